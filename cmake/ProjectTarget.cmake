@@ -1,0 +1,39 @@
+# What every target of this project has in common.
+
+include_guard()
+
+add_library(modeling_flags INTERFACE)
+target_compile_features(modeling_flags INTERFACE cxx_std_20)
+target_compile_options(modeling_flags INTERFACE
+    # Fused multiply-adds round differently: results would depend on the compiler and the machine.
+    -ffp-contract=off
+    -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor -Woverloaded-virtual)
+if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
+    target_compile_options(modeling_flags INTERFACE -Wno-restrict) # g++ 12 sees overlaps in std::string that are not there
+endif()
+if(MODELING_WARNINGS_AS_ERRORS)
+    target_compile_options(modeling_flags INTERFACE -Werror)
+endif()
+if(MODELING_SANITIZE)
+    target_compile_options(modeling_flags INTERFACE -fsanitize=${MODELING_SANITIZE} -fno-omit-frame-pointer)
+    target_link_options(modeling_flags INTERFACE -fsanitize=${MODELING_SANITIZE})
+    if(MODELING_SANITIZE MATCHES "undefined")
+        target_compile_options(modeling_flags INTERFACE -fno-sanitize-recover=undefined)
+    endif()
+endif()
+
+# A target with the project's language level, warnings and sanitizers. Nothing of that reaches its users.
+function(modeling_use_flags target)
+    target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:modeling_flags>)
+    target_compile_features(${target} PUBLIC cxx_std_20)
+    set_target_properties(${target} PROPERTIES CXX_EXTENSIONS OFF)
+endfunction()
+
+# A test program; further arguments are its libraries. Each gtest case becomes a test of CTest.
+function(modeling_add_test name)
+    cmake_parse_arguments(arg "" "" "SOURCES;LIBRARIES;LABELS" ${ARGN})
+    add_executable(${name} ${arg_SOURCES})
+    modeling_use_flags(${name})
+    target_link_libraries(${name} PRIVATE ${arg_LIBRARIES} GTest::gmock GTest::gtest_main)
+    gtest_discover_tests(${name} DISCOVERY_TIMEOUT 60 PROPERTIES LABELS "${arg_LABELS}" TIMEOUT 600)
+endfunction()

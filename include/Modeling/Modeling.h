@@ -1,0 +1,5 @@
+#pragma once
+
+// All operations of the library.
+
+#include <Modeling/removeSlivers.h>

@@ -1,0 +1,519 @@
+#include <Modeling/removeSlivers.h>
+
+#include "frame/Arrays.h"
+#include "frame/PointCorners.h"
+#include "frame/VectorMath.h"
+#include "host/GeoProperties.h"
+
+#include <TessaraGeometry/Elements.h>
+
+#include <array>
+#include <atomic>
+#include <memory>
+#include <optional>
+#include <vector>
+
+namespace Geometry::Mesh {
+
+using namespace Modeling;
+using Tessara::Geometry::kInvalidIndex;
+
+namespace {
+
+    using IndexArray = Orvan::Array<unsigned int>;
+    using Triangle = std::array<unsigned int, 3>;
+
+    // Around a face: corner k, edge k from corner k to the next one, and the face across edge k.
+    constexpr unsigned int next(unsigned int k)
+    {
+        return k == 2 ? 0 : k + 1;
+    }
+    constexpr unsigned int previous(unsigned int k)
+    {
+        return k == 0 ? 2 : k - 1;
+    }
+
+    /// The arrays as the object holds them; nobody writes them during the operation.
+    struct TriangleMesh {
+        Orvan::Ptr<Orvan::Array<float3>> positions;
+        Orvan::Ptr<IndexArray> faceVertex;
+        Orvan::Ptr<IndexArray> faceOffset;
+        unsigned int pointCount = 0;
+        unsigned int faceCount = 0;
+    };
+
+    /// The mesh while its faces collapse. A removed face has `kInvalidIndex` at its first corner.
+    struct CollapsingMesh {
+        Orvan::Array<float3> positions;
+        IndexArray faceVertex;
+        Orvan::Array<Triangle> adjacency; // the faces across a face's edges
+        IndexArray valence; // faces around each point; a fan that is no longer is not all around its point
+        Orvan::Array<unsigned char>
+            isDue; // faces to be measured: those that qualified at first, and those changed since
+        std::vector<unsigned int> removedFaces;
+        std::vector<unsigned int> removedPoints;
+
+        unsigned int* corners(unsigned int face) { return faceVertex.data + std::size_t{3} * face; }
+        unsigned int const* corners(unsigned int face) const { return faceVertex.data + std::size_t{3} * face; }
+        bool isRemoved(unsigned int face) const { return corners(face)[0] == kInvalidIndex; }
+    };
+
+    /// A face around a point, which is its corner `entry`.
+    struct FanFace {
+        unsigned int face;
+        unsigned int entry;
+    };
+
+    /// An edge that may collapse, from `start` to `end`, and the faces around both ends.
+    struct EdgeFans {
+        unsigned int face = 0; // whose edge it is
+        unsigned int edge = 0;
+        unsigned int across = 0; // the face on the other side
+        unsigned int start = 0;
+        unsigned int end = 0;
+        std::vector<FanFace> startFan; // from behind `face` up to and including `across`
+        std::vector<FanFace> endFan; // from behind `across` up to and including `face`
+        std::vector<unsigned int> startRing, endRing, sharedRing; // the points around the ends, without the other end
+    };
+
+    bool hasOnlyTriangles(IndexArray const& faceOffset, unsigned int faceCount)
+    {
+        std::atomic<bool> areTriangles = true;
+        unsigned int const* const offset = faceOffset.data;
+        // Any thread may clear the flag; it is looked at after the loop.
+        parallelFor(
+            tbb::blocked_range<std::size_t>(0, std::size_t{faceCount} + 1, kElementGrain), [&](auto const& entries) {
+                for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry)
+                    if (offset[entry] != 3 * entry)
+                        areTriangles.store(false, std::memory_order_relaxed);
+            });
+        return areTriangles.load(std::memory_order_relaxed);
+    }
+
+    /// Nothing where an array is missing or the faces are not all triangles.
+    std::optional<TriangleMesh> readTriangleMesh(Tessara::Object const& object)
+    {
+        using namespace Tessara::Geometry;
+        TriangleMesh mesh;
+        mesh.positions = readGeoPropData<float3>(object, sPointPosition);
+        mesh.faceVertex = readGeoPropData<unsigned int>(object, sFaceVertex);
+        mesh.faceOffset = readGeoPropData<unsigned int>(object, sFaceOffset);
+        if (!mesh.positions || !mesh.faceVertex || !mesh.faceOffset)
+            return std::nullopt;
+        mesh.pointCount = static_cast<unsigned int>(mesh.positions->size);
+        mesh.faceCount = getElementCount(object, sFaceComp);
+        bool const fits =
+            mesh.faceOffset->size > mesh.faceCount && mesh.faceVertex->size >= std::uint64_t{3} * mesh.faceCount;
+        if (!fits || !hasOnlyTriangles(*mesh.faceOffset, mesh.faceCount))
+            return std::nullopt;
+        return mesh;
+    }
+
+    struct EdgeLengths {
+        float shortest = std::numeric_limits<float>::max();
+        float longest = -std::numeric_limits<float>::max();
+        unsigned int shortestEdge = 0; // of equal ones the first
+    };
+
+    EdgeLengths measureEdges(unsigned int const* corners, float3 const* position)
+    {
+        EdgeLengths lengths;
+        for (unsigned int edge = 0; edge != 3; ++edge) {
+            float const edgeLength = length(position[corners[next(edge)]] - position[corners[edge]]);
+            if (lengths.shortest > edgeLength) {
+                lengths.shortest = edgeLength;
+                lengths.shortestEdge = edge;
+            }
+            if (lengths.longest < edgeLength)
+                lengths.longest = edgeLength;
+        }
+        return lengths;
+    }
+
+    bool isSliver(EdgeLengths const& lengths, float ratio)
+    {
+        return lengths.longest * ratio > lengths.shortest;
+    }
+
+    /// One byte a face: 1 where it is a sliver as it stands. Only these, and faces that a collapse changes, can
+    /// collapse.
+    Orvan::Array<unsigned char> findSlivers(TriangleMesh const& mesh, float ratio)
+    {
+        Orvan::Array<unsigned char> slivers = uninitializedArray<unsigned char>(mesh.faceCount);
+        unsigned char* const sliver = slivers.data;
+        unsigned int const* const corner = mesh.faceVertex->data;
+        float3 const* const position = mesh.positions->data;
+        // Each face writes its own byte.
+        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [=](auto const& faces) {
+            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
+                sliver[face] = isSliver(measureEdges(corner + std::size_t{3} * face, position), ratio) ? 1 : 0;
+        });
+        return slivers;
+    }
+
+    /// The first due face from `face` on; the face count where there is none.
+    unsigned int nextDue(Orvan::Array<unsigned char> const& isDue, unsigned int face)
+    {
+        if (face >= isDue.size)
+            return static_cast<unsigned int>(isDue.size);
+        void const* const due = std::memchr(isDue.data + face, 1, isDue.size - face);
+        return static_cast<unsigned int>(
+            due ? static_cast<unsigned char const*>(due) - isDue.data : isDue.end() - isDue.data);
+    }
+
+    /// A half-edge into the point at hand: where it comes from, and its face.
+    struct Incoming {
+        unsigned int start;
+        unsigned int face;
+        friend auto operator<=>(Incoming const&, Incoming const&) = default;
+    };
+
+    /// Finds the twins of the half-edges that leave one point, among those that enter it.
+    class TwinFinder {
+    public:
+        void gather(unsigned int const* corners, std::size_t count, unsigned int const* faceVertex)
+        {
+            incoming_.resize(count);
+            for (std::size_t i = 0; i != count; ++i) {
+                unsigned int const face = corners[i] / 3;
+                incoming_[i] = {faceVertex[std::size_t{3} * face + previous(corners[i] % 3)], face};
+            }
+            isSorted_ = count > kShortList;
+            if (isSorted_)
+                std::sort(incoming_.begin(), incoming_.end());
+        }
+
+        /// The lowest face whose half-edge comes from `start`.
+        unsigned int faceFrom(unsigned int start) const
+        {
+            auto const from = isSorted_
+                ? std::lower_bound(incoming_.begin(), incoming_.end(), Incoming{start, 0})
+                : std::find_if(incoming_.begin(), incoming_.end(), [=](Incoming const& i) { return i.start == start; });
+            return from != incoming_.end() && from->start == start ? from->face : kInvalidIndex;
+        }
+
+    private:
+        static constexpr std::size_t kShortList = 24; // up to here looking at all is faster than sorting
+        std::vector<Incoming> incoming_;
+        bool isSorted_ = false;
+    };
+
+    /// For each edge of each face the face on its other side, of several the lowest; `kInvalidIndex` at a boundary.
+    Orvan::Array<Triangle> buildFaceAdjacency(TriangleMesh const& mesh, PointCorners const& around)
+    {
+        Orvan::Array<Triangle> adjacency = uninitializedArray<Triangle>(mesh.faceCount);
+        Triangle* const neighbours = adjacency.data;
+        unsigned int const* const faceVertex = mesh.faceVertex->data;
+        unsigned int const* const offset = around.offsets.data;
+        unsigned int const* const corners = around.corners.data;
+        // Each half-edge leaves one point, whose iteration writes its entry.
+        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.pointCount, kFaceGrain), [=](auto const& points) {
+            TwinFinder twins;
+            for (unsigned int point = points.begin(); point != points.end(); ++point) {
+                twins.gather(corners + offset[point], offset[point + 1] - offset[point], faceVertex);
+                for (unsigned int i = offset[point]; i != offset[point + 1]; ++i) {
+                    unsigned int const face = corners[i] / 3;
+                    unsigned int const edge = corners[i] % 3;
+                    neighbours[face][edge] = twins.faceFrom(faceVertex[std::size_t{3} * face + next(edge)]);
+                }
+            }
+        });
+        return adjacency;
+    }
+
+    IndexArray countFacesAround(PointCorners const& around)
+    {
+        unsigned int const* const offset = around.offsets.data;
+        IndexArray valence = uninitializedArray<unsigned int>(around.offsets.size - 1);
+        unsigned int* const count = valence.data;
+        // Each point writes its own entry.
+        parallelFor(tbb::blocked_range<std::size_t>(0, valence.size, kElementGrain), [=](auto const& points) {
+            for (std::size_t point = points.begin(); point != points.end(); ++point)
+                count[point] = offset[point + 1] - offset[point];
+        });
+        return valence;
+    }
+
+    CollapsingMesh prepareCollapses(TriangleMesh const& mesh, Orvan::Array<unsigned char> slivers)
+    {
+        CollapsingMesh collapsing;
+        {
+            PointCorners const around =
+                cornersByPoint(mesh.pointCount, mesh.faceVertex->data, std::size_t{3} * mesh.faceCount);
+            collapsing.adjacency = buildFaceAdjacency(mesh, around);
+            collapsing.valence = countFacesAround(around);
+        }
+        collapsing.positions = copyOfFirst(mesh.pointCount, *mesh.positions);
+        collapsing.faceVertex = copyOfFirst(std::uint64_t{3} * mesh.faceCount, *mesh.faceVertex);
+        collapsing.isDue = std::move(slivers);
+        return collapsing;
+    }
+
+    /// Which edge of `face` has `neighbour` on its other side.
+    unsigned int neighbourIndex(CollapsingMesh const& mesh, unsigned int face, unsigned int neighbour)
+    {
+        Triangle const& neighbours = mesh.adjacency[face];
+        return neighbours[0] == neighbour ? 0 : neighbours[1] == neighbour ? 1 : 2;
+    }
+
+    /// Lists the faces around `center`, from behind `first` (left through `edge`) up to and including `last`.
+    /// False unless the fan closes and holds all faces of the point: around boundaries and non-manifold points it does
+    /// not.
+    bool collectFan(CollapsingMesh const& mesh, unsigned int center, FanFace const& first, unsigned int last,
+        std::vector<FanFace>& fan)
+    {
+        fan.clear();
+        FanFace current = first;
+        for (unsigned int left = mesh.valence[center]; left > 1; --left) {
+            unsigned int const face = mesh.adjacency[current.face][previous(current.entry)];
+            if (face == kInvalidIndex || face == first.face || mesh.isRemoved(face))
+                return false;
+            unsigned int const entry = neighbourIndex(mesh, face, current.face);
+            if (mesh.corners(face)[entry] != center)
+                return false;
+            current = {face, entry};
+            fan.push_back(current);
+        }
+        return !fan.empty() && fan.back().face == last
+            && mesh.adjacency[current.face][previous(current.entry)] == first.face;
+    }
+
+    bool collectFans(CollapsingMesh const& mesh, unsigned int face, unsigned int edge, EdgeFans& fans)
+    {
+        fans.face = face;
+        fans.edge = edge;
+        fans.across = mesh.adjacency[face][edge];
+        if (fans.across == kInvalidIndex || fans.across == face || mesh.isRemoved(fans.across))
+            return false;
+        fans.start = mesh.corners(face)[edge];
+        fans.end = mesh.corners(face)[next(edge)];
+        if (fans.start == fans.end)
+            return false;
+        unsigned int const edgeAcross = neighbourIndex(mesh, fans.across, face);
+        return mesh.corners(fans.across)[edgeAcross] == fans.end
+            && collectFan(mesh, fans.start, {face, edge}, fans.across, fans.startFan)
+            && collectFan(mesh, fans.end, {fans.across, edgeAcross}, face, fans.endFan);
+    }
+
+    /// The points around an end of the edge, without the other end, ascending.
+    void collectRing(CollapsingMesh const& mesh, std::vector<FanFace> const& fan, std::vector<unsigned int>& ring)
+    {
+        ring.clear();
+        for (FanFace const& around : fan)
+            ring.push_back(mesh.corners(around.face)[next(around.entry)]);
+        std::sort(ring.begin(), ring.end());
+    }
+
+    /// Whether the ends of the edge have just the third points of its two faces in common, and are not both of valence
+    /// 3: that collapse would close up a tetrahedron.
+    bool collapseKeepsLink(CollapsingMesh const& mesh, EdgeFans& fans)
+    {
+        collectRing(mesh, fans.startFan, fans.startRing);
+        collectRing(mesh, fans.endFan, fans.endRing);
+        if (fans.startRing.size() == 2 && fans.endRing.size() == 2)
+            return false;
+        fans.sharedRing.clear();
+        std::set_intersection(fans.startRing.begin(), fans.startRing.end(), fans.endRing.begin(), fans.endRing.end(),
+            std::back_inserter(fans.sharedRing));
+        return fans.sharedRing.size() == 2;
+    }
+
+    /// The normal of a face from before the first collapse. Its length is the sine of the angle, on purpose.
+    float3 originalNormal(TriangleMesh const& original, unsigned int face)
+    {
+        unsigned int const* const c = original.faceVertex->data + std::size_t{3} * face;
+        float3 const* const position = original.positions->data;
+        return cross(safeNormalize(position[c[1]] - position[c[0]]), safeNormalize(position[c[2]] - position[c[0]]));
+    }
+
+    bool faceKeepsOrientation(
+        TriangleMesh const& original, CollapsingMesh const& mesh, FanFace const& around, float3 const& midpoint)
+    {
+        unsigned int const* const c = mesh.corners(around.face);
+        float3 const p0 = mesh.positions[c[around.entry]]; // the point that moves
+        float3 const p1 = mesh.positions[c[next(around.entry)]];
+        float3 const p2 = mesh.positions[c[previous(around.entry)]];
+
+        // The midpoint has to lie strictly on the inner side of the opposite edge,
+        float3 const opposite = safeNormalize(p2 - p1);
+        float3 const normal = cross(safeNormalize(p1 - p0), safeNormalize(p2 - p0));
+        if (dot(cross(normal, opposite), midpoint - p1) <= 0)
+            return false;
+        // and the new face may not look away from where the original face looked.
+        float3 const newNormal = cross(safeNormalize(p1 - midpoint), safeNormalize(p2 - midpoint));
+        return !(dot(newNormal, originalNormal(original, around.face)) <= 0);
+    }
+
+    float3 midpointOf(CollapsingMesh const& mesh, EdgeFans const& fans)
+    {
+        return (mesh.positions[fans.start] + mesh.positions[fans.end]) * 0.5f;
+    }
+
+    bool collapseKeepsOrientation(TriangleMesh const& original, CollapsingMesh const& mesh, EdgeFans const& fans)
+    {
+        float3 const midpoint = midpointOf(mesh, fans);
+        auto const keepsIt = [&](FanFace const& around) {
+            return faceKeepsOrientation(original, mesh, around, midpoint);
+        };
+        // The last face of either fan is one of the two that go.
+        return std::all_of(fans.startFan.begin(), fans.startFan.end() - 1, keepsIt)
+            && std::all_of(fans.endFan.begin(), fans.endFan.end() - 1, keepsIt);
+    }
+
+    void replaceNeighbour(unsigned int face, unsigned int from, unsigned int to, CollapsingMesh& mesh)
+    {
+        Triangle& neighbours = mesh.adjacency[face];
+        auto const first = std::find(neighbours.begin(), neighbours.end(), from);
+        if (first != neighbours.end())
+            *first = to;
+    }
+
+    /// Joins the faces on both sides of the two faces that go.
+    void glueHoles(EdgeFans const& fans, CollapsingMesh& mesh)
+    {
+        unsigned int const f = fans.face;
+        unsigned int const g = fans.across;
+        unsigned int const j = neighbourIndex(mesh, g, f);
+        // All four are read before anything changes.
+        unsigned int const x = mesh.adjacency[f][next(fans.edge)];
+        unsigned int const y = mesh.adjacency[f][previous(fans.edge)];
+        unsigned int const s = mesh.adjacency[g][next(j)];
+        unsigned int const t = mesh.adjacency[g][previous(j)];
+        replaceNeighbour(x, f, y, mesh);
+        replaceNeighbour(y, f, x, mesh);
+        replaceNeighbour(t, g, s, mesh);
+        replaceNeighbour(s, g, t, mesh);
+    }
+
+    void removeFace(unsigned int face, EdgeFans const& fans, CollapsingMesh& mesh)
+    {
+        unsigned int* const corners = mesh.corners(face);
+        for (unsigned int k = 0; k != 3; ++k)
+            --mesh.valence[corners[k] == fans.end ? fans.start : corners[k]];
+        corners[0] = kInvalidIndex;
+        mesh.removedFaces.push_back(face);
+    }
+
+    void collapseEdge(EdgeFans const& fans, CollapsingMesh& mesh)
+    {
+        mesh.removedFaces.reserve(mesh.removedFaces.size() + 2);
+        mesh.positions[fans.start] = midpointOf(mesh, fans);
+        mesh.removedPoints.push_back(fans.end);
+        for (auto around = fans.endFan.begin(); around != fans.endFan.end() - 1; ++around)
+            std::replace(mesh.corners(around->face), mesh.corners(around->face) + 3, fans.end, fans.start);
+        glueHoles(fans, mesh);
+
+        mesh.valence[fans.start] += std::exchange(mesh.valence[fans.end], 0);
+        removeFace(fans.face, fans, mesh);
+        removeFace(fans.across, fans, mesh);
+        for (std::vector<FanFace> const* const fan : {&fans.startFan, &fans.endFan})
+            for (FanFace const& around : *fan)
+                mesh.isDue[around.face] = 1;
+    }
+
+    void collapseSlivers(TriangleMesh const& original, float ratio, CollapsingMesh& mesh)
+    {
+        EdgeFans fans;
+        for (unsigned int face = nextDue(mesh.isDue, 0); face != original.faceCount;
+             face = nextDue(mesh.isDue, face + 1)) {
+            if (mesh.isRemoved(face))
+                continue;
+            EdgeLengths const lengths = measureEdges(mesh.corners(face), mesh.positions.data);
+            if (isSliver(lengths, ratio) && collectFans(mesh, face, lengths.shortestEdge, fans)
+                && collapseKeepsLink(mesh, fans) && collapseKeepsOrientation(original, mesh, fans))
+                collapseEdge(fans, mesh);
+        }
+    }
+
+    /// Fills the holes among the points from the end. Entry p of the result is the new index of point p.
+    IndexArray compactPoints(CollapsingMesh& mesh)
+    {
+        IndexArray pointRemap = uninitializedArray<unsigned int>(mesh.positions.size);
+        unsigned int* const remap = pointRemap.data;
+        // Each point writes its own entry.
+        parallelFor(tbb::blocked_range<std::size_t>(0, pointRemap.size, kElementGrain), [=](auto const& points) {
+            for (std::size_t point = points.begin(); point != points.end(); ++point)
+                remap[point] = static_cast<unsigned int>(point);
+        });
+        for (unsigned int const point : mesh.removedPoints)
+            remap[point] = kInvalidIndex;
+        std::sort(mesh.removedPoints.begin(), mesh.removedPoints.end());
+        std::uint64_t const remaining = mesh.positions.size - mesh.removedPoints.size();
+        std::uint64_t last = mesh.positions.size - 1;
+        for (unsigned int const hole : mesh.removedPoints) {
+            if (hole >= remaining)
+                break;
+            while (remap[last] == kInvalidIndex)
+                --last;
+            remap[last] = hole;
+            mesh.positions[hole] = mesh.positions[last];
+            --last;
+        }
+        mesh.positions.resize(remaining);
+        return pointRemap;
+    }
+
+    /// Fills the holes among the faces from the end, the last hole first.
+    void compactFaces(CollapsingMesh& mesh)
+    {
+        std::sort(mesh.removedFaces.begin(), mesh.removedFaces.end(), std::greater<>());
+        std::uint64_t faceCount = mesh.faceVertex.size / 3;
+        for (unsigned int const hole : mesh.removedFaces) {
+            --faceCount;
+            std::copy_n(mesh.corners(static_cast<unsigned int>(faceCount)), 3, mesh.corners(hole));
+        }
+        mesh.faceVertex.resize(3 * faceCount);
+    }
+
+    void compactAfterCollapse(CollapsingMesh& mesh)
+    {
+        IndexArray const pointRemap = compactPoints(mesh);
+        compactFaces(mesh);
+        unsigned int const* const remap = pointRemap.data;
+        unsigned int* const corner = mesh.faceVertex.data;
+        // Each corner writes its own entry.
+        parallelFor(tbb::blocked_range<std::size_t>(0, mesh.faceVertex.size, kElementGrain), [=](auto const& corners) {
+            for (std::size_t c = corners.begin(); c != corners.end(); ++c)
+                corner[c] = remap[corner[c]];
+        });
+    }
+
+    void writeTriangleMesh(TriangleMesh const& original, CollapsingMesh&& mesh, Tessara::Object& object)
+    {
+        using namespace Tessara::Geometry;
+        auto const cornerCount = static_cast<unsigned int>(mesh.faceVertex.size);
+        unsigned int const faceCount = cornerCount / 3;
+        PreparedWrites writes(object);
+        writes.setElementCount(sPointComp, static_cast<unsigned int>(mesh.positions.size));
+        writes.setElementCount(sFaceVertexComp, cornerCount);
+        writes.setElementCount(sFaceComp, faceCount);
+        writes.writeGeoPropData(sPointPosition, Orvan::makePtr<Orvan::Array<float3>>(std::move(mesh.positions)));
+        writes.writeGeoPropData(sFaceVertex, Orvan::makePtr<IndexArray>(std::move(mesh.faceVertex)));
+        // The offsets of triangles are 0, 3, 6 and so on, however many there are.
+        writes.writeGeoPropData(
+            sFaceOffset, Orvan::makePtr<IndexArray>(copyOfFirst(std::uint64_t{faceCount} + 1, *original.faceOffset)));
+        writes.commit();
+    }
+
+}
+
+bool removeSlivers(float ratio, Tessara::Object& mesh)
+{
+    std::optional<TriangleMesh> const original = readTriangleMesh(mesh);
+    if (!original)
+        return true;
+    Orvan::Array<unsigned char> slivers = findSlivers(*original, ratio);
+    if (nextDue(slivers, 0) == original->faceCount)
+        return true;
+
+    CollapsingMesh collapsing = prepareCollapses(*original, std::move(slivers));
+    collapseSlivers(*original, ratio, collapsing);
+    if (collapsing.removedFaces.empty())
+        return true;
+
+    compactAfterCollapse(collapsing);
+    writeTriangleMesh(*original, std::move(collapsing), mesh);
+    return true;
+}
+
+}

@@ -1,0 +1,101 @@
+#pragma once
+
+#include "ParallelFor.h"
+
+#include <OrvanCore/Array.h>
+
+#include <tbb/parallel_scan.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <cstring>
+#include <limits>
+#include <new>
+#include <type_traits>
+
+namespace Modeling {
+
+/// An array whose elements the caller writes before they are read; elements of non-trivial types are constructed.
+template <class T> Orvan::Array<T> uninitializedArray(std::uint64_t count)
+{
+    return Orvan::Array<T>(count, Orvan::kUninitialized);
+}
+
+namespace Internal {
+
+    constexpr std::size_t kBlockBytes = std::size_t{1} << 18; // enough to drown the cost of a task
+
+    template <class T> constexpr std::size_t kBlockGrain = std::max<std::size_t>(1, kBlockBytes / sizeof(T));
+
+}
+
+/// Copies elements between arrays that do not overlap, with several threads where that pays.
+template <class T> void copyElements(T const* source, std::size_t count, T* target)
+{
+    // Each block writes its own elements.
+    parallelFor(tbb::blocked_range<std::size_t>(0, count, Internal::kBlockGrain<T>), [=](auto const& block) {
+        if constexpr (std::is_trivially_copyable_v<T>)
+            std::memcpy(static_cast<void*>(target + block.begin()), source + block.begin(), block.size() * sizeof(T));
+        else
+            std::copy(source + block.begin(), source + block.end(), target + block.begin());
+    });
+}
+
+/// Gives elements of an array one value, with several threads where that pays.
+template <class T> void fillElements(T* target, std::size_t count, T const& value)
+{
+    // Each block writes its own elements.
+    parallelFor(tbb::blocked_range<std::size_t>(0, count, Internal::kBlockGrain<T>),
+        [=, &value](auto const& block) { std::fill(target + block.begin(), target + block.end(), value); });
+}
+
+/// A copy of the first `count` elements of an array, with a capacity of as many.
+template <class T> Orvan::Array<T> copyOfFirst(std::uint64_t count, Orvan::Array<T> const& source)
+{
+    Orvan::Array<T> copy = uninitializedArray<T>(count);
+    copyElements(source.data, count, copy.data);
+    return copy;
+}
+
+template <class T> Orvan::Array<T> filledArray(std::uint64_t count, T const& value)
+{
+    Orvan::Array<T> array = uninitializedArray<T>(count);
+    fillElements(array.data, count, value);
+    return array;
+}
+
+template <class T> Orvan::Array<T> zeroedArray(std::uint64_t count)
+{
+    return filledArray(count, T{});
+}
+
+/// The sums of the counts before each element, and of all of them: entry i is where the things of element i begin, and
+/// the array is one entry longer than the elements.
+/// \param countOf  `unsigned int (std::size_t element)`, called up to twice an element and from several threads
+/// \throws std::bad_alloc  when memory runs out or the sum does not fit 32 bits
+template <class CountOf> Orvan::Array<unsigned int> offsetsFromCounts(std::size_t elementCount, CountOf const& countOf)
+{
+    Orvan::Array<unsigned int> offsets = uninitializedArray<unsigned int>(elementCount + 1);
+    unsigned int* const offset = offsets.data;
+    std::uint64_t total = 0;
+    auto const addUp = [&countOf, offset](
+                           tbb::blocked_range<std::size_t> const& elements, std::uint64_t sum, bool isFinal) {
+        for (std::size_t element = elements.begin(); element != elements.end(); ++element) {
+            if (isFinal)
+                offset[element] = static_cast<unsigned int>(sum);
+            sum += countOf(element);
+        }
+        return sum;
+    };
+    tbb::blocked_range<std::size_t> const all(0, elementCount, kElementGrain);
+    if (elementCount <= kElementGrain)
+        total = addUp(all, 0, true);
+    else
+        runIsolated([&] { total = tbb::parallel_scan(all, std::uint64_t{0}, addUp, std::plus<>()); });
+    if (total > std::numeric_limits<unsigned int>::max())
+        throw std::bad_alloc();
+    offset[elementCount] = static_cast<unsigned int>(total);
+    return offsets;
+}
+
+}

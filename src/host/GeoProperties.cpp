@@ -1,0 +1,84 @@
+#include "GeoProperties.h"
+
+#include <TessaraGeometry/Elements.h>
+
+namespace Modeling {
+
+using Tessara::Object;
+using Tessara::PropertyValue;
+using namespace Tessara::Geometry;
+
+namespace {
+
+    Orvan::Ptr<Object> objectAt(Object const& object, Orvan::String const& key)
+    {
+        PropertyValue const value = object.getProperty(key);
+        auto const* const held = value.get<Orvan::Ptr<Object>>();
+        return held ? *held : nullptr;
+    }
+
+}
+
+Orvan::Ptr<Object> dataPropertyAt(Object const& object, Orvan::String const& key)
+{
+    Orvan::Ptr<Object> property = objectAt(object, key);
+    return property && property->hasProperty(sData) ? property : nullptr;
+}
+
+bool writeGeoPropValue(Orvan::String const& key, PropertyValue&& data, Object& object)
+{
+    Orvan::Ptr<Object> property = dataPropertyAt(object, key);
+    if (!property)
+        return false;
+    Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
+    changed->setProperty(sData, std::move(data));
+    if (!key.empty())
+        object.setProperty(key, Orvan::Ptr<Object>(std::move(changed)));
+    return true;
+}
+
+void PreparedWrites::setElementCount(Orvan::String const& component, unsigned int count)
+{
+    writes_.push_back({component, count, nullptr});
+    Tessara::Geometry::setElementCount(component, getElementCount(object_, component), object_);
+}
+
+void PreparedWrites::writeValue(Orvan::String const& key, PropertyValue&& data)
+{
+    Orvan::Ptr<Object> property = dataPropertyAt(object_, key);
+    if (!property || key.empty())
+        return;
+    Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
+    changed->setProperty(sData, std::move(data));
+    writes_.push_back({key, 0, std::move(changed)});
+}
+
+void PreparedWrites::commit() noexcept
+{
+    for (Write& write : writes_) {
+        if (write.property)
+            object_.setProperty(write.key, Orvan::Ptr<Object>(std::move(write.property)));
+        else
+            Tessara::Geometry::setElementCount(write.key, write.count, object_);
+    }
+    writes_.clear();
+}
+
+std::vector<std::pair<Orvan::String, Orvan::MutablePtr<Object>>> collectGeoPropsByTarget(
+    Object const& object, Orvan::String const& target)
+{
+    std::vector<std::pair<Orvan::String, Orvan::MutablePtr<Object>>> collected;
+    Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = object.keys();
+    for (Orvan::String const& key : *keys) {
+        Orvan::Ptr<Object> property = objectAt(object, key);
+        if (!property)
+            continue;
+        PropertyValue const propertyTarget = property->getProperty(sTarget);
+        auto const* const name = propertyTarget.get<Orvan::String>();
+        if (name && *name == target)
+            collected.emplace_back(key, makeMutable(std::move(property)));
+    }
+    return collected;
+}
+
+}

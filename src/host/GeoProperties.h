@@ -1,0 +1,132 @@
+#pragma once
+
+#include <OrvanCore/Array.h>
+#include <OrvanCore/Ptr.h>
+#include <OrvanCore/String.h>
+#include <TessaraGeometry/Names.h>
+#include <TessaraGeometry/Records.h>
+#include <TessaraObject/Object.h>
+
+#include <utility>
+#include <vector>
+
+namespace Modeling {
+
+/// The geo property under a key: null unless the key holds one with `sData`.
+Orvan::Ptr<Tessara::Object> dataPropertyAt(Tessara::Object const& object, Orvan::String const& key);
+
+/// The array of a data property, shared with the object and not copied. Null where there is none of that type.
+template <class T> Orvan::Ptr<Orvan::Array<T>> readGeoPropData(Tessara::Object const& object, Orvan::String const& key)
+{
+    Orvan::Ptr<Tessara::Object> const property = dataPropertyAt(object, key);
+    if (!property)
+        return nullptr;
+    Tessara::PropertyValue const data = property->getProperty(Tessara::Geometry::sData);
+    auto const* const values = data.get<Orvan::Ptr<Orvan::Array<T>>>();
+    return values ? *values : nullptr;
+}
+
+/// Replaces the value under `sData` of a data property: the only way in which operations change one. The geo property
+/// is cloned, which copies no array, so that its other holders see no change. \return false, with nothing changed,
+/// where the key holds no data property
+bool writeGeoPropValue(Orvan::String const& key, Tessara::PropertyValue&& data, Tessara::Object& object);
+
+template <class T>
+bool writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& data, Tessara::Object& object)
+{
+    return writeGeoPropValue(key, std::move(data), object);
+}
+
+/// Changes to one object that are prepared first, and then made without taking memory: all of them or, when preparing
+/// fails, none. (Clones of geo properties are made when a change is added, and a component's count is made this
+/// object's own by setting it to what it is.)
+class PreparedWrites {
+public:
+    explicit PreparedWrites(Tessara::Object& object)
+        : object_(object)
+    {
+    }
+
+    /// As `setElementCount`; without effect where there is no such component.
+    void setElementCount(Orvan::String const& component, unsigned int count);
+
+    /// As `writeGeoPropData`; without effect where the key holds no data property.
+    template <class T> void writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& data)
+    {
+        writeValue(key, std::move(data));
+    }
+
+    /// Makes the changes in the order in which they were added.
+    void commit() noexcept;
+
+private:
+    struct Write {
+        Orvan::String key;
+        unsigned int count; // of a component
+        Orvan::MutablePtr<Tessara::Object> property; // null for a component
+    };
+
+    void writeValue(Orvan::String const& key, Tessara::PropertyValue&& data);
+
+    Tessara::Object& object_;
+    std::vector<Write> writes_;
+};
+
+/// Edits the array of a data property in place: `edit(Orvan::Array<T>&)`. It is copied only where somebody other than
+/// this object holds it.
+///
+/// An array that is merely read from an object is shared with it, and making it mutable would copy it. So the property
+/// first lets go of it, and gets it back afterwards, also when `edit` throws; the memory for that is taken beforehand.
+/// \return false, with nothing called, where the key holds no data property of that type
+template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Tessara::Object& object, Edit&& edit)
+{
+    using SharedArray = Orvan::Ptr<Orvan::Array<T>>;
+    SharedArray shared = readGeoPropData<T>(object, key);
+    if (!shared)
+        return false;
+
+    struct PutBack {
+        Orvan::String key;
+        Tessara::Object& object;
+        Orvan::MutablePtr<Tessara::Object> property; // a clone of the present one
+        SharedArray array;
+
+        ~PutBack()
+        {
+            property->setProperty(Tessara::Geometry::sData, std::move(array));
+            object.setProperty(key, Orvan::Ptr<Tessara::Object>(std::move(property)));
+        }
+    } putBack{key, object, makeMutable(dataPropertyAt(object, key)), std::move(shared)};
+
+    writeGeoPropData<T>(key, nullptr, object);
+    putBack.property->setProperty(Tessara::Geometry::sData, SharedArray());
+    Orvan::MutablePtr<Orvan::Array<T>> array = makeMutable(std::move(putBack.array));
+    try {
+        edit(*array);
+    } catch (...) {
+        putBack.array = std::move(array);
+        throw;
+    }
+    putBack.array = std::move(array);
+    return true;
+}
+
+/// A data property of element type `T` that holds no values yet and targets nothing.
+template <class T> Orvan::MutablePtr<Tessara::Object> populateDataGeoProperty(T const& defaultValue)
+{
+    using namespace Tessara::Geometry;
+    Orvan::MutablePtr<Tessara::Object> property = Tessara::createObject();
+    property->setProperty(sData, Orvan::makePtr<Orvan::Array<T>>());
+    property->setProperty(sTarget, Orvan::String(sNullString));
+    property->setProperty(sDependsOn, Orvan::makePtr<Orvan::Array<Orvan::String>>());
+    property->setProperty(sDefault, defaultValue);
+    property->setProperty(sInterp, static_cast<Common::DataInterpolationMode>(1));
+    return property;
+}
+
+/// The geo properties of every kind whose `sTarget` is `target`, in the order of the object's keys: names, and private
+/// shallow clones. The object is not changed.
+std::vector<std::pair<Orvan::String, Orvan::MutablePtr<Tessara::Object>>> collectGeoPropsByTarget(
+    Tessara::Object const& object, Orvan::String const& target);
+
+}

@@ -1,0 +1,181 @@
+#pragma once
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <type_traits>
+#include <utility>
+
+namespace Orvan {
+
+template <class T> class Ptr;
+template <class T> class MutablePtr;
+
+namespace Internal {
+
+    /// Counts the references to one shared value, and knows how to copy it and how to end it.
+    template <class T> class ControlBlock {
+    public:
+        virtual Ptr<T> clone(T const& value) const = 0; ///< A deep copy of the value, held once.
+        virtual void dispose() noexcept = 0; ///< Destroys the value and this block.
+
+        std::atomic<std::uint64_t> count{1};
+
+    protected:
+        ~ControlBlock() = default;
+    };
+
+    /// Holds the value itself, so that a shared value is one allocation.
+    template <class T> class InlineControlBlock final : public ControlBlock<T> {
+    public:
+        template <class... Arguments> explicit InlineControlBlock(Arguments&&... arguments)
+            : value(std::forward<Arguments>(arguments)...)
+        {
+        }
+
+        Ptr<T> clone(T const& source) const override;
+        void dispose() noexcept override { delete this; }
+
+        T value;
+    };
+
+    template <class T> void retain(ControlBlock<T>* control) noexcept
+    {
+        if (control)
+            control->count.fetch_add(1, std::memory_order_relaxed);
+    }
+
+    template <class T> void release(ControlBlock<T>* control) noexcept
+    {
+        if (control && control->count.fetch_sub(1, std::memory_order_acq_rel) == 1)
+            control->dispose();
+    }
+
+}
+
+/// A reference to a shared value that nobody changes. Null by default; null needs no control block.
+///
+/// The count is atomic: references to one value may be copied and dropped on any threads. One `Ptr` itself is not to be
+/// written by two threads at once.
+template <class T> class Ptr {
+public:
+    Ptr() noexcept = default;
+    Ptr(std::nullptr_t) noexcept { }
+    Ptr(Ptr const& other) noexcept
+        : value_(other.value_)
+        , control_(other.control_)
+    {
+        Internal::retain(control_);
+    }
+    Ptr(Ptr&& other) noexcept
+        : value_(std::exchange(other.value_, nullptr))
+        , control_(std::exchange(other.control_, nullptr))
+    {
+    }
+    Ptr(MutablePtr<T>&& other) noexcept;
+    Ptr& operator=(Ptr other) noexcept
+    {
+        std::swap(value_, other.value_);
+        std::swap(control_, other.control_);
+        return *this;
+    }
+    ~Ptr() { Internal::release(control_); }
+
+    T const* get() const noexcept { return value_; }
+    T const& operator*() const noexcept { return *value_; }
+    T const* operator->() const noexcept { return value_; }
+    explicit operator bool() const noexcept { return value_ != nullptr; }
+
+    /// How many references there are; 0 for null. Exact only while no other thread copies or drops one.
+    std::uint64_t useCount() const noexcept { return control_ ? control_->count.load(std::memory_order_acquire) : 0; }
+
+    friend bool operator==(Ptr const& a, Ptr const& b) noexcept { return a.value_ == b.value_; }
+
+private:
+    friend class MutablePtr<T>;
+    template <class U> friend MutablePtr<U> makeMutable(Ptr<U>&& shared);
+
+    T* value_ = nullptr;
+    Internal::ControlBlock<T>* control_ = nullptr;
+};
+
+/// The only reference to a value, which may therefore be changed. Converts to a `Ptr` by a move.
+template <class T> class MutablePtr {
+public:
+    MutablePtr() noexcept = default;
+    MutablePtr(std::nullptr_t) noexcept { }
+    MutablePtr(MutablePtr&& other) noexcept
+        : value_(std::exchange(other.value_, nullptr))
+        , control_(std::exchange(other.control_, nullptr))
+    {
+    }
+    MutablePtr& operator=(MutablePtr&& other) noexcept
+    {
+        MutablePtr taken(std::move(other));
+        std::swap(value_, taken.value_);
+        std::swap(control_, taken.control_);
+        return *this;
+    }
+    ~MutablePtr() { Internal::release(control_); }
+
+    /// A new value, constructed from the arguments.
+    template <class... Arguments> static MutablePtr make(Arguments&&... arguments)
+    {
+        auto* const control = new Internal::InlineControlBlock<T>(std::forward<Arguments>(arguments)...);
+        return MutablePtr(&control->value, control);
+    }
+
+    T* get() const noexcept { return value_; }
+    T& operator*() const noexcept { return *value_; }
+    T* operator->() const noexcept { return value_; }
+    explicit operator bool() const noexcept { return value_ != nullptr; }
+
+private:
+    friend class Ptr<T>;
+    template <class U> friend MutablePtr<U> makeMutable(Ptr<U>&& shared);
+
+    MutablePtr(T* value, Internal::ControlBlock<T>* control) noexcept
+        : value_(value)
+        , control_(control)
+    {
+    }
+
+    T* value_ = nullptr;
+    Internal::ControlBlock<T>* control_ = nullptr;
+};
+
+template <class T> Ptr<T>::Ptr(MutablePtr<T>&& other) noexcept
+    : value_(std::exchange(other.value_, nullptr))
+    , control_(std::exchange(other.control_, nullptr))
+{
+}
+
+/// Turns a shared value into one that may be changed, and empties `shared`: the value itself where this was the only
+/// reference, a deep copy where somebody else holds it too, null for null.
+/// \throws whatever copying throws; `shared` is then as it was.
+template <class T> MutablePtr<T> makeMutable(Ptr<T>&& shared)
+{
+    if (!shared.control_) {
+        shared.value_ = nullptr;
+        return {};
+    }
+    // Acquire: what the last other holder did before it let go happens before our edits.
+    if (shared.control_->count.load(std::memory_order_acquire) != 1) {
+        Ptr<T> copy = shared.control_->clone(*shared.value_);
+        shared = std::move(copy);
+    }
+    return MutablePtr<T>(std::exchange(shared.value_, nullptr), std::exchange(shared.control_, nullptr));
+}
+
+template <class T> Ptr<T> Internal::InlineControlBlock<T>::clone(T const& source) const
+{
+    return MutablePtr<T>::make(source);
+}
+
+/// A new shared value, constructed from the arguments.
+template <class T, class... Arguments> Ptr<T> makePtr(Arguments&&... arguments)
+{
+    return MutablePtr<T>::make(std::forward<Arguments>(arguments)...);
+}
+
+}

@@ -1,0 +1,97 @@
+#include <TessaraGeometry/Names.h>
+#include <TessaraGeometry/Prototypes.h>
+
+#include "GeoProps.h"
+
+#include <initializer_list>
+
+namespace Tessara::Geometry {
+
+namespace {
+
+    void exclude(std::initializer_list<Orvan::String> keys, Object& prototype)
+    {
+        prototype.setProperty(Object::kExcludedKeys, Orvan::makePtr<Orvan::Array<Orvan::String>>(keys));
+    }
+
+    Orvan::Ptr<Object> makeComponentPrototype()
+    {
+        Orvan::MutablePtr<Object> prototype = createObject();
+        prototype->setProperty(Internal::sElementCount, 0u);
+        exclude({sData, sIndices}, *prototype);
+        return prototype;
+    }
+
+    Orvan::Ptr<Object> makeRangePrototype()
+    {
+        Orvan::MutablePtr<Object> prototype = createObject();
+        prototype->setProperty(sIndices, PropertyValue());
+        prototype->setProperty(sTarget, Orvan::String());
+        exclude({sData, Internal::sElementCount}, *prototype);
+        return prototype;
+    }
+
+    Orvan::Ptr<Object> makeDataPrototype()
+    {
+        Orvan::MutablePtr<Object> prototype = createObject();
+        prototype->setProperty(sData, PropertyValue());
+        prototype->setProperty(sTarget, Orvan::String());
+        exclude({sIndices, Internal::sElementCount}, *prototype);
+        return prototype;
+    }
+
+    Orvan::Ptr<Object> makeGeometryPrototype(std::initializer_list<char const*> components,
+        std::initializer_list<char const*> data, std::initializer_list<Orvan::String> excluded)
+    {
+        Orvan::MutablePtr<Object> prototype = createObject();
+        for (char const* const name : components)
+            prototype->setProperty(name, getComponentGeoPropPrototype());
+        for (char const* const name : data)
+            prototype->setProperty(name, getDataGeoPropPrototype(sGenericDataGeoProp));
+        if (excluded.size() != 0)
+            exclude(excluded, *prototype);
+        return prototype;
+    }
+
+}
+
+Orvan::Ptr<Object> getMeshPrototype()
+{
+    static Orvan::Ptr<Object> const prototype =
+        makeGeometryPrototype({sPointComp, sFaceComp, sFaceVertexComp}, {sPointPosition, sFaceVertex, sFaceOffset}, {});
+    return prototype;
+}
+
+Orvan::Ptr<Object> getPointCloudPrototype()
+{
+    static Orvan::Ptr<Object> const prototype =
+        makeGeometryPrototype({sPointComp}, {sPointPosition}, {sFaceComp, sFaceVertexComp, sStrandComp});
+    return prototype;
+}
+
+Orvan::Ptr<Object> getStrandPrototype()
+{
+    static Orvan::Ptr<Object> const prototype =
+        makeGeometryPrototype({sPointComp, sStrandComp}, {sPointPosition, sStrandOffset}, {});
+    return prototype;
+}
+
+Orvan::Ptr<Object> getComponentGeoPropPrototype()
+{
+    static Orvan::Ptr<Object> const prototype = makeComponentPrototype();
+    return prototype;
+}
+
+Orvan::Ptr<Object> getRangeGeoPropPrototype()
+{
+    static Orvan::Ptr<Object> const prototype = makeRangePrototype();
+    return prototype;
+}
+
+Orvan::Ptr<Object> getDataGeoPropPrototype(Orvan::String const& name)
+{
+    static Orvan::Ptr<Object> const prototype = makeDataPrototype();
+    return name == sGenericDataGeoProp ? prototype : nullptr;
+}
+
+}

@@ -1,0 +1,61 @@
+#pragma once
+
+#include <OrvanCore/String.h>
+#include <TessaraGeometryVolume/Export.h>
+
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace TSR::Utils {
+
+/// Selects names (of channels, of properties) by a list of patterns, such as "* -weight* weightTotal".
+///
+/// Entries are separated by blanks (also tabs and line ends) or commas, any number of them. In an entry `*` stands for
+/// any number of characters, `?` for one character (of UTF-8), everything else for itself, and upper case is not lower
+/// case. A leading `^` or `-` makes the entry one that excludes. The last entry that matches a name decides about it; a
+/// name that no entry matches is not accepted. So the empty list accepts nothing, and neither does one that only
+/// excludes.
+///
+/// Any number of threads may call `accepts` at once.
+class TESSARAGEOMETRYVOLUME_EXPORT ChannelParser {
+public:
+    /// Whether a list was well formed, and otherwise the first fault in a sentence.
+    class Status {
+    public:
+        Status() = default;
+        explicit Status(Orvan::String fault)
+            : fault_(std::move(fault))
+        {
+        }
+
+        explicit operator bool() const noexcept { return fault_.empty(); }
+        /// Empty for a well-formed list. Belongs to the status: it outlives the parser.
+        Orvan::String const& message() const noexcept { return fault_; }
+
+    private:
+        Orvan::String fault_;
+    };
+
+    /// Accepts nothing until a list is parsed.
+    ChannelParser() = default;
+    ~ChannelParser() = default;
+
+    /// Replaces the list. Malformed is an entry that is a `^` or `-` without a pattern, or that has two of these signs
+    /// in front. Such an entry is left out, and the others stand: a slip in one entry must not turn the rest around.
+    /// \throws std::bad_alloc  the parser then keeps its old list
+    Status parses(Orvan::String const& list);
+
+    /// Whether the list selects the name. Takes no memory; at worst the name's length times that of the list.
+    bool accepts(Orvan::String const& name) const;
+
+private:
+    struct Entry {
+        std::string pattern;
+        bool excludes;
+    };
+
+    std::vector<Entry> entries_;
+};
+
+}

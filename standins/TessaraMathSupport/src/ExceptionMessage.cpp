@@ -1,0 +1,7 @@
+#include <TessaraMathSupport/ExceptionMessage.h>
+
+namespace TSR {
+
+Orvan::String const exceptionMessage = "job cancelled";
+
+}

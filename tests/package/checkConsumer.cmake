@@ -1,0 +1,8 @@
+# The installed tree, library and stand-ins together, serves a project that knows nothing but its prefix.
+
+include(${CMAKE_CURRENT_LIST_DIR}/consumer.cmake)
+
+set(folder ${BUILD_DIR}/package-test/together)
+file(REMOVE_RECURSE ${folder})
+run(${CMAKE_COMMAND} --install ${BUILD_DIR} --prefix ${folder}/prefix)
+run_consumer(${folder}/consumer ${folder}/prefix)

@@ -1,0 +1,16 @@
+# The library builds against a host that is installed elsewhere; the stand-ins, installed apart, play that part.
+
+include(${CMAKE_CURRENT_LIST_DIR}/consumer.cmake)
+
+set(folder ${BUILD_DIR}/package-test/apart)
+file(REMOVE_RECURSE ${folder})
+run(${CMAKE_COMMAND} --install ${BUILD_DIR} --component TessaraHost --prefix ${folder}/host)
+run(${CMAKE_COMMAND} -S ${SOURCE_DIR} -B ${folder}/build ${flags} -DMODELING_HOST=external
+    -DCMAKE_PREFIX_PATH=${folder}/host -DMODELING_SANITIZE=${SANITIZE} -DMODELING_WARNINGS_AS_ERRORS=ON
+    -DMODELING_BUILD_TESTS=OFF -DMODELING_BUILD_PROGRAM=OFF)
+run(${CMAKE_COMMAND} --build ${folder}/build)
+run(${CMAKE_COMMAND} --install ${folder}/build --prefix ${folder}/modeling)
+if(EXISTS ${folder}/modeling/include/OrvanCore)
+    message(FATAL_ERROR "an installation for an external host holds host headers")
+endif()
+run_consumer(${folder}/consumer ${folder}/modeling ${folder}/host)

@@ -1,0 +1,4 @@
+// Loads the library and does nothing with it.
+int main()
+{
+}

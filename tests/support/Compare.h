@@ -1,0 +1,16 @@
+#pragma once
+
+#include <TessaraObject/Object.h>
+
+#include <gtest/gtest.h>
+
+namespace TestSupport {
+
+/// Same keys in the same order with values of the same types and bits, also inside objects and arrays. Otherwise names
+/// the first difference: key, element and both values' places.
+testing::AssertionResult sameContents(Tessara::Object const& actual, Tessara::Object const& expected);
+
+/// A copy that shares nothing: what an object looked like, however it is changed later.
+Orvan::MutablePtr<Tessara::Object> deepCopy(Tessara::Object const& object);
+
+}

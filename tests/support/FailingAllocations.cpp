@@ -1,0 +1,126 @@
+#include "FailingAllocations.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <cstdlib>
+#include <limits>
+#include <new>
+
+namespace TestSupport {
+
+namespace {
+
+    constexpr std::int64_t kNever = std::numeric_limits<std::int64_t>::max();
+
+    std::atomic<std::int64_t> allocationsLeft = kNever; // before the one that fails
+    std::atomic<bool> failsOnce = false;
+    std::atomic<std::int64_t> liveBlocks = 0;
+
+    bool mustFail()
+    {
+        if (allocationsLeft.load(std::memory_order_relaxed) == kNever)
+            return false;
+        std::int64_t const left = allocationsLeft.fetch_sub(1);
+        return failsOnce ? left == 0 : left <= 0;
+    }
+
+    void* take(std::size_t bytes, std::size_t alignment)
+    {
+        if (mustFail())
+            throw std::bad_alloc();
+        std::size_t const whole = (std::max<std::size_t>(bytes, 1) + alignment - 1) / alignment * alignment;
+        void* const block =
+            alignment <= alignof(std::max_align_t) ? std::malloc(whole) : std::aligned_alloc(alignment, whole);
+        if (!block)
+            throw std::bad_alloc();
+        liveBlocks.fetch_add(1, std::memory_order_relaxed);
+        return block;
+    }
+
+    void giveBack(void* block) noexcept
+    {
+        if (block)
+            liveBlocks.fetch_sub(1, std::memory_order_relaxed);
+        std::free(block);
+    }
+
+    /// Whether an allocation failed in the action and, if so, ended it.
+    struct Outcome {
+        bool hasFailed = false;
+        bool isCompleted = false;
+    };
+
+    Outcome runWithFailure(std::function<void()> const& action, std::int64_t number, bool once)
+    {
+        Outcome outcome;
+        failsOnce = once;
+        allocationsLeft = number - 1;
+        try {
+            action();
+            outcome.isCompleted = true;
+        } catch (std::bad_alloc const&) {
+        } catch (...) {
+            allocationsLeft = kNever;
+            throw;
+        }
+        outcome.hasFailed = allocationsLeft.exchange(kNever) < 0;
+        return outcome;
+    }
+
+}
+
+void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
+{
+    for (bool const once : {true, false}) {
+        bool hasFailed = true;
+        for (std::int64_t number = 1; hasFailed && !testing::Test::HasFatalFailure(); ++number) {
+            SCOPED_TRACE("allocation " + std::to_string(number) + (once ? " fails" : " and all later ones fail"));
+            ASSERT_LT(number, 100'000) << "the action never succeeds";
+            std::int64_t const before = liveBlocks;
+            {
+                Attempt const attempt = [&](std::function<void()> const& action) {
+                    Outcome const outcome = runWithFailure(action, number, once);
+                    hasFailed = outcome.hasFailed;
+                    EXPECT_TRUE(outcome.isCompleted || outcome.hasFailed)
+                        << "std::bad_alloc without a failed allocation";
+                    return outcome.isCompleted;
+                };
+                trial(attempt);
+            }
+            EXPECT_EQ(liveBlocks, before) << "blocks leaked";
+        }
+    }
+}
+
+}
+
+void* operator new(std::size_t bytes)
+{
+    return TestSupport::take(bytes, alignof(std::max_align_t));
+}
+
+void* operator new(std::size_t bytes, std::align_val_t alignment)
+{
+    return TestSupport::take(bytes, static_cast<std::size_t>(alignment));
+}
+
+void operator delete(void* block) noexcept
+{
+    TestSupport::giveBack(block);
+}
+
+void operator delete(void* block, std::size_t) noexcept
+{
+    TestSupport::giveBack(block);
+}
+
+void operator delete(void* block, std::align_val_t) noexcept
+{
+    TestSupport::giveBack(block);
+}
+
+void operator delete(void* block, std::size_t, std::align_val_t) noexcept
+{
+    TestSupport::giveBack(block);
+}

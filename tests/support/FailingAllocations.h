@@ -1,0 +1,18 @@
+#pragma once
+
+#include <cstdint>
+#include <functional>
+
+namespace TestSupport {
+
+// Programs that link this take memory through replaced `operator new`, which can be told to fail.
+
+/// Runs an action; false where it ended in `std::bad_alloc`. Other exceptions pass through.
+using Attempt = std::function<bool(std::function<void()> const& action)>;
+
+/// Calls `trial` again and again. Inside the action that the trial hands to its attempt, the n-th allocation fails:
+/// once, and in a second trial all from then on; for n = 1, 2, 3 and so on, until the action succeeds. The trial makes
+/// its inputs and checks what the action left of them; afterwards, nothing it took may still be taken.
+void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial);
+
+}
