@@ -396,7 +396,6 @@ namespace {
 
     void collapseEdge(EdgeFans const& fans, CollapsingMesh& mesh)
     {
-        mesh.removedFaces.reserve(mesh.removedFaces.size() + 2);
         mesh.positions[fans.start] = midpointOf(mesh, fans);
         mesh.removedPoints.push_back(fans.end);
         for (auto around = fans.endFan.begin(); around != fans.endFan.end() - 1; ++around)

@@ -71,7 +71,8 @@ public:
 
     Array(Array&& other) noexcept { swap(other); }
 
-    /// Reuses the storage where it is large enough.
+    /// Reuses the storage where it is large enough and the elements are trivial; others are copied first, so that a
+    /// copy that fails changes nothing.
     Array& operator=(Array const& other)
     {
         if (this == &other)

@@ -43,7 +43,7 @@ public:
     /// Whether `object` conforms to `prototype`, which is decided by content. For every key of the prototype:
     /// - the reserved key `kExcludedKeys` lists the keys that `object` must not have;
     /// - an empty value asks for the key with any value, empty ones included;
-    /// - an object asks for an object that conforms to it in turn;
+    /// - an object asks for an object that conforms to it in turn, a null one for any object but null;
     /// - any other value asks for a value of the same type.
     static bool isA(Object const& object, Object const& prototype);
 

@@ -79,7 +79,9 @@ inline bool pointInTriangle(Math::float2 const& p, Math::float2 const& a, Math::
     double const areaA = sign * Internal::doubledArea(p, b, c);
     double const areaB = sign * Internal::doubledArea(p, c, a);
     double const areaC = sign * Internal::doubledArea(p, a, b);
-    bool const inside = hasInside && areaA >= 0.0 && areaB >= 0.0 && areaC >= 0.0 && p != a && p != b && p != c;
+    // The signs are as good as random to a branch predictor, so that the first three tests go without a branch.
+    bool const notOutside = (areaA >= 0.0) & (areaB >= 0.0) & (areaC >= 0.0);
+    bool const inside = notOutside && hasInside && p != a && p != b && p != c;
 
     u = hasInside ? static_cast<float>(areaA / whole) : 0.0f;
     v = hasInside ? static_cast<float>(areaB / whole) : 0.0f;

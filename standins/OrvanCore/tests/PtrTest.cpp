@@ -1,0 +1,128 @@
+#include "support/FailingAllocations.h"
+
+#include <OrvanCore/Array.h>
+#include <OrvanCore/Ptr.h>
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <memory>
+#include <thread>
+#include <utility>
+#include <vector>
+
+using Orvan::Array;
+using Orvan::makePtr;
+using Orvan::MutablePtr;
+using Orvan::Ptr;
+
+using Ints = Array<int>;
+
+TEST(Ptr, nullHasNoControlBlock)
+{
+    TestSupport::sweepFailingAllocations([](TestSupport::Attempt const& attempt) {
+        EXPECT_TRUE(attempt([] { // takes no memory at all, so nothing can fail
+            Ptr<Ints> null;
+            Ptr<Ints> const fromMutable = MutablePtr<Ints>(nullptr);
+            null = fromMutable;
+            EXPECT_FALSE(makeMutable(std::move(null)));
+            EXPECT_EQ(fromMutable.useCount(), 0u);
+            EXPECT_EQ(fromMutable, nullptr);
+        }));
+    });
+}
+
+TEST(Ptr, countsItsReferences)
+{
+    Ptr<Ints> first = makePtr<Ints>(3u);
+    EXPECT_EQ(first.useCount(), 1u);
+    {
+        Ptr<Ints> const second = first;
+        Ptr<Ints> third = second;
+        EXPECT_EQ(first.useCount(), 3u);
+        Ptr<Ints> const fourth = std::move(third);
+        EXPECT_FALSE(third);
+        EXPECT_EQ(third.useCount(), 0u);
+        EXPECT_EQ(first.useCount(), 3u);
+        EXPECT_EQ(fourth, first);
+    }
+    EXPECT_EQ(first.useCount(), 1u);
+    Ints const* const value = first.get();
+    first = static_cast<Ptr<Ints> const&>(first);
+    EXPECT_EQ(first.get(), value);
+    EXPECT_EQ(first.useCount(), 1u);
+
+    auto const watched = std::make_shared<int>(5);
+    Ptr<std::shared_ptr<int>> holder = makePtr<std::shared_ptr<int>>(watched);
+    Ptr<std::shared_ptr<int>> const other = holder;
+    holder = nullptr;
+    EXPECT_EQ(watched.use_count(), 2);
+    holder = MutablePtr<std::shared_ptr<int>>::make(watched);
+    EXPECT_EQ(watched.use_count(), 3);
+    makeMutable(std::move(holder)) = nullptr;
+    EXPECT_EQ(watched.use_count(), 2) << "a dropped value is destroyed";
+}
+
+TEST(MakeMutable, movesTheOnlyReferenceAndCopiesASharedOne)
+{
+    Ptr<Ints> shared = makePtr<Ints>(Ints{1, 2, 3});
+    Ints const* const value = shared.get();
+
+    MutablePtr<Ints> only = makeMutable(std::move(shared));
+    EXPECT_FALSE(shared);
+    EXPECT_EQ(only.get(), value);
+
+    (*only)[0] = 9;
+    shared = std::move(only);
+    EXPECT_FALSE(only);
+    Ptr<Ints> holder = shared;
+    MutablePtr<Ints> const copy = makeMutable(std::move(shared));
+    EXPECT_FALSE(shared);
+    EXPECT_NE(copy.get(), value);
+    (*copy)[1] = 8;
+    EXPECT_EQ(*copy, (Ints{9, 8, 3}));
+    EXPECT_EQ(*holder, (Ints{9, 2, 3}));
+    EXPECT_EQ(holder.useCount(), 1u);
+}
+
+TEST(MakeMutable, leavesTheReferenceWhenCopyingFails)
+{
+    TestSupport::sweepFailingAllocations([](TestSupport::Attempt const& attempt) {
+        Ptr<Ints> shared = makePtr<Ints>(4u);
+        Ptr<Ints> const holder = shared;
+        if (!attempt([&] { (void)makeMutable(std::move(shared)); })) {
+            EXPECT_EQ(shared, holder);
+            EXPECT_EQ(holder.useCount(), 2u);
+        }
+    });
+}
+
+// At most one thread gets the value itself, and it must see that all others are done reading before it writes.
+TEST(Ptr, isCopiedAndDroppedOnManyThreads)
+{
+    constexpr int kThreads = 3;
+    for (int round = 0; round < 300; ++round) {
+        Ptr<Ints> shared = makePtr<Ints>(Ints{1, 2, 3});
+        Ints const* const value = shared.get();
+        std::atomic<int> waiting = kThreads;
+        std::atomic<int> owners = 0;
+        std::vector<std::thread> threads;
+        for (int thread = 0; thread < kThreads; ++thread)
+            threads.emplace_back([&waiting, &owners, value, mine = shared]() mutable {
+                for (int i = 0; i < 10; ++i)
+                    EXPECT_EQ((*Ptr<Ints>(mine))[1], 2);
+                // All at once from here; relaxed, so that only the count itself orders what follows.
+                waiting.fetch_sub(1, std::memory_order_relaxed);
+                while (waiting.load(std::memory_order_relaxed) != 0)
+                    std::this_thread::yield();
+                MutablePtr<Ints> const edited = makeMutable(std::move(mine));
+                owners.fetch_add(edited.get() == value, std::memory_order_relaxed);
+                EXPECT_EQ(*edited, (Ints{1, 2, 3}));
+                (*edited)[1] = 7;
+            });
+        shared = nullptr;
+        for (std::thread& thread : threads)
+            thread.join();
+        EXPECT_LE(owners, 1);
+    }
+}

@@ -1,0 +1,284 @@
+#include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Populate.h>
+#include <TessaraGeometry/Prototypes.h>
+#include <TessaraGeometry/Validators.h>
+
+#include "support/Compare.h"
+#include "support/FailingAllocations.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <map>
+#include <string>
+#include <thread>
+#include <vector>
+
+using namespace Tessara::Geometry;
+using Tessara::Object;
+using Tessara::Math::float3;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using Indices = Orvan::Array<unsigned int>;
+using Names = Orvan::Array<Orvan::String>;
+
+namespace {
+
+Orvan::MutablePtr<Object> twoTriangles()
+{
+    return makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}}, {0, 1, 2, 0, 2, 3}, {0, 3, 6});
+}
+
+Orvan::MutablePtr<Object> twoStrands()
+{
+    return makeStrands({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}, {3, 0, 0}, {4, 0, 0}}, {0, 2, 5});
+}
+
+bool isA(Orvan::Ptr<Object> const& geoProperty, Orvan::Ptr<Object> const& prototype)
+{
+    return Object::isA(*geoProperty, *prototype);
+}
+
+/// Which of the three prototypes of geometry an object conforms to.
+std::string kindsOf(Object const& object)
+{
+    return std::string(Object::isA(object, *getMeshPrototype()) ? "mesh " : "")
+        + (Object::isA(object, *getPointCloudPrototype()) ? "cloud " : "")
+        + (Object::isA(object, *getStrandPrototype()) ? "strands " : "");
+}
+
+std::vector<std::string> textsOf(Names const& names)
+{
+    std::vector<std::string> texts;
+    for (Orvan::String const& name : names)
+        texts.emplace_back(name.view());
+    return texts;
+}
+
+}
+
+TEST(Prototypes, tellTheKindsOfGeoPropertyApart)
+{
+    Orvan::MutablePtr<Object> component = Tessara::createObject(), range = Tessara::createObject();
+    populateComponentGeoProperty(3, *component);
+    ASSERT_TRUE(populateRangeGeoProperty(Orvan::makePtr<Indices>(), "target", *range));
+    Orvan::MutablePtr<Object> bare = makeDataProperty<float>("target", nullptr);
+    bare->setProperty(sData, Tessara::PropertyValue()); // empty, but there
+    bare->eraseProperty(sDefault);
+    Orvan::Ptr<Object> const kinds[] = {std::move(component), std::move(range), std::move(bare)};
+    Orvan::Ptr<Object> const prototypes[] = {
+        getComponentGeoPropPrototype(), getRangeGeoPropPrototype(), getDataGeoPropPrototype(sGenericDataGeoProp)};
+    for (int kind = 0; kind != 3; ++kind)
+        for (int prototype = 0; prototype != 3; ++prototype)
+            EXPECT_EQ(isA(kinds[kind], prototypes[prototype]), kind == prototype) << kind << " and " << prototype;
+    EXPECT_FALSE(getDataGeoPropPrototype("no such name"));
+    forEachElementTypeName([&]<class T>(ElementType<T> type) {
+        EXPECT_TRUE(isA(makeDataProperty<T>("target", Orvan::makePtr<Orvan::Array<T>>(2u)), prototypes[2]))
+            << type.name;
+    });
+}
+
+TEST(Prototypes, tellTheKindsOfGeometryApart)
+{
+    auto const populated = [](void (*populate)(Object&)) {
+        auto object = Tessara::createObject();
+        object->setProperty("own", 1.5f);
+        populate(*object);
+        EXPECT_TRUE(object->getProperty("own").get<float>()) << "other keys are left alone";
+        return object;
+    };
+    auto const mesh = populated(populateMesh), cloud = populated(populatePointCloud),
+               strands = populated(populateStrand);
+    EXPECT_EQ(kindsOf(*mesh) + kindsOf(*cloud) + kindsOf(*strands), "mesh cloud strands ");
+    EXPECT_EQ(kindsOf(*Tessara::createObject()), "");
+    EXPECT_TRUE(validateMesh(*mesh));
+    EXPECT_TRUE(PointCloudValidator().validate(*cloud));
+    EXPECT_TRUE(StrandValidator().validate(*strands));
+    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceOffset), Indices{0});
+    EXPECT_EQ(kindsOf(*twoTriangles()) + kindsOf(*makePointCloud({})) + kindsOf(*twoStrands()), "mesh cloud strands ");
+}
+
+TEST(Elements, areCountedAndOnlyCounted)
+{
+    auto const mesh = twoTriangles();
+    Object const other = *mesh;
+    EXPECT_EQ(getElementCount(*mesh, sFaceVertexComp), 6u);
+    EXPECT_TRUE(setElementCount(sFaceVertexComp, 9, *mesh));
+    EXPECT_EQ(getElementCount(*mesh, sFaceVertexComp), 9u);
+    EXPECT_EQ(getElementCount(other, sFaceVertexComp), 6u);
+    EXPECT_EQ(dataOf<unsigned int>(*mesh, sFaceVertex)->size, 6u);
+    for (char const* const absent : {"absent", sPointPosition}) {
+        EXPECT_EQ(getElementCount(*mesh, absent), 0u);
+        EXPECT_FALSE(setElementCount(absent, 1, *mesh));
+    }
+}
+
+TEST(Elements, surviveEveryFailingAllocation)
+{
+    TestSupport::sweepFailingAllocations([](TestSupport::Attempt const& attempt) {
+        auto const mesh = twoTriangles();
+        addRangeProperty("range", sPointComp, {1, 2, 3}, *mesh);
+        Object const other = *mesh; // so that both have to clone
+        auto const before = TestSupport::deepCopy(*mesh);
+        if (!attempt([&] { setElementCount(sPointComp, 7, *mesh); })) {
+            EXPECT_TRUE(TestSupport::sameContents(*mesh, *before));
+        }
+        auto const mid = TestSupport::deepCopy(*mesh);
+        if (!attempt([&] { setRangeGeoPropIndices("range", Orvan::makePtr<Indices>(), *mesh); })) {
+            EXPECT_TRUE(TestSupport::sameContents(*mesh, *mid));
+        }
+        EXPECT_TRUE(TestSupport::sameContents(other, *before));
+    });
+}
+
+TEST(Lookup, findsGeoPropertiesByKindAndTarget)
+{
+    auto const mesh = twoTriangles();
+    addDataProperty<float>("weight", sPointComp, {1, 2, 3, 4}, *mesh);
+    addRangeProperty("range", sFaceComp, {0, 1}, *mesh);
+    addDataProperty<float>("material", "range", {1, 2}, *mesh);
+    addRangeProperty("far", "range", {0}, *mesh);
+    mesh->setProperty("text", Orvan::String(sPointComp));
+    mesh->setProperty("null", Orvan::Ptr<Object>());
+
+    auto const data = getDataGeoPropPrototype(sGenericDataGeoProp);
+    EXPECT_THAT(textsOf(getGeoPropNamesByPrototype(*mesh, *data)),
+        ElementsAre(sPointPosition, sFaceVertex, sFaceOffset, "weight", "material"));
+    EXPECT_EQ(getGeoPropsByPrototype(*mesh, *getRangeGeoPropPrototype()).size, 2u);
+    EXPECT_THAT(textsOf(getGeoPropNamesByTarget(*mesh, sPointComp)), ElementsAre(sPointPosition, "weight"));
+    EXPECT_THAT(textsOf(getGeoPropNamesByTarget(*mesh, "range")), ElementsAre("material", "far"));
+
+    EXPECT_EQ(getGeoPropTargetName(*mesh, "material"), "range");
+    EXPECT_EQ(getGeoPropTargetName(*mesh, "text"), "");
+    EXPECT_TRUE(getDataGeoProperty(*mesh, "weight") && getRangeGeoProperty(*mesh, "range"));
+    EXPECT_FALSE(getDataGeoProperty(*mesh, "range") || getRangeGeoProperty(*mesh, "weight")
+        || getDataGeoProperty(*mesh, "null"));
+    EXPECT_EQ(*getRangeGeoPropIndices(*mesh, "range"), (Indices{0, 1}));
+    EXPECT_FALSE(getRangeGeoPropIndices(*mesh, "weight"));
+    EXPECT_TRUE(setRangeGeoPropIndices("range", Orvan::makePtr<Indices>(Indices{1, 1}), *mesh));
+    EXPECT_EQ(*getRangeGeoPropIndices(*getRangeGeoProperty(*mesh, "range")), (Indices{1, 1}));
+    EXPECT_FALSE(setRangeGeoPropIndices("weight", Orvan::makePtr<Indices>(), *mesh));
+}
+
+TEST(Lookup, followsTargetsToTheirComponent)
+{
+    auto const mesh = twoTriangles();
+    addRangeProperty("range", sFaceComp, {0, 1}, *mesh);
+    addRangeProperty("far", "range", {0}, *mesh);
+    addDataProperty<float>("farthest", "far", {1}, *mesh);
+    addDataProperty<float>("astray", "nowhere", {1}, *mesh);
+    addRangeProperty("circleA", "circleB", {0}, *mesh);
+    addRangeProperty("circleB", "circleA", {0}, *mesh);
+    addDataProperty<float>("onCircle", "circleA", {1}, *mesh);
+    addDataProperty<float>("onData", sPointPosition, {1}, *mesh);
+    std::map<std::string, char const*> const expected{{sPointPosition, sPointComp}, {"range", sFaceComp},
+        {"farthest", sFaceComp}, {"astray", ""}, {"circleA", ""}, {"onCircle", ""}, {"onData", ""}, {sFaceComp, ""},
+        {"absent", ""}};
+    for (auto const& [name, component] : expected)
+        EXPECT_EQ(getTargetComponent(*mesh, name.c_str()), component) << name;
+}
+
+TEST(Validators, nameTheFirstFailure)
+{
+    using Break = std::function<void(Object&)>;
+    auto const data = [](auto values, char const* name, char const* target) -> Break {
+        return [=](Object& object) { addDataProperty(name, target, values, object); };
+    };
+    auto const erase = [](char const* key) -> Break { return [=](Object& object) { object.eraseProperty(key); }; };
+    auto const offsets = [&](Indices values) { return data(values, sFaceOffset, sFaceComp); };
+    std::vector<std::pair<Break, std::string>> const breaks{
+        {erase(sFaceVertexComp), "the component sFaceVertexComp is missing"},
+        {erase(sFaceOffset), "the data property sFaceOffset is missing"},
+        {[](Object& mesh) { mesh.setProperty(sFaceComp, Orvan::String("text")); },
+            "the component sFaceComp is missing"},
+        {data(Orvan::Array<int>(6), sFaceVertex, sFaceVertexComp),
+            "sFaceVertex does not hold an array of unsigned int"},
+        {data(Indices(6), sFaceVertex, sPointComp), "sFaceVertex targets \"sPointComp\" instead of sFaceVertexComp"},
+        {[](Object& mesh) {
+             auto property = makeDataProperty<float3>(sPointComp, Orvan::makePtr<Orvan::Array<float3>>(4u));
+             property->setProperty(sDefault, 1.0f);
+             mesh.setProperty(sPointPosition, Orvan::Ptr<Object>(std::move(property)));
+         },
+            "sPointPosition has no sDefault of type float3"},
+        {data(Orvan::Array<float3>(3), sPointPosition, sPointComp),
+            "sPointPosition has 3 entries instead of 4 for 4 elements of sPointComp"},
+        {offsets({0, 6}), "sFaceOffset has 2 entries instead of 3 for 2 elements of sFaceComp"},
+        {offsets({1, 3, 6}), "sFaceOffset[0] is 1 instead of 0"},
+        {offsets({0, 7, 6}), "sFaceOffset[2] is 6, less than the 7 before it"},
+        {offsets({0, 3, 5}), "sFaceOffset[2] is 5, but the mesh has 6 face corners"},
+        {data(Indices{0, 1, 2, 0, 4, 3}, sFaceVertex, sFaceVertexComp),
+            "sFaceVertex[4] is 4, but the mesh has 4 points"},
+    };
+    for (auto const& [damage, sentence] : breaks) {
+        GeoValidator::Status status;
+        {
+            auto const mesh = twoTriangles();
+            damage(*mesh);
+            status = validateMesh(*mesh);
+        }
+        EXPECT_FALSE(status) << sentence;
+        EXPECT_EQ(status.message(), sentence.c_str());
+    }
+    auto const cloud = makePointCloud({{0, 0, 0}});
+    addComponent("second", 1, *cloud);
+    EXPECT_EQ(PointCloudValidator().validate(*cloud).message(),
+        "a point cloud has one component, but there is also \"second\"");
+    auto const strands = twoStrands();
+    addDataProperty<unsigned int>(sStrandOffset, sStrandComp, {0, 2, 4}, *strands);
+    EXPECT_EQ(StrandValidator().validate(*strands).message(), "sStrandOffset[2] is 4, but the strand set has 5 points");
+}
+
+TEST(Validators, acceptWhatIsUnusualButWhole)
+{
+    float const nan = std::numeric_limits<float>::quiet_NaN();
+    auto const odd = twoTriangles();
+    addDataProperty<float>("too short", sPointComp, {1}, *odd);
+    EXPECT_TRUE(validateMesh(*twoTriangles()));
+    EXPECT_TRUE(validateMesh(*odd));
+    EXPECT_TRUE(validateMesh(*makeMesh({}, {}, {})));
+    EXPECT_TRUE(validateMesh(*makeMesh({{nan, 0, 0}, {1, 0, 0}}, {}, {0}))) << "points without faces, not finite";
+    EXPECT_TRUE(validateMesh(*makeMesh({{0, 0, 0}}, {0, 0}, {0, 0, 2}))) << "faces of no and of two corners";
+    EXPECT_TRUE(StrandValidator().validate(*twoStrands()));
+    EXPECT_TRUE(StrandValidator().validate(*makeStrands({{0, 0, 0}}, {0})));
+    EXPECT_TRUE(StrandValidator().validate(*makeStrands({{0, 0, 0}}, {1})));
+    EXPECT_FALSE(StrandValidator().validate(*makeStrands({{0, 0, 0}, {1, 0, 0}}, {1})));
+    EXPECT_TRUE(PointCloudValidator().validate(*makePointCloud({{nan, 0, 0}})));
+}
+
+TEST(Validators, reportOddProperties)
+{
+    auto const mesh = twoTriangles();
+    EXPECT_THAT(textsOf(reportProperties(*mesh)), IsEmpty());
+    addDataProperty<float>("weight", sPointComp, {1, 2}, *mesh);
+    addDataProperty<float>("astray", "nowhere", {1}, *mesh);
+    addRangeProperty("range", sFaceComp, {0, 2}, *mesh);
+    addDataProperty<Orvan::String>("label", "range", {"a", "b", "c"}, *mesh);
+    addDataProperty<float>("tint", "range", {1, 2}, *mesh);
+    addRangeProperty("fine", sFaceComp, {kInvalidIndex, 0}, *mesh);
+    addDataProperty<float>("fineData", "fine", {1}, *mesh);
+    EXPECT_THAT(textsOf(reportProperties(*mesh)),
+        ElementsAre("\"weight\" has 2 entries for 4 elements of sPointComp",
+            "\"astray\" targets \"nowhere\", which is not there", "\"range\"[1] is 2, but \"tint\" has 2 values"));
+}
+
+TEST(Geometry, isReadByManyThreadsAtOnce)
+{
+    auto const mesh = twoTriangles();
+    addRangeProperty("range", sFaceComp, {0, 1}, *mesh);
+    std::vector<std::thread> readers;
+    for (int reader = 0; reader != 4; ++reader)
+        readers.emplace_back([&object = *mesh] {
+            for (int round = 0; round != 200; ++round) {
+                EXPECT_TRUE(validateMesh(object));
+                EXPECT_EQ(getTargetComponent(object, "range"), sFaceComp);
+                EXPECT_EQ(getGeoPropNamesByTarget(object, sFaceComp).size, 2u);
+                EXPECT_EQ(reportProperties(object).size, 0u);
+            }
+        });
+    for (std::thread& reader : readers)
+        reader.join();
+}

@@ -1,0 +1,98 @@
+#include <TessaraGeometryVolume/Canceller.h>
+#include <TessaraGeometryVolume/ChannelParser.h>
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <string>
+#include <thread>
+#include <vector>
+
+using TSR::Utils::ChannelParser;
+
+namespace {
+
+// Which of the names the list accepts, joined by blanks.
+std::string accepted(char const* list, std::vector<char const*> const& names)
+{
+    ChannelParser parser;
+    parser.parses(list);
+    std::string result;
+    for (char const* const name : names)
+        if (parser.accepts(name))
+            result += (result.empty() ? "" : " ") + std::string(name);
+    return result;
+}
+
+}
+
+TEST(ChannelParser, selectsNames)
+{
+    std::vector<char const*> const names{"uv", "uv2", "UV", "weight", "weightTotal", "a-b", "gr\u00f6\u00dfe"};
+    struct Case {
+        char const* list;
+        char const* accepted;
+    };
+    for (Case const& expected : std::vector<Case>{
+             {"", ""}, {" ,\t\n, ", ""}, {"uv", "uv"}, {" uv,weight\tabsent\n", "uv weight"},
+             {"*", "uv uv2 UV weight weightTotal a-b gr\u00f6\u00dfe"}, {"uv*", "uv uv2"}, {"uv?", "uv2"},
+             {"??", "uv UV"}, {"gr??e", "gr\u00f6\u00dfe"}, {"*t*t*", "weightTotal"}, {"w**t", "weight"},
+             {"*-*", "a-b"}, {"-uv", ""}, {"* -uv*", "UV weight weightTotal a-b gr\u00f6\u00dfe"},
+             {"-uv* *", "uv uv2 UV weight weightTotal a-b gr\u00f6\u00dfe"}, // the last match decides
+             {"weight* ^weight* weightTotal", "weightTotal"}, {"[uv]* \\* u.", ""}, // only * and ? are special
+         })
+        EXPECT_EQ(accepted(expected.list, names), expected.accepted) << expected.list;
+    EXPECT_FALSE(ChannelParser().accepts("uv"));
+    EXPECT_FALSE(ChannelParser().accepts(""));
+}
+
+TEST(ChannelParser, reportsTheFirstFaultAndKeepsTheOtherEntries)
+{
+    struct Case {
+        char const* list;
+        char const* fault;
+        char const* accepted;
+    };
+    for (Case const& expected : std::vector<Case>{
+             {"uv -weight", "", "uv"},
+             {"* -", "\"-\" at character 3 of the list excludes nothing", "uv weight"},
+             {"^ weight", "\"^\" at character 1 of the list excludes nothing", "weight"},
+             {"uv,weight -^uv ^", "\"-^uv\" at character 11 of the list has two signs of exclusion", "uv weight"},
+         }) {
+        ChannelParser parser;
+        parser.parses("*");
+        ChannelParser::Status const status = parser.parses(expected.list);
+        EXPECT_EQ(static_cast<bool>(status), *expected.fault == '\0') << expected.list;
+        EXPECT_STREQ(status.message().c_str(), expected.fault);
+        EXPECT_EQ(accepted(expected.list, {"uv", "weight"}), expected.accepted);
+        EXPECT_FALSE(parser.accepts("absent") && *expected.list != '*') << "a new list replaces the old one";
+    }
+}
+
+TEST(ChannelParser, takesNoExponentialTime)
+{
+    ChannelParser parser;
+    parser.parses("*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*b");
+    auto const start = std::chrono::steady_clock::now();
+    EXPECT_FALSE(parser.accepts(std::string(5000, 'a').c_str()));
+    EXPECT_TRUE(parser.accepts((std::string(5000, 'a') + "b").c_str()));
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(5));
+}
+
+TEST(Canceller, countsCallsFromAllThreads)
+{
+    TSR::Canceller::resetCallCount();
+    std::vector<std::thread> threads;
+    for (int thread = 0; thread < 4; ++thread)
+        threads.emplace_back([] {
+            TSR::Canceller::ID place{4};
+            for (int i = 0; i < 1000; ++i)
+                TSR::Canceller::cancelID(place);
+            EXPECT_EQ(place.value, 4u);
+        });
+    for (std::thread& thread : threads)
+        thread.join();
+    EXPECT_EQ(TSR::Canceller::callCount(), 4000u);
+    TSR::Canceller::resetCallCount();
+    EXPECT_EQ(TSR::Canceller::callCount(), 0u);
+}

@@ -1,0 +1,155 @@
+#include <TessaraMathSupport/ExceptionMessage.h>
+#include <TessaraMathSupport/Loggers.h>
+#include <TessaraMathSupport/Stepper.h>
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <limits>
+#include <stdexcept>
+#include <string>
+#include <thread>
+#include <vector>
+
+using Tessara::Math::Stepper;
+
+namespace {
+
+constexpr float kInfinity = std::numeric_limits<float>::infinity();
+constexpr float kNotANumber = std::numeric_limits<float>::quiet_NaN();
+
+std::vector<float> incrementsOf(float amount, float limit)
+{
+    std::vector<float> increments;
+    for (Stepper stepper(amount, limit); stepper && increments.size() < 100; stepper.step(CoreGL::NOPLogger()))
+        increments.push_back(stepper.increment());
+    return increments;
+}
+
+}
+
+TEST(Stepper, cutsTheAmountAtTheLimit)
+{
+    struct Case {
+        float amount, limit;
+        std::vector<float> increments;
+    };
+    float const smallest = std::numeric_limits<float>::denorm_min();
+    for (auto const& [amount, limit, increments] : std::vector<Case>{
+             {0.5f, 0.9f, {0.5f}},
+             {0.9f, 0.9f, {0.9f}},
+             {1.0f, 0.9f, {0.9f, 1.0f - 0.9f}},
+             {1.75f, 0.5f, {0.5f, 0.5f, 0.5f, 0.25f}},
+             {smallest, 0.9f, {smallest}},
+             {3 * smallest, smallest, {smallest, smallest, smallest}},
+             // The remainders round: 2.7 - 0.9 is just above 1.8, and a sliver is left over in the end.
+             {2.7f, 0.9f, {0.9f, 0.9f, 0.9f, (2.7f - 0.9f) - 0.9f - 0.9f}},
+             {0.0f, 0.9f, {}},
+             {-0.0f, 0.9f, {}},
+             {-1.0f, 0.9f, {}},
+             {-kInfinity, 0.9f, {}},
+             {kNotANumber, 0.9f, {}},
+             {2.0f, 0.0f, {2.0f}},
+             {2.0f, -1.0f, {2.0f}},
+             {2.0f, kNotANumber, {2.0f}},
+             {2.0f, kInfinity, {2.0f}},
+             {kInfinity, kInfinity, {kInfinity}},
+             {kInfinity, 0.9f, {0.9f}}, // the subtraction changes nothing from the start
+             {1e9f, 0.9f, {0.9f}},
+             {16777218.0f, 0.5f, {0.5f}},
+         })
+        EXPECT_EQ(incrementsOf(amount, limit), increments) << amount << " by " << limit;
+}
+
+TEST(Stepper, endsWhereverTheSubtractionBeginsToRound)
+{
+    unsigned int most = 0;
+    for (float const ulps : {0.5f, 0.51f, 0.75f, 1.0f, 1.49f, 1.5f, 2.5f}) { // of amounts just below 2^24
+        unsigned int count = 0;
+        for (Stepper stepper(16777215.0f, ulps); stepper; stepper.step(CoreGL::NOPLogger()))
+            ++count;
+        most = std::max(most, count);
+    }
+    EXPECT_GT(most, 1u << 24);
+    EXPECT_LT(most, 1u << 25);
+}
+
+TEST(Stepper, keepsItsIncrementForAllThreadsDuringAStep)
+{
+    Stepper stepper(1.0f, 0.75f);
+    for (float const expected : {0.75f, 0.25f}) {
+        std::vector<std::thread> threads;
+        for (int thread = 0; thread < 4; ++thread)
+            threads.emplace_back([&] { EXPECT_EQ(stepper.increment(), expected); });
+        for (std::thread& thread : threads)
+            thread.join();
+        stepper.step(CoreGL::NOPLogger());
+    }
+    EXPECT_FALSE(stepper);
+    EXPECT_EQ(stepper.increment(), 0.0f);
+}
+
+namespace {
+
+template <class Logger> void stepThrough(Stepper stepper, Logger const& logger)
+{
+    while (stepper)
+        stepper.step(logger);
+    stepper.step(logger); // none is due: nothing to tell
+}
+
+}
+
+TEST(Loggers, writeALineAStep)
+{
+    std::vector<std::string> const expected{
+        "step 1: 0.5, 0.75 remain", "step 2: 0.5, 0.25 remain", "step 3: 0.25, 0 remain"};
+    std::vector<std::string> lines;
+    testing::internal::CaptureStdout();
+    CoreGL::OrvanLogger::setSink([&](char const* line) { lines.push_back(line); });
+    stepThrough(Stepper(1.25f, 0.5f), CoreGL::NOPLogger());
+    stepThrough(Stepper(1.25f, 0.5f), CoreGL::OrvanLogger());
+    EXPECT_EQ(testing::internal::GetCapturedStdout(), "");
+    EXPECT_EQ(lines, expected);
+
+    CoreGL::OrvanLogger::setSink(nullptr);
+    testing::internal::CaptureStdout();
+    stepThrough(Stepper(1.25f, 0.5f), CoreGL::OrvanLogger());
+    stepThrough(Stepper(1.25f, 0.5f), CoreGL::ConsoleLogger());
+    EXPECT_EQ(testing::internal::GetCapturedStdout(), expected[0] + "\n" + expected[1] + "\n" + expected[2] + "\n");
+    EXPECT_EQ(lines.size(), 3u);
+
+    CoreGL::OrvanLogger::setSink([&](char const* line) { lines.assign(1, line); });
+    float const longest = -std::numeric_limits<float>::min() * 1.0000001f;
+    CoreGL::OrvanLogger().logStep(std::numeric_limits<unsigned int>::max(), longest, longest);
+    EXPECT_EQ(lines[0], "step 4294967295: -1.1754945e-38, -1.1754945e-38 remain");
+    CoreGL::OrvanLogger::setSink(nullptr);
+}
+
+TEST(Loggers, letGoOfASinkThatThrows)
+{
+    CoreGL::OrvanLogger::setSink([](char const*) { throw std::runtime_error("full"); });
+    Stepper stepper(1.0f, 0.75f);
+    EXPECT_THROW(stepper.step(CoreGL::OrvanLogger()), std::runtime_error);
+    EXPECT_EQ(stepper.increment(), 0.25f) << "the step is ended all the same";
+    CoreGL::OrvanLogger::setSink(nullptr);
+}
+
+TEST(Loggers, shareTheSinkBetweenThreads)
+{
+    int lineCount = 0; // not atomic on purpose: sinks are called one call at a time
+    std::vector<std::thread> threads;
+    for (int thread = 0; thread < 3; ++thread)
+        threads.emplace_back([] { stepThrough(Stepper(100.0f, 0.5f), CoreGL::OrvanLogger()); });
+    for (int i = 0; i < 100; ++i)
+        CoreGL::OrvanLogger::setSink([&lineCount](char const*) { ++lineCount; });
+    for (std::thread& thread : threads)
+        thread.join();
+    CoreGL::OrvanLogger::setSink(nullptr);
+    EXPECT_LE(lineCount, 600);
+}
+
+TEST(ExceptionMessage, isTheTextOfCancelledJobs)
+{
+    EXPECT_STREQ(TSR::exceptionMessage.c_str(), "job cancelled");
+}

@@ -1,0 +1,136 @@
+#include <OrvanCore/Array.h>
+#include <OrvanCore/Ptr.h>
+#include <OrvanCore/String.h>
+#include <TessaraObject/Object.h>
+
+#include <gtest/gtest.h>
+
+#include <array>
+#include <memory>
+#include <optional>
+#include <type_traits>
+#include <utility>
+#include <vector>
+
+using Orvan::Array;
+using Orvan::Ptr;
+using Tessara::PropertyValue;
+
+namespace {
+
+enum class Mode : int { First, Second };
+
+struct Wide { // too large to lie inside of a value
+    std::array<double, 16> numbers{};
+    std::shared_ptr<int> watched;
+};
+
+struct alignas(64) Aligned {
+    int number;
+};
+
+struct ThrowingMove { // small, but a move may fail: must not lie inside either
+    explicit ThrowingMove(int n)
+        : number(n)
+    {
+    }
+    ThrowingMove(ThrowingMove const&) = default;
+    ThrowingMove(ThrowingMove&& other) noexcept(false)
+        : number(other.number)
+    {
+    }
+    int number;
+};
+
+template <class... Types> struct TypeList {
+};
+
+using StoredTypes = TypeList<signed char, char, unsigned char, short, unsigned short, int, unsigned int, long,
+    long long, unsigned long long, bool, float, double, Mode, Orvan::String, Wide, Aligned, Array<int>, Ptr<Array<int>>,
+    Ptr<Array<unsigned int>>, Ptr<Array<Array<int>>>, Ptr<Array<Orvan::String>>, Ptr<Tessara::Object>,
+    std::shared_ptr<int>>;
+
+template <class... Types> int matchCount(PropertyValue const& value, TypeList<Types...>)
+{
+    return (0 + ... + (value.get<Types>() != nullptr));
+}
+
+template <class... Types> void expectExactTypes(TypeList<Types...> all)
+{
+    auto const expectOnly = [&]<class T>(std::type_identity<T>) {
+        PropertyValue const value = T{};
+        EXPECT_NE(value.get<T>(), nullptr) << typeid(T).name();
+        EXPECT_EQ(matchCount(value, all), 1) << typeid(T).name();
+        EXPECT_EQ(value.type(), typeid(T));
+        EXPECT_EQ(reinterpret_cast<std::uintptr_t>(value.get<T>()) % alignof(T), 0u) << typeid(T).name();
+    };
+    (expectOnly(std::type_identity<Types>()), ...);
+}
+
+static_assert(!std::is_constructible_v<PropertyValue, char const*>, "a text literal is no value");
+static_assert(!std::is_constructible_v<PropertyValue, std::unique_ptr<int>>, "values are copyable");
+static_assert(std::is_nothrow_move_constructible_v<PropertyValue> && std::is_nothrow_move_assignable_v<PropertyValue>);
+
+}
+
+TEST(PropertyValue, tellsTypesApartExactly)
+{
+    expectExactTypes(StoredTypes());
+    PropertyValue const empty;
+    EXPECT_TRUE(empty.empty());
+    EXPECT_EQ(matchCount(empty, StoredTypes()), 0);
+    EXPECT_EQ(empty.type(), typeid(void));
+    EXPECT_FALSE(PropertyValue(Ptr<Array<int>>()).empty()) << "a null Ptr is a value";
+}
+
+TEST(PropertyValue, copiesReferencesNotArrays)
+{
+    Ptr<Array<int>> const array = Orvan::makePtr<Array<int>>(3u);
+    PropertyValue value = array;
+    PropertyValue const copy = value;
+    EXPECT_EQ(*copy.get<Ptr<Array<int>>>(), array);
+    EXPECT_EQ(array.useCount(), 3u);
+    PropertyValue const moved = std::move(value);
+    EXPECT_TRUE(value.empty());
+    EXPECT_EQ(array.useCount(), 3u);
+    value = 1;
+    value = copy;
+    value = *&value;
+    EXPECT_EQ(array.useCount(), 4u);
+    value = PropertyValue();
+    EXPECT_EQ(array.useCount(), 3u);
+}
+
+TEST(PropertyValue, ownsLargeAndFragileValues)
+{
+    auto const watched = std::make_shared<int>(0);
+    {
+        PropertyValue value = Wide{{1.5}, watched};
+        Wide const* const address = value.get<Wide>();
+        PropertyValue copy = value;
+        EXPECT_NE(copy.get<Wide>(), address);
+        EXPECT_EQ(copy.get<Wide>()->numbers[0], 1.5);
+        EXPECT_EQ(watched.use_count(), 3);
+        PropertyValue moved = std::move(value);
+        EXPECT_EQ(moved.get<Wide>(), address) << "moving a large value moves no bytes of it";
+        copy = 3;
+        EXPECT_EQ(watched.use_count(), 2);
+        moved = *moved.get<Wide>(); // from what it holds
+        EXPECT_EQ(moved.get<Wide>()->numbers[0], 1.5);
+    }
+    EXPECT_EQ(watched.use_count(), 1);
+    PropertyValue const fragile = PropertyValue(ThrowingMove(7));
+    EXPECT_EQ(fragile.get<ThrowingMove>()->number, 7);
+}
+
+TEST(PropertyValue, livesInContainers)
+{
+    std::vector<PropertyValue> values;
+    for (int i = 0; i < 100; ++i)
+        values.push_back(
+            i % 2 ? PropertyValue(i) : PropertyValue(Orvan::String("a text that takes memory of its own")));
+    std::optional<PropertyValue> const chosen = values[51];
+    values.erase(values.begin(), values.begin() + 50);
+    EXPECT_EQ(*values[1].get<int>(), 51);
+    EXPECT_EQ(*chosen->get<int>(), 51);
+}
