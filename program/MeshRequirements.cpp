@@ -1,0 +1,82 @@
+#include "MeshRequirements.h"
+
+#include "Report.h"
+
+#include <fmt/format.h>
+
+namespace ModelingProgram {
+
+namespace {
+
+    std::string describePoint(MeshArrays const& mesh, unsigned int point)
+    {
+        auto const& p = (*mesh.positions)[point];
+        return fmt::format("point {} at ({}, {}, {})", point, p.x, p.y, p.z);
+    }
+
+    /// The edge that starts at a corner.
+    std::string describeEdge(MeshArrays const& mesh, unsigned int corner)
+    {
+        return fmt::format("edge of face {} from {} to {}", mesh.faceOf(corner),
+            describePoint(mesh, (*mesh.faceVertex)[corner]),
+            describePoint(mesh, (*mesh.faceVertex)[mesh.nextCorner(corner)]));
+    }
+
+    std::string describeOpenEdges(MeshArrays const& mesh, MeshTopology const& topology)
+    {
+        std::uint64_t const count = topology.openEdges.count;
+        std::string sentence = fmt::format("{} of {} {} open: no other face is on the far side. The first is the {}.",
+            groupDigits(count), countOf(topology.edgeCount, "edge"), count == 1 ? "is" : "are",
+            describeEdge(mesh, topology.openEdges.first));
+        std::uint64_t const coincident = countCoincidentPoints(mesh);
+        return sentence
+            + (coincident == 0 ? std::string(" Fill the holes first.")
+                               : fmt::format(" {} in the same place as another point: merge equal points first, and "
+                                             "fill the holes that are left.",
+                                   coincident == 1 ? "1 point lies" : groupDigits(coincident) + " points lie"));
+    }
+
+}
+
+std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopology const& topology)
+{
+    std::vector<std::string> faults;
+    if (topology.openEdges)
+        faults.push_back(describeOpenEdges(mesh, topology));
+    if (Finding const& edges = topology.nonManifoldEdges)
+        faults.push_back(
+            fmt::format("More than two faces meet at {}. The first is the {}. Separate the sheets or solids "
+                        "that meet there.",
+                countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
+    if (Finding const& edges = topology.flippedEdges)
+        faults.push_back(fmt::format("At {} neighbouring faces look to opposite sides. The first is the {}. Turn faces "
+                                     "over until all look outwards.",
+            countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
+    if (Finding const& points = topology.pinchedPoints)
+        faults.push_back(fmt::format("The surface is pinched at {}: the faces there touch only in the point. The first "
+                                     "is {}. Give each sheet a point of its own.",
+            countOf(points.count, "point"), describePoint(mesh, points.first)));
+    return faults;
+}
+
+std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology const& topology)
+{
+    std::vector<std::string> faults;
+    if (topology.quads || topology.polygons) {
+        unsigned int const first = std::min(topology.quads.first, topology.polygons.first);
+        std::uint64_t const count = topology.quads.count + topology.polygons.count;
+        faults.push_back(fmt::format("{} more than three corners. The first is face {} with {}. Triangulate the mesh "
+                                     "first.",
+            countOf(count, "face has", "faces have"), first, groupDigits(mesh.corners(first).size())));
+    }
+    if (Finding const& faces = topology.facesBelowThreeCorners)
+        faults.push_back(fmt::format("{} fewer than three corners. The first is face {}. Remove such faces first.",
+            countOf(faces.count, "face has", "faces have"), faces.first));
+    // Polygons may do that, and need not once they are triangulated.
+    if (Finding const& faces = topology.facesWithRepeatedPoints; faces && !topology.quads && !topology.polygons)
+        faults.push_back(fmt::format("{} a point more than once. The first is face {}. Remove such faces first.",
+            countOf(faces.count, "face visits", "faces visit"), faces.first));
+    return faults;
+}
+
+}

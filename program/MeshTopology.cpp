@@ -1,0 +1,321 @@
+#include "MeshTopology.h"
+
+#include <TessaraGeometry/Makers.h>
+
+#include <tbb/blocked_range.h>
+#include <tbb/parallel_for.h>
+#include <tbb/parallel_sort.h>
+
+#include <algorithm>
+#include <array>
+#include <bit>
+#include <cmath>
+#include <limits>
+#include <numeric>
+#include <vector>
+
+namespace ModelingProgram {
+
+using Tessara::Geometry::kInvalidIndex;
+using Tessara::Math::float3;
+
+namespace {
+
+    /// Disjoint sets of indices; each starts as a set of its own.
+    class DisjointSets {
+    public:
+        explicit DisjointSets(unsigned int count)
+            : parents_(count)
+        {
+            std::iota(parents_.begin(), parents_.end(), 0u);
+        }
+
+        unsigned int find(unsigned int index)
+        {
+            while (parents_[index] != index)
+                index = parents_[index] = parents_[parents_[index]];
+            return index;
+        }
+
+        void join(unsigned int a, unsigned int b)
+        {
+            a = find(a);
+            b = find(b);
+            parents_[std::max(a, b)] = std::min(a, b);
+        }
+
+        /// Whether the index stands for its set: one of each set does.
+        bool isRoot(unsigned int index) const { return parents_[index] == index; }
+
+    private:
+        std::vector<unsigned int> parents_;
+    };
+
+    /// A side of an edge, listed at the lower of its two points.
+    struct Side {
+        unsigned int higherPoint;
+        unsigned int corner; // where it starts
+        unsigned int nextCorner; // where it ends
+        friend auto operator<=>(Side const&, Side const&) = default;
+    };
+
+    /// The sides at point p begin at `offsets[p]`, those of one edge next to one another.
+    struct EdgeSides {
+        std::vector<unsigned int> offsets;
+        std::vector<Side> sides;
+    };
+
+    /// The fans of faces around the points: sets of corners, each at one point.
+    using Fans = DisjointSets;
+
+    bool hasRepeatedPoint(std::span<unsigned int const> corners, std::vector<unsigned int>& scratch)
+    {
+        if (corners.size() == 3)
+            return corners[0] == corners[1] || corners[1] == corners[2] || corners[2] == corners[0];
+        scratch.assign(corners.begin(), corners.end());
+        std::sort(scratch.begin(), scratch.end());
+        return std::adjacent_find(scratch.begin(), scratch.end()) != scratch.end();
+    }
+
+    void countFaces(MeshArrays const& mesh, MeshTopology& topology)
+    {
+        std::vector<unsigned int> scratch;
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+            std::span<unsigned int const> const corners = mesh.corners(face);
+            if (corners.size() < 3)
+                topology.facesBelowThreeCorners.add(face);
+            else if (corners.size() == 3)
+                ++topology.triangleCount;
+            else
+                (corners.size() == 4 ? topology.quads : topology.polygons).add(face);
+            if (hasRepeatedPoint(corners, scratch))
+                topology.facesWithRepeatedPoints.add(face);
+        }
+    }
+
+    /// Calls `visit(corner, next corner)` for each side of each face that has sides.
+    template <class Visit> void forEachSide(MeshArrays const& mesh, Visit const& visit)
+    {
+        unsigned int const* const offset = mesh.faceOffset->data;
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+            if (offset[face + 1] - offset[face] < 3)
+                continue;
+            unsigned int const last = offset[face + 1] - 1;
+            for (unsigned int corner = offset[face]; corner != last; ++corner)
+                visit(corner, corner + 1);
+            visit(last, offset[face]);
+        }
+    }
+
+    EdgeSides listEdgeSides(MeshArrays const& mesh)
+    {
+        unsigned int const* const point = mesh.faceVertex->data;
+        EdgeSides edges;
+        edges.offsets.resize(std::size_t{mesh.pointCount()} + 1);
+        forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
+            if (point[corner] != point[next])
+                ++edges.offsets[std::min(point[corner], point[next])];
+        });
+        std::inclusive_scan(edges.offsets.begin(), edges.offsets.end(), edges.offsets.begin());
+        edges.sides.resize(edges.offsets.back());
+        // Filling from the ends leaves the beginnings behind.
+        forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
+            auto const [lower, higher] = std::minmax(point[corner], point[next]);
+            if (lower != higher)
+                edges.sides[--edges.offsets[lower]] = {higher, corner, next};
+        });
+
+        // Each point sorts its own sides.
+        tbb::parallel_for(tbb::blocked_range<std::size_t>(0, mesh.pointCount(), 1000), [&](auto const& points) {
+            Side* const sides = edges.sides.data();
+            for (std::size_t p = points.begin(); p != points.end(); ++p)
+                std::sort(sides + edges.offsets[p], sides + edges.offsets[p + 1]);
+        });
+        return edges;
+    }
+
+    /// What is around one edge: `lower` is its lower point, `sides` are in ascending order.
+    void examineEdge(MeshArrays const& mesh, unsigned int lower, std::span<Side const> sides, MeshTopology& topology)
+    {
+        ++topology.edgeCount;
+        if (sides.size() == 1)
+            topology.openEdges.add(sides[0].corner);
+        if (sides.size() > 2)
+            topology.nonManifoldEdges.add(sides[0].corner);
+
+        std::array<Finding, 2> directions; // away from the lower point, and towards it
+        for (Side const& side : sides)
+            directions[(*mesh.faceVertex)[side.corner] == lower ? 0 : 1].add(side.corner);
+        for (Finding const& direction : directions) {
+            if (direction.count > 1)
+                topology.windingConflicts.add(direction.first);
+            if (direction.count == 2 && sides.size() == 2)
+                topology.flippedEdges.add(direction.first);
+        }
+    }
+
+    void joinFans(MeshArrays const& mesh, unsigned int lower, std::span<Side const> sides, Fans& fans)
+    {
+        unsigned int firstAtLower = kInvalidIndex;
+        unsigned int firstAtHigher = kInvalidIndex;
+        for (Side const& side : sides) {
+            unsigned int atLower = side.corner;
+            unsigned int atHigher = side.nextCorner;
+            if ((*mesh.faceVertex)[atLower] != lower)
+                std::swap(atLower, atHigher);
+            if (firstAtLower == kInvalidIndex) {
+                firstAtLower = atLower;
+                firstAtHigher = atHigher;
+            }
+            fans.join(firstAtLower, atLower);
+            fans.join(firstAtHigher, atHigher);
+        }
+    }
+
+    void examineEdges(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
+    {
+        EdgeSides const edges = listEdgeSides(mesh);
+        for (unsigned int point = 0; point != mesh.pointCount(); ++point) {
+            Side const* const end = edges.sides.data() + edges.offsets[point + 1];
+            for (Side const* first = edges.sides.data() + edges.offsets[point]; first != end;) {
+                unsigned int const higherPoint = first->higherPoint;
+                Side const* const last =
+                    std::find_if(first, end, [=](Side const& side) { return side.higherPoint != higherPoint; });
+                examineEdge(mesh, point, {first, last}, topology);
+                joinFans(mesh, point, {first, last}, fans);
+                first = last;
+            }
+        }
+    }
+
+    void countPinchedPoints(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
+    {
+        unsigned int const* const point = mesh.faceVertex->data;
+        std::vector<bool> hasFan(mesh.pointCount());
+        std::vector<bool> isPinched(mesh.pointCount());
+        forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
+            if (point[corner] == point[next]) // a point that follows itself is one place on the face
+                fans.join(corner, next);
+        });
+        forEachSide(mesh, [&](unsigned int corner, unsigned int) {
+            if (!fans.isRoot(corner))
+                return;
+            if (hasFan[point[corner]])
+                isPinched[point[corner]] = true;
+            hasFan[point[corner]] = true;
+        });
+        for (unsigned int p = 0; p != mesh.pointCount(); ++p)
+            if (isPinched[p])
+                topology.pinchedPoints.add(p);
+    }
+
+    void countParts(MeshArrays const& mesh, MeshTopology& topology)
+    {
+        DisjointSets parts(mesh.pointCount());
+        std::vector<bool> isUsed(mesh.pointCount());
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+            for (unsigned int const point : mesh.corners(face)) {
+                parts.join(mesh.corners(face)[0], point);
+                isUsed[point] = true;
+            }
+        }
+        for (unsigned int point = 0; point != mesh.pointCount(); ++point) {
+            if (!isUsed[point])
+                topology.isolatedPoints.add(point);
+            else if (parts.isRoot(point))
+                ++topology.partCount;
+        }
+    }
+
+    float distance(float3 const& a, float3 const& b)
+    {
+        float3 const d{b.x - a.x, b.y - a.y, b.z - a.z};
+        return std::sqrt((d.x * d.x + d.y * d.y) + d.z * d.z);
+    }
+
+    bool isSliver(std::span<unsigned int const> corners, float3 const* position, float ratio)
+    {
+        float shortest = std::numeric_limits<float>::max();
+        float longest = 0;
+        for (std::size_t k = 0; k != corners.size(); ++k) {
+            float const edge = distance(position[corners[k]], position[corners[k + 1 == corners.size() ? 0 : k + 1]]);
+            shortest = std::min(shortest, edge);
+            longest = std::max(longest, edge);
+        }
+        return longest * ratio > shortest;
+    }
+
+}
+
+std::span<unsigned int const> MeshArrays::corners(unsigned int face) const
+{
+    unsigned int const first = (*faceOffset)[face];
+    return {faceVertex->data + first, (*faceOffset)[face + 1] - first};
+}
+
+unsigned int MeshArrays::faceOf(unsigned int corner) const
+{
+    // Faces without corners end where they begin; the last face that begins at or before the corner holds it.
+    unsigned int const* const after = std::upper_bound(faceOffset->begin(), faceOffset->end(), corner);
+    return static_cast<unsigned int>(after - faceOffset->begin() - 1);
+}
+
+unsigned int MeshArrays::nextCorner(unsigned int corner) const
+{
+    unsigned int const face = faceOf(corner);
+    return corner + 1 == (*faceOffset)[face + 1] ? (*faceOffset)[face] : corner + 1;
+}
+
+MeshArrays arraysOf(Tessara::Object const& mesh)
+{
+    using namespace Tessara::Geometry;
+    return {dataOf<float3>(mesh, sPointPosition), dataOf<unsigned int>(mesh, sFaceVertex),
+        dataOf<unsigned int>(mesh, sFaceOffset)};
+}
+
+bool MeshTopology::isClosedManifold() const
+{
+    return !facesBelowThreeCorners && !openEdges && !nonManifoldEdges && !windingConflicts && !pinchedPoints;
+}
+
+MeshTopology analyseTopology(MeshArrays const& mesh)
+{
+    MeshTopology topology;
+    countFaces(mesh, topology);
+    {
+        Fans fans(mesh.cornerCount());
+        examineEdges(mesh, fans, topology);
+        countPinchedPoints(mesh, fans, topology);
+    }
+    countParts(mesh, topology);
+    if (topology.isClosedManifold()) {
+        auto const points = static_cast<std::int64_t>(mesh.pointCount() - topology.isolatedPoints.count);
+        auto const edges = static_cast<std::int64_t>(topology.edgeCount);
+        std::int64_t const eulerCharacteristic = points - edges + std::int64_t{mesh.faceCount()};
+        topology.genus = static_cast<std::int64_t>(topology.partCount) - eulerCharacteristic / 2;
+    }
+    return topology;
+}
+
+std::uint64_t countSlivers(MeshArrays const& mesh, float ratio)
+{
+    std::uint64_t count = 0;
+    for (unsigned int face = 0; face != mesh.faceCount(); ++face)
+        if (isSliver(mesh.corners(face), mesh.positions->data, ratio))
+            ++count;
+    return count;
+}
+
+std::uint64_t countCoincidentPoints(MeshArrays const& mesh)
+{
+    // Compared by bits: any positions have an order then. Adding 0 makes both zeros the same.
+    std::vector<std::array<std::uint32_t, 3>> keys;
+    keys.reserve(mesh.pointCount());
+    for (float3 const& p : *mesh.positions)
+        keys.push_back({std::bit_cast<std::uint32_t>(p.x + 0.0f), std::bit_cast<std::uint32_t>(p.y + 0.0f),
+            std::bit_cast<std::uint32_t>(p.z + 0.0f)});
+    tbb::parallel_sort(keys.begin(), keys.end());
+    return static_cast<std::uint64_t>(keys.end() - std::unique(keys.begin(), keys.end()));
+}
+
+}

@@ -1,0 +1,124 @@
+#include "Operation.h"
+
+#include "Cancellation.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "files/GeometryFile.h"
+
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+
+#include <chrono>
+
+#include <sys/resource.h>
+
+namespace ModelingProgram {
+
+namespace fs = std::filesystem;
+
+namespace {
+
+    std::uint64_t peakMemory()
+    {
+        rusage usage{};
+        ::getrusage(RUSAGE_SELF, &usage);
+        return static_cast<std::uint64_t>(usage.ru_maxrss) * 1024;
+    }
+
+}
+
+void requireWritable(fs::path const& file)
+{
+    if (!isWritableFormat(file))
+        throw Failure(ExitCode::File,
+            fmt::format("cannot write {}: the name has to end in .obj, .ply, .stl or .vtp", file.string()));
+    std::error_code ignored;
+    if (fs::is_directory(file, ignored))
+        throw Failure(ExitCode::File, fmt::format("cannot write {}: it is a folder", file.string()));
+    fs::path const folder = file.has_parent_path() ? file.parent_path() : fs::path(".");
+    if (!fs::is_directory(folder, ignored))
+        throw Failure(
+            ExitCode::File, fmt::format("cannot write {}: there is no folder {}", file.string(), folder.string()));
+}
+
+Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& report)
+{
+    GeometryFile geometry = readGeometryFile(file);
+    stopIfCancelled();
+    for (std::string const& note : geometry.notes)
+        report.warn(note);
+    requireValid(*geometry.object, file);
+    report.document["inputs"].push_back(
+        {{"file", file.string()}, {"format", geometry.format}, {"kind", nameOf(typeOf(*geometry.object))}});
+    return std::move(geometry.object);
+}
+
+void requireValid(Tessara::Object const& object, fs::path const& file)
+{
+    auto const status = validate(object);
+    if (!status)
+        throw Failure(ExitCode::Invalid,
+            fmt::format("{} holds no valid {}: {}", file.string(), nameOf(typeOf(object)), status.message().view()));
+}
+
+void runOperation(Report& report, std::function<void()> const& operation)
+{
+    auto const start = std::chrono::steady_clock::now();
+    try {
+        operation();
+    } catch (std::bad_alloc const&) {
+        throw;
+    } catch (std::exception const&) {
+        stopIfCancelled(); // that is how a cancelled operation ends
+        throw;
+    }
+    stopIfCancelled();
+    std::chrono::duration<double> const time = std::chrono::steady_clock::now() - start;
+    report.document["seconds"] = time.count();
+}
+
+void saveGeometry(Tessara::Object const& object, fs::path const& file, Report& report)
+{
+    auto const status = validate(object);
+    if (!status)
+        throw Failure(ExitCode::Unexpected,
+            fmt::format("the result is not valid, so nothing was written: {}", status.message().view()));
+    stopIfCancelled();
+    for (std::string const& note : writeGeometryFile(object, file))
+        report.warn(note);
+    report.document["output"] = file.string();
+}
+
+Json countsOf(Tessara::Object const& object)
+{
+    using namespace Tessara::Geometry;
+    Json counts;
+    for (auto const& [key, component] :
+        {std::pair{"points", sPointComp}, {"corners", sFaceVertexComp}, {"faces", sFaceComp}, {"strands", sStrandComp}})
+        if (object.hasProperty(component))
+            counts[key] = getElementCount(object, component);
+    return counts;
+}
+
+void reportOperation(
+    Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report)
+{
+    Json& document = report.document;
+    document["before"] = before;
+    document["after"] = after;
+    document["droppedProperties"] = droppedProperties;
+    document["peakMemoryBytes"] = peakMemory();
+
+    report.text += formatValues({{"before", before}, {"after", after}});
+    std::string dropped = fmt::format("{}", fmt::join(droppedProperties, ", "));
+    report.text += "\n"
+        + formatTable({{}, {}},
+            {{"dropped properties", dropped.empty() ? "none" : std::move(dropped)},
+                {"time", formatSeconds(document["seconds"].get<double>())},
+                {"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())},
+                {"written", document["output"].get<std::string>()}});
+}
+
+}

@@ -1,0 +1,47 @@
+#pragma once
+
+#include "Report.h"
+
+#include <TessaraObject/Object.h>
+
+#include <filesystem>
+#include <functional>
+#include <vector>
+
+namespace ModelingProgram {
+
+// The frame of a command that makes a file from files:
+//
+//     requireWritable(out);
+//     Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(in, report);
+//     refuse what the operation cannot take
+//     runOperation(report, [&] { Geometry::Mesh::...(*mesh); });
+//     saveGeometry(*mesh, out, report);
+//     reportOperation(before, after, report);
+//
+// Each step ends the command with a `Failure` or `FileError` where it cannot do its work, and where the user has
+// cancelled the job. Before `saveGeometry` nothing is written; that replaces a file only by a complete one.
+
+/// Looks at the name before time is spent: the format, and the folder the file is to go to.
+void requireWritable(std::filesystem::path const& file);
+
+/// Reads a file, and has the host's validator look at it.
+Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);
+
+/// Refuses an object that the validator finds fault with. `file` is where it comes from.
+void requireValid(Tessara::Object const& object, std::filesystem::path const& file);
+
+/// Runs and times an operation of the library.
+void runOperation(Report& report, std::function<void()> const& operation);
+
+/// Validates the result and writes it.
+void saveGeometry(Tessara::Object const& object, std::filesystem::path const& file, Report& report);
+
+/// The numbers of elements: points, corners, faces, strands.
+Json countsOf(Tessara::Object const& object);
+
+/// Ends the report with a table of the numbers before and after, dropped properties, time and peak memory.
+void reportOperation(
+    Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report);
+
+}

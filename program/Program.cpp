@@ -1,0 +1,167 @@
+#include "Program.h"
+
+#include "Cancellation.h"
+#include "Commands.h"
+#include "Failure.h"
+#include "files/GeometryFile.h"
+
+#include <fmt/format.h>
+#include <tbb/global_control.h>
+
+#include <charconv>
+#include <cstdio>
+#include <new>
+#include <optional>
+
+namespace ModelingProgram {
+
+namespace {
+
+    constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addRemoveSlivers};
+
+    constexpr char kFooter[] =
+        R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply .stl .vtp. OUT may
+be IN: a file is replaced only by a complete one, and is left as it was when anything fails. Results go to standard
+output, messages to standard error.
+
+Exit codes:
+  0  done
+  1  unexpected failure: a fault of the program
+  2  the command line is wrong
+  3  a file cannot be read or written
+  4  a file holds geometry that is not valid
+  5  the operation refuses its input; the message says why
+  6  cancelled by Ctrl-C or SIGTERM; nothing was written
+  7  out of memory
+
+"modeling COMMAND --help" tells about a command.)";
+
+    constexpr char kOutOfMemory[] = "there is not enough memory for this";
+
+    bool writeToStandardOutput(std::string const& text)
+    {
+        return std::fwrite(text.data(), 1, text.size(), stdout) == text.size() && std::fflush(stdout) == 0;
+    }
+
+    /// For use where an exception is being handled.
+    Failure currentFailure()
+    {
+        try {
+            throw;
+        } catch (Failure const& failure) {
+            return failure;
+        } catch (FileError const& error) {
+            return {ExitCode::File, error.what()};
+        } catch (std::bad_alloc const&) {
+            return {ExitCode::OutOfMemory, kOutOfMemory};
+        } catch (std::exception const& error) {
+            return {ExitCode::Unexpected, fmt::format("unexpected failure: {}", error.what())};
+        }
+    }
+
+    int reportFailure(Failure const& failure, bool asJson, Report& report)
+    {
+        std::string message = fmt::format("modeling: {}\n", failure.what());
+        for (std::string const& reason : failure.reasons)
+            message += fmt::format("  - {}\n", reason);
+        std::fputs(message.c_str(), stderr);
+        if (asJson) {
+            report.document["exitCode"] = static_cast<int>(failure.code);
+            report.document["error"] = {{"message", failure.what()}, {"reasons", failure.reasons}};
+            writeToStandardOutput(toText(report.document) + "\n"); // where that fails there is a failure already
+        }
+        return static_cast<int>(failure.code);
+    }
+
+    int runCommand(Invocation const& invocation)
+    {
+        CancelOnSignal const cancelOnSignal;
+        std::optional<tbb::global_control> threadLimit;
+        if (invocation.threads != 0)
+            threadLimit.emplace(tbb::global_control::max_allowed_parallelism, invocation.threads);
+        Report report(invocation.command);
+        try {
+            invocation.run(report);
+            report.document["exitCode"] = 0;
+            if (!writeToStandardOutput(invocation.asJson ? toText(report.document) + "\n" : report.text))
+                throw Failure(ExitCode::File, "cannot write to standard output");
+            return 0;
+        } catch (...) {
+            return reportFailure(currentFailure(), invocation.asJson, report);
+        }
+    }
+
+    int parseAndRun(int argumentCount, char const* const* arguments)
+    {
+        Invocation invocation;
+        CLI::App program("Geometry algorithms for meshes, point clouds and strands, run on files.", "modeling");
+        program.set_version_flag("--version", "modeling " MODELING_VERSION, "Print the version and exit");
+        program.set_help_flag("-h,--help", "Print this help and exit");
+        program.footer(kFooter);
+        program.require_subcommand(1);
+        for (auto const add : kCommands)
+            add(program, invocation);
+        try {
+            program.parse(argumentCount, arguments);
+        } catch (CLI::RequiredError const& error) {
+            bool const isUnknown = program.get_subcommands().empty() && !program.remaining().empty();
+            std::string const message = isUnknown ? "There is no command " + program.remaining()[0] : error.what();
+            std::fprintf(stderr, "%s\nRun with --help for more information.\n", message.c_str());
+            return static_cast<int>(ExitCode::CommandLine);
+        } catch (CLI::ParseError const& error) {
+            return program.exit(error) == 0 ? 0 : static_cast<int>(ExitCode::CommandLine);
+        }
+        return runCommand(invocation);
+    }
+
+}
+
+CLI::App& addCommand(CommandHelp const& help, CLI::App& program, Invocation& invocation)
+{
+    CLI::App& command = *program.add_subcommand(help.name, help.summary);
+    command.set_help_flag("-h,--help", "Print this help and exit");
+    command.footer(fmt::format("{}\n\nExamples:\n{}", help.details, help.examples));
+    command.add_flag("--json", invocation.asJson, "Print one JSON document in place of text, also on failure");
+    command.add_option("--threads", invocation.threads, "Use at most N threads")
+        ->type_name("N")
+        ->check(CLI::Range(1, 1024).description(""));
+    return command;
+}
+
+void addFile(char const* name, char const* description, std::filesystem::path& file, CLI::App& command)
+{
+    command.add_option(name, file, description)->required()->option_text(" ");
+}
+
+void onSelected(CLI::App& command, Invocation& invocation, std::function<void(Report&)> run)
+{
+    command.callback([&invocation, name = command.get_name(), chosen = std::move(run)] {
+        invocation.command = name;
+        invocation.run = chosen;
+    });
+}
+
+CLI::Validator isFraction()
+{
+    return CLI::Validator(
+        [](std::string const& text) {
+            double value = -1;
+            auto const [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+            bool const isNumber = error == std::errc() && end == text.data() + text.size();
+            return isNumber && value >= 0 && value <= 1 ? std::string() : text + " is not a number from 0 to 1";
+        },
+        "0..1");
+}
+
+int runProgram(int argumentCount, char const* const* arguments)
+{
+    try {
+        return parseAndRun(argumentCount, arguments);
+    } catch (std::bad_alloc const&) {
+        // Not even the message could be made.
+        std::fprintf(stderr, "modeling: %s\n", kOutOfMemory);
+        return static_cast<int>(ExitCode::OutOfMemory);
+    }
+}
+
+}

@@ -1,0 +1,53 @@
+#pragma once
+
+#include <nlohmann/json.hpp>
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace ModelingProgram {
+
+using Json = nlohmann::ordered_json;
+
+/// What a command has to tell: results go to standard output at its end, as a text or as one JSON document; warnings go
+/// to standard error at once, and into the document too.
+class Report {
+public:
+    explicit Report(std::string const& command);
+
+    void warn(std::string const& sentence);
+
+    Json document; // what --json prints
+    std::string text; // what is printed otherwise
+};
+
+/// The document as it is printed. Bytes that are no UTF-8 (names in files may hold any) become replacement characters.
+std::string toText(Json const& document);
+
+/// 1234567 as "1,234,567".
+std::string groupDigits(std::uint64_t number);
+/// "1 edge", "1,234 edges".
+std::string countOf(std::uint64_t number, std::string_view singular, std::string_view plural = {});
+/// "1.25 ms", "3.1 s".
+std::string formatSeconds(double seconds);
+/// "8.1 MB".
+std::string formatBytes(std::uint64_t bytes);
+
+struct Column {
+    std::string title;
+    bool isNumber = false; // then it is aligned to the right
+};
+
+/// Cells in aligned columns; without a line of titles where all are empty.
+std::string formatTable(std::vector<Column> const& columns, std::vector<std::vector<std::string>> const& rows);
+
+/// Objects with the same keys side by side, a row a key: "openEdges" is shown as "open edges", null as "-".
+struct Values {
+    std::string title;
+    Json values;
+};
+std::string formatValues(std::vector<Values> const& columns);
+
+}

@@ -1,0 +1,99 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "MeshRequirements.h"
+#include "MeshTopology.h"
+#include "Operation.h"
+
+#include <Modeling/removeSlivers.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+
+#include <memory>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using Tessara::Object;
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path out;
+        float ratio = 0.05f;
+    };
+
+    void requireClosedTriangleMesh(Object const& object, MeshTopology const& topology, Options const& options)
+    {
+        MeshArrays const mesh = arraysOf(object);
+        std::vector<std::string> reasons = faultsOfTriangles(mesh, topology);
+        for (std::string& reason : faultsOfClosedManifold(mesh, topology))
+            reasons.push_back(std::move(reason));
+        if (!reasons.empty())
+            throw Failure(ExitCode::Refused,
+                fmt::format("remove-slivers needs a closed manifold mesh of triangles, which {} does not hold "
+                            "(points and faces are counted from 0):",
+                    options.in.string()),
+                std::move(reasons));
+    }
+
+    Json describeMesh(Object const& object, MeshTopology const& topology, float ratio)
+    {
+        Json values = countsOf(object);
+        values["parts"] = topology.partCount;
+        values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
+        values["slivers"] = countSlivers(arraysOf(object), ratio);
+        return values;
+    }
+
+    void removeSlivers(Options const& options, Report& report)
+    {
+        requireWritable(options.out);
+        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
+        if (typeOf(*mesh) != GeometryType::Mesh)
+            throw Failure(ExitCode::Refused,
+                fmt::format(
+                    "remove-slivers needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+        MeshTopology const topology = analyseTopology(arraysOf(*mesh));
+        requireClosedTriangleMesh(*mesh, topology, options);
+        Json const before = describeMesh(*mesh, topology, options.ratio);
+
+        // The operation takes only the standard properties along; the others go where elements were renumbered.
+        Object result = *mesh;
+        std::vector<std::string> dropped = dropOtherProperties(result);
+        runOperation(report, [&] { Geometry::Mesh::removeSlivers(options.ratio, result); });
+        if (countsOf(result) == countsOf(*mesh)) {
+            result = *mesh;
+            dropped.clear();
+        }
+
+        Json const after = describeMesh(result, analyseTopology(arraysOf(result)), options.ratio);
+        saveGeometry(result, options.out, report);
+        report.document["ratio"] = options.ratio;
+        reportOperation(before, after, dropped, report);
+    }
+
+}
+
+void addRemoveSlivers(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"remove-slivers",
+        "Collapse the needle-shaped faces of a closed manifold mesh of triangles",
+        R"(A face is a needle when its shortest edge is shorter than the ratio times its longest one. A collapse takes one point
+and two faces; it is left out where it would change the topology or turn a face over, so that some needles may stay.
+Points and faces are renumbered, and properties other than the positions are dropped, unless nothing collapses.)",
+        "  modeling remove-slivers part.stl clean.stl\n"
+        "  modeling remove-slivers scan.ply scan.ply --ratio 0.1 --json"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("IN", "Mesh to read", options->in, command);
+    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    command.add_option("--ratio", options->ratio, "Shortest edge over longest edge below which a face is a needle")
+        ->check(isFraction())
+        ->capture_default_str();
+    onSelected(command, invocation, [options](Report& report) { removeSlivers(*options, report); });
+}
+
+}

@@ -1,0 +1,64 @@
+#include "GeometryFile.h"
+
+#include "Readers.h"
+#include "Writers.h"
+
+#include <map>
+
+namespace ModelingProgram {
+
+namespace {
+
+    struct Format {
+        GeometryFile (*read)(InputFile const&);
+        void (*write)(WritableGeometry&, std::filesystem::path const&);
+    };
+
+    std::map<std::string, Format> const& formats()
+    {
+        static std::map<std::string, Format> const result{
+            {".obj", {readObj, writeObj}},
+            {".off", {readOff, nullptr}},
+            {".ply", {readPly, writePly}},
+            {".stl", {readStl, writeStl}},
+            {".vtp", {nullptr, writeVtp}},
+            {".xyz", {readXyz, nullptr}},
+        };
+        return result;
+    }
+
+    Format formatOf(std::filesystem::path const& file)
+    {
+        std::string extension = file.extension().string();
+        for (char& c : extension)
+            c = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+        auto const format = formats().find(extension);
+        return format == formats().end() ? Format{} : format->second;
+    }
+
+}
+
+GeometryFile readGeometryFile(std::filesystem::path const& file)
+{
+    Format const format = formatOf(file);
+    if (!format.read)
+        throw FileError(file.string() + " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz");
+    return format.read(InputFile(file));
+}
+
+std::vector<std::string> writeGeometryFile(Tessara::Object const& object, std::filesystem::path const& file)
+{
+    Format const format = formatOf(file);
+    if (!format.write)
+        throw FileError(file.string() + " cannot be written: its name ends in none of .obj, .ply, .stl and .vtp");
+    WritableGeometry geometry = takeApart(object, file);
+    format.write(geometry, file);
+    return std::move(geometry.leftOut);
+}
+
+bool isWritableFormat(std::filesystem::path const& file)
+{
+    return formatOf(file).write != nullptr;
+}
+
+}

@@ -1,0 +1,41 @@
+#pragma once
+
+#include <TessaraObject/Object.h>
+
+#include <filesystem>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace ModelingProgram {
+
+/// A file that cannot be read or written: the text names the file, and the line or element where there is one.
+class FileError : public std::runtime_error {
+public:
+    using std::runtime_error::runtime_error;
+};
+
+/// What a file held, as the library takes it: a mesh where there are faces, otherwise a strand set where there are
+/// polylines, otherwise a point cloud.
+struct GeometryFile {
+    Orvan::MutablePtr<Tessara::Object> object;
+    std::string format; // "OBJ", "PLY (binary, little endian)", ...
+    std::vector<std::string> notes; // what was in the file and is not in the object, a sentence each
+};
+
+/// Reads OBJ, PLY, STL, OFF and XYZ files, told apart by the extension of the name, in any case.
+/// \throws FileError  for a file that is not there, is cut off, or holds what cannot be right
+GeometryFile readGeometryFile(std::filesystem::path const& file);
+
+/// Writes OBJ, PLY (binary, little endian), STL (binary) and VTP files. The file appears under its name only when it is
+/// complete: it is written beside it first. An existing file is replaced.
+/// \return what the format cannot hold and was therefore dropped, a sentence each
+/// \throws FileError  where the file cannot be written, or the format cannot hold the kind of geometry at all; a file
+/// of
+///                    that name is then as it was
+std::vector<std::string> writeGeometryFile(Tessara::Object const& object, std::filesystem::path const& file);
+
+/// Whether `writeGeometryFile` knows the extension: asked before work is done that could not be kept.
+bool isWritableFormat(std::filesystem::path const& file);
+
+}

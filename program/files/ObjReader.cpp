@@ -1,0 +1,298 @@
+#include "Readers.h"
+
+#include <TessaraGeometry/Names.h>
+
+#include <set>
+
+namespace ModelingProgram {
+
+using namespace Tessara::Geometry;
+using Tessara::Math::float2;
+using Tessara::Math::float3;
+
+namespace {
+
+    constexpr float3 kWhite{1, 1, 1};
+
+    template <class T>
+    Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
+    {
+        Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
+        std::transform(indices.begin(), indices.end(), result.begin(),
+            [&](unsigned int index) { return index == kInvalidIndex ? T{} : values[index]; });
+        return result;
+    }
+
+    class ObjReader {
+    public:
+        explicit ObjReader(InputFile const& file)
+            : file_(file)
+            , in_(file, 0, TextScanner::Syntax::CommentsAndJoinedLines)
+            , builder_(in_)
+        {
+        }
+
+        GeometryFile read()
+        {
+            countStatements();
+            for (; !in_.atEnd(); in_.nextLine())
+                readStatement();
+            addCornerValues("uv", textureOf_, textures_);
+            addCornerValues("normal", normalOf_, normals_);
+            addPointValues();
+            noteLeftOut();
+            return std::move(builder_).finish("OBJ");
+        }
+
+    private:
+        struct Counts {
+            std::uint64_t points = 0;
+            std::uint64_t textures = 0;
+            std::uint64_t normals = 0;
+            std::uint64_t faces = 0;
+        };
+
+        /// The counts come first, so that an index can be checked where it stands: it may point forwards.
+        void countStatements()
+        {
+            TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
+            for (; !scanner.atEnd(); scanner.nextLine()) {
+                std::string_view const keyword = scanner.peekWord();
+                total_.points += keyword == "v";
+                total_.textures += keyword == "vt";
+                total_.normals += keyword == "vn";
+                total_.faces += keyword == "f";
+            }
+            if (std::max({total_.textures, total_.normals, total_.faces}) >= GeometryBuilder::kMostElements)
+                in_.refuse("there are more elements than a mesh can hold");
+            builder_.expectPoints(total_.points);
+            builder_.expectFaces(total_.faces);
+            textures_.reserve(total_.textures);
+            normals_.reserve(total_.normals);
+        }
+
+        void readStatement()
+        {
+            std::string_view const keyword = in_.word();
+            if (keyword == "v")
+                readPoint();
+            else if (keyword == "f")
+                readFace();
+            else if (keyword == "vt")
+                readTexture();
+            else if (keyword == "vn")
+                normals_.append(readFloat3("a component of the normal"));
+            else if (keyword == "l")
+                readPolyline();
+            else if (keyword == "p")
+                ++pointElements_;
+            else if (!keyword.empty() && !isIgnored(keyword) && unknownKeywords_.size() < 5)
+                unknownKeywords_.insert(TextScanner::quoted(keyword));
+            if (isGeometry(keyword) && !in_.atLineEnd())
+                in_.refuse(TextScanner::quoted(in_.peekWord()) + " is more than belongs into this line");
+        }
+
+        static bool isGeometry(std::string_view keyword)
+        {
+            return keyword == "v" || keyword == "f" || keyword == "vt" || keyword == "vn" || keyword == "l";
+        }
+
+        /// Names of groups and materials, which no geometry depends on.
+        static bool isIgnored(std::string_view keyword)
+        {
+            constexpr std::string_view kIgnored[] = {"o", "g", "s", "usemtl", "mtllib"};
+            return std::find(std::begin(kIgnored), std::end(kIgnored), keyword) != std::end(kIgnored);
+        }
+
+        float3 readFloat3(char const* what)
+        {
+            float const x = in_.number<float>(what);
+            float const y = in_.number<float>(what);
+            return {x, y, in_.number<float>(what)};
+        }
+
+        /// v x y z, then perhaps a weight or a colour.
+        void readPoint()
+        {
+            builder_.addPoint(readFloat3("a coordinate"));
+            if (in_.atLineEnd())
+                return;
+            float const first = in_.number<float>("a weight or a colour");
+            if (in_.atLineEnd()) {
+                weightedPoints_ += first != 1;
+                return;
+            }
+            float const green = in_.number<float>("a colour");
+            float3 const color{first, green, in_.number<float>("a colour")};
+            fillColors(builder_.pointCount() - 1);
+            colors_.append(color);
+        }
+
+        void fillColors(std::uint64_t count)
+        {
+            while (colors_.size < count) {
+                colors_.append(kWhite);
+                ++uncoloredPoints_;
+            }
+        }
+
+        void readTexture()
+        {
+            float const u = in_.number<float>("a texture coordinate");
+            float const v = in_.atLineEnd() ? 0 : in_.number<float>("a texture coordinate");
+            if (!in_.atLineEnd())
+                deepTextures_ += in_.number<float>("a texture coordinate") != 0;
+            textures_.append({u, v});
+        }
+
+        void readFace()
+        {
+            while (!in_.atLineEnd()) {
+                builder_.addCorner(readIndex("point", builder_.pointCount(), total_.points));
+                unsigned int texture = kInvalidIndex;
+                unsigned int normal = kInvalidIndex;
+                if (in_.accept('/')) { // v/vt, v/vt/vn, v//vn, and any of them with an empty end
+                    if (!in_.atTokenEnd() && !in_.isAt('/'))
+                        texture = readIndex("texture coordinate", textures_.size, total_.textures);
+                    if (in_.accept('/') && !in_.atTokenEnd())
+                        normal = readIndex("normal", normals_.size, total_.normals);
+                }
+                expectTokenEnd();
+                if (total_.textures != 0)
+                    textureOf_.append(texture);
+                if (total_.normals != 0)
+                    normalOf_.append(normal);
+            }
+            builder_.endFace();
+        }
+
+        void readPolyline()
+        {
+            while (!in_.atLineEnd()) {
+                linePoints_.append(readIndex("point", builder_.pointCount(), total_.points));
+                if (in_.accept('/') && !in_.atTokenEnd())
+                    static_cast<void>(readIndex("texture coordinate", textures_.size, total_.textures));
+                expectTokenEnd();
+            }
+            if (linePoints_.size == lineOffset_[lineOffset_.size - 1])
+                in_.refuse("a polyline has no points");
+            if (linePoints_.size >= GeometryBuilder::kMostElements)
+                in_.refuse("there are more points in polylines than a strand set can hold");
+            lineOffset_.append(static_cast<unsigned int>(linePoints_.size));
+        }
+
+        /// Indices count from 1, negative ones backwards from what has been read so far.
+        unsigned int readIndex(char const* kind, std::uint64_t read, std::uint64_t total)
+        {
+            long long const index = in_.leadingInteger("an index");
+            long long const element = index < 0 ? static_cast<long long>(read) + index : index - 1;
+            if (element < 0 || element >= static_cast<long long>(total))
+                in_.refuse(std::string("the ") + kind + " " + std::to_string(index) + " does not exist: "
+                    + (index == 0       ? "the first one is 1"
+                            : index < 0 ? std::to_string(read) + " stand above"
+                                        : "the file has " + std::to_string(total)));
+            return static_cast<unsigned int>(element);
+        }
+
+        void expectTokenEnd()
+        {
+            if (!in_.atTokenEnd())
+                in_.refuse(TextScanner::quoted(in_.peekWord()) + " follows an index, but is none");
+        }
+
+        template <class T>
+        void addCornerValues(char const* name, Orvan::Array<unsigned int> const& indices, Orvan::Array<T> const& values)
+        {
+            auto const missing = static_cast<std::uint64_t>(std::count(indices.begin(), indices.end(), kInvalidIndex));
+            if (missing == indices.size)
+                return;
+            if (missing != 0)
+                builder_.note(std::to_string(missing) + " face corners have no \"" + name + "\" and get zeros");
+            builder_.addProperty<T>(name, sFaceVertexComp, gathered(values, indices));
+        }
+
+        void addPointValues()
+        {
+            if (!colors_.empty())
+                fillColors(total_.points);
+            if (uncoloredPoints_ != 0)
+                builder_.note(std::to_string(uncoloredPoints_) + " points have no colour and become white");
+            // Without faces nothing tells whose a normal is, but writers of point clouds give one a point.
+            if (builder_.faceCount() != 0 || normals_.size != total_.points)
+                normals_.clear();
+            if (lineOffset_.size != 1)
+                addPolylines();
+            if (!colors_.empty())
+                builder_.addProperty<float3>("color", sPointComp, std::move(colors_));
+            if (!normals_.empty())
+                builder_.addProperty<float3>("normal", sPointComp, std::move(normals_));
+        }
+
+        /// A strand's points are consecutive and its own: points that polylines share become several, and points of no
+        /// polyline go.
+        void addPolylines()
+        {
+            if (builder_.faceCount() != 0) {
+                builder_.note(std::to_string(lineOffset_.size - 1) + " polylines are left out: a mesh has none");
+                return;
+            }
+            std::vector<bool> isUsed(total_.points);
+            std::uint64_t usedCount = 0;
+            for (unsigned int const point : linePoints_) {
+                usedCount += !isUsed[point];
+                isUsed[point] = true;
+            }
+            if (usedCount != total_.points)
+                builder_.note(std::to_string(total_.points - usedCount) + " points of no polyline are left out");
+            if (usedCount != linePoints_.size)
+                builder_.note(std::to_string(linePoints_.size - usedCount)
+                    + " points are added where polylines share points: each strand has its own");
+            if (!colors_.empty())
+                colors_ = gathered(colors_, linePoints_);
+            if (!normals_.empty())
+                normals_ = gathered(normals_, linePoints_);
+            builder_.makeStrands(std::move(lineOffset_), linePoints_);
+        }
+
+        void noteLeftOut()
+        {
+            auto const noteCount = [&](std::uint64_t count, char const* what) {
+                if (count != 0)
+                    builder_.note(std::to_string(count) + what);
+            };
+            noteCount(pointElements_, " lines of point elements (p) are left out: every point is kept anyway");
+            noteCount(weightedPoints_, " weights of points are left out");
+            noteCount(deepTextures_, " third texture coordinates are left out");
+            std::string keywords;
+            for (std::string const& keyword : unknownKeywords_)
+                keywords += (keywords.empty() ? "" : ", ") + keyword;
+            if (!keywords.empty())
+                builder_.note("lines that begin with " + keywords + " are left out");
+        }
+
+        InputFile const& file_;
+        TextScanner in_;
+        GeometryBuilder builder_;
+        Counts total_;
+        Orvan::Array<float2> textures_;
+        Orvan::Array<float3> normals_;
+        Orvan::Array<float3> colors_;
+        Orvan::Array<unsigned int> textureOf_; // an entry a corner, where the file has texture coordinates at all
+        Orvan::Array<unsigned int> normalOf_;
+        Orvan::Array<unsigned int> linePoints_;
+        Orvan::Array<unsigned int> lineOffset_{0u};
+        std::uint64_t uncoloredPoints_ = 0;
+        std::uint64_t pointElements_ = 0;
+        std::uint64_t weightedPoints_ = 0;
+        std::uint64_t deepTextures_ = 0;
+        std::set<std::string> unknownKeywords_;
+    };
+
+}
+
+GeometryFile readObj(InputFile const& file)
+{
+    return ObjReader(file).read();
+}
+
+}

@@ -1,0 +1,199 @@
+#include "Welder.h"
+#include "Writers.h"
+
+namespace ModelingProgram {
+
+using namespace Tessara::Geometry;
+using namespace Tessara::Math;
+
+namespace {
+
+    /// Texture coordinates or normals: a list of vectors, and an entry of it for each corner. Without entries the list
+    /// is one of the points.
+    struct Vectors {
+        Tessara::PropertyValue list;
+        Orvan::Array<unsigned int> numbers;
+        bool isOfPoints = false;
+
+        explicit operator bool() const { return !list.empty(); }
+        unsigned int numberOf(std::uint64_t corner, unsigned int point) const
+        {
+            return isOfPoints ? point : numbers[corner];
+        }
+    };
+
+    template <class T> OutputFile& writeComponents(T const& vector, OutputFile& out)
+    {
+        if constexpr (sizeof(vector) > 2 * sizeof(vector.x))
+            return out << " " << vector.x << " " << vector.y << " " << vector.z;
+        else
+            return out << " " << vector.x << " " << vector.y;
+    }
+
+    class ObjWriter {
+    public:
+        explicit ObjWriter(WritableGeometry& geometry)
+            : geometry_(geometry)
+        {
+        }
+
+        void write(std::filesystem::path const& file)
+        {
+            chooseAttributes();
+            OutputFile out(file);
+            writePoints(out);
+            writeVectors<float2, double2>("vt", textures_, out);
+            writeVectors<float3, double3>("vn", normals_, out);
+            if (geometry_.kind == WritableGeometry::Kind::Mesh)
+                writeFaces(out);
+            else if (geometry_.kind == WritableGeometry::Kind::Strands)
+                writePolylines(out);
+            out.commit();
+        }
+
+    private:
+        /// Values of corners win over those of points: they are what the format is made for.
+        void chooseAttributes()
+        {
+            for (char const* const component : {sFaceVertexComp, sPointComp}) {
+                for (Attribute const& attribute : geometry_.attributes) {
+                    if (attribute.component == component && !isTaken(attribute))
+                        leaveOut(attribute, "OBJ files have no place for it", geometry_.leftOut);
+                }
+            }
+            for (Attribute const& attribute : geometry_.attributes) {
+                if (attribute.component != sFaceVertexComp && attribute.component != sPointComp)
+                    leaveOut(attribute, "OBJ files have no place for it", geometry_.leftOut);
+            }
+        }
+
+        bool isTaken(Attribute const& attribute)
+        {
+            bool const isOfPoints = attribute.component == sPointComp;
+            if (attribute.name == "color" && isOfPoints)
+                return takeColors(attribute);
+            if (attribute.name == "uv" && !textures_ && geometry_.kind == WritableGeometry::Kind::Mesh)
+                return takeVectors<float2>(attribute, textures_) || takeVectors<double2>(attribute, textures_);
+            if (attribute.name == "normal" && !normals_)
+                return takeVectors<float3>(attribute, normals_) || takeVectors<double3>(attribute, normals_);
+            return false;
+        }
+
+        bool takeColors(Attribute const& attribute)
+        {
+            colors_ = attribute.values;
+            auto const isOf = [&]<class... T>(std::type_identity<T>...) {
+                return (visitAs<T>(attribute.values, [](auto const&) {}) || ...);
+            };
+            if (isOf(std::type_identity<float3>()))
+                return true;
+            if (isOf(std::type_identity<uchar3>(), std::type_identity<uchar4>(), std::type_identity<float4>())) {
+                geometry_.leftOut.push_back("\"color\" is written as three fractions a point: OBJ files have no bytes "
+                                            "there and no alpha");
+                return true;
+            }
+            colors_ = {};
+            return false;
+        }
+
+        template <class T> bool takeVectors(Attribute const& attribute, Vectors& vectors)
+        {
+            return visitAs<T>(attribute.values, [&](Orvan::Array<T> const& values) {
+                vectors.isOfPoints = attribute.component == sPointComp;
+                vectors.list = attribute.values;
+                if (vectors.isOfPoints)
+                    return;
+                Welder<T> welder;
+                vectors.numbers = Orvan::Array<unsigned int>(values.size, Orvan::kUninitialized);
+                for (std::uint64_t corner = 0; corner < values.size; ++corner)
+                    vectors.numbers[corner] = welder.numberOf(values[corner]);
+                vectors.list = Orvan::makePtr<Orvan::Array<T>>(welder.values());
+            });
+        }
+
+        void writePoints(OutputFile& out) const
+        {
+            Orvan::Array<float3> const& positions = *geometry_.positions;
+            auto const writeAll = [&](auto const& writeColor) {
+                for (std::uint64_t point = 0; point < positions.size; ++point) {
+                    out << "v";
+                    writeComponents(positions[point], out);
+                    writeColor(point);
+                    out << "\n";
+                }
+            };
+            auto const writeAs = [&]<class T>(std::type_identity<T>, float most) {
+                return visitAs<T>(colors_, [&](Orvan::Array<T> const& colors) {
+                    writeAll([&](std::uint64_t point) {
+                        T const& c = colors[point];
+                        out << " " << static_cast<float>(c.x) / most << " " << static_cast<float>(c.y) / most << " "
+                            << static_cast<float>(c.z) / most;
+                    });
+                });
+            };
+            bool const areColored = writeAs(std::type_identity<float3>(), 1) || writeAs(std::type_identity<float4>(), 1)
+                || writeAs(std::type_identity<uchar3>(), 255) || writeAs(std::type_identity<uchar4>(), 255);
+            if (!areColored)
+                writeAll([](std::uint64_t) {});
+        }
+
+        template <class... T> static void writeVectors(char const* keyword, Vectors const& vectors, OutputFile& out)
+        {
+            auto const writeAll = [&](auto const& list) {
+                for (auto const& vector : list)
+                    writeComponents(vector, out << keyword) << "\n";
+            };
+            static_cast<void>((visitAs<T>(vectors.list, writeAll) || ...));
+        }
+
+        void writeFaces(OutputFile& out) const
+        {
+            Orvan::Array<unsigned int> const& point = *geometry_.faceVertex;
+            Orvan::Array<unsigned int> const& offset = *geometry_.offsets;
+            for (std::uint64_t face = 0; face + 1 < offset.size; ++face) {
+                out << "f";
+                for (std::uint64_t corner = offset[face]; corner < offset[face + 1]; ++corner) {
+                    out << " " << oneBased(point[corner]);
+                    if (textures_)
+                        out << "/" << oneBased(textures_.numberOf(corner, point[corner]));
+                    if (normals_)
+                        out << (textures_ ? "/" : "//") << oneBased(normals_.numberOf(corner, point[corner]));
+                }
+                out << "\n";
+            }
+        }
+
+        void writePolylines(OutputFile& out)
+        {
+            Orvan::Array<unsigned int> const& offset = *geometry_.offsets;
+            std::uint64_t emptyCount = 0;
+            for (std::uint64_t strand = 0; strand + 1 < offset.size; ++strand) {
+                emptyCount += offset[strand] == offset[strand + 1];
+                if (offset[strand] == offset[strand + 1])
+                    continue;
+                out << "l";
+                for (unsigned int point = offset[strand]; point < offset[strand + 1]; ++point)
+                    out << " " << oneBased(point);
+                out << "\n";
+            }
+            if (emptyCount != 0)
+                geometry_.leftOut.push_back(
+                    std::to_string(emptyCount) + " strands without points are left out: OBJ files hold none");
+        }
+
+        static std::uint64_t oneBased(unsigned int index) { return std::uint64_t{index} + 1; }
+
+        WritableGeometry& geometry_;
+        Tessara::PropertyValue colors_;
+        Vectors textures_;
+        Vectors normals_;
+    };
+
+}
+
+void writeObj(WritableGeometry& geometry, std::filesystem::path const& file)
+{
+    ObjWriter(geometry).write(file);
+}
+
+}

@@ -1,0 +1,228 @@
+#include "PlyColumns.h"
+#include "Writers.h"
+
+#include <algorithm>
+#include <bit>
+#include <iterator>
+#include <limits>
+#include <optional>
+#include <set>
+#include <sstream>
+
+namespace ModelingProgram {
+
+using namespace Tessara::Geometry;
+
+namespace {
+
+    static_assert(std::endian::native == std::endian::little, "numbers are written as they lie in memory");
+
+    std::string typeName(auto elementType)
+    {
+        using Layout = ElementLayout<typename decltype(elementType)::Type>;
+        if constexpr (Layout::components == 0)
+            return {};
+        else if constexpr (std::is_same_v<typename Layout::Scalar, bool>)
+            return "uchar";
+        else if constexpr (sizeof(typename Layout::Scalar) == 8 && !std::is_same_v<typename Layout::Scalar, double>)
+            return {};
+        else
+            return elementTypeName<typename Layout::Scalar>();
+    }
+
+    /// The values of an attribute as they go into the file: so many bytes an element.
+    struct Values {
+        std::byte const* data;
+        std::size_t bytes;
+        std::string type; // of a scalar; empty where PLY has none like it
+        unsigned int components;
+        bool isAmbiguous; // a reader would take it for another type of as many scalars
+    };
+
+    Values valuesOf(Attribute const& attribute)
+    {
+        Values result{};
+        visitArray(attribute.values, [&](auto const& array, auto elementType) {
+            using T = typename decltype(elementType)::Type;
+            using Layout = ElementLayout<T>;
+            result = {reinterpret_cast<std::byte const*>(array.data), sizeof(T), typeName(elementType),
+                Layout::components, false};
+            if constexpr (Layout::components != 0)
+                visitElementTypeOf<typename Layout::Scalar>(Layout::components,
+                    [&]<class First>(ElementType<First>) { result.isAmbiguous = !std::is_same_v<First, T>; });
+        });
+        return result;
+    }
+
+    std::vector<std::string> wordsOf(std::string_view text)
+    {
+        std::istringstream stream{std::string(text)};
+        return {std::istream_iterator<std::string>(stream), {}};
+    }
+
+    /// The columns or the list of one element: the header's lines, and where the values come from.
+    struct Column {
+        Values values;
+        bool isList;
+    };
+
+    class PlyWriter {
+    public:
+        PlyWriter(WritableGeometry& geometry, std::filesystem::path const& file)
+            : geometry_(geometry)
+            , file_(file)
+        {
+        }
+
+        void write()
+        {
+            if (geometry_.kind == WritableGeometry::Kind::Strands)
+                throw FileError(file_.string() + " cannot be written: PLY files hold no strands; OBJ and VTP files do");
+            std::ostringstream header;
+            header << "ply\nformat binary_little_endian 1.0\nelement vertex " << geometry_.pointCount()
+                   << "\nproperty float x\nproperty float y\nproperty float z\n";
+            std::vector<Column> const pointColumns = chooseColumns(sPointComp, {"x", "y", "z"}, header);
+            std::vector<Column> faceColumns;
+            if (geometry_.kind == WritableGeometry::Kind::Mesh)
+                faceColumns = declareFaces(header);
+            for (Attribute const& attribute : geometry_.attributes)
+                leaveOutOthers(attribute);
+            header << "end_header\n";
+
+            OutputFile out(file_);
+            out << header.str();
+            for (std::uint64_t point = 0; point < geometry_.pointCount(); ++point) {
+                out.writeBinary((*geometry_.positions)[point]);
+                writeColumns(pointColumns, point, out);
+            }
+            for (std::uint64_t face = 0; face < geometry_.cellCount(); ++face) {
+                writeCorners(face, out);
+                writeColumns(faceColumns, face, out);
+            }
+            out.commit();
+        }
+
+    private:
+        std::vector<Column> declareFaces(std::ostringstream& header)
+        {
+            Orvan::Array<unsigned int> const& offset = *geometry_.offsets;
+            for (std::uint64_t face = 0; face + 1 < offset.size; ++face)
+                mostCorners_ = std::max(mostCorners_, offset[face + 1] - offset[face]);
+            // Most programs know no other index type than int.
+            char const* const indexType =
+                geometry_.pointCount() > std::numeric_limits<std::int32_t>::max() ? "uint" : "int";
+            header << "element face " << geometry_.cellCount() << "\nproperty list " << lengthType(mostCorners_) << " "
+                   << indexType << " vertex_indices\n";
+            for (Attribute const& attribute : geometry_.attributes) {
+                Values const values = valuesOf(attribute);
+                if (attribute.component == sFaceVertexComp && attribute.name == "uv" && values.components == 2
+                    && (values.type == "float" || values.type == "double")) {
+                    cornerTextures_ = values;
+                    header << "property list " << lengthType(2 * mostCorners_) << " " << values.type << " "
+                           << kPlyCornerTextures << "\n";
+                }
+            }
+            return chooseColumns(
+                sFaceComp, {"vertex_indices", "vertex_index", std::string(kPlyCornerTextures)}, header);
+        }
+
+        static char const* lengthType(unsigned int most) { return most > 255 ? "uint" : "uchar"; }
+
+        static void writeLength(unsigned int length, unsigned int most, OutputFile& out)
+        {
+            if (most > 255)
+                out.writeBinary(length);
+            else
+                out.writeBinary(static_cast<unsigned char>(length));
+        }
+
+        std::vector<Column> chooseColumns(
+            char const* component, std::set<std::string> taken, std::ostringstream& header)
+        {
+            std::vector<Column> columns;
+            for (Attribute const& attribute : geometry_.attributes) {
+                if (attribute.component != component)
+                    continue;
+                Values const values = valuesOf(attribute);
+                std::vector<std::string> const names = columnNames(attribute, values);
+                bool const isFree = std::none_of(
+                    names.begin(), names.end(), [&](std::string const& name) { return taken.contains(name); });
+                if (values.type.empty() || (values.isAmbiguous && names.size() == 1)) {
+                    leaveOut(attribute, "PLY files have no such type", geometry_.leftOut);
+                } else if (!isFree || wordsOf(attribute.name) != std::vector{attribute.name}) {
+                    leaveOut(attribute, "PLY files cannot have a property of that name here", geometry_.leftOut);
+                } else {
+                    taken.insert(names.begin(), names.end());
+                    bool const isList = names.size() != values.components;
+                    for (std::string const& name : names)
+                        header << "property " << (isList ? "list uchar " : "") << values.type << " " << name << "\n";
+                    columns.push_back({values, isList});
+                    noteBytesForBools(attribute);
+                }
+            }
+            return columns;
+        }
+
+        /// A name for each component, or one for a list of them.
+        static std::vector<std::string> columnNames(Attribute const& attribute, Values const& values)
+        {
+            std::vector<std::string> const own = wordsOf(attribute.columnNames);
+            if (own.size() == values.components && values.components > 1)
+                return own;
+            for (PlyColumns const& columns : kPlyColumns) {
+                if (columns.property == attribute.name && columns.components == values.components)
+                    return wordsOf(columns.names);
+            }
+            return {attribute.name};
+        }
+
+        void noteBytesForBools(Attribute const& attribute)
+        {
+            if (visitAs<bool>(attribute.values, [](auto const&) {}))
+                geometry_.leftOut.push_back(
+                    "\"" + attribute.name + "\" is written as uchar, 0 or 1: PLY files have no bool");
+        }
+
+        void leaveOutOthers(Attribute const& attribute)
+        {
+            bool const isWritten = attribute.component == sPointComp || attribute.component == sFaceComp
+                || (cornerTextures_ && attribute.component == sFaceVertexComp && attribute.name == "uv");
+            if (!isWritten)
+                leaveOut(attribute, "of face corners PLY files hold only texture coordinates (uv)", geometry_.leftOut);
+        }
+
+        void writeCorners(std::uint64_t face, OutputFile& out) const
+        {
+            unsigned int const first = (*geometry_.offsets)[face];
+            unsigned int const count = (*geometry_.offsets)[face + 1] - first;
+            writeLength(count, mostCorners_, out);
+            out.write(geometry_.faceVertex->data + first, count * sizeof(unsigned int));
+            if (!cornerTextures_)
+                return;
+            writeLength(2 * count, 2 * mostCorners_, out);
+            out.write(cornerTextures_->data + first * cornerTextures_->bytes, count * cornerTextures_->bytes);
+        }
+
+        static void writeColumns(std::vector<Column> const& columns, std::uint64_t element, OutputFile& out)
+        {
+            for (Column const& column : columns) {
+                if (column.isList)
+                    out.writeBinary(static_cast<unsigned char>(column.values.components));
+                out.write(column.values.data + element * column.values.bytes, column.values.bytes);
+            }
+        }
+
+        WritableGeometry& geometry_;
+        std::filesystem::path const& file_;
+        unsigned int mostCorners_ = 0;
+        std::optional<Values> cornerTextures_;
+    };
+
+}
+
+void writePly(WritableGeometry& geometry, std::filesystem::path const& file)
+{
+    PlyWriter(geometry, file).write();
+}
+
+}

@@ -1,0 +1,280 @@
+#pragma once
+
+#include "GeometryFile.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <cstdint>
+#include <cstring>
+#include <limits>
+#include <memory>
+#include <string_view>
+
+namespace ModelingProgram {
+
+/// The bytes of a file, read at once.
+struct InputFile {
+    explicit InputFile(std::filesystem::path const& file);
+
+    std::filesystem::path path;
+    std::size_t size = 0;
+    std::unique_ptr<char[]> bytes;
+};
+
+/// The place that a reader has reached in a file. Whatever is wrong with the file is said through `refuse`, so that no
+/// refusal comes without its place.
+class Scanner {
+public:
+    Scanner(InputFile const& file, std::size_t start)
+        : file_(file)
+        , at_(file.bytes.get() + start)
+        , end_(file.bytes.get() + file.size)
+    {
+    }
+    Scanner(Scanner const&) = delete;
+    Scanner& operator=(Scanner const&) = delete;
+    virtual ~Scanner() = default;
+
+    [[noreturn]] void refuse(std::string const& why) const
+    {
+        throw FileError(file_.path.string() + ", " + place() + ": " + why);
+    }
+
+    /// Refuses a declared count of elements that the rest of the file cannot hold.
+    void believe(std::uint64_t count, char const* elements, std::uint64_t leastBytesEach) const
+    {
+        // The last line of a text may lack its end.
+        if (leastBytesEach != 0 && count > (remaining() + 1) / leastBytesEach)
+            refuse("the file is cut off: it declares " + std::to_string(count) + " " + elements + ", but only "
+                + std::to_string(remaining()) + " bytes follow");
+    }
+
+    std::size_t position() const { return static_cast<std::size_t>(at_ - file_.bytes.get()); }
+    std::size_t remaining() const { return static_cast<std::size_t>(end_ - at_); }
+    bool atEnd() const { return at_ == end_; }
+
+protected:
+    virtual std::string place() const = 0;
+
+    InputFile const& file_;
+    char const* at_;
+    char const* end_;
+};
+
+/// Reads numbers as they lie in memory, perhaps with their bytes the other way round. Its places are elements, counted
+/// from 0.
+class BinaryScanner final : public Scanner {
+public:
+    BinaryScanner(InputFile const& file, std::size_t start, bool swapsBytes)
+        : Scanner(file, start)
+        , swapsBytes_(swapsBytes)
+    {
+    }
+
+    void beginElement(char const* kind, std::uint64_t index)
+    {
+        kind_ = kind;
+        index_ = index;
+    }
+    void endElement() { }
+
+    template <class T> T number(char const* what)
+    {
+        if (remaining() < sizeof(T))
+            refuse(std::string("the file ends before ") + what);
+        char bytes[sizeof(T)];
+        std::memcpy(bytes, at_, sizeof(T));
+        at_ += sizeof(T);
+        if (swapsBytes_)
+            std::reverse(std::begin(bytes), std::end(bytes));
+        T value;
+        std::memcpy(&value, bytes, sizeof(T));
+        return value;
+    }
+
+    void skip(std::size_t bytes) { at_ += std::min(bytes, remaining()); }
+
+protected:
+    std::string place() const override { return std::string(kind_) + " " + std::to_string(index_); }
+
+private:
+    bool swapsBytes_;
+    char const* kind_ = "byte";
+    std::uint64_t index_ = 0;
+};
+
+/// Reads words and numbers from lines of text. Its places are lines, counted from 1.
+class TextScanner final : public Scanner {
+public:
+    enum class Syntax {
+        Plain,
+        Comments, // from # to the end of the line
+        CommentsAndJoinedLines, // and a line that ends with \ goes on in the next one
+    };
+
+    TextScanner(InputFile const& file, std::size_t start, Syntax syntax)
+        : Scanner(file, start)
+        , comments_(syntax != Syntax::Plain)
+        , joinsLines_(syntax == Syntax::CommentsAndJoinedLines)
+    {
+    }
+
+    /// What is left of the line, comments aside, is blank.
+    bool atLineEnd()
+    {
+        skipBlanks();
+        return at_ == end_ || *at_ == '\n' || (comments_ && *at_ == '#');
+    }
+
+    void nextLine()
+    {
+        auto const* const newline = static_cast<char const*>(std::memchr(at_, '\n', remaining()));
+        at_ = newline ? newline + 1 : end_;
+    }
+
+    void skipEmptyLines()
+    {
+        while (!atEnd() && atLineEnd())
+            nextLine();
+    }
+
+    void expectLineEnd()
+    {
+        if (!atLineEnd())
+            refuse(quoted(peekWord()) + " is more than belongs into this line");
+        nextLine();
+    }
+
+    /// An element is a line of its own; empty lines do not count.
+    void beginElement(char const* kind, std::uint64_t index)
+    {
+        skipEmptyLines();
+        if (atEnd())
+            refuse("the file is cut off before " + std::string(kind) + " " + std::to_string(index + 1));
+    }
+    void endElement() { expectLineEnd(); }
+
+    /// The next word of the line, without moving on; empty at the line's end.
+    std::string_view peekWord()
+    {
+        if (atLineEnd())
+            return {};
+        return {at_,
+            static_cast<std::size_t>(std::find_if(at_, end_, [&](char const& c) { return isTokenEnd(&c); }) - at_)};
+    }
+
+    std::string_view word()
+    {
+        std::string_view const text = peekWord();
+        at_ += text.size();
+        return text;
+    }
+
+    bool isAt(char character) const { return at_ != end_ && *at_ == character; }
+    bool accept(char character)
+    {
+        bool const isThere = isAt(character);
+        at_ += isThere ? 1 : 0;
+        return isThere;
+    }
+
+    template <class T> T number(char const* what)
+    {
+        skipBlanks();
+        T value{};
+        char const* const first = at_ + (hasPlusSign() ? 1 : 0); // which from_chars does not know
+        auto const [rest, error] = std::from_chars(first, end_, value);
+        if (error != std::errc{} || !isTokenEnd(rest))
+            return unusualNumber<T>(what);
+        at_ = rest;
+        return value;
+    }
+
+    /// A whole number that other characters may follow.
+    long long leadingInteger(char const* what)
+    {
+        skipBlanks();
+        long long value = 0;
+        auto const [rest, error] = std::from_chars(at_, end_, value);
+        if (error != std::errc{})
+            refuseNumber(what);
+        at_ = rest;
+        return value;
+    }
+
+    [[noreturn]] void refuseNumber(char const* what)
+    {
+        if (atLineEnd())
+            refuse(std::string("the line ends before ") + what);
+        refuse(quoted(peekWord()) + " stands for " + what + ", but is no number that fits");
+    }
+
+    bool atTokenEnd() const { return isTokenEnd(at_); }
+
+    static std::string quoted(std::string_view text);
+
+protected:
+    std::string place() const override
+    {
+        return "line " + std::to_string(1 + std::count(static_cast<char const*>(file_.bytes.get()), at_, '\n'));
+    }
+
+private:
+    static bool isBlank(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\v' || c == '\f'; }
+
+    /// The end of the line that the \ at `backslash` joins with the next one; null where it is just a character.
+    char const* joinedLine(char const* backslash) const
+    {
+        char const* newline = backslash + 1;
+        while (newline != end_ && isBlank(*newline))
+            ++newline;
+        return newline != end_ && *newline == '\n' ? newline : nullptr;
+    }
+
+    void skipBlanks()
+    {
+        for (; at_ != end_; ++at_) {
+            if (isBlank(*at_))
+                continue;
+            char const* const newline = joinsLines_ && *at_ == '\\' ? joinedLine(at_) : nullptr;
+            if (!newline)
+                return;
+            at_ = newline;
+        }
+    }
+
+    bool isTokenEnd(char const* c) const
+    {
+        return c == end_ || *c == '\n' || isBlank(*c) || (comments_ && *c == '#')
+            || (joinsLines_ && *c == '\\' && joinedLine(c));
+    }
+
+    bool hasPlusSign() const { return isAt('+') && at_ + 1 != end_ && at_[1] != '-'; }
+
+    /// Numbers too small for their type are 0, as everywhere else; all others that do not fit are refused.
+    template <class T> T unusualNumber(char const* what)
+    {
+        if constexpr (std::is_floating_point_v<T>) {
+            std::string_view const text = peekWord();
+            double wide = 0;
+            auto const [rest, error] =
+                std::from_chars(text.data() + (hasPlusSign() ? 1 : 0), text.data() + text.size(), wide);
+            bool const isWhole = !text.empty() && rest == text.data() + text.size();
+            bool const hasNegativeExponent = text.find_first_of("eE") + 1 == text.find('-', 1);
+            bool const isTiny = error == std::errc::result_out_of_range
+                ? hasNegativeExponent
+                : error == std::errc{} && std::abs(wide) < std::numeric_limits<T>::min();
+            if (isWhole && isTiny) {
+                at_ = rest;
+                return static_cast<T>(wide);
+            }
+        }
+        refuseNumber(what);
+    }
+
+    bool comments_;
+    bool joinsLines_;
+};
+
+}

@@ -1,0 +1,61 @@
+#pragma once
+
+#include "ElementLayout.h"
+
+#include <OrvanCore/Array.h>
+
+#include <bit>
+#include <cstdint>
+
+namespace ModelingProgram {
+
+/// Numbers vectors in the order in which they first come: equal ones have one number. 0 and -0 are equal.
+template <class T> class Welder {
+public:
+    unsigned int numberOf(T const& value)
+    {
+        if (2 * values_.size >= slots_.size)
+            grow();
+        std::uint64_t slot = slotOf(value);
+        for (; slots_[slot] != 0; slot = (slot + 1) & (slots_.size - 1)) {
+            if (values_[slots_[slot] - 1] == value)
+                return slots_[slot] - 1;
+        }
+        values_.append(value);
+        slots_[slot] = static_cast<unsigned int>(values_.size);
+        return slots_[slot] - 1;
+    }
+
+    Orvan::Array<T> const& values() const { return values_; }
+
+private:
+    std::uint64_t slotOf(T const& value) const
+    {
+        using Scalar = typename ElementLayout<T>::Scalar;
+        using Bits = std::conditional_t<sizeof(Scalar) == 4, std::uint32_t, std::uint64_t>;
+        Scalar scalars[ElementLayout<T>::components];
+        std::memcpy(scalars, &value, sizeof(T));
+        std::uint64_t hash = 0;
+        for (Scalar const scalar : scalars) {
+            hash = (hash ^ std::bit_cast<Bits>(scalar + Scalar(0))) * 0x9E3779B97F4A7C15u; // -0 + 0 is 0
+            hash ^= hash >> 32;
+        }
+        return hash & (slots_.size - 1);
+    }
+
+    void grow()
+    {
+        slots_ = Orvan::Array<unsigned int>(slots_.empty() ? 1024 : 2 * slots_.size);
+        for (unsigned int number = 0; number < values_.size; ++number) {
+            std::uint64_t slot = slotOf(values_[number]);
+            while (slots_[slot] != 0)
+                slot = (slot + 1) & (slots_.size - 1);
+            slots_[slot] = number + 1;
+        }
+    }
+
+    Orvan::Array<T> values_;
+    Orvan::Array<unsigned int> slots_; // open addressing: a number plus one, or 0; a power of two, at most half full
+};
+
+}

@@ -1,0 +1,123 @@
+#include "Writers.h"
+
+#include "GeometryBuilder.h"
+
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Prototypes.h>
+#include <TessaraGeometry/Validators.h>
+
+namespace ModelingProgram {
+
+using namespace Tessara::Geometry;
+using Tessara::Math::float3;
+
+namespace {
+
+    [[noreturn]] void refuse(std::filesystem::path const& file, std::string const& why)
+    {
+        throw FileError(file.string() + " cannot be written: " + why);
+    }
+
+    WritableGeometry::Kind kindOf(Tessara::Object const& object)
+    {
+        if (object.hasProperty(sFaceComp))
+            return WritableGeometry::Kind::Mesh;
+        return object.hasProperty(sStrandComp) ? WritableGeometry::Kind::Strands : WritableGeometry::Kind::PointCloud;
+    }
+
+    GeoValidator::Status validate(Tessara::Object const& object, WritableGeometry::Kind kind)
+    {
+        if (kind == WritableGeometry::Kind::Mesh)
+            return validateMesh(object);
+        return kind == WritableGeometry::Kind::Strands ? StrandValidator().validate(object)
+                                                       : PointCloudValidator().validate(object);
+    }
+
+    void checkValues(WritableGeometry const& geometry, std::filesystem::path const& file)
+    {
+        auto const isFinite = [](float3 const& p) {
+            return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
+        };
+        Orvan::Array<float3> const& positions = *geometry.positions;
+        float3 const* const bad = std::find_if_not(positions.begin(), positions.end(), isFinite);
+        if (bad != positions.end())
+            refuse(
+                file, "point " + std::to_string(bad - positions.begin()) + " lies nowhere: a coordinate is not finite");
+        if (geometry.kind != WritableGeometry::Kind::Mesh)
+            return;
+        Orvan::Array<unsigned int> const& offset = *geometry.offsets;
+        for (std::uint64_t face = 0; face + 1 < offset.size; ++face) {
+            if (offset[face + 1] - offset[face] < 3)
+                refuse(file, "face " + std::to_string(face) + " has fewer than three corners");
+        }
+    }
+
+    /// The name without the prefix that it got because the name itself was taken.
+    std::string nameInFile(Tessara::Object const& object, Orvan::String const& name, Orvan::String const& component)
+    {
+        std::string_view const prefix = namePrefix(component);
+        if (!name.view().starts_with(prefix))
+            return std::string(name.view());
+        std::string const plain(name.view().substr(prefix.size()));
+        return isReservedName(plain) || object.hasProperty(Orvan::String(plain)) ? plain : std::string(name.view());
+    }
+
+    void addAttribute(Tessara::Object const& object, Orvan::String const& name, WritableGeometry& geometry)
+    {
+        Orvan::Ptr<Tessara::Object> const property = getDataGeoProperty(object, name);
+        Attribute attribute{
+            std::string(name.view()), getGeoPropTargetName(object, name), property->getProperty(sData), {}};
+        bool const isOfElements = !namePrefix(attribute.component).empty() && object.hasProperty(attribute.component);
+        if (!isOfElements) {
+            leaveOut(attribute, "it belongs to a range or to nothing, not to elements", geometry.leftOut);
+            return;
+        }
+        attribute.name = nameInFile(object, name, attribute.component);
+        std::uint64_t const elements = getElementCount(object, attribute.component);
+        std::optional<std::uint64_t> length;
+        visitArray(attribute.values, [&](auto const& values, auto) { length = values.size; });
+        if (length != elements) {
+            leaveOut(attribute,
+                "it has " + std::to_string(length.value_or(0)) + " values for " + std::to_string(elements)
+                    + " elements",
+                geometry.leftOut);
+            return;
+        }
+        Tessara::PropertyValue const columnNames = property->getProperty(sColumnNames);
+        if (auto const* const names = columnNames.get<Orvan::String>())
+            attribute.columnNames = names->view();
+        geometry.attributes.push_back(std::move(attribute));
+    }
+
+}
+
+void leaveOut(Attribute const& attribute, std::string const& why, std::vector<std::string>& sentences)
+{
+    std::string type;
+    visitArray(attribute.values, [&](auto const&, auto elementType) { type = elementType.name; });
+    sentences.push_back("\"" + attribute.name + "\" (" + (type.empty() ? "" : type + ", ")
+        + std::string(attribute.component.view()) + ") is left out: " + why);
+}
+
+WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file)
+{
+    WritableGeometry geometry;
+    geometry.kind = kindOf(object);
+    if (GeoValidator::Status const status = validate(object, geometry.kind); !status)
+        refuse(file, "the geometry is not valid: " + std::string(status.message().view()));
+    geometry.positions = dataOf<float3>(object, sPointPosition);
+    geometry.faceVertex = dataOf<unsigned int>(object, sFaceVertex);
+    if (geometry.kind != WritableGeometry::Kind::PointCloud)
+        geometry.offsets =
+            dataOf<unsigned int>(object, geometry.kind == WritableGeometry::Kind::Mesh ? sFaceOffset : sStrandOffset);
+    checkValues(geometry, file);
+    auto const names = getGeoPropNamesByPrototype(object, *getDataGeoPropPrototype(sGenericDataGeoProp));
+    for (Orvan::String const& name : names) {
+        if (!isReservedName(name.view()))
+            addAttribute(object, name, geometry);
+    }
+    return geometry;
+}
+
+}

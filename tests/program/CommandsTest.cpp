@@ -1,0 +1,162 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+
+#include <sys/wait.h>
+
+namespace {
+
+namespace fs = std::filesystem;
+using nlohmann::json;
+using testing::HasSubstr;
+
+std::string contentsOf(fs::path const& file)
+{
+    std::ifstream stream(file, std::ios::binary);
+    return {std::istreambuf_iterator<char>(stream), {}};
+}
+
+void write(fs::path const& file, std::string const& contents)
+{
+    std::ofstream(file, std::ios::binary) << contents;
+}
+
+/// Runs the program as a shell does, in a folder of its own.
+class Commands : public testing::Test {
+protected:
+    struct Result {
+        int exitCode = -1;
+        std::string output;
+        std::string messages;
+    };
+
+    Commands()
+    {
+        std::string pattern = (fs::path(testing::TempDir()) / "modeling-XXXXXX").string();
+        folder = ::mkdtemp(pattern.data());
+    }
+    ~Commands() override { fs::remove_all(folder); }
+
+    Result run(std::string const& arguments, std::string const& output = "stdout")
+    {
+        std::string const line =
+            "cd '" + folder.string() + "' && '" MODELING_PROGRAM "' " + arguments + " >" + output + " 2>stderr";
+        int const status = std::system(line.c_str());
+        return {
+            WIFEXITED(status) ? WEXITSTATUS(status) : -1, contentsOf(folder / "stdout"), contentsOf(folder / "stderr")};
+    }
+
+    json runForJson(std::string const& arguments) { return json::parse(run(arguments + " --json").output); }
+
+    void copySample(char const* name) { fs::copy_file(fs::path(MODELING_SAMPLES) / name, folder / name); }
+
+    fs::path folder;
+};
+
+TEST_F(Commands, RemoveSliversKeepsClosedManifolds)
+{
+    copySample("cylinder.obj");
+    json const done = runForJson("remove-slivers cylinder.obj out.ply --ratio 0.1");
+    EXPECT_EQ(done["exitCode"], 0);
+    EXPECT_EQ(done["before"]["slivers"], 64);
+    EXPECT_EQ(done["before"]["faces"], 256);
+    EXPECT_LT(done["after"]["faces"], 256);
+    EXPECT_EQ(done["after"]["genus"], 0);
+    EXPECT_FALSE(done["droppedProperties"].empty());
+    EXPECT_GT(done["peakMemoryBytes"], 0);
+
+    json const info = runForJson("info out.ply");
+    EXPECT_EQ(info["counts"],
+        json({{"points", done["after"]["points"]}, {"corners", done["after"]["corners"]},
+            {"faces", done["after"]["faces"]}}));
+    EXPECT_EQ(info["topology"]["closedManifold"], true);
+    EXPECT_EQ(info["properties"].size(), 3);
+    Result const table = run("remove-slivers cylinder.obj again.ply --ratio 0.1 --threads 1");
+    EXPECT_THAT(table.output, HasSubstr("slivers       64       0\n"));
+    EXPECT_EQ(contentsOf(folder / "again.ply"), contentsOf(folder / "out.ply"));
+
+    // In place.
+    EXPECT_EQ(run("remove-slivers cylinder.obj cylinder.obj --ratio 0.1").exitCode, 0);
+    EXPECT_EQ(runForJson("info cylinder.obj")["counts"], info["counts"]);
+}
+
+TEST_F(Commands, RemoveSliversKeepsPropertiesWhereNothingCollapses)
+{
+    copySample("cylinder.obj");
+    json const done = runForJson("remove-slivers cylinder.obj out.obj --ratio 0.01");
+    EXPECT_EQ(done["before"], done["after"]);
+    EXPECT_TRUE(done["droppedProperties"].empty());
+    EXPECT_EQ(runForJson("info out.obj")["properties"], runForJson("info cylinder.obj")["properties"]);
+}
+
+TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
+{
+    for (char const* const name : {"cylinder.obj", "sphere-with-hole.stl", "cube.ply", "spider.obj"})
+        copySample(name);
+    write(folder / "lines.obj", "v 0 0 0\nv 1 0 0\nl 1 2\n");
+    write(folder / "broken.obj", "v 0 0 0\nf 1 2 3\n");
+    fs::create_directory(folder / "folder.obj");
+    write(folder / "out.obj", "as it was");
+
+    struct Case {
+        char const* arguments;
+        int exitCode;
+        char const* message;
+    };
+    constexpr Case kCases[] = {
+        {"remove-slivers sphere-with-hole.stl out.obj", 5, "9 of 432 edges are open"},
+        {"remove-slivers sphere-with-hole.stl out.obj", 5, "pinched at 2 points"},
+        {"remove-slivers cube.ply out.obj", 5, "6 faces have more than three corners. The first is face 0 with 4"},
+        {"remove-slivers cube.ply out.obj", 5, "lie in the same place as another point"},
+        {"remove-slivers spider.obj out.obj", 5, "At 10 edges neighbouring faces look to opposite sides"},
+        {"remove-slivers lines.obj out.obj", 5, "lines.obj holds a strand set"},
+        {"remove-slivers missing.obj out.obj", 3, "missing.obj"},
+        {"remove-slivers broken.obj out.obj", 3, "broken.obj"},
+        {"validate broken.obj", 3, "broken.obj"},
+        {"remove-slivers cylinder.obj out.off", 3, "has to end in .obj, .ply, .stl or .vtp"},
+        {"remove-slivers cylinder.obj nowhere/out.obj", 3, "there is no folder nowhere"},
+        {"remove-slivers cylinder.obj folder.obj", 3, "it is a folder"},
+        {"remove-slivers cylinder.obj out.obj --ratio 1.5", 2, "1.5 is not a number from 0 to 1"},
+        {"remove-slivers cylinder.obj out.obj --ratio nan", 2, "nan is not a number"},
+        {"remove-slivers cylinder.obj out.obj --threads 0", 2, "--threads"},
+        {"remove-slivers cylinder.obj", 2, "OUT"},
+        {"", 2, "subcommand"},
+        {"remove-splinters a b", 2, "There is no command remove-splinters"},
+    };
+    for (Case const& c : kCases) {
+        Result const result = run(c.arguments);
+        EXPECT_EQ(result.exitCode, c.exitCode) << c.arguments << "\n" << result.messages;
+        EXPECT_THAT(result.messages, HasSubstr(c.message)) << c.arguments;
+        EXPECT_EQ(result.output, "") << c.arguments;
+        EXPECT_EQ(contentsOf(folder / "out.obj"), "as it was") << c.arguments;
+    }
+    json const refused = runForJson("remove-slivers cube.ply out.obj");
+    EXPECT_EQ(refused["exitCode"], 5);
+    EXPECT_EQ(refused["error"]["reasons"].size(), 2);
+    EXPECT_EQ(run("info cylinder.obj", "/dev/full").exitCode, 3);
+}
+
+TEST_F(Commands, InfoAndValidateTellAboutFiles)
+{
+    copySample("mixed.obj");
+    write(folder / "lines.obj", "v 0 0 0\nv 1 0 -2\nl 1 2\n");
+    json const topology = runForJson("info mixed.obj")["topology"];
+    EXPECT_EQ(topology["quads"], 6);
+    EXPECT_EQ(topology["genus"], 0);
+    json const lines = runForJson("info lines.obj");
+    EXPECT_EQ(lines["inputs"][0]["kind"], "strand set");
+    EXPECT_EQ(lines["boundingBox"], json({{"min", {0, 0, -2}}, {"max", {1, 0, 0}}}));
+    EXPECT_FALSE(lines.contains("topology"));
+    EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (1, 0, 0)"));
+    EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
+    EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
+    for (char const* const help : {"--help", "info --help", "validate -h", "remove-slivers --help", "--version"})
+        EXPECT_EQ(run(help).exitCode, 0) << help;
+}
+
+}

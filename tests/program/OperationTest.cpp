@@ -1,0 +1,133 @@
+#include "Operation.h"
+
+#include "Cancellation.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "Program.h"
+
+#include "support/MeshBuilder.h"
+
+#include <OrvanCppOpSDK/Job.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <csignal>
+#include <cstdlib>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using namespace Tessara::Geometry;
+    using testing::ElementsAre;
+    using TestSupport::MeshBuilder;
+
+    template <class Action> ExitCode exitCodeOf(Action const& action)
+    {
+        try {
+            action();
+        } catch (Failure const& failure) {
+            return failure.code;
+        }
+        return ExitCode::Done;
+    }
+
+    struct CancelledJob {
+        CancelledJob() { Orvan::setJobCancelled(true); }
+        CancelledJob(CancelledJob const&) = delete;
+        CancelledJob& operator=(CancelledJob const&) = delete;
+        ~CancelledJob() { Orvan::setJobCancelled(false); }
+    };
+
+}
+
+TEST(Operation, DropsWhatBelongsToElements)
+{
+    auto const mesh = MeshBuilder::tetrahedron().build();
+    addDataProperty<int>("weight", sPointComp, {1, 2, 3, 4}, *mesh);
+    addRangeProperty("seams", sFaceVertexComp, {0, 1, 0, 1, 0, 1, 0, 1, 0, 1, 0, 1}, *mesh);
+    addDataProperty<float>("texture", "seams", {0.25f, 0.75f}, *mesh);
+    addDataProperty<int>("astray", "nowhere", {1}, *mesh);
+    mesh->setProperty("author", 7);
+
+    auto const properties = propertiesOf(*mesh);
+    auto const texture =
+        std::find_if(properties.begin(), properties.end(), [](Property const& p) { return p.name == "texture"; });
+    ASSERT_NE(texture, properties.end());
+    EXPECT_EQ(texture->type, "float");
+    EXPECT_EQ(texture->component, sFaceVertexComp);
+    EXPECT_EQ(texture->range, "seams");
+    EXPECT_EQ(texture->length, 2);
+
+    EXPECT_THAT(dropOtherProperties(*mesh), ElementsAre("weight", "seams", "texture"));
+    EXPECT_FALSE(mesh->hasProperty("texture"));
+    EXPECT_TRUE(mesh->hasProperty("astray"));
+    EXPECT_TRUE(mesh->hasProperty("author"));
+    EXPECT_TRUE(validate(*mesh));
+}
+
+TEST(Operation, RefusesInvalidGeometry)
+{
+    auto const mesh = MeshBuilder::tetrahedron().build();
+    EXPECT_EQ(exitCodeOf([&] { requireValid(*mesh, "a.obj"); }), ExitCode::Done);
+    setElementCount(sPointComp, 3, *mesh);
+    EXPECT_EQ(exitCodeOf([&] { requireValid(*mesh, "a.obj"); }), ExitCode::Invalid);
+    EXPECT_EQ(exitCodeOf([&] { requireValid(Tessara::Object(), "a.obj"); }), ExitCode::Invalid);
+}
+
+TEST(Operation, EndsAsCancelledWhenTheJobIs)
+{
+    Report report("test");
+    auto const exitCodeOfRun = [&](std::function<void()> const& operation) {
+        CancelledJob const cancelled;
+        return exitCodeOf([&] { runOperation(report, operation); });
+    };
+    EXPECT_EQ(exitCodeOf([&] { runOperation(report, [] {}); }), ExitCode::Done);
+    EXPECT_EQ(exitCodeOfRun([] {}), ExitCode::Cancelled);
+    EXPECT_EQ(exitCodeOfRun([] { throw std::runtime_error("job cancelled"); }), ExitCode::Cancelled);
+    EXPECT_THROW(exitCodeOfRun([] { throw std::bad_alloc(); }), std::bad_alloc);
+    EXPECT_THROW(runOperation(report, [] { throw std::runtime_error("other"); }), std::runtime_error);
+
+    auto const out = std::filesystem::path(testing::TempDir()) / "cancelled.obj";
+    std::string const target = out.string();
+    char const* const line[] = {"modeling", "remove-slivers", MODELING_SAMPLES "/cylinder.obj", target.c_str()};
+    CancelledJob const cancelled;
+    EXPECT_EQ(runProgram(4, line), static_cast<int>(ExitCode::Cancelled));
+    EXPECT_FALSE(std::filesystem::exists(out));
+}
+
+TEST(CancelOnSignalDeathTest, StopsAtTheFirstSignalAndEndsAtTheSecond)
+{
+    testing::FLAGS_gtest_death_test_style = "threadsafe";
+    for (int const signal : {SIGINT, SIGTERM}) {
+        auto const raise = [=](int times) {
+            CancelOnSignal const cancelOnSignal;
+            for (int i = 0; i != times; ++i)
+                std::raise(signal);
+            std::exit(Orvan::isJobCancelled() ? 42 : 0);
+        };
+        EXPECT_EXIT(raise(1), testing::ExitedWithCode(42), "stopping");
+        EXPECT_EXIT(raise(2), testing::KilledBySignal(signal), "stopping");
+    }
+}
+
+TEST(Report, AlignsTablesAndMendsBytes)
+{
+    EXPECT_EQ(groupDigits(0) + " " + groupDigits(999) + " " + groupDigits(1000) + " " + groupDigits(1234567),
+        "0 999 1,000 1,234,567");
+    EXPECT_EQ(countOf(1, "edge") + ", " + countOf(0, "edge") + ", " + countOf(2, "face has", "faces have"),
+        "1 edge, 0 edges, 2 faces have");
+    EXPECT_EQ(formatValues({{"before", {{"openEdges", 1000u}, {"genus", nullptr}}}, {"after", {{"openEdges", 2u}}}}),
+        "             before   after\n"
+        "open edges    1,000       2\n"
+        "genus             -       -\n");
+    Report report("test");
+    report.document["name"] = "a\xFFz";
+    EXPECT_NE(toText(report.document).find("a\xEF\xBF\xBDz"), std::string::npos);
+}
+
+}

@@ -1,0 +1,97 @@
+#include "FileSupport.h"
+
+#include <TessaraGeometry/Names.h>
+
+#include <gtest/gtest.h>
+
+#include <map>
+#include <random>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using namespace Tessara::Geometry;
+
+    /// Valid where it is read at all; refused with the file's name otherwise. Anything else is a fault of the reader.
+    void readBroken(std::filesystem::path const& file, std::string_view content)
+    {
+        store(file, content);
+        try {
+            GeometryFile const whole = readGeometryFile(file);
+            Tessara::Object const& object = *whole.object;
+            EXPECT_TRUE(
+                validateMesh(object) || StrandValidator().validate(object) || PointCloudValidator().validate(object));
+            EXPECT_TRUE(reportProperties(object).empty());
+        } catch (FileError const& error) {
+            EXPECT_NE(std::string(error.what()).find(file.string()), std::string::npos);
+        }
+    }
+
+    std::map<std::string, std::string> wholeFiles()
+    {
+        using namespace Tessara::Math;
+        Orvan::MutablePtr<Tessara::Object> const mesh =
+            makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0.5f}}, {0, 1, 2, 0, 2, 3}, {0, 3, 6});
+        addDataProperty<float2>("uv", sFaceVertexComp, Orvan::Array<float2>(6, {0.5f, 0.25f}), *mesh);
+        addDataProperty<float3>("normal", sFaceVertexComp, Orvan::Array<float3>(6, {0, 0, 1}), *mesh);
+        addDataProperty<uchar3>("color", sPointComp, Orvan::Array<uchar3>(4, {255, 0, 1}), *mesh);
+        addDataProperty<float4>("axis", sFaceComp, Orvan::Array<float4>(2, {1, 2, 3, 4}), *mesh);
+        TemporaryFolder const folder;
+        std::map<std::string, std::string> files;
+        for (std::string const extension : {".obj", ".ply", ".stl"}) {
+            writeGeometryFile(*mesh, folder / ("a" + extension));
+            files[extension] = contentOf(folder / ("a" + extension));
+        }
+        files[".off"] = "COFF\n3 1 0\n0 0 0 1 0 0 1\n1 0 0 0 0 0 1\n0 1 0 0 0 0 1\n3 0 1 2 1.0 0 0\n";
+        files[".xyz"] = "0 0 0 1 0 0\n1 2 3 0 0 1\n";
+        files["-text.ply"] =
+            "ply\nformat ascii 1.0\nelement vertex 3\nproperty float x\nproperty double y\n"
+            "property uchar z\nproperty list int short q\nelement face 1\n"
+            "property list uchar int vertex_indices\nend_header\n0 1e1 2 1 5\n1 -1 2 1 6\n0 0 0 1 7\n3 0 1 2\n";
+        files["-text.stl"] =
+            "solid\nfacet normal 0 0 1\nouter loop\nvertex 0 0 0\nvertex 1 0 0\nvertex 0 1 0\nendloop\n"
+            "endfacet\nendsolid\n";
+        return files;
+    }
+
+    TEST(BrokenFiles, cutOffAnywhereAreReadOrRefused)
+    {
+        TemporaryFolder const folder;
+        for (auto const& [ending, content] : wholeFiles()) {
+            for (std::size_t length = 0; length <= content.size(); ++length)
+                readBroken(folder / ("a" + ending), std::string_view(content).substr(0, length));
+        }
+    }
+
+    TEST(BrokenFiles, cutOffBinaryFilesAreRefused)
+    {
+        TemporaryFolder const folder;
+        for (char const* const ending : {".ply", ".stl"}) {
+            std::string const content = wholeFiles()[ending];
+            for (std::size_t length = 0; length < content.size(); ++length) {
+                store(folder / "a" += ending, content.substr(0, length));
+                EXPECT_THROW(readGeometryFile(folder / "a" += ending), FileError) << ending << " " << length;
+            }
+        }
+    }
+
+    TEST(BrokenFiles, withOtherBytesAreReadOrRefused)
+    {
+        constexpr int kFilesEach = 400;
+        constexpr char kBytes[] = {'\0', '\n', ' ', '-', '0', '9', '.', 'e', '\\', '/', '#', '\x7f', '\xff'};
+        std::mt19937 random(1); // the same files in every run
+        TemporaryFolder const folder;
+        for (auto const& [ending, content] : wholeFiles()) {
+            for (int i = 0; i < kFilesEach; ++i) {
+                std::string broken = content;
+                for (auto changes = 1 + random() % 3; changes != 0; --changes)
+                    broken[random() % broken.size()] = kBytes[random() % std::size(kBytes)];
+                readBroken(folder / ("a" + ending), broken);
+            }
+        }
+    }
+
+}
+
+}

@@ -1,0 +1,291 @@
+#include "FileSupport.h"
+
+#include "support/Compare.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <map>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using namespace Tessara::Geometry;
+    using namespace Tessara::Math;
+    using testing::ElementsAre;
+    using testing::HasSubstr;
+    using TestSupport::sameContents;
+
+    using Indices = std::vector<unsigned int>;
+
+    TEST(ReadGeometryFile, takesWhatFormatsAllow)
+    {
+        struct Case {
+            char const* extension;
+            std::string content;
+            std::uint64_t points;
+            Indices corners;
+            Indices offsets; // of faces, or of strands where there are no corners
+            std::string note = {};
+        };
+        std::string const square = "v 0 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0\n";
+        std::string const plyHead = "ply\nformat ascii 1.0\ncomment x\n";
+        std::string const plyPoints = "element vertex 3\nproperty float x\nproperty float y\nproperty float z\n";
+        std::string const plyFace = "element face 1\nproperty list uchar int vertex_index\n";
+        std::map<std::string, Case> const cases{
+            {"indices from the end", {".obj", square + "f -4 -3 -2\n", 4, {0, 1, 2}, {0, 3}}},
+            {"indices of points that come later", {".obj", "f 1 2 4 3\n" + square, 4, {0, 1, 3, 2}, {0, 4}}},
+            {"a line that goes on in the next", {".obj", square + "f 1 2 \\\r\n3\\\n 4", 4, {0, 1, 2, 3}, {0, 4}}},
+            {"line ends of two characters, tabs",
+                {".OBJ", "v\t0 0 0 \r\nv 1 0 0\r\nv 1e0 +1 -0.\r\nf 1 2 3\r\n", 3, {0, 1, 2}, {0, 3}}},
+            {"comments", {".obj", "# \\\n" + square + "f 1 2 3# 4\n  # f 1 2 9", 4, {0, 1, 2}, {0, 3}}},
+            {"all forms of corners",
+                {".obj", square + "vt 0 0\nvn 0 0 1\nf 1/1/1 2//1 3/1 4/ 1// 2/1/", 4, {0, 1, 2, 3, 0, 1}, {0, 6},
+                    "3 face corners have no \"uv\""}},
+            {"numbers too small for a float", {".obj", "v 1e-60 -1e-4000 1e-42", 1, {}, {}}},
+            {"groups and unknown statements",
+                {".obj", "o a\ng b c\ns 1\nusemtl \nmtllib x\nvp 1\n" + square, 4, {}, {}, "\"vp\""}},
+            {"weights", {".obj", "v 0 0 0 1\nv 1 0 0 0.5", 2, {}, {}, "1 weights"}},
+            {"polylines in order", {".obj", square + "l 1 2\nl 3 4\n", 4, {}, {0, 2, 4}}},
+            {"polylines that share points",
+                {".obj", square + "l 4 2 1 3\nl 1/ 4\n", 6, {}, {0, 4, 6}, "2 points are added"}},
+            {"faces and polylines", {".obj", square + "l 1 2\nf 1 2 3\n", 4, {0, 1, 2}, {0, 3}, "1 polylines"}},
+            {"points only", {".obj", square + "p 1 2\n", 4, {}, {}, "point elements"}},
+            {"a list of faces in front",
+                {".ply", plyHead + plyFace + plyPoints + "end_header\r\n3 0 1 2\n\n0 0 0\n1 0 0\n0 1 0", 3, {0, 1, 2},
+                    {0, 3}}},
+            {"elements of other kinds",
+                {".ply",
+                    plyHead + "element edge 2\nproperty list int double q\nproperty char w\n" + plyPoints
+                        + "end_header\n0 1\n2 0.5 1e9 -1\n0 0 0\n1 0 0\n0 1 0\n",
+                    3, {}, {}, "\"edge\" are left out"}},
+            {"more than was declared",
+                {".ply", plyHead + plyPoints + "end_header\n0 0 0\n1 0 0\n0 1 0\n9", 3, {}, {}, "follows the last"}},
+            {"comments in OFF",
+                {".off", "# a\nOFF # b\n\n3 1 # c\n0 0 0\n# d\n1 0 0\n0 1 0\n3 2 1 0\n#", 3, {2, 1, 0}, {0, 3}}},
+            {"colours of a table",
+                {".off", "OFF 3 1 0\n0 0 0\n1 0 0\n0 1 0\n3 2 1 0 7\n", 3, {2, 1, 0}, {0, 3}, "of a table"}},
+            {"points without normals", {".xyz", "0 0 0\n\n 1 2.5 3 # x\r\n", 2, {}, {}}},
+            {"corners welded, also 0 and -0",
+                {".stl",
+                    "solid a b\nFacet normal 0 0 1\n outer loop\nVERTEX 0 0 0\n"
+                    "vertex 1 0 0\nvertex 0 1 0\nendloop\nendfacet\nfacet normal nan 0 0\nouter loop\nvertex 1 0 -0\n"
+                    "vertex 0 1 0\nvertex 1 1 0\nendloop\nendfacet\nendsolid a b\n",
+                    4, {0, 1, 2, 1, 2, 3}, {0, 3, 6}}},
+        };
+        for (auto const& [name, test] : cases) {
+            SCOPED_TRACE(name);
+            GeometryFile const file = readContent(test.extension, test.content);
+            EXPECT_EQ(getElementCount(*file.object, sPointComp), test.points);
+            EXPECT_EQ(valuesOf<unsigned int>(*file.object, sFaceVertex), test.corners);
+            bool const isMesh = !test.corners.empty();
+            EXPECT_EQ(valuesOf<unsigned int>(*file.object, isMesh ? sFaceOffset : sStrandOffset), test.offsets);
+            EXPECT_EQ(static_cast<bool>(validateMesh(*file.object)), isMesh);
+            EXPECT_EQ(file.notes.empty(), test.note.empty());
+            EXPECT_THAT(file.notes.empty() ? "" : file.notes[0], HasSubstr(test.note));
+        }
+    }
+
+    TEST(ReadGeometryFile, refusesWhatCannotBeRight)
+    {
+        struct Case {
+            char const* extension;
+            std::string content;
+            char const* refusal;
+        };
+        std::string const points = "v 0 0 0\nv 1 0 0\nv 0 1 0\n";
+        std::string const ply = "ply\nformat ascii 1.0\nelement vertex 1\nproperty float x\nproperty float y\n";
+        std::string const plyTail = "property float z\nend_header\n0 0 0\n";
+        std::string const tenZeros = "0 0 0 0 0 0 0 0 0 0\n";
+        std::vector<Case> const cases{
+            {".obj", "", " cannot be read: it is empty"},
+            {".obj", "hello\n", ", line 2: the file holds no points"},
+            {".obj", "v 0 nan 0", ", line 1: a coordinate is not finite"},
+            {".obj", "v 0 1e39 0", ", line 1: \"1e39\" stands for a coordinate, but is no number that fits"},
+            {".obj", "v 0 0\n", ", line 1: the line ends before a coordinate"},
+            {".obj", "v 0 0 1.2x\n", ", line 1: \"1.2x\" stands for a coordinate, but is no number that fits"},
+            {".obj", "v 0 0 +-1\n", ", line 1: \"+-1\" stands for a coordinate, but is no number that fits"},
+            {".obj", "v 0 0 0 1 1 1 1", ", line 1: \"1\" is more than belongs into this line"},
+            {".obj", points + "f 1 2 3 x", ", line 4: \"x\" stands for an index, but is no number that fits"},
+            {".obj", points + "f 1 2 3.5", ", line 4: \".5\" follows an index, but is none"},
+            {".obj", points + "f 0 1 2", ", line 4: the point 0 does not exist: the first one is 1"},
+            {".obj", points + "\nf 1 2 4", ", line 5: the point 4 does not exist: the file has 3"},
+            {".obj", "v 0 0 0\nf -1 -2 1\nv 0 0 0", ", line 2: the point -2 does not exist: 1 stand above"},
+            {".obj", points + "f 1 2", ", line 4: a face has fewer than three corners"},
+            {".obj", points + "f 1/1 2/1 3/1", ", line 4: the texture coordinate 1 does not exist: the file has 0"},
+            {".obj", points + "f 1 2 99999999999999999999",
+                ", line 4: \"99999999999999999999\" stands for an index, but is no number that fits"},
+            {".obj", points + "l\n", ", line 4: a polyline has no points"},
+            {".ply", "plx\n", ", line 1: the file does not begin with \"ply\""},
+            {".ply", ply, ", line 6: the file is cut off: its header has no \"end_header\""},
+            {".ply", "ply\nformat ascii 2.0\n", ", line 2: the format \"ascii\" is not known, or not of version 1.0"},
+            {".ply", ply + "property quux q\n" + plyTail, ", line 6: the type \"quux\" is not known"},
+            {".ply", ply + "property list float int q\n" + plyTail,
+                ", line 6: the length of a list is no whole number"},
+            {".ply", ply + "property char x\n" + plyTail, ", line 6: the property \"x\" is declared twice"},
+            {".ply", ply + "property uchar c\nproperty float z\nend_header\n0.0 0 0\n",
+                ", line 9: the line ends before z"},
+            {".ply", ply + "end_header\n0 0\n", ", line 7: points lack x, y or z"},
+            {".ply", ply + plyTail.substr(0, plyTail.size() - 2) + "zero\n",
+                ", line 8: \"zero\" stands for z, but is no number that fits"},
+            {".ply", ply + "property list char char q\n" + "property float z\nend_header\n0 0 -1 0\n",
+                ", line 9: the list \"q\" has a negative length"},
+            {".ply", "ply\nformat ascii 1.0\nelement vertex 4000000000\nproperty char x\nend_header\n0\n",
+                ", line 6: the file is cut off: it declares 4000000000 elements \"vertex\", but only 2 bytes follow"},
+            {".off", "off\n", ", line 1: the file does not begin with OFF, COFF, NOFF or the like, or is binary"},
+            {".off", "4OFF\n1 0 0\n" + tenZeros,
+                ", line 1: \"4OFF\" files are not known: points have three coordinates here"},
+            {".off", "OFF\n3 1 0\n0 0 0\n1 0 0\n0 1 0\n3 0 1 3\n",
+                ", line 6: a face names point 3, but the file has 3 points, counted from 0"},
+            {".off", "OFF\n1 0 0\n0 0 0 1 1\n", ", line 3: a colour has 2 values instead of 3 or 4"},
+            {".off", "OFF\n2 0 0\n0 0 0 #" + tenZeros, ", line 4: the file is cut off before point 2"},
+            {".xyz", "0 0 0\n1 2\n", ", line 2: there are 2 values; 3 make a point, 6 a point and its normal"},
+            {".xyz", "0 0 0\n1 2 3 0 0 1\n", ", line 2: some points have normals and some have none"},
+            {".stl", "solid\nfacet\nouter\nvertex 0 0 0\n", ", line 5: the file is cut off inside of a solid"},
+            {".stl", "solid\nfacet\nouter\nvertex 0 0 0\nendloop\n",
+                ", line 5: \"endloop\" stands where \"vertex\" belongs"},
+            {".stl", std::string(90, '\0'),
+                ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90"},
+            {".abc", "x", " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz"},
+        };
+        for (Case const& test : cases)
+            EXPECT_EQ(refusalOf(test.extension, test.content), test.refusal) << test.content;
+
+        TemporaryFolder const folder;
+        EXPECT_THROW(readGeometryFile(folder / "none.obj"), FileError);
+        std::filesystem::create_directory(folder / "folder.obj");
+        EXPECT_THROW(readGeometryFile(folder / "folder.obj"), FileError);
+    }
+
+    TEST(ReadObj, keepsPointsSharedAcrossSeams)
+    {
+        GeometryFile const file = readContent(".obj",
+            "v 0 0 0 1 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0 0 0 1\nvt 0 0\nvt 1 0.5\nvt 0.25 1 0\nvn 0 0 1\n"
+            "f 1/1/1 2/2/1 3/3/1\nf 1/3/1 3/2/1 4/1/1\n");
+        EXPECT_EQ(getElementCount(*file.object, sPointComp), 4u);
+        EXPECT_THAT(valuesOf<float2>(*file.object, "uv"),
+            ElementsAre(
+                float2{0, 0}, float2{1, 0.5f}, float2{0.25f, 1}, float2{0.25f, 1}, float2{1, 0.5f}, float2{0, 0}));
+        EXPECT_EQ(valuesOf<float3>(*file.object, "normal"), std::vector<float3>(6, {0, 0, 1}));
+        EXPECT_THAT(valuesOf<float3>(*file.object, "color"),
+            ElementsAre(float3{1, 0, 0}, float3{1, 1, 1}, float3{1, 1, 1}, float3{0, 0, 1}));
+        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("2 points have no colour")));
+    }
+
+    TEST(ReadObj, takesPointValuesAlongIntoStrands)
+    {
+        GeometryFile const file =
+            readContent(".obj", "v 0 0 0 1 0 0\nv 1 0 0 0 1 0\nv 2 0 0 0 0 1\nvn 1 0 0\nvn 0 1 0\nvn 0 0 1\nl 3 1\n");
+        EXPECT_THAT(valuesOf<float3>(*file.object, sPointPosition), ElementsAre(float3{2, 0, 0}, float3{0, 0, 0}));
+        EXPECT_THAT(valuesOf<float3>(*file.object, "color"), ElementsAre(float3{0, 0, 1}, float3{1, 0, 0}));
+        EXPECT_THAT(valuesOf<float3>(*file.object, "normal"), ElementsAre(float3{0, 0, 1}, float3{1, 0, 0}));
+        EXPECT_TRUE(StrandValidator().validate(*file.object));
+    }
+
+    std::string const kPlyProperties = "element vertex 3\n"
+                                       "property double x\nproperty short flag\nproperty double y\n"
+                                       "property float nx\nproperty float ny\nproperty float nz\n"
+                                       "property uchar red\nproperty uchar green\nproperty uchar blue\n"
+                                       "property float u\nproperty float v\nproperty double z\n"
+                                       "property list uchar float weights\nproperty uint sFaceVertex\n"
+                                       "element face 1\n"
+                                       "property list ushort float texcoord\nproperty list uchar uint vertex_indices\n"
+                                       "property char red\nproperty list uint int odd\nproperty float nx\n"
+                                       "element rest 1\nproperty list char double left\n"
+                                       "end_header\n";
+
+    std::string plyOf(std::endian order)
+    {
+        std::string content = std::string("ply\nformat binary_") + (order == std::endian::little ? "little" : "big")
+            + "_endian 1.0\n" + kPlyProperties;
+        for (unsigned char i = 0; i < 3; ++i) {
+            float const f = i;
+            content += bytesOf(order, 0.5 + i, short(-i), 1.5 * i, f, 0.5f, 1 - f, i, (unsigned char)(i + 1),
+                (unsigned char)(255), f / 4, f / 2, -0.25, (unsigned char)(2), f, f + 1, 4000000000u + i);
+        }
+        content += bytesOf(order, (unsigned short)(6), 0.0f, 0.125f, 1.0f, 0.25f, 2.0f, 0.5f, (unsigned char)(3), 2u,
+            0u, 1u, (signed char)(-7), 2u, 1, 2, 0.75f, (signed char)(1), 9.0);
+        return content;
+    }
+
+    TEST(ReadPly, givesTheSameInAllEncodings)
+    {
+        std::string const text = "ply\nformat ascii 1.0\n" + kPlyProperties
+            + "0.5 0 0 0 0.5 1 0 1 255 0 0 -0.25 2 0 1 4000000000\n"
+              "1.5 -1 1.5 1 0.5 0 1 2 255 0.25 0.5 -0.25 2 1 2 4000000001\n"
+              "2.5 -2 3 2 0.5 -1 2 3 255 0.5 1 -0.25 2 2 3 4000000002\n"
+              "6 0 0.125 1 0.25 2 0.5 3 2 0 1 -7 2 1 2 0.75\n"
+              "1 9\n";
+        GeometryFile const file = readContent(".ply", text);
+        Tessara::Object const& mesh = *file.object;
+        EXPECT_EQ(file.format, "PLY (ascii)");
+        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("rounded"), HasSubstr("\"rest\"")));
+        EXPECT_THAT(valuesOf<float3>(mesh, sPointPosition),
+            ElementsAre(float3{0.5f, 0, -0.25f}, float3{1.5f, 1.5f, -0.25f}, float3{2.5f, 3, -0.25f}));
+        EXPECT_THAT(valuesOf<short>(mesh, "flag"), ElementsAre(0, -1, -2));
+        EXPECT_THAT(
+            valuesOf<float3>(mesh, "normal"), ElementsAre(float3{0, 0.5f, 1}, float3{1, 0.5f, 0}, float3{2, 0.5f, -1}));
+        EXPECT_THAT(
+            valuesOf<uchar3>(mesh, "color"), ElementsAre(uchar3{0, 1, 255}, uchar3{1, 2, 255}, uchar3{2, 3, 255}));
+        EXPECT_THAT(valuesOf<float2>(mesh, "uv"), ElementsAre(float2{0, 0}, float2{0.25f, 0.5f}, float2{0.5f, 1}));
+        EXPECT_THAT(valuesOf<float2>(mesh, "weights"), ElementsAre(float2{0, 1}, float2{1, 2}, float2{2, 3}));
+        EXPECT_THAT(
+            valuesOf<unsigned int>(mesh, "point:sFaceVertex"), ElementsAre(4000000000u, 4000000001u, 4000000002u));
+        EXPECT_THAT(valuesOf<unsigned int>(mesh, sFaceVertex), ElementsAre(2u, 0u, 1u));
+        EXPECT_THAT(
+            valuesOf<float2>(mesh, "corner:uv"), ElementsAre(float2{0, 0.125f}, float2{1, 0.25f}, float2{2, 0.5f}));
+        EXPECT_THAT(valuesOf<signed char>(mesh, "red"), ElementsAre(-7));
+        EXPECT_THAT(valuesOf<int2>(mesh, "odd"), ElementsAre(int2{1, 2}));
+        EXPECT_THAT(valuesOf<float>(mesh, "nx"), ElementsAre(0.75f));
+
+        for (std::endian const order : {std::endian::little, std::endian::big})
+            EXPECT_TRUE(sameContents(*readContent(".ply", plyOf(order)).object, mesh));
+    }
+
+    TEST(ReadPly, leavesOutListsOfSeveralLengths)
+    {
+        GeometryFile const file = readContent(".ply",
+            "ply\nformat ascii 1.0\nelement vertex 2\nproperty float x\nproperty float y\nproperty float z\n"
+            "property list uchar int neighbours\nproperty list uchar ushort three\nend_header\n"
+            "0 0 0 1 1 3 1 2 3\n1 0 0 2 0 0 3 1 2 3\n");
+        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("\"neighbours\""), HasSubstr("\"three\"")));
+    }
+
+    TEST(ReadOff, tellsBytesFromFractions)
+    {
+        auto const colored = [](std::string const& colors) {
+            return readContent(".off",
+                "STCNOFF\n3 1 0\n0 0 0 1 0 0 " + colors
+                    + " 0.5 0\n1 0 0 0 1 0 0 1\n"
+                      "0 1 0 0 0 1 0 0 1 0 1\n3 0 1 2 1 0 0 1\n")
+                .object;
+        };
+        auto const bytes = colored("255 0 7");
+        EXPECT_THAT(
+            valuesOf<uchar3>(*bytes, "color"), ElementsAre(uchar3{255, 0, 7}, uchar3{255, 255, 255}, uchar3{0, 0, 1}));
+        EXPECT_THAT(valuesOf<uchar4>(*bytes, "face:color"), ElementsAre(uchar4{1, 0, 0, 1}));
+        EXPECT_THAT(valuesOf<float3>(*bytes, "normal"), ElementsAre(float3{1, 0, 0}, float3{0, 1, 0}, float3{0, 0, 1}));
+        EXPECT_THAT(valuesOf<float2>(*bytes, "uv"), ElementsAre(float2{0.5f, 0}, float2{0, 1}, float2{0, 1}));
+        auto const fractions = colored("1. 0 0 0.5");
+        EXPECT_THAT(valuesOf<float4>(*fractions, "color"),
+            ElementsAre(float4{1, 0, 0, 0.5f}, float4{1, 1, 1, 1}, float4{0, 0, 1, 1}));
+    }
+
+    TEST(ReadStl, isBinaryWhereItsLengthSaysSo)
+    {
+        std::string content =
+            "solid, but not as a text is" + std::string(53, ' ') + bytesOf(std::endian::little, std::uint32_t{2});
+        for (float const z : {0.0f, 1.0f})
+            content += bytesOf(std::endian::little, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 1.0f, 0.0f, 0.0f, 0.0f, 1.0f, z,
+                std::uint16_t(z));
+        GeometryFile const file = readContent(".stl", content);
+        EXPECT_EQ(file.format, "STL (binary)");
+        EXPECT_THAT(valuesOf<unsigned int>(*file.object, sFaceVertex), ElementsAre(0u, 1u, 2u, 0u, 1u, 3u));
+        EXPECT_THAT(valuesOf<unsigned short>(*file.object, "attribute"), ElementsAre(0, 1));
+        EXPECT_THAT(refusalOf(".stl", content.substr(1)), HasSubstr("damaged"));
+    }
+
+}
+
+}

@@ -1,0 +1,329 @@
+#include "FileSupport.h"
+
+#include "support/Compare.h"
+
+#include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Lookup.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <csignal>
+#include <limits>
+#include <map>
+#include <sstream>
+#include <sys/resource.h>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using namespace Tessara::Geometry;
+    using namespace Tessara::Math;
+    using testing::ElementsAre;
+    using testing::HasSubstr;
+    using testing::IsEmpty;
+    using TestSupport::sameContents;
+    using Object = Orvan::MutablePtr<Tessara::Object>;
+
+    /// A triangle and a quad that share an edge.
+    Object twoFaces()
+    {
+        return makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 1e-20f}, {1.0f / 3, 2, 123456.789f}},
+            {0, 1, 2, 0, 2, 4, 3}, {0, 3, 7});
+    }
+
+    Object triangle()
+    {
+        return makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}}, {0, 1, 2}, {0, 3});
+    }
+
+    /// Values whose bytes all differ, in every element.
+    template <class T> Orvan::Array<T> someValues(std::uint64_t count)
+    {
+        Orvan::Array<T> values(count);
+        auto* const bytes = reinterpret_cast<unsigned char*>(values.data);
+        for (std::uint64_t i = 0; i < count * sizeof(T); ++i)
+            bytes[i] = static_cast<unsigned char>(i * 7 % 120);
+        return values;
+    }
+
+    Orvan::Ptr<Tessara::Object> propertyOf(Tessara::Object const& object, Orvan::String const& name)
+    {
+        Tessara::PropertyValue const value = object.getProperty(name);
+        auto const* const property = value.get<Orvan::Ptr<Tessara::Object>>();
+        return property ? *property : Orvan::Ptr<Tessara::Object>(Tessara::createObject());
+    }
+
+    TEST(WritePly, bringsPropertiesOfAllTypesBack)
+    {
+        Object const mesh = twoFaces();
+        std::vector<std::string> leftOut;
+        for (auto const& [component, count] : std::map<std::string, std::uint64_t>{{sPointComp, 5}, {sFaceComp, 2}}) {
+            forEachElementTypeName([&]<class T>(ElementType<T> type) {
+                std::string const name = std::string(component == sFaceComp ? "face:" : "") + "a_" + type.name;
+                if constexpr (std::is_trivially_copyable_v<T> && !std::is_same_v<T, bool>) {
+                    addDataProperty<T>(name.c_str(), component.c_str(), someValues<T>(count), *mesh);
+                }
+            });
+        }
+        std::string const unknown[] = {
+            "long", "ulong", "float2x2", "double2x2", "GeometryType", "FaceEdge", "GraphTransforms"};
+        addDataProperty<uchar4>("color", sPointComp, someValues<uchar4>(5), *mesh);
+        addDataProperty<uchar3>("face:color", sFaceComp, someValues<uchar3>(2), *mesh);
+        addDataProperty<double3>("normal", sPointComp, someValues<double3>(5), *mesh);
+        addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(7), *mesh);
+
+        TemporaryFolder const folder;
+        EXPECT_EQ(writeGeometryFile(*mesh, folder / "a.ply").size(), 2 * std::size(unknown));
+        GeometryFile const file = readGeometryFile(folder / "a.ply");
+        EXPECT_THAT(file.notes, IsEmpty());
+        for (std::string const& type : unknown) {
+            mesh->eraseProperty(("a_" + type).c_str());
+            mesh->eraseProperty(("face:a_" + type).c_str());
+        }
+        auto const names = mesh->keys();
+        for (Orvan::String const& name : *names) // in any order
+            EXPECT_TRUE(sameContents(*propertyOf(*file.object, name), *propertyOf(*mesh, name))) << name.view();
+        EXPECT_EQ(file.object->keys()->size, names->size);
+    }
+
+    TEST(WritePly, bringsTheNamesOfColumnsBack)
+    {
+        for (std::string const columns : {"s t", "u v", "texture_u texture_v"}) {
+            std::string header = "element vertex 1\nproperty float x\nproperty float y\nproperty float z\n"
+                                 "property float nx\nproperty float ny\nproperty float nz\n"
+                                 "property float red\nproperty float green\nproperty float blue\n"
+                                 "property short x2\n";
+            std::istringstream names(columns);
+            for (std::string name; names >> name;)
+                header += "property double " + name + "\n";
+            header += "property uchar sPointComp\nproperty list uchar float axis\nend_header\n";
+            GeometryFile const file =
+                readContent(".ply", "ply\nformat ascii 1.0\n" + header + "1 2 3 4 5 6 7 8 9 10 11 12 15 2 13 14\n");
+            EXPECT_EQ(valuesOf<double2>(*file.object, "uv").size(), 1u) << columns;
+            TemporaryFolder const folder;
+            EXPECT_THAT(writeGeometryFile(*file.object, folder / "a.ply"), IsEmpty());
+            EXPECT_THAT(contentOf(folder / "a.ply"), HasSubstr("1.0\n" + header));
+            EXPECT_TRUE(sameContents(*readGeometryFile(folder / "a.ply").object, *file.object));
+        }
+    }
+
+    TEST(WritePly, writesBoolsAsBytesAndLongFaces)
+    {
+        Orvan::Array<unsigned int> corners(300);
+        for (unsigned int corner = 0; corner < 300; ++corner)
+            corners[corner] = corner % 5;
+        Object const mesh = makeMesh(Orvan::Array<float3>(5), corners, {0, 300});
+        addDataProperty<bool>("chosen", sFaceComp, {true}, *mesh);
+        addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(300), *mesh);
+        addDataProperty<int>("two words", sFaceComp, {1}, *mesh);
+        addDataProperty<int>("x", sPointComp, someValues<int>(5), *mesh);
+        TemporaryFolder const folder;
+        EXPECT_THAT(writeGeometryFile(*mesh, folder / "a.ply"),
+            ElementsAre(HasSubstr("\"x\" (int, sPointComp) is left out"), HasSubstr("\"chosen\" is written as uchar"),
+                HasSubstr("\"two words\"")));
+        GeometryFile const file = readGeometryFile(folder / "a.ply");
+        EXPECT_EQ(valuesOf<unsigned char>(*file.object, "chosen"), std::vector<unsigned char>{1});
+        EXPECT_EQ(valuesOf<unsigned int>(*file.object, sFaceVertex).size(), 300u);
+        EXPECT_EQ(valuesOf<float2>(*file.object, "uv"), valuesOf<float2>(*mesh, "uv"));
+    }
+
+    TEST(WriteObj, bringsGeometryBackToTheBit)
+    {
+        Object const mesh = twoFaces();
+        addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(7), *mesh);
+        addDataProperty<float3>("normal", sFaceVertexComp, Orvan::Array<float3>(7, {0, 0.1f, 1}), *mesh);
+        addDataProperty<float3>("color", sPointComp, someValues<float3>(5), *mesh);
+        EXPECT_TRUE(sameContents(*writtenAndRead(*mesh, ".obj").object, *mesh));
+
+        Object const strands = makeStrands({{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {5, 5, 5}}, {0, 3, 4});
+        addDataProperty<float3>("normal", sPointComp, someValues<float3>(4), *strands);
+        EXPECT_TRUE(sameContents(*writtenAndRead(*strands, ".obj").object, *strands));
+        Object const cloud = makePointCloud({{0, 0, 0}, {1, 2, 3}});
+        EXPECT_TRUE(sameContents(*writtenAndRead(*cloud, ".obj").object, *cloud));
+    }
+
+    TEST(WriteObj, sharesEqualCornerValuesAndTakesThoseOfPoints)
+    {
+        Object const mesh = twoFaces();
+        addDataProperty<double2>("uv", sFaceVertexComp, Orvan::Array<double2>(7, {0, 0.1}), *mesh);
+        addDataProperty<float3>("normal", sPointComp, Orvan::Array<float3>(5, {0, 0, 1}), *mesh);
+        addDataProperty<uchar4>("color", sPointComp, Orvan::Array<uchar4>(5, {255, 0, 51, 9}), *mesh);
+        addDataProperty<float>("heat", sPointComp, Orvan::Array<float>(5), *mesh);
+        addDataProperty<int>("part", sFaceComp, Orvan::Array<int>(3), *mesh);
+        addRangeProperty("range", sFaceComp, {0, 0}, *mesh);
+        addDataProperty<int>("of range", "range", {1}, *mesh);
+        TemporaryFolder const folder;
+        EXPECT_THAT(writeGeometryFile(*mesh, folder / "a.obj"),
+            ElementsAre("\"part\" (int, sFaceComp) is left out: it has 3 values for 2 elements",
+                HasSubstr("\"of range\" (int, range) is left out"),
+                HasSubstr("\"color\" is written as three fractions a point"),
+                HasSubstr("\"heat\" (float, sPointComp) is left out")));
+        std::string const content = contentOf(folder / "a.obj");
+        EXPECT_THAT(content, HasSubstr("v 1 0 0 1 0 0.2\n"));
+        EXPECT_THAT(content, HasSubstr("\nvt 0 0.1\nvn "));
+        EXPECT_THAT(content, HasSubstr("f 1/1/1 2/1/2 3/1/3\nf 1/1/1 3/1/3 5/1/5 4/1/4\n"));
+    }
+
+    TEST(WriteStl, bringsTrianglesBack)
+    {
+        Object const mesh = triangle();
+        addDataProperty<unsigned short>("attribute", sFaceComp, {7}, *mesh);
+        EXPECT_TRUE(sameContents(*writtenAndRead(*mesh, ".stl").object, *mesh));
+        TemporaryFolder const folder;
+        writeGeometryFile(*mesh, folder / "a.stl");
+        EXPECT_EQ(contentOf(folder / "a.stl").substr(84, 12), bytesOf(std::endian::little, 0.0f, 0.0f, 1.0f));
+        Object const withLoosePoint = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {2, 2, 2}}, {0, 1, 2}, {0, 3});
+        EXPECT_THAT(
+            writeGeometryFile(*withLoosePoint, folder / "a.stl"), ElementsAre(HasSubstr("1 points of no face")));
+    }
+
+    std::string attributeOf(std::string const& tag, std::string const& name)
+    {
+        std::size_t const begin = tag.find(" " + name + "=\"") + name.size() + 3;
+        return tag.substr(begin, tag.find('"', begin) - begin);
+    }
+
+    /// The bytes of each array of a VTP file, by section, name and type.
+    std::map<std::string, std::string> arraysOf(std::string const& content)
+    {
+        std::map<std::string, std::string> arrays;
+        std::size_t const data = content.find('_', content.find("<AppendedData encoding=\"raw\">")) + 1;
+        std::istringstream xml(content.substr(0, data));
+        std::string section;
+        for (std::string line; std::getline(xml, line);) {
+            std::string const tag = line.substr(std::min(line.size(), line.find('<')));
+            if (tag.find(' ') == std::string::npos)
+                section = tag;
+            if (!tag.starts_with("<DataArray"))
+                continue;
+            std::size_t const begin = data + std::stoul(attributeOf(tag, "offset"));
+            std::uint64_t bytes = 0;
+            std::memcpy(&bytes, content.data() + begin, sizeof(bytes));
+            arrays[section + " " + attributeOf(tag, "Name") + " " + attributeOf(tag, "type") + "x"
+                + attributeOf(tag, "NumberOfComponents")] = content.substr(begin + sizeof(bytes), bytes);
+        }
+        return arrays;
+    }
+
+    template <class T> std::string bytesOfArray(Tessara::Object const& object, char const* name)
+    {
+        auto const array = dataOf<T>(object, name);
+        return {reinterpret_cast<char const*>(array->data), array->size * sizeof(T)};
+    }
+
+    TEST(WriteVtp, holdsNamedArraysOfPointsAndCells)
+    {
+        TemporaryFolder const folder;
+        auto const written = [&](Tessara::Object const& object) {
+            writeGeometryFile(object, folder / "a.vtp");
+            return arraysOf(contentOf(folder / "a.vtp"));
+        };
+        auto const longs = [](auto... numbers) { return bytesOf(std::endian::little, std::int64_t{numbers}...); };
+
+        Object const mesh = twoFaces();
+        addDataProperty<float3>("a<\"b\">&", sPointComp, someValues<float3>(5), *mesh);
+        addDataProperty<unsigned long long>("id", sFaceComp, someValues<unsigned long long>(2), *mesh);
+        addDataProperty<float3x3>("face:id", sFaceComp, someValues<float3x3>(2), *mesh);
+        addDataProperty<bool>("tag", sFaceComp, {true, false}, *mesh);
+        addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(7), *mesh);
+        addDataProperty<Orvan::String>("text", sFaceComp, {"a", "b"}, *mesh);
+        std::map<std::string, std::string> const ofMesh{
+            {"<PointData> a&#60;&#34;b&#34;&#62;&#38; Float32x3", bytesOfArray<float3>(*mesh, "a<\"b\">&")},
+            {"<CellData> id UInt64x1", bytesOfArray<unsigned long long>(*mesh, "id")},
+            {"<CellData> id Float32x9", bytesOfArray<float3x3>(*mesh, "face:id")},
+            {"<CellData> tag UInt8x1", bytesOfArray<bool>(*mesh, "tag")},
+            {"<Points> Points Float32x3", bytesOfArray<float3>(*mesh, sPointPosition)},
+            {"<Polys> connectivity Int64x1", longs(0, 1, 2, 0, 2, 4, 3)}, {"<Polys> offsets Int64x1", longs(3, 7)}};
+        EXPECT_EQ(written(*mesh), ofMesh);
+        EXPECT_THAT(
+            writeGeometryFile(*mesh, folder / "a.vtp"), ElementsAre(HasSubstr("\"text\""), HasSubstr("\"uv\"")));
+
+        Object const strands = makeStrands({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}}, {0, 2, 3});
+        addDataProperty<int>("part", sStrandComp, {4, 5}, *strands);
+        std::map<std::string, std::string> const ofStrands{
+            {"<CellData> part Int32x1", bytesOfArray<int>(*strands, "part")},
+            {"<Points> Points Float32x3", bytesOfArray<float3>(*strands, sPointPosition)},
+            {"<Lines> connectivity Int64x1", longs(0, 1, 2)}, {"<Lines> offsets Int64x1", longs(2, 3)}};
+        EXPECT_EQ(written(*strands), ofStrands);
+
+        Object const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
+        std::map<std::string, std::string> const ofCloud{
+            {"<Points> Points Float32x3", bytesOfArray<float3>(*cloud, sPointPosition)},
+            {"<Verts> connectivity Int64x1", longs(0, 1)}, {"<Verts> offsets Int64x1", longs(1, 2)}};
+        EXPECT_EQ(written(*cloud), ofCloud);
+    }
+
+    TEST(WriteGeometryFile, refusesWhatAFormatCannotHold)
+    {
+        struct Case {
+            Object object;
+            char const* name;
+            char const* refusal;
+        };
+        constexpr float kInfinite = std::numeric_limits<float>::infinity();
+        std::vector<Case> cases;
+        cases.push_back({twoFaces(), "a.stl", "triangles only, but face 1 has 4 corners"});
+        cases.push_back({makePointCloud({{0, 0, 0}}), "a.stl", "triangles only, and this is no mesh"});
+        cases.push_back({makeStrands({{0, 0, 0}}, {0, 1}), "a.ply", "PLY files hold no strands"});
+        cases.push_back({makePointCloud({{0, 0, 0}, {0, kInfinite, 0}}), "a.ply", "point 1 lies nowhere"});
+        cases.push_back({makeMesh({{0, 0, 0}}, {0, 0}, {0, 2}), "a.obj", "face 0 has fewer than three corners"});
+        cases.push_back({makeMesh({{0, 0, 0}}, {0, 0, 7}, {0, 3}), "a.obj", "is not valid: sFaceVertex[2] is 7"});
+        cases.push_back({triangle(), "a.off", "its name ends in none of .obj, .ply, .stl and .vtp"});
+        for (Case const& test : cases) {
+            TemporaryFolder const folder;
+            store(folder / test.name, "old");
+            try {
+                writeGeometryFile(*test.object, folder / test.name);
+                ADD_FAILURE() << "written, but: " << test.refusal;
+            } catch (FileError const& error) {
+                EXPECT_THAT(error.what(), HasSubstr(test.refusal));
+            }
+            EXPECT_EQ(contentOf(folder / test.name), "old");
+            EXPECT_EQ(folder.entryCount(), 1);
+        }
+        EXPECT_TRUE(isWritableFormat("x.PLY"));
+        EXPECT_FALSE(isWritableFormat("x.off"));
+    }
+
+    TEST(WriteGeometryFile, leavesTheOldFileWhereTheDiskFails)
+    {
+        TemporaryFolder const folder;
+        EXPECT_THROW(writeGeometryFile(*triangle(), folder / "none/a.obj"), FileError);
+        std::filesystem::create_symlink("/dev/full", folder / "full.obj");
+        EXPECT_THROW(writeGeometryFile(*triangle(), folder / "full.obj"), FileError);
+        EXPECT_EQ(folder.entryCount(), 1);
+
+        // A file may not grow beyond some bytes here: that is as a disk that becomes full in the middle.
+        store(folder / "a.ply", "old");
+        Object const large = makePointCloud(Orvan::Array<float3>(100'000));
+        rlimit limit{};
+        ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &limit), 0);
+        rlimit const small{600'000, limit.rlim_max};
+        auto* const handler = std::signal(SIGXFSZ, SIG_IGN);
+        ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &small), 0);
+        EXPECT_THROW(writeGeometryFile(*large, folder / "a.ply"), FileError);
+        ::setrlimit(RLIMIT_FSIZE, &limit);
+        std::signal(SIGXFSZ, handler);
+        EXPECT_EQ(contentOf(folder / "a.ply"), "old");
+        EXPECT_EQ(folder.entryCount(), 2);
+    }
+
+    TEST(WriteGeometryFile, replacesWhatALinkLeadsToAndKeepsItsPermissions)
+    {
+        using std::filesystem::perms;
+        TemporaryFolder const folder;
+        store(folder / "real.obj", "old");
+        std::filesystem::permissions(folder / "real.obj", perms::owner_read | perms::owner_write);
+        std::filesystem::create_symlink("real.obj", folder / "link.obj");
+        writeGeometryFile(*triangle(), folder / "link.obj");
+        EXPECT_TRUE(std::filesystem::is_symlink(folder / "link.obj"));
+        EXPECT_THAT(contentOf(folder / "real.obj"), HasSubstr("f 1 2 3"));
+        EXPECT_EQ(std::filesystem::status(folder / "real.obj").permissions(), perms::owner_read | perms::owner_write);
+        EXPECT_EQ(folder.entryCount(), 2);
+    }
+
+}
+
+}
