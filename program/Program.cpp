@@ -20,9 +20,9 @@ namespace {
     constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addRemoveSlivers};
 
     constexpr char kFooter[] =
-        R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply .stl .vtp. OUT may
-be IN: a file is replaced only by a complete one, and is left as it was when anything fails. Results go to standard
-output, messages to standard error.
+        R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply
+.stl .vtp. OUT may be IN: a file is replaced only by a complete one, and is left as it was when
+anything fails. Results go to standard output, messages to standard error.
 
 Exit codes:
   0  done

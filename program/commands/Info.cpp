@@ -95,10 +95,10 @@ void addInfo(CLI::App& program, Invocation& invocation)
 {
     auto const file = std::make_shared<std::filesystem::path>();
     constexpr CommandHelp kHelp = {"info", "Tell what a file holds, and how the faces of a mesh hang together",
-        R"(Open edges have one face, non-manifold ones more than two. A winding conflict is an edge that faces pass in the same
-direction. At a pinched point there are faces that share the point, but do not hang together by edges there. The genus is
-given for closed manifolds, summed over the parts. A sliver below 0.1 is a face whose shortest edge is shorter than 0.1
-times its longest one.)",
+        R"(Open edges have one face, non-manifold ones more than two. A winding conflict is an edge that faces
+pass in the same direction. At a pinched point there are faces that share the point, but do not hang
+together by edges there. The genus is given for closed manifolds, summed over the parts. A sliver
+below 0.1 is a face whose shortest edge is shorter than 0.1 times its longest one.)",
         "  modeling info bunny.obj\n"
         "  modeling info bunny.obj --json | jq .topology.openEdges"};
     CLI::App& command = addCommand(kHelp, program, invocation);

@@ -82,9 +82,10 @@ void addRemoveSlivers(CLI::App& program, Invocation& invocation)
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"remove-slivers",
         "Collapse the needle-shaped faces of a closed manifold mesh of triangles",
-        R"(A face is a needle when its shortest edge is shorter than the ratio times its longest one. A collapse takes one point
-and two faces; it is left out where it would change the topology or turn a face over, so that some needles may stay.
-Points and faces are renumbered, and properties other than the positions are dropped, unless nothing collapses.)",
+        R"(A face is a needle when its shortest edge is shorter than the ratio times its longest one. A
+collapse takes one point and two faces; it is left out where it would change the topology or turn a
+face over, so that some needles may stay. Points and faces are renumbered, and properties other than
+the positions are dropped, unless nothing collapses.)",
         "  modeling remove-slivers part.stl clean.stl\n"
         "  modeling remove-slivers scan.ply scan.ply --ratio 0.1 --json"};
     CLI::App& command = addCommand(kHelp, program, invocation);

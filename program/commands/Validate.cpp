@@ -35,8 +35,9 @@ void addValidate(CLI::App& program, Invocation& invocation)
 {
     auto const file = std::make_shared<std::filesystem::path>();
     constexpr CommandHelp kHelp = {"validate", "Tell whether a file holds valid geometry",
-        R"(Valid means that arrays fit their counts, offsets ascend, and indices are in range. What is odd in further properties
-is a warning. How faces hang together does not matter here: "modeling info" tells that.)",
+        R"(Valid means that arrays fit their counts, offsets ascend, and indices are in range. What is odd in
+further properties is a warning. How faces hang together does not matter here: "modeling info" tells
+that.)",
         "  modeling validate part.stl"};
     CLI::App& command = addCommand(kHelp, program, invocation);
     addFile("FILE", "File to read", *file, command);

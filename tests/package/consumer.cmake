@@ -14,12 +14,13 @@ if(SANITIZE)
     list(APPEND flags -DCMAKE_CXX_FLAGS=-fsanitize=${SANITIZE})
 endif()
 
-function(run_consumer folder)
+# `library_path` is where a host that is installed elsewhere has its libraries; empty when all stand in one place.
+function(run_consumer folder library_path)
     list(JOIN ARGN ":" prefixes)
     run(${CMAKE_COMMAND} -E env CMAKE_PREFIX_PATH=${prefixes}
         ${CMAKE_COMMAND} -S ${CMAKE_CURRENT_LIST_DIR}/consumer -B ${folder} ${flags})
     run(${CMAKE_COMMAND} --build ${folder})
-    run(${folder}/consumer)
+    run(${CMAKE_COMMAND} -E env LD_LIBRARY_PATH=${library_path} ${folder}/consumer)
     if(NOT output MATCHES "6 points, 8 faces")
         message(FATAL_ERROR "the consumer said: ${output}")
     endif()

@@ -39,6 +39,7 @@ private:
 
 inline void store(std::filesystem::path const& file, std::string_view content)
 {
+    std::filesystem::remove(file); // for writing over it can wait for the disk
     std::ofstream(file, std::ios::binary) << content;
 }
 

@@ -59,12 +59,13 @@ namespace {
     {
         Object const mesh = twoFaces();
         std::vector<std::string> leftOut;
-        for (auto const& [component, count] : std::map<std::string, std::uint64_t>{{sPointComp, 5}, {sFaceComp, 2}}) {
+        for (std::string const prefix : {"", "face:"}) {
+            char const* const component = prefix.empty() ? sPointComp : sFaceComp;
             forEachElementTypeName([&]<class T>(ElementType<T> type) {
-                std::string const name = std::string(component == sFaceComp ? "face:" : "") + "a_" + type.name;
-                if constexpr (std::is_trivially_copyable_v<T> && !std::is_same_v<T, bool>) {
-                    addDataProperty<T>(name.c_str(), component.c_str(), someValues<T>(count), *mesh);
-                }
+                std::string const name = prefix + "a_" + type.name;
+                if constexpr (std::is_trivially_copyable_v<T> && !std::is_same_v<T, bool>)
+                    addDataProperty<T>(
+                        name.c_str(), component, someValues<T>(getElementCount(*mesh, component)), *mesh);
             });
         }
         std::string const unknown[] = {
