@@ -3,6 +3,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdio>
 
 namespace ModelingProgram {
@@ -72,6 +73,11 @@ void Report::warn(std::string const& sentence)
 std::string toText(Json const& document)
 {
     return document.dump(2, ' ', false, Json::error_handler_t::replace);
+}
+
+Json numberOf(float value)
+{
+    return std::isfinite(value) ? Json::parse(fmt::format("{}", value)) : Json();
 }
 
 std::string groupDigits(std::uint64_t number)

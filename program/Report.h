@@ -26,6 +26,8 @@ public:
 /// The document as it is printed. Bytes that are no UTF-8 (names in files may hold any) become replacement characters.
 std::string toText(Json const& document);
 
+/// With the fewest digits from which the same number is read; null where it is not finite.
+Json numberOf(float value);
 /// 1234567 as "1,234,567".
 std::string groupDigits(std::uint64_t number);
 /// "1 edge", "1,234 edges".

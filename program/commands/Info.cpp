@@ -37,7 +37,8 @@ namespace {
     {
         if (!box)
             return {};
-        return {{"min", {box->min.x, box->min.y, box->min.z}}, {"max", {box->max.x, box->max.y, box->max.z}}};
+        auto const numbersOf = [](float3 const& p) { return Json{numberOf(p.x), numberOf(p.y), numberOf(p.z)}; };
+        return {{"min", numbersOf(box->min)}, {"max", numbersOf(box->max)}};
     }
 
     std::string formatBox(std::optional<BoundingBox> const& box)

@@ -71,7 +71,7 @@ namespace {
 
         Json const after = describeMesh(result, analyseTopology(arraysOf(result)), options.ratio);
         saveGeometry(result, options.out, report);
-        report.document["ratio"] = options.ratio;
+        report.document["ratio"] = numberOf(options.ratio);
         reportOperation(before, after, dropped, report);
     }
 

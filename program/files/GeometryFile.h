@@ -9,7 +9,8 @@
 
 namespace ModelingProgram {
 
-/// A file that cannot be read or written: the text names the file, and the line or element where there is one.
+/// A file that cannot be read or written: the text names the file, and the line (counted from 1) or element (counted
+/// from 0) where there is one.
 class FileError : public std::runtime_error {
 public:
     using std::runtime_error::runtime_error;
@@ -29,10 +30,10 @@ GeometryFile readGeometryFile(std::filesystem::path const& file);
 
 /// Writes OBJ, PLY (binary, little endian), STL (binary) and VTP files. The file appears under its name only when it is
 /// complete: it is written beside it first. An existing file is replaced.
-/// \return what the format cannot hold and was therefore dropped, a sentence each
-/// \throws FileError  where the file cannot be written, or the format cannot hold the kind of geometry at all; a file
-/// of
-///                    that name is then as it was
+/// \return what the format cannot hold and was therefore dropped or written in another form, a sentence each
+/// \throws FileError  where the file cannot be written, the format cannot hold the kind of geometry at all, or the
+///                    geometry is not valid, has positions that are not finite or faces of fewer than three corners; a
+///                    file of that name is then as it was
 std::vector<std::string> writeGeometryFile(Tessara::Object const& object, std::filesystem::path const& file);
 
 /// Whether `writeGeometryFile` knows the extension: asked before work is done that could not be kept.

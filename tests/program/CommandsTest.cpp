@@ -63,6 +63,7 @@ TEST_F(Commands, RemoveSliversKeepsClosedManifolds)
     copySample("cylinder.obj");
     json const done = runForJson("remove-slivers cylinder.obj out.ply --ratio 0.1");
     EXPECT_EQ(done["exitCode"], 0);
+    EXPECT_EQ(done["ratio"], 0.1);
     EXPECT_EQ(done["before"]["slivers"], 64);
     EXPECT_EQ(done["before"]["faces"], 256);
     EXPECT_LT(done["after"]["faces"], 256);
@@ -144,15 +145,15 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
 TEST_F(Commands, InfoAndValidateTellAboutFiles)
 {
     copySample("mixed.obj");
-    write(folder / "lines.obj", "v 0 0 0\nv 1 0 -2\nl 1 2\n");
+    write(folder / "lines.obj", "v 0 0 0\nv 0.1 0 -2\nl 1 2\n");
     json const topology = runForJson("info mixed.obj")["topology"];
     EXPECT_EQ(topology["quads"], 6);
     EXPECT_EQ(topology["genus"], 0);
     json const lines = runForJson("info lines.obj");
     EXPECT_EQ(lines["inputs"][0]["kind"], "strand set");
-    EXPECT_EQ(lines["boundingBox"], json({{"min", {0, 0, -2}}, {"max", {1, 0, 0}}}));
+    EXPECT_EQ(lines["boundingBox"], json({{"min", {0, 0, -2}}, {"max", {0.1, 0, 0}}}));
     EXPECT_FALSE(lines.contains("topology"));
-    EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (1, 0, 0)"));
+    EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (0.1, 0, 0)"));
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
     for (char const* const help : {"--help", "info --help", "validate -h", "remove-slivers --help", "--version"})
