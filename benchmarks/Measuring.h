@@ -4,7 +4,9 @@
 
 #include <benchmark/benchmark.h>
 
+#include <cstdint>
 #include <cstring>
+#include <functional>
 
 // Names tell how the table relates its rows: "<name>/<size>" is compared with "<name>:memcpy/<size>", which copies the
 // bytes of the same input into fresh memory on one thread, and with "<name>:<peer>/<size>".
@@ -23,6 +25,9 @@ inline void copyBytes(benchmark::State& state, std::size_t bytes)
     }
     state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
 }
+
+/// The most memory that the work has taken through `operator new` at one time, beyond what was taken before it.
+std::int64_t peakBytesOf(std::function<void()> const& work);
 
 /// Reports the wall time for each element.
 inline void countElements(benchmark::State& state, std::size_t elements)

@@ -10,7 +10,8 @@
 #include "support/MeshBuilder.h"
 
 #include <Modeling/removeSlivers.h>
-#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Names.h>
 
 #include <unordered_map>
 
@@ -36,6 +37,11 @@ std::size_t facesOf(benchmark::State const& state)
     return static_cast<std::size_t>(state.range(0));
 }
 
+std::size_t bytesOf(std::size_t pointCount, std::size_t faceCount)
+{
+    return pointCount * sizeof(float3) + faceCount * 4 * sizeof(unsigned int); // corners and offsets
+}
+
 void removeSliversOfSphere(benchmark::State& state)
 {
     auto const source = needledSphere(facesOf(state)).build();
@@ -50,6 +56,14 @@ void removeSliversOfSphere(benchmark::State& state)
         state.ResumeTiming();
     }
     Benchmarks::countElements(state, facesOf(state));
+
+    Tessara::Object mesh = *source;
+    std::int64_t const peak = Benchmarks::peakBytesOf([&] { Geometry::Mesh::removeSlivers(kRatio, mesh); });
+    auto const pointCount = Tessara::Geometry::getElementCount(mesh, Tessara::Geometry::sPointComp);
+    auto const faceCount = Tessara::Geometry::getElementCount(mesh, Tessara::Geometry::sFaceComp);
+    auto const resultBytes = static_cast<std::int64_t>(bytesOf(pointCount, faceCount));
+    state.counters["working bytes/element"] =
+        static_cast<double>(peak - resultBytes) / static_cast<double>(state.range(0));
 }
 
 /// What cannot be done without: adjacency, normals and one measuring sweep over flat arrays, and the copy that is
@@ -98,7 +112,7 @@ void flatPasses(benchmark::State& state)
 void copyMesh(benchmark::State& state)
 {
     MeshBuilder const& mesh = needledSphere(facesOf(state));
-    Benchmarks::copyBytes(state, mesh.points.size() * sizeof(float3) + mesh.faces.size() * 4 * sizeof(unsigned int));
+    Benchmarks::copyBytes(state, bytesOf(mesh.points.size(), mesh.faces.size()));
     Benchmarks::countElements(state, facesOf(state));
 }
 

@@ -9,6 +9,7 @@ function(ask_git result)
     if(GIT AND EXISTS ${SOURCE_DIR}/.git)
         execute_process(COMMAND ${GIT} ${ARGN} WORKING_DIRECTORY ${SOURCE_DIR}
             OUTPUT_VARIABLE answer OUTPUT_STRIP_TRAILING_WHITESPACE ERROR_QUIET RESULT_VARIABLE failed)
+        string(REGEX REPLACE "[^A-Za-z0-9._/+-]" "_" answer "${answer}") # a branch may be called anything
         if(NOT failed AND answer)
             set(${result} ${answer} PARENT_SCOPE)
         endif()
@@ -31,4 +32,10 @@ inline constexpr char const* kBranch = \"${branch}\";
 
 }
 ")
-file(CONFIGURE OUTPUT ${OUTPUT} CONTENT "${content}" @ONLY)
+set(present "")
+if(EXISTS ${OUTPUT})
+    file(READ ${OUTPUT} present)
+endif()
+if(NOT content STREQUAL present)
+    file(WRITE ${OUTPUT} "${content}")
+endif()

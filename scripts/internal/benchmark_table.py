@@ -28,12 +28,14 @@ def main(path):
             own[operation, size] = run
     context = report["context"]
     print(f"{context['num_cpus']} cores at {context['mhz_per_cpu']} MHz, {context['date']}, load {context['load_avg'][:1]}\n")
-    print("| benchmark | size | time | an element | times as long as |\n|---|---|---|---|---|")
+    print("| benchmark | size | time | an element | working memory an element | times as long as |\n|---|---|---|---|---|---|")
     for (operation, size), run in own.items():
         time = nanoseconds(run)
         element = run.get("time/element")
+        memory = run.get("working bytes/element")
         ratios = ", ".join(f"{peer}: {time / other:.2f}" for peer, other in peers.get((operation, size), []))
-        print(f"| {operation} | {size} | {readable(time)} | {readable(element * 1e9) if element else ''} | {ratios} |")
+        print(f"| {operation} | {size} | {readable(time)} | {readable(element * 1e9) if element else ''}"
+              f" | {f'{memory:.3g} bytes' if memory else ''} | {ratios} |")
 
 
 main(sys.argv[1])

@@ -7,10 +7,16 @@
 
 #include <TessaraGeometry/Elements.h>
 
+#include <algorithm>
 #include <array>
 #include <atomic>
-#include <memory>
+#include <compare>
+#include <cstring>
+#include <functional>
+#include <iterator>
+#include <limits>
 #include <optional>
+#include <utility>
 #include <vector>
 
 namespace Geometry::Mesh {
@@ -48,8 +54,7 @@ namespace {
         IndexArray faceVertex;
         Orvan::Array<Triangle> adjacency; // the faces across a face's edges
         IndexArray valence; // faces around each point; a fan that is no longer is not all around its point
-        Orvan::Array<unsigned char>
-            isDue; // faces to be measured: those that qualified at first, and those changed since
+        Orvan::Array<unsigned char> isDue; // faces to measure: those that qualified at first, and those changed since
         std::vector<unsigned int> removedFaces;
         std::vector<unsigned int> removedPoints;
 
@@ -64,15 +69,15 @@ namespace {
         unsigned int entry;
     };
 
-    /// An edge that may collapse, from `start` to `end`, and the faces around both ends.
+    /// An edge that may collapse, its two faces, and the faces around both of its ends, which stay.
     struct EdgeFans {
-        unsigned int face = 0; // whose edge it is
-        unsigned int edge = 0;
-        unsigned int across = 0; // the face on the other side
-        unsigned int start = 0;
+        FanFace face{}; // around `start`
+        FanFace across{}; // around `end`, on the other side of the edge
+        unsigned int start = 0; // the point that stays, and moves to the midpoint
         unsigned int end = 0;
-        std::vector<FanFace> startFan; // from behind `face` up to and including `across`
-        std::vector<FanFace> endFan; // from behind `across` up to and including `face`
+        float3 midpoint{};
+        std::vector<FanFace> startFan; // from behind `face` up to but excluding `across`
+        std::vector<FanFace> endFan; // from behind `across` up to but excluding `face`
         std::vector<unsigned int> startRing, endRing, sharedRing; // the points around the ends, without the other end
     };
 
@@ -256,49 +261,47 @@ namespace {
         return neighbours[0] == neighbour ? 0 : neighbours[1] == neighbour ? 1 : 2;
     }
 
-    /// Lists the faces around `center`, from behind `first` (left through `edge`) up to and including `last`.
-    /// False unless the fan closes and holds all faces of the point: around boundaries and non-manifold points it does
-    /// not.
-    bool collectFan(CollapsingMesh const& mesh, unsigned int center, FanFace const& first, unsigned int last,
-        std::vector<FanFace>& fan)
+    /// The face around the same point behind `current`. Nothing at a boundary, and where faces do not fit together.
+    std::optional<FanFace> nextAround(CollapsingMesh const& mesh, FanFace const& current)
+    {
+        unsigned int const face = mesh.adjacency[current.face][previous(current.entry)];
+        if (face == kInvalidIndex || mesh.isRemoved(face))
+            return std::nullopt;
+        unsigned int const entry = neighbourIndex(mesh, face, current.face);
+        bool const isMutual = mesh.adjacency[face][entry] == current.face
+            && mesh.corners(face)[entry] == mesh.corners(current.face)[current.entry];
+        return isMutual ? std::optional<FanFace>({face, entry}) : std::nullopt;
+    }
+
+    /// Lists the faces around a point that lie between two neighbouring faces, behind `first` and before `last`.
+    /// False unless the fan closes and holds all faces of the point, which it does not around boundaries and
+    /// non-manifold points, and unless `accept` takes each of the listed faces: with the first that it does not the
+    /// walk ends, so that collapses at a hub are refused without going all around it.
+    template <class Accept> bool collectFan(CollapsingMesh const& mesh, FanFace const& first, FanFace const& last,
+        Accept const& accept, std::vector<FanFace>& fan)
     {
         fan.clear();
         FanFace current = first;
-        for (unsigned int left = mesh.valence[center]; left > 1; --left) {
-            unsigned int const face = mesh.adjacency[current.face][previous(current.entry)];
-            if (face == kInvalidIndex || face == first.face || mesh.isRemoved(face))
+        for (unsigned int left = mesh.valence[mesh.corners(first.face)[first.entry]]; left > 1; --left) {
+            std::optional<FanFace> const around = nextAround(mesh, current);
+            if (!around || around->face == first.face)
                 return false;
-            unsigned int const entry = neighbourIndex(mesh, face, current.face);
-            if (mesh.corners(face)[entry] != center)
+            if (around->face == last.face)
+                return left == 2 && mesh.adjacency[around->face][previous(around->entry)] == first.face;
+            if (!accept(*around))
                 return false;
-            current = {face, entry};
-            fan.push_back(current);
+            fan.push_back(*around);
+            current = *around;
         }
-        return !fan.empty() && fan.back().face == last
-            && mesh.adjacency[current.face][previous(current.entry)] == first.face;
+        return false;
     }
 
-    bool collectFans(CollapsingMesh const& mesh, unsigned int face, unsigned int edge, EdgeFans& fans)
+    /// The points around an end of the edge, without the other end, ascending. The fan lacks
+    /// the face that closes it.
+    void collectRing(CollapsingMesh const& mesh, std::vector<FanFace> const& fan, unsigned int thirdPointOfLast,
+        std::vector<unsigned int>& ring)
     {
-        fans.face = face;
-        fans.edge = edge;
-        fans.across = mesh.adjacency[face][edge];
-        if (fans.across == kInvalidIndex || fans.across == face || mesh.isRemoved(fans.across))
-            return false;
-        fans.start = mesh.corners(face)[edge];
-        fans.end = mesh.corners(face)[next(edge)];
-        if (fans.start == fans.end)
-            return false;
-        unsigned int const edgeAcross = neighbourIndex(mesh, fans.across, face);
-        return mesh.corners(fans.across)[edgeAcross] == fans.end
-            && collectFan(mesh, fans.start, {face, edge}, fans.across, fans.startFan)
-            && collectFan(mesh, fans.end, {fans.across, edgeAcross}, face, fans.endFan);
-    }
-
-    /// The points around an end of the edge, without the other end, ascending.
-    void collectRing(CollapsingMesh const& mesh, std::vector<FanFace> const& fan, std::vector<unsigned int>& ring)
-    {
-        ring.clear();
+        ring.assign(1, thirdPointOfLast);
         for (FanFace const& around : fan)
             ring.push_back(mesh.corners(around.face)[next(around.entry)]);
         std::sort(ring.begin(), ring.end());
@@ -308,8 +311,10 @@ namespace {
     /// 3: that collapse would close up a tetrahedron.
     bool collapseKeepsLink(CollapsingMesh const& mesh, EdgeFans& fans)
     {
-        collectRing(mesh, fans.startFan, fans.startRing);
-        collectRing(mesh, fans.endFan, fans.endRing);
+        unsigned int const third = mesh.corners(fans.face.face)[previous(fans.face.entry)];
+        unsigned int const thirdAcross = mesh.corners(fans.across.face)[previous(fans.across.entry)];
+        collectRing(mesh, fans.startFan, thirdAcross, fans.startRing);
+        collectRing(mesh, fans.endFan, third, fans.endRing);
         if (fans.startRing.size() == 2 && fans.endRing.size() == 2)
             return false;
         fans.sharedRing.clear();
@@ -344,20 +349,26 @@ namespace {
         return !(dot(newNormal, originalNormal(original, around.face)) <= 0);
     }
 
-    float3 midpointOf(CollapsingMesh const& mesh, EdgeFans const& fans)
+    /// Whether the edge has a face on both sides, both ends have closed fans, and no face around them turns over.
+    bool collectFans(TriangleMesh const& original, CollapsingMesh const& mesh, FanFace const& face, EdgeFans& fans)
     {
-        return (mesh.positions[fans.start] + mesh.positions[fans.end]) * 0.5f;
-    }
-
-    bool collapseKeepsOrientation(TriangleMesh const& original, CollapsingMesh const& mesh, EdgeFans const& fans)
-    {
-        float3 const midpoint = midpointOf(mesh, fans);
-        auto const keepsIt = [&](FanFace const& around) {
+        unsigned int const across = mesh.adjacency[face.face][face.entry];
+        if (across == kInvalidIndex || across == face.face || mesh.isRemoved(across))
+            return false;
+        fans.face = face;
+        fans.across = {across, neighbourIndex(mesh, across, face.face)};
+        fans.start = mesh.corners(face.face)[face.entry];
+        fans.end = mesh.corners(face.face)[next(face.entry)];
+        bool const isMutual = mesh.adjacency[across][fans.across.entry] == face.face
+            && mesh.corners(across)[fans.across.entry] == fans.end;
+        if (!isMutual || fans.start == fans.end)
+            return false;
+        fans.midpoint = (mesh.positions[fans.start] + mesh.positions[fans.end]) * 0.5f;
+        auto const keepsOrientation = [&, midpoint = fans.midpoint](FanFace const& around) {
             return faceKeepsOrientation(original, mesh, around, midpoint);
         };
-        // The last face of either fan is one of the two that go.
-        return std::all_of(fans.startFan.begin(), fans.startFan.end() - 1, keepsIt)
-            && std::all_of(fans.endFan.begin(), fans.endFan.end() - 1, keepsIt);
+        return collectFan(mesh, fans.face, fans.across, keepsOrientation, fans.startFan)
+            && collectFan(mesh, fans.across, fans.face, keepsOrientation, fans.endFan);
     }
 
     void replaceNeighbour(unsigned int face, unsigned int from, unsigned int to, CollapsingMesh& mesh)
@@ -371,20 +382,21 @@ namespace {
     /// Joins the faces on both sides of the two faces that go.
     void glueHoles(EdgeFans const& fans, CollapsingMesh& mesh)
     {
-        unsigned int const f = fans.face;
-        unsigned int const g = fans.across;
-        unsigned int const j = neighbourIndex(mesh, g, f);
+        auto const [f, edge] = fans.face;
+        auto const [g, edgeAcross] = fans.across;
         // All four are read before anything changes.
-        unsigned int const x = mesh.adjacency[f][next(fans.edge)];
-        unsigned int const y = mesh.adjacency[f][previous(fans.edge)];
-        unsigned int const s = mesh.adjacency[g][next(j)];
-        unsigned int const t = mesh.adjacency[g][previous(j)];
-        replaceNeighbour(x, f, y, mesh);
-        replaceNeighbour(y, f, x, mesh);
-        replaceNeighbour(t, g, s, mesh);
-        replaceNeighbour(s, g, t, mesh);
+        unsigned int const behindEnd = mesh.adjacency[f][next(edge)];
+        unsigned int const behindStart = mesh.adjacency[f][previous(edge)];
+        unsigned int const acrossBehindStart = mesh.adjacency[g][next(edgeAcross)];
+        unsigned int const acrossBehindEnd = mesh.adjacency[g][previous(edgeAcross)];
+        replaceNeighbour(behindEnd, f, behindStart, mesh);
+        replaceNeighbour(behindStart, f, behindEnd, mesh);
+        replaceNeighbour(acrossBehindEnd, g, acrossBehindStart, mesh);
+        replaceNeighbour(acrossBehindStart, g, acrossBehindEnd, mesh);
     }
 
+    /// Marks a face of the edge as removed. It still has the end of the edge at a corner, which counts for the start
+    /// now.
     void removeFace(unsigned int face, EdgeFans const& fans, CollapsingMesh& mesh)
     {
         unsigned int* const corners = mesh.corners(face);
@@ -396,15 +408,15 @@ namespace {
 
     void collapseEdge(EdgeFans const& fans, CollapsingMesh& mesh)
     {
-        mesh.positions[fans.start] = midpointOf(mesh, fans);
+        mesh.positions[fans.start] = fans.midpoint;
         mesh.removedPoints.push_back(fans.end);
-        for (auto around = fans.endFan.begin(); around != fans.endFan.end() - 1; ++around)
-            std::replace(mesh.corners(around->face), mesh.corners(around->face) + 3, fans.end, fans.start);
+        for (FanFace const& around : fans.endFan)
+            std::replace(mesh.corners(around.face), mesh.corners(around.face) + 3, fans.end, fans.start);
         glueHoles(fans, mesh);
 
         mesh.valence[fans.start] += std::exchange(mesh.valence[fans.end], 0);
-        removeFace(fans.face, fans, mesh);
-        removeFace(fans.across, fans, mesh);
+        removeFace(fans.face.face, fans, mesh);
+        removeFace(fans.across.face, fans, mesh);
         for (std::vector<FanFace> const* const fan : {&fans.startFan, &fans.endFan})
             for (FanFace const& around : *fan)
                 mesh.isDue[around.face] = 1;
@@ -418,8 +430,8 @@ namespace {
             if (mesh.isRemoved(face))
                 continue;
             EdgeLengths const lengths = measureEdges(mesh.corners(face), mesh.positions.data);
-            if (isSliver(lengths, ratio) && collectFans(mesh, face, lengths.shortestEdge, fans)
-                && collapseKeepsLink(mesh, fans) && collapseKeepsOrientation(original, mesh, fans))
+            if (isSliver(lengths, ratio) && collectFans(original, mesh, {face, lengths.shortestEdge}, fans)
+                && collapseKeepsLink(mesh, fans))
                 collapseEdge(fans, mesh);
         }
     }
@@ -459,7 +471,8 @@ namespace {
         std::uint64_t faceCount = mesh.faceVertex.size / 3;
         for (unsigned int const hole : mesh.removedFaces) {
             --faceCount;
-            std::copy_n(mesh.corners(static_cast<unsigned int>(faceCount)), 3, mesh.corners(hole));
+            if (hole != faceCount)
+                std::copy_n(mesh.corners(static_cast<unsigned int>(faceCount)), 3, mesh.corners(hole));
         }
         mesh.faceVertex.resize(3 * faceCount);
     }

@@ -4,6 +4,9 @@
 
 #include <tbb/task_arena.h>
 
+#include <algorithm>
+#include <functional>
+
 namespace Modeling {
 
 namespace {

@@ -53,7 +53,7 @@ void PreparedWrites::writeValue(Orvan::String const& key, PropertyValue&& data)
     writes_.push_back({key, 0, std::move(changed)});
 }
 
-void PreparedWrites::commit() noexcept
+void PreparedWrites::commit()
 {
     for (Write& write : writes_) {
         if (write.property)

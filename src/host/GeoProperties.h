@@ -56,8 +56,9 @@ public:
         writeValue(key, std::move(data));
     }
 
-    /// Makes the changes in the order in which they were added.
-    void commit() noexcept;
+    /// Makes the changes in the order in which they were added. Takes no memory with a host that replaces the value of a
+    /// present key, and the count of a component that is not shared, without taking any; the stand-ins do.
+    void commit();
 
 private:
     struct Write {
@@ -77,12 +78,12 @@ private:
 ///
 /// An array that is merely read from an object is shared with it, and making it mutable would copy it. So the property
 /// first lets go of it, and gets it back afterwards, also when `edit` throws; the memory for that is taken beforehand.
-/// \return false, with nothing called, where the key holds no data property of that type
+/// \return false, with nothing called, where the key is empty or holds no data property of that type
 template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Tessara::Object& object, Edit&& edit)
 {
     using SharedArray = Orvan::Ptr<Orvan::Array<T>>;
     SharedArray shared = readGeoPropData<T>(object, key);
-    if (!shared)
+    if (!shared || key.empty())
         return false;
 
     struct PutBack {

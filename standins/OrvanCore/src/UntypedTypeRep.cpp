@@ -1,6 +1,7 @@
 #include <OrvanCore/UntypedTypeRep.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstddef>
 #include <limits>
 #include <new>
@@ -40,8 +41,11 @@ void* UntypedTypeRep::allocate(std::uint64_t count) const
     if (bytes == 0)
         return nullptr;
     void* const block = ::operator new(bytes, blockAlignment(*this, bytes));
-    if (bytes >= kHugeBlock)
+    if (bytes >= kHugeBlock) {
+        int const before = errno;
         ::madvise(block, bytes, MADV_HUGEPAGE); // advice only: where it is refused, small pages do
+        errno = before;
+    }
     return block;
 }
 

@@ -21,6 +21,13 @@ namespace {
         }
     }
 
+    /// Whether it belongs to a target: data and ranges do.
+    bool hasTarget(Object const& geoProperty)
+    {
+        return Object::isA(geoProperty, *getDataGeoPropPrototype(sGenericDataGeoProp))
+            || Object::isA(geoProperty, *getRangeGeoPropPrototype());
+    }
+
     Orvan::Ptr<Object> geoPropertyOf(Object const& object, Orvan::String const& name, Object const& prototype)
     {
         Orvan::Ptr<Object> const geoProperty = objectAt(object, name);
@@ -53,7 +60,7 @@ Orvan::Array<Orvan::String> getGeoPropNamesByTarget(Object const& object, Orvan:
 {
     Orvan::Array<Orvan::String> names;
     forEachObjectIn(object, [&](Orvan::String const& name, Orvan::Ptr<Object> const& geoProperty) {
-        if (Internal::valueOf<Orvan::String>(*geoProperty, sTarget) == target)
+        if (hasTarget(*geoProperty) && Internal::valueOf<Orvan::String>(*geoProperty, sTarget) == target)
             names.append(name);
     });
     return names;
@@ -62,8 +69,9 @@ Orvan::Array<Orvan::String> getGeoPropNamesByTarget(Object const& object, Orvan:
 Orvan::String getGeoPropTargetName(Object const& object, Orvan::String const& name)
 {
     Orvan::Ptr<Object> const geoProperty = objectAt(object, name);
-    return geoProperty ? Internal::valueOf<Orvan::String>(*geoProperty, sTarget).value_or(Orvan::String())
-                       : Orvan::String();
+    return geoProperty && hasTarget(*geoProperty)
+        ? Internal::valueOf<Orvan::String>(*geoProperty, sTarget).value_or(Orvan::String())
+        : Orvan::String();
 }
 
 Orvan::String getTargetComponent(Object const& object, Orvan::String const& name)

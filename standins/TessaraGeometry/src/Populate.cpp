@@ -17,32 +17,39 @@ namespace {
 
 void populateMesh(Object& object)
 {
-    addComponent(sPointComp, 0, object);
-    addComponent(sFaceVertexComp, 0, object);
-    addComponent(sFaceComp, 0, object);
-    addStandardData<Math::float3>(sPointPosition, sPointComp, {}, object);
-    addStandardData<unsigned int>(sFaceVertex, sFaceVertexComp, {}, object);
-    addStandardData<unsigned int>(sFaceOffset, sFaceComp, {0}, object);
+    Object populated = object;
+    addComponent(sPointComp, 0, populated);
+    addComponent(sFaceVertexComp, 0, populated);
+    addComponent(sFaceComp, 0, populated);
+    addStandardData<Math::float3>(sPointPosition, sPointComp, {}, populated);
+    addStandardData<unsigned int>(sFaceVertex, sFaceVertexComp, {}, populated);
+    addStandardData<unsigned int>(sFaceOffset, sFaceComp, {0}, populated);
+    object = std::move(populated);
 }
 
 void populatePointCloud(Object& object)
 {
-    addComponent(sPointComp, 0, object);
-    addStandardData<Math::float3>(sPointPosition, sPointComp, {}, object);
+    Object populated = object;
+    addComponent(sPointComp, 0, populated);
+    addStandardData<Math::float3>(sPointPosition, sPointComp, {}, populated);
+    object = std::move(populated);
 }
 
 void populateStrand(Object& object)
 {
-    addComponent(sPointComp, 0, object);
-    addComponent(sStrandComp, 0, object);
-    addStandardData<Math::float3>(sPointPosition, sPointComp, {}, object);
-    addStandardData<unsigned int>(sStrandOffset, sStrandComp, {0}, object);
+    Object populated = object;
+    addComponent(sPointComp, 0, populated);
+    addComponent(sStrandComp, 0, populated);
+    addStandardData<Math::float3>(sPointPosition, sPointComp, {}, populated);
+    addStandardData<unsigned int>(sStrandOffset, sStrandComp, {0}, populated);
+    object = std::move(populated);
 }
 
 void populateComponentGeoProperty(unsigned int count, Object& component)
 {
-    component.eraseAllProperties();
-    component.setProperty(Internal::sElementCount, count);
+    Object populated;
+    populated.setProperty(Internal::sElementCount, count);
+    component = std::move(populated);
 }
 
 void populateTag(Orvan::String const& target, Orvan::Ptr<Orvan::Array<bool>> const& values, Object& tag)
@@ -55,9 +62,10 @@ bool populateRangeGeoProperty(
 {
     if (!indices)
         return false;
-    range.eraseAllProperties();
-    range.setProperty(sIndices, std::move(indices));
-    range.setProperty(sTarget, Orvan::String(target));
+    Object populated;
+    populated.setProperty(sIndices, std::move(indices));
+    populated.setProperty(sTarget, Orvan::String(target));
+    range = std::move(populated);
     return true;
 }
 

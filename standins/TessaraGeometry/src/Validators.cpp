@@ -7,6 +7,7 @@
 #include "GeoProps.h"
 
 #include <algorithm>
+#include <functional>
 #include <string>
 
 namespace Tessara::Geometry {
@@ -26,10 +27,10 @@ namespace {
         return "\"" + std::string(text.view()) + "\"";
     }
 
-    /// What a validator calls the whole object and the elements of each component.
+    /// What a validator calls the object, and what the entries of its offset array count.
     struct Wording {
         char const* object;
-        char const* indexed; // what the entries of the offset array count
+        char const* indexed;
     };
 
     struct StandardData {
@@ -71,7 +72,7 @@ namespace {
     Status checkOffsets(
         char const* name, Orvan::Array<unsigned int> const& offsets, std::uint64_t last, Wording const& words)
     {
-        if (offsets[0] != 0 && offsets.size > 1)
+        if (offsets[0] != 0)
             return failure(std::string(name) + "[0] is " + to_string(offsets[0]) + " instead of 0");
         unsigned int const* const fall = std::adjacent_find(offsets.begin(), offsets.end(), std::greater<>());
         if (fall != offsets.end()) {
@@ -160,8 +161,10 @@ Status StrandValidator::validate(Object const& strands)
         },
         [&] {
             auto const offsets = dataOf<unsigned int>(strands, sStrandOffset);
-            // Without strands the points belong to none of them, and the one offset may still be 0.
-            std::uint64_t const last = strandCount == 0 && (*offsets)[0] == 0 ? 0 : pointCount;
+            // Without strands the points belong to none of them: the one offset may be 0, or their number.
+            std::uint64_t const last = strandCount == 0 ? 0 : pointCount;
+            if (strandCount == 0 && (*offsets)[0] == pointCount)
+                return Status();
             return checkOffsets(sStrandOffset, *offsets, last, {"strand set", "points"});
         });
 }

@@ -121,6 +121,14 @@ TEST(Elements, surviveEveryFailingAllocation)
 {
     TestSupport::sweepFailingAllocations([](TestSupport::Attempt const& attempt) {
         auto const mesh = twoTriangles();
+        auto const before = TestSupport::deepCopy(*mesh);
+        if (attempt([&] { populateMesh(*mesh); }))
+            EXPECT_EQ(getElementCount(*mesh, sFaceComp), 0u);
+        else
+            EXPECT_TRUE(TestSupport::sameContents(*mesh, *before));
+    });
+    TestSupport::sweepFailingAllocations([](TestSupport::Attempt const& attempt) {
+        auto const mesh = twoTriangles();
         addRangeProperty("range", sPointComp, {1, 2, 3}, *mesh);
         Object const other = *mesh; // so that both have to clone
         auto const before = TestSupport::deepCopy(*mesh);
@@ -240,6 +248,7 @@ TEST(Validators, acceptWhatIsUnusualButWhole)
     EXPECT_TRUE(validateMesh(*twoTriangles()));
     EXPECT_TRUE(validateMesh(*odd));
     EXPECT_TRUE(validateMesh(*makeMesh({}, {}, {})));
+    EXPECT_FALSE(validateMesh(*makeMesh({{0, 0, 0}}, {0, 0, 0}, {3}))) << "corners without faces";
     EXPECT_TRUE(validateMesh(*makeMesh({{nan, 0, 0}, {1, 0, 0}}, {}, {0}))) << "points without faces, not finite";
     EXPECT_TRUE(validateMesh(*makeMesh({{0, 0, 0}}, {0, 0}, {0, 0, 2}))) << "faces of no and of two corners";
     EXPECT_TRUE(StrandValidator().validate(*twoStrands()));

@@ -26,7 +26,7 @@ inline constexpr Uninitialized kUninitialized{};
 /// need a constructor are always constructed. `bool` elements are bytes of their own.
 ///
 /// Copies are deep. Several threads may read one array, or write different elements of it.
-/// \throws std::bad_alloc  from every operation that may grow; the array is then as it was before.
+/// \throws std::bad_alloc  from every operation that may grow; the array then holds the same elements as before.
 template <class T> class Array {
     static_assert(std::is_nothrow_move_constructible_v<T>, "growing must not fail halfway");
     static constexpr bool kTrivial = std::is_trivially_copyable_v<T> && std::is_trivially_default_constructible_v<T>;

@@ -3,6 +3,8 @@
 #include <TessaraGeometry/Export.h>
 #include <TessaraObject/Object.h>
 
+#include <utility>
+
 namespace Tessara::Geometry {
 
 // The validators check the standard geometry strictly, and nothing else:

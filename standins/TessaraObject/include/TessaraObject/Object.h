@@ -26,7 +26,10 @@ class TESSARAOBJECT_EXPORT Object {
 public:
     Object() = default;
     Object(Object const&) = default;
-    Object& operator=(Object const&) = default;
+    Object(Object&&) noexcept = default;
+    /// \throws std::bad_alloc  with the object as it was
+    Object& operator=(Object const& other) { return *this = Object(other); }
+    Object& operator=(Object&&) noexcept = default;
     virtual ~Object() = default;
 
     virtual bool hasProperty(Orvan::String const& key) const;
