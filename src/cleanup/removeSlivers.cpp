@@ -48,13 +48,16 @@ namespace {
         unsigned int faceCount = 0;
     };
 
+    /// What the sweep has to do with a face. Only slivers, and faces that a collapse has changed, can collapse.
+    enum class FaceVisit : unsigned char { None = 0, Sliver = 1, Changed = 2 };
+
     /// The mesh while its faces collapse. A removed face has `kInvalidIndex` at its first corner.
     struct CollapsingMesh {
         Orvan::Array<float3> positions;
         IndexArray faceVertex;
         Orvan::Array<Triangle> adjacency; // the faces across a face's edges
         IndexArray valence; // faces around each point; a fan that is no longer is not all around its point
-        Orvan::Array<unsigned char> isDue; // faces to measure: those that qualified at first, and those changed since
+        Orvan::Array<FaceVisit> visits; // one a face
         std::vector<unsigned int> removedFaces;
         std::vector<unsigned int> removedPoints;
 
@@ -140,30 +143,35 @@ namespace {
         return lengths.longest * ratio > lengths.shortest;
     }
 
-    /// One byte a face: 1 where it is a sliver as it stands. Only these, and faces that a collapse changes, can
-    /// collapse.
-    Orvan::Array<unsigned char> findSlivers(TriangleMesh const& mesh, float ratio)
+    /// Tells the faces that are slivers as they stand.
+    Orvan::Array<FaceVisit> findSlivers(TriangleMesh const& mesh, float ratio)
     {
-        Orvan::Array<unsigned char> slivers = uninitializedArray<unsigned char>(mesh.faceCount);
-        unsigned char* const sliver = slivers.data;
+        Orvan::Array<FaceVisit> visits = uninitializedArray<FaceVisit>(mesh.faceCount);
+        FaceVisit* const visit = visits.data;
         unsigned int const* const corner = mesh.faceVertex->data;
         float3 const* const position = mesh.positions->data;
-        // Each face writes its own byte.
+        // Each face writes its own entry.
         parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [=](auto const& faces) {
-            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                sliver[face] = isSliver(measureEdges(corner + std::size_t{3} * face, position), ratio) ? 1 : 0;
+            for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
+                bool const isFound = isSliver(measureEdges(corner + std::size_t{3} * face, position), ratio);
+                visit[face] = isFound ? FaceVisit::Sliver : FaceVisit::None;
+            }
         });
-        return slivers;
+        return visits;
     }
 
-    /// The first due face from `face` on; the face count where there is none.
-    unsigned int nextDue(Orvan::Array<unsigned char> const& isDue, unsigned int face)
+    /// The first face from `face` on that has to be visited; the face count where there is none.
+    unsigned int nextVisit(Orvan::Array<FaceVisit> const& visits, std::uint64_t face)
     {
-        if (face >= isDue.size)
-            return static_cast<unsigned int>(isDue.size);
-        void const* const due = std::memchr(isDue.data + face, 1, isDue.size - face);
-        return static_cast<unsigned int>(
-            due ? static_cast<unsigned char const*>(due) - isDue.data : isDue.end() - isDue.data);
+        // Mostly there is nothing to do: eight faces at a time.
+        for (std::uint64_t eight = 0; face + sizeof eight <= visits.size; face += sizeof eight) {
+            std::memcpy(&eight, visits.data + face, sizeof eight);
+            if (eight != 0)
+                break;
+        }
+        while (face < visits.size && visits[face] == FaceVisit::None)
+            ++face;
+        return static_cast<unsigned int>(std::min(face, visits.size));
     }
 
     /// A half-edge into the point at hand: where it comes from, and its face.
@@ -239,7 +247,7 @@ namespace {
         return valence;
     }
 
-    CollapsingMesh prepareCollapses(TriangleMesh const& mesh, Orvan::Array<unsigned char> slivers)
+    CollapsingMesh prepareCollapses(TriangleMesh const& mesh, Orvan::Array<FaceVisit> slivers)
     {
         CollapsingMesh collapsing;
         {
@@ -250,7 +258,7 @@ namespace {
         }
         collapsing.positions = copyOfFirst(mesh.pointCount, *mesh.positions);
         collapsing.faceVertex = copyOfFirst(std::uint64_t{3} * mesh.faceCount, *mesh.faceVertex);
-        collapsing.isDue = std::move(slivers);
+        collapsing.visits = std::move(slivers);
         return collapsing;
     }
 
@@ -323,12 +331,30 @@ namespace {
         return fans.sharedRing.size() == 2;
     }
 
-    /// The normal of a face from before the first collapse. Its length is the sine of the angle, on purpose.
-    float3 originalNormal(TriangleMesh const& original, unsigned int face)
+    /// Unit vectors along the edges of a face around a point, which is its corner `entry`.
+    struct FaceDirections {
+        float3 toFirst; // from the point to the next corner
+        float3 toSecond; // from the point to the corner after that
+        float3 opposite; // from the one to the other
+    };
+
+    /// The normal of a face from before the first collapse: the cross product of the directions from its first corner to
+    /// the other two. Its length is the sine of the angle, on purpose.
+    float3 originalNormal(
+        TriangleMesh const& original, CollapsingMesh const& mesh, FanFace const& around, FaceDirections const& now)
     {
-        unsigned int const* const c = original.faceVertex->data + std::size_t{3} * face;
-        float3 const* const position = original.positions->data;
-        return cross(safeNormalize(position[c[1]] - position[c[0]]), safeNormalize(position[c[2]] - position[c[0]]));
+        if (mesh.visits[around.face] == FaceVisit::Changed) {
+            unsigned int const* const c = original.faceVertex->data + std::size_t{3} * around.face;
+            float3 const* const position = original.positions->data;
+            return cross(
+                safeNormalize(position[c[1]] - position[c[0]]), safeNormalize(position[c[2]] - position[c[0]]));
+        }
+        // An unchanged face has the same directions, to the bit up to their signs, which leave a product as it is.
+        if (around.entry == 0)
+            return cross(now.toFirst, now.toSecond);
+        if (around.entry == 1)
+            return cross(now.toSecond, now.opposite);
+        return cross(now.toFirst, now.opposite);
     }
 
     bool faceKeepsOrientation(
@@ -338,15 +364,15 @@ namespace {
         float3 const p0 = mesh.positions[c[around.entry]]; // the point that moves
         float3 const p1 = mesh.positions[c[next(around.entry)]];
         float3 const p2 = mesh.positions[c[previous(around.entry)]];
+        FaceDirections const now{safeNormalize(p1 - p0), safeNormalize(p2 - p0), safeNormalize(p2 - p1)};
 
         // The midpoint has to lie strictly on the inner side of the opposite edge,
-        float3 const opposite = safeNormalize(p2 - p1);
-        float3 const normal = cross(safeNormalize(p1 - p0), safeNormalize(p2 - p0));
-        if (dot(cross(normal, opposite), midpoint - p1) <= 0)
+        float3 const normal = cross(now.toFirst, now.toSecond);
+        if (dot(cross(normal, now.opposite), midpoint - p1) <= 0)
             return false;
         // and the new face may not look away from where the original face looked.
         float3 const newNormal = cross(safeNormalize(p1 - midpoint), safeNormalize(p2 - midpoint));
-        return !(dot(newNormal, originalNormal(original, around.face)) <= 0);
+        return !(dot(newNormal, originalNormal(original, mesh, around, now)) <= 0);
     }
 
     /// Whether the edge has a face on both sides, both ends have closed fans, and no face around them turns over.
@@ -419,14 +445,14 @@ namespace {
         removeFace(fans.across.face, fans, mesh);
         for (std::vector<FanFace> const* const fan : {&fans.startFan, &fans.endFan})
             for (FanFace const& around : *fan)
-                mesh.isDue[around.face] = 1;
+                mesh.visits[around.face] = FaceVisit::Changed;
     }
 
     void collapseSlivers(TriangleMesh const& original, float ratio, CollapsingMesh& mesh)
     {
         EdgeFans fans;
-        for (unsigned int face = nextDue(mesh.isDue, 0); face != original.faceCount;
-             face = nextDue(mesh.isDue, face + 1)) {
+        for (unsigned int face = nextVisit(mesh.visits, 0); face != original.faceCount;
+             face = nextVisit(mesh.visits, std::uint64_t{face} + 1)) {
             if (mesh.isRemoved(face))
                 continue;
             EdgeLengths const lengths = measureEdges(mesh.corners(face), mesh.positions.data);
@@ -514,8 +540,8 @@ bool removeSlivers(float ratio, Tessara::Object& mesh)
     std::optional<TriangleMesh> const original = readTriangleMesh(mesh);
     if (!original)
         return true;
-    Orvan::Array<unsigned char> slivers = findSlivers(*original, ratio);
-    if (nextDue(slivers, 0) == original->faceCount)
+    Orvan::Array<FaceVisit> slivers = findSlivers(*original, ratio);
+    if (nextVisit(slivers, 0) == original->faceCount)
         return true;
 
     CollapsingMesh collapsing = prepareCollapses(*original, std::move(slivers));
