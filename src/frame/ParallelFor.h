@@ -24,8 +24,7 @@ inline constexpr unsigned int kFaceGrain = 1; // a whole face, point neighbourho
 /// empty one is none. `body` walks its sub-range upwards and writes only what belongs to the elements at hand.
 ///
 /// \param isolated  True: a cancellation of an enclosing oneTBB group does not reach the loop. False: it does, and
-/// after
-///                  the loop the job's cancellation is looked at. Only the balance sweep of subdivision does that; all
+///                  after the loop the job's cancellation is looked at. Only the balance sweep of subdivision does that; all
 ///                  other operations run to their end once started.
 /// \throws          std::runtime_error with the text of `TSR::exceptionMessage` when not isolated and the job is
 ///                  cancelled; and what `body` throws, which ends the other sub-ranges as soon as they return.

@@ -86,29 +86,25 @@ template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Te
     if (!shared || key.empty())
         return false;
 
+    // Puts the array back in whatever way this ends.
     struct PutBack {
         Orvan::String key;
         Tessara::Object& object;
         Orvan::MutablePtr<Tessara::Object> property; // a clone of the present one
-        SharedArray array;
+        SharedArray shared; // the array until it is mutable
+        Orvan::MutablePtr<Orvan::Array<T>> array;
 
         ~PutBack()
         {
-            property->setProperty(Tessara::Geometry::sData, std::move(array));
+            property->setProperty(Tessara::Geometry::sData, array ? SharedArray(std::move(array)) : std::move(shared));
             object.setProperty(key, Orvan::Ptr<Tessara::Object>(std::move(property)));
         }
-    } putBack{key, object, makeMutable(dataPropertyAt(object, key)), std::move(shared)};
+    } putBack{key, object, makeMutable(dataPropertyAt(object, key)), std::move(shared), nullptr};
 
     writeGeoPropData<T>(key, nullptr, object);
     putBack.property->setProperty(Tessara::Geometry::sData, SharedArray());
-    Orvan::MutablePtr<Orvan::Array<T>> array = makeMutable(std::move(putBack.array));
-    try {
-        edit(*array);
-    } catch (...) {
-        putBack.array = std::move(array);
-        throw;
-    }
-    putBack.array = std::move(array);
+    putBack.array = makeMutable(std::move(putBack.shared));
+    edit(*putBack.array);
     return true;
 }
 

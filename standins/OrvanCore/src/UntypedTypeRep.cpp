@@ -13,8 +13,7 @@ namespace Orvan::Internal {
 namespace {
 
     constexpr std::size_t kHugePage = std::size_t{1} << 21;
-    constexpr std::size_t kHugeBlock =
-        2 * kHugePage; // below, rounding up to whole huge pages would cost more than it gains
+    constexpr std::size_t kHugeBlock = 2 * kHugePage; // below, rounding up to huge pages costs more than it gains
 
     std::size_t byteCount(UntypedTypeRep const& rep, std::uint64_t count)
     {

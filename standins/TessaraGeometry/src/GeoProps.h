@@ -28,24 +28,20 @@ inline Orvan::Ptr<Object> objectAt(Object const& object, Orvan::String const& ke
 /// shared with another object; when that fails the object is as it was.
 inline void setInGeoProp(Orvan::String const& key, Orvan::String const& inner, PropertyValue&& value, Object& object)
 {
-    // Without our own reference in the object the geo property is free to be changed in place.
-    Orvan::Ptr<Object> geoProperty = objectAt(object, key);
+    // Puts the geo property back in whatever way this ends.
+    struct PutBack {
+        Orvan::String const& key;
+        Object& object;
+        Orvan::Ptr<Object> shared; // the geo property until it is mutable
+        Orvan::MutablePtr<Object> changed;
+
+        ~PutBack() { object.setProperty(key, changed ? Orvan::Ptr<Object>(std::move(changed)) : std::move(shared)); }
+    } putBack{key, object, objectAt(object, key), nullptr};
+
+    // Without the object's own reference the geo property is free to be changed in place.
     object.setProperty(key, Orvan::Ptr<Object>());
-    try {
-        Orvan::MutablePtr<Object> changed = makeMutable(std::move(geoProperty));
-        geoProperty = nullptr;
-        try {
-            changed->setProperty(inner, std::move(value));
-        } catch (...) {
-            geoProperty = std::move(changed);
-            throw;
-        }
-        geoProperty = std::move(changed);
-    } catch (...) {
-        object.setProperty(key, std::move(geoProperty));
-        throw;
-    }
-    object.setProperty(key, std::move(geoProperty));
+    putBack.changed = makeMutable(std::move(putBack.shared));
+    putBack.changed->setProperty(inner, std::move(value));
 }
 
 }

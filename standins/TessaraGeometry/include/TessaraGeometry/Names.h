@@ -11,13 +11,11 @@ inline constexpr char const* sFaceComp = "sFaceComp";
 inline constexpr char const* sFaceVertexComp = "sFaceVertexComp"; // face corners
 inline constexpr char const* sStrandComp = "sStrandComp";
 
-// Standard data properties.
+// Standard data properties. The offset arrays have one entry more than there are faces or strands.
 inline constexpr char const* sPointPosition = "sPointPosition"; // float3 a point
 inline constexpr char const* sFaceVertex = "sFaceVertex"; // unsigned int a face corner: its point
-inline constexpr char const* sFaceOffset =
-    "sFaceOffset"; // unsigned int: each face's first corner; one more entry than faces
-inline constexpr char const* sStrandOffset =
-    "sStrandOffset"; // unsigned int: each strand's first point; one more than strands
+inline constexpr char const* sFaceOffset = "sFaceOffset"; // unsigned int a face: its first corner
+inline constexpr char const* sStrandOffset = "sStrandOffset"; // unsigned int a strand: its first point
 
 // Properties of geo properties.
 inline constexpr char const* sData = "sData"; // Ptr<Array<T>>: the values

@@ -11,8 +11,7 @@ namespace Tessara {
 
 class PropertyValue;
 
-/// What a property value can hold. Not pointers or arrays: a text literal would be stored as what it is not meant to
-/// be.
+/// What a property value can hold. Not pointers or arrays: a text literal would become what it is not meant to be.
 template <class T>
 concept StorableValue = (!std::is_same_v<T, PropertyValue>)&&(!std::is_pointer_v<T>)&&(!std::is_null_pointer_v<T>)&&(
     !std::is_array_v<T>)&&std::is_copy_constructible_v<T>;
