@@ -31,9 +31,9 @@ endfunction()
 
 # A test program; further arguments are its libraries. Each gtest case becomes a test of CTest.
 function(modeling_add_test name)
-    cmake_parse_arguments(arg "" "" "SOURCES;LIBRARIES;LABELS" ${ARGN})
+    cmake_parse_arguments(arg "" "LABEL" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     modeling_use_flags(${name})
     target_link_libraries(${name} PRIVATE ${arg_LIBRARIES} GTest::gmock GTest::gtest_main)
-    gtest_discover_tests(${name} DISCOVERY_TIMEOUT 60 PROPERTIES LABELS "${arg_LABELS}" TIMEOUT 600)
+    gtest_discover_tests(${name} DISCOVERY_TIMEOUT 60 PROPERTIES LABELS "${arg_LABEL}" TIMEOUT 600)
 endfunction()
