@@ -7,6 +7,8 @@ target_compile_features(modeling_flags INTERFACE cxx_std_20)
 target_compile_options(modeling_flags INTERFACE
     # Fused multiply-adds round differently: results would depend on the compiler and the machine.
     -ffp-contract=off
+    # Square roots need not report errors through errno, so that they can be taken several at a time: same values.
+    -fno-math-errno
     -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor -Woverloaded-virtual)
 if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
     target_compile_options(modeling_flags INTERFACE -Wno-restrict) # g++ 12 sees overlaps in std::string that are not there

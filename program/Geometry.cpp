@@ -1,6 +1,7 @@
 #include "Geometry.h"
 
 #include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Makers.h>
 #include <TessaraGeometry/Names.h>
@@ -117,6 +118,39 @@ std::vector<std::string> dropOtherProperties(Object& object)
         dropped.push_back(property.name);
     }
     return dropped;
+}
+
+std::vector<std::string> dropOutdatedProperties(Object& object)
+{
+    std::vector<std::string> dropped;
+    auto const dropIf = [&](auto const& isOutdated) {
+        for (Property const& property : propertiesOf(object)) {
+            if (property.isStandard || !isOutdated(property))
+                continue;
+            object.eraseProperty(property.name.c_str());
+            dropped.push_back(property.name);
+        }
+    };
+    dropIf([&](Property const& property) {
+        return property.range.empty() && !property.component.empty()
+            && property.length != getElementCount(object, property.component.c_str());
+    });
+    // The data of a range has nothing to belong to without it.
+    dropIf([&](Property const& property) {
+        return property.component.empty()
+            && std::find(dropped.begin(), dropped.end(), getGeoPropTargetName(object, property.name.c_str()).view())
+            != dropped.end();
+    });
+    return dropped;
+}
+
+std::vector<std::string> namesMissingIn(Object const& later, Object const& earlier)
+{
+    std::vector<std::string> names;
+    for (Property const& property : propertiesOf(earlier))
+        if (!later.hasProperty(property.name.c_str()))
+            names.push_back(property.name);
+    return names;
 }
 
 }

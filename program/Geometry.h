@@ -46,4 +46,10 @@ std::vector<Property> propertiesOf(Tessara::Object const& object);
 /// and take only the standard properties along.
 std::vector<std::string> dropOtherProperties(Tessara::Object& object);
 
+/// Removes what no longer has a value for each element of its component, or whose range is gone, and returns the names.
+std::vector<std::string> dropOutdatedProperties(Tessara::Object& object);
+
+/// The properties of `earlier` that `later` has not got.
+std::vector<std::string> namesMissingIn(Tessara::Object const& later, Tessara::Object const& earlier);
+
 }

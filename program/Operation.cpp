@@ -119,13 +119,17 @@ void reportOperation(
     document["peakMemoryBytes"] = peakMemory();
 
     report.text += formatValues({{"before", before}, {"after", after}});
-    std::string dropped = fmt::format("{}", fmt::join(droppedProperties, ", "));
-    report.text += "\n"
-        + formatTable({{}, {}},
-            {{"dropped properties", dropped.empty() ? "none" : std::move(dropped)},
-                {"time", formatSeconds(document["seconds"].get<double>())},
-                {"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())},
-                {"written", document["output"].get<std::string>()}});
+    auto const listOf = [](std::vector<std::string> const& names) {
+        return names.empty() ? "none" : fmt::format("{}", fmt::join(names, ", "));
+    };
+    std::vector<std::vector<std::string>> rows;
+    if (document.contains("keptProperties"))
+        rows.push_back({"kept properties", listOf(document["keptProperties"])});
+    rows.push_back({"dropped properties", listOf(droppedProperties)});
+    rows.push_back({"time", formatSeconds(document["seconds"].get<double>())});
+    rows.push_back({"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())});
+    rows.push_back({"written", document["output"].get<std::string>()});
+    report.text += "\n" + formatTable({{}, {}}, rows);
 }
 
 }

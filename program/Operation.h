@@ -40,7 +40,8 @@ void saveGeometry(Tessara::Object const& object, std::filesystem::path const& fi
 /// The numbers of elements: points, corners, faces, strands.
 Json countsOf(Tessara::Object const& object);
 
-/// Ends the report with a table of the numbers before and after, dropped properties, time and peak memory.
+/// Ends the report with a table of the numbers before and after, kept ("keptProperties" of the document, where it is
+/// there) and dropped properties, time and peak memory.
 void reportOperation(
     Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report);
 

@@ -3,3 +3,4 @@
 // All operations of the library.
 
 #include <Modeling/removeSlivers.h>
+#include <Modeling/triangulate.h>

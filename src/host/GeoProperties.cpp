@@ -1,6 +1,7 @@
 #include "GeoProperties.h"
 
 #include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
 
 namespace Modeling {
 
@@ -39,7 +40,7 @@ bool writeGeoPropValue(Orvan::String const& key, PropertyValue&& data, Object& o
 
 void PreparedWrites::setElementCount(Orvan::String const& component, unsigned int count)
 {
-    writes_.push_back({component, count, nullptr});
+    writes_.push_back({Write::Kind::Count, component, count, nullptr});
     Tessara::Geometry::setElementCount(component, getElementCount(object_, component), object_);
 }
 
@@ -50,16 +51,37 @@ void PreparedWrites::writeValue(Orvan::String const& key, PropertyValue&& data)
         return;
     Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
     changed->setProperty(sData, std::move(data));
-    writes_.push_back({key, 0, std::move(changed)});
+    writes_.push_back({Write::Kind::Property, key, 0, std::move(changed)});
+}
+
+void PreparedWrites::setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices)
+{
+    // The host's own way of setting them, tried out on an object that has nothing but the range.
+    Orvan::MutablePtr<Object> const onlyRange = Tessara::createObject();
+    onlyRange->setProperty(name, object_.getProperty(name));
+    if (setRangeGeoPropIndices(name, std::move(indices), *onlyRange))
+        writes_.push_back({Write::Kind::Property, name, 0, objectAt(*onlyRange, name)});
+}
+
+void PreparedWrites::eraseProperty(Orvan::String const& key)
+{
+    writes_.push_back({Write::Kind::Erasure, key, 0, nullptr});
 }
 
 void PreparedWrites::commit()
 {
     for (Write& write : writes_) {
-        if (write.property)
-            object_.setProperty(write.key, Orvan::Ptr<Object>(std::move(write.property)));
-        else
+        switch (write.kind) {
+        case Write::Kind::Count:
             Tessara::Geometry::setElementCount(write.key, write.count, object_);
+            break;
+        case Write::Kind::Property:
+            object_.setProperty(write.key, std::move(write.property));
+            break;
+        case Write::Kind::Erasure:
+            object_.eraseProperty(write.key);
+            break;
+        }
     }
     writes_.clear();
 }

@@ -56,15 +56,23 @@ public:
         writeValue(key, std::move(data));
     }
 
+    /// As `setRangeGeoPropIndices`; without effect where there is no range of that name.
+    void setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices);
+
+    /// As `eraseProperty` of the object.
+    void eraseProperty(Orvan::String const& key);
+
     /// Makes the changes in the order in which they were added. Takes no memory with a host that replaces the value of a
-    /// present key, and the count of a component that is not shared, without taking any; the stand-ins do.
+    /// present key, and the count of a component that is not shared, and erases a key without taking any; the stand-ins do.
     void commit();
 
 private:
     struct Write {
+        enum class Kind { Count, Property, Erasure };
+        Kind kind;
         Orvan::String key;
         unsigned int count; // of a component
-        Orvan::MutablePtr<Tessara::Object> property; // null for a component
+        Orvan::Ptr<Tessara::Object> property; // that replaces the present one
     };
 
     void writeValue(Orvan::String const& key, Tessara::PropertyValue&& data);

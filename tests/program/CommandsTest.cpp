@@ -95,6 +95,32 @@ TEST_F(Commands, RemoveSliversKeepsPropertiesWhereNothingCollapses)
     EXPECT_EQ(runForJson("info out.obj")["properties"], runForJson("info cylinder.obj")["properties"]);
 }
 
+TEST_F(Commands, TriangulateKeepsWhatTheChannelsChoose)
+{
+    write(
+        folder / "quad.obj", "v 0 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0\nvt 0 0\nvt 1 0\nvt 1 1\nvt 0 1\nf 1/1 2/2 3/3 4/4\n");
+    json const done = runForJson("triangulate quad.obj out.obj --check");
+    EXPECT_EQ(done["before"]["quads"], 1);
+    EXPECT_EQ(done["after"]["triangles"], 2);
+    EXPECT_EQ(done["keptProperties"], json({"uv"}));
+    EXPECT_EQ(done["check"][0]["corners"], "4");
+    EXPECT_EQ(done["check"][0]["lossy"], 0);
+    EXPECT_EQ(runForJson("info out.obj")["properties"].size(), 4);
+    EXPECT_EQ(runForJson("triangulate quad.obj out.obj --channels '* -uv'")["droppedProperties"], json({"uv"}));
+
+    // A concave face of some thousandths of a unit: too small for the library in its own units, but not for the program. The
+    // other face intersects itself.
+    write(folder / "small.obj",
+        "v 0.001 0.001 0\nv 0 0.003 0\nv 0 0 0\nv 0.003 0 0\nv 0 0 1\nv 1 1 1\nv 1 0 1\nv 0 2 1\nf 1 2 3 4\nf 5 6 7 "
+        "8\n");
+    json const fine = runForJson("triangulate small.obj out.ply --check")["check"];
+    EXPECT_EQ(fine[0]["fans"], 1);
+    EXPECT_EQ(fine[0]["firstLossy"], 1);
+    json const own = runForJson("triangulate small.obj out.ply --check --keep-units")["check"];
+    EXPECT_EQ(own[0]["fans"], 2);
+    EXPECT_THAT(run("triangulate small.obj out.ply --check").output, HasSubstr("1 (first: face 1)"));
+}
+
 TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
 {
     for (char const* const name : {"cylinder.obj", "sphere-with-hole.stl", "cube.ply", "spider.obj"})
@@ -116,6 +142,8 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"remove-slivers cube.ply out.obj", 5, "lie in the same place as another point"},
         {"remove-slivers spider.obj out.obj", 5, "At 10 edges neighbouring faces look to opposite sides"},
         {"remove-slivers lines.obj out.obj", 5, "lines.obj holds a strand set"},
+        {"triangulate lines.obj out.obj", 5, "lines.obj holds a strand set"},
+        {"triangulate cube.ply out.obj --channels '* ^'", 2, "--channels: "},
         {"remove-slivers missing.obj out.obj", 3, "missing.obj"},
         {"remove-slivers broken.obj out.obj", 3, "broken.obj"},
         {"validate broken.obj", 3, "broken.obj"},
@@ -156,8 +184,9 @@ TEST_F(Commands, InfoAndValidateTellAboutFiles)
     EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (0.1, 0, 0)"));
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
-    for (char const* const help : {"--help", "info --help", "validate -h", "remove-slivers --help", "--version"})
-        EXPECT_EQ(run(help).exitCode, 0) << help;
+    for (char const* const command : {"", "info ", "validate ", "triangulate ", "remove-slivers "})
+        EXPECT_EQ(run(command + std::string("--help")).exitCode, 0) << command;
+    EXPECT_EQ(run("--version").exitCode, 0);
 }
 
 }

@@ -3,6 +3,7 @@
 #include <TessaraMathSupport/Types.h>
 #include <TessaraSpatial/Export.h>
 
+#include <algorithm>
 #include <cmath>
 #include <limits>
 
@@ -47,6 +48,11 @@ namespace Internal {
     TESSARASPATIAL_EXPORT TrianglePlace placeNotInside(
         Math::float2 const& p, Math::float2 const& a, Math::float2 const& b, Math::float2 const& c) noexcept;
 
+    inline bool isBetween(float value, float a, float b, float c)
+    {
+        return value >= std::min({a, b, c}) && value <= std::max({a, b, c});
+    }
+
 }
 
 /// How the path from a over b to c turns. `Collinear` also where any two of the points are equal (a path that comes
@@ -60,8 +66,9 @@ inline PointEdgeOrientation pointEdgeOrientation(Math::float2 const& a, Math::fl
 }
 
 /// Whether p lies in the triangle a, b, c, of either winding, edges included; but a point that equals a corner does
-/// not. Points on an edge that two triangles share are in both of them, and no point falls between the two. Nothing
-/// lies in a triangle whose corners are collinear or not all finite.
+/// not. Points on an edge that two triangles share are in both of them, and no point falls between the two (where the
+/// signs are exact). Nothing lies in a triangle whose corners are collinear or not all finite, and, however areas round,
+/// no point outside the corners' bounding box does: callers may look at that first.
 ///
 /// \param u, v, w  Always written: the barycentric values of p, the weights of a, b and c, also for p outside. They add
 ///                 up to 1 but for rounding. All 0 where nothing can lie in the triangle; without meaning where only p
@@ -81,7 +88,8 @@ inline bool pointInTriangle(Math::float2 const& p, Math::float2 const& a, Math::
     double const areaC = sign * Internal::doubledArea(p, a, b);
     // The signs are as good as random to a branch predictor, so that the first three tests go without a branch.
     bool const notOutside = (areaA >= 0.0) & (areaB >= 0.0) & (areaC >= 0.0);
-    bool const inside = notOutside && hasInside && p != a && p != b && p != c;
+    bool const inside = notOutside && hasInside && p != a && p != b && p != c
+        && Internal::isBetween(p.x, a.x, b.x, c.x) && Internal::isBetween(p.y, a.y, b.y, c.y);
 
     u = hasInside ? static_cast<float>(areaA / whole) : 0.0f;
     v = hasInside ? static_cast<float>(areaB / whole) : 0.0f;

@@ -1,0 +1,161 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "Operation.h"
+#include "TriangulationCheck.h"
+
+#include <Modeling/triangulate.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometryVolume/ChannelParser.h>
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <cmath>
+#include <memory>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using Tessara::Object;
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path out;
+        std::string channels = "*";
+        bool keepsUnits = false;
+        bool isToBeChecked = false;
+    };
+
+    void requireChannels(std::string const& channels)
+    {
+        TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels.c_str());
+        if (!status)
+            throw Failure(ExitCode::CommandLine, fmt::format("--channels: {}", status.message().view()));
+    }
+
+    Json describeMesh(Object const& mesh)
+    {
+        Json values = countsOf(mesh);
+        MeshTopology const topology = analyseTopology(arraysOf(mesh));
+        values["triangles"] = topology.triangleCount;
+        values["quads"] = topology.quads.count;
+        values["polygons"] = topology.polygons.count;
+        values["openEdges"] = topology.openEdges.count;
+        return values;
+    }
+
+    std::vector<std::string> namesOfOtherProperties(Object const& mesh)
+    {
+        std::vector<std::string> names;
+        for (Property const& property : propertiesOf(mesh))
+            if (!property.isStandard && !property.component.empty())
+                names.push_back(property.name);
+        return names;
+    }
+
+    void reportCheck(std::vector<CutFaces> const& kinds, Report& report)
+    {
+        report.document["check"] = Json::array();
+        std::vector<std::vector<std::string>> rows;
+        for (CutFaces const& kind : kinds) {
+            auto const firstOf = [](Finding const& finding) { return finding ? Json(finding.first) : Json(); };
+            report.document["check"].push_back({{"corners", kind.corners}, {"faces", kind.faceCount},
+                {"fans", kind.fans.count}, {"firstFan", firstOf(kind.fans)}, {"lossy", kind.lossy.count},
+                {"firstLossy", firstOf(kind.lossy)}, {"worstDifference", kind.worstDifference}});
+            auto const cellOf = [](Finding const& finding) {
+                return finding ? fmt::format("{} (first: face {})", groupDigits(finding.count), finding.first) : "0";
+            };
+            rows.push_back({kind.corners, groupDigits(kind.faceCount), cellOf(kind.fans), cellOf(kind.lossy),
+                fmt::format("{:.1e}", kind.worstDifference)});
+        }
+        report.text += "\n"
+            + formatTable({{"corners"}, {"faces", true}, {"cut as a fan", true}, {"area lost", true},
+                              {"largest difference of a face", true}},
+                rows);
+    }
+
+    /// The library looks at no face below 5e-5 square units. So the mesh is measured in units in which it is about a
+    /// million long; a power of two of its own, so that nothing rounds.
+    Orvan::Array<float3> inFineUnits(Orvan::Array<float3> const& positions, BoundingBox const& box)
+    {
+        constexpr int kExponent = 20;
+        float const size = std::max({box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z});
+        int const shift = std::isnormal(size) ? kExponent - std::ilogb(size) : 0;
+        Orvan::Array<float3> scaled = positions;
+        for (float3& p : scaled)
+            p = {std::ldexp(p.x, shift), std::ldexp(p.y, shift), std::ldexp(p.z, shift)};
+        return scaled;
+    }
+
+    /// The mesh as its faces are to be measured.
+    Object measuredMesh(Options const& options, Object const& mesh)
+    {
+        using namespace Tessara::Geometry;
+        Object measured = mesh;
+        std::optional<BoundingBox> const box = boundingBoxOf(mesh);
+        if (!options.keepsUnits && box)
+            addDataProperty(
+                sPointPosition, sPointComp, inFineUnits(*dataOf<float3>(mesh, sPointPosition), *box), measured);
+        return measured;
+    }
+
+    void triangulate(Options const& options, Report& report)
+    {
+        requireChannels(options.channels);
+        requireWritable(options.out);
+        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
+        if (typeOf(*mesh) != GeometryType::Mesh)
+            throw Failure(ExitCode::Refused,
+                fmt::format("triangulate needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+
+        Object const measured = measuredMesh(options, *mesh);
+        Object result = measured;
+        runOperation(report, [&] { Geometry::Mesh::triangulate(options.channels.c_str(), result); });
+        result.setProperty(Tessara::Geometry::sPointPosition, mesh->getProperty(Tessara::Geometry::sPointPosition));
+
+        std::vector<std::string> dropped = namesMissingIn(result, *mesh);
+        for (std::string const& name : dropOutdatedProperties(result)) {
+            report.warn(fmt::format("\"{}\" is dropped: triangles cannot get values of its type", name));
+            dropped.push_back(name);
+        }
+        report.document["keptProperties"] = namesOfOtherProperties(result);
+        report.document["channels"] = options.channels;
+        saveGeometry(result, options.out, report);
+        reportOperation(describeMesh(*mesh), describeMesh(result), dropped, report);
+        if (options.isToBeChecked)
+            reportCheck(checkTriangulation(arraysOf(measured), arraysOf(result)), report);
+    }
+
+}
+
+void addTriangulate(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"triangulate", "Cut the faces of a mesh into triangles",
+        R"(Each face with n corners becomes n - 2 triangles between its own corners; concave faces are fine.
+No point is added, moved or removed. Faces that intersect themselves, have two equal corners in a row
+or cover next to nothing become a fan from their first corner. Next to nothing is 5e-5 square units,
+where the mesh is about a million units long; with --keep-units they are those of the file.
+
+--channels chooses the properties of faces and corners that triangles get from their face; the others
+are dropped, with the data of ranges. It is a list of names and patterns, separated by blanks or
+commas: * stands for any characters, ? for one, and a leading ^ or - excludes. The last entry that
+matches a name decides. "*" keeps all, "" none, "* -tmp*" all but those that begin with tmp, "uv N"
+these two. Properties of points stay.)",
+        "  modeling triangulate quads.obj triangles.ply\n"
+        "  modeling triangulate cad.obj cad.stl --channels \"\" --check"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("IN", "Mesh to read", options->in, command);
+    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    command.add_option("--channels", options->channels, "Which properties of faces and corners to keep")
+        ->type_name("LIST")
+        ->capture_default_str();
+    command.add_flag("--keep-units", options->keepsUnits, "Measure faces in the units of the file");
+    command.add_flag("--check", options->isToBeChecked,
+        "Compare the area of every face with that of its triangles, and count the fans");
+    onSelected(command, invocation, [options](Report& report) { triangulate(*options, report); });
+}
+
+}

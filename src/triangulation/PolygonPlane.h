@@ -1,0 +1,88 @@
+#pragma once
+
+#include "frame/VectorMath.h"
+
+#include <TessaraMathSupport/Types.h>
+
+#include <cmath>
+#include <cstddef>
+#include <limits>
+#include <optional>
+#include <span>
+
+namespace Modeling::Internal {
+
+// What clipping ears measures: the polygon's plane, and how sharp a corner is. Inline, because it runs for each corner.
+
+using Tessara::Math::float2;
+
+inline constexpr float kFlat = 1e-8f; // squared length of the normal, which is twice the area: absolute on purpose
+inline constexpr float kUpsideDown = 1e-5f; // 1 plus the z of a normal that points along -z
+
+/// Its length is twice the area of the polygon.
+inline float3 newellNormal(std::span<float3 const> corners)
+{
+    float3 normal{0, 0, 0};
+    float3 const* previous = &corners.back();
+    for (std::size_t i = 0; i != corners.size(); ++i) {
+        float3 const& corner = corners[i];
+        float3 const& next = corners[i + 1 == corners.size() ? 0 : i + 1];
+        normal.z += (next.y - previous->y) * corner.x;
+        normal.x += (next.z - previous->z) * corner.y;
+        normal.y += (next.x - previous->x) * corner.z;
+        previous = &corner;
+    }
+    return normal;
+}
+
+struct Quaternion {
+    float x, y, z, w;
+};
+
+/// The shortest rotation from a unit normal to +z.
+inline Quaternion rotationToZ(float3 const& normal)
+{
+    float const w = normal.z + 1;
+    if (kUpsideDown > w)
+        return {normal.z, -normal.y, normal.x, 0}; // a half-turn, not normalised: used as it stands
+    float const norm = std::sqrt((normal.y * normal.y + normal.x * normal.x) + w * w);
+    return {normal.y / norm, -normal.x / norm, 0, w / norm};
+}
+
+/// x and y of the rotated point: two Hamilton products, q (p, 0) and then that with the conjugate of q. Left out are
+/// the products with the 0, which could change no more than the sign of a zero.
+inline float2 rotateAndDropZ(Quaternion const& q, float3 const& p)
+{
+    float const x = (q.w * p.x + q.y * p.z) - q.z * p.y;
+    float const y = (q.w * p.y + q.z * p.x) - q.x * p.z;
+    float const z = (q.w * p.z + q.x * p.y) - q.y * p.x;
+    float const w = (-(q.x * p.x) - q.y * p.y) - q.z * p.z;
+    return {((x * q.w - w * q.x) - y * q.z) + z * q.y, ((y * q.w - w * q.y) - z * q.x) + x * q.z};
+}
+
+/// The rotation that lays the polygon into the plane z = 0, where it is counter-clockwise. Nothing for a polygon
+/// that is too small to have a plane.
+inline std::optional<Quaternion> findPlane(std::span<float3 const> corners)
+{
+    float3 const normal = newellNormal(corners);
+    float const squaredLength = dot(normal, normal);
+    if (kFlat > squaredLength)
+        return std::nullopt;
+    float const norm = std::sqrt(squaredLength);
+    return rotationToZ({normal.x / norm, normal.y / norm, normal.z / norm});
+}
+
+/// How sharp a corner is between the edges that enter and leave it, which are unit vectors: 1 minus the cosine of the
+/// inner angle in space. 0 for a needle, 2 for a straight line.
+inline float sharpnessBetween(float3 const& entering, float3 const& leaving)
+{
+    // The edge back to the previous corner is the one that enters turned around, to the bit.
+    float const sharpness = 1 + dot(leaving, entering);
+    float const atMost2 = 2.0f > sharpness ? sharpness : 2.0f; // also where it is not a number
+    return atMost2 > 0.0f ? atMost2 : 0.0f;
+}
+
+inline constexpr float kNoEar = std::numeric_limits<float>::infinity(); // the sharpness of other corners
+inline constexpr float kSharper = 0.0001f; // by so much an ear has to be sharper than one with a lower number
+
+}

@@ -1,0 +1,206 @@
+#include <Modeling/triangulate.h>
+
+#include "support/Compare.h"
+#include "support/FailingAllocations.h"
+#include "support/MeshChecks.h"
+#include "support/PolygonMesh.h"
+#include "support/Threads.h"
+
+#include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <gtest/gtest.h>
+
+#include <map>
+#include <string>
+#include <vector>
+
+using namespace Tessara::Geometry;
+using namespace TestSupport;
+using Geometry::Mesh::triangulate;
+using Tessara::Object;
+
+namespace {
+
+template <class T> std::vector<T> valuesOf(Object const& mesh, char const* name)
+{
+    auto const values = dataOf<T>(mesh, name);
+    return values ? std::vector<T>(values->begin(), values->end()) : std::vector<T>();
+}
+
+using Indices = std::vector<unsigned int>;
+
+/// A quad (cut from corner 1 to 3), a face of two corners, and a triangle.
+Orvan::MutablePtr<Object> quadTwoCornersTriangle()
+{
+    return makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}}, {0, 1, 2, 3, 1, 2, 0, 1, 2}, {0, 4, 6, 9});
+}
+
+Indices const kSource{3, 0, 1, 3, 1, 2, 6, 7, 8}; // of each corner of its triangles
+
+/// Every element type at the corners and at the faces, a range with data, and what the channels do not choose.
+Orvan::MutablePtr<Object> withProperties(PolygonMesh const& polygons)
+{
+    auto mesh = polygons.build();
+    for (Orvan::String const component : {sFaceVertexComp, sFaceComp}) {
+        std::uint64_t const count = component == sFaceComp ? polygons.faceCount() : polygons.faceVertex.size();
+        std::string const prefix = component == sFaceComp ? "face " : "corner ";
+        forEachElementTypeName([&]<class T>(ElementType<T> elementType) {
+            Orvan::Array<T> values(count);
+            if constexpr (std::is_arithmetic_v<T>)
+                for (std::uint64_t i = 0; i != count; ++i)
+                    values[i] = static_cast<T>(i % 100);
+            addDataProperty((prefix + elementType.name).c_str(), component, std::move(values), *mesh);
+        });
+        Orvan::Array<unsigned int> indices(count);
+        for (std::uint64_t i = 0; i != count; ++i)
+            indices[i] = static_cast<unsigned int>(i % 7);
+        addRangeProperty((prefix + "range").c_str(), component, std::move(indices), *mesh);
+        addDataProperty((prefix + "data").c_str(), (prefix + "range").c_str(), Orvan::Array<float>(7), *mesh);
+    }
+    return mesh;
+}
+
+Orvan::MutablePtr<Object> triangulated(Object const& mesh)
+{
+    auto result = Tessara::createObject();
+    *result = mesh;
+    triangulate("*", *result);
+    return result;
+}
+
+}
+
+TEST(Triangulate, cutsFacesAndGivesTrianglesTheValuesOfTheirFaces)
+{
+    auto const mesh = quadTwoCornersTriangle();
+    addDataProperty<Orvan::String>("name", sFaceComp, {"quad", "line", "triangle"}, *mesh);
+    addDataProperty<int>("short", sFaceComp, {7}, *mesh);
+    addDataProperty<double>("corner", sFaceVertexComp, {0, 1, 2, 3, 4, 5, 6, 7, 8}, *mesh);
+    addDataProperty<int>("short corner", sFaceVertexComp, {5, 6, 7, 8}, *mesh);
+    addDataProperty<Common::GeoLocation>("location", sFaceComp, Orvan::Array<Common::GeoLocation>(3), *mesh);
+    addRangeProperty("material", sFaceComp, {2, 0, 1}, *mesh);
+    addDataProperty<int>("color", "material", {10, 20, 30}, *mesh);
+    addRangeProperty("seam", sFaceVertexComp, {8, 7, 6, 5, 4, 3, 2, 1, 0}, *mesh);
+    auto const before = deepCopy(*mesh);
+    Object const other = *mesh;
+    triangulate("*", *mesh);
+
+    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceVertex), (Indices{3, 0, 1, 3, 1, 2, 0, 1, 2}));
+    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, 3, 6, 9}));
+    EXPECT_EQ(countsOf(*mesh), (Counts{4, 9, 3}));
+    EXPECT_EQ(valuesOf<Orvan::String>(*mesh, "name"), (std::vector<Orvan::String>{"quad", "quad", "triangle"}));
+    EXPECT_EQ(valuesOf<int>(*mesh, "short"), (std::vector<int>{7, 7, 0}));
+    EXPECT_EQ(valuesOf<double>(*mesh, "corner"), std::vector<double>(kSource.begin(), kSource.end()));
+    EXPECT_EQ(valuesOf<int>(*mesh, "short corner"), (std::vector<int>{8, 5, 6, 8, 6, 7, 0, 0, 0}));
+    EXPECT_EQ(dataOf<Common::GeoLocation>(*mesh, "location"), dataOf<Common::GeoLocation>(other, "location"))
+        << "of no core type: stays as it is";
+    auto const material = getRangeGeoPropIndices(*mesh, "material");
+    EXPECT_EQ(Indices(material->begin(), material->end()), (Indices{2, 2, 1}));
+    EXPECT_EQ(dataOf<int>(*mesh, "color"), dataOf<int>(other, "color"));
+    auto const seam = getRangeGeoPropIndices(*mesh, "seam");
+    EXPECT_EQ(Indices(seam->begin(), seam->end()), (Indices{5, 8, 7, 5, 7, 6, 2, 1, 0}));
+    EXPECT_TRUE(sameContents(other, *before)) << "other holders see no change";
+}
+
+TEST(Triangulate, removesWhatTheChannelsDoNotChooseWithItsDependents)
+{
+    std::map<std::string, std::vector<std::string>> const kept{
+        {"*", {"uv", "material", "color", "density"}}, {"", {"density"}},
+        {"color uv", {"uv", "density"}}, // the color goes with its range
+        {"* -uv ^-", {"material", "color", "density"}}, // a malformed entry counts as not there
+    };
+    for (auto const& [channels, names] : kept) {
+        auto const mesh = quadTwoCornersTriangle();
+        addDataProperty<float>("uv", sFaceVertexComp, Orvan::Array<float>(9), *mesh);
+        addRangeProperty("material", sFaceComp, {0, 0, 0}, *mesh);
+        addDataProperty<int>("color", "material", {1}, *mesh);
+        addDataProperty<float>("density", sPointComp, Orvan::Array<float>(4), *mesh);
+        triangulate(channels.c_str(), *mesh);
+        EXPECT_TRUE(isValid(*mesh));
+        std::vector<std::string> left;
+        for (char const* const name : {"uv", "material", "color", "density"})
+            if (mesh->hasProperty(name))
+                left.emplace_back(name);
+        EXPECT_EQ(left, names) << channels;
+    }
+}
+
+TEST(Triangulate, takesOddMeshesAndLeavesIncompleteOnes)
+{
+    auto const points = Orvan::Array<float3>{{0, 0, 0}, {1, 0, 0}, {0, 1, 0}};
+    auto const empty = makeMesh({}, {}, {});
+    addDataProperty<int>("id", sFaceComp, {}, *empty);
+    triangulate("*", *empty);
+    EXPECT_EQ(valuesOf<unsigned int>(*empty, sFaceOffset), Indices{0});
+    EXPECT_EQ(countsOf(*empty), (Counts{0, 0, 0}));
+    EXPECT_TRUE(dataOf<int>(*empty, "id"));
+
+    // Faces of no corner and of one, offsets that fall and that lead out of the corners: no triangles.
+    auto const odd = makeMesh(points, {0, 1, 2, 0}, {0, 0, 1, 4, 2, 4000000000u, 0, 3});
+    triangulate("*", *odd);
+    EXPECT_EQ(valuesOf<unsigned int>(*odd, sFaceVertex), (Indices{1, 2, 0, 0, 1, 2}));
+
+    auto const noCorners = makeMesh(points, {0, 1, 2}, {0, 3});
+    noCorners->eraseProperty(sFaceVertex);
+    auto const noPositions = makeMesh(points, {0, 1, 2}, {0, 3});
+    addDataProperty<double>(sPointPosition, sPointComp, {0, 1, 2}, *noPositions);
+    auto const shortOffsets = makeMesh(points, {0, 1, 2}, {0, 3});
+    setElementCount(sFaceComp, 2, *shortOffsets);
+    auto const shortPositions = makeMesh(points, {0, 1, 2}, {0, 3});
+    setElementCount(sPointComp, 4, *shortPositions);
+    for (auto const* const mesh : {&noCorners, &noPositions, &shortOffsets, &shortPositions}) {
+        addDataProperty<int>("id", sFaceComp, {1}, **mesh);
+        auto const before = deepCopy(**mesh);
+        triangulate("", **mesh);
+        EXPECT_TRUE(sameContents(**mesh, *before));
+    }
+}
+
+TEST(Triangulate, keepsAClosedSurfaceAndLeavesTrianglesAsTheyAre)
+{
+    auto const prism = makeMesh(
+        {{0, 0, 0}, {3, 0, 0}, {3, 3, 0}, {1, 1, 0}, {0, 3, 0}, {0, 0, 1}, {3, 0, 1}, {3, 3, 1}, {1, 1, 1}, {0, 3, 1}},
+        {4, 3, 2, 1, 0, 5, 6, 7, 8, 9, 0, 1, 6, 5, 1, 2, 7, 6, 2, 3, 8, 7, 3, 4, 9, 8, 4, 0, 5, 9},
+        {0, 5, 10, 14, 18, 22, 26, 30});
+    auto const cut = triangulated(*prism);
+    EXPECT_TRUE(isClosedManifold(*cut));
+    EXPECT_EQ(countsOf(*cut), (Counts{10, 48, 16}));
+    EXPECT_EQ(eulerCharacteristic(*cut), 2);
+    EXPECT_TRUE(sameContents(*triangulated(*cut), *cut));
+}
+
+TEST(Triangulate, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
+{
+    PolygonMesh mesh = PolygonMesh::quads(40).withNoise(0.3f, 1);
+    PolygonMesh const stars = PolygonMesh::stars(2000, 3, 50, 2);
+    for (std::size_t face = 0; face != stars.faceCount(); ++face)
+        mesh.addPolygon(
+            {stars.points.begin() + stars.faceOffset[face], stars.points.begin() + stars.faceOffset[face + 1]});
+    auto const source = withProperties(mesh);
+    expectSameForThreads({1, 2, 8}, [&] { return triangulated(*source); });
+    EXPECT_EQ(fingerprint(*triangulated(*source)), 1934010084424662450u) << "unlike other builds";
+}
+
+TEST(Triangulate, leavesTheMeshAsItWasWhenMemoryRunsOut)
+{
+    for (std::size_t const faces : {1u, 40u}) { // on one thread, and in parallel
+        PolygonMesh const polygons = PolygonMesh::stars(faces, 33, 34, 3);
+        auto const source = polygons.build();
+        addDataProperty("uv", sFaceVertexComp, Orvan::Array<float>(polygons.faceVertex.size()), *source);
+        addDataProperty("drop", sFaceComp, Orvan::Array<float>(faces), *source);
+        addRangeProperty("range", sFaceComp, Orvan::Array<unsigned int>(faces), *source);
+        auto const before = deepCopy(*source);
+        auto const expected = Tessara::createObject();
+        *expected = *source;
+        triangulate("* -drop", *expected);
+        sweepFailingAllocations([&](Attempt const& attempt) {
+            Object mesh = *source;
+            bool const isDone = attempt([&] { triangulate("* -drop", mesh); });
+            EXPECT_TRUE(sameContents(mesh, isDone ? *expected : *before));
+        });
+        EXPECT_TRUE(sameContents(*source, *before));
+    }
+}
