@@ -50,16 +50,22 @@ void requireWritable(fs::path const& file)
             ExitCode::File, fmt::format("cannot write {}: there is no folder {}", file.string(), folder.string()));
 }
 
-Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& report)
+Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& report)
 {
     GeometryFile geometry = readGeometryFile(file);
     stopIfCancelled();
     for (std::string const& note : geometry.notes)
         report.warn(note);
-    requireValid(*geometry.object, file);
     report.document["inputs"].push_back(
         {{"file", file.string()}, {"format", geometry.format}, {"kind", nameOf(typeOf(*geometry.object))}});
     return std::move(geometry.object);
+}
+
+Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& report)
+{
+    Orvan::MutablePtr<Tessara::Object> object = readGeometry(file, report);
+    requireValid(*object, file);
+    return object;
 }
 
 void requireValid(Tessara::Object const& object, fs::path const& file)

@@ -25,6 +25,9 @@ namespace ModelingProgram {
 /// Looks at the name before time is spent: the format, and the folder the file is to go to.
 void requireWritable(std::filesystem::path const& file);
 
+/// Reads a file.
+Orvan::MutablePtr<Tessara::Object> readGeometry(std::filesystem::path const& file, Report& report);
+
 /// Reads a file, and has the host's validator look at it.
 Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);
 

@@ -42,6 +42,20 @@ void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool 
         throw std::runtime_error(TSR::exceptionMessage.c_str());
 }
 
+/// Runs tasks side by side and waits for all of them, also where one fails or cannot be started. They are left out where an
+/// enclosing oneTBB group has been cancelled: let each leave a mark that it was run.
+template <class... Task> void runTasks(Task const&... tasks)
+{
+    tbb::task_group group;
+    try {
+        (group.run([&tasks] { tasks(); }), ...);
+    } catch (...) {
+        group.wait();
+        throw;
+    }
+    group.wait();
+}
+
 /// Runs `work` out of reach of a cancellation of an enclosing oneTBB group: for scans and reductions, which oneTBB
 /// would otherwise leave out silently.
 template <class Work> void runIsolated(Work const& work)

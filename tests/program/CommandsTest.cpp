@@ -121,6 +121,27 @@ TEST_F(Commands, TriangulateKeepsWhatTheChannelsChoose)
     EXPECT_THAT(run("triangulate small.obj out.ply --check").output, HasSubstr("1 (first: face 1)"));
 }
 
+TEST_F(Commands, MergeTellsWhatBecameOfAttributes)
+{
+    copySample("cube.ply");
+    copySample("spider.obj");
+    json const done = runForJson("merge cube.ply spider.obj cube.ply cube.ply --source-attribute file");
+    EXPECT_EQ(done["exitCode"], 0);
+    EXPECT_EQ(done["after"]["faces"], 6 + 1368 + 6);
+    EXPECT_EQ(done["after"], done["before"]);
+    json const names = {"normal", "uv", "file"};
+    for (json const& property : done["properties"]) {
+        EXPECT_THAT(names, testing::Contains(property["name"])) << property;
+        EXPECT_EQ(property["missingIn"].size(), 0) << property;
+    }
+    write(folder / "a.xyz", "0 0 0\n1 1 1\n");
+    write(folder / "b.xyz", "0 0 0 0 0 1\n");
+    json const clouds = runForJson("merge a.xyz b.xyz out.ply");
+    EXPECT_EQ(clouds["properties"][0]["name"], "normal");
+    EXPECT_EQ(clouds["properties"][0]["missingIn"], json({"a.xyz"}));
+    EXPECT_EQ(clouds["after"]["points"], 3);
+}
+
 TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
 {
     for (char const* const name : {"cylinder.obj", "sphere-with-hole.stl", "cube.ply", "spider.obj"})
@@ -142,6 +163,9 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"remove-slivers cube.ply out.obj", 5, "lie in the same place as another point"},
         {"remove-slivers spider.obj out.obj", 5, "At 10 edges neighbouring faces look to opposite sides"},
         {"remove-slivers lines.obj out.obj", 5, "lines.obj holds a strand set"},
+        {"merge lines.obj cube.ply out.obj", 5, "lines.obj holds a strand set"},
+        {"merge cube.ply spider.obj out.obj --source-attribute normal", 5, "already has a property"},
+        {"merge out.obj", 2, "and then the one to write"},
         {"triangulate lines.obj out.obj", 5, "lines.obj holds a strand set"},
         {"triangulate cube.ply out.obj --channels '* ^'", 2, "--channels: "},
         {"remove-slivers missing.obj out.obj", 3, "missing.obj"},
@@ -184,7 +208,7 @@ TEST_F(Commands, InfoAndValidateTellAboutFiles)
     EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (0.1, 0, 0)"));
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
-    for (char const* const command : {"", "info ", "validate ", "triangulate ", "remove-slivers "})
+    for (char const* const command : {"", "info ", "validate ", "merge ", "triangulate ", "remove-slivers "})
         EXPECT_EQ(run(command + std::string("--help")).exitCode, 0) << command;
     EXPECT_EQ(run("--version").exitCode, 0);
 }

@@ -1,0 +1,232 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "Operation.h"
+
+#include <Modeling/mergeMeshes.h>
+#include <Modeling/mergePointClouds.h>
+#include <Modeling/mergeStrands.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <map>
+#include <memory>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using Tessara::Object;
+    using Inputs = Orvan::Array<Orvan::Ptr<Object>>;
+
+    struct Options {
+        std::vector<std::filesystem::path> files; // the last one is written
+        std::string sourceAttribute;
+    };
+
+    /// The inputs that are merged, and where they come from.
+    struct Sources {
+        Inputs objects;
+        std::vector<std::string> files;
+        GeometryType type = GeometryType::None;
+    };
+
+    Sources readSources(Options const& options, Report& report)
+    {
+        Sources sources;
+        report.document["skipped"] = Json::array();
+        for (std::size_t i = 0; i + 1 != options.files.size(); ++i) {
+            std::string const file = options.files[i].string();
+            Orvan::Ptr<Object> object = readGeometry(options.files[i], report);
+            if (auto const status = validate(*object); !status) {
+                report.warn(fmt::format("{} is skipped: {}", file, status.message().view()));
+                report.document["skipped"].push_back({{"file", file}, {"reason", status.message().c_str()}});
+                continue;
+            }
+            sources.objects.append(std::move(object));
+            sources.files.push_back(file);
+        }
+        if (sources.objects.empty())
+            throw Failure(ExitCode::Invalid, "none of the files holds valid geometry");
+        return sources;
+    }
+
+    void requireOneKind(Sources& sources)
+    {
+        sources.type = typeOf(*sources.objects[0]);
+        std::vector<std::string> kinds;
+        bool areAlike = true;
+        for (std::size_t i = 0; i != sources.files.size(); ++i) {
+            GeometryType const type = typeOf(*sources.objects[i]);
+            areAlike = areAlike && type == sources.type;
+            kinds.push_back(fmt::format("{} holds a {}", sources.files[i], nameOf(type)));
+        }
+        if (!areAlike)
+            throw Failure(ExitCode::Refused,
+                "merge joins meshes with meshes, point clouds with point clouds, or strand sets with strand sets",
+                std::move(kinds));
+    }
+
+    char const* elementsOf(GeometryType type)
+    {
+        using namespace Tessara::Geometry;
+        return type == GeometryType::Mesh ? sFaceComp : type == GeometryType::Strands ? sStrandComp : sPointComp;
+    }
+
+    /// Each face, strand or point of a cloud gets the number of its input.
+    void numberSources(std::string const& attribute, Sources& sources)
+    {
+        using namespace Tessara::Geometry;
+        for (std::size_t i = 0; i != sources.files.size(); ++i) {
+            Orvan::MutablePtr<Object> object = makeMutable(std::move(sources.objects[i]));
+            if (object->hasProperty(attribute.c_str()))
+                throw Failure(ExitCode::Refused,
+                    fmt::format("--source-attribute: {} already has a property \"{}\"", sources.files[i], attribute));
+            Orvan::String const component = elementsOf(sources.type);
+            std::uint64_t const count = getElementCount(*object, component);
+            addDataProperty(attribute.c_str(), component, Orvan::Array<int>(count, static_cast<int>(i)), *object);
+            sources.objects[i] = std::move(object);
+        }
+    }
+
+    bool merge(Sources const& sources, Object& output)
+    {
+        using namespace Tessara::GeometryAlgorithms;
+        switch (sources.type) {
+        case GeometryType::Mesh:
+            return mergeMeshes(sources.objects, output, nullptr);
+        case GeometryType::PointCloud:
+            return mergePointClouds(sources.objects, output, nullptr);
+        case GeometryType::Strands:
+            return mergeStrands(sources.objects, output, nullptr);
+        case GeometryType::None:
+            break;
+        }
+        return false;
+    }
+
+    Json totalsOf(Sources const& sources)
+    {
+        Json totals = Json::object();
+        for (auto const& object : sources.objects) {
+            Json const counts = countsOf(*object);
+            for (auto const& [key, count] : counts.items())
+                totals[key] = totals.value(key, std::uint64_t{0}) + count.get<std::uint64_t>();
+        }
+        return totals;
+    }
+
+    /// What became of a property: the files in which its elements got the default, for want of it or for its type there.
+    struct Outcome {
+        Property property; // as merged
+        std::vector<std::string> missingIn;
+        std::vector<std::string> otherTypeIn;
+    };
+
+    std::vector<Outcome> outcomesOf(Sources const& sources, Object const& merged)
+    {
+        std::vector<Outcome> outcomes;
+        for (Property& property : propertiesOf(merged))
+            if (!property.isStandard && !property.component.empty())
+                outcomes.push_back({std::move(property), {}, {}});
+        for (std::size_t i = 0; i != sources.files.size(); ++i) {
+            std::map<std::string, std::string> types;
+            for (Property const& property : propertiesOf(*sources.objects[i]))
+                types.emplace(property.name, property.type);
+            for (Outcome& outcome : outcomes) {
+                auto const present = types.find(outcome.property.name);
+                if (present == types.end())
+                    outcome.missingIn.push_back(sources.files[i]);
+                else if (present->second != outcome.property.type)
+                    outcome.otherTypeIn.push_back(fmt::format("{} ({})", sources.files[i], present->second));
+            }
+        }
+        return outcomes;
+    }
+
+    std::vector<std::string> droppedIn(Sources const& sources, Object const& merged)
+    {
+        std::vector<std::string> dropped;
+        for (auto const& object : sources.objects)
+            for (std::string& name : namesMissingIn(merged, *object))
+                if (std::find(dropped.begin(), dropped.end(), name) == dropped.end())
+                    dropped.push_back(std::move(name));
+        return dropped;
+    }
+
+    void reportOutcomes(std::vector<Outcome> const& outcomes, Report& report)
+    {
+        report.document["properties"] = Json::array();
+        std::vector<std::vector<std::string>> rows;
+        auto const filesIn = [](std::vector<std::string> const& files) {
+            constexpr std::size_t kNamed = 3;
+            std::string const named = fmt::format("{}",
+                fmt::join(
+                    files.begin(), files.begin() + static_cast<std::ptrdiff_t>(std::min(kNamed, files.size())), ", "));
+            return files.empty()         ? "-"
+                : files.size() <= kNamed ? named
+                                         : fmt::format("{} and {} more", named, groupDigits(files.size() - kNamed));
+        };
+        for (Outcome const& outcome : outcomes) {
+            Property const& property = outcome.property;
+            report.document["properties"].push_back(
+                {{"name", property.name}, {"type", property.type}, {"component", property.component},
+                    {"missingIn", outcome.missingIn}, {"otherTypeIn", outcome.otherTypeIn}});
+            rows.push_back({property.name, property.type, property.component, filesIn(outcome.missingIn),
+                filesIn(outcome.otherTypeIn)});
+        }
+        if (!rows.empty())
+            report.text += formatTable({{"property"}, {"type"}, {"of"}, {"default, as it is missing in"},
+                                           {"default, as it has another type in"}},
+                               rows)
+                + "\n";
+    }
+
+    void mergeFiles(Options const& options, Report& report)
+    {
+        std::filesystem::path const& out = options.files.back();
+        if (options.files.size() < 2)
+            throw Failure(ExitCode::CommandLine, "merge takes one file or more to read, and then the one to write");
+        requireWritable(out);
+        Sources sources = readSources(options, report);
+        requireOneKind(sources);
+        if (!options.sourceAttribute.empty())
+            numberSources(options.sourceAttribute, sources);
+
+        auto const merged = Tessara::createObject();
+        bool isDone = false;
+        runOperation(report, [&] { isDone = merge(sources, *merged); });
+        if (!isDone)
+            throw Failure(ExitCode::Refused, "there would be more than 4,294,967,295 elements of one kind");
+
+        saveGeometry(*merged, out, report);
+        reportOutcomes(outcomesOf(sources, *merged), report);
+        reportOperation(totalsOf(sources), countsOf(*merged), droppedIn(sources, *merged), report);
+    }
+
+}
+
+void addMerge(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"merge", "Join meshes, point clouds or strand sets into one, with all attributes",
+        R"(The files may have different formats, but have to hold the same kind of geometry. A file whose geometry
+is not valid is skipped, and named. Of each attribute the first file that has it decides the type;
+elements of files that do not have it, or have it with another type, get the default.)",
+        "  modeling merge a.obj b.ply c.off all.ply\n"
+        "  modeling merge scan-*.ply all.ply --source-attribute scan"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    command.add_option("FILES", options->files, "Files to read, and at the end the one to write (may be one of them)")
+        ->required()
+        ->option_text("IN... OUT");
+    command
+        .add_option("--source-attribute", options->sourceAttribute,
+            "Store the number of the file, from 0, under that name: for each face, strand, or point of a cloud")
+        ->type_name("NAME");
+    onSelected(command, invocation, [options](Report& report) { mergeFiles(*options, report); });
+}
+
+}

@@ -1,0 +1,54 @@
+#include "MergedComponents.h"
+
+#include "frame/Arrays.h"
+#include "host/GeoProperties.h"
+
+#include <TessaraGeometry/Lookup.h>
+
+#include <algorithm>
+
+namespace Modeling::Internal {
+
+void transferComponentProperties(Orvan::String const& component, Tessara::Object& source, Tessara::Object& output)
+{
+    Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = source.keys();
+    for (Orvan::String const& key : *keys) {
+        bool const belongs = key == component || Tessara::Geometry::getTargetComponent(source, key) == component;
+        if (belongs && !key.empty())
+            output.setProperty(key, source.getProperty(key));
+    }
+    source.eraseAllProperties();
+}
+
+void rebaseRegions(Offsets const& regionOffsets, Orvan::Array<unsigned int>& values, Offsets const& baseOffsets)
+{
+    if (baseOffsets.size <= 2)
+        return; // one input
+    // Each region is one iteration's own.
+    parallelFor(tbb::blocked_range<std::size_t>(1, baseOffsets.size - 1, kFaceGrain), [&](auto const& regions) {
+        for (std::size_t region = regions.begin(); region != regions.end(); ++region) {
+            unsigned int const base = baseOffsets[region];
+            std::size_t const end = std::min<std::size_t>(regionOffsets[region + 1], values.size);
+            std::size_t const begin = std::min<std::size_t>(regionOffsets[region], end);
+            // Each value is written once.
+            parallelFor(tbb::blocked_range<std::size_t>(begin, end, kElementGrain),
+                [data = values.data, base](auto const& elements) {
+                    for (std::size_t element = elements.begin(); element != elements.end(); ++element)
+                        data[element] += base;
+                });
+        }
+    });
+}
+
+bool finishConnectivity(Connectivity const& connectivity, Offsets const& regionOffsets, Tessara::Object& output)
+{
+    if (connectivity.merged && readGeoPropData<unsigned int>(output, connectivity.name) == connectivity.merged)
+        return true;
+    return editGeoPropData<unsigned int>(connectivity.name, output, [&](Orvan::Array<unsigned int>& values) {
+        if (connectivity.closingEntry)
+            values.append(*connectivity.closingEntry);
+        rebaseRegions(regionOffsets, values, connectivity.baseOffsets);
+    });
+}
+
+}

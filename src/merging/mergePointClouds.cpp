@@ -1,0 +1,28 @@
+#include <Modeling/copyNonGeoProperties.h>
+#include <Modeling/mergePointClouds.h>
+
+#include "mergeGeoComponent.h"
+
+#include <TessaraGeometry/Names.h>
+#include <TessaraGeometry/Populate.h>
+#include <TessaraGeometry/Validators.h>
+
+namespace Tessara::GeometryAlgorithms {
+
+using namespace Modeling::Internal;
+using namespace Tessara::Geometry;
+
+bool mergePointClouds(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
+{
+    MergePlan const plan = planMerge(filterValid<PointCloudValidator>(holdInputs(inputs, output)));
+    std::optional<Offsets> const pointOffsets = computeElementOffsets(plan.inputs, sPointComp);
+    if (plan.inputs.empty() || !pointOffsets)
+        return false;
+
+    populatePointCloud(output);
+    mergeGeoComponent(plan, sPointComp, *pointOffsets, nullptr, output);
+    copyNonGeoProperties(plan.inputs, output);
+    return true;
+}
+
+}

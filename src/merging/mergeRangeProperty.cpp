@@ -1,0 +1,154 @@
+#include "mergeRangeProperty.h"
+
+#include "frame/Arrays.h"
+#include "frame/ElementTypes.h"
+#include "mergeDataProperty.h"
+
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Names.h>
+#include <TessaraGeometry/Populate.h>
+
+#include <algorithm>
+#include <limits>
+#include <new>
+
+namespace Modeling::Internal {
+
+using namespace Tessara::Geometry;
+using Tessara::Object;
+using Tessara::PropertyValue;
+
+namespace {
+
+    using IndexArray = Orvan::Array<unsigned int>;
+
+    /// Its indices, where the input has the range and anything that targets it; otherwise null.
+    Orvan::Ptr<IndexArray> sourceIndices(MergePlan const& plan, std::size_t input, Orvan::String const& rangeName)
+    {
+        Orvan::Ptr<IndexArray> indices = getRangeGeoPropIndices(*plan.inputs[input], rangeName);
+        bool const hasDependents = std::any_of(plan.properties[input].data.begin(), plan.properties[input].data.end(),
+            [&](GeoProperty const& data) { return data.target == rangeName; });
+        return hasDependents ? indices : nullptr;
+    }
+
+    std::vector<Orvan::Ptr<IndexArray>> collectSourceIndices(MergePlan const& plan, Orvan::String const& rangeName)
+    {
+        std::vector<Orvan::Ptr<IndexArray>> sources(plan.inputs.size);
+        // Each input has its own entry.
+        parallelFor(tbb::blocked_range<std::size_t>(0, sources.size(), kFaceGrain), [&](auto const& inputs) {
+            for (std::size_t input = inputs.begin(); input != inputs.end(); ++input)
+                sources[input] = sourceIndices(plan, input, rangeName);
+        });
+        return sources;
+    }
+
+    /// The length of the data in one input: that of the shortest array. Lengths count by their low 32 bits.
+    unsigned int smallestDependentSize(Object const& input, std::vector<DataPropertyMergeEntry> const& dependents)
+    {
+        unsigned int smallest = kInvalidIndex;
+        for (DataPropertyMergeEntry const& dependent : dependents) {
+            Orvan::Ptr<Object> const property = getDataGeoProperty(input, dependent.name);
+            if (!property)
+                continue;
+            PropertyValue const data = property->getProperty(sData);
+            bool ignored = false;
+            forEachElementType<AllElementTypes, ArrayForm>(
+                &data, &ignored, [&]<class T>(Orvan::Ptr<Orvan::Array<T>>& values) {
+                    if (values)
+                        smallest = std::min(smallest, static_cast<unsigned int>(values->size));
+                    return true;
+                });
+        }
+        return smallest == kInvalidIndex ? 0 : smallest;
+    }
+
+    Offsets computeDependentOffsets(MergeInputs const& inputs, std::vector<DataPropertyMergeEntry> const& dependents)
+    {
+        Offsets offsets(inputs.size + 1, Orvan::kUninitialized);
+        std::uint64_t total = 0;
+        for (std::uint64_t input = 0; input != inputs.size; ++input) {
+            offsets[input] = static_cast<unsigned int>(total);
+            total += smallestDependentSize(*inputs[input], dependents);
+            if (total >= std::numeric_limits<unsigned int>::max()) // the default behind it has an index too
+                throw std::bad_alloc();
+        }
+        offsets[inputs.size] = static_cast<unsigned int>(total);
+        return offsets;
+    }
+
+    /// Index arrays that are not as long as their component: those that are longer run on into the elements of later
+    /// inputs (up to the end), those that are shorter leave what is there. So what is not written by its own input is
+    /// written here, by ascending inputs.
+    void writeOverruns(std::vector<Orvan::Ptr<IndexArray>> const& sources, Offsets const& elementOffsets,
+        Offsets const& dependentOffsets, IndexArray& merged)
+    {
+        for (std::size_t input = 0; input != sources.size(); ++input) {
+            std::uint64_t const count = elementOffsets[input + 1] - elementOffsets[input];
+            if (!sources[input] || sources[input]->size <= count)
+                continue;
+            std::uint64_t const end = std::min(sources[input]->size, merged.size - elementOffsets[input]);
+            copyRaised(sources[input]->data + count, end - count, dependentOffsets[input],
+                merged.data + elementOffsets[input] + count);
+        }
+    }
+
+    IndexArray mergeIndices(std::vector<Orvan::Ptr<IndexArray>> const& sources, Offsets const& elementOffsets,
+        Offsets const& dependentOffsets)
+    {
+        std::size_t const inputCount = sources.size();
+        auto const countOf = [&](std::size_t input) { return elementOffsets[input + 1] - elementOffsets[input]; };
+        bool fits = true;
+        for (std::size_t input = 0; input != inputCount; ++input)
+            fits = fits && (!sources[input] || sources[input]->size == countOf(input));
+
+        IndexArray merged = uninitializedArray<unsigned int>(elementOffsets[inputCount]);
+        if (!fits) {
+            fillElements(merged.data, merged.size, 0u);
+            writeOverruns(sources, elementOffsets, dependentOffsets, merged);
+        }
+        // Each input writes its own elements.
+        parallelFor(tbb::blocked_range<std::size_t>(0, inputCount, kFaceGrain), [&](auto const& inputs) {
+            for (std::size_t input = inputs.begin(); input != inputs.end(); ++input) {
+                std::uint64_t const count = countOf(input);
+                unsigned int* const target = merged.data + elementOffsets[input];
+                if (sources[input])
+                    copyRaised(
+                        sources[input]->data, std::min(count, sources[input]->size), dependentOffsets[input], target);
+                else
+                    fillElements(target, count, dependentOffsets[inputCount]);
+            }
+        });
+        return merged;
+    }
+
+}
+
+void mergeRangeProperty(MergePlan const& plan, Offsets const& elementOffsets, RangePropertyMergeEntry& entry)
+{
+    std::vector<Orvan::Ptr<IndexArray>> const sources = collectSourceIndices(plan, entry.name);
+    Offsets const dependentOffsets = computeDependentOffsets(plan.inputs, entry.dependents);
+    entry.mergedIndices = Orvan::makePtr<IndexArray>(mergeIndices(sources, elementOffsets, dependentOffsets));
+
+    bool const needsDefaultSlot = std::find(sources.begin(), sources.end(), nullptr) != sources.end();
+    // Each dependent is one iteration's own.
+    parallelFor(tbb::blocked_range<std::size_t>(0, entry.dependents.size(), kFaceGrain), [&](auto const& dependents) {
+        for (std::size_t dependent = dependents.begin(); dependent != dependents.end(); ++dependent) {
+            mergeDataProperty(plan.inputs, dependentOffsets, nullptr, entry.dependents[dependent]);
+            if (needsDefaultSlot)
+                appendDefaultValue(entry.dependents[dependent]);
+        }
+    });
+}
+
+bool addMergedRangeProperty(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>> const& mergedIndices,
+    Orvan::String const& component, Object& target)
+{
+    Orvan::MutablePtr<Object> range = Tessara::createObject();
+    if (!populateRangeGeoProperty(mergedIndices, component, *range))
+        return false;
+    if (!name.empty())
+        target.setProperty(name, Orvan::Ptr<Object>(std::move(range)));
+    return true;
+}
+
+}

@@ -1,0 +1,385 @@
+#include "PlainMerge.h"
+
+#include "merging/MergedComponents.h"
+#include "support/Compare.h"
+#include "support/FailingAllocations.h"
+#include "support/MeshChecks.h"
+#include "support/PolygonMesh.h"
+#include "support/PropertyBag.h"
+#include "support/Threads.h"
+
+#include <Modeling/copyNonGeoProperties.h>
+#include <Modeling/mergeMeshes.h>
+#include <Modeling/mergePointClouds.h>
+#include <Modeling/mergeStrands.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <gtest/gtest.h>
+#include <tbb/parallel_for.h>
+
+#include <string>
+#include <thread>
+#include <vector>
+
+using namespace Tessara::Geometry;
+using namespace Tessara::GeometryAlgorithms;
+using namespace TestSupport;
+using PlainMerge::Inputs;
+using Tessara::Object;
+
+namespace {
+
+using Indices = std::vector<unsigned int>;
+
+enum class Kind { Meshes, PointClouds, Strands };
+
+bool merge(Kind kind, Inputs const& inputs, Object& output)
+{
+    return kind == Kind::Meshes     ? mergeMeshes(inputs, output, nullptr)
+        : kind == Kind::PointClouds ? mergePointClouds(inputs, output, nullptr)
+                                    : mergeStrands(inputs, output, nullptr);
+}
+
+bool mergePlainly(Kind kind, Inputs const& inputs, Object& output)
+{
+    return kind == Kind::Meshes     ? PlainMerge::mergeMeshes(inputs, output)
+        : kind == Kind::PointClouds ? PlainMerge::mergePointClouds(inputs, output)
+                                    : PlainMerge::mergeStrands(inputs, output);
+}
+
+Orvan::Array<float3> randomPositions(std::size_t count, Random& random)
+{
+    Orvan::Array<float3> positions(count);
+    for (float3& p : positions)
+        p = {random.coordinate(), random.coordinate(), random.coordinate()};
+    return positions;
+}
+
+Orvan::Ptr<Object> randomInput(Kind kind, std::size_t size, Random& random)
+{
+    std::size_t const pointCount = size + random.below(4);
+    Orvan::Array<unsigned int> offsets{0};
+    Orvan::Array<unsigned int> corners;
+    Orvan::MutablePtr<Object> input;
+    std::vector<char const*> components{sPointComp};
+    if (kind == Kind::Meshes) {
+        for (std::size_t face = pointCount == 0 ? 0 : random.below(size + 1); face != 0; --face) {
+            for (unsigned int corner = random.below(5); corner != 0; --corner)
+                corners.append(random.below(pointCount));
+            offsets.append(static_cast<unsigned int>(corners.size));
+        }
+        input = makeMesh(randomPositions(pointCount, random), std::move(corners), std::move(offsets));
+        components = {sPointComp, sFaceVertexComp, sFaceComp};
+    } else if (kind == Kind::Strands) {
+        for (std::size_t point = 0; point < pointCount;) {
+            point = std::min(pointCount, point + random.below(4));
+            offsets.append(static_cast<unsigned int>(point));
+        }
+        input = makeStrands(randomPositions(pointCount, random), std::move(offsets));
+        components = {sPointComp, sStrandComp};
+    } else {
+        input = makePointCloud(randomPositions(pointCount, random));
+    }
+    for (char const* const component : components)
+        addRandomProperties(component, random, *input);
+    if (random.below(3) == 0)
+        input->setProperty("note", static_cast<int>(random.below(100)));
+    if (random.below(8) == 0)
+        setElementCount(sPointComp, 12345, *input); // no longer valid
+    if (random.below(8) == 0)
+        addDataProperty<float>("sPointComp1", components.back(), Orvan::Array<float>(size), *input);
+    return input;
+}
+
+struct Trial {
+    explicit Trial(unsigned int seed)
+    {
+        Random random(seed);
+        kind = static_cast<Kind>(seed % 3);
+        for (std::size_t input = 1 + random.below(5); input != 0; --input)
+            inputs.append(random.below(6) == 0 && !inputs.empty()
+                    ? inputs[0]
+                    : randomInput(kind, random.below(random.below(40) == 0 ? 3000 : 7), random));
+        if (random.below(3) == 0)
+            output->setProperty("note", 1.5);
+    }
+
+    Kind kind;
+    Inputs inputs;
+    Orvan::MutablePtr<Object> output = Tessara::createObject();
+};
+
+Orvan::Array<Orvan::Ptr<Object>> copiesOf(Inputs const& inputs)
+{
+    Inputs copies;
+    for (auto const& input : inputs)
+        copies.append(deepCopy(*input));
+    return copies;
+}
+
+void expectUnchanged(Inputs const& inputs, Inputs const& before)
+{
+    for (std::size_t input = 0; input != inputs.size; ++input)
+        EXPECT_TRUE(sameContents(*inputs[input], *before[input])) << "input " << input;
+}
+
+template <class T> std::vector<T> valuesOf(Object const& object, char const* name)
+{
+    auto const values = dataOf<T>(object, name);
+    return values ? std::vector<T>(values->begin(), values->end()) : std::vector<T>();
+}
+
+Indices indicesOf(Object const& object, char const* range)
+{
+    auto const indices = getRangeGeoPropIndices(object, range);
+    return indices ? Indices(indices->begin(), indices->end()) : Indices();
+}
+
+Orvan::MutablePtr<Object> cloudOf(std::size_t count)
+{
+    return makePointCloud(Orvan::Array<float3>(count));
+}
+
+template <class... Input> Inputs inputsOf(Input&&... input)
+{
+    Inputs inputs;
+    (inputs.append(Orvan::Ptr<Object>(std::forward<Input>(input))), ...);
+    return inputs;
+}
+
+Orvan::MutablePtr<Object> mergedClouds(Inputs const& inputs)
+{
+    auto output = Tessara::createObject();
+    EXPECT_TRUE(mergePointClouds(inputs, *output, nullptr));
+    return output;
+}
+
+}
+
+TEST(Merge, agreesWithPlainMergingOnRandomInputs)
+{
+    for (unsigned int seed = 0; seed != 6000; ++seed) {
+        SCOPED_TRACE(seed);
+        Trial const trial(seed);
+        Inputs const before = copiesOf(trial.inputs);
+        auto const expected = deepCopy(*trial.output);
+        bool const isMerged = mergePlainly(trial.kind, trial.inputs, *expected);
+        ASSERT_EQ(merge(trial.kind, trial.inputs, *trial.output), isMerged);
+        ASSERT_TRUE(sameContents(*trial.output, *expected));
+        expectUnchanged(trial.inputs, before);
+        if (isMerged) {
+            ASSERT_TRUE(isValid(*trial.output));
+        }
+    }
+}
+
+TEST(Merge, fillsHolesWithTheDefaultOfTheFirstInputThatHasTheProperty)
+{
+    auto first = cloudOf(3);
+    addDataProperty<int>("elsewhere", "nowhere", {1, 2, 3}, *first, 7);
+    addDataProperty<int>("long", sPointComp, {1, 2, 3, 4, 5}, *first, 9);
+    addDataProperty<int>("type", sPointComp, {1, 2, 3}, *first, 5);
+    auto second = cloudOf(2);
+    addDataProperty<Orvan::String>("late", sPointComp, {"a", "b"}, *second, "none");
+    addDataProperty<int>("elsewhere", sPointComp, {4, 5}, *second, 8);
+    addDataProperty<int>("long", sPointComp, {6}, *second, -1);
+    addDataProperty<float>("type", sPointComp, {1.5f, 2.5f}, *second);
+    auto const merged = mergedClouds(inputsOf(std::move(first), std::move(second)));
+    EXPECT_EQ(valuesOf<Orvan::String>(*merged, "late"), (std::vector<Orvan::String>{"none", "none", "none", "a", "b"}));
+    EXPECT_EQ(valuesOf<int>(*merged, "elsewhere"), (std::vector<int>{1, 2, 3, 4, 5})) << "its own target is not asked";
+    EXPECT_EQ(getGeoPropTargetName(*merged, "elsewhere"), sPointComp);
+    EXPECT_EQ(valuesOf<int>(*merged, "long"), (std::vector<int>{1, 2, 3, 6, 9}));
+    EXPECT_EQ(valuesOf<int>(*merged, "type"), (std::vector<int>{1, 2, 3, 5, 5}));
+}
+
+TEST(Merge, raisesRangesAndGivesInputsWithoutThemADefault)
+{
+    auto const with = [](std::size_t count, Indices const& indices, std::vector<int> const& data) {
+        auto cloud = cloudOf(count);
+        addRangeProperty("material", sPointComp, Orvan::Array<unsigned int>(std::span(indices)), *cloud);
+        if (!data.empty())
+            addDataProperty<int>("color", "material", Orvan::Array<int>(std::span(data)), *cloud, 77);
+        return cloud;
+    };
+    struct Case {
+        char const* name;
+        Orvan::MutablePtr<Object> second;
+        Indices indices;
+        std::vector<int> colors;
+    };
+    Case const cases[] = {
+        {"both have it", with(2, {1, 0}, {40, 50}), {0, 2, 1, 4, 3}, {10, 20, 30, 40, 50}},
+        {"the second lacks it", cloudOf(2), {0, 2, 1, 3, 3}, {10, 20, 30, 77}},
+        {"the second has no data", with(2, {0, 0}, {}), {0, 2, 1, 3, 3}, {10, 20, 30, 77}},
+        {"too short", with(2, {1}, {40, 50}), {0, 2, 1, 4, 0}, {10, 20, 30, 40, 50}},
+        {"invalid indices wrap", with(2, {kInvalidIndex, 0}, {40}), {0, 2, 1, 2, 3}, {10, 20, 30, 40}},
+    };
+    for (auto const& [name, second, indices, colors] : cases) {
+        auto const merged = mergedClouds(inputsOf(with(3, {0, 2, 1}, {10, 20, 30}), deepCopy(*second)));
+        EXPECT_EQ(indicesOf(*merged, "material"), indices) << name;
+        EXPECT_EQ(valuesOf<int>(*merged, "color"), colors) << name;
+    }
+    // One that is too long runs on into the next one's elements, where those are not written; never behind the end.
+    auto const merged =
+        mergedClouds(inputsOf(with(1, {0, 1, 2, 3, 4}, {1}), with(2, {0}, {2}), with(1, {0, 9, 9}, {3})));
+    EXPECT_EQ(indicesOf(*merged, "material"), (Indices{0, 1, 2, 2}));
+
+    // Data of the host's own records gets no default behind it, although indices point there.
+    auto located = with(1, {0}, {});
+    addDataProperty("location", "material", Orvan::Array<Common::GeoLocation>(1), *located);
+    auto const half = mergedClouds(inputsOf(std::move(located), cloudOf(1)));
+    EXPECT_EQ(indicesOf(*half, "material"), (Indices{0, 1}));
+    EXPECT_EQ(dataOf<Common::GeoLocation>(*half, "location")->size, 1u);
+}
+
+TEST(Merge, joinsConnectivity)
+{
+    Orvan::Ptr<Object> const triangle = makeMesh({{0, 0, 0}, {1, 0, 0}, {0, 1, 0}}, {0, 1, 2}, {0, 3});
+    auto const output = Tessara::createObject();
+    ASSERT_TRUE(
+        mergeMeshes(inputsOf(triangle, makeMesh({{5, 5, 5}}, {}, {0}), cloudOf(2), nullptr, deepCopy(*triangle)),
+            *output, nullptr));
+    EXPECT_EQ(valuesOf<unsigned int>(*output, sFaceVertex), (Indices{0, 1, 2, 4, 5, 6}));
+    EXPECT_EQ(valuesOf<unsigned int>(*output, sFaceOffset), (Indices{0, 3, 6}));
+    EXPECT_EQ(countsOf(*output), (Counts{7, 6, 2}));
+
+    auto const strands = Tessara::createObject();
+    ASSERT_TRUE(mergeStrands(inputsOf(makeStrands(Orvan::Array<float3>(10), {0, 4, 10}), makeStrands({{}, {}}, {0}),
+                                 makeStrands(Orvan::Array<float3>(6), {0, 6})),
+        *strands, nullptr));
+    EXPECT_EQ(valuesOf<unsigned int>(*strands, sStrandOffset), (Indices{0, 4, 12, 18}));
+}
+
+TEST(Merge, refusesWhatItCannotMergeAndTouchesNothing)
+{
+    // That many elements do not fit here, so only their counts are asked.
+    auto const huge = [] {
+        auto object = cloudOf(0);
+        addComponent(sPointComp, 3'000'000'000u, *object);
+        return object;
+    };
+    EXPECT_TRUE(Modeling::Internal::computeElementOffsets(inputsOf(huge()), sPointComp));
+    EXPECT_FALSE(Modeling::Internal::computeElementOffsets(inputsOf(huge(), huge()), sPointComp));
+
+    for (Kind const kind : {Kind::Meshes, Kind::PointClouds, Kind::Strands})
+        for (Inputs const& inputs : {Inputs{}, Inputs{nullptr}}) {
+            auto const output = cloudOf(2);
+            auto const before = deepCopy(*output);
+            EXPECT_FALSE(merge(kind, inputs, *output));
+            EXPECT_TRUE(sameContents(*output, *before));
+        }
+}
+
+TEST(Merge, takesTheOutputAsAnInput)
+{
+    for (unsigned int seed = 0; seed != 60; ++seed) {
+        SCOPED_TRACE(seed);
+        Trial const trial(seed);
+        Orvan::MutablePtr<Object> output = deepCopy(*trial.inputs[0]);
+        auto const expected = deepCopy(*output);
+        bool const isMerged =
+            mergePlainly(trial.kind, inputsOf(deepCopy(*output), trial.inputs[0], deepCopy(*output)), *expected);
+        Object& written = *output;
+        Orvan::Ptr<Object> const shared = std::move(output);
+        EXPECT_EQ(merge(trial.kind, inputsOf(shared, trial.inputs[0], shared), written), isMerged);
+        EXPECT_TRUE(sameContents(*shared, *expected));
+    }
+}
+
+TEST(Merge, copiesWhatIsNoGeometryFromTheFirstInputThatHasIt)
+{
+    auto first = Tessara::createObject();
+    first->setProperty("a", 1);
+    Orvan::Ptr<Object> const object = cloudOf(1);
+    first->setProperty("object", Orvan::Ptr<Object>(object));
+    first->setProperty("null", Orvan::Ptr<Object>());
+    auto second = cloudOf(1);
+    second->setProperty("a", 2.5);
+    second->setProperty("b", Orvan::String("text"));
+    second->setProperty("kept", 4);
+    addDataProperty<int>("data", sPointComp, {1}, *second);
+    addRangeProperty("range", sPointComp, {0}, *second);
+    auto const output = Tessara::createObject();
+    output->setProperty("kept", 3);
+    copyNonGeoProperties(inputsOf(std::move(first), nullptr, std::move(second)), *output);
+    EXPECT_EQ(*output->getProperty("a").get<int>(), 1);
+    EXPECT_EQ(*output->getProperty("b").get<Orvan::String>(), "text");
+    EXPECT_EQ(*output->getProperty("kept").get<int>(), 3);
+    EXPECT_EQ(*output->getProperty("object").get<Orvan::Ptr<Object>>(), object);
+    EXPECT_TRUE(output->hasProperty("null"));
+    for (char const* const name : {"data", "range", sPointComp, sPointPosition})
+        EXPECT_FALSE(output->hasProperty(name)) << name;
+}
+
+TEST(Merge, raisesAnArrayThatHasTakenThePlaceOfTheConnectivity)
+{
+    using namespace Modeling::Internal;
+    Offsets const regions{0, 2, 3, 5}, bases{0, 10, 100, 1000};
+    auto const output = cloudOf(0);
+    addDataProperty<unsigned int>("other", sPointComp, {1, 2, 3, 4}, *output); // shorter than the regions
+    EXPECT_TRUE(finishConnectivity({"other", bases, 1000u, nullptr}, regions, *output));
+    EXPECT_EQ(valuesOf<unsigned int>(*output, "other"), (Indices{1, 2, 13, 104, 1100}));
+    addDataProperty<int>("other", sPointComp, {1, 2, 3, 4}, *output);
+    EXPECT_FALSE(finishConnectivity({"other", bases, 1000u, nullptr}, regions, *output));
+}
+
+TEST(Merge, leavesCancelledGroupsWithoutAResult)
+{
+    Orvan::Ptr<Object> const mesh = PolygonMesh::quads(3).build();
+    Orvan::Ptr<Object> const strands = makeStrands(Orvan::Array<float3>(4), {0, 4});
+    auto const meshOutput = cloudOf(1);
+    auto const strandOutput = Tessara::createObject();
+    tbb::task_group group;
+    group.run_and_wait([&] {
+        group.cancel();
+        EXPECT_FALSE(mergeMeshes(inputsOf(mesh, mesh), *meshOutput, nullptr));
+        EXPECT_FALSE(mergeStrands(inputsOf(strands, strands), *strandOutput, nullptr));
+    });
+    EXPECT_TRUE(meshOutput->keys()->empty());
+}
+
+TEST(Merge, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
+{
+    Random random(1);
+    Inputs inputs;
+    for (unsigned int segments : {3u, 40u, 20u}) {
+        auto mesh = PolygonMesh::quads(segments).withNoise(0.1f, segments).build();
+        addAllTypes(sFaceVertexComp, random, *mesh);
+        addRandomProperties(sFaceComp, random, *mesh);
+        inputs.append(std::move(mesh));
+    }
+    auto const merged = [&] {
+        auto output = Tessara::createObject();
+        EXPECT_TRUE(mergeMeshes(inputs, *output, nullptr));
+        return output;
+    };
+    expectSameForThreads({1, 2, 8}, merged);
+    EXPECT_EQ(fingerprint(*merged()), 4029426161352146075u) << "unlike other builds";
+
+    // Merges side by side that share their inputs.
+    auto const expected = merged();
+    std::vector<std::thread> threads;
+    for (int thread = 0; thread != 4; ++thread)
+        threads.emplace_back([&] { EXPECT_TRUE(sameContents(*merged(), *expected)); });
+    for (std::thread& thread : threads)
+        thread.join();
+}
+
+TEST(Merge, leavesTheInputsAsTheyAreWhenMemoryRunsOut)
+{
+    for (unsigned int seed : {0u, 1u, 2u, 30u}) {
+        Trial const trial(seed);
+        Inputs const before = copiesOf(trial.inputs);
+        auto const expected = Tessara::createObject();
+        mergePlainly(trial.kind, trial.inputs, *expected);
+        sweepFailingAllocations([&](Attempt const& attempt) {
+            auto const output = Tessara::createObject();
+            if (attempt([&] { merge(trial.kind, trial.inputs, *output); })) {
+                EXPECT_TRUE(sameContents(*output, *expected));
+            }
+            expectUnchanged(trial.inputs, before);
+        });
+    }
+}
