@@ -9,10 +9,6 @@
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Prototypes.h>
 
-#include <algorithm>
-#include <type_traits>
-#include <utility>
-
 namespace Tessara::GeometryAlgorithms::Internal {
 
 using namespace Modeling;
@@ -49,118 +45,6 @@ namespace {
         return kept;
     }
 
-    template <class T> class TypedCompaction : public ArrayCompaction {
-        static constexpr bool kTrivial = std::is_trivially_copyable_v<T>;
-
-    public:
-        TypedCompaction(Orvan::Ptr<Orvan::Array<T>> source, KeptElements const& kept, bool inPlace)
-            : kept_(kept.sources)
-            , source_(std::move(source))
-        {
-            if (inPlace)
-                return;
-            target_ = Orvan::MutablePtr<Orvan::Array<T>>::make();
-            // An array that goes beyond its component may get its last entry back.
-            target_->reserve(kept_.size + (source_->size > kept.oldCount ? 1 : 0));
-            target_->resize(kept_.size, Orvan::kUninitialized);
-            if constexpr (!kTrivial)
-                gather();
-        }
-
-        void fill() override
-        {
-            if constexpr (kTrivial)
-                if (target_)
-                    gather();
-        }
-
-        PropertyValue finish() override
-        {
-            if (!target_)
-                compactInPlace();
-            return Orvan::Ptr<Orvan::Array<T>>(std::move(target_));
-        }
-
-    protected:
-        virtual void gather()
-        {
-            T const* const from = source_->data;
-            T* const to = target_->data;
-            unsigned int const* const source = kept_.data;
-            for (std::uint64_t element = 0; element != kept_.size; ++element)
-                to[element] = from[source[element]];
-        }
-
-        virtual void compactInPlace()
-        {
-            target_ = makeMutable(std::move(source_)); // held by nobody else by now, so that this does not copy
-            T* const values = target_->data;
-            unsigned int const* const source = kept_.data;
-            // Values only move forward, over those that have moved.
-            for (std::uint64_t element = 0; element != kept_.size; ++element)
-                if (source[element] != element)
-                    values[element] = std::move(values[source[element]]);
-            target_->resize(kept_.size);
-        }
-
-        IndexArray const& kept_;
-        Orvan::Ptr<Orvan::Array<T>> source_;
-        Orvan::MutablePtr<Orvan::Array<T>> target_; // null until `finish` for compaction in place
-    };
-
-    class IndexCompaction final : public TypedCompaction<unsigned int> {
-    public:
-        using TypedCompaction::TypedCompaction;
-
-        void renumber(Renumbering const& renumbering) override { renumbering_ = renumbering; }
-        void close(unsigned int lastEntry) override
-        {
-            lastEntry_ = lastEntry;
-            isClosed_ = true;
-        }
-
-        PropertyValue finish() override
-        {
-            if (!target_)
-                compactInPlace();
-            if (isClosed_)
-                target_->append(lastEntry_); // there is room: the array was longer by one
-            return TypedCompaction::finish();
-        }
-
-    private:
-        void gather() override
-        {
-            if (!renumbering_.remap)
-                return TypedCompaction::gather();
-            for (std::uint64_t element = 0; element != kept_.size; ++element)
-                (*target_)[element] = renumbering_((*source_)[kept_[element]]);
-        }
-
-        void compactInPlace() override
-        {
-            TypedCompaction::compactInPlace();
-            if (renumbering_.remap)
-                for (unsigned int& entry : *target_)
-                    entry = renumbering_(entry);
-        }
-
-        Renumbering renumbering_;
-        unsigned int lastEntry_ = 0;
-        bool isClosed_ = false;
-    };
-
-    template <class T> using CompactionOf =
-        std::conditional_t<std::is_same_v<T, unsigned int>, IndexCompaction, TypedCompaction<T>>;
-
-    /// Takes the array out of a clone of a property, so that it does not count as somebody else who holds it.
-    PropertyValue takeArray(char const* arrayKey, Object& property)
-    {
-        PropertyValue array = property.getProperty(arrayKey);
-        property.setProperty(arrayKey, PropertyValue());
-        return array;
-    }
-
     bool isDataProperty(Object const& property)
     {
         return Object::isA(property, *getDataGeoPropPrototype(sGenericDataGeoProp));
@@ -178,7 +62,7 @@ namespace {
         return length;
     }
 
-    /// Marks the values of a range's data that no entry of an element that stays refers to.
+    /// Marks the values of a range's data to which no element that stays has an entry.
     Orvan::Array<bool> findUnused(std::uint64_t length, IndexArray const& indices, KeptElements const& kept)
     {
         Orvan::Array<bool> isUnused = filledArray<bool>(length, true);
@@ -188,25 +72,39 @@ namespace {
         return isUnused;
     }
 
+    /// Takes the array out of a clone of a property, so that the clone does not count as somebody else who holds it.
+    PropertyValue takeArray(char const* arrayKey, Object& property)
+    {
+        PropertyValue array = property.getProperty(arrayKey);
+        property.setProperty(arrayKey, PropertyValue());
+        return array;
+    }
+
 }
 
 bool Deletion::prepare(Orvan::String const& component, Orvan::Array<bool> const& deleted)
 {
-    return prepareComponent(component, deleted);
+    return prepareEntries(component, deleted);
 }
 
 bool Deletion::prepare(Orvan::String const& component, IndexArray const& remap)
 {
-    return prepareComponent(component, remap);
+    return prepareEntries(component, remap);
 }
 
-template <class Entries> bool Deletion::prepareComponent(Orvan::String const& component, Entries const& entries)
+template <class Entries> bool Deletion::prepareEntries(Orvan::String const& component, Entries const& entries)
 {
-    unsigned int const oldCount = getElementCount(object_, component);
-    if (oldCount != entries.size || oldCount == 0)
+    if (entries.size != getElementCount(object_, component))
         return false;
     kept_.push_back(std::make_unique<KeptElements>(keptElements(entries)));
-    KeptElements const& kept = *kept_.back();
+    return prepare(component, *kept_.back());
+}
+
+bool Deletion::prepare(Orvan::String const& component, KeptElements const& kept)
+{
+    unsigned int const oldCount = getElementCount(object_, component);
+    if (oldCount != kept.oldCount || oldCount == 0)
+        return false;
     // Setting what is set makes the component this object's own, so that its new count takes no memory.
     if (!setElementCount(component, oldCount, object_))
         return false;
@@ -246,13 +144,14 @@ bool Deletion::prepareRange(Orvan::String const& name, Orvan::MutablePtr<Object>
             return false;
     }
     indices = nullptr;
-    prepareArray<ElementTypeList<unsigned int>>(name, sIndices, std::move(range), kept, {dataRemap, kInvalidIndex});
+    if (prepareArray<ElementTypeList<unsigned int>>(name, sIndices, std::move(range), kept) && dataRemap)
+        renumber(name, *dataRemap);
     return true;
 }
 
 /// False where there is no array of these types that reaches over the component.
-template <class Types> bool Deletion::prepareArray(Orvan::String const& key, char const* arrayKey,
-    Orvan::MutablePtr<Object>&& property, KeptElements const& kept, Renumbering const& renumbering)
+template <class Types> bool Deletion::prepareArray(
+    Orvan::String const& key, char const* arrayKey, Orvan::MutablePtr<Object>&& property, KeptElements const& kept)
 {
     PropertyValue const array = takeArray(arrayKey, *property);
     constexpr std::uint64_t kOwnReferences = 2; // the object's and the one here
@@ -264,7 +163,6 @@ template <class Types> bool Deletion::prepareArray(Orvan::String const& key, cha
         constexpr std::uint64_t kOwnArrayReferences = 3; // the property's, the value's and the one here
         bool const isShared = isPropertyShared || source.useCount() > kOwnArrayReferences;
         auto compaction = std::make_unique<CompactionOf<T>>(std::move(source), kept, !isShared);
-        compaction->renumber(renumbering);
         if (!key.empty())
             changes_.push_back({key, arrayKey, std::move(property), std::move(compaction)});
         return true;
@@ -272,32 +170,38 @@ template <class Types> bool Deletion::prepareArray(Orvan::String const& key, cha
     return matched;
 }
 
-void Deletion::renumber(Orvan::String const& key, Renumbering const& renumbering)
+ArrayCompaction* Deletion::arrayAt(Orvan::String const& key)
 {
-    for (Change& change : changes_)
-        if (change.key == key)
-            change.array->renumber(renumbering);
+    auto const change = std::find_if(changes_.begin(), changes_.end(), [&](Change const& c) { return c.key == key; });
+    return change == changes_.end() ? nullptr : change->array.get();
 }
 
-void Deletion::close(Orvan::String const& key, unsigned int lastEntry)
+void Deletion::renumber(Orvan::String const& key, IndexArray const& remap)
 {
-    for (Change& change : changes_)
-        if (change.key == key)
-            change.array->close(lastEntry);
+    if (ArrayCompaction* const array = arrayAt(key))
+        array->renumber(remap);
+}
+
+void Deletion::renumberOffsets(Orvan::String const& key, KeptElements const& kept)
+{
+    if (ArrayCompaction* const array = arrayAt(key))
+        array->renumberOffsets(kept);
 }
 
 void Deletion::fillArrays()
 {
-    std::uint64_t valueCount = 0;
-    for (auto const& kept : kept_)
-        valueCount += kept->sources.size;
-    std::size_t const grain = valueCount <= kElementGrain ? changes_.size() : 1; // few values are not worth a task
-    // Each property has an array of its own.
-    parallelFor(tbb::blocked_range<std::size_t>(0, changes_.size(), std::max<std::size_t>(1, grain)),
-        [this](auto const& range) {
-            for (std::size_t change = range.begin(); change != range.end(); ++change)
-                changes_[change].array->fill();
-        });
+    if (changes_.empty())
+        return;
+    std::uint64_t elementCount = 0;
+    for (Change const& change : changes_)
+        elementCount += change.array->newSize();
+    // Few values are not worth a task.
+    std::size_t const grain = elementCount <= kElementGrain ? changes_.size() : 1;
+    // Each property has a new array of its own.
+    parallelFor(tbb::blocked_range<std::size_t>(0, changes_.size(), grain), [this](auto const& range) {
+        for (std::size_t change = range.begin(); change != range.end(); ++change)
+            changes_[change].array->fill();
+    });
 }
 
 void Deletion::commit()
@@ -306,8 +210,7 @@ void Deletion::commit()
     for (Count const& count : counts_)
         setElementCount(count.component, count.count, object_);
     for (Change& change : changes_) {
-        object_.setProperty(
-            change.key, Orvan::Ptr<Object>()); // an array that nobody else holds is free to be edited now
+        object_.setProperty(change.key, Orvan::Ptr<Object>()); // lets go of the array, which may be edited in place
         change.property->setProperty(change.arrayKey, change.array->finish());
         object_.setProperty(change.key, Orvan::Ptr<Object>(std::move(change.property)));
     }

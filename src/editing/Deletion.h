@@ -1,7 +1,7 @@
 #pragma once
 
-#include <OrvanCore/Array.h>
-#include <OrvanCore/Ptr.h>
+#include "ArrayCompaction.h"
+
 #include <OrvanCore/String.h>
 #include <TessaraObject/Object.h>
 
@@ -9,37 +9,6 @@
 #include <vector>
 
 namespace Tessara::GeometryAlgorithms::Internal {
-
-using IndexArray = Orvan::Array<unsigned int>;
-
-/// The elements that stay, of as many as there were.
-struct KeptElements {
-    std::uint64_t oldCount;
-    IndexArray sources; // for each element that stays its old index; ascending
-};
-
-/// What becomes of the entries of an index array: entry e turns to `(*remap)[e]`, or to `outside` where the remap has no
-/// such entry. Without a remap they stay.
-struct Renumbering {
-    IndexArray const* remap = nullptr;
-    unsigned int outside = 0;
-
-    unsigned int operator()(unsigned int entry) const { return entry < remap->size ? (*remap)[entry] : outside; }
-};
-
-/// One array on its way to a shorter one.
-class ArrayCompaction {
-public:
-    virtual ~ArrayCompaction() = default;
-    /// Fills the new array, where there is one and where that cannot fail: on any thread.
-    virtual void fill() = 0;
-    /// The compacted array, after the object has let go of the old one. Takes no memory.
-    virtual PropertyValue finish() = 0;
-    /// For index arrays. The remap has to live until `finish`.
-    virtual void renumber(Renumbering const&) { }
-    /// For index arrays that are longer than their component: adds an entry at the end.
-    virtual void close(unsigned int) { }
-};
 
 /// Deletes elements of components of one object: prepared first, and then done without a failure.
 class Deletion {
@@ -49,15 +18,18 @@ public:
     {
     }
 
-    /// Prepares what `deleteComponents` does to one component; the elements are given by flags or by a remap. Nothing of
-    /// the arguments is needed afterwards. Where this is false, what came before the refusal is prepared nevertheless:
-    /// operations do it, and do not roll back.
+    // These prepare what `deleteComponents` does to one component. Where one is false, what came before the refusal is
+    // prepared nevertheless: operations do that much, and do not roll back.
+
     bool prepare(Orvan::String const& component, Orvan::Array<bool> const& deleted);
     bool prepare(Orvan::String const& component, IndexArray const& remap);
+    /// \param kept  has to live until `commit`
+    bool prepare(Orvan::String const& component, KeptElements const& kept);
 
-    /// Further changes to an index array that has been prepared. The remap has to live until `commit`.
-    void renumber(Orvan::String const& key, Renumbering const& renumbering);
-    void close(Orvan::String const& key, unsigned int lastEntry);
+    // Further changes to an index array that has been prepared. What is referred to has to live until `commit`.
+
+    void renumber(Orvan::String const& key, IndexArray const& remap);
+    void renumberOffsets(Orvan::String const& key, KeptElements const& kept);
 
     /// Does what has been prepared. Takes no memory with a host that replaces values of present keys without taking any.
     void commit();
@@ -74,10 +46,11 @@ private:
         std::unique_ptr<ArrayCompaction> array;
     };
 
-    template <class Entries> bool prepareComponent(Orvan::String const& component, Entries const& entries);
+    template <class Entries> bool prepareEntries(Orvan::String const& component, Entries const& entries);
     bool prepareRange(Orvan::String const& name, Orvan::MutablePtr<Object>&& range, KeptElements const& kept);
-    template <class Types> bool prepareArray(Orvan::String const& key, char const* arrayKey,
-        Orvan::MutablePtr<Object>&& property, KeptElements const& kept, Renumbering const& renumbering = {});
+    template <class Types> bool prepareArray(
+        Orvan::String const& key, char const* arrayKey, Orvan::MutablePtr<Object>&& property, KeptElements const& kept);
+    ArrayCompaction* arrayAt(Orvan::String const& key);
     void fillArrays();
 
     Object& object_;

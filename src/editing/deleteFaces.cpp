@@ -10,6 +10,7 @@
 #include <TessaraGeometry/Prototypes.h>
 
 #include <algorithm>
+#include <optional>
 
 namespace Tessara::GeometryAlgorithms {
 
@@ -17,67 +18,92 @@ using namespace Modeling;
 using namespace Tessara::Geometry;
 using Internal::Deletion;
 using Internal::IndexArray;
+using Internal::KeptElements;
 
 namespace {
 
-    /// What goes together with the faces.
-    struct UnusedElements {
-        Orvan::Array<bool> points;
-        Orvan::Array<bool> corners;
+    /// What goes and stays together with the faces.
+    struct FaceElements {
+        KeptElements corners;
+        Orvan::Array<bool> unusedPoints;
     };
 
     bool fitsCounts(Object const& mesh, IndexArray const* faceOffset, IndexArray const* faceVertex)
     {
-        return faceOffset && faceOffset->size == std::uint64_t{getElementCount(mesh, sFaceComp)} + 1
-            && getGeoPropTargetName(mesh, sFaceOffset) == sFaceComp //
-            && faceVertex && faceVertex->size >= getElementCount(mesh, sFaceVertexComp)
+        return faceOffset && faceVertex && faceOffset->size == std::uint64_t{getElementCount(mesh, sFaceComp)} + 1
+            && faceVertex->size >= getElementCount(mesh, sFaceVertexComp)
+            && getGeoPropTargetName(mesh, sFaceOffset) == sFaceComp
             && getGeoPropTargetName(mesh, sFaceVertex) == sFaceVertexComp;
     }
 
-    /// Everything is unused until a face that stays is seen to use it.
-    UnusedElements findUnused(Orvan::Array<bool> const& deleted, Object const& mesh, IndexArray const& faceOffset,
-        IndexArray const& faceVertex)
+    /// Calls `visit(first, end)` for the corners of each face that stays. The calls ascend and do not overlap, whatever
+    /// the offsets are.
+    template <class Visit> void forEachCornerRange(
+        Orvan::Array<bool> const& deleted, IndexArray const& faceOffset, unsigned int cornerCount, Visit const& visit)
     {
-        unsigned int const pointCount = getElementCount(mesh, sPointComp);
-        unsigned int const cornerCount = getElementCount(mesh, sFaceVertexComp);
-        UnusedElements unused{filledArray<bool>(pointCount, true), filledArray<bool>(cornerCount, true)};
+        unsigned int lastEnd = 0;
         for (std::uint64_t face = 0; face != deleted.size; ++face) {
             if (deleted[face])
                 continue;
+            unsigned int const first = std::max(faceOffset[face], lastEnd);
             unsigned int const end = std::min(faceOffset[face + 1], cornerCount);
-            for (unsigned int corner = faceOffset[face]; corner < end; ++corner) {
-                unused.corners[corner] = false;
-                if (faceVertex[corner] < pointCount)
-                    unused.points[faceVertex[corner]] = false;
+            if (first < end) {
+                visit(first, end);
+                lastEnd = end;
             }
         }
-        return unused;
     }
 
-    struct Remaps {
-        IndexArray points;
-        IndexArray corners;
-        unsigned int newCornerCount;
-    };
-
-    Remaps numberRemaining(UnusedElements const& unused)
+    KeptElements findKeptCorners(
+        Orvan::Array<bool> const& deleted, IndexArray const& faceOffset, unsigned int cornerCount)
     {
-        auto const newCornerCount = std::count(unused.corners.begin(), unused.corners.end(), false);
-        return {computeDeletedComponentMapping(unused.points), computeDeletedComponentMapping(unused.corners),
-            static_cast<unsigned int>(newCornerCount)};
+        std::uint64_t keptCount = 0;
+        forEachCornerRange(
+            deleted, faceOffset, cornerCount, [&](unsigned int first, unsigned int end) { keptCount += end - first; });
+        KeptElements kept{cornerCount, uninitializedArray<unsigned int>(keptCount)};
+        unsigned int* source = kept.sources.data;
+        forEachCornerRange(deleted, faceOffset, cornerCount, [&](unsigned int first, unsigned int end) {
+            for (unsigned int corner = first; corner != end; ++corner)
+                *source++ = corner;
+        });
+        return kept;
     }
 
-    /// Points, then corners, then faces. An index array is renumbered when its component has been prepared as a whole.
-    bool prepareDeletion(
-        Orvan::Array<bool> const& deleted, UnusedElements const& unused, Remaps const& remaps, Deletion& deletion)
+    /// A point goes unless a corner that stays uses it.
+    Orvan::Array<bool> findUnusedPoints(
+        KeptElements const& corners, IndexArray const& faceVertex, unsigned int pointCount)
     {
-        if (!deletion.prepare(sPointComp, unused.points) || !deletion.prepare(sFaceVertexComp, unused.corners))
+        Orvan::Array<bool> isUnused = filledArray<bool>(pointCount, true);
+        for (unsigned int const corner : corners.sources)
+            if (faceVertex[corner] < pointCount)
+                isUnused[faceVertex[corner]] = false;
+        return isUnused;
+    }
+
+    /// Nothing where the index arrays do not fit the mesh.
+    std::optional<FaceElements> findFaceElements(Orvan::Array<bool> const& deleted, Object const& mesh)
+    {
+        auto const faceOffset = readGeoPropData<unsigned int>(mesh, sFaceOffset);
+        auto const faceVertex = readGeoPropData<unsigned int>(mesh, sFaceVertex);
+        if (!fitsCounts(mesh, faceOffset.get(), faceVertex.get()))
+            return std::nullopt;
+        FaceElements elements;
+        elements.corners = findKeptCorners(deleted, *faceOffset, getElementCount(mesh, sFaceVertexComp));
+        elements.unusedPoints = findUnusedPoints(elements.corners, *faceVertex, getElementCount(mesh, sPointComp));
+        return elements;
+    }
+
+    /// Points, then corners, then faces. An index array is renumbered when its component is prepared as a whole.
+    bool prepareDeletion(Orvan::Array<bool> const& deleted, FaceElements const& elements, IndexArray const& pointRemap,
+        Deletion& deletion)
+    {
+        if (!deletion.prepare(sPointComp, elements.unusedPoints)
+            || !deletion.prepare(sFaceVertexComp, elements.corners))
             return false;
-        deletion.renumber(sFaceVertex, {&remaps.points, kInvalidIndex});
+        deletion.renumber(sFaceVertex, pointRemap);
         if (!deletion.prepare(sFaceComp, deleted))
             return false;
-        deletion.renumber(sFaceOffset, {&remaps.corners, remaps.newCornerCount});
-        deletion.close(sFaceOffset, remaps.newCornerCount); // which was cut off as the entry beyond the faces
+        deletion.renumberOffsets(sFaceOffset, elements.corners);
         return true;
     }
 
@@ -87,17 +113,12 @@ bool deleteFaces(Orvan::Array<bool> const& deleted, Object& mesh)
 {
     if (!Object::isA(mesh, *getMeshPrototype()) || deleted.size != getElementCount(mesh, sFaceComp))
         return false;
-    UnusedElements unused;
-    {
-        auto const faceOffset = readGeoPropData<unsigned int>(mesh, sFaceOffset);
-        auto const faceVertex = readGeoPropData<unsigned int>(mesh, sFaceVertex);
-        if (!fitsCounts(mesh, faceOffset.get(), faceVertex.get()))
-            return false;
-        unused = findUnused(deleted, mesh, *faceOffset, *faceVertex);
-    }
-    Remaps const remaps = numberRemaining(unused);
+    std::optional<FaceElements> const elements = findFaceElements(deleted, mesh);
+    if (!elements)
+        return false;
+    IndexArray const pointRemap = computeDeletedComponentMapping(elements->unusedPoints);
     Deletion deletion(mesh);
-    bool const isDone = prepareDeletion(deleted, unused, remaps, deletion);
+    bool const isDone = prepareDeletion(deleted, *elements, pointRemap, deletion);
     deletion.commit();
     return isDone;
 }
