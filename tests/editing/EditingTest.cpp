@@ -1,0 +1,411 @@
+#include "PlainEditing.h"
+
+#include "support/Compare.h"
+#include "support/FailingAllocations.h"
+#include "support/MeshBuilder.h"
+#include "support/MeshChecks.h"
+#include "support/PropertyBag.h"
+#include "support/Threads.h"
+
+#include <Modeling/addPointsToPointCloud.h>
+#include <Modeling/computeDeletedComponentMapping.h>
+#include <Modeling/deleteComponents.h>
+#include <Modeling/deleteFaces.h>
+#include <Modeling/deletePointsInPointCloud.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <gtest/gtest.h>
+
+using namespace Tessara::Geometry;
+using namespace Tessara::GeometryAlgorithms;
+using namespace TestSupport;
+using PlainEditing::Flags;
+using PlainEditing::Indices;
+using Tessara::Object;
+using Positions = Orvan::Array<float3>;
+
+namespace {
+
+Positions randomPositions(std::size_t count, Random& random)
+{
+    Positions positions(count);
+    for (float3& p : positions)
+        p = {random.coordinate(), random.coordinate(), random.coordinate()};
+    return positions;
+}
+
+Orvan::MutablePtr<Object> randomCloud(std::size_t pointCount, Random& random)
+{
+    auto cloud = makePointCloud(randomPositions(pointCount, random));
+    addRandomProperties(sPointComp, random, *cloud);
+    return cloud;
+}
+
+/// Polygons of one to five corners, and perhaps some of none; points may be of no face.
+Orvan::MutablePtr<Object> randomMesh(std::size_t pointCount, std::size_t faceCount, bool withEmptyFaces, Random& random)
+{
+    Indices corners, offsets{0};
+    for (std::size_t face = 0; face != faceCount; ++face) {
+        for (unsigned int corner = withEmptyFaces && random.below(3) == 0 ? 0 : 1 + random.below(5); corner != 0;
+             --corner)
+            corners.append(random.below(pointCount));
+        offsets.append(static_cast<unsigned int>(corners.size));
+    }
+    auto mesh = makeMesh(randomPositions(pointCount, random), std::move(corners), std::move(offsets));
+    for (char const* const component : {sPointComp, sFaceVertexComp, sFaceComp})
+        addRandomProperties(component, random, *mesh);
+    return mesh;
+}
+
+Flags randomFlags(std::size_t count, Random& random)
+{
+    unsigned int const outOf = 1 + random.below(4); // 1: all or none
+    Flags flags(count);
+    for (bool& flag : flags)
+        flag = random.below(outOf + 1) == 0;
+    if (outOf == 1)
+        std::fill(flags.begin(), flags.end(), random.below(2) == 1);
+    return flags;
+}
+
+struct Edit {
+    std::function<bool(Object&)> edit;
+    std::function<bool(Object&)> plainEdit;
+};
+
+/// A random operation, and a random object for it.
+Orvan::MutablePtr<Object> randomCase(Random& random, Edit& edit)
+{
+    std::size_t const size = random.below(8) == 0 ? random.below(900) : random.below(9);
+    if (unsigned int const kind = random.below(4); kind != 0) {
+        auto cloud = randomCloud(size, random);
+        if (kind == 1) {
+            Indices indices;
+            for (std::size_t i = random.below(size + 2); i != 0; --i)
+                indices.append(random.below(size + 2)); // some twice, some out of range
+            edit = {[=](Object& o) { return deletePointsInPointCloud(indices, o, nullptr); },
+                [=](Object& o) { return PlainEditing::deletePoints(indices, o); }};
+        } else if (kind == 2) {
+            Indices const remap = PlainEditing::mapping(randomFlags(size, random));
+            edit = {[=](Object& o) { return deleteComponents(remap, sPointComp, o); },
+                [=](Object& o) { return PlainEditing::deleteComponents(remap, sPointComp, o); }};
+        } else {
+            auto const positions = randomPositions(random.below(2 * size + 3), random);
+            Orvan::String const tag = random.below(2) == 0 ? "" : random.below(2) == 0 ? "isNew" : "sPointComp1";
+            edit = {[=](Object& o) { return addPointsToPointCloud(positions, tag, o, nullptr); },
+                [=](Object& o) { return PlainEditing::addPoints(positions, tag, o); }};
+        }
+        return cloud;
+    }
+    auto mesh = randomMesh(1 + size, size == 0 ? 0 : random.below(size), random.below(4) == 0, random);
+    Flags const deleted = randomFlags(getElementCount(*mesh, sFaceComp), random);
+    edit = {[=](Object& o) { return deleteFaces(deleted, o); },
+        [=](Object& o) { return PlainEditing::deleteFaces(deleted, o); }};
+    return mesh;
+}
+
+}
+
+TEST(Editing, agreesWithThePlainReferenceOnRandomPropertyBags)
+{
+    unsigned int done = 0;
+    for (unsigned int seed = 0; seed != 6000 && !HasFailure(); ++seed) {
+        SCOPED_TRACE(seed);
+        Random random(seed);
+        Edit edit;
+        auto const object = randomCase(random, edit);
+        auto const before = deepCopy(*object);
+        auto const expected = deepCopy(*object);
+        auto const holders = static_cast<Holders>(random.below(4));
+        Object const other = held(holders, *object);
+        Object const otherBefore = held(holders, *before);
+        bool const isDone = edit.edit(*object);
+        EXPECT_EQ(isDone, edit.plainEdit(*expected));
+        EXPECT_TRUE(sameContents(*object, *expected));
+        EXPECT_TRUE(sameContents(other, otherBefore)) << "somebody else sees a change";
+        done += isDone ? 1 : 0;
+    }
+    EXPECT_GT(done, 4000u);
+}
+
+TEST(Editing, editsInPlaceOnlyWhatNobodyElseHolds)
+{
+    Random random(1);
+    for (auto const holders : {Holders::None, Holders::Object, Holders::Properties, Holders::Arrays}) {
+        auto const cloud = makePointCloud(randomPositions(9, random));
+        Object const other = held(holders, *cloud);
+        float3 const* const data = dataOf<float3>(*cloud, sPointPosition)->data;
+        ASSERT_TRUE(deletePointsInPointCloud(Indices{0}, *cloud, nullptr));
+        EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->data == data, holders == Holders::None);
+    }
+    // One array under two properties is held twice.
+    auto const cloud = makePointCloud(randomPositions(9, random));
+    cloud->setProperty("same", cloud->getProperty(sPointPosition));
+    addDataProperty<float3>("array", sPointComp, {}, *cloud);
+    cloud->setProperty(
+        "array", Orvan::Ptr<Object>(makeDataProperty<float3>(sPointComp, dataOf<float3>(*cloud, sPointPosition))));
+    ASSERT_TRUE(deletePointsInPointCloud(Indices{4}, *cloud, nullptr));
+    for (char const* const name : {"same", "array"})
+        EXPECT_EQ(*dataOf<float3>(*cloud, name), *dataOf<float3>(*cloud, sPointPosition)) << name;
+}
+
+TEST(Editing, readsArgumentsThatLieInTheObject)
+{
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
+    addDataProperty<unsigned int>("chosen", sPointComp, {1, 1, 0, 1}, *cloud);
+    Orvan::String const tag = "sTarget of a property";
+    ASSERT_TRUE(addPointsToPointCloud(*dataOf<float3>(*cloud, sPointPosition), tag, *cloud, nullptr));
+    EXPECT_EQ(*dataOf<float3>(*cloud, sPointPosition), (Positions{{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {1, 0, 0}}));
+    EXPECT_EQ(*dataOf<bool>(*cloud, tag), (Flags{false, false, true, true}));
+
+    // References alone: nobody holds these arrays but the object.
+    Indices const& chosen = *dataOf<unsigned int>(*cloud, "chosen");
+    ASSERT_TRUE(deletePointsInPointCloud(chosen, *cloud, nullptr));
+    EXPECT_EQ(*dataOf<unsigned int>(*cloud, "chosen"), (Indices{0, 1}));
+
+    auto const mesh = MeshBuilder::tetrahedron().build();
+    addDataProperty<bool>("goes", sFaceComp, {true, false, true, true}, *mesh);
+    Flags const& goes = *dataOf<bool>(*mesh, "goes");
+    ASSERT_TRUE(deleteFaces(goes, *mesh));
+    EXPECT_EQ(*dataOf<bool>(*mesh, "goes"), (Flags{false}));
+    EXPECT_EQ(countsOf(*mesh), (Counts{3, 3, 1}));
+    EXPECT_TRUE(isValid(*mesh));
+}
+
+TEST(AddPoints, losesArraysOfTheHostsRecordTypesAndKeepsOthers)
+{
+    Random random(3);
+    auto const cloud = makePointCloud(randomPositions(2, random));
+    addAllTypes(sPointComp, random, *cloud);
+    ASSERT_TRUE(addPointsToPointCloud({{1, 2, 3}}, {}, *cloud, nullptr));
+    unsigned int lost = 0;
+    for (Orvan::String const& name : getGeoPropNamesByTarget(*cloud, sPointComp)) {
+        auto const property = getDataGeoProperty(*cloud, name);
+        ASSERT_TRUE(property && property->hasProperty(sData));
+        lost += property->getProperty(sData).empty() ? 1 : 0;
+    }
+    EXPECT_EQ(lost, 4u);
+    for (char const* const type : {"GeometryType", "GeoLocation", "FaceEdge", "GraphTransforms"})
+        EXPECT_TRUE(getDataGeoProperty(*cloud, (std::string(sPointComp) + type).c_str())->getProperty(sData).empty());
+}
+
+TEST(AddPoints, growsByTheGrowthRuleAndByDefaults)
+{
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
+    addDataProperty<Tessara::Math::float2x2>("matrix", sPointComp, Orvan::Array<Tessara::Math::float2x2>(3), *cloud);
+    addDataProperty<int>("weight", sPointComp, {1, 2, 3}, *cloud, 7);
+    addRangeProperty("seam", sPointComp, {0, kInvalidIndex, 1}, *cloud);
+    addDataProperty<int>("of seam", "seam", {5, 6}, *cloud);
+    ASSERT_TRUE(addPointsToPointCloud({{9, 9, 9}}, "isNew", *cloud, nullptr));
+    EXPECT_EQ(*dataOf<int>(*cloud, "weight"), (Orvan::Array<int>{1, 2, 3, 7}));
+    EXPECT_EQ(dataOf<int>(*cloud, "weight")->capacity, 6u) << "doubles";
+    EXPECT_EQ((*dataOf<Tessara::Math::float2x2>(*cloud, "matrix"))[3], Tessara::Math::float2x2()) << "zero";
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{0, kInvalidIndex, 1, kInvalidIndex}));
+    EXPECT_EQ(*dataOf<int>(*cloud, "of seam"), (Orvan::Array<int>{5, 6}));
+    ASSERT_TRUE(addPointsToPointCloud(Positions(9), "isNew", *cloud, nullptr));
+    EXPECT_EQ(dataOf<int>(*cloud, "weight")->capacity, 13u) << "by what is needed";
+    Flags isNew(13, true);
+    std::fill(isNew.data, isNew.data + 4, false);
+    EXPECT_EQ(*dataOf<bool>(*cloud, "isNew"), isNew) << "only the second tag is left";
+    ASSERT_TRUE(addPointsToPointCloud({}, "none", *cloud, nullptr));
+    EXPECT_EQ(*dataOf<bool>(*cloud, "none"), Flags(13));
+
+    EXPECT_FALSE(addPointsToPointCloud({{1, 1, 1}}, sPointPosition, *cloud, nullptr))
+        << "the tag replaces the positions";
+    EXPECT_EQ(dataOf<bool>(*cloud, sPointPosition)->size, 14u);
+    EXPECT_EQ(dataOf<int>(*cloud, "weight")->size, 14u);
+}
+
+TEST(Editing, refusesBeforeTheFirstChange)
+{
+    Random random(4);
+    auto const mesh = MeshBuilder::tetrahedron().build();
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
+    auto const emptyCloud = makePointCloud({});
+    auto const withTwo = makePointCloud({{0, 0, 0}});
+    addComponent("sOtherComp", 1, *withTwo);
+    auto const withoutPositions = makePointCloud({{0, 0, 0}});
+    addDataProperty<int>(sPointPosition, sPointComp, {1}, *withoutPositions);
+    auto const shortOffsets = MeshBuilder::tetrahedron().build();
+    addDataProperty<unsigned int>(sFaceOffset, sFaceComp, {0, 3, 6, 9}, *shortOffsets);
+    auto const noOffsets = MeshBuilder::tetrahedron().build();
+    addDataProperty<int>(sFaceOffset, sFaceComp, {0, 3, 6, 9, 12}, *noOffsets);
+    auto const noPoints = makeMesh({}, {}, {});
+    Positions tooMany(1);
+    tooMany.size = 0xFFFFFFFFu; // more than a component can hold, and never read
+    auto const add = [](Positions const& p) {
+        return [&](Object& o) { return addPointsToPointCloud(p, "t", o, nullptr); };
+    };
+    Positions const one(1);
+    Indices const none, first{0};
+    auto const deletePoint = [&](Object& o) { return deletePointsInPointCloud(first, o, nullptr); };
+    auto const deleteNone = [](Object& o) { return deleteFaces(Flags(getElementCount(o, sFaceComp)), o); };
+    struct Case {
+        char const* name;
+        Object& object;
+        std::function<bool(Object&)> edit;
+    };
+    for (Case const& c : {
+             Case{"add to a mesh", *mesh, add(one)},
+             {"add to a cloud with a second component", *withTwo, add(one)},
+             {"add to a cloud without positions", *withoutPositions, add(one)},
+             {"add more than 32 bits", *cloud, add(tooMany)},
+             {"delete points of a mesh", *mesh, deletePoint},
+             {"delete points of an empty cloud", *emptyCloud, deletePoint},
+             {"remap of another length", *cloud, [&](Object& o) { return deleteComponents(first, sPointComp, o); }},
+             {"no such component", *cloud, [&](Object& o) { return deleteComponents(none, "absent", o); }},
+             {"delete faces of a cloud", *cloud, deleteNone},
+             {"flags of another length", *mesh, [](Object& o) { return deleteFaces(Flags(3), o); }},
+             {"short offsets", *shortOffsets, deleteNone},
+             {"offsets of another type", *noOffsets, deleteNone},
+             {"mesh without points", *noPoints, deleteNone},
+         }) {
+        auto const before = deepCopy(c.object);
+        EXPECT_FALSE(c.edit(c.object)) << c.name;
+        EXPECT_TRUE(sameContents(c.object, *before)) << c.name;
+    }
+    tooMany.size = 1;
+}
+
+TEST(DeleteComponents, worksByHand)
+{
+    EXPECT_EQ(computeDeletedComponentMapping({false, true, false}), (Indices{0, kDeletedElement, 1}));
+    EXPECT_EQ(computeDeletedComponentMapping({}), Indices());
+
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
+    addDataProperty<Orvan::String>("name", sPointComp, {"a", "b", "c"}, *cloud);
+    addRangeProperty("seam", sPointComp, {3, kInvalidIndex, 1}, *cloud);
+    addDataProperty<int>("of seam", "seam", {5, 6, 7, 8}, *cloud);
+    ASSERT_TRUE(deletePointsInPointCloud(Orvan::Array<long long>{-1, 3, 1LL << 40, -(1LL << 40)}, *cloud, nullptr));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{1, kInvalidIndex, 0}));
+    EXPECT_EQ(*dataOf<int>(*cloud, "of seam"), (Orvan::Array<int>{6, 8})) << "unused values go, though no point does";
+    ASSERT_TRUE(deletePointsInPointCloud(Orvan::Array<long long>{0, 0, 2}, *cloud, nullptr));
+    EXPECT_EQ(*dataOf<Orvan::String>(*cloud, "name"), (Orvan::Array<Orvan::String>{"b"}));
+    EXPECT_EQ(*dataOf<float3>(*cloud, sPointPosition), (Positions{{1, 0, 0}}));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{kInvalidIndex}));
+    EXPECT_TRUE(dataOf<int>(*cloud, "of seam")->empty());
+    EXPECT_TRUE(isValid(*cloud));
+}
+
+TEST(DeleteComponents, keepsWhatWasDoneBeforeARefusedRange)
+{
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
+    addDataProperty<int>("before", sPointComp, {1, 2}, *cloud);
+    addRangeProperty("seam", sPointComp, {1, 0}, *cloud);
+    addDataProperty<int>("first", "seam", {5, 6}, *cloud);
+    addDataProperty<int>("second", "seam", {7, 8}, *cloud);
+    addDataProperty<int>("after", sPointComp, {3, 4}, *cloud);
+    EXPECT_FALSE(deletePointsInPointCloud(Indices{0}, *cloud, nullptr));
+    EXPECT_EQ(getElementCount(*cloud, sPointComp), 1u);
+    EXPECT_EQ(*dataOf<int>(*cloud, "before"), (Orvan::Array<int>{2}));
+    EXPECT_EQ(*dataOf<int>(*cloud, "first"), (Orvan::Array<int>{5}));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{1, 0}));
+    EXPECT_EQ(dataOf<int>(*cloud, "second")->size, 2u);
+    EXPECT_EQ(dataOf<int>(*cloud, "after")->size, 2u);
+}
+
+TEST(DeleteFaces, worksByHand)
+{
+    Positions const points{{0, 0, 0}, {1, 0, 0}, {9, 9, 9}, {1, 1, 0}, {0, 1, 0}};
+    auto const twoFaces = [&] { return makeMesh(points, {0, 1, 3, 4, 4, 3, 1}, {0, 4, 7}); };
+    struct Case {
+        Flags deleted;
+        Indices faceVertex, faceOffset;
+        std::size_t points;
+    };
+    for (Case const& c :
+        {Case{{false, false}, {0, 1, 2, 3, 3, 2, 1}, {0, 4, 7}, 4}, {{true, false}, {2, 1, 0}, {0, 3}, 3},
+            {{false, true}, {0, 1, 2, 3}, {0, 4}, 4}, {{true, true}, {}, {0}, 0}}) {
+        auto const mesh = twoFaces();
+        addDataProperty<int>("corner", sFaceVertexComp, {0, 1, 2, 3, 4, 5, 6}, *mesh);
+        ASSERT_TRUE(deleteFaces(c.deleted, *mesh));
+        EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceVertex), c.faceVertex);
+        EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceOffset), c.faceOffset);
+        EXPECT_EQ(getElementCount(*mesh, sPointComp), c.points);
+        EXPECT_EQ(dataOf<int>(*mesh, "corner")->size, c.faceVertex.size);
+        EXPECT_TRUE(isValid(*mesh));
+    }
+    auto const onlyPoints = makeMesh(points, {}, {});
+    EXPECT_FALSE(deleteFaces({}, *onlyPoints));
+    EXPECT_EQ(getElementCount(*onlyPoints, sPointComp), 0u)
+        << "points without a face go before the corners are refused";
+    auto const emptyFace = makeMesh(points, {0, 1, 3, 4, 3, 1}, {0, 3, 3, 6});
+    ASSERT_TRUE(deleteFaces({false, false, true}, *emptyFace));
+    EXPECT_EQ(*dataOf<unsigned int>(*emptyFace, sFaceOffset), (Indices{0, kDeletedElement, 3})) << "on purpose";
+}
+
+TEST(DeleteFaces, staysInsideTheArraysWhateverTheyHold)
+{
+    for (unsigned int seed = 0; seed != 2000; ++seed) {
+        Random random(seed);
+        auto const mesh = randomMesh(1 + random.below(9), 1 + random.below(9), false, random);
+        std::size_t const faceCount = getElementCount(*mesh, sFaceComp);
+        for (char const* const name : {sFaceVertex, sFaceOffset}) {
+            Indices values = *dataOf<unsigned int>(*mesh, name);
+            for (unsigned int& value : values)
+                value = random.below(3) == 0 ? 0u - random.below(4) : random.below(3) == 0 ? random.below(40) : value;
+            addDataProperty<unsigned int>(name, getGeoPropTargetName(*mesh, name), values, *mesh);
+        }
+        deleteFaces(randomFlags(faceCount, random), *mesh);
+        Indices remap(getElementCount(*mesh, sPointComp), Orvan::kUninitialized);
+        for (unsigned int& entry : remap)
+            entry = random.below(2) == 0 ? 0u - random.below(4) : random.below(40);
+        deleteComponents(remap, sPointComp, *mesh);
+    }
+}
+
+TEST(Editing, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
+{
+    Random random(8);
+    auto const source = MeshBuilder::sphere(40).withNoise(0.1f, 2).shuffled(3).build();
+    for (char const* const component : {sPointComp, sFaceVertexComp, sFaceComp})
+        addAllTypes(component, random, *source);
+    auto const cloud = makePointCloud(randomPositions(30'000, random));
+    addAllTypes(sPointComp, random, *cloud);
+    Flags deleted(getElementCount(*source, sFaceComp));
+    for (std::size_t face = 0; face != deleted.size; ++face)
+        deleted[face] = face / 20 % 2 == 0 || random.below(9) == 0;
+    Indices indices(20'000);
+    for (unsigned int& index : indices)
+        index = random.below(40'000);
+    auto const thinned = [&] {
+        auto mesh = deepCopy(*source);
+        EXPECT_TRUE(deleteFaces(deleted, *mesh));
+        return mesh;
+    };
+    auto const edited = [&] {
+        auto object = Tessara::createObject();
+        *object = *cloud;
+        EXPECT_TRUE(deletePointsInPointCloud(indices, *object, nullptr));
+        EXPECT_TRUE(addPointsToPointCloud(*dataOf<float3>(*source, sPointPosition), "isNew", *object, nullptr));
+        return object;
+    };
+    expectSameForThreads({1, 2, 8}, thinned);
+    expectSameForThreads({1, 2, 8}, edited);
+    EXPECT_EQ(fingerprint(*thinned()), 12342138204333143154u) << "unlike other builds";
+    EXPECT_EQ(fingerprint(*edited()), 16628838800453466263u) << "unlike other builds";
+}
+
+TEST(Editing, leavesTheObjectAsItWasWhenMemoryRunsOut)
+{
+    for (unsigned int seed = 0; seed != 24; ++seed) {
+        SCOPED_TRACE(seed);
+        sweepFailingAllocations([&](Attempt const& attempt) {
+            Random random(seed);
+            Edit edit;
+            auto const object = randomCase(random, edit);
+            auto const before = deepCopy(*object);
+            auto const expected = deepCopy(*object);
+            auto const holders = static_cast<Holders>(seed % 4);
+            Object const other = held(holders, *object);
+            Object const otherBefore = held(holders, *before);
+            bool isDone = attempt([&] { edit.edit(*object); });
+            if (isDone)
+                edit.plainEdit(*expected);
+            EXPECT_TRUE(sameContents(*object, isDone ? *expected : *before));
+            EXPECT_TRUE(sameContents(other, otherBefore));
+        });
+    }
+}

@@ -1,0 +1,22 @@
+#pragma once
+
+#include "Random.h"
+
+#include <TessaraObject/Object.h>
+
+namespace TestSupport {
+
+/// Adds properties to a component: data of any of the forty element types, with and without a default, some as long as
+/// the component and some not, and ranges with and without data. Some hold null or no array.
+void addRandomProperties(Orvan::String const& component, Random& random, Tessara::Object& object);
+
+/// One data property of each of the forty element types, as long as the component.
+void addAllTypes(Orvan::String const& component, Random& random, Tessara::Object& object);
+
+/// References that somebody else holds to what an object holds.
+enum class Holders { None, Object, Properties, Arrays };
+
+/// An object that holds the same as another one: all of it, its geo properties, or the arrays in those.
+Tessara::Object held(Holders holders, Tessara::Object const& object);
+
+}
