@@ -195,8 +195,8 @@ void Deletion::fillArrays()
     std::uint64_t elementCount = 0;
     for (Change const& change : changes_)
         elementCount += change.array->newSize();
-    // Few values are not worth a task.
-    std::size_t const grain = elementCount <= kElementGrain ? changes_.size() : 1;
+    constexpr std::uint64_t kFewElements = 1 << 16; // up to here one thread is done before a second one has woken up
+    std::size_t const grain = elementCount <= kFewElements ? changes_.size() : 1;
     // Each property has a new array of its own.
     parallelFor(tbb::blocked_range<std::size_t>(0, changes_.size(), grain), [this](auto const& range) {
         for (std::size_t change = range.begin(); change != range.end(); ++change)
