@@ -1,5 +1,7 @@
 #include "Measuring.h"
 
+#include "peers/deletions.h"
+
 #include "frame/Arrays.h"
 
 #include "support/MeshBuilder.h"
@@ -314,6 +316,32 @@ void copyExtendedCloud(benchmark::State& state)
     Benchmarks::countElements(state, count);
 }
 
+void measurePeer(benchmark::State& state, std::size_t elements, Benchmarks::PeerDeletion const& peer)
+{
+    for (auto _ : state) {
+        state.PauseTiming();
+        peer.prepare();
+        state.ResumeTiming();
+        peer.run();
+    }
+    Benchmarks::countElements(state, elements);
+    state.counters["remaining"] = static_cast<double>(peer.remaining());
+}
+
+using MakePointPeer = Benchmarks::PeerDeletion (*)(std::size_t, Orvan::Array<unsigned int> const&);
+[[maybe_unused]] void deletePointsWithPeer(benchmark::State& state, MakePointPeer makePeer)
+{
+    measurePeer(state, sizeOf(state), makePeer(sizeOf(state), everySecondAtRandom(sizeOf(state))));
+}
+
+using MakeFacePeer = Benchmarks::PeerDeletion (*)(Benchmarks::PeerMesh const&);
+[[maybe_unused]] void deleteFacesWithPeer(benchmark::State& state, MakeFacePeer makePeer)
+{
+    FlatMesh const flat = makeFlatMesh(sizeOf(state));
+    auto const deleted = everySecondPatch(flat.materials.size);
+    measurePeer(state, deleted.size, makePeer({flat.positions, flat.faceVertex, deleted}));
+}
+
 #define MODELING_ADDED Args({1'000, 1'000})->Args({1'000'000, 9'000'000})->Args({9'000'000, 1'000'000})->UseRealTime()
 BENCHMARK(addPoints)->Name("addPointsToPointCloud")->MODELING_ADDED;
 BENCHMARK(copyAndFill)->Name("addPointsToPointCloud:copy and fill")->MODELING_ADDED;
@@ -324,10 +352,26 @@ BENCHMARK(deletePoints)->Name("deletePointsInPointCloud")->MODELING_POINTS;
 BENCHMARK(deletePointsOfOwnCloud)->Name("deletePointsInPointCloud:in place")->MODELING_POINTS;
 BENCHMARK(flatDeletePoints)->Name("deletePointsInPointCloud:flat")->MODELING_POINTS;
 BENCHMARK(copyCloud)->Name("deletePointsInPointCloud:memcpy")->MODELING_POINTS;
+#ifdef MODELING_HAS_PCL
+BENCHMARK_CAPTURE(deletePointsWithPeer, PCL, Benchmarks::pclDeletion)
+    ->Name("deletePointsInPointCloud:PCL")
+    ->MODELING_POINTS;
+#endif
+#ifdef MODELING_HAS_VTK
+BENCHMARK_CAPTURE(deletePointsWithPeer, VTK, Benchmarks::vtkPointDeletion)
+    ->Name("deletePointsInPointCloud:VTK")
+    ->MODELING_POINTS;
+#endif
 
 #define MODELING_FACES Arg(1'000)->Arg(100'000)->Arg(1'000'000)->UseRealTime()
 BENCHMARK(deleteFaces)->MODELING_FACES;
 BENCHMARK(flatDeleteFaces)->Name("deleteFaces:flat")->MODELING_FACES;
 BENCHMARK(copyMesh)->Name("deleteFaces:memcpy")->MODELING_FACES;
+#ifdef MODELING_HAS_CGAL
+BENCHMARK_CAPTURE(deleteFacesWithPeer, CGAL, Benchmarks::cgalFaceDeletion)->Name("deleteFaces:CGAL")->MODELING_FACES;
+#endif
+#ifdef MODELING_HAS_VTK
+BENCHMARK_CAPTURE(deleteFacesWithPeer, VTK, Benchmarks::vtkFaceDeletion)->Name("deleteFaces:VTK")->MODELING_FACES;
+#endif
 
 }
