@@ -45,7 +45,7 @@ namespace {
     void addDataOfAnyType(
         Orvan::String const& name, Orvan::String const& target, std::size_t length, Random& random, Object& object)
     {
-        unsigned int type = random.below(40);
+        unsigned int type = random.below(40); // which is counted down
         forEachElementTypeName([&]<class T>(ElementType<T>) {
             if (type-- == 0)
                 addData<T>(name, target, length, random, object);
