@@ -1,5 +1,7 @@
 #pragma once
 
+#include "support/PropertyBag.h"
+
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
@@ -17,6 +19,7 @@ using Indices = Orvan::Array<unsigned int>;
 using Tessara::Object;
 using Tessara::PropertyValue;
 using Tessara::Math::float3;
+using TestSupport::replaceIn;
 using namespace Tessara::Geometry;
 
 inline Indices mapping(Flags const& deleted)
@@ -26,13 +29,6 @@ inline Indices mapping(Flags const& deleted)
     for (bool const isDeleted : deleted)
         remap.append(isDeleted ? kDeletedElement : next++);
     return remap;
-}
-
-inline void set(Orvan::String const& name, char const* key, PropertyValue value, Object& object)
-{
-    Object changed = **object.getProperty(name).get<Orvan::Ptr<Object>>();
-    changed.setProperty(key, std::move(value));
-    object.setProperty(name, Orvan::makePtr<Object>(changed));
 }
 
 template <class T> Orvan::Array<T> compacted(Orvan::Array<T> array, Indices const& remap)
@@ -57,7 +53,7 @@ inline bool compactData(Orvan::String const& name, Indices const& remap, Object&
     visitArray(getDataGeoProperty(object, name)->getProperty(sData), [&]<class T>(Orvan::Array<T> const& array, auto) {
         isDone = array.size >= remap.size;
         if (isDone)
-            set(name, sData, Orvan::makePtr<Orvan::Array<T>>(compacted(array, remap)), object);
+            replaceIn(name, sData, Orvan::makePtr<Orvan::Array<T>>(compacted(array, remap)), object);
     });
     return isDone;
 }
@@ -89,7 +85,7 @@ inline bool deleteRange(Orvan::String const& name, Indices const& remap, Object&
         for (unsigned int& entry : indices)
             if (!dataRemap.empty() && entry != kInvalidIndex)
                 entry = dataRemap[entry];
-        set(name, sIndices, Orvan::makePtr<Indices>(indices), object);
+        replaceIn(name, sIndices, Orvan::makePtr<Indices>(indices), object);
     }
     return true;
 }
@@ -114,7 +110,7 @@ inline void extendData(Orvan::String const& name, std::uint64_t newCount, Object
         PropertyValue const fallback = property->getProperty(sDefault);
         result = extended(array, newCount, fallback.get<T>() ? *fallback.get<T>() : T{});
     });
-    set(name, sData, std::move(result), object);
+    replaceIn(name, sData, std::move(result), object);
 }
 
 inline bool addPoints(Orvan::Array<float3> const& positions, Orvan::String const& tag, Object& object)
@@ -125,7 +121,7 @@ inline bool addPoints(Orvan::Array<float3> const& positions, Orvan::String const
         if (getDataGeoProperty(object, name))
             extendData(name, newCount, object);
         else if (auto const indices = getRangeGeoPropIndices(object, name))
-            set(name, sIndices, extended(*indices, newCount, kInvalidIndex), object);
+            replaceIn(name, sIndices, extended(*indices, newCount, kInvalidIndex), object);
     if (!tag.empty()) {
         Flags isNew(newCount);
         std::fill(isNew.data + oldCount, isNew.data + newCount, true);
@@ -136,7 +132,7 @@ inline bool addPoints(Orvan::Array<float3> const& positions, Orvan::String const
         return false;
     Orvan::Array<float3> all = *current;
     std::copy(positions.begin(), positions.end(), all.data + oldCount);
-    set(sPointPosition, sData, Orvan::makePtr<Orvan::Array<float3>>(all), object);
+    replaceIn(sPointPosition, sData, Orvan::makePtr<Orvan::Array<float3>>(all), object);
     return true;
 }
 
@@ -171,7 +167,7 @@ inline bool deleteFaces(Flags const& deleted, Object& mesh)
     Indices faceVertex = *dataOf<unsigned int>(mesh, sFaceVertex);
     for (unsigned int& entry : faceVertex)
         entry = pointRemap[entry];
-    set(sFaceVertex, sData, Orvan::makePtr<Indices>(faceVertex), mesh);
+    replaceIn(sFaceVertex, sData, Orvan::makePtr<Indices>(faceVertex), mesh);
     if (!deleteComponents(mapping(deleted), sFaceComp, mesh))
         return false;
     Indices faceOffset = *dataOf<unsigned int>(mesh, sFaceOffset);
@@ -179,7 +175,7 @@ inline bool deleteFaces(Flags const& deleted, Object& mesh)
     for (unsigned int& entry : faceOffset)
         entry = cornerRemap[entry];
     faceOffset.append(getElementCount(mesh, sFaceVertexComp));
-    set(sFaceOffset, sData, Orvan::makePtr<Indices>(faceOffset), mesh);
+    replaceIn(sFaceOffset, sData, Orvan::makePtr<Indices>(faceOffset), mesh);
     return true;
 }
 

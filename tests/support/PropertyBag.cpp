@@ -4,6 +4,7 @@
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
 
+#include <algorithm>
 #include <string>
 #include <type_traits>
 
@@ -19,7 +20,6 @@ namespace {
         T value{};
         if constexpr (std::is_same_v<T, Orvan::String>) {
             value = std::string(random.below(30), 'a').c_str(); // up to 15 take no memory of their own
-            value += std::to_string(random.below(1000)).c_str();
         } else if constexpr (std::is_same_v<T, Common::GeoLocation>) {
             value = {randomValue<Orvan::String>(random), randomValue<Orvan::String>(random), random.below(99), {}};
         } else if constexpr (std::is_same_v<T, bool>) {
@@ -37,8 +37,7 @@ namespace {
         Orvan::String const& name, Orvan::String const& target, std::size_t length, Random& random, Object& object)
     {
         Orvan::Array<T> values(length);
-        for (T& value : values)
-            value = randomValue<T>(random);
+        std::generate(values.begin(), values.end(), [&] { return randomValue<T>(random); });
         addDataProperty<T>(name, target, std::move(values), object, randomValue<T>(random));
     }
 
@@ -50,14 +49,6 @@ namespace {
             if (type-- == 0)
                 addData<T>(name, target, length, random, object);
         });
-    }
-
-    void replaceIn(Orvan::String const& name, char const* key, Tessara::PropertyValue value, Object& object)
-    {
-        Orvan::MutablePtr<Object> changed =
-            makeMutable(Orvan::Ptr<Object>(*object.getProperty(name).get<Orvan::Ptr<Object>>()));
-        changed->setProperty(key, std::move(value));
-        object.setProperty(name, Orvan::Ptr<Object>(std::move(changed)));
     }
 
     /// Mostly the length itself.
@@ -88,6 +79,13 @@ namespace {
 
 }
 
+void replaceIn(Orvan::String const& name, char const* key, Tessara::PropertyValue value, Object& object)
+{
+    Object changed = **object.getProperty(name).get<Orvan::Ptr<Object>>();
+    changed.setProperty(key, std::move(value));
+    object.setProperty(name, Orvan::makePtr<Object>(changed));
+}
+
 void addRandomProperties(Orvan::String const& component, Random& random, Object& object)
 {
     std::size_t const count = getElementCount(object, component);
@@ -107,7 +105,9 @@ void addRandomProperties(Orvan::String const& component, Random& random, Object&
         else if (kind == 6)
             replaceIn(name, sData, 1.5f, object); // of no type that operations know
         else if (kind == 7)
-            replaceIn(name, sDefault, Tessara::PropertyValue(), object);
+            replaceIn(name, sDefault, {}, object);
+        else if (kind == 8)
+            object.setProperty("same", object.getProperty(name));
     }
 }
 

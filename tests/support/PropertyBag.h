@@ -6,6 +6,9 @@
 
 namespace TestSupport {
 
+/// Sets a value inside a geo property; its other holders see no change.
+void replaceIn(Orvan::String const& name, char const* key, Tessara::PropertyValue value, Tessara::Object& object);
+
 /// Adds properties to a component: data of any of the forty element types, with and without a default, some as long as
 /// the component and some not, and ranges with and without data. Some hold null or no array.
 void addRandomProperties(Orvan::String const& component, Random& random, Tessara::Object& object);
