@@ -37,7 +37,8 @@ namespace Tessara::GeometryAlgorithms {
 /// \throws           std::bad_alloc, with the object as it was. Job cancellation is not looked at.
 ///
 /// Linear in the elements. Arrays of plain values are compacted at the same time, each on one thread, into memory of
-/// the final size; takes 4 bytes for each element that stays, and 5 for each value of a range's data.
+/// the final size; texts and places one after the other. Takes 4 bytes for each element that stays, and up to 9 for each
+/// value of a range's data.
 MODELING_EXPORT bool deleteComponents(
     Orvan::Array<unsigned int> const& remap, Orvan::String const& component, Tessara::Object& object);
 

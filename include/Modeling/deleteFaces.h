@@ -26,7 +26,7 @@ namespace Tessara::GeometryAlgorithms {
 /// \throws         std::bad_alloc, with the mesh as it was. Job cancellation is not looked at.
 ///
 /// Linear in points, corners and faces. Used points are marked on the calling thread, arrays are compacted as
-/// `deleteComponents` says. Takes about 5 bytes a point and a corner, 4 a face, and 4 for each of them that stays.
+/// `deleteComponents` says. Takes 5 bytes a point, and 4 for each point, corner and face that stays.
 MODELING_EXPORT bool deleteFaces(Orvan::Array<bool> const& deleted, Tessara::Object& mesh);
 
 }

@@ -19,7 +19,8 @@ namespace Tessara::GeometryAlgorithms {
 ///                  what that says has been done.
 /// \throws          std::bad_alloc, with the object as it was. Job cancellation is not looked at.
 ///
-/// Linear in points and indices. Points are marked in parallel, and arrays compacted as `deleteComponents` says.
+/// Linear in points and indices. Points are marked in parallel, and arrays compacted as `deleteComponents` says. Takes a
+/// byte a point beside that.
 MODELING_EXPORT bool deletePointsInPointCloud(
     Orvan::Array<unsigned int> const& indices, Tessara::Object& object, Orvan::RuntimeServices const* services);
 MODELING_EXPORT bool deletePointsInPointCloud(
