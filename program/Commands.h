@@ -40,6 +40,9 @@ CLI::Validator isFraction();
 // Each command is a source in commands/, and is listed in Program.cpp.
 void addInfo(CLI::App& program, Invocation& invocation);
 void addValidate(CLI::App& program, Invocation& invocation);
+void addAddPoints(CLI::App& program, Invocation& invocation);
+void addDeletePoints(CLI::App& program, Invocation& invocation);
+void addDeleteFaces(CLI::App& program, Invocation& invocation);
 void addMerge(CLI::App& program, Invocation& invocation);
 void addRemoveSlivers(CLI::App& program, Invocation& invocation);
 void addTriangulate(CLI::App& program, Invocation& invocation);

@@ -76,12 +76,29 @@ void requireValid(Tessara::Object const& object, fs::path const& file)
             fmt::format("{} holds no valid {}: {}", file.string(), nameOf(typeOf(object)), status.message().view()));
 }
 
+void requirePointCloud(char const* command, Tessara::Object const& object, fs::path const& file)
+{
+    if (typeOf(object) != GeometryType::PointCloud)
+        throw Failure(ExitCode::Refused,
+            fmt::format("{} needs a point cloud, and {} holds a {}", command, file.string(), nameOf(typeOf(object))));
+}
+
+void requireDone(char const* command, bool isDone)
+{
+    if (!isDone)
+        throw Failure(ExitCode::Refused,
+            fmt::format(
+                "{} cannot be done: the geometry or one of its attributes is not as the operation needs it", command));
+}
+
 void runOperation(Report& report, std::function<void()> const& operation)
 {
     auto const start = std::chrono::steady_clock::now();
     try {
         operation();
     } catch (std::bad_alloc const&) {
+        throw;
+    } catch (Failure const&) {
         throw;
     } catch (std::exception const&) {
         stopIfCancelled(); // that is how a cancelled operation ends

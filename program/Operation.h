@@ -34,6 +34,12 @@ Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& fil
 /// Refuses an object that the validator finds fault with. `file` is where it comes from.
 void requireValid(Tessara::Object const& object, std::filesystem::path const& file);
 
+/// Refuses an object of another kind.
+void requirePointCloud(char const* command, Tessara::Object const& object, std::filesystem::path const& file);
+
+/// Refuses the input where an operation has done so.
+void requireDone(char const* command, bool isDone);
+
 /// Runs and times an operation of the library.
 void runOperation(Report& report, std::function<void()> const& operation);
 

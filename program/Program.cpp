@@ -17,7 +17,8 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addMerge, addTriangulate, addRemoveSlivers};
+    constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints, addDeleteFaces,
+        addMerge, addTriangulate, addRemoveSlivers};
 
     constexpr char kFooter[] =
         R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply

@@ -2,7 +2,12 @@
 
 // All operations of the library.
 
+#include <Modeling/addPointsToPointCloud.h>
+#include <Modeling/computeDeletedComponentMapping.h>
 #include <Modeling/copyNonGeoProperties.h>
+#include <Modeling/deleteComponents.h>
+#include <Modeling/deleteFaces.h>
+#include <Modeling/deletePointsInPointCloud.h>
 #include <Modeling/mergeMeshes.h>
 #include <Modeling/mergePointClouds.h>
 #include <Modeling/mergeStrands.h>

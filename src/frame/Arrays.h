@@ -42,12 +42,27 @@ template <class T> void copyElements(T const* source, std::size_t count, T* targ
     });
 }
 
+namespace Internal {
+
+    /// `std::fill` that goes on by copying what it has filled, which is several times as fast for values of odd sizes.
+    template <class T> void fillBlock(T* target, std::size_t count, T const& value)
+    {
+        constexpr std::size_t kCopied = std::max<std::size_t>(1, 4096 / sizeof(T)); // stays in the nearest cache
+        std::size_t const first = std::is_trivially_copyable_v<T> ? std::min(count, kCopied) : count;
+        std::fill(target, target + first, value);
+        if constexpr (std::is_trivially_copyable_v<T>)
+            for (std::size_t filled = first; filled < count; filled += first)
+                std::memcpy(static_cast<void*>(target + filled), target, std::min(first, count - filled) * sizeof(T));
+    }
+
+}
+
 /// Gives elements of an array one value, with several threads where that pays.
 template <class T> void fillElements(T* target, std::size_t count, T const& value)
 {
     // Each block writes its own elements.
     parallelFor(tbb::blocked_range<std::size_t>(0, count, Internal::kBlockGrain<T>),
-        [=, &value](auto const& block) { std::fill(target + block.begin(), target + block.end(), value); });
+        [=, &value](auto const& block) { Internal::fillBlock(target + block.begin(), block.size(), value); });
 }
 
 /// A copy of the first `count` elements of an array, with a capacity of as many.

@@ -9,15 +9,11 @@ using Tessara::Object;
 using Tessara::PropertyValue;
 using namespace Tessara::Geometry;
 
-namespace {
-
-    Orvan::Ptr<Object> objectAt(Object const& object, Orvan::String const& key)
-    {
-        PropertyValue const value = object.getProperty(key);
-        auto const* const held = value.get<Orvan::Ptr<Object>>();
-        return held ? *held : nullptr;
-    }
-
+Orvan::Ptr<Object> objectAt(Object const& object, Orvan::String const& key)
+{
+    PropertyValue const value = object.getProperty(key);
+    auto const* const held = value.get<Orvan::Ptr<Object>>();
+    return held ? *held : nullptr;
 }
 
 Orvan::Ptr<Object> dataPropertyAt(Object const& object, Orvan::String const& key)
@@ -38,20 +34,28 @@ bool writeGeoPropValue(Orvan::String const& key, PropertyValue&& data, Object& o
     return true;
 }
 
-void PreparedWrites::setElementCount(Orvan::String const& component, unsigned int count)
+bool PreparedWrites::setElementCount(Orvan::String const& component, unsigned int count)
 {
+    if (!Tessara::Geometry::setElementCount(component, getElementCount(object_, component), object_))
+        return false;
     writes_.push_back({Write::Kind::Count, component, count, nullptr});
-    Tessara::Geometry::setElementCount(component, getElementCount(object_, component), object_);
+    return true;
+}
+
+void PreparedWrites::setGeoProp(Orvan::String const& key, Orvan::Ptr<Object>&& property)
+{
+    if (!key.empty())
+        writes_.push_back({Write::Kind::Property, key, 0, std::move(property)});
 }
 
 void PreparedWrites::writeValue(Orvan::String const& key, PropertyValue&& data)
 {
     Orvan::Ptr<Object> property = dataPropertyAt(object_, key);
-    if (!property || key.empty())
+    if (!property)
         return;
     Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
     changed->setProperty(sData, std::move(data));
-    writes_.push_back({Write::Kind::Property, key, 0, std::move(changed)});
+    setGeoProp(key, std::move(changed));
 }
 
 void PreparedWrites::setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices)
@@ -60,7 +64,7 @@ void PreparedWrites::setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan
     Orvan::MutablePtr<Object> const onlyRange = Tessara::createObject();
     onlyRange->setProperty(name, object_.getProperty(name));
     if (setRangeGeoPropIndices(name, std::move(indices), *onlyRange))
-        writes_.push_back({Write::Kind::Property, name, 0, objectAt(*onlyRange, name)});
+        setGeoProp(name, objectAt(*onlyRange, name));
 }
 
 void PreparedWrites::eraseProperty(Orvan::String const& key)
@@ -68,8 +72,26 @@ void PreparedWrites::eraseProperty(Orvan::String const& key)
     writes_.push_back({Write::Kind::Erasure, key, 0, nullptr});
 }
 
+void PreparedWrites::addNewKeys()
+{
+    std::vector<Orvan::String> added;
+    try {
+        for (Write const& write : writes_) {
+            if (write.kind != Write::Kind::Property || object_.hasProperty(write.key))
+                continue;
+            added.push_back(write.key);
+            object_.setProperty(write.key, PropertyValue());
+        }
+    } catch (...) {
+        for (Orvan::String const& key : added)
+            object_.eraseProperty(key);
+        throw;
+    }
+}
+
 void PreparedWrites::commit()
 {
+    addNewKeys();
     for (Write& write : writes_) {
         switch (write.kind) {
         case Write::Kind::Count:

@@ -12,6 +12,9 @@
 
 namespace Modeling {
 
+/// The object under a key; null where there is none.
+Orvan::Ptr<Tessara::Object> objectAt(Tessara::Object const& object, Orvan::String const& key);
+
 /// The geo property under a key: null unless the key holds one with `sData`.
 Orvan::Ptr<Tessara::Object> dataPropertyAt(Tessara::Object const& object, Orvan::String const& key);
 
@@ -39,7 +42,7 @@ bool writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& da
 
 /// Changes to one object that are prepared first, and then made without taking memory: all of them or, when preparing
 /// fails, none. (Clones of geo properties are made when a change is added, and a component's count is made this
-/// object's own by setting it to what it is.)
+/// object's own by setting it to what it is. Only new keys take memory, before the first change.)
 class PreparedWrites {
 public:
     explicit PreparedWrites(Tessara::Object& object)
@@ -47,8 +50,8 @@ public:
     {
     }
 
-    /// As `setElementCount`; without effect where there is no such component.
-    void setElementCount(Orvan::String const& component, unsigned int count);
+    /// As `setElementCount`; false, and without effect, where there is no such component.
+    bool setElementCount(Orvan::String const& component, unsigned int count);
 
     /// As `writeGeoPropData`; without effect where the key holds no data property.
     template <class T> void writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& data)
@@ -56,14 +59,19 @@ public:
         writeValue(key, std::move(data));
     }
 
+    /// As `setProperty` of the object; without effect where the key is empty.
+    void setGeoProp(Orvan::String const& key, Orvan::Ptr<Tessara::Object>&& property);
+
     /// As `setRangeGeoPropIndices`; without effect where there is no range of that name.
     void setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices);
 
     /// As `eraseProperty` of the object.
     void eraseProperty(Orvan::String const& key);
 
-    /// Makes the changes in the order in which they were added. Takes no memory with a host that replaces the value of a
-    /// present key, and the count of a component that is not shared, and erases a key without taking any; the stand-ins do.
+    /// Makes the changes in the order in which they were added. Present keys take no memory with a host that replaces
+    /// their values, and the count of a component that is not shared, and erases keys without taking any; the stand-ins
+    /// do.
+    /// \throws std::bad_alloc  for a key that is new to the object, with the object as it was
     void commit();
 
 private:
@@ -74,6 +82,8 @@ private:
         unsigned int count; // of a component
         Orvan::Ptr<Tessara::Object> property; // that replaces the present one
     };
+
+    void addNewKeys();
 
     void writeValue(Orvan::String const& key, Tessara::PropertyValue&& data);
 

@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -25,6 +26,11 @@ void write(fs::path const& file, std::string const& contents)
 {
     std::ofstream(file, std::ios::binary) << contents;
 }
+
+constexpr char kCloud[] =
+    "ply\nformat ascii 1.0\nelement vertex 7\nproperty float x\nproperty float y\nproperty float z\n"
+    "property uchar label\nend_header\n"
+    "0 0 0 0\n1 0 0 3\n2 0 0 0\n3 0 0 1\n4 0 0 0\n5 0 0 0\n6 0 0 1\n";
 
 /// Runs the program as a shell does, in a folder of its own.
 class Commands : public testing::Test {
@@ -142,11 +148,37 @@ TEST_F(Commands, MergeTellsWhatBecameOfAttributes)
     EXPECT_EQ(clouds["after"]["points"], 3);
 }
 
+TEST_F(Commands, PointsAndFacesArePickedAndKeepTheirAttributes)
+{
+    copySample("cube.ply");
+    write(folder / "cloud.ply", kCloud);
+    write(folder / "list", "5 0 # twice\n\n5\n");
+    for (auto const& [arguments, picked] : {std::pair{"points cloud.ply --indices list", 2},
+             {"points cloud.ply --attribute label", 3}, {"points cloud.ply --box 4 9 9 1 -9 -9", 4},
+             {"points cloud.ply --box 1 -9 -9 4 9 9 --invert", 3}, {"faces cube.ply --indices list", 2}}) {
+        json const done = runForJson("delete-" + std::string(arguments) + " out.ply");
+        EXPECT_EQ(done["picked"], picked) << arguments;
+        std::string const element(arguments, std::strchr(arguments, ' '));
+        EXPECT_EQ(done["before"][element].get<int>() - done["after"][element].get<int>(), picked) << arguments;
+        EXPECT_EQ(runForJson("info out.ply")["counts"], done["after"]) << arguments;
+    }
+    EXPECT_EQ(runForJson("info out.ply")["properties"].size(), runForJson("info cube.ply")["properties"].size());
+    EXPECT_THAT(run("delete-points cloud.ply out.ply --attribute label").output, HasSubstr("picked 3 of 7 points\n"));
+
+    json const added = runForJson("add-points cloud.ply cube.ply both.ply --tag new");
+    json const cubePoints = runForJson("info cube.ply")["counts"]["points"];
+    EXPECT_EQ(added["after"]["points"].get<int>(), 7 + cubePoints.get<int>());
+    EXPECT_EQ(runForJson("delete-points both.ply again.ply --attribute new")["picked"], cubePoints);
+    EXPECT_EQ(runForJson("info again.ply")["boundingBox"], runForJson("info cloud.ply")["boundingBox"]);
+}
+
 TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
 {
     for (char const* const name : {"cylinder.obj", "sphere-with-hole.stl", "cube.ply", "spider.obj"})
         copySample(name);
     write(folder / "lines.obj", "v 0 0 0\nv 1 0 0\nl 1 2\n");
+    write(folder / "cloud.ply", kCloud);
+    write(folder / "list", "0 # the first\n 1 2 3 4 5 6 -1\n");
     write(folder / "broken.obj", "v 0 0 0\nf 1 2 3\n");
     fs::create_directory(folder / "folder.obj");
     write(folder / "out.obj", "as it was");
@@ -178,6 +210,13 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"remove-slivers cylinder.obj out.obj --ratio nan", 2, "nan is not a number"},
         {"remove-slivers cylinder.obj out.obj --threads 0", 2, "--threads"},
         {"remove-slivers cylinder.obj", 2, "OUT"},
+        {"delete-faces cloud.ply out.obj --indices list", 5, "needs a mesh, and cloud.ply holds a point cloud"},
+        {"delete-points cube.ply out.obj --indices list", 5, "needs a point cloud, and cube.ply holds a mesh"},
+        {"delete-faces cube.ply out.obj --indices list", 3, "list, line 2: index 6 is out of range: there are 6 faces"},
+        {"delete-points cloud.ply out.obj --attribute other", 5, "These have: label (uchar)"},
+        {"delete-points cloud.ply out.obj --box 0 0 0 1 1", 2, "6 required"},
+        {"delete-points cloud.ply out.obj --box 0 0 0 1 1 1 --indices list", 2, "Exactly 1"},
+        {"add-points cloud.ply cube.ply out.obj --tag sPointPosition", 5, "would take the place of the points"},
         {"", 2, "subcommand"},
         {"remove-splinters a b", 2, "There is no command remove-splinters"},
     };

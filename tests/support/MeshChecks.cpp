@@ -64,6 +64,8 @@ namespace {
     template <class T> void hashArray(Tessara::Object const& mesh, char const* name, std::uint64_t& hash)
     {
         auto const array = dataOf<T>(mesh, name);
+        if (!array)
+            return; // a point cloud has positions only
         auto const* const bytes = reinterpret_cast<unsigned char const*>(array->data);
         for (std::size_t i = 0; i != array->size * sizeof(T); ++i)
             hash = (hash ^ bytes[i]) * 0x100000001B3u; // FNV-1a

@@ -1,0 +1,83 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "Operation.h"
+
+#include <Modeling/addPointsToPointCloud.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <fmt/format.h>
+
+#include <memory>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using namespace Tessara::Geometry;
+    using Tessara::Object;
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path points;
+        std::filesystem::path out;
+        std::string tag;
+    };
+
+    void checkTag(std::string const& tag, Object const& cloud, Report& report)
+    {
+        Orvan::String const name = tag.c_str();
+        if (name == sPointPosition || name == sPointComp)
+            throw Failure(ExitCode::Refused, fmt::format("a tag named {} would take the place of the points", tag));
+        if (!tag.empty() && cloud.hasProperty(name))
+            report.warn(fmt::format("the tag takes the place of the attribute {}", tag));
+    }
+
+    void warnOfAttributes(Object const& points, std::filesystem::path const& file, Report& report)
+    {
+        std::vector<std::string> names;
+        for (Property const& property : propertiesOf(points))
+            if (!property.isStandard)
+                names.push_back(property.name);
+        if (!names.empty())
+            report.warn(
+                fmt::format("only positions are taken from {}; left out: {}", file.string(), fmt::join(names, ", ")));
+    }
+
+    void addPoints(Options const& options, Report& report)
+    {
+        requireWritable(options.out);
+        Orvan::MutablePtr<Object> const cloud = loadGeometry(options.in, report);
+        requirePointCloud("add-points", *cloud, options.in);
+        checkTag(options.tag, *cloud, report);
+        Orvan::MutablePtr<Object> const points = loadGeometry(options.points, report);
+        warnOfAttributes(*points, options.points, report);
+        Json const before = countsOf(*cloud);
+        auto const positions = dataOf<float3>(*points, sPointPosition);
+        runOperation(report, [&] {
+            requireDone("add-points",
+                Tessara::GeometryAlgorithms::addPointsToPointCloud(*positions, options.tag.c_str(), *cloud, nullptr));
+        });
+        saveGeometry(*cloud, options.out, report);
+        reportOperation(before, countsOf(*cloud), {}, report);
+    }
+
+}
+
+void addAddPoints(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"add-points", "Add the points of a file to a point cloud",
+        R"(The points come behind those that are there, and from any kind of file; of a mesh all its points.
+Only their positions are taken: attributes that the point cloud has are zero for them, or what their
+default is. A tag is a new attribute of the points, true for those that were added.)",
+        "  modeling add-points scan.ply second-scan.xyz both.ply --tag second"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("IN", "Point cloud to read", options->in, command);
+    addFile("POINTS", "File whose points are added", options->points, command);
+    addFile("OUT", "Point cloud to write; may be IN", options->out, command);
+    command.add_option("--tag", options->tag, "Name of the attribute that marks the new points")->type_name("NAME");
+    onSelected(command, invocation, [options](Report& report) { addPoints(*options, report); });
+}
+
+}

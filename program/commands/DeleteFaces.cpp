@@ -1,0 +1,75 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "MeshTopology.h"
+#include "Operation.h"
+#include "Selection.h"
+
+#include <Modeling/deleteFaces.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+
+#include <memory>
+
+namespace ModelingProgram {
+
+namespace {
+
+    constexpr Pickable kFaces = {Tessara::Geometry::sFaceComp, "face", "faces"};
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path out;
+        Selection selection;
+    };
+
+    void requireFacesWithCorners(Tessara::Object const& object, std::filesystem::path const& file)
+    {
+        MeshArrays const mesh = arraysOf(object);
+        if (mesh.faceCount() == 0)
+            throw Failure(ExitCode::Refused, fmt::format("there are no faces in {}", file.string()));
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face)
+            if (mesh.corners(face).empty())
+                throw Failure(ExitCode::Refused,
+                    fmt::format("delete-faces needs faces with corners, and face {} of {} has none (counted from 0)",
+                        face, file.string()));
+    }
+
+    void deleteFaces(Options const& options, Report& report)
+    {
+        requireWritable(options.out);
+        Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(options.in, report);
+        if (typeOf(*mesh) != GeometryType::Mesh)
+            throw Failure(ExitCode::Refused,
+                fmt::format(
+                    "delete-faces needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+        requireFacesWithCorners(*mesh, options.in);
+        Json const before = countsOf(*mesh);
+        Orvan::Array<bool> const picked = pickElements(options.selection, kFaces, *mesh, report);
+        runOperation(
+            report, [&] { requireDone("delete-faces", Tessara::GeometryAlgorithms::deleteFaces(picked, *mesh)); });
+        saveGeometry(*mesh, options.out, report);
+        reportOperation(before, countsOf(*mesh), {}, report);
+    }
+
+}
+
+void addDeleteFaces(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"delete-faces", "Delete faces of a mesh, and the points that no other face uses",
+        R"(Everything else keeps its order and all its attributes; points that no face used before go too. A
+face is in a box when all its corners are; corners on the border are in it. A file of indices holds
+whole numbers, separated by blanks or lines; what follows a # is a comment.)",
+        "  modeling delete-faces bunny.obj half.obj --box -1 -1 -1 0 1 1\n"
+        "  modeling delete-faces part.ply part.ply --indices bad-faces.txt\n"
+        "  modeling delete-faces scan.ply kept.ply --attribute material --invert"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("IN", "Mesh to read", options->in, command);
+    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    addSelection(kFaces, options->selection, command);
+    onSelected(command, invocation, [options](Report& report) { deleteFaces(*options, report); });
+}
+
+}

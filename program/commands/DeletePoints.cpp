@@ -1,0 +1,70 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "Operation.h"
+#include "Selection.h"
+
+#include <Modeling/deletePointsInPointCloud.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+
+#include <memory>
+
+namespace ModelingProgram {
+
+namespace {
+
+    constexpr Pickable kPoints = {Tessara::Geometry::sPointComp, "point", "points"};
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path out;
+        Selection selection;
+    };
+
+    Orvan::Array<unsigned int> indicesOf(Orvan::Array<bool> const& picked)
+    {
+        Orvan::Array<unsigned int> indices;
+        for (std::uint64_t point = 0; point != picked.size; ++point)
+            if (picked[point])
+                indices.append(static_cast<unsigned int>(point));
+        return indices;
+    }
+
+    void deletePoints(Options const& options, Report& report)
+    {
+        requireWritable(options.out);
+        Orvan::MutablePtr<Tessara::Object> const cloud = loadGeometry(options.in, report);
+        requirePointCloud("delete-points", *cloud, options.in);
+        Json const before = countsOf(*cloud);
+        if (before["points"] == 0)
+            throw Failure(ExitCode::Refused, fmt::format("there are no points in {}", options.in.string()));
+        auto const indices = indicesOf(pickElements(options.selection, kPoints, *cloud, report));
+        runOperation(report, [&] {
+            requireDone(
+                "delete-points", Tessara::GeometryAlgorithms::deletePointsInPointCloud(indices, *cloud, nullptr));
+        });
+        saveGeometry(*cloud, options.out, report);
+        reportOperation(before, countsOf(*cloud), {}, report);
+    }
+
+}
+
+void addDeletePoints(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"delete-points", "Delete points of a point cloud",
+        R"(The other points keep their order and all their attributes. A file of indices holds whole numbers,
+separated by blanks or lines; what follows a # is a comment. Points on the border of a box are in it.)",
+        "  modeling delete-points scan.ply clean.ply --indices outliers.txt\n"
+        "  modeling delete-points scan.ply part.ply --box -1 -1 0 1 1 2.5 --invert\n"
+        "  modeling delete-points scan.ply rest.ply --attribute label"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("IN", "Point cloud to read", options->in, command);
+    addFile("OUT", "Point cloud to write; may be IN", options->out, command);
+    addSelection(kPoints, options->selection, command);
+    onSelected(command, invocation, [options](Report& report) { deletePoints(*options, report); });
+}
+
+}

@@ -1,0 +1,15 @@
+#include <Modeling/deleteComponents.h>
+
+#include "Deletion.h"
+
+namespace Tessara::GeometryAlgorithms {
+
+bool deleteComponents(Orvan::Array<unsigned int> const& remap, Orvan::String const& component, Object& object)
+{
+    Internal::Deletion deletion(object);
+    bool const isDone = deletion.prepare(component, remap);
+    deletion.commit();
+    return isDone;
+}
+
+}

@@ -1,0 +1,328 @@
+#include "PlainEditing.h"
+
+#include "support/Compare.h"
+#include "support/FailingAllocations.h"
+#include "support/MeshBuilder.h"
+#include "support/MeshChecks.h"
+#include "support/PropertyBag.h"
+#include "support/Threads.h"
+
+#include <Modeling/addPointsToPointCloud.h>
+#include <Modeling/computeDeletedComponentMapping.h>
+#include <Modeling/deleteComponents.h>
+#include <Modeling/deleteFaces.h>
+#include <Modeling/deletePointsInPointCloud.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <gtest/gtest.h>
+
+#include <map>
+
+using namespace Tessara::Geometry;
+using namespace Tessara::GeometryAlgorithms;
+using namespace TestSupport;
+using PlainEditing::Flags;
+using PlainEditing::Indices;
+using Tessara::Object;
+using Positions = Orvan::Array<float3>;
+
+namespace {
+
+Positions randomPositions(std::size_t count, Random& random)
+{
+    Positions positions(count);
+    for (float3& p : positions)
+        p = {random.coordinate(), random.coordinate(), random.coordinate()};
+    return positions;
+}
+
+/// Polygons of one to five corners, and perhaps some of none; points may be of no face.
+Orvan::MutablePtr<Object> randomMesh(std::size_t pointCount, std::size_t faceCount, bool withEmptyFaces, Random& random)
+{
+    Indices corners, offsets{0};
+    for (std::size_t face = 0; face != faceCount; ++face) {
+        for (unsigned int corner = withEmptyFaces && random.below(3) == 0 ? 0 : 1 + random.below(5); corner != 0;
+             --corner)
+            corners.append(random.below(pointCount));
+        offsets.append(static_cast<unsigned int>(corners.size));
+    }
+    auto mesh = makeMesh(randomPositions(pointCount, random), std::move(corners), std::move(offsets));
+    for (char const* const component : {sPointComp, sFaceVertexComp, sFaceComp})
+        addRandomProperties(component, random, *mesh);
+    return mesh;
+}
+
+Flags randomFlags(std::size_t count, Random& random)
+{
+    unsigned int const outOf = 1 + random.below(4); // 1: all or none
+    Flags flags(count);
+    for (bool& flag : flags)
+        flag = random.below(outOf + 1) == 0;
+    if (outOf == 1)
+        std::fill(flags.begin(), flags.end(), random.below(2) == 1);
+    return flags;
+}
+
+struct Edit {
+    std::function<bool(Object&)> edit;
+    std::function<bool(Object&)> plainEdit;
+};
+
+/// A random operation, and a random object for it.
+Orvan::MutablePtr<Object> randomCase(Random& random, Edit& edit)
+{
+    std::size_t const size = random.below(8) == 0 ? random.below(900) : random.below(9);
+    if (unsigned int const kind = random.below(4); kind != 0) {
+        auto cloud = makePointCloud(randomPositions(size, random));
+        addRandomProperties(sPointComp, random, *cloud);
+        if (kind == 1) {
+            Indices indices;
+            Flags flags(size);
+            for (std::size_t i = random.below(size + 2); i != 0; --i) {
+                indices.append(random.below(size + 2)); // some twice, some out of range
+                if (indices[indices.size - 1] < size)
+                    flags[indices[indices.size - 1]] = true;
+            }
+            edit = {[=](Object& o) { return deletePointsInPointCloud(indices, o, nullptr); },
+                [=](Object& o) { return PlainEditing::deleteComponents(PlainEditing::mapping(flags), sPointComp, o); }};
+        } else if (kind == 2) {
+            Indices const remap = PlainEditing::mapping(randomFlags(size, random));
+            edit = {[=](Object& o) { return deleteComponents(remap, sPointComp, o); },
+                [=](Object& o) { return PlainEditing::deleteComponents(remap, sPointComp, o); }};
+        } else {
+            auto const positions = randomPositions(random.below(2 * size + 3), random);
+            Orvan::String const tag = random.below(2) == 0 ? "" : random.below(2) == 0 ? "isNew" : "sPointComp1";
+            edit = {[=](Object& o) { return addPointsToPointCloud(positions, tag, o, nullptr); },
+                [=](Object& o) { return PlainEditing::addPoints(positions, tag, o); }};
+        }
+        return cloud;
+    }
+    auto mesh = randomMesh(1 + size, size == 0 ? 0 : random.below(size), random.below(4) == 0, random);
+    Flags const deleted = randomFlags(getElementCount(*mesh, sFaceComp), random);
+    edit = {[=](Object& o) { return deleteFaces(deleted, o); },
+        [=](Object& o) { return PlainEditing::deleteFaces(deleted, o); }};
+    return mesh;
+}
+
+/// A random operation on a random object that somebody else may hold too.
+struct Trial {
+    explicit Trial(unsigned int seed)
+        : random(seed)
+        , object(randomCase(random, edit))
+        , before(deepCopy(*object))
+        , expected(deepCopy(*object))
+        , holders(static_cast<Holders>(seed % 4))
+        , other(held(holders, *object))
+    {
+    }
+
+    Random random;
+    Edit edit;
+    Orvan::MutablePtr<Object> object, before, expected;
+    Holders holders;
+    Object other;
+};
+
+}
+
+TEST(Editing, agreesWithThePlainReferenceOnRandomPropertyBags)
+{
+    unsigned int done = 0;
+    for (unsigned int seed = 0; seed != 6000 && !HasFailure(); ++seed) {
+        SCOPED_TRACE(seed);
+        Trial trial(seed);
+        bool const isDone = trial.edit.edit(*trial.object);
+        EXPECT_EQ(isDone, trial.edit.plainEdit(*trial.expected));
+        EXPECT_TRUE(sameContents(*trial.object, *trial.expected));
+        EXPECT_TRUE(sameContents(trial.other, held(trial.holders, *trial.before))) << "somebody else sees a change";
+        done += isDone ? 1 : 0;
+    }
+    EXPECT_GT(done, 4000u);
+    EXPECT_LT(done, 5800u) << "some are refused halfway";
+}
+
+TEST(Editing, leavesTheObjectAsItWasWhenMemoryRunsOut)
+{
+    for (unsigned int seed = 0; seed != 24; ++seed) {
+        SCOPED_TRACE(seed);
+        sweepFailingAllocations([&](Attempt const& attempt) {
+            Trial trial(seed);
+            bool const isDone = attempt([&] { trial.edit.edit(*trial.object); });
+            if (isDone)
+                trial.edit.plainEdit(*trial.expected);
+            EXPECT_TRUE(sameContents(*trial.object, isDone ? *trial.expected : *trial.before));
+            EXPECT_TRUE(sameContents(trial.other, held(trial.holders, *trial.before)));
+        });
+    }
+}
+
+TEST(Editing, editsArraysOfItsOwnInPlace)
+{
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
+    float3 const* const data = dataOf<float3>(*cloud, sPointPosition)->data;
+    ASSERT_TRUE(deletePointsInPointCloud(Indices{0}, *cloud, nullptr));
+    EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->data, data);
+    EXPECT_EQ(*dataOf<float3>(*cloud, sPointPosition), (Positions{{1, 0, 0}}));
+}
+
+TEST(Editing, readsArgumentsThatLieInTheObject)
+{
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
+    addDataProperty<unsigned int>("chosen", sPointComp, {1, 1, 0, 1}, *cloud);
+    // References alone: nobody holds these arrays but the object.
+    Positions const& positions = *dataOf<float3>(*cloud, sPointPosition);
+    ASSERT_TRUE(addPointsToPointCloud(positions, "isNew", *cloud, nullptr));
+    EXPECT_EQ(*dataOf<float3>(*cloud, sPointPosition), (Positions{{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {1, 0, 0}}));
+    Indices const& chosen = *dataOf<unsigned int>(*cloud, "chosen");
+    ASSERT_TRUE(deletePointsInPointCloud(chosen, *cloud, nullptr));
+    EXPECT_EQ(*dataOf<unsigned int>(*cloud, "chosen"), (Indices{0, 1}));
+
+    auto const mesh = MeshBuilder::tetrahedron().build();
+    addDataProperty<bool>("goes", sFaceComp, {true, false, true, true}, *mesh);
+    Flags const& goes = *dataOf<bool>(*mesh, "goes");
+    ASSERT_TRUE(deleteFaces(goes, *mesh));
+    EXPECT_EQ(countsOf(*mesh), (Counts{3, 3, 1}));
+}
+
+TEST(AddPoints, growsByTheGrowthRuleAndLosesRecords)
+{
+    Random random(3);
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
+    addAllTypes(sPointComp, random, *cloud);
+    ASSERT_TRUE(addPointsToPointCloud({{9, 9, 9}}, "isNew", *cloud, nullptr));
+    for (char const* const type : {"GeometryType", "GeoLocation", "FaceEdge", "GraphTransforms"})
+        EXPECT_TRUE(getDataGeoProperty(*cloud, (std::string(sPointComp) + type).c_str())->getProperty(sData).empty());
+    EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->capacity, 6u) << "doubles";
+    ASSERT_TRUE(addPointsToPointCloud(Positions(9), "isNew", *cloud, nullptr));
+    EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->capacity, 13u) << "by what is needed";
+    EXPECT_FALSE(addPointsToPointCloud({{1, 1, 1}}, sPointPosition, *cloud, nullptr))
+        << "the tag replaces the positions";
+    EXPECT_EQ(dataOf<bool>(*cloud, sPointPosition)->size, 14u);
+}
+
+TEST(Editing, refusesBeforeTheFirstChange)
+{
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}}), emptyCloud = makePointCloud({});
+    auto const withTwo = makePointCloud({{0, 0, 0}}), withoutPositions = makePointCloud({{0, 0, 0}});
+    addComponent("sOtherComp", 1, *withTwo);
+    addDataProperty<int>(sPointPosition, sPointComp, {1}, *withoutPositions);
+    auto const mesh = MeshBuilder::tetrahedron().build(), shortOffsets = MeshBuilder::tetrahedron().build();
+    addDataProperty<unsigned int>(sFaceOffset, sFaceComp, {0, 3, 6, 9}, *shortOffsets);
+    auto const noPoints = makeMesh({}, {}, {});
+    Positions one(1), tooMany(1);
+    tooMany.size = 0xFFFFFFFFu; // more than a component can hold, and never read
+    auto const add = [](Positions const& p) {
+        return [&](Object& o) { return addPointsToPointCloud(p, "t", o, nullptr); };
+    };
+    Indices const none, first{0};
+    auto const deletePoint = [&](Object& o) { return deletePointsInPointCloud(first, o, nullptr); };
+    auto const deleteNone = [](Object& o) { return deleteFaces(Flags(getElementCount(o, sFaceComp)), o); };
+    std::map<std::string, std::pair<Object*, std::function<bool(Object&)>>> const cases{
+        {"add to a mesh", {mesh.get(), add(one)}},
+        {"add to a cloud with a second component", {withTwo.get(), add(one)}},
+        {"add to a cloud without positions", {withoutPositions.get(), add(one)}},
+        {"add more than 32 bits", {cloud.get(), add(tooMany)}},
+        {"delete points of a mesh", {mesh.get(), deletePoint}},
+        {"delete points of an empty cloud", {emptyCloud.get(), deletePoint}},
+        {"remap of another length", {cloud.get(), [&](Object& o) { return deleteComponents(first, sPointComp, o); }}},
+        {"no such component", {cloud.get(), [&](Object& o) { return deleteComponents(none, "absent", o); }}},
+        {"delete faces of a cloud", {cloud.get(), deleteNone}},
+        {"flags of another length", {mesh.get(), [](Object& o) { return deleteFaces(Flags(3), o); }}},
+        {"short offsets", {shortOffsets.get(), deleteNone}},
+        {"mesh without points", {noPoints.get(), deleteNone}},
+    };
+    for (auto const& [name, c] : cases) {
+        auto const before = deepCopy(*c.first);
+        EXPECT_FALSE(c.second(*c.first)) << name;
+        EXPECT_TRUE(sameContents(*c.first, *before)) << name;
+    }
+    tooMany.size = 1;
+}
+
+TEST(DeleteComponents, worksByHand)
+{
+    EXPECT_EQ(computeDeletedComponentMapping({false, true, false}), (Indices{0, kDeletedElement, 1}));
+    EXPECT_EQ(computeDeletedComponentMapping({}), Indices());
+
+    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
+    addRangeProperty("seam", sPointComp, {3, kInvalidIndex, 1}, *cloud);
+    addDataProperty<int>("of seam", "seam", {5, 6, 7, 8}, *cloud);
+    ASSERT_TRUE(deletePointsInPointCloud(Orvan::Array<long long>{-1, 3, 1LL << 40, -(1LL << 40)}, *cloud, nullptr));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{1, kInvalidIndex, 0}));
+    EXPECT_EQ(*dataOf<int>(*cloud, "of seam"), (Orvan::Array<int>{6, 8})) << "unused values go, though no point does";
+    ASSERT_TRUE(deletePointsInPointCloud(Orvan::Array<long long>{0, 0, 2}, *cloud, nullptr));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{kInvalidIndex}));
+    EXPECT_TRUE(dataOf<int>(*cloud, "of seam")->empty());
+}
+
+TEST(DeleteFaces, worksByHand)
+{
+    Positions const points{{0, 0, 0}, {1, 0, 0}, {9, 9, 9}, {1, 1, 0}, {0, 1, 0}};
+    auto const mesh = makeMesh(points, {0, 1, 3, 4, 4, 3, 1}, {0, 4, 7});
+    ASSERT_TRUE(deleteFaces({false, false}, *mesh));
+    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceVertex), (Indices{0, 1, 2, 3, 3, 2, 1})) << "without the unused point";
+    ASSERT_TRUE(deleteFaces({true, false}, *mesh));
+    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceVertex), (Indices{2, 1, 0}));
+    ASSERT_TRUE(deleteFaces({true}, *mesh));
+    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceOffset), Indices{0});
+    EXPECT_TRUE(isValid(*mesh));
+
+    auto const onlyPoints = makeMesh(points, {}, {});
+    EXPECT_FALSE(deleteFaces({}, *onlyPoints));
+    EXPECT_EQ(getElementCount(*onlyPoints, sPointComp), 0u) << "they go before the corners are refused";
+    auto const emptyFace = makeMesh(points, {0, 1, 3, 4, 3, 1}, {0, 3, 3, 6});
+    ASSERT_TRUE(deleteFaces({false, false, true}, *emptyFace));
+    EXPECT_EQ(*dataOf<unsigned int>(*emptyFace, sFaceOffset), (Indices{0, kDeletedElement, 3})) << "on purpose";
+}
+
+TEST(DeleteFaces, staysInsideTheArraysWhateverTheyHold)
+{
+    for (unsigned int seed = 0; seed != 2000; ++seed) {
+        Random random(seed);
+        auto const mesh = randomMesh(1 + random.below(9), 1 + random.below(9), false, random);
+        std::size_t const faceCount = getElementCount(*mesh, sFaceComp);
+        for (char const* const name : {sFaceVertex, sFaceOffset}) {
+            Indices values = *dataOf<unsigned int>(*mesh, name);
+            for (unsigned int& value : values)
+                value = random.below(3) == 0 ? 0u - random.below(4) : random.below(3) == 0 ? random.below(40) : value;
+            addDataProperty<unsigned int>(name, getGeoPropTargetName(*mesh, name), values, *mesh);
+        }
+        deleteFaces(randomFlags(faceCount, random), *mesh);
+        Indices remap(getElementCount(*mesh, sPointComp), Orvan::kUninitialized);
+        for (unsigned int& entry : remap)
+            entry = random.below(2) == 0 ? 0u - random.below(4) : random.below(40);
+        deleteComponents(remap, sPointComp, *mesh);
+    }
+}
+
+TEST(Editing, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
+{
+    Random random(8);
+    auto const source = MeshBuilder::sphere(40).withNoise(0.1f, 2).shuffled(3).build();
+    for (char const* const component : {sPointComp, sFaceVertexComp, sFaceComp})
+        addAllTypes(component, random, *source);
+    auto const cloud = makePointCloud(randomPositions(30'000, random));
+    addAllTypes(sPointComp, random, *cloud);
+    Flags deleted(getElementCount(*source, sFaceComp));
+    for (std::size_t face = 0; face != deleted.size; ++face)
+        deleted[face] = face / 20 % 2 == 0 || random.below(9) == 0;
+    Indices indices(20'000);
+    for (unsigned int& index : indices)
+        index = random.below(40'000);
+    auto const thinned = [&] {
+        auto mesh = makeMutable(Orvan::makePtr<Object>(*source));
+        EXPECT_TRUE(deleteFaces(deleted, *mesh));
+        return mesh;
+    };
+    auto const edited = [&] {
+        auto object = makeMutable(Orvan::makePtr<Object>(*cloud));
+        EXPECT_TRUE(deletePointsInPointCloud(indices, *object, nullptr));
+        EXPECT_TRUE(addPointsToPointCloud(*dataOf<float3>(*source, sPointPosition), "isNew", *object, nullptr));
+        return object;
+    };
+    expectSameForThreads({1, 2, 8}, thinned);
+    expectSameForThreads({1, 2, 8}, edited);
+    EXPECT_EQ(fingerprint(*thinned()) ^ fingerprint(*edited()), 3499281809127205428u) << "unlike other builds";
+}
