@@ -20,11 +20,6 @@ namespace {
 
     constexpr unsigned int kCancelPlace = 4; // what the host knows this loop by
 
-    constexpr unsigned int nextCorner(unsigned int k)
-    {
-        return k == 2 ? 0 : k + 1;
-    }
-
     /// What a face and those around it make of its state. Bits are only ever set, so repeating this comes to an end.
     unsigned char settledState(
         unsigned char state, std::array<unsigned int, 3> const& across, unsigned char const* states)
@@ -50,57 +45,147 @@ namespace {
         return static_cast<unsigned char>(level << 2 | split << 1 | marked);
     }
 
-}
+    std::array<unsigned int, 3> facesAcross(HalfEdgeDataStructure const& halfEdges, unsigned int const* c)
+    {
+        return {halfEdges.halfEdge(c[0], c[1]).face, halfEdges.halfEdge(c[1], c[2]).face,
+            halfEdges.halfEdge(c[2], c[0]).face};
+    }
 
-FaceNeighbours findFaceNeighbours(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
-    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset)
-{
-    FaceNeighbours neighbours = uninitializedArray<std::array<unsigned int, 3>>(numFaces);
-    std::array<unsigned int, 3>* const across = neighbours.data;
-    // Each face writes its own entry.
-    parallelFor(tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [&, across](auto const& faces) {
-        for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
-            unsigned int const* const c = faceVertex.data + faceOffset[face];
-            for (unsigned int k = 0; k != 3; ++k)
-                across[face][k] = halfEdges.halfEdge(c[k], c[nextCorner(k)]).face;
+    void announceCancelPlace()
+    {
+        TSR::Canceller::ID place{kCancelPlace};
+        TSR::Canceller::cancelID(place);
+    }
+
+    /// The sweeps of one pass. A sweep works only on faces at which something may change, and looks up what is across the
+    /// edges of these alone: mostly a pass has to do with few of the faces.
+    class Balance {
+    public:
+        Balance(HalfEdgeDataStructure const& halfEdges, unsigned int faceCount, unsigned int const* faceVertex,
+            unsigned int const* faceOffset, unsigned char* states)
+            : halfEdges_(halfEdges)
+            , faceVertex_(faceVertex)
+            , faceOffset_(faceOffset)
+            , faceCount_(faceCount)
+            , settled_(states)
+            , current_(uninitializedArray<unsigned char>(faceCount))
+            , isDue_(zeroedArray<unsigned char>(faceCount))
+            , isDueNext_(zeroedArray<unsigned char>(faceCount))
+            , hasNeighbours_(zeroedArray<unsigned char>(faceCount))
+            , neighbours_(uninitializedArray<std::array<unsigned int, 3>>(faceCount))
+        {
+            copyElements(settled_, faceCount_, current_.data);
         }
-    });
-    return neighbours;
+
+        /// Requested faces and those around them are due in the first sweep.
+        void prepare()
+        {
+            // Each face looks up its own neighbours; any may set flags, which are looked at after the loop.
+            parallelFor(tbb::blocked_range<unsigned int>(0, faceCount_, kFaceGrain), [this](auto const& faces) {
+                for (unsigned int face = faces.begin(); face != faces.end(); ++face)
+                    if (isRequested(current_[face]))
+                        callUp(face, isDue_.data);
+            });
+        }
+
+        /// \return whether a state has changed
+        bool sweep()
+        {
+            std::atomic<bool> isChanged = false;
+            // Each face reads what the sweep before has left and writes its own state; any may set flags, which are
+            // looked at after the loop.
+            parallelFor(
+                tbb::blocked_range<unsigned int>(0, faceCount_, kFaceGrain),
+                [&, this](auto const& faces) {
+                    announceCancelPlace();
+                    if (settleFaces(faces.begin(), faces.end()))
+                        isChanged.store(true, std::memory_order_relaxed);
+                },
+                false);
+            copyElements(settled_, faceCount_, current_.data);
+            isDue_.swap(isDueNext_);
+            return isChanged.load(std::memory_order_relaxed);
+        }
+
+        FaceNeighbours takeNeighbours() { return std::move(neighbours_); }
+
+    private:
+        bool settleFaces(unsigned int first, unsigned int last)
+        {
+            bool isChanged = false;
+            for (unsigned int face = first; face != last; ++face) {
+                if (!isDue_[face])
+                    continue;
+                isDue_[face] = false; // for the sweep after the next one
+                lookAround(face);
+                unsigned char const state = settledState(current_[face], neighbours_[face], current_.data);
+                if (state == current_[face])
+                    continue;
+                settled_[face] = state;
+                callUp(face, isDueNext_.data);
+                isChanged = true;
+            }
+            return isChanged;
+        }
+
+        void lookAround(unsigned int face)
+        {
+            if (hasNeighbours_[face])
+                return;
+            hasNeighbours_[face] = true;
+            neighbours_[face] = facesAcross(halfEdges_, faceVertex_ + faceOffset_[face]);
+        }
+
+        /// A face and those around it are due.
+        void callUp(unsigned int face, unsigned char* isDue)
+        {
+            lookAround(face);
+            callUpFace(isDue[face]);
+            for (unsigned int const neighbour : neighbours_[face])
+                if (neighbour != kInvalidIndex)
+                    callUpFace(isDue[neighbour]);
+        }
+
+        static void callUpFace(unsigned char& isDue)
+        {
+            std::atomic_ref<unsigned char> const flag(isDue);
+            if (!flag.load(std::memory_order_relaxed))
+                flag.store(true, std::memory_order_relaxed);
+        }
+
+        HalfEdgeDataStructure const& halfEdges_;
+        unsigned int const* faceVertex_;
+        unsigned int const* faceOffset_;
+        unsigned int faceCount_;
+        unsigned char* settled_;
+        Orvan::Array<unsigned char> current_; // as the sweep before has left them
+        Orvan::Array<unsigned char> isDue_, isDueNext_; // faces to look at
+        Orvan::Array<unsigned char> hasNeighbours_;
+        FaceNeighbours neighbours_;
+    };
+
+    bool isAnyRequested(Orvan::Array<unsigned char> const& states, unsigned int faceCount)
+    {
+        return std::any_of(states.data, states.data + faceCount, isRequested);
+    }
+
 }
 
-void balanceFaceStates(FaceNeighbours const& neighbours, Orvan::Array<unsigned char>& faceStates)
+FaceNeighbours balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
+    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
+    Orvan::Array<unsigned char>& faceStates)
 {
-    auto const faceCount = static_cast<unsigned int>(faceStates.size);
-    Orvan::Array<unsigned char> current = copyOfFirst(faceCount, faceStates);
-    std::array<unsigned int, 3> const* const across = neighbours.data;
-    unsigned char const* const state = current.data;
-    unsigned char* const settled = faceStates.data;
-    std::atomic<bool> isChanged;
-    do {
-        isChanged.store(false, std::memory_order_relaxed);
-        // Each face reads what the sweep before has left and writes its own state; any may set the flag, which is looked at
-        // after the loop.
+    if (!isAnyRequested(faceStates, numFaces)) {
+        // There is nothing to spread, but this is where a pass can be cancelled.
         parallelFor(
-            tbb::blocked_range<unsigned int>(0, faceCount, kFaceGrain),
-            [&isChanged, across, state, settled](auto const& faces) {
-                TSR::Canceller::ID place{kCancelPlace};
-                TSR::Canceller::cancelID(place);
-                if (!across)
-                    return;
-                bool hasChanged = false;
-                for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                    if (unsigned char const next = settledState(state[face], across[face], state);
-                        next != state[face]) {
-                        settled[face] = next;
-                        hasChanged = true;
-                    }
-                if (hasChanged)
-                    isChanged.store(true, std::memory_order_relaxed);
-            },
+            tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [](auto const&) { announceCancelPlace(); },
             false);
-        if (isChanged.load(std::memory_order_relaxed))
-            copyElements(faceStates.data, faceCount, current.data);
-    } while (isChanged.load(std::memory_order_relaxed));
+        return {};
+    }
+    Balance balance(halfEdges, numFaces, faceVertex.data, faceOffset.data, faceStates.data);
+    balance.prepare();
+    while (balance.sweep()) { }
+    return balance.takeNeighbours();
 }
 
 bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
@@ -109,10 +194,8 @@ bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
 {
     auto const largestDifference = [&](tbb::blocked_range<unsigned int> const& faces, unsigned int largest) {
         for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
-            unsigned int const* const c = faceVertex.data + faceOffset[face];
             unsigned int const level = levelOf(faceStates[face]);
-            for (unsigned int k = 0; k != 3; ++k) {
-                unsigned int const neighbour = halfEdges.halfEdge(c[k], c[nextCorner(k)]).face;
+            for (unsigned int const neighbour : facesAcross(halfEdges, faceVertex.data + faceOffset[face])) {
                 if (neighbour == kInvalidIndex)
                     continue;
                 unsigned int const other = levelOf(faceStates[neighbour]);

@@ -53,13 +53,13 @@ constexpr unsigned char stateOfLevel(unsigned int level)
 /// The faces across the three edges of each face, `kInvalidIndex` where there is none.
 using FaceNeighbours = Orvan::Array<std::array<unsigned int, 3>>;
 
-FaceNeighbours findFaceNeighbours(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
-    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset);
-
 /// Spreads requests until neighbours agree on which faces split in this pass. The one place that looks at cancellation:
 /// at the end of each sweep over the faces.
-/// \param neighbours  may be empty where no face is marked: then there is nothing to spread
+/// \return the neighbours of all faces that split; entries of others may not have been written, and the array is empty
+///         where no face is requested
 /// \throws std::runtime_error  when the job is cancelled; `faceStates` may then be half done
-void balanceFaceStates(FaceNeighbours const& neighbours, Orvan::Array<unsigned char>& faceStates);
+FaceNeighbours balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
+    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
+    Orvan::Array<unsigned char>& faceStates);
 
 }

@@ -8,7 +8,7 @@
 
 #include <TessaraMathSupport/Types.h>
 
-#include <atomic>
+#include <algorithm>
 #include <limits>
 #include <new>
 
@@ -22,22 +22,15 @@ namespace {
 
     using IndexArray = Orvan::Array<unsigned int>;
 
-    /// Takes the requests of the pass to the states. \return whether any face has one, old ones included
-    bool takeMarks(Orvan::Array<bool> const& marks, unsigned int numFaces, Orvan::Array<unsigned char>& faceStates)
+    void takeMarks(Orvan::Array<bool> const& marks, unsigned int numFaces, Orvan::Array<unsigned char>& faceStates)
     {
-        std::atomic<bool> isAnyRequested = false;
-        // Each face writes its own state; any may set the flag, which is looked at after the loop.
-        parallelFor(tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain),
-            [&isAnyRequested, mark = marks.data, state = faceStates.data](auto const& faces) {
-                unsigned int requests = 0;
-                for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
-                    state[face] |= mark[face] ? kMarkedBit : 0;
-                    requests |= isRequested(state[face]);
-                }
-                if (requests)
-                    isAnyRequested.store(true, std::memory_order_relaxed);
-            });
-        return isAnyRequested.load(std::memory_order_relaxed);
+        bool const* const mark = marks.data;
+        unsigned char* const state = faceStates.data;
+        // Each face writes its own state.
+        parallelFor(tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [=](auto const& faces) {
+            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
+                state[face] |= mark[face] ? kMarkedBit : 0;
+        });
     }
 
     /// Which faces stay, and how many new ones and new points there are: entry f of each array counts what belongs to the
@@ -181,10 +174,8 @@ void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& hal
     Orvan::Array<float3>& limitPositions, Orvan::Array<unsigned char>& vertexLevels, IndexArray& faceVertex,
     IndexArray& faceOffset, Orvan::Array<unsigned char>& faceStates, Tessara::Object& object)
 {
-    FaceNeighbours neighbours;
-    if (takeMarks(marks, numFaces, faceStates))
-        neighbours = findFaceNeighbours(halfEdges, numFaces, faceVertex, faceOffset);
-    balanceFaceStates(neighbours, faceStates);
+    takeMarks(marks, numFaces, faceStates);
+    FaceNeighbours const neighbours = balanceFaceStates(halfEdges, numFaces, faceVertex, faceOffset, faceStates);
 
     SettledFaces faces{
         halfEdges, faceVertex.data, faceOffset.data, faceStates.data, neighbours.data, numFaces, numPoints, nullptr};
