@@ -1,0 +1,218 @@
+#pragma once
+
+#include "support/MeshBuilder.h"
+
+#include <algorithm>
+#include <cmath>
+#include <map>
+#include <set>
+#include <utility>
+#include <vector>
+
+namespace TestSupport {
+
+/// The operation once more, written plainly: maps, every sweep over all faces, and no step left out. For triangle meshes
+/// without equal directed edges.
+class PlainSubdivision {
+public:
+    using Triangle = MeshBuilder::Triangle;
+
+    PlainSubdivision(MeshBuilder const& mesh, std::vector<float3> pointValues)
+        : faces(mesh.faces)
+        , positions(mesh.points)
+        , values(std::move(pointValues))
+        , states(faces.size(), 0)
+        , basePositions_(mesh.points)
+        , vertexLevels_(mesh.points.size(), 0)
+    {
+        rebuild();
+        for (unsigned int v = 0; v != positions.size(); ++v) {
+            auto const n = static_cast<float>(neighbours_[v].size());
+            float3 sum{0, 0, 0};
+            for (unsigned int const u : neighbours_[v])
+                sum = plus(sum, positions[u]);
+            float const t = beta(n) * 3, gamma = t / (t + 1);
+            limitPositions_.push_back(plus(times(1 - gamma, positions[v]), times(gamma / n, sum)));
+        }
+    }
+
+    void run(float tolerance)
+    {
+        std::size_t before = 0;
+        do {
+            before = faces.size();
+            std::vector<bool> marks;
+            for (Triangle const& f : faces)
+                marks.push_back(isLarge(f, tolerance));
+            pass(marks);
+        } while (faces.size() != before);
+    }
+
+    bool isLarge(Triangle const& f, float tolerance) const
+    {
+        float side = 0;
+        for (unsigned int k = 0; k != 3; ++k) {
+            float3 const p = positions[f[k]], q = positions[f[(k + 1) % 3]];
+            side = std::max({side, std::abs(q.x - p.x), std::abs(q.y - p.y), std::abs(q.z - p.z)});
+        }
+        return tolerance > 1.1920929e-7f && side > tolerance + tolerance;
+    }
+
+    void pass(std::vector<bool> const& marks)
+    {
+        for (std::size_t f = 0; f != faces.size(); ++f)
+            states[f] |= marks[f] ? 1u : 0u;
+        while (sweep()) { }
+        std::vector<unsigned int> newPoint(faces.size());
+        auto numPoints = static_cast<unsigned int>(positions.size());
+        std::vector<float3> newBase, newLimit;
+        std::vector<unsigned int> newLevels;
+        for (unsigned int f = 0; f != faces.size(); ++f)
+            if (splits(f) && !(level(f) & 1)) {
+                newPoint[f] = numPoints++;
+                makePoint(f, newBase, newLimit, newLevels);
+                auto const& [a, b, c] = faces[f];
+                values.push_back(times(0.33333334f, plus(plus(plus({0, 0, 0}, values[a]), values[b]), values[c])));
+            }
+        basePositions_.insert(basePositions_.end(), newBase.begin(), newBase.end());
+        limitPositions_.insert(limitPositions_.end(), newLimit.begin(), newLimit.end());
+        vertexLevels_.insert(vertexLevels_.end(), newLevels.begin(), newLevels.end());
+        replaceFaces(newPoint);
+        rebuild();
+        positions.clear();
+        for (unsigned int v = 0; v != numPoints; ++v)
+            positions.push_back(evaluate(v, (finest_[v] >> 1) - vertexLevels_[v]));
+    }
+
+    std::vector<Triangle> faces;
+    std::vector<float3> positions;
+    std::vector<float3> values;
+    std::vector<unsigned int> states;
+
+private:
+    static float3 plus(float3 a, float3 b) { return {a.x + b.x, a.y + b.y, a.z + b.z}; }
+    static float3 times(float s, float3 a) { return {s * a.x, s * a.y, s * a.z}; }
+    static float3 third(float3 a) { return {a.x / 3.0f, a.y / 3.0f, a.z / 3.0f}; }
+    static float cosine(float angle)
+    {
+        float volatile const atRunTime = angle;
+        return std::cos(atRunTime);
+    }
+    static float beta(float n) { return (4 - 2 * cosine(6.2831855f / n)) / 9; }
+
+    float3 evaluate(unsigned int v, unsigned int e) const
+    {
+        float const lambda = 0.6666667f - beta(static_cast<float>(neighbours_[v].size()));
+        float const w = std::pow(lambda, static_cast<float>(e));
+        return plus(times(1 - w, limitPositions_[v]), times(w, basePositions_[v]));
+    }
+
+    unsigned int level(std::size_t f) const { return states[f] >> 2; }
+    bool splits(std::size_t f) const { return states[f] & 2; }
+    unsigned int across(std::size_t f, unsigned int k) const { return owner_.at({faces[f][(k + 1) % 3], faces[f][k]}); }
+    unsigned int pointAcross(std::size_t f, unsigned int k) const
+    {
+        for (unsigned int const p : faces[across(f, k)])
+            if (p != faces[f][k] && p != faces[f][(k + 1) % 3])
+                return p;
+        return 0;
+    }
+
+    bool sweep()
+    {
+        std::vector<unsigned int> const current = states;
+        for (std::size_t f = 0; f != faces.size(); ++f) {
+            unsigned int const l = current[f] >> 2;
+            unsigned int m = current[f] & 1, t = current[f] >> 1 & 1, lowest = ~0u;
+            for (unsigned int k = 0; k != 3; ++k) {
+                unsigned int const n = current[across(f, k)], other = n >> 2;
+                lowest = std::min(lowest, other);
+                if (n & 1)
+                    m |= l % 2 ? other != l : l < other;
+                if (n & 2 && l % 2 && other < l)
+                    t = 1;
+            }
+            if (l % 2 == 0 && m && l <= lowest)
+                t = 1;
+            states[f] = l << 2 | t << 1 | m;
+        }
+        return states != current;
+    }
+
+    void makePoint(
+        unsigned int f, std::vector<float3>& base, std::vector<float3>& limit, std::vector<unsigned int>& levels) const
+    {
+        unsigned int const h = level(f) >> 1;
+        float3 current{0, 0, 0}, next{0, 0, 0};
+        unsigned int newLevel = 0;
+        for (unsigned int k = 0; k != 3; ++k) {
+            unsigned int const v = faces[f][k], e = h - vertexLevels_[v];
+            current = plus(current, evaluate(v, e));
+            next = plus(next, evaluate(v, e + 1));
+            newLevel = std::max(newLevel, vertexLevels_[v] + 1);
+            if (level(across(f, k)) % 2) {
+                unsigned int const x = pointAcross(f, k);
+                next = plus(next, evaluate(x, h - vertexLevels_[x]));
+            } else {
+                float3 sum{0, 0, 0};
+                for (unsigned int const u : faces[across(f, k)])
+                    sum = plus(sum, evaluate(u, h - vertexLevels_[u]));
+                next = plus(next, third(sum));
+            }
+        }
+        float const t = (4 - 2 * cosine(1.0471976f)) / 9 * 3, gamma = t / (t + 1);
+        base.push_back(third(current));
+        limit.push_back(plus(times(1 - gamma, base.back()), times(gamma / 6, next)));
+        levels.push_back(newLevel);
+    }
+
+    void replaceFaces(std::vector<unsigned int> const& newPoint)
+    {
+        std::vector<Triangle> newFaces;
+        std::vector<unsigned int> newStates;
+        for (std::size_t f = 0; f != faces.size(); ++f)
+            if (!splits(f)) {
+                newFaces.push_back(faces[f]);
+                newStates.push_back(states[f]);
+            }
+        auto const add = [&](unsigned int a, unsigned int b, unsigned int c, unsigned int l) {
+            newFaces.push_back({a, b, c});
+            newStates.push_back(l << 2);
+        };
+        for (std::size_t f = 0; f != faces.size(); ++f)
+            for (unsigned int k = 0; k != 3 && splits(f) && level(f) % 2 == 0; ++k) {
+                unsigned int const a = faces[f][k], b = faces[f][(k + 1) % 3], c = newPoint[f], n = across(f, k);
+                if (!splits(n)) {
+                    add(a, b, c, level(f) + 1);
+                } else if (level(n) > level(f)) {
+                    add(a, pointAcross(f, k), c, level(f) + 2);
+                    add(b, c, pointAcross(f, k), level(f) + 2);
+                } else if (level(n) == level(f)) {
+                    add(a, newPoint[n], c, level(f) + 2);
+                }
+            }
+        faces = newFaces;
+        states = newStates;
+    }
+
+    void rebuild()
+    {
+        owner_.clear();
+        neighbours_.assign(std::max(positions.size(), basePositions_.size()), {});
+        finest_.assign(neighbours_.size(), 0);
+        for (unsigned int f = 0; f != faces.size(); ++f)
+            for (unsigned int k = 0; k != 3; ++k) {
+                owner_[{faces[f][k], faces[f][(k + 1) % 3]}] = f;
+                neighbours_[faces[f][(k + 1) % 3]].insert(faces[f][k]);
+                finest_[faces[f][k]] = std::max(finest_[faces[f][k]], level(f));
+            }
+    }
+
+    std::vector<float3> basePositions_, limitPositions_;
+    std::vector<unsigned int> vertexLevels_;
+    std::map<std::pair<unsigned int, unsigned int>, unsigned int> owner_; // the face that passes a directed edge
+    std::vector<std::set<unsigned int>> neighbours_;
+    std::vector<unsigned int> finest_; // the highest level of a face at each point
+};
+
+}
