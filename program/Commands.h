@@ -41,5 +41,6 @@ CLI::Validator isFraction();
 void addInfo(CLI::App& program, Invocation& invocation);
 void addValidate(CLI::App& program, Invocation& invocation);
 void addRemoveSlivers(CLI::App& program, Invocation& invocation);
+void addSubdivide(CLI::App& program, Invocation& invocation);
 
 }

@@ -1,8 +1,12 @@
 #include "MeshRequirements.h"
 
+#include "Failure.h"
+#include "Geometry.h"
 #include "Report.h"
 
 #include <fmt/format.h>
+
+#include <cmath>
 
 namespace ModelingProgram {
 
@@ -77,6 +81,47 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
         faults.push_back(fmt::format("{} a point more than once. The first is face {}. Remove such faces first.",
             countOf(faces.count, "face visits", "faces visit"), faces.first));
     return faults;
+}
+
+std::vector<std::string> faultsOfPoints(MeshArrays const& mesh, MeshTopology const& topology)
+{
+    std::vector<std::string> faults;
+    Finding odd;
+    for (unsigned int point = 0; point != mesh.pointCount(); ++point) {
+        auto const& p = (*mesh.positions)[point];
+        if (!std::isfinite(p.x) || !std::isfinite(p.y) || !std::isfinite(p.z))
+            odd.add(point);
+    }
+    if (odd)
+        faults.push_back(fmt::format("{} at no finite place. The first is {}.",
+            countOf(odd.count, "point lies", "points lie"), describePoint(mesh, odd.first)));
+    if (Finding const& points = topology.isolatedPoints)
+        faults.push_back(fmt::format("{} to no face. The first is {}. Remove such points first.",
+            countOf(points.count, "point belongs", "points belong"), describePoint(mesh, points.first)));
+    return faults;
+}
+
+void requireMesh(Tessara::Object const& object, char const* command, std::filesystem::path const& file)
+{
+    if (typeOf(object) != GeometryType::Mesh)
+        throw Failure(ExitCode::Refused,
+            fmt::format("{} needs a mesh, and {} holds a {}", command, file.string(), nameOf(typeOf(object))));
+}
+
+void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
+    std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file)
+{
+    std::vector<std::string> reasons = faultsOfTriangles(mesh, topology);
+    for (std::string& reason : faultsOfClosedManifold(mesh, topology))
+        reasons.push_back(std::move(reason));
+    for (std::string& reason : furtherFaults)
+        reasons.push_back(std::move(reason));
+    if (!reasons.empty())
+        throw Failure(ExitCode::Refused,
+            fmt::format("{} needs a closed manifold mesh of triangles, which {} does not hold "
+                        "(points and faces are counted from 0):",
+                command, file.string()),
+            std::move(reasons));
 }
 
 }
