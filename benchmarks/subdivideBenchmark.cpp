@@ -1,4 +1,10 @@
 #include "Measuring.h"
+#ifdef MODELING_HAS_CGAL
+#include "peers/cgalRefinement.h"
+#endif
+#ifdef MODELING_HAS_OPENMESH
+#include "peers/openMeshRefinement.h"
+#endif
 
 #include "frame/Arrays.h"
 #include "frame/PointCorners.h"
@@ -150,9 +156,15 @@ void subdivideUniformly(benchmark::State& state)
     });
 }
 
+/// For the graded sphere of that many faces, so that the result has about 15 times as many.
+float toleranceFor(std::size_t faces)
+{
+    return 0.0042f / std::sqrt(static_cast<float>(faces) / 81'920);
+}
+
 void subdivideAdaptively(benchmark::State& state)
 {
-    float const tolerance = 0.0042f / std::sqrt(static_cast<float>(facesOf(state)) / 81'920);
+    float const tolerance = toleranceFor(facesOf(state));
     measureRefinement(state, gradedSphereOf(facesOf(state)),
         [=](Tessara::Object& mesh) { Geometry::Mesh::subdivide(tolerance, mesh); });
 }
@@ -219,21 +231,89 @@ void copyRefined(benchmark::State& state)
     Benchmarks::countElements(state, faces);
 }
 
+/// Runs `refine()`, which gives a number of faces. Peers take their mesh from arrays in the time that is measured.
+template <class Refine> void measurePeer(benchmark::State& state, Refine const& refine)
+{
+    std::size_t faces = 0;
+    for (auto _ : state)
+        faces = refine();
+    Benchmarks::countElements(state, faces);
+    state.counters["result faces"] = static_cast<double>(faces);
+    state.counters["working bytes/element"] =
+        static_cast<double>(Benchmarks::peakBytesOf([&] { refine(); })) / static_cast<double>(faces);
+}
+
+#ifdef MODELING_HAS_CGAL
+void cgalAdjacency(benchmark::State& state, bool isShuffled)
+{
+    MeshBuilder const& sphere = sphereOf(facesOf(state), isShuffled);
+    Benchmarks::CgalRefinement const mesh(sphere);
+    measurePeer(state, [&] { return mesh.buildAdjacency() / 3; });
+}
+
+void cgalUniform(benchmark::State& state)
+{
+    Benchmarks::CgalRefinement const mesh(icosphereOf(facesOf(state)));
+    measurePeer(state, [&] { return mesh.refine(kUniformSteps); });
+}
+#endif
+
+#ifdef MODELING_HAS_OPENMESH
+void openMeshAdjacency(benchmark::State& state, bool isShuffled)
+{
+    MeshBuilder const& sphere = sphereOf(facesOf(state), isShuffled);
+    measurePeer(state, [&] { return Benchmarks::buildOpenMesh(sphere) / 3; });
+}
+
+void openMeshUniform(benchmark::State& state)
+{
+    MeshBuilder const& mesh = icosphereOf(facesOf(state));
+    measurePeer(state, [&] { return Benchmarks::refineOpenMesh(mesh, kUniformSteps); });
+}
+
+void openMeshAdaptive(benchmark::State& state)
+{
+    MeshBuilder const& mesh = gradedSphereOf(facesOf(state));
+    float const tolerance = toleranceFor(facesOf(state));
+    measurePeer(state, [&] { return Benchmarks::refineOpenMeshAdaptively(mesh, tolerance); });
+}
+#endif
+
 #define MODELING_SIZES Arg(100'000)->Arg(2'000'000)->Arg(10'000'000)->UseRealTime()
+#define MODELING_PEER_SIZES Arg(100'000)->Arg(2'000'000)->UseRealTime()
 BENCHMARK_CAPTURE(halfEdges, ordered, false)->Name("halfEdges")->MODELING_SIZES;
 BENCHMARK(copyCorners)->Name("halfEdges:memcpy")->MODELING_SIZES;
 BENCHMARK_CAPTURE(halfEdges, shuffled, true)->Name("halfEdges shuffled")->MODELING_SIZES;
+#ifdef MODELING_HAS_CGAL
+BENCHMARK_CAPTURE(cgalAdjacency, ordered, false)->Name("halfEdges:CGAL")->MODELING_PEER_SIZES;
+BENCHMARK_CAPTURE(cgalAdjacency, shuffled, true)->Name("halfEdges shuffled:CGAL")->MODELING_PEER_SIZES;
+#endif
+#ifdef MODELING_HAS_OPENMESH
+BENCHMARK_CAPTURE(openMeshAdjacency, ordered, false)->Name("halfEdges:OpenMesh")->MODELING_PEER_SIZES;
+BENCHMARK_CAPTURE(openMeshAdjacency, shuffled, true)->Name("halfEdges shuffled:OpenMesh")->MODELING_PEER_SIZES;
+#endif
 #undef MODELING_SIZES
+#undef MODELING_PEER_SIZES
 
 // Faces of the coarse mesh; 81 times as many in the result.
 #define MODELING_SIZES Arg(1'280)->Arg(20'480)->Arg(81'920)->UseRealTime()
+#define MODELING_PEER_SIZES Arg(1'280)->Arg(20'480)->UseRealTime()
 BENCHMARK(subdivideUniformly)->Name("subdivide uniform")->MODELING_SIZES;
 BENCHMARK(flatUniform)->Name("subdivide uniform:flat kernel")->MODELING_SIZES;
 BENCHMARK(copyRefined)->Name("subdivide uniform:memcpy")->MODELING_SIZES;
+#ifdef MODELING_HAS_CGAL
+BENCHMARK(cgalUniform)->Name("subdivide uniform:CGAL")->MODELING_PEER_SIZES;
+#endif
+#ifdef MODELING_HAS_OPENMESH
+BENCHMARK(openMeshUniform)->Name("subdivide uniform:OpenMesh")->MODELING_PEER_SIZES;
+#endif
 #undef MODELING_SIZES
+#undef MODELING_PEER_SIZES
 
-#define MODELING_SIZES Arg(5'120)->Arg(81'920)->Arg(1'310'720)->UseRealTime()
-BENCHMARK(subdivideAdaptively)->Name("subdivide adaptive")->MODELING_SIZES;
-#undef MODELING_SIZES
+// Faces of the coarse mesh; about 15 times as many in the result.
+BENCHMARK(subdivideAdaptively)->Name("subdivide adaptive")->Arg(5'120)->Arg(81'920)->Arg(1'310'720)->UseRealTime();
+#ifdef MODELING_HAS_OPENMESH
+BENCHMARK(openMeshAdaptive)->Name("subdivide adaptive:OpenMesh")->Arg(5'120)->Arg(81'920)->UseRealTime();
+#endif
 
 }

@@ -13,8 +13,10 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <cmath>
 #include <cstdio>
+#include <limits>
 #include <map>
 #include <memory>
 #include <optional>
@@ -110,13 +112,24 @@ namespace {
 
     float toleranceOf(Options const& options, Object const& mesh)
     {
-        if (options.tolerance)
-            return *options.tolerance;
-        std::optional<BoundingBox> const box = boundingBoxOf(mesh);
-        if (!box)
-            return *options.relative;
-        return *options.relative
-            * std::hypot(box->max.x - box->min.x, box->max.y - box->min.y, box->max.z - box->min.z);
+        BoundingBox const box = boundingBoxOf(mesh).value_or(BoundingBox{});
+        float3 const size{box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z};
+        float const tolerance =
+            options.tolerance ? *options.tolerance : *options.relative * std::hypot(size.x, size.y, size.z);
+
+        // Below, the library refines nothing; and where points are as far from one another as numbers are, all faces stay
+        // large for ever.
+        constexpr float kFinest = std::numeric_limits<float>::epsilon();
+        float farthest = 0.25f;
+        for (float const coordinate : {box.min.x, box.min.y, box.min.z, box.max.x, box.max.y, box.max.z})
+            farthest = std::max(farthest, std::abs(coordinate));
+        if (!(tolerance > 4 * kFinest * farthest))
+            throw Failure(ExitCode::Refused,
+                fmt::format(
+                    "a tolerance of {} is finer than single precision can tell apart at coordinates of up to {}. "
+                    "Take a larger one, scale a tiny mesh up, or move a far one to the origin.",
+                    tolerance, farthest));
+        return tolerance;
     }
 
     /// Warns of the properties that are no longer there, and why. \return their names
