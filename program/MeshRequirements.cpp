@@ -6,8 +6,6 @@
 
 #include <fmt/format.h>
 
-#include <cmath>
-
 namespace ModelingProgram {
 
 namespace {
@@ -83,18 +81,9 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
     return faults;
 }
 
-std::vector<std::string> faultsOfPoints(MeshArrays const& mesh, MeshTopology const& topology)
+std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopology const& topology)
 {
     std::vector<std::string> faults;
-    Finding odd;
-    for (unsigned int point = 0; point != mesh.pointCount(); ++point) {
-        auto const& p = (*mesh.positions)[point];
-        if (!std::isfinite(p.x) || !std::isfinite(p.y) || !std::isfinite(p.z))
-            odd.add(point);
-    }
-    if (odd)
-        faults.push_back(fmt::format("{} at no finite place. The first is {}.",
-            countOf(odd.count, "point lies", "points lie"), describePoint(mesh, odd.first)));
     if (Finding const& points = topology.isolatedPoints)
         faults.push_back(fmt::format("{} to no face. The first is {}. Remove such points first.",
             countOf(points.count, "point belongs", "points belong"), describePoint(mesh, points.first)));

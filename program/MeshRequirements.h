@@ -17,9 +17,8 @@ std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopo
 /// What keeps its faces from being triangles with three different points.
 std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology const& topology);
 
-/// What makes positions useless: coordinates that are no finite numbers, and points of no face, where operations that
-/// smooth have nothing to go by.
-std::vector<std::string> faultsOfPoints(MeshArrays const& mesh, MeshTopology const& topology);
+/// Points of no face: operations that smooth have nothing to go by there.
+std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopology const& topology);
 
 /// Refuses what is no mesh for `command`, or has one of the faults.
 void requireMesh(Tessara::Object const& object, char const* command, std::filesystem::path const& file);

@@ -168,7 +168,7 @@ namespace {
         requireMesh(*mesh, "subdivide", options.in);
         MeshTopology const topology = analyseTopology(arraysOf(*mesh));
         requireClosedTriangleMesh(
-            arraysOf(*mesh), topology, faultsOfPoints(arraysOf(*mesh), topology), "subdivide", options.in);
+            arraysOf(*mesh), topology, faultsOfIsolatedPoints(arraysOf(*mesh), topology), "subdivide", options.in);
 
         float const tolerance = toleranceOf(options, *mesh);
         Object result = *mesh;
