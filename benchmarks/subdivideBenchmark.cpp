@@ -18,6 +18,7 @@
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Names.h>
 
+#include <algorithm>
 #include <cmath>
 #include <map>
 
@@ -42,16 +43,39 @@ MeshBuilder const& sphereOf(std::size_t faces, bool isShuffled)
     return entry->second;
 }
 
+/// Cuts each face into four, with the new points moved out to the unit sphere.
+MeshBuilder cutIntoFour(MeshBuilder mesh)
+{
+    std::map<std::pair<unsigned int, unsigned int>, unsigned int> middles;
+    auto const middle = [&](unsigned int a, unsigned int b) {
+        auto const [entry, isNew] =
+            middles.try_emplace(std::minmax(a, b), static_cast<unsigned int>(mesh.points.size()));
+        if (isNew)
+            mesh.points.push_back(safeNormalize(mesh.points[a] + mesh.points[b]));
+        return entry->second;
+    };
+    std::vector<MeshBuilder::Triangle> faces;
+    for (auto const& [a, b, c] : mesh.faces) {
+        unsigned int const ab = middle(a, b), bc = middle(b, c), ca = middle(c, a);
+        faces.insert(faces.end(), {{a, ab, ca}, {b, bc, ab}, {c, ca, bc}, {ab, bc, ca}});
+    }
+    mesh.faces = std::move(faces);
+    return mesh;
+}
+
 /// 20 · 4ⁿ faces.
 MeshBuilder const& icosphereOf(std::size_t faces)
 {
     static std::map<std::size_t, MeshBuilder> made;
     auto const [entry, isNew] = made.try_emplace(faces);
-    unsigned int cuts = 0;
-    while (20 * (std::size_t{1} << 2 * cuts) < faces)
-        ++cuts;
-    if (isNew)
-        entry->second = MeshBuilder::icosphere(cuts);
+    if (isNew) {
+        MeshBuilder mesh = MeshBuilder::icosahedron();
+        for (float3& p : mesh.points)
+            p = safeNormalize(p);
+        while (mesh.faces.size() < faces)
+            mesh = cutIntoFour(std::move(mesh));
+        entry->second = std::move(mesh);
+    }
     return entry->second;
 }
 

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "frame/VectorMath.h"
+
 #include "support/MeshBuilder.h"
 
 #include <algorithm>
@@ -11,41 +13,41 @@
 
 namespace TestSupport {
 
+using Modeling::operator+;
+using Modeling::operator*;
+
 /// The operation once more, written plainly: maps, every sweep over all faces, and no step left out. For triangle meshes
 /// without equal directed edges.
 class PlainSubdivision {
 public:
     using Triangle = MeshBuilder::Triangle;
 
-    PlainSubdivision(MeshBuilder const& mesh, std::vector<float3> pointValues)
+    explicit PlainSubdivision(MeshBuilder const& mesh)
         : faces(mesh.faces)
         , positions(mesh.points)
-        , values(std::move(pointValues))
+        , values(mesh.points)
         , states(faces.size(), 0)
-        , basePositions_(mesh.points)
-        , vertexLevels_(mesh.points.size(), 0)
     {
         rebuild();
         for (unsigned int v = 0; v != positions.size(); ++v) {
             auto const n = static_cast<float>(neighbours_[v].size());
             float3 sum{0, 0, 0};
             for (unsigned int const u : neighbours_[v])
-                sum = plus(sum, positions[u]);
-            float const t = beta(n) * 3, gamma = t / (t + 1);
-            limitPositions_.push_back(plus(times(1 - gamma, positions[v]), times(gamma / n, sum)));
+                sum = sum + positions[u];
+            points_.push_back({positions[v], limit(positions[v], sum, beta(n), n), 0});
         }
     }
 
     void run(float tolerance)
     {
         std::size_t before = 0;
-        do {
+        while (before != faces.size()) {
             before = faces.size();
             std::vector<bool> marks;
             for (Triangle const& f : faces)
                 marks.push_back(isLarge(f, tolerance));
             pass(marks);
-        } while (faces.size() != before);
+        }
     }
 
     bool isLarge(Triangle const& f, float tolerance) const
@@ -64,34 +66,30 @@ public:
             states[f] |= marks[f] ? 1u : 0u;
         while (sweep()) { }
         std::vector<unsigned int> newPoint(faces.size());
-        auto numPoints = static_cast<unsigned int>(positions.size());
-        std::vector<float3> newBase, newLimit;
-        std::vector<unsigned int> newLevels;
         for (unsigned int f = 0; f != faces.size(); ++f)
-            if (splits(f) && !(level(f) & 1)) {
-                newPoint[f] = numPoints++;
-                makePoint(f, newBase, newLimit, newLevels);
+            if (splits(f) && level(f) % 2 == 0) {
+                newPoint[f] = static_cast<unsigned int>(points_.size());
+                points_.push_back(pointIn(f));
                 auto const& [a, b, c] = faces[f];
-                values.push_back(times(0.33333334f, plus(plus(plus({0, 0, 0}, values[a]), values[b]), values[c])));
+                values.push_back((float3{0, 0, 0} + values[a] + values[b] + values[c]) * 0.33333334f);
             }
-        basePositions_.insert(basePositions_.end(), newBase.begin(), newBase.end());
-        limitPositions_.insert(limitPositions_.end(), newLimit.begin(), newLimit.end());
-        vertexLevels_.insert(vertexLevels_.end(), newLevels.begin(), newLevels.end());
         replaceFaces(newPoint);
+        positions.resize(points_.size());
         rebuild();
-        positions.clear();
-        for (unsigned int v = 0; v != numPoints; ++v)
-            positions.push_back(evaluate(v, (finest_[v] >> 1) - vertexLevels_[v]));
+        for (unsigned int v = 0; v != positions.size(); ++v)
+            positions[v] = at(v, finest_[v] >> 1);
     }
 
     std::vector<Triangle> faces;
-    std::vector<float3> positions;
-    std::vector<float3> values;
+    std::vector<float3> positions, values;
     std::vector<unsigned int> states;
 
 private:
-    static float3 plus(float3 a, float3 b) { return {a.x + b.x, a.y + b.y, a.z + b.z}; }
-    static float3 times(float s, float3 a) { return {s * a.x, s * a.y, s * a.z}; }
+    struct Point {
+        float3 base, limit;
+        unsigned int level;
+    };
+
     static float3 third(float3 a) { return {a.x / 3.0f, a.y / 3.0f, a.z / 3.0f}; }
     static float cosine(float angle)
     {
@@ -100,12 +98,19 @@ private:
     }
     static float beta(float n) { return (4 - 2 * cosine(6.2831855f / n)) / 9; }
 
-    float3 evaluate(unsigned int v, unsigned int e) const
+    static float3 limit(float3 p, float3 sum, float beta, float n)
+    {
+        float const t = beta * 3, gamma = t / (t + 1);
+        return p * (1 - gamma) + sum * (gamma / n);
+    }
+
+    float3 after(unsigned int v, unsigned int e) const
     {
         float const lambda = 0.6666667f - beta(static_cast<float>(neighbours_[v].size()));
         float const w = std::pow(lambda, static_cast<float>(e));
-        return plus(times(1 - w, limitPositions_[v]), times(w, basePositions_[v]));
+        return points_[v].limit * (1 - w) + points_[v].base * w;
     }
+    float3 at(unsigned int v, unsigned int h) const { return after(v, h - points_[v].level); }
 
     unsigned int level(std::size_t f) const { return states[f] >> 2; }
     bool splits(std::size_t f) const { return states[f] & 2; }
@@ -139,31 +144,27 @@ private:
         return states != current;
     }
 
-    void makePoint(
-        unsigned int f, std::vector<float3>& base, std::vector<float3>& limit, std::vector<unsigned int>& levels) const
+    Point pointIn(unsigned int f) const
     {
         unsigned int const h = level(f) >> 1;
         float3 current{0, 0, 0}, next{0, 0, 0};
         unsigned int newLevel = 0;
         for (unsigned int k = 0; k != 3; ++k) {
-            unsigned int const v = faces[f][k], e = h - vertexLevels_[v];
-            current = plus(current, evaluate(v, e));
-            next = plus(next, evaluate(v, e + 1));
-            newLevel = std::max(newLevel, vertexLevels_[v] + 1);
+            unsigned int const v = faces[f][k];
+            current = current + at(v, h);
+            next = next + at(v, h + 1);
+            newLevel = std::max(newLevel, points_[v].level + 1);
             if (level(across(f, k)) % 2) {
-                unsigned int const x = pointAcross(f, k);
-                next = plus(next, evaluate(x, h - vertexLevels_[x]));
+                next = next + at(pointAcross(f, k), h);
             } else {
                 float3 sum{0, 0, 0};
                 for (unsigned int const u : faces[across(f, k)])
-                    sum = plus(sum, evaluate(u, h - vertexLevels_[u]));
-                next = plus(next, third(sum));
+                    sum = sum + at(u, h);
+                next = next + third(sum);
             }
         }
-        float const t = (4 - 2 * cosine(1.0471976f)) / 9 * 3, gamma = t / (t + 1);
-        base.push_back(third(current));
-        limit.push_back(plus(times(1 - gamma, base.back()), times(gamma / 6, next)));
-        levels.push_back(newLevel);
+        float const betaOfSix = (4 - 2 * cosine(1.0471976f)) / 9;
+        return {third(current), limit(third(current), next, betaOfSix, 6), newLevel};
     }
 
     void replaceFaces(std::vector<unsigned int> const& newPoint)
@@ -198,8 +199,8 @@ private:
     void rebuild()
     {
         owner_.clear();
-        neighbours_.assign(std::max(positions.size(), basePositions_.size()), {});
-        finest_.assign(neighbours_.size(), 0);
+        neighbours_.assign(positions.size(), {});
+        finest_.assign(positions.size(), 0);
         for (unsigned int f = 0; f != faces.size(); ++f)
             for (unsigned int k = 0; k != 3; ++k) {
                 owner_[{faces[f][k], faces[f][(k + 1) % 3]}] = f;
@@ -208,8 +209,7 @@ private:
             }
     }
 
-    std::vector<float3> basePositions_, limitPositions_;
-    std::vector<unsigned int> vertexLevels_;
+    std::vector<Point> points_;
     std::map<std::pair<unsigned int, unsigned int>, unsigned int> owner_; // the face that passes a directed edge
     std::vector<std::set<unsigned int>> neighbours_;
     std::vector<unsigned int> finest_; // the highest level of a face at each point

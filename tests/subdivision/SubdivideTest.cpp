@@ -36,31 +36,19 @@ namespace Steps = Geometry::Mesh::Internal;
 
 namespace {
 
-/// A mesh with a property "carried" on its points that starts out as their positions.
-Orvan::MutablePtr<Object> meshOf(MeshBuilder const& builder, std::vector<float3> const& carried)
+/// A mesh with a property "carried" on its points, by default their positions.
+Orvan::MutablePtr<Object> meshOf(MeshBuilder const& builder, std::vector<float3> const& carried = {})
 {
     auto mesh = builder.build();
-    addDataProperty<float3>("carried", sPointComp, Orvan::Array<float3>(carried), *mesh);
+    addDataProperty<float3>(
+        "carried", sPointComp, Orvan::Array<float3>(carried.empty() ? builder.points : carried), *mesh);
     return mesh;
-}
-
-Orvan::MutablePtr<Object> meshOf(MeshBuilder const& builder)
-{
-    return meshOf(builder, builder.points);
 }
 
 Orvan::MutablePtr<Object> refined(MeshBuilder const& builder, float tolerance)
 {
     auto mesh = meshOf(builder);
     EXPECT_TRUE(subdivide(tolerance, *mesh));
-    return mesh;
-}
-
-/// Moved onto a grid on which sums of coordinates are exact, whatever their order.
-MeshBuilder onGrid(MeshBuilder mesh)
-{
-    for (float3& p : mesh.points)
-        p = {std::round(p.x * 256) / 256, std::round(p.y * 256) / 256, std::round(p.z * 256) / 256};
     return mesh;
 }
 
@@ -79,7 +67,7 @@ std::map<std::string, MeshBuilder> closedMeshes()
     return {
         {"tetrahedron", MeshBuilder::tetrahedron()},
         {"noise", MeshBuilder::sphere(4).withNoise(0.1f, 3).shuffled(4)},
-        {"graded", graded(MeshBuilder::icosphere(2))},
+        {"graded", graded(MeshBuilder::sphere(6))},
         {"torus", MeshBuilder::torus(12, 9).withNoise(0.3f, 1).shuffled(9)},
         {"needles", MeshBuilder::sphere(3).withNeedles(20, 0.02f).shuffled(2)},
         {"bipyramid", MeshBuilder::bipyramid(60).withNoise(0.01f, 7)},
@@ -91,16 +79,6 @@ std::map<std::string, MeshBuilder> closedMeshes()
 struct Passes {
     explicit Passes(MeshBuilder const& builder)
         : object(meshOf(builder))
-        , positions(*dataOf<float3>(*object, sPointPosition))
-        , basePositions(positions)
-        , vertexLevels(positions.size)
-        , faceVertex(*dataOf<unsigned int>(*object, sFaceVertex))
-        , faceOffset(*dataOf<unsigned int>(*object, sFaceOffset))
-        , faceStates(faceOffset.size - 1)
-        , numPoints(static_cast<unsigned int>(positions.size))
-        , numFaceVertices(static_cast<unsigned int>(faceVertex.size))
-        , numFaces(static_cast<unsigned int>(faceStates.size))
-        , halfEdges(numPoints, numFaces, faceVertex, faceOffset)
     {
         Steps::computePositionsInfinity(halfEdges, numPoints, positions, limitPositions);
     }
@@ -110,7 +88,6 @@ struct Passes {
         Steps::subdivide(marks, halfEdges, numPoints, numFaceVertices, numFaces, basePositions, limitPositions,
             vertexLevels, faceVertex, faceOffset, faceStates, *object);
     }
-
     void pass(Orvan::Array<bool> const& marks)
     {
         subdivide(marks);
@@ -118,48 +95,33 @@ struct Passes {
         Steps::computePositions(
             halfEdges, numPoints, basePositions, limitPositions, vertexLevels, faceStates, positions);
     }
-
     bool isBalanced() const { return Steps::isBalanced(halfEdges, numFaces, faceVertex, faceOffset, faceStates); }
     auto mesh() const { return makeMesh(positions, faceVertex, faceOffset); }
 
     Orvan::MutablePtr<Object> object;
-    Orvan::Array<float3> positions, basePositions, limitPositions;
-    Orvan::Array<unsigned char> vertexLevels;
-    Orvan::Array<unsigned int> faceVertex, faceOffset;
-    Orvan::Array<unsigned char> faceStates;
-    unsigned int numPoints, numFaceVertices, numFaces;
-    Geometry::Mesh::HalfEdgeDataStructure halfEdges;
+    Orvan::Array<float3> positions = *dataOf<float3>(*object, sPointPosition), basePositions = positions;
+    Orvan::Array<float3> limitPositions;
+    Orvan::Array<unsigned int> faceVertex = *dataOf<unsigned int>(*object, sFaceVertex);
+    Orvan::Array<unsigned int> faceOffset = *dataOf<unsigned int>(*object, sFaceOffset);
+    unsigned int numPoints = getElementCount(*object, sPointComp), numFaces = getElementCount(*object, sFaceComp);
+    unsigned int numFaceVertices = 3 * numFaces;
+    Orvan::Array<unsigned char> vertexLevels = Orvan::Array<unsigned char>(numPoints);
+    Orvan::Array<unsigned char> faceStates = Orvan::Array<unsigned char>(numFaces);
+    Geometry::Mesh::HalfEdgeDataStructure halfEdges{numPoints, numFaces, faceVertex, faceOffset};
 };
 
-/// Six times the volume inside.
-double volumeOf(Object const& mesh)
-{
-    auto const points = dataOf<float3>(mesh, sPointPosition);
-    auto const corners = dataOf<unsigned int>(mesh, sFaceVertex);
-    double volume = 0;
-    for (std::size_t c = 0; c != corners->size; c += 3) {
-        float3 const p = (*points)[(*corners)[c]], q = (*points)[(*corners)[c + 1]], r = (*points)[(*corners)[c + 2]];
-        volume += p.x * (q.y * r.z - q.z * r.y) + p.y * (q.z * r.x - q.x * r.z) + p.z * (q.x * r.y - q.y * r.x);
-    }
-    return volume;
-}
+using Place = std::array<float, 3>;
 
-/// The places of the faces, whatever their numbers.
-std::vector<std::array<float, 9>> placesOf(Object const& mesh)
+/// The corners of the faces, whatever their numbers.
+std::vector<std::array<Place, 3>> placesOf(Object const& mesh)
 {
     auto const points = dataOf<float3>(mesh, sPointPosition);
     auto const corners = dataOf<unsigned int>(mesh, sFaceVertex);
-    std::vector<std::array<float, 9>> places;
-    for (std::size_t c = 0; c != corners->size; c += 3) {
-        std::array<float, 9> place{};
-        for (std::size_t first = 0; first != 3; ++first) {
-            std::array<float, 9> turned{};
-            for (std::size_t k = 0; k != 3; ++k)
-                std::memcpy(&turned[3 * k], &(*points)[(*corners)[c + (first + k) % 3]], sizeof(float3));
-            place = first == 0 ? turned : std::min(place, turned);
-        }
-        places.push_back(place);
-    }
+    std::vector<std::array<Place, 3>> places(corners->size / 3);
+    for (std::size_t c = 0; c != corners->size; ++c)
+        std::memcpy(&places[c / 3][c % 3], &(*points)[(*corners)[c]], sizeof(Place));
+    for (auto& face : places)
+        std::rotate(face.begin(), std::min_element(face.begin(), face.end()), face.end());
     std::sort(places.begin(), places.end());
     return places;
 }
@@ -169,19 +131,24 @@ float largestDifference(float3 a, float3 b)
     return std::max({std::abs(a.x - b.x), std::abs(a.y - b.y), std::abs(a.z - b.z)});
 }
 
+/// Calls `visit(scalars, count)` for the values of a floating point type.
+template <class T, class Visit> void forEachScalar(ElementType<T> type, Orvan::Array<T>& values, Visit const& visit)
+{
+    if (std::string_view(type.name).starts_with("float"))
+        visit(reinterpret_cast<float*>(values.data), values.size * sizeof(T) / sizeof(float));
+    if (std::string_view(type.name).starts_with("double"))
+        visit(reinterpret_cast<double*>(values.data), values.size * sizeof(T) / sizeof(double));
+}
+
 /// What a run that did not come to its end has to leave: the mesh as it was, and "carried" at least as long.
-void expectAsBefore(Object const& mesh, Object const& before)
+void expectAsBefore(Object mesh, Object before)
 {
     auto const carried = dataOf<float3>(mesh, "carried"), carriedBefore = dataOf<float3>(before, "carried");
-    ASSERT_TRUE(carried);
-    ASSERT_GE(carried->size, carriedBefore->size);
-    EXPECT_EQ(std::memcmp(carried->data, carriedBefore->data, carriedBefore->size * sizeof(float3)), 0);
-    Object const mine = mesh, other = before;
-    auto const standardOf = [](Object object) {
-        object.eraseProperty("carried");
-        return object;
-    };
-    EXPECT_TRUE(sameContents(standardOf(mine), standardOf(other)));
+    ASSERT_TRUE(carried && carried->size >= carriedBefore->size);
+    EXPECT_TRUE(std::equal(carriedBefore->begin(), carriedBefore->end(), carried->begin()));
+    mesh.eraseProperty("carried");
+    before.eraseProperty("carried");
+    EXPECT_TRUE(sameContents(mesh, before));
 }
 
 }
@@ -192,13 +159,11 @@ TEST(Subdivide, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
         for (float const tolerance : {0.5f, 0.15f, 0.09f}) {
             SCOPED_TRACE(name + ", tolerance " + std::to_string(tolerance));
             auto const mesh = refined(builder, tolerance);
-            PlainSubdivision plain(builder, builder.points);
+            PlainSubdivision plain(builder);
             plain.run(tolerance);
             EXPECT_TRUE(sameContents(*mesh, *meshOf(MeshBuilder::of(plain.positions, plain.faces), plain.values)));
-            auto const source = builder.build();
             EXPECT_TRUE(isClosedManifold(*mesh));
-            EXPECT_EQ(eulerCharacteristic(*mesh), eulerCharacteristic(*source));
-            EXPECT_GT(volumeOf(*mesh) * volumeOf(*source), 0) << "turned inside out";
+            EXPECT_EQ(eulerCharacteristic(*mesh), eulerCharacteristic(*builder.build()));
             for (std::size_t f = 0; f != plain.faces.size(); ++f)
                 if (plain.isLarge(plain.faces[f], tolerance)) {
                     EXPECT_TRUE(plain.states[f] & 1) << "face " << f << " is large, but was not even asked to split";
@@ -210,7 +175,7 @@ TEST(Subdivide, agreesWithThePlainReferenceForAnyMarks)
 {
     for (auto const& [name, builder] : closedMeshes()) {
         Passes passes(builder);
-        PlainSubdivision plain(builder, builder.points);
+        PlainSubdivision plain(builder);
         Random random(7);
         for (unsigned int pass = 0; pass != 7; ++pass) {
             SCOPED_TRACE(name + ", pass " + std::to_string(pass));
@@ -230,36 +195,49 @@ TEST(Subdivide, agreesWithThePlainReferenceForAnyMarks)
     }
 }
 
-TEST(Subdivide, takesSolidsToWhereTheFormulasSay)
+TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
 {
-    // One step at all points of one valence: (1 - β) p + β m; and the limit (1 - γ) p + γ m. For these solids the mean m of
-    // the neighbours is a multiple of p.
-    struct Case {
+    // At the corners of a solid the mean of the neighbours is a multiple m of the point p itself. One step takes it to
+    // (1 - β) p + β m p, and the limit is (1 - γ) p + γ m p.
+    struct Solid {
         MeshBuilder mesh;
         double beta, gamma, mean;
     };
-    double const fifth = (4 - 2 * std::cos(2 * std::acos(-1.0) / 5)) / 9;
-    Case const cases[] = {{MeshBuilder::tetrahedron(), 5.0 / 9, 5.0 / 8, -1.0 / 3},
-        {MeshBuilder::sphere(1), 4.0 / 9, 4.0 / 7, 0},
-        {MeshBuilder::icosahedron(), fifth, 3 * fifth / (3 * fifth + 1), std::sqrt(0.2)}};
-    for (auto const& [mesh, beta, gamma, mean] : cases) {
-        Passes passes(mesh);
-        std::size_t const points = mesh.points.size(), faces = mesh.faces.size();
-        passes.pass(Orvan::Array<bool>(faces, true));
-        EXPECT_EQ(passes.numFaces, 3 * faces);
-        EXPECT_EQ(passes.numPoints, points + faces);
-        EXPECT_EQ(passes.faceStates, Orvan::Array<unsigned char>(3 * faces, 2 << 2)) << "every edge has turned over";
-        for (std::size_t v = 0; v != points; ++v) {
-            auto const scaled = [&](double s) {
-                auto const f = static_cast<float>(s);
-                return float3{mesh.points[v].x * f, mesh.points[v].y * f, mesh.points[v].z * f};
-            };
-            EXPECT_LT(largestDifference(passes.positions[v], scaled(1 - beta + beta * mean)), 1e-6f);
-            EXPECT_LT(largestDifference(passes.limitPositions[v], scaled(1 - gamma + gamma * mean)), 1e-6f);
+    double const five = (4 - 2 * std::cos(2 * std::acos(-1.0) / 5)) / 9;
+    for (Solid const& solid : {Solid{MeshBuilder::tetrahedron(), 5.0 / 9, 5.0 / 8, -1.0 / 3},
+             Solid{MeshBuilder::sphere(1), 4.0 / 9, 4.0 / 7, 0.0},
+             Solid{MeshBuilder::icosahedron(), five, 3 * five / (3 * five + 1), std::sqrt(0.2)}}) {
+        Passes passes(solid.mesh);
+        auto const limit = static_cast<float>(1 - solid.gamma + solid.gamma * solid.mean);
+        auto const once = static_cast<float>(1 - solid.beta + solid.beta * solid.mean);
+        EXPECT_LT(largestDifference(passes.limitPositions[0], solid.mesh.points[0] * limit), 1e-6f);
+        for (unsigned char pass = 1; pass != 6; ++pass) {
+            Orvan::Array<float3> const positions = passes.positions;
+            Orvan::Array<unsigned int> const corners = passes.faceVertex;
+            auto const halfEdges = passes.halfEdges;
+            unsigned int const points = passes.numPoints, faces = passes.numFaces;
+            passes.pass(Orvan::Array<bool>(faces, true));
+            ASSERT_EQ(passes.numPoints, points + faces);
+            // Every edge has turned over.
+            EXPECT_EQ(passes.faceStates, Orvan::Array<unsigned char>(3 * faces, 8 * pass & 0xFF));
+            for (unsigned int v = 0; v != points; ++v) {
+                float3 sum{0, 0, 0};
+                for (auto const& [neighbour, halfEdge] : halfEdges.neighbours(v))
+                    sum = sum + positions[neighbour];
+                auto const n = static_cast<float>(halfEdges.valence(v));
+                float const beta = (4 - 2 * std::cos(6.2831853f / n)) / 9;
+                float3 const relaxed = positions[v] * (1 - beta) + sum * (beta / n);
+                EXPECT_LT(largestDifference(passes.positions[v], relaxed), 2e-6f);
+            }
+            for (unsigned int f = 0; f != faces; ++f) {
+                unsigned int const* const c = corners.data + 3 * f;
+                float3 const sum = positions[c[0]] + positions[c[1]] + positions[c[2]];
+                EXPECT_LT(largestDifference(passes.positions[points + f], sum * (1.0f / 3)), 2e-6f);
+            }
+            if (pass == 1) {
+                EXPECT_LT(largestDifference(passes.positions[0], solid.mesh.points[0] * once), 1e-6f);
+            }
         }
-        EXPECT_LT(
-            largestDifference(passes.positions[points], (*dataOf<float3>(*passes.object, "carried"))[points]), 1e-6f)
-            << "the middle of the first face";
     }
 }
 
@@ -268,12 +246,11 @@ TEST(Subdivide, stepsKeepToTheirRules)
     // A third of a face sits at the limit at first: its point is younger than its step, and the exponent wraps.
     Passes passes(MeshBuilder::tetrahedron());
     passes.pass({true, false, false, false});
-    EXPECT_EQ(passes.numFaces, 6);
+    EXPECT_EQ(passes.faceVertex, (Orvan::Array<unsigned int>{0, 3, 1, 0, 2, 3, 1, 3, 2, 0, 1, 4, 1, 2, 4, 2, 0, 4}));
     EXPECT_EQ(passes.faceStates, (Orvan::Array<unsigned char>{0, 0, 0, 4, 4, 4}));
     EXPECT_EQ(passes.positions[4], passes.limitPositions[4]);
     // The gate of one third turns over: the face in front writes both sides.
     passes.pass({true, false, false, false, false, false});
-    EXPECT_EQ(passes.numFaces, 8);
     EXPECT_EQ(passes.faceStates, (Orvan::Array<unsigned char>{0, 0, 4, 4, 4, 4, 8, 8}));
     EXPECT_LT(largestDifference(passes.positions[4], passes.basePositions[4]), 1e-6f);
 
@@ -305,89 +282,63 @@ TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
 {
     auto const mesh = MeshBuilder::tetrahedron().build();
     forEachElementTypeName([&]<class T>(ElementType<T> type) {
-        addDataProperty<T>(type.name, sPointComp, Orvan::Array<T>(4), *mesh);
+        Orvan::Array<T> values(4);
+        forEachScalar(type, values, []<class Scalar>(Scalar* scalars, std::size_t count) {
+            for (std::size_t i = 0; i != count; ++i)
+                scalars[i] = static_cast<Scalar>(i * i % 37);
+        });
+        addDataProperty<T>(type.name, sPointComp, std::move(values), *mesh);
         addDataProperty<T>((std::string("face ") + type.name).c_str(), sFaceComp, Orvan::Array<T>(4), *mesh);
     });
-    auto const fill = [&]<class T, class Scalar>(char const* name) {
-        Orvan::Array<T> values(4);
-        for (std::size_t scalar = 0; scalar != values.size * sizeof(T) / sizeof(Scalar); ++scalar)
-            reinterpret_cast<Scalar*>(values.data)[scalar] = static_cast<Scalar>(scalar * scalar % 37);
-        addDataProperty<T>(name, sPointComp, std::move(values), *mesh);
-    };
-    auto const check = [&]<class T, class Scalar>(char const* name) {
-        auto const values = dataOf<T>(*mesh, name);
-        ASSERT_TRUE(values) << name;
-        ASSERT_EQ(values->size, 8) << name;
-        constexpr std::size_t kScalars = sizeof(T) / sizeof(Scalar);
-        auto const* const scalars = reinterpret_cast<Scalar const*>(values->data);
-        for (std::size_t scalar = 0; scalar != kScalars; ++scalar) { // the first face is that of points 0, 1 and 2
-            Scalar const sum = scalars[scalar] + scalars[kScalars + scalar] + scalars[2 * kScalars + scalar];
-            EXPECT_EQ(scalars[4 * kScalars + scalar],
-                sum
-                    * (sizeof(Scalar) == 4 ? static_cast<Scalar>(0.33333334f)
-                                           : static_cast<Scalar>(0.3333333333333333)))
-                << name;
-        }
-    };
-    auto const forEachAveraged = [](auto const& visit) {
-        using namespace Tessara::Math;
-        visit.template operator()<float, float>("float");
-        visit.template operator()<float2, float>("float2");
-        visit.template operator()<float3, float>("float3");
-        visit.template operator()<float4, float>("float4");
-        visit.template operator()<float2x2, float>("float2x2");
-        visit.template operator()<float2x3, float>("float2x3");
-        visit.template operator()<float3x3, float>("float3x3");
-        visit.template operator()<float4x4, float>("float4x4");
-        visit.template operator()<double, double>("double");
-        visit.template operator()<double2, double>("double2");
-        visit.template operator()<double3, double>("double3");
-        visit.template operator()<double4, double>("double4");
-        visit.template operator()<double2x2, double>("double2x2");
-        visit.template operator()<double2x3, double>("double2x3");
-        visit.template operator()<double3x3, double>("double3x3");
-        visit.template operator()<double4x4, double>("double4x4");
-    };
-    forEachAveraged(fill);
     addRangeProperty("range", sPointComp, {0, 0, 0, 0}, *mesh);
     addDataProperty<float>("of range", "range", {1}, *mesh);
     addDataProperty<float>("of int", "int", {1}, *mesh);
     addDataProperty<float>("of what targets int", "of int", {1}, *mesh);
     addDataProperty<float>("of corners", sFaceVertexComp, Orvan::Array<float>(12), *mesh);
-    addDataProperty<float>("astray", "nowhere", {1}, *mesh);
-    EXPECT_TRUE(subdivide(0.9f, *mesh));
-    forEachAveraged(check);
+    ASSERT_TRUE(subdivide(0.9f, *mesh));
+    long averaged = 0;
+    forEachElementTypeName([&]<class T>(ElementType<T> type) {
+        auto const shared = dataOf<T>(*mesh, type.name);
+        Orvan::Array<T> values = shared ? *shared : Orvan::Array<T>();
+        forEachScalar(type, values, [&]<class Scalar>(Scalar const* scalars, std::size_t count) {
+            ++averaged;
+            ASSERT_EQ(values.size, 8) << type.name;
+            std::size_t const n = count / 8;
+            Scalar const third = sizeof(Scalar) == 4 ? Scalar(0.33333334f) : Scalar(0.3333333333333333);
+            for (std::size_t i = 0; i != n; ++i) // the first face is that of points 0, 1 and 2
+                EXPECT_EQ(scalars[4 * n + i], (scalars[i] + scalars[n + i] + scalars[2 * n + i]) * third) << type.name;
+        });
+    });
+    EXPECT_EQ(averaged, 16);
     EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sPointComp).size, 17) << "those and the positions";
     EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceComp).size, 1);
     EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceVertexComp).size, 1);
-    for (char const* const name : {"range", "of range", "of int", "of corners"})
-        EXPECT_FALSE(mesh->hasProperty(name)) << name;
-    for (char const* const name : {"astray", "of what targets int"})
-        EXPECT_TRUE(mesh->hasProperty(name)) << name;
+    EXPECT_FALSE(mesh->hasProperty("of range") || mesh->hasProperty("of int"));
+    EXPECT_TRUE(mesh->hasProperty("of what targets int")) << "dropping goes one level deep";
 }
 
 TEST(Subdivide, keepsConstantAndLinearAttributes)
 {
-    auto const builder = graded(MeshBuilder::icosphere(2));
+    auto const builder = graded(MeshBuilder::sphere(6));
     auto const mesh = meshOf(builder);
-    Orvan::Array<double> linear;
-    for (float3 const& p : builder.points)
-        linear.append(2.0 * p.x - p.y + 0.5 * p.z + 3);
+    auto const linearAt = [](float3 const& p) { return 2.0 * p.x - p.y + 0.5 * p.z + 3; };
+    Orvan::Array<double> linear(builder.points.size());
+    std::transform(builder.points.begin(), builder.points.end(), linear.data, linearAt);
     addDataProperty<double>("linear", sPointComp, std::move(linear), *mesh);
     addDataProperty<float>("constant", sPointComp, Orvan::Array<float>(builder.points.size(), 7.0f), *mesh);
     ASSERT_TRUE(subdivide(0.05f, *mesh));
     auto const places = dataOf<float3>(*mesh, "carried"); // not smoothed, as the other two
-    ASSERT_GT(places->size, 2 * builder.points.size());
     for (std::size_t v = 0; v != places->size; ++v) {
-        float3 const p = (*places)[v];
-        EXPECT_NEAR((*dataOf<double>(*mesh, "linear"))[v], 2.0 * p.x - p.y + 0.5 * p.z + 3, 1e-5);
+        EXPECT_NEAR((*dataOf<double>(*mesh, "linear"))[v], linearAt((*places)[v]), 1e-5);
         EXPECT_NEAR((*dataOf<float>(*mesh, "constant"))[v], 7.0f, 1e-5f);
     }
 }
 
 TEST(Subdivide, doesNotDependOnNumbers)
 {
-    auto const builder = onGrid(graded(MeshBuilder::icosphere(2)));
+    auto builder = graded(MeshBuilder::sphere(6));
+    for (float3& p : builder.points) // on a grid sums are exact, whatever their order
+        p = {std::round(p.x * 256) / 256, std::round(p.y * 256) / 256, std::round(p.z * 256) / 256};
     auto const expected = placesOf(*refined(builder, 0.06f));
     for (unsigned int const seed : {1u, 2u})
         EXPECT_TRUE(placesOf(*refined(MeshBuilder(builder).shuffled(seed), 0.06f)) == expected);
@@ -424,82 +375,73 @@ TEST(Subdivide, survivesWhatItIsNotMeantFor)
     Random random(1);
     for (unsigned int run = 0; run != 300; ++run) {
         MeshBuilder soup = MeshBuilder::sphere(2).withNoise(1, run);
-        for (auto& face : soup.faces)
-            for (unsigned int& corner : face)
-                if (random.below(30) == 0)
-                    corner = random.below(soup.points.size());
-        for (std::size_t face = soup.faces.size();
-             face-- != 0;) { // closed, but not manifold: each face once more, turned
-            auto const [a, b, c] = soup.faces[face];
-            soup.faces.push_back({c, b, a});
-        }
-        soup.points[random.below(soup.points.size())].x = std::numeric_limits<float>::quiet_NaN();
-        auto const mesh = soup.build();
-        EXPECT_TRUE(subdivide(0.4f, *mesh));
-        EXPECT_TRUE(isValid(*mesh)) << run;
+        for (unsigned int change = 0; change != 3; ++change)
+            soup.faces[random.below(32)][random.below(3)] = random.below(18);
+        for (std::size_t face = 0; face != 32; ++face) // closed, but not manifold: each face once more, turned
+            soup.faces.push_back({soup.faces[face][2], soup.faces[face][1], soup.faces[face][0]});
+        soup.points[random.below(18)].x = std::numeric_limits<float>::quiet_NaN();
+        EXPECT_TRUE(isValid(*refined(soup, 0.4f))) << run;
     }
     EXPECT_TRUE(isValid(*refined(MeshBuilder::bipyramid(30'000), 0.4f)));
 }
 
 TEST(Subdivide, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
 {
-    auto const builder = graded(MeshBuilder::icosphere(3)).withNoise(0.01f, 5).shuffled(6);
+    auto const builder = graded(MeshBuilder::sphere(12)).withNoise(0.01f, 5).shuffled(6);
     expectSameForThreads({1, 2, 8}, [&] { return refined(builder, 0.02f); });
-    EXPECT_EQ(fingerprint(*refined(builder, 0.02f)), 10570202878098447737u) << "unlike other builds";
+    EXPECT_EQ(fingerprint(*refined(builder, 0.02f)), 15911402519549515617u) << "unlike other builds";
 }
 
 TEST(Subdivide, canBeCancelledInEverySweep)
 {
-    struct CancelledJob {
-        ~CancelledJob() { Orvan::setJobCancelled(false); }
-    };
-    auto const builder = graded(MeshBuilder::icosphere(2));
-    auto const before = meshOf(builder);
-    unsigned int passes = 0;
-    bool isDone = false;
-    for (unsigned int last = 0; !isDone; ++last) { // in the first sweep of each pass
-        CancelledJob const guard;
+    auto const builder = graded(MeshBuilder::sphere(6));
+    auto const before = meshOf(builder), expected = refined(builder, 0.03f);
+    // \return whether it was cancelled
+    auto const isCancelled = [&](Steps::MarkFaces const& mark) {
         auto const mesh = meshOf(builder);
-        unsigned int pass = 0;
-        auto const mark = [&](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
-            Steps::markForSubdivision(0.03f, m.faceCount, m.positions, m.faceVertex, m.faceOffset, marks);
-            Orvan::setJobCancelled(pass++ == last);
-        };
+        bool hasThrown = false;
         try {
-            isDone = Steps::refineMesh(mark, *mesh);
-            passes = pass;
+            EXPECT_TRUE(Steps::refineMesh(mark, *mesh));
+            EXPECT_TRUE(sameContents(*mesh, *expected));
         } catch (std::runtime_error const&) {
+            hasThrown = true;
             expectAsBefore(*mesh, *before);
         }
-    }
-    EXPECT_GT(passes, 3);
+        Orvan::setJobCancelled(false);
+        return hasThrown;
+    };
+    auto const mark = [](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
+        Steps::markForSubdivision(0.03f, m.faceCount, m.positions, m.faceVertex, m.faceOffset, marks);
+    };
+    unsigned int last = 0, pass = 0;
+    auto const markAndCancel = [&](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
+        mark(m, marks);
+        Orvan::setJobCancelled(pass++ == last);
+    };
+    for (; isCancelled(markAndCancel); pass = 0) // in the first sweep of each pass
+        ++last;
+    EXPECT_GT(last, 3);
 
     TSR::Canceller::resetCallCount();
-    auto const expected = refined(builder, 0.03f);
+    EXPECT_FALSE(isCancelled(mark));
     std::uint64_t const calls = TSR::Canceller::callCount();
     for (std::uint64_t call = 1; call <= calls; call += 1 + calls / 40) { // in later sweeps, as near as threads meet
-        CancelledJob const guard;
-        auto const mesh = meshOf(builder);
         std::atomic<bool> isOver = false;
         TSR::Canceller::resetCallCount();
         std::thread canceller([&] {
             while (TSR::Canceller::callCount() < call && !isOver) { }
             Orvan::setJobCancelled(true);
         });
-        try {
-            EXPECT_TRUE(subdivide(0.03f, *mesh));
-            EXPECT_TRUE(sameContents(*mesh, *expected));
-        } catch (std::runtime_error const&) {
-            expectAsBefore(*mesh, *before);
-        }
+        isCancelled(mark);
         isOver = true;
         canceller.join();
+        Orvan::setJobCancelled(false);
     }
 }
 
 TEST(Subdivide, leavesTheMeshAsItWasWhenMemoryRunsOut)
 {
-    for (auto const& builder : {MeshBuilder::tetrahedron(), graded(MeshBuilder::icosphere(1))}) {
+    for (auto const& builder : {MeshBuilder::tetrahedron(), graded(MeshBuilder::sphere(2))}) {
         auto const expected = refined(builder, 0.3f);
         sweepFailingAllocations([&](Attempt const& attempt) {
             auto const mesh = meshOf(builder);

@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <map>
 #include <numeric>
 #include <tuple>
 
@@ -109,33 +108,6 @@ MeshBuilder MeshBuilder::icosahedron()
         {{0, 11, 5}, {0, 5, 1}, {0, 1, 7}, {0, 7, 10}, {0, 10, 11}, {1, 5, 9}, {5, 11, 4}, {11, 10, 2}, {10, 7, 6},
             {7, 1, 8}, {3, 9, 4}, {3, 4, 2}, {3, 2, 6}, {3, 6, 8}, {3, 8, 9}, {4, 9, 5}, {2, 4, 11}, {6, 2, 10},
             {8, 6, 7}, {9, 8, 1}});
-}
-
-MeshBuilder MeshBuilder::icosphere(unsigned int cuts)
-{
-    MeshBuilder mesh = icosahedron();
-    for (; cuts != 0; --cuts) {
-        std::map<std::pair<unsigned int, unsigned int>, unsigned int> middles;
-        auto const middle = [&](unsigned int a, unsigned int b) {
-            auto const [entry, isNew] =
-                middles.try_emplace(std::minmax(a, b), static_cast<unsigned int>(mesh.points.size()));
-            float3 const p = mesh.points[a], q = mesh.points[b];
-            if (isNew)
-                mesh.points.push_back({p.x + q.x, p.y + q.y, p.z + q.z});
-            return entry->second;
-        };
-        std::vector<Triangle> faces;
-        for (auto const& [a, b, c] : mesh.faces) {
-            unsigned int const ab = middle(a, b), bc = middle(b, c), ca = middle(c, a);
-            faces.insert(faces.end(), {{a, ab, ca}, {b, bc, ab}, {c, ca, bc}, {ab, bc, ca}});
-        }
-        mesh.faces = std::move(faces);
-        for (float3& p : mesh.points) {
-            float const length = std::sqrt(p.x * p.x + p.y * p.y + p.z * p.z);
-            p = {p.x / length, p.y / length, p.z / length};
-        }
-    }
-    return mesh;
 }
 
 MeshBuilder MeshBuilder::torus(unsigned int rings, unsigned int sides)

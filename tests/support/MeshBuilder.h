@@ -21,8 +21,6 @@ public:
     static MeshBuilder sphere(unsigned int segments);
     static MeshBuilder sphereWithFaces(std::size_t atLeast);
     static MeshBuilder icosahedron();
-    /// A sphere of radius 1 from an icosahedron whose faces are cut into four so many times: 20 · 4ⁿ faces.
-    static MeshBuilder icosphere(unsigned int cuts);
     /// A closed surface of genus 1 with 2 · rings · sides faces.
     static MeshBuilder torus(unsigned int rings, unsigned int sides);
     /// Two points of valence `rim` over and under a rim of as many points.
