@@ -40,7 +40,7 @@ namespace Geometry::Mesh {
 ///                   there are points: further values at its end.
 ///
 /// The same result for any number of threads. Linear in the faces of each pass, so in the result when faces split evenly.
-/// Takes up to about 110 bytes a face of the result at its peak, the result itself included.
+/// Takes up to about 130 bytes a face of the result at its peak, the result itself included.
 ///
 /// Method: Kobbelt, "√3-subdivision", 2000, with points evaluated at any step in closed form.
 MODELING_EXPORT bool subdivide(float tolerance, Tessara::Object& object);

@@ -171,25 +171,23 @@ private:
     {
         std::vector<Triangle> newFaces;
         std::vector<unsigned int> newStates;
-        for (std::size_t f = 0; f != faces.size(); ++f)
-            if (!splits(f)) {
-                newFaces.push_back(faces[f]);
-                newStates.push_back(states[f]);
-            }
-        auto const add = [&](unsigned int a, unsigned int b, unsigned int c, unsigned int l) {
-            newFaces.push_back({a, b, c});
-            newStates.push_back(l << 2);
+        auto const add = [&](Triangle const& face, unsigned int state) {
+            newFaces.push_back(face);
+            newStates.push_back(state);
         };
+        for (std::size_t f = 0; f != faces.size(); ++f)
+            if (!splits(f))
+                add(faces[f], states[f]);
         for (std::size_t f = 0; f != faces.size(); ++f)
             for (unsigned int k = 0; k != 3 && splits(f) && level(f) % 2 == 0; ++k) {
                 unsigned int const a = faces[f][k], b = faces[f][(k + 1) % 3], c = newPoint[f], n = across(f, k);
                 if (!splits(n)) {
-                    add(a, b, c, level(f) + 1);
+                    add({a, b, c}, (level(f) + 1) << 2);
                 } else if (level(n) > level(f)) {
-                    add(a, pointAcross(f, k), c, level(f) + 2);
-                    add(b, c, pointAcross(f, k), level(f) + 2);
+                    add({a, pointAcross(f, k), c}, (level(f) + 2) << 2);
+                    add({b, c, pointAcross(f, k)}, (level(f) + 2) << 2);
                 } else if (level(n) == level(f)) {
-                    add(a, newPoint[n], c, level(f) + 2);
+                    add({a, newPoint[n], c}, (level(f) + 2) << 2);
                 }
             }
         faces = newFaces;
