@@ -31,6 +31,7 @@
 using namespace Tessara::Geometry;
 using namespace TestSupport;
 using Geometry::Mesh::subdivide;
+using Modeling::operator-;
 using Tessara::Object;
 namespace Steps = Geometry::Mesh::Internal;
 
@@ -126,11 +127,6 @@ std::vector<std::array<Place, 3>> placesOf(Object const& mesh)
     return places;
 }
 
-float largestDifference(float3 a, float3 b)
-{
-    return std::max({std::abs(a.x - b.x), std::abs(a.y - b.y), std::abs(a.z - b.z)});
-}
-
 /// Calls `visit(scalars, count)` for the values of a floating point type.
 template <class T, class Visit> void forEachScalar(ElementType<T> type, Orvan::Array<T>& values, Visit const& visit)
 {
@@ -210,7 +206,7 @@ TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
         Passes passes(solid.mesh);
         auto const limit = static_cast<float>(1 - solid.gamma + solid.gamma * solid.mean);
         auto const once = static_cast<float>(1 - solid.beta + solid.beta * solid.mean);
-        EXPECT_LT(largestDifference(passes.limitPositions[0], solid.mesh.points[0] * limit), 1e-6f);
+        EXPECT_LT(length(passes.limitPositions[0] - solid.mesh.points[0] * limit), 1e-6f);
         for (unsigned char pass = 1; pass != 6; ++pass) {
             Orvan::Array<float3> const positions = passes.positions;
             Orvan::Array<unsigned int> const corners = passes.faceVertex;
@@ -226,16 +222,15 @@ TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
                     sum = sum + positions[neighbour];
                 auto const n = static_cast<float>(halfEdges.valence(v));
                 float const beta = (4 - 2 * std::cos(6.2831853f / n)) / 9;
-                float3 const relaxed = positions[v] * (1 - beta) + sum * (beta / n);
-                EXPECT_LT(largestDifference(passes.positions[v], relaxed), 2e-6f);
+                EXPECT_LT(length(passes.positions[v] - (positions[v] * (1 - beta) + sum * (beta / n))), 2e-6f);
             }
             for (unsigned int f = 0; f != faces; ++f) {
                 unsigned int const* const c = corners.data + 3 * f;
                 float3 const sum = positions[c[0]] + positions[c[1]] + positions[c[2]];
-                EXPECT_LT(largestDifference(passes.positions[points + f], sum * (1.0f / 3)), 2e-6f);
+                EXPECT_LT(length(passes.positions[points + f] - sum * (1.0f / 3)), 2e-6f);
             }
             if (pass == 1) {
-                EXPECT_LT(largestDifference(passes.positions[0], solid.mesh.points[0] * once), 1e-6f);
+                EXPECT_LT(length(passes.positions[0] - solid.mesh.points[0] * once), 1e-6f);
             }
         }
     }
@@ -252,7 +247,7 @@ TEST(Subdivide, stepsKeepToTheirRules)
     // The gate of one third turns over: the face in front writes both sides.
     passes.pass({true, false, false, false, false, false});
     EXPECT_EQ(passes.faceStates, (Orvan::Array<unsigned char>{0, 0, 4, 4, 4, 4, 8, 8}));
-    EXPECT_LT(largestDifference(passes.positions[4], passes.basePositions[4]), 1e-6f);
+    EXPECT_LT(length(passes.positions[4] - passes.basePositions[4]), 1e-6f);
 
     // Beside a coarser face nothing is written; the balance leaves such a state alone when all have split.
     Passes unbalanced(MeshBuilder::tetrahedron());
