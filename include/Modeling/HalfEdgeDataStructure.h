@@ -66,6 +66,9 @@ public:
     /// How many directed edges end at the point: its valence on a closed manifold. Constant time.
     std::uint64_t valence(unsigned int point) const { return offsets_[std::uint64_t{point} + 1] - offsets_[point]; }
 
+    /// How many directed edges there are: as many as corners, unless some were left out.
+    std::uint64_t size() const { return entries_.size; }
+
     /// The directed edges that end at the point, ascending by the points they come from.
     Neighbours neighbours(unsigned int point) const;
 

@@ -61,16 +61,19 @@ namespace {
     /// edges of these alone: mostly a pass has to do with few of the faces.
     class Balance {
     public:
-        Balance(HalfEdgeDataStructure const& halfEdges, unsigned int faceCount, unsigned int const* faceVertex,
-            unsigned int const* faceOffset, unsigned char* states)
+        /// \param areMutual  whether the neighbours of a face are those whose neighbour it is. Otherwise a face cannot tell
+        ///                   whom it concerns when its state changes, and all are looked at in each sweep.
+        Balance(HalfEdgeDataStructure const& halfEdges, bool areMutual, unsigned int faceCount,
+            unsigned int const* faceVertex, unsigned int const* faceOffset, unsigned char* states)
             : halfEdges_(halfEdges)
             , faceVertex_(faceVertex)
             , faceOffset_(faceOffset)
             , faceCount_(faceCount)
             , settled_(states)
+            , isAlwaysDue_(!areMutual)
             , current_(uninitializedArray<unsigned char>(faceCount))
-            , isDue_(zeroedArray<unsigned char>(faceCount))
-            , isDueNext_(zeroedArray<unsigned char>(faceCount))
+            , isDue_(filledArray<unsigned char>(faceCount, isAlwaysDue_))
+            , isDueNext_(filledArray<unsigned char>(faceCount, isAlwaysDue_))
             , hasNeighbours_(zeroedArray<unsigned char>(faceCount))
             , neighbours_(uninitializedArray<std::array<unsigned int, 3>>(faceCount))
         {
@@ -116,7 +119,7 @@ namespace {
             for (unsigned int face = first; face != last; ++face) {
                 if (!isDue_[face])
                     continue;
-                isDue_[face] = false; // for the sweep after the next one
+                isDue_[face] = isAlwaysDue_; // for the sweep after the next one
                 lookAround(face);
                 unsigned char const state = settledState(current_[face], neighbours_[face], current_.data);
                 if (state == current_[face])
@@ -158,11 +161,20 @@ namespace {
         unsigned int const* faceOffset_;
         unsigned int faceCount_;
         unsigned char* settled_;
+        bool isAlwaysDue_;
         Orvan::Array<unsigned char> current_; // as the sweep before has left them
         Orvan::Array<unsigned char> isDue_, isDueNext_; // faces to look at
         Orvan::Array<unsigned char> hasNeighbours_;
         FaceNeighbours neighbours_;
     };
+
+    /// On closed meshes of triangles without repeated directed edges they are.
+    bool areNeighboursMutual(
+        HalfEdgeDataStructure const& halfEdges, unsigned int faceCount, Orvan::Array<unsigned int> const& faceOffset)
+    {
+        std::uint64_t const corners = std::uint64_t{3} * faceCount;
+        return faceOffset[faceCount] == corners && halfEdges.size() == corners;
+    }
 
     bool isAnyRequested(Orvan::Array<unsigned char> const& states, unsigned int faceCount)
     {
@@ -182,7 +194,8 @@ FaceNeighbours balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigne
             false);
         return {};
     }
-    Balance balance(halfEdges, numFaces, faceVertex.data, faceOffset.data, faceStates.data);
+    Balance balance(halfEdges, areNeighboursMutual(halfEdges, numFaces, faceOffset), numFaces, faceVertex.data,
+        faceOffset.data, faceStates.data);
     balance.prepare();
     while (balance.sweep()) { }
     return balance.takeNeighbours();

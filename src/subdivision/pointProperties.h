@@ -1,6 +1,6 @@
 #pragma once
 
-#include "positionRules.h"
+#include "SettledFaces.h"
 
 #include <TessaraObject/Object.h>
 

@@ -122,12 +122,6 @@ namespace Internal {
 
     }
 
-    unsigned int SettledFaces::pointAcross(unsigned int face, unsigned int k) const
-    {
-        HalfEdge const twin = halfEdges.halfEdge(corners(face)[k], corners(face)[k == 2 ? 0 : k + 1]);
-        return corners(twin.face)[(twin.corner + 1u) % twin.faceSize];
-    }
-
     void computeNewPoints(SettledFaces const& faces, RefinedPoints const& refined)
     {
         PointsInTime const points{faces.halfEdges, refined.basePositions, refined.limitPositions, refined.levels};

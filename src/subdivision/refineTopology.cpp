@@ -1,6 +1,6 @@
 #include <Modeling/subdivisionSteps.h>
 
-#include "faceStates.h"
+#include "SettledFaces.h"
 #include "pointProperties.h"
 #include "positionRules.h"
 

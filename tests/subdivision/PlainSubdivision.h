@@ -17,8 +17,8 @@ using Modeling::operator+;
 using Modeling::operator*;
 using Modeling::length;
 
-/// The operation once more, written plainly: maps, every sweep over all faces, and no step left out. For triangle meshes
-/// without equal directed edges.
+/// The operation once more, written plainly: maps, every sweep over all faces, and no step left out. For meshes of
+/// triangles.
 class PlainSubdivision {
 public:
     using Triangle = MeshBuilder::Triangle;
@@ -90,6 +90,10 @@ private:
         float3 base, limit;
         unsigned int level;
     };
+    static constexpr unsigned int kNone = ~0u;
+    struct Owner {
+        unsigned int face, corner;
+    };
 
     static float3 third(float3 a) { return {a.x / 3.0f, a.y / 3.0f, a.z / 3.0f}; }
     static float cosine(float angle)
@@ -115,13 +119,15 @@ private:
 
     unsigned int level(std::size_t f) const { return states[f] >> 2; }
     bool splits(std::size_t f) const { return states[f] & 2; }
-    unsigned int across(std::size_t f, unsigned int k) const { return owner_.at({faces[f][(k + 1) % 3], faces[f][k]}); }
+    Owner twin(std::size_t f, unsigned int k) const
+    {
+        auto const found = owners_.find({faces[f][(k + 1) % 3], faces[f][k]});
+        return found == owners_.end() ? Owner{kNone, 0} : found->second;
+    }
+    unsigned int across(std::size_t f, unsigned int k) const { return twin(f, k).face; }
     unsigned int pointAcross(std::size_t f, unsigned int k) const
     {
-        for (unsigned int const p : faces[across(f, k)])
-            if (p != faces[f][k] && p != faces[f][(k + 1) % 3])
-                return p;
-        return 0;
+        return faces[across(f, k)][(twin(f, k).corner + 1) % 3];
     }
 
     bool sweep()
@@ -131,6 +137,8 @@ private:
             unsigned int const l = current[f] >> 2;
             unsigned int m = current[f] & 1, t = current[f] >> 1 & 1, lowest = ~0u;
             for (unsigned int k = 0; k != 3; ++k) {
+                if (across(f, k) == kNone)
+                    continue;
                 unsigned int const n = current[across(f, k)], other = n >> 2;
                 lowest = std::min(lowest, other);
                 if (n & 1)
@@ -155,6 +163,8 @@ private:
             current = current + at(v, h);
             next = next + at(v, h + 1);
             newLevel = std::max(newLevel, points_[v].level + 1);
+            if (across(f, k) == kNone)
+                continue;
             if (level(across(f, k)) % 2) {
                 next = next + at(pointAcross(f, k), h);
             } else {
@@ -182,6 +192,8 @@ private:
         for (std::size_t f = 0; f != faces.size(); ++f)
             for (unsigned int k = 0; k != 3 && splits(f) && level(f) % 2 == 0; ++k) {
                 unsigned int const a = faces[f][k], b = faces[f][(k + 1) % 3], c = newPoint[f], n = across(f, k);
+                if (n == kNone)
+                    continue;
                 if (!splits(n)) {
                     add({a, b, c}, (level(f) + 1) << 2);
                 } else if (level(n) > level(f)) {
@@ -197,19 +209,20 @@ private:
 
     void rebuild()
     {
-        owner_.clear();
+        owners_.clear();
         neighbours_.assign(positions.size(), {});
         finest_.assign(positions.size(), 0);
         for (unsigned int f = 0; f != faces.size(); ++f)
             for (unsigned int k = 0; k != 3; ++k) {
-                owner_[{faces[f][k], faces[f][(k + 1) % 3]}] = f;
-                neighbours_[faces[f][(k + 1) % 3]].insert(faces[f][k]);
-                finest_[faces[f][k]] = std::max(finest_[faces[f][k]], level(f));
+                unsigned int const end = faces[f][k], start = faces[f][(k + 2) % 3];
+                if (owners_.try_emplace({start, end}, Owner{f, k}).second)
+                    finest_[end] = std::max(finest_[end], level(f));
+                neighbours_[end].insert(start);
             }
     }
 
     std::vector<Point> points_;
-    std::map<std::pair<unsigned int, unsigned int>, unsigned int> owner_; // the face that passes a directed edge
+    std::map<std::pair<unsigned int, unsigned int>, Owner> owners_; // of directed edges, with the corner at their end
     std::vector<std::set<unsigned int>> neighbours_;
     std::vector<unsigned int> finest_; // the highest level of a face at each point
 };

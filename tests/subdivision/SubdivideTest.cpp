@@ -370,6 +370,10 @@ TEST(Subdivide, survivesWhatItIsNotMeantFor)
             soup.faces[random.below(32)][random.below(3)] = random.below(18);
         for (std::size_t face = 0; face != 32; ++face) // closed, but not manifold: each face once more, turned
             soup.faces.push_back({soup.faces[face][2], soup.faces[face][1], soup.faces[face][0]});
+        PlainSubdivision plain(soup);
+        plain.run(0.4f);
+        auto const expected = meshOf(MeshBuilder::of(plain.positions, plain.faces), plain.values);
+        EXPECT_TRUE(sameContents(*refined(soup, 0.4f), *expected)) << run;
         soup.points[random.below(18)].x = std::numeric_limits<float>::quiet_NaN();
         EXPECT_TRUE(isValid(*refined(soup, 0.4f))) << run;
     }
