@@ -4,6 +4,8 @@
 
 #include "support/MeshBuilder.h"
 
+#include <OrvanCore/Array.h>
+
 #include <algorithm>
 #include <cmath>
 #include <map>
@@ -44,9 +46,9 @@ public:
         std::size_t before = 0;
         while (before != faces.size()) {
             before = faces.size();
-            std::vector<bool> marks;
+            Orvan::Array<bool> marks;
             for (Triangle const& f : faces)
-                marks.push_back(isLarge(f, tolerance));
+                marks.append(isLarge(f, tolerance));
             pass(marks);
         }
     }
@@ -61,7 +63,7 @@ public:
         return side > tolerance + tolerance;
     }
 
-    void pass(std::vector<bool> const& marks)
+    void pass(Orvan::Array<bool> const& marks)
     {
         for (std::size_t f = 0; f != faces.size(); ++f)
             states[f] |= marks[f] ? 1u : 0u;

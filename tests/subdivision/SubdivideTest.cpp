@@ -175,12 +175,10 @@ TEST(Subdivide, agreesWithThePlainReferenceForAnyMarks)
         Random random(7);
         for (unsigned int pass = 0; pass != 7; ++pass) {
             SCOPED_TRACE(name + ", pass " + std::to_string(pass));
-            std::vector<bool> marks;
+            Orvan::Array<bool> marks;
             for (unsigned int face = 0; face != passes.numFaces; ++face)
-                marks.push_back(random.below(pass == 3 ? 1 : 9) == 0);
-            Orvan::Array<bool> flags(marks.size());
-            std::copy(marks.begin(), marks.end(), flags.data);
-            passes.pass(flags);
+                marks.append(random.below(pass == 3 ? 1 : 9) == 0);
+            passes.pass(marks);
             plain.pass(marks);
             EXPECT_TRUE(sameContents(*passes.mesh(), *MeshBuilder::of(plain.positions, plain.faces).build()));
             EXPECT_TRUE(std::equal(plain.states.begin(), plain.states.end(), passes.faceStates.begin()));
