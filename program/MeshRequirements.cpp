@@ -1,5 +1,7 @@
 #include "MeshRequirements.h"
 
+#include "Failure.h"
+#include "Geometry.h"
 #include "Report.h"
 
 #include <fmt/format.h>
@@ -77,6 +79,38 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
         faults.push_back(fmt::format("{} a point more than once. The first is face {}. Remove such faces first.",
             countOf(faces.count, "face visits", "faces visit"), faces.first));
     return faults;
+}
+
+std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopology const& topology)
+{
+    std::vector<std::string> faults;
+    if (Finding const& points = topology.isolatedPoints)
+        faults.push_back(fmt::format("{} to no face. The first is {}. Remove such points first.",
+            countOf(points.count, "point belongs", "points belong"), describePoint(mesh, points.first)));
+    return faults;
+}
+
+void requireMesh(Tessara::Object const& object, char const* command, std::filesystem::path const& file)
+{
+    if (typeOf(object) != GeometryType::Mesh)
+        throw Failure(ExitCode::Refused,
+            fmt::format("{} needs a mesh, and {} holds a {}", command, file.string(), nameOf(typeOf(object))));
+}
+
+void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
+    std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file)
+{
+    std::vector<std::string> reasons = faultsOfTriangles(mesh, topology);
+    for (std::string& reason : faultsOfClosedManifold(mesh, topology))
+        reasons.push_back(std::move(reason));
+    for (std::string& reason : furtherFaults)
+        reasons.push_back(std::move(reason));
+    if (!reasons.empty())
+        throw Failure(ExitCode::Refused,
+            fmt::format("{} needs a closed manifold mesh of triangles, which {} does not hold "
+                        "(points and faces are counted from 0):",
+                command, file.string()),
+            std::move(reasons));
 }
 
 }

@@ -2,6 +2,7 @@
 
 #include "MeshTopology.h"
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -15,5 +16,13 @@ std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopo
 
 /// What keeps its faces from being triangles with three different points.
 std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology const& topology);
+
+/// Points of no face: operations that smooth have nothing to go by there.
+std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopology const& topology);
+
+/// Refuses what is no mesh for `command`, or has one of the faults.
+void requireMesh(Tessara::Object const& object, char const* command, std::filesystem::path const& file);
+void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
+    std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file);
 
 }

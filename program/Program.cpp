@@ -17,8 +17,8 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints, addDeleteFaces,
-        addMerge, addTriangulate, addRemoveSlivers};
+    constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints,
+        addDeleteFaces, addMerge, addTriangulate, addSubdivide, addRemoveSlivers};
 
     constexpr char kFooter[] =
         R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply
@@ -33,7 +33,7 @@ Exit codes:
   4  a file holds geometry that is not valid
   5  the operation refuses its input; the message says why
   6  cancelled by Ctrl-C or SIGTERM; nothing was written
-  7  out of memory
+  7  out of memory, or of what --max-memory allows
 
 "modeling COMMAND --help" tells about a command.)";
 

@@ -2,6 +2,7 @@
 
 // All operations of the library.
 
+#include <Modeling/HalfEdgeDataStructure.h>
 #include <Modeling/addPointsToPointCloud.h>
 #include <Modeling/computeDeletedComponentMapping.h>
 #include <Modeling/copyNonGeoProperties.h>
@@ -12,4 +13,6 @@
 #include <Modeling/mergePointClouds.h>
 #include <Modeling/mergeStrands.h>
 #include <Modeling/removeSlivers.h>
+#include <Modeling/subdivide.h>
+#include <Modeling/subdivisionSteps.h>
 #include <Modeling/triangulate.h>

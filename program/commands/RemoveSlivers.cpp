@@ -1,5 +1,4 @@
 #include "Commands.h"
-#include "Failure.h"
 #include "Geometry.h"
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
@@ -8,8 +7,6 @@
 #include <Modeling/removeSlivers.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Names.h>
-
-#include <fmt/format.h>
 
 #include <memory>
 
@@ -25,20 +22,6 @@ namespace {
         float ratio = 0.05f;
     };
 
-    void requireClosedTriangleMesh(Object const& object, MeshTopology const& topology, Options const& options)
-    {
-        MeshArrays const mesh = arraysOf(object);
-        std::vector<std::string> reasons = faultsOfTriangles(mesh, topology);
-        for (std::string& reason : faultsOfClosedManifold(mesh, topology))
-            reasons.push_back(std::move(reason));
-        if (!reasons.empty())
-            throw Failure(ExitCode::Refused,
-                fmt::format("remove-slivers needs a closed manifold mesh of triangles, which {} does not hold "
-                            "(points and faces are counted from 0):",
-                    options.in.string()),
-                std::move(reasons));
-    }
-
     Json describeMesh(Object const& object, MeshTopology const& topology, float ratio)
     {
         Json values = countsOf(object);
@@ -52,12 +35,9 @@ namespace {
     {
         requireWritable(options.out);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        if (typeOf(*mesh) != GeometryType::Mesh)
-            throw Failure(ExitCode::Refused,
-                fmt::format(
-                    "remove-slivers needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+        requireMesh(*mesh, "remove-slivers", options.in);
         MeshTopology const topology = analyseTopology(arraysOf(*mesh));
-        requireClosedTriangleMesh(*mesh, topology, options);
+        requireClosedTriangleMesh(arraysOf(*mesh), topology, {}, "remove-slivers", options.in);
         Json const before = describeMesh(*mesh, topology, options.ratio);
 
         // The operation takes only the standard properties along; the others go where elements were renumbered.

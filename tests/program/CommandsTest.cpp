@@ -14,7 +14,9 @@ namespace {
 
 namespace fs = std::filesystem;
 using nlohmann::json;
+using testing::AllOf;
 using testing::HasSubstr;
+using testing::Not;
 
 std::string contentsOf(fs::path const& file)
 {
@@ -172,6 +174,35 @@ TEST_F(Commands, PointsAndFacesArePickedAndKeepTheirAttributes)
     EXPECT_EQ(runForJson("info again.ply")["boundingBox"], runForJson("info cloud.ply")["boundingBox"]);
 }
 
+TEST_F(Commands, SubdivideCarriesWhatItCanAndSaysWhatItDrops)
+{
+    write(folder / "tetrahedron.ply",
+        "ply\nformat ascii 1.0\nelement vertex 4\nproperty float x\nproperty float y\nproperty float z\n"
+        "property float heat\nproperty int id\nelement face 4\nproperty list uchar int vertex_indices\n"
+        "property float area\nend_header\n1 1 1 1 7\n1 -1 -1 2 7\n-1 1 -1 3 7\n-1 -1 1 4 7\n"
+        "3 0 1 2 1\n3 0 3 1 1\n3 0 2 3 1\n3 1 3 2 1\n");
+    json const done = runForJson("subdivide tetrahedron.ply out.ply --tolerance 0.3");
+    EXPECT_EQ(done["exitCode"], 0);
+    EXPECT_EQ(done["tolerance"], 0.3);
+    EXPECT_GT(done["after"]["faces"], 12);
+    EXPECT_EQ(done["after"]["genus"], 0);
+    EXPECT_EQ(done["droppedProperties"].size(), 2);
+    EXPECT_THAT(done["warnings"].dump(), AllOf(HasSubstr("id: values of type int"), HasSubstr("made anew")));
+    json const info = runForJson("info out.ply");
+    EXPECT_EQ(info["topology"]["closedManifold"], true);
+    EXPECT_EQ(info["counts"]["faces"], done["after"]["faces"]);
+    EXPECT_THAT(info["properties"].dump(), AllOf(HasSubstr("heat"), Not(HasSubstr("id"))));
+
+    // Relative to a diagonal of √12; on a terminal with a count for each pass, and in place with the same result.
+    run("subdivide tetrahedron.ply again.ply --relative 0.0866025404 --threads 1");
+    EXPECT_EQ(contentsOf(folder / "again.ply"), contentsOf(folder / "out.ply"));
+    std::string const line = MODELING_PROGRAM " subdivide tetrahedron.ply tetrahedron.ply --tolerance 0.3";
+    ASSERT_EQ(
+        std::system(("cd '" + folder.string() + "' && script -qec '" + line + "' typescript >/dev/null").c_str()), 0);
+    EXPECT_THAT(contentsOf(folder / "typescript"), HasSubstr("modeling: pass 1: 12 faces"));
+    EXPECT_EQ(contentsOf(folder / "tetrahedron.ply"), contentsOf(folder / "out.ply"));
+}
+
 TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
 {
     for (char const* const name : {"cylinder.obj", "sphere-with-hole.stl", "cube.ply", "spider.obj"})
@@ -179,6 +210,8 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
     write(folder / "lines.obj", "v 0 0 0\nv 1 0 0\nl 1 2\n");
     write(folder / "cloud.ply", kCloud);
     write(folder / "list", "0 # the first\n 1 2 3 4 5 6 -1\n");
+    write(folder / "isolated.obj",
+        "v 1 1 1\nv 1 -1 -1\nv -1 1 -1\nv -1 -1 1\nv 0 0 0\nf 1 2 3\nf 1 4 2\nf 1 3 4\nf 2 4 3\n");
     write(folder / "broken.obj", "v 0 0 0\nf 1 2 3\n");
     fs::create_directory(folder / "folder.obj");
     write(folder / "out.obj", "as it was");
@@ -194,6 +227,15 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"remove-slivers cube.ply out.obj", 5, "6 faces have more than three corners. The first is face 0 with 4"},
         {"remove-slivers cube.ply out.obj", 5, "lie in the same place as another point"},
         {"remove-slivers spider.obj out.obj", 5, "At 10 edges neighbouring faces look to opposite sides"},
+        {"subdivide sphere-with-hole.stl out.obj --tolerance 1", 5, "9 of 432 edges are open"},
+        {"subdivide cube.ply out.obj --tolerance 1", 5, "6 faces have more than three corners"},
+        {"subdivide lines.obj out.obj --tolerance 1", 5, "lines.obj holds a strand set"},
+        {"subdivide isolated.obj out.obj --tolerance 1", 5, "1 point belongs to no face. The first is point 4"},
+        {"subdivide cylinder.obj out.obj --relative 1e-9", 5, "finer than single precision"},
+        {"subdivide cylinder.obj out.obj --relative 1e-3 --max-memory 1kB", 7, "which --max-memory allows"},
+        {"subdivide cylinder.obj out.obj", 2, "is required"},
+        {"subdivide cylinder.obj out.obj --tolerance 1 --relative 1", 2, "tolerance"},
+        {"subdivide cylinder.obj out.obj --tolerance 0", 2, "0 is not a positive number"},
         {"remove-slivers lines.obj out.obj", 5, "lines.obj holds a strand set"},
         {"merge lines.obj cube.ply out.obj", 5, "lines.obj holds a strand set"},
         {"merge cube.ply spider.obj out.obj --source-attribute normal", 5, "already has a property"},
@@ -247,7 +289,7 @@ TEST_F(Commands, InfoAndValidateTellAboutFiles)
     EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (0.1, 0, 0)"));
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
-    for (char const* const command : {"", "info ", "validate ", "merge ", "triangulate ", "remove-slivers "})
+    for (char const* const command : {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "remove-slivers "})
         EXPECT_EQ(run(command + std::string("--help")).exitCode, 0) << command;
     EXPECT_EQ(run("--version").exitCode, 0);
 }

@@ -100,6 +100,16 @@ MeshBuilder MeshBuilder::sphereWithFaces(std::size_t atLeast)
     return sphere(segments);
 }
 
+MeshBuilder MeshBuilder::icosahedron()
+{
+    float const t = (1 + std::sqrt(5.0f)) / 2;
+    return of({{-1, t, 0}, {1, t, 0}, {-1, -t, 0}, {1, -t, 0}, {0, -1, t}, {0, 1, t}, {0, -1, -t}, {0, 1, -t},
+                  {t, 0, -1}, {t, 0, 1}, {-t, 0, -1}, {-t, 0, 1}},
+        {{0, 11, 5}, {0, 5, 1}, {0, 1, 7}, {0, 7, 10}, {0, 10, 11}, {1, 5, 9}, {5, 11, 4}, {11, 10, 2}, {10, 7, 6},
+            {7, 1, 8}, {3, 9, 4}, {3, 4, 2}, {3, 2, 6}, {3, 6, 8}, {3, 8, 9}, {4, 9, 5}, {2, 4, 11}, {6, 2, 10},
+            {8, 6, 7}, {9, 8, 1}});
+}
+
 MeshBuilder MeshBuilder::torus(unsigned int rings, unsigned int sides)
 {
     // Circles as chords of the rational parametrisation would be uneven; a square ring with a square section will do.

@@ -20,6 +20,7 @@ public:
     /// A sphere of radius 1 from an octahedron with n segments an edge: 8 n² faces, 4 n² + 2 points.
     static MeshBuilder sphere(unsigned int segments);
     static MeshBuilder sphereWithFaces(std::size_t atLeast);
+    static MeshBuilder icosahedron();
     /// A closed surface of genus 1 with 2 · rings · sides faces.
     static MeshBuilder torus(unsigned int rings, unsigned int sides);
     /// Two points of valence `rim` over and under a rim of as many points.

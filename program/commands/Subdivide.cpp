@@ -1,0 +1,228 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "MemoryLimit.h"
+#include "MeshRequirements.h"
+#include "MeshTopology.h"
+#include "Operation.h"
+
+#include <Modeling/subdivide.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <cmath>
+#include <cstdio>
+#include <limits>
+#include <map>
+#include <memory>
+#include <optional>
+
+#include <unistd.h>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using Tessara::Object;
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path out;
+        std::optional<float> tolerance;
+        std::optional<float> relative;
+        std::uint64_t maxMemory = 0;
+    };
+
+    /// A mesh that tells on standard error how many faces it has, whenever a pass has made more. It sees that from data of
+    /// its points, which follows each pass: on a closed mesh a new point brings two faces.
+    class TellingMesh : public Object {
+    public:
+        explicit TellingMesh(Object const& mesh)
+            : Object(mesh)
+            , pointCount_(Tessara::Geometry::getElementCount(mesh, Tessara::Geometry::sPointComp))
+            , faceCount_(Tessara::Geometry::getElementCount(mesh, Tessara::Geometry::sFaceComp))
+        {
+            using namespace Tessara::Geometry;
+            addDataProperty<float>(kWatched, sPointComp, Orvan::Array<float>(pointCount_), *this);
+        }
+
+        void setProperty(Orvan::String const& key, Tessara::PropertyValue&& value) override
+        {
+            Object::setProperty(key, std::move(value));
+            if (key == kWatched)
+                tell();
+        }
+
+        /// The mesh without what this has added.
+        Object mesh() const
+        {
+            Object mesh = *this;
+            mesh.eraseProperty(kWatched);
+            return mesh;
+        }
+
+    private:
+        static constexpr char const* kWatched = "modeling: passes";
+
+        void tell()
+        {
+            auto const watched = Tessara::Geometry::dataOf<float>(*this, kWatched);
+            if (!watched || watched->size == pointCount_)
+                return;
+            faceCount_ += 2 * (watched->size - pointCount_);
+            pointCount_ = watched->size;
+            std::fprintf(stderr, "modeling: pass %u: %s\n", ++pass_, countOf(faceCount_, "face").c_str());
+        }
+
+        std::uint64_t pointCount_;
+        std::uint64_t faceCount_;
+        unsigned int pass_ = 0;
+    };
+
+    /// Where the user can see them, with the count of faces after each pass.
+    void refine(float tolerance, Object& mesh)
+    {
+        if (!::isatty(STDERR_FILENO)) {
+            Geometry::Mesh::subdivide(tolerance, mesh);
+            return;
+        }
+        TellingMesh telling(mesh);
+        Geometry::Mesh::subdivide(tolerance, telling);
+        mesh = telling.mesh();
+    }
+
+    void runWithin(std::uint64_t maxMemory, Report& report, std::function<void()> const& operation)
+    {
+        MemoryLimit const limit(maxMemory);
+        try {
+            runOperation(report, operation);
+        } catch (Failure const&) {
+            if (!limit.wasExceeded())
+                throw;
+            throw Failure(ExitCode::OutOfMemory,
+                fmt::format("stopped, since this takes more than {}, which --max-memory allows; nothing was written. "
+                            "Dividing the tolerance by 3 makes about nine times as many faces.",
+                    formatBytes(maxMemory)));
+        }
+    }
+
+    float toleranceOf(Options const& options, Object const& mesh)
+    {
+        BoundingBox const box = boundingBoxOf(mesh).value_or(BoundingBox{});
+        float3 const size{box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z};
+        float const tolerance =
+            options.tolerance ? *options.tolerance : *options.relative * std::hypot(size.x, size.y, size.z);
+
+        // Below, the library refines nothing; and where points are as far from one another as numbers are, all faces stay
+        // large for ever.
+        constexpr float kFinest = std::numeric_limits<float>::epsilon();
+        float farthest = 0.25f;
+        for (float const coordinate : {box.min.x, box.min.y, box.min.z, box.max.x, box.max.y, box.max.z})
+            farthest = std::max(farthest, std::abs(coordinate));
+        if (!(tolerance > 4 * kFinest * farthest))
+            throw Failure(ExitCode::Refused,
+                fmt::format(
+                    "a tolerance of {} is finer than single precision can tell apart at coordinates of up to {}. "
+                    "Take a larger one, scale a tiny mesh up, or move a far one to the origin.",
+                    tolerance, farthest));
+        return tolerance;
+    }
+
+    /// Warns of the properties that are no longer there, and why. \return their names
+    std::vector<std::string> explainDropped(Object const& before, Object const& after, Report& report)
+    {
+        std::vector<std::string> dropped;
+        std::map<std::string, std::vector<std::string>> namesByReason;
+        for (Property const& property : propertiesOf(before)) {
+            if (after.hasProperty(property.name.c_str()))
+                continue;
+            dropped.push_back(property.name);
+            std::string reason = "it belongs to faces or corners, and these are made anew";
+            if (property.component == Tessara::Geometry::sPointComp)
+                reason = property.range.empty() && property.type != "range"
+                    ? fmt::format("values of type {} have no mean for a new point", property.type)
+                    : "what points refer to has no mean for a new point";
+            namesByReason[reason].push_back(property.name);
+        }
+        for (auto const& [reason, names] : namesByReason)
+            report.warn(fmt::format("dropped {}: {}", fmt::join(names, ", "), reason));
+        return dropped;
+    }
+
+    Json describeMesh(Object const& object, MeshTopology const& topology)
+    {
+        Json values = countsOf(object);
+        values["parts"] = topology.partCount;
+        values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
+        return values;
+    }
+
+    void subdivide(Options const& options, Report& report)
+    {
+        requireWritable(options.out);
+        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
+        requireMesh(*mesh, "subdivide", options.in);
+        MeshTopology const topology = analyseTopology(arraysOf(*mesh));
+        requireClosedTriangleMesh(
+            arraysOf(*mesh), topology, faultsOfIsolatedPoints(arraysOf(*mesh), topology), "subdivide", options.in);
+
+        float const tolerance = toleranceOf(options, *mesh);
+        Object result = *mesh;
+        runWithin(options.maxMemory, report, [&] { refine(tolerance, result); });
+
+        std::vector<std::string> const dropped = explainDropped(*mesh, result, report);
+        Json const after = describeMesh(result, analyseTopology(arraysOf(result)));
+        saveGeometry(result, options.out, report);
+        report.document["tolerance"] = numberOf(tolerance);
+        reportOperation(describeMesh(*mesh, topology), after, dropped, report);
+    }
+
+    CLI::Validator isPositive()
+    {
+        return CLI::Validator(
+            [](std::string const& text) {
+                double value = 0;
+                bool const isNumber = CLI::detail::lexical_cast(text, value);
+                return isNumber && static_cast<float>(value) > 0 && std::isfinite(static_cast<float>(value))
+                    ? std::string()
+                    : text + " is not a positive number";
+            },
+            "> 0");
+    }
+
+}
+
+void addSubdivide(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"subdivide",
+        "Refine a closed manifold mesh of triangles where its faces are large, and smooth it",
+        R"(Faces split until each fits into twice the tolerance along every axis. Small faces stay as they are,
+but for those next to large ones. Floating point values on points (normals too) are carried along as means;
+all other properties are dropped, with a warning that says why.
+
+Levels: one level divides edges by 1.73 and makes 3 times as many faces, two levels divide edges by 3.
+Where all faces are of the size s (the longest side of their box), a tolerance of s/2 leaves them, s/3.46
+gives one level, s/6 two, s/10.4 three and s/18 four.)",
+        "  modeling subdivide coarse.obj fine.ply --relative 0.01\n"
+        "  modeling subdivide part.stl fine.stl --tolerance 0.25 --max-memory 4GB"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("IN", "Mesh to read", options->in, command);
+    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    CLI::Option_group& size = *command.add_option_group("Size of faces", "one of these is required");
+    size.add_option("--tolerance", options->tolerance, "Half the size of the largest face that stays, in model units")
+        ->check(isPositive());
+    size.add_option("--relative", options->relative, "The same, as a fraction of the diagonal of the bounding box")
+        ->check(isPositive());
+    size.require_option(1);
+    command.add_option("--max-memory", options->maxMemory, "Stop when the program takes more: 500MB, 4GB")
+        ->type_name("")
+        ->transform(CLI::AsSizeValue(true));
+    onSelected(command, invocation, [options](Report& report) { subdivide(*options, report); });
+}
+
+}

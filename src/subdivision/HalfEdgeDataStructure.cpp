@@ -1,0 +1,307 @@
+#include <Modeling/HalfEdgeDataStructure.h>
+
+#include "frame/Arrays.h"
+
+#include <tbb/parallel_reduce.h>
+
+#include <atomic>
+#include <bit>
+#include <functional>
+#include <limits>
+#include <new>
+#include <vector>
+
+namespace Geometry::Mesh {
+
+using namespace Modeling;
+
+namespace {
+
+    using IndexArray = Orvan::Array<unsigned int>;
+
+    struct Faces {
+        unsigned int count;
+        unsigned int const* point; // of each corner
+        unsigned int const* offset;
+        bool areTriangles; // and begin at the corners 0, 3, 6 and so on
+    };
+
+    bool areTriangles(unsigned int faceCount, IndexArray const& faceOffset)
+    {
+        std::atomic<bool> found = true;
+        unsigned int const* const offset = faceOffset.data;
+        // Any thread may clear the flag; it is looked at after the loop.
+        parallelFor(
+            tbb::blocked_range<std::size_t>(0, std::size_t{faceCount} + 1, kElementGrain), [&](auto const& entries) {
+                for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry)
+                    if (offset[entry] != 3 * entry)
+                        return found.store(false, std::memory_order_relaxed);
+            });
+        return found.load(std::memory_order_relaxed);
+    }
+
+    /// What the loops over all faces are cut into, and the points. Directed edges first go to the bucket of the point at
+    /// which they end, in the order of their corners, and then within the bucket to the point: so each step writes to few
+    /// places at a time, however the points are numbered.
+    struct Layout {
+        unsigned int bucketBits; // a bucket is that many low bits of a point's number
+        std::size_t bucketCount;
+        std::size_t facesPerBlock;
+        std::size_t blockCount;
+
+        Layout(unsigned int pointCount, unsigned int faceCount)
+        {
+            // A bucket and its copy fit the cache of a core; small meshes get some buckets too, for all threads to work.
+            bucketBits = std::clamp(static_cast<unsigned int>(std::bit_width(pointCount / 16)), 7u, 13u);
+            bucketCount = (std::size_t{pointCount} + (std::size_t{1} << bucketBits) - 1) >> bucketBits;
+            facesPerBlock = std::max<std::size_t>(std::size_t{1} << 14, faceCount / 64 + 1);
+            blockCount = (faceCount + facesPerBlock - 1) / facesPerBlock;
+        }
+    };
+
+    /// Calls `visit(start, end, corner)` for the directed edges of a block of faces, each with the corner at its end, in
+    /// the order of these corners.
+    template <class Visit>
+    void forEachEdge(Faces const& faces, Layout const& layout, std::size_t block, Visit const& visit)
+    {
+        std::size_t const first = block * layout.facesPerBlock;
+        std::size_t const last = std::min<std::size_t>(first + layout.facesPerBlock, faces.count);
+        if (faces.areTriangles) {
+            for (std::size_t face = first; face != last; ++face) {
+                auto const corner = static_cast<unsigned int>(3 * face);
+                unsigned int const a = faces.point[corner], b = faces.point[corner + 1], c = faces.point[corner + 2];
+                visit(c, a, corner);
+                visit(a, b, corner + 1);
+                visit(b, c, corner + 2);
+            }
+            return;
+        }
+        for (std::size_t face = first; face != last; ++face) {
+            unsigned int const begin = faces.offset[face], end = faces.offset[face + 1];
+            for (unsigned int corner = begin; corner != end; ++corner)
+                visit(faces.point[corner == begin ? end - 1 : corner - 1], faces.point[corner], corner);
+        }
+    }
+
+    /// Calls `work(block)` for the blocks of faces, at once.
+    template <class Work> void forEachBlock(Layout const& layout, Work const& work)
+    {
+        // Each block writes what belongs to it.
+        parallelFor(tbb::blocked_range<std::size_t>(0, layout.blockCount, 1), [&](auto const& blocks) {
+            for (std::size_t block = blocks.begin(); block != blocks.end(); ++block)
+                work(block);
+        });
+    }
+
+    /// Where each block writes its first edge of each bucket: a row a block. The row behind the last is where the buckets
+    /// begin, with the number of edges behind it.
+    std::vector<std::size_t> findBlockStarts(Faces const& faces, Layout const& layout)
+    {
+        std::size_t const width = layout.bucketCount + 1;
+        std::vector<std::size_t> starts((layout.blockCount + 1) * width);
+        forEachBlock(layout, [&](std::size_t block) {
+            std::size_t* const count = starts.data() + block * width;
+            forEachEdge(faces, layout, block,
+                [=, bits = layout.bucketBits](unsigned int, unsigned int end, unsigned int) { ++count[end >> bits]; });
+        });
+        std::size_t sum = 0;
+        for (std::size_t bucket = 0; bucket != width; ++bucket) {
+            starts[layout.blockCount * width + bucket] = sum;
+            for (std::size_t block = 0; block != layout.blockCount; ++block)
+                sum += std::exchange(starts[block * width + bucket], sum);
+        }
+        return starts;
+    }
+
+    /// Sorts the edges at one point.
+    void sortEdges(std::uint64_t* first, std::uint64_t* last)
+    {
+        constexpr std::ptrdiff_t kFew = 32;
+        if (last - first > kFew)
+            return std::sort(first, last);
+        for (std::uint64_t* next = first; next != last; ++next) {
+            std::uint64_t const entry = *next;
+            std::uint64_t* hole = next;
+            for (; hole != first && hole[-1] > entry; --hole)
+                *hole = hole[-1];
+            *hole = entry;
+        }
+    }
+
+    /// Brings the edges of one bucket to their points, in ascending order.
+    class BucketSorter {
+    public:
+        /// \param entries     the edges of the bucket, in the order of their corners
+        /// \param pointOf     the point in the bucket at which each of them ends
+        /// \param offset      where the edges at each point of the bucket begin; written here
+        /// \return            whether two edges go from the same point to the same point
+        bool sort(std::uint64_t* entries, std::uint16_t const* pointOf, std::size_t edgeCount, std::size_t pointCount,
+            unsigned int bucketStart, unsigned int* offset)
+        {
+            cursors_.assign(pointCount + 1, 0);
+            for (std::size_t edge = 0; edge != edgeCount; ++edge)
+                ++cursors_[pointOf[edge] + std::size_t{1}];
+            for (std::size_t point = 0; point != pointCount; ++point) {
+                offset[point] = bucketStart + cursors_[point];
+                cursors_[point + 1] += cursors_[point];
+            }
+            copy_.assign(entries, entries + edgeCount);
+            for (std::size_t edge = 0; edge != edgeCount; ++edge)
+                entries[cursors_[pointOf[edge]]++] = copy_[edge];
+
+            bool hasRepeats = false;
+            std::size_t first = 0;
+            for (std::size_t point = 0; point != pointCount; ++point) {
+                std::size_t const last = cursors_[point];
+                sortEdges(entries + first, entries + last);
+                for (std::size_t edge = first; edge + 1 < last; ++edge)
+                    hasRepeats |= entries[edge] >> 32 == entries[edge + 1] >> 32;
+                first = last;
+            }
+            return hasRepeats;
+        }
+
+    private:
+        std::vector<unsigned int> cursors_;
+        std::vector<std::uint64_t> copy_;
+    };
+
+    /// Lists the directed edges by the points at which they end, ascending. \return whether there are equal ones
+    bool listEdges(
+        Faces const& faces, unsigned int pointCount, unsigned int* offset, Orvan::Array<std::uint64_t>& entries)
+    {
+        Layout const layout(pointCount, faces.count);
+        std::vector<std::size_t> starts = findBlockStarts(faces, layout);
+        std::size_t const width = layout.bucketCount + 1;
+        std::vector<std::size_t> const bucketStarts(starts.end() - static_cast<std::ptrdiff_t>(width), starts.end());
+        if (bucketStarts.back() > std::numeric_limits<unsigned int>::max())
+            throw std::bad_alloc();
+
+        entries = uninitializedArray<std::uint64_t>(bucketStarts.back());
+        auto const pointsInBuckets = uninitializedArray<std::uint16_t>(bucketStarts.back());
+        std::uint64_t* const entry = entries.data;
+        std::uint16_t* const pointInBucket = pointsInBuckets.data;
+        forEachBlock(layout, [&](std::size_t block) {
+            std::size_t* const cursor = starts.data() + block * width;
+            unsigned int const bits = layout.bucketBits, mask = (1u << bits) - 1;
+            forEachEdge(faces, layout, block, [=](unsigned int start, unsigned int end, unsigned int corner) {
+                std::size_t const place = cursor[end >> bits]++;
+                entry[place] = std::uint64_t{start} << 32 | corner;
+                pointInBucket[place] = static_cast<std::uint16_t>(end & mask);
+            });
+        });
+
+        std::atomic<bool> hasRepeats = false;
+        // Each bucket writes its own edges, and the offsets of its own points.
+        parallelFor(tbb::blocked_range<std::size_t>(0, layout.bucketCount, 1), [&](auto const& buckets) {
+            BucketSorter sorter;
+            for (std::size_t bucket = buckets.begin(); bucket != buckets.end(); ++bucket) {
+                std::size_t const first = bucketStarts[bucket], firstPoint = bucket << layout.bucketBits;
+                std::size_t const points = std::min(std::size_t{1} << layout.bucketBits, pointCount - firstPoint);
+                if (sorter.sort(entry + first, pointInBucket + first, bucketStarts[bucket + 1] - first, points,
+                        static_cast<unsigned int>(first), offset + firstPoint))
+                    hasRepeats.store(true, std::memory_order_relaxed);
+            }
+        });
+        offset[pointCount] = static_cast<unsigned int>(bucketStarts.back());
+        return hasRepeats.load(std::memory_order_relaxed);
+    }
+
+    /// For each corner the directed edge that ends there.
+    Orvan::Array<HalfEdge> describeCorners(Faces const& faces, std::size_t cornerCount)
+    {
+        Orvan::Array<HalfEdge> records(cornerCount); // corners that belong to no face keep the default
+        HalfEdge* const record = records.data;
+        unsigned int const* const offset = faces.offset;
+        // Each face writes the entries of its corners.
+        parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [=](auto const& range) {
+            for (unsigned int face = range.begin(); face != range.end(); ++face)
+                for (unsigned int corner = offset[face]; corner != offset[face + 1]; ++corner)
+                    record[corner] = {face, static_cast<unsigned char>(corner - offset[face]),
+                        static_cast<unsigned char>(offset[face + 1] - offset[face])};
+        });
+        return records;
+    }
+
+}
+
+HalfEdgeDataStructure::HalfEdgeDataStructure(unsigned int numPoints)
+    : offsets_(zeroedArray<unsigned int>(std::uint64_t{numPoints} + 1))
+{
+}
+
+HalfEdgeDataStructure::HalfEdgeDataStructure(unsigned int numPoints, unsigned int numFaces,
+    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset)
+    : offsets_(uninitializedArray<unsigned int>(std::uint64_t{numPoints} + 1))
+{
+    Faces const faces{numFaces, faceVertex.data, faceOffset.data, numFaces == 0 || areTriangles(numFaces, faceOffset)};
+    bool const hasRepeats = listEdges(faces, numPoints, offsets_.data, entries_);
+    if (!faces.areTriangles)
+        records_ = describeCorners(faces, faceVertex.size);
+    if (hasRepeats)
+        dropRepeatedEdges();
+}
+
+void HalfEdgeDataStructure::dropRepeatedEdges()
+{
+    unsigned int const* const offset = offsets_.data;
+    std::uint64_t const* const entry = entries_.data;
+    auto const isRepeat = [=](unsigned int edge, unsigned int first) {
+        return edge != first && startOf(entry[edge]) == startOf(entry[edge - 1]);
+    };
+    Orvan::Array<unsigned int> newOffsets = offsetsFromCounts(offsets_.size - 1, [=](std::size_t point) {
+        unsigned int count = 0;
+        for (unsigned int edge = offset[point]; edge != offset[point + 1]; ++edge)
+            count += !isRepeat(edge, offset[point]);
+        return count;
+    });
+    auto newEntries = uninitializedArray<std::uint64_t>(newOffsets[newOffsets.size - 1]);
+    // Each point writes its own entries.
+    parallelFor(tbb::blocked_range<std::size_t>(0, offsets_.size - 1, kElementGrain), [&](auto const& points) {
+        for (std::size_t point = points.begin(); point != points.end(); ++point) {
+            std::uint64_t* target = newEntries.data + newOffsets[point];
+            for (unsigned int edge = offset[point]; edge != offset[point + 1]; ++edge)
+                if (!isRepeat(edge, offset[point]))
+                    *target++ = entry[edge];
+        }
+    });
+    offsets_.swap(newOffsets);
+    entries_.swap(newEntries);
+}
+
+void HalfEdgeDataStructure::clear() noexcept
+{
+    offsets_.clear();
+    entries_ = {};
+    records_ = {};
+}
+
+void HalfEdgeDataStructure::swap(HalfEdgeDataStructure& other) noexcept
+{
+    offsets_.swap(other.offsets_);
+    entries_.swap(other.entries_);
+    records_.swap(other.records_);
+}
+
+bool HalfEdgeDataStructure::hasBoundary(unsigned int numFaces, Orvan::Array<unsigned int> const& faceVertex,
+    Orvan::Array<unsigned int> const& faceOffset) const
+{
+    bool isOpen = false;
+    runIsolated([&] {
+        isOpen = tbb::parallel_reduce(
+            tbb::blocked_range<unsigned int>(0, numFaces), false,
+            [&](tbb::blocked_range<unsigned int> const& faces, bool found) {
+                for (unsigned int face = faces.begin(); !found && face != faces.end(); ++face) {
+                    if (faceOffset[face + std::uint64_t{1}] - faceOffset[face] < 3)
+                        return true;
+                    unsigned int const* const c = faceVertex.data + faceOffset[face];
+                    found = !find(c[0], c[1]) || !find(c[1], c[2]) || !find(c[2], c[0]);
+                }
+                return found;
+            },
+            std::logical_or<>(), tbb::auto_partitioner());
+    });
+    return isOpen;
+}
+
+}

@@ -1,0 +1,49 @@
+#include <Modeling/subdivisionSteps.h>
+
+#include "faceStates.h"
+
+#include "frame/ParallelFor.h"
+
+#include <cmath>
+#include <limits>
+
+namespace Geometry::Mesh::Internal {
+
+using namespace Modeling;
+using Tessara::Math::float3;
+
+namespace {
+
+    /// The longest side of the triangle's box along the axes.
+    float longestBoxSide(float3 const& a, float3 const& b, float3 const& c)
+    {
+        float longest = 0;
+        for (float const side :
+            {b.x - a.x, b.y - a.y, b.z - a.z, c.x - b.x, c.y - b.y, c.z - b.z, a.x - c.x, a.y - c.y, a.z - c.z})
+            longest = std::abs(side) > longest ? std::abs(side) : longest;
+        return longest;
+    }
+
+}
+
+void markForSubdivision(float tolerance, unsigned int numFaces, Orvan::Array<float3> const& positions,
+    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
+    Orvan::Array<bool>& marks)
+{
+    if (!(tolerance > std::numeric_limits<float>::epsilon()))
+        return;
+    float3 const* const position = positions.data;
+    unsigned int const* const corner = faceVertex.data;
+    unsigned int const* const offset = faceOffset.data;
+    bool* const mark = marks.data;
+    // Each face writes its own mark.
+    parallelFor(tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [=](auto const& faces) {
+        for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
+            unsigned int const* const c = corner + offset[face];
+            if (longestBoxSide(position[c[0]], position[c[1]], position[c[2]]) > tolerance + tolerance)
+                mark[face] = true;
+        }
+    });
+}
+
+}

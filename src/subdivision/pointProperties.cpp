@@ -1,0 +1,129 @@
+#include "pointProperties.h"
+
+#include "frame/Arrays.h"
+#include "frame/ElementTypes.h"
+#include "host/GeoProperties.h"
+
+#include <TessaraGeometry/Lookup.h>
+
+#include <array>
+#include <bit>
+#include <type_traits>
+
+namespace Geometry::Mesh::Internal {
+
+using namespace Modeling;
+using namespace Tessara::Geometry;
+using Orvan::String;
+using Tessara::Object;
+
+namespace {
+
+    // The types whose values have a mean. Everything else on points is dropped.
+    using AveragedTypes = ElementTypeList<float, double, Tessara::Math::float2, Tessara::Math::float4,
+        Tessara::Math::float3, Tessara::Math::float2x2, Tessara::Math::float2x3, Tessara::Math::float3x3,
+        Tessara::Math::float4x4, Tessara::Math::double2, Tessara::Math::double3, Tessara::Math::double4,
+        Tessara::Math::double2x2, Tessara::Math::double2x3, Tessara::Math::double3x3, Tessara::Math::double4x4>;
+
+    /// Of the floating point types of the host, those of doubles are aligned for them.
+    template <class T> using ScalarOf = std::conditional_t<alignof(T) == alignof(double), double, float>;
+    template <class T> using ScalarsOf = std::array<ScalarOf<T>, sizeof(T) / sizeof(ScalarOf<T>)>;
+
+    constexpr float thirdOf(float sum)
+    {
+        return sum * 0.33333334f;
+    }
+    constexpr double thirdOf(double sum)
+    {
+        return sum * 0.3333333333333333;
+    }
+
+    template <class T> T meanOf(T const& a, T const& b, T const& c)
+    {
+        auto const p = std::bit_cast<ScalarsOf<T>>(a), q = std::bit_cast<ScalarsOf<T>>(b),
+                   r = std::bit_cast<ScalarsOf<T>>(c);
+        ScalarsOf<T> mean;
+        for (std::size_t scalar = 0; scalar != mean.size(); ++scalar)
+            mean[scalar] = thirdOf(0 + p[scalar] + q[scalar] + r[scalar]);
+        return std::bit_cast<T>(mean);
+    }
+
+    template <class... T> bool canBeAveraged(ElementTypeList<T...>, Object const& object, String const& name)
+    {
+        return (readGeoPropData<T>(object, name) || ...);
+    }
+
+    /// One level deep: what in turn targets the properties that target this one stays.
+    void dropProperty(String const& name, Object& object)
+    {
+        Orvan::Array<String> const dependents = getGeoPropNamesByTarget(object, name);
+        object.eraseProperty(name);
+        for (String const& dependent : dependents)
+            object.eraseProperty(dependent);
+    }
+
+    template <class Keep> void dropUnless(Keep const& keep, char const* component, Object& object)
+    {
+        Orvan::Array<String> const names = getGeoPropNamesByTarget(object, component);
+        for (String const& name : names)
+            if (!keep(name))
+                dropProperty(name, object);
+    }
+
+    template <class T> void extend(SettledFaces const& faces, unsigned int numPoints, Orvan::Array<T>& values)
+    {
+        values.resize(faces.pointCount); // where it did not fit the points: what is missing is zero
+        values.resize(numPoints, Orvan::kUninitialized);
+        T* const value = values.data;
+        // Each face reads old values, and writes that of its own new point.
+        parallelFor(tbb::blocked_range<unsigned int>(0, faces.faceCount, kFaceGrain), [&, value](auto const& range) {
+            for (unsigned int face = range.begin(); face != range.end(); ++face) {
+                if (!isSplitAroundPoint(faces.states[face]))
+                    continue;
+                unsigned int const* const c = faces.corners(face);
+                value[faces.newPoint(face)] = meanOf(value[c[0]], value[c[1]], value[c[2]]);
+            }
+        });
+    }
+
+    /// \return false where the property has another type
+    template <class T>
+    bool extendProperty(SettledFaces const& faces, unsigned int numPoints, String const& name, Object& object)
+    {
+        {
+            Orvan::Ptr<Orvan::Array<T>> const values = readGeoPropData<T>(object, name);
+            if (!values)
+                return false;
+            if (faces.pointCount == numPoints && values->size == numPoints)
+                return true; // which leaves a shared array shared
+        }
+        return editGeoPropData<T>(name, object, [&](Orvan::Array<T>& values) { extend(faces, numPoints, values); });
+    }
+
+    template <class... T> void extendProperty(
+        ElementTypeList<T...>, SettledFaces const& faces, unsigned int numPoints, String const& name, Object& object)
+    {
+        (extendProperty<T>(faces, numPoints, name, object) || ...);
+    }
+
+}
+
+void stripSubdivisionProperties(Object& object)
+{
+    auto const staysOnPoints = [&](String const& name) {
+        return name == sPointPosition || canBeAveraged(AveragedTypes(), object, name);
+    };
+    dropUnless(staysOnPoints, sPointComp, object);
+    dropUnless([](String const& name) { return name == sFaceOffset; }, sFaceComp, object);
+    dropUnless([](String const& name) { return name == sFaceVertex; }, sFaceVertexComp, object);
+}
+
+void transferPointProperties(SettledFaces const& faces, unsigned int numPoints, Object& object)
+{
+    Orvan::Array<String> const names = getGeoPropNamesByTarget(object, sPointComp);
+    for (String const& name : names)
+        if (!(name == sPointPosition))
+            extendProperty(AveragedTypes(), faces, numPoints, name, object);
+}
+
+}

@@ -1,0 +1,232 @@
+#pragma once
+
+#include "frame/VectorMath.h"
+
+#include "support/MeshBuilder.h"
+
+#include <OrvanCore/Array.h>
+
+#include <algorithm>
+#include <cmath>
+#include <map>
+#include <set>
+#include <utility>
+#include <vector>
+
+namespace TestSupport {
+
+using Modeling::operator+;
+using Modeling::operator*;
+using Modeling::length;
+
+/// The operation once more, written plainly: maps, every sweep over all faces, and no step left out. For meshes of
+/// triangles.
+class PlainSubdivision {
+public:
+    using Triangle = MeshBuilder::Triangle;
+
+    explicit PlainSubdivision(MeshBuilder const& mesh)
+        : faces(mesh.faces)
+        , positions(mesh.points)
+        , values(mesh.points)
+        , states(faces.size(), 0)
+    {
+        rebuild();
+        for (unsigned int v = 0; v != positions.size(); ++v) {
+            auto const n = static_cast<float>(neighbours_[v].size());
+            float3 sum{0, 0, 0};
+            for (unsigned int const u : neighbours_[v])
+                sum = sum + positions[u];
+            points_.push_back({positions[v], limit(positions[v], sum, beta(n), n), 0});
+        }
+    }
+
+    void run(float tolerance)
+    {
+        std::size_t before = 0;
+        while (before != faces.size()) {
+            before = faces.size();
+            Orvan::Array<bool> marks;
+            for (Triangle const& f : faces)
+                marks.append(isLarge(f, tolerance));
+            pass(marks);
+        }
+    }
+
+    bool isLarge(Triangle const& f, float tolerance) const
+    {
+        float side = 0;
+        for (unsigned int k = 0; k != 3; ++k) {
+            float3 const p = positions[f[k]], q = positions[f[(k + 1) % 3]];
+            side = std::max({side, std::abs(q.x - p.x), std::abs(q.y - p.y), std::abs(q.z - p.z)});
+        }
+        return side > tolerance + tolerance;
+    }
+
+    void pass(Orvan::Array<bool> const& marks)
+    {
+        for (std::size_t f = 0; f != faces.size(); ++f)
+            states[f] |= marks[f] ? 1u : 0u;
+        while (sweep()) { }
+        std::vector<unsigned int> newPoint(faces.size());
+        for (unsigned int f = 0; f != faces.size(); ++f)
+            if (splits(f) && level(f) % 2 == 0) {
+                newPoint[f] = static_cast<unsigned int>(points_.size());
+                points_.push_back(pointIn(f));
+                auto const& [a, b, c] = faces[f];
+                values.push_back((float3{0, 0, 0} + values[a] + values[b] + values[c]) * 0.33333334f);
+            }
+        replaceFaces(newPoint);
+        positions.resize(points_.size());
+        rebuild();
+        for (unsigned int v = 0; v != positions.size(); ++v)
+            positions[v] = at(v, finest_[v] >> 1);
+    }
+
+    std::vector<Triangle> faces;
+    std::vector<float3> positions, values;
+    std::vector<unsigned int> states;
+
+private:
+    struct Point {
+        float3 base, limit;
+        unsigned int level;
+    };
+    static constexpr unsigned int kNone = ~0u;
+    struct Owner {
+        unsigned int face, corner;
+    };
+
+    static float3 third(float3 a) { return {a.x / 3.0f, a.y / 3.0f, a.z / 3.0f}; }
+    static float cosine(float angle)
+    {
+        float volatile const atRunTime = angle;
+        return std::cos(atRunTime);
+    }
+    static float beta(float n) { return (4 - 2 * cosine(6.2831855f / n)) / 9; }
+
+    static float3 limit(float3 p, float3 sum, float beta, float n)
+    {
+        float const t = beta * 3, gamma = t / (t + 1);
+        return p * (1 - gamma) + sum * (gamma / n);
+    }
+
+    float3 after(unsigned int v, unsigned int e) const
+    {
+        float const lambda = 0.6666667f - beta(static_cast<float>(neighbours_[v].size()));
+        float const w = std::pow(lambda, static_cast<float>(e));
+        return points_[v].limit * (1 - w) + points_[v].base * w;
+    }
+    float3 at(unsigned int v, unsigned int h) const { return after(v, h - points_[v].level); }
+
+    unsigned int level(std::size_t f) const { return states[f] >> 2; }
+    bool splits(std::size_t f) const { return states[f] & 2; }
+    Owner twin(std::size_t f, unsigned int k) const
+    {
+        auto const found = owners_.find({faces[f][(k + 1) % 3], faces[f][k]});
+        return found == owners_.end() ? Owner{kNone, 0} : found->second;
+    }
+    unsigned int across(std::size_t f, unsigned int k) const { return twin(f, k).face; }
+    unsigned int pointAcross(std::size_t f, unsigned int k) const
+    {
+        return faces[across(f, k)][(twin(f, k).corner + 1) % 3];
+    }
+
+    bool sweep()
+    {
+        std::vector<unsigned int> const current = states;
+        for (std::size_t f = 0; f != faces.size(); ++f) {
+            unsigned int const l = current[f] >> 2;
+            unsigned int m = current[f] & 1, t = current[f] >> 1 & 1, lowest = ~0u;
+            for (unsigned int k = 0; k != 3; ++k) {
+                if (across(f, k) == kNone)
+                    continue;
+                unsigned int const n = current[across(f, k)], other = n >> 2;
+                lowest = std::min(lowest, other);
+                if (n & 1)
+                    m |= l % 2 ? other != l : l < other;
+                if (n & 2 && l % 2 && other < l)
+                    t = 1;
+            }
+            if (l % 2 == 0 && m && l <= lowest)
+                t = 1;
+            states[f] = l << 2 | t << 1 | m;
+        }
+        return states != current;
+    }
+
+    Point pointIn(unsigned int f) const
+    {
+        unsigned int const h = level(f) >> 1;
+        float3 current{0, 0, 0}, next{0, 0, 0};
+        unsigned int newLevel = 0;
+        for (unsigned int k = 0; k != 3; ++k) {
+            unsigned int const v = faces[f][k];
+            current = current + at(v, h);
+            next = next + at(v, h + 1);
+            newLevel = std::max(newLevel, points_[v].level + 1);
+            if (across(f, k) == kNone)
+                continue;
+            if (level(across(f, k)) % 2) {
+                next = next + at(pointAcross(f, k), h);
+            } else {
+                float3 sum{0, 0, 0};
+                for (unsigned int const u : faces[across(f, k)])
+                    sum = sum + at(u, h);
+                next = next + third(sum);
+            }
+        }
+        float const betaOfSix = (4 - 2 * cosine(1.0471976f)) / 9;
+        return {third(current), limit(third(current), next, betaOfSix, 6), newLevel};
+    }
+
+    void replaceFaces(std::vector<unsigned int> const& newPoint)
+    {
+        std::vector<Triangle> newFaces;
+        std::vector<unsigned int> newStates;
+        auto const add = [&](Triangle const& face, unsigned int state) {
+            newFaces.push_back(face);
+            newStates.push_back(state);
+        };
+        for (std::size_t f = 0; f != faces.size(); ++f)
+            if (!splits(f))
+                add(faces[f], states[f]);
+        for (std::size_t f = 0; f != faces.size(); ++f)
+            for (unsigned int k = 0; k != 3 && splits(f) && level(f) % 2 == 0; ++k) {
+                unsigned int const a = faces[f][k], b = faces[f][(k + 1) % 3], c = newPoint[f], n = across(f, k);
+                if (n == kNone)
+                    continue;
+                if (!splits(n)) {
+                    add({a, b, c}, (level(f) + 1) << 2);
+                } else if (level(n) > level(f)) {
+                    add({a, pointAcross(f, k), c}, (level(f) + 2) << 2);
+                    add({b, c, pointAcross(f, k)}, (level(f) + 2) << 2);
+                } else if (level(n) == level(f)) {
+                    add({a, newPoint[n], c}, (level(f) + 2) << 2);
+                }
+            }
+        faces = newFaces;
+        states = newStates;
+    }
+
+    void rebuild()
+    {
+        owners_.clear();
+        neighbours_.assign(positions.size(), {});
+        finest_.assign(positions.size(), 0);
+        for (unsigned int f = 0; f != faces.size(); ++f)
+            for (unsigned int k = 0; k != 3; ++k) {
+                unsigned int const end = faces[f][k], start = faces[f][(k + 2) % 3];
+                if (owners_.try_emplace({start, end}, Owner{f, k}).second)
+                    finest_[end] = std::max(finest_[end], level(f));
+                neighbours_[end].insert(start);
+            }
+    }
+
+    std::vector<Point> points_;
+    std::map<std::pair<unsigned int, unsigned int>, Owner> owners_; // of directed edges, with the corner at their end
+    std::vector<std::set<unsigned int>> neighbours_;
+    std::vector<unsigned int> finest_; // the highest level of a face at each point
+};
+
+}

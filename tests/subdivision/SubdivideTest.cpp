@@ -1,0 +1,450 @@
+#include <Modeling/subdivide.h>
+
+#include "PlainSubdivision.h"
+
+#include "subdivision/refineMesh.h"
+
+#include "support/Compare.h"
+#include "support/FailingAllocations.h"
+#include "support/MeshChecks.h"
+#include "support/Random.h"
+#include "support/Threads.h"
+
+#include <Modeling/subdivisionSteps.h>
+#include <OrvanCppOpSDK/Job.h>
+#include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometryVolume/Canceller.h>
+
+#include <gtest/gtest.h>
+
+#include <array>
+#include <atomic>
+#include <cstring>
+#include <map>
+#include <new>
+#include <string>
+#include <thread>
+
+using namespace Tessara::Geometry;
+using namespace TestSupport;
+using Geometry::Mesh::subdivide;
+using Modeling::operator-;
+using Tessara::Object;
+namespace Steps = Geometry::Mesh::Internal;
+
+namespace {
+
+/// A mesh with a property "carried" on its points, by default their positions.
+Orvan::MutablePtr<Object> meshOf(MeshBuilder const& builder, std::vector<float3> const& carried = {})
+{
+    auto mesh = builder.build();
+    addDataProperty<float3>(
+        "carried", sPointComp, Orvan::Array<float3>(carried.empty() ? builder.points : carried), *mesh);
+    return mesh;
+}
+
+Orvan::MutablePtr<Object> refined(MeshBuilder const& builder, float tolerance)
+{
+    auto mesh = meshOf(builder);
+    EXPECT_TRUE(subdivide(tolerance, *mesh));
+    return mesh;
+}
+
+/// The same surface with small faces on one side.
+MeshBuilder graded(MeshBuilder mesh)
+{
+    for (float3& p : mesh.points) {
+        float const squared = p.x * p.x + p.y * p.y + (p.z + 0.5f) * (p.z + 0.5f);
+        p = {p.x / squared, p.y / squared, (p.z + 0.5f) / squared};
+    }
+    return mesh;
+}
+
+std::map<std::string, MeshBuilder> closedMeshes()
+{
+    return {
+        {"tetrahedron", MeshBuilder::tetrahedron()},
+        {"noise", MeshBuilder::sphere(4).withNoise(0.1f, 3).shuffled(4)},
+        {"graded", graded(MeshBuilder::sphere(6))},
+        {"torus", MeshBuilder::torus(12, 9).withNoise(0.3f, 1).shuffled(9)},
+        {"needles", MeshBuilder::sphere(3).withNeedles(20, 0.02f).shuffled(2)},
+        {"bipyramid", MeshBuilder::bipyramid(60).withNoise(0.01f, 7)},
+        {"two parts", MeshBuilder::icosahedron().joinedWith(MeshBuilder::torus(5, 4), {9, 0, 0})},
+    };
+}
+
+/// Passes with any marks, through the steps themselves.
+struct Passes {
+    explicit Passes(MeshBuilder const& builder)
+        : object(meshOf(builder))
+    {
+        Steps::computePositionsInfinity(halfEdges, numPoints, positions, limitPositions);
+    }
+
+    void subdivide(Orvan::Array<bool> const& marks)
+    {
+        Steps::subdivide(marks, halfEdges, numPoints, numFaceVertices, numFaces, basePositions, limitPositions,
+            vertexLevels, faceVertex, faceOffset, faceStates, *object);
+    }
+    void pass(Orvan::Array<bool> const& marks)
+    {
+        subdivide(marks);
+        halfEdges = {numPoints, numFaces, faceVertex, faceOffset};
+        Steps::computePositions(
+            halfEdges, numPoints, basePositions, limitPositions, vertexLevels, faceStates, positions);
+    }
+    bool isBalanced() const { return Steps::isBalanced(halfEdges, numFaces, faceVertex, faceOffset, faceStates); }
+    auto mesh() const { return makeMesh(positions, faceVertex, faceOffset); }
+
+    Orvan::MutablePtr<Object> object;
+    Orvan::Array<float3> positions = *dataOf<float3>(*object, sPointPosition), basePositions = positions;
+    Orvan::Array<float3> limitPositions;
+    Orvan::Array<unsigned int> faceVertex = *dataOf<unsigned int>(*object, sFaceVertex);
+    Orvan::Array<unsigned int> faceOffset = *dataOf<unsigned int>(*object, sFaceOffset);
+    unsigned int numPoints = getElementCount(*object, sPointComp), numFaces = getElementCount(*object, sFaceComp);
+    unsigned int numFaceVertices = 3 * numFaces;
+    Orvan::Array<unsigned char> vertexLevels = Orvan::Array<unsigned char>(numPoints);
+    Orvan::Array<unsigned char> faceStates = Orvan::Array<unsigned char>(numFaces);
+    Geometry::Mesh::HalfEdgeDataStructure halfEdges{numPoints, numFaces, faceVertex, faceOffset};
+};
+
+using Place = std::array<float, 3>;
+
+/// The corners of the faces, whatever their numbers.
+std::vector<std::array<Place, 3>> placesOf(Object const& mesh)
+{
+    auto const points = dataOf<float3>(mesh, sPointPosition);
+    auto const corners = dataOf<unsigned int>(mesh, sFaceVertex);
+    std::vector<std::array<Place, 3>> places(corners->size / 3);
+    for (std::size_t c = 0; c != corners->size; ++c)
+        std::memcpy(&places[c / 3][c % 3], &(*points)[(*corners)[c]], sizeof(Place));
+    for (auto& face : places)
+        std::rotate(face.begin(), std::min_element(face.begin(), face.end()), face.end());
+    std::sort(places.begin(), places.end());
+    return places;
+}
+
+/// Calls `visit(scalars, count)` for the values of a floating point type.
+template <class T, class Visit> void forEachScalar(ElementType<T> type, Orvan::Array<T>& values, Visit const& visit)
+{
+    if (std::string_view(type.name).starts_with("float"))
+        visit(reinterpret_cast<float*>(values.data), values.size * sizeof(T) / sizeof(float));
+    if (std::string_view(type.name).starts_with("double"))
+        visit(reinterpret_cast<double*>(values.data), values.size * sizeof(T) / sizeof(double));
+}
+
+/// What a run that did not come to its end has to leave: the mesh as it was, and "carried" at least as long.
+void expectAsBefore(Object mesh, Object before)
+{
+    auto const carried = dataOf<float3>(mesh, "carried"), carriedBefore = dataOf<float3>(before, "carried");
+    ASSERT_TRUE(carried && carried->size >= carriedBefore->size);
+    EXPECT_TRUE(std::equal(carriedBefore->begin(), carriedBefore->end(), carried->begin()));
+    mesh.eraseProperty("carried");
+    before.eraseProperty("carried");
+    EXPECT_TRUE(sameContents(mesh, before));
+}
+
+}
+
+TEST(Subdivide, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
+{
+    for (auto const& [name, builder] : closedMeshes())
+        for (float const tolerance : {0.5f, 0.12f}) {
+            SCOPED_TRACE(name + ", tolerance " + std::to_string(tolerance));
+            auto const mesh = refined(builder, tolerance);
+            PlainSubdivision plain(builder);
+            plain.run(tolerance);
+            EXPECT_TRUE(sameContents(*mesh, *meshOf(MeshBuilder::of(plain.positions, plain.faces), plain.values)));
+            EXPECT_TRUE(isClosedManifold(*mesh));
+            EXPECT_EQ(eulerCharacteristic(*mesh), eulerCharacteristic(*builder.build()));
+            for (std::size_t f = 0; f != plain.faces.size(); ++f)
+                if (plain.isLarge(plain.faces[f], tolerance)) {
+                    EXPECT_TRUE(plain.states[f] & 1) << "face " << f << " is large, but was not even asked to split";
+                }
+        }
+}
+
+TEST(Subdivide, agreesWithThePlainReferenceForAnyMarks)
+{
+    for (auto const& [name, builder] : closedMeshes()) {
+        Passes passes(builder);
+        PlainSubdivision plain(builder);
+        Random random(7);
+        for (unsigned int pass = 0; pass != 7; ++pass) {
+            SCOPED_TRACE(name + ", pass " + std::to_string(pass));
+            Orvan::Array<bool> marks;
+            for (unsigned int face = 0; face != passes.numFaces; ++face)
+                marks.append(random.below(pass == 3 ? 1 : 9) == 0);
+            passes.pass(marks);
+            plain.pass(marks);
+            EXPECT_TRUE(sameContents(*passes.mesh(), *MeshBuilder::of(plain.positions, plain.faces).build()));
+            EXPECT_TRUE(std::equal(plain.states.begin(), plain.states.end(), passes.faceStates.begin()));
+            EXPECT_EQ(*dataOf<float3>(*passes.object, "carried"), Orvan::Array<float3>(plain.values));
+            EXPECT_TRUE(passes.isBalanced());
+            EXPECT_TRUE(isClosedManifold(*passes.mesh()));
+        }
+    }
+}
+
+TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
+{
+    // By symmetry a corner of a solid moves along its own direction: so far in one step, and so far at the limit.
+    struct Solid {
+        MeshBuilder mesh;
+        float once, limit;
+    };
+    for (Solid const& solid :
+        {Solid{MeshBuilder::tetrahedron(), 7.0f / 27, 1.0f / 6}, Solid{MeshBuilder::sphere(1), 5.0f / 9, 3.0f / 7},
+            Solid{MeshBuilder::icosahedron(), 0.792277f, 0.707064f}}) {
+        Passes passes(solid.mesh);
+        EXPECT_LT(length(passes.limitPositions[0] - solid.mesh.points[0] * solid.limit), 2e-6f);
+        for (unsigned char pass = 1; pass != 6; ++pass) {
+            Orvan::Array<float3> const positions = passes.positions;
+            Orvan::Array<unsigned int> const corners = passes.faceVertex;
+            auto const halfEdges = passes.halfEdges;
+            unsigned int const points = passes.numPoints, faces = passes.numFaces;
+            passes.pass(Orvan::Array<bool>(faces, true));
+            ASSERT_EQ(passes.numPoints, points + faces);
+            // Every edge has turned over.
+            EXPECT_EQ(passes.faceStates, Orvan::Array<unsigned char>(3 * faces, 8 * pass & 0xFF));
+            for (unsigned int v = 0; v != points; ++v) {
+                float3 sum{0, 0, 0};
+                for (auto const& [neighbour, halfEdge] : halfEdges.neighbours(v))
+                    sum = sum + positions[neighbour];
+                auto const n = static_cast<float>(halfEdges.valence(v));
+                float const beta = (4 - 2 * std::cos(6.2831853f / n)) / 9;
+                EXPECT_LT(length(passes.positions[v] - (positions[v] * (1 - beta) + sum * (beta / n))), 2e-6f);
+            }
+            for (unsigned int f = 0; f != faces; ++f) {
+                unsigned int const* const c = corners.data + 3 * f;
+                float3 const sum = positions[c[0]] + positions[c[1]] + positions[c[2]];
+                EXPECT_LT(length(passes.positions[points + f] - sum * (1.0f / 3)), 2e-6f);
+            }
+            if (pass == 1) {
+                EXPECT_LT(length(passes.positions[0] - solid.mesh.points[0] * solid.once), 2e-6f);
+            }
+        }
+    }
+}
+
+TEST(Subdivide, stepsKeepToTheirRules)
+{
+    // A third of a face sits at the limit at first: its point is younger than its step, and the exponent wraps.
+    Passes passes(MeshBuilder::tetrahedron());
+    passes.pass({true, false, false, false});
+    EXPECT_EQ(passes.faceVertex, (Orvan::Array<unsigned int>{0, 3, 1, 0, 2, 3, 1, 3, 2, 0, 1, 4, 1, 2, 4, 2, 0, 4}));
+    EXPECT_EQ(passes.faceStates, (Orvan::Array<unsigned char>{0, 0, 0, 4, 4, 4}));
+    EXPECT_EQ(passes.positions[4], passes.limitPositions[4]);
+    // The gate of one third turns over: the face in front writes both sides.
+    passes.pass({true, false, false, false, false, false});
+    EXPECT_EQ(passes.faceStates, (Orvan::Array<unsigned char>{0, 0, 4, 4, 4, 4, 8, 8}));
+    EXPECT_LT(length(passes.positions[4] - passes.basePositions[4]), 1e-6f);
+
+    // Beside a coarser face nothing is written; the balance leaves such a state alone when all have split.
+    Passes unbalanced(MeshBuilder::tetrahedron());
+    unbalanced.faceStates = {2 << 2 | 2, 2, 2, 2};
+    EXPECT_FALSE(unbalanced.isBalanced());
+    unbalanced.subdivide(Orvan::Array<bool>(4));
+    EXPECT_EQ(unbalanced.numFaces, 12);
+    EXPECT_EQ(unbalanced.numPoints, 8);
+
+    Passes full(MeshBuilder::tetrahedron());
+    full.numPoints = 0xFFFFFFFC;
+    EXPECT_THROW(full.subdivide(Orvan::Array<bool>(4, true)), std::bad_alloc);
+    EXPECT_EQ(full.numFaces, 4);
+    EXPECT_EQ(full.positions.size, 4);
+
+    float const nan = std::numeric_limits<float>::quiet_NaN();
+    for (auto const& [tolerance, marked] :
+        std::map<float, bool>{{1, false}, {0.99999f, true}, {1.1920929e-7f, false}, {0, false}, {-1, false}}) {
+        Orvan::Array<bool> marks{false, false, true};
+        Steps::markForSubdivision(tolerance, 3, {{0, 0, 0}, {1, 0, 0}, {0, 1, -2}, {nan, nan, nan}, {2, 2, 2}},
+            {0, 1, 2, 3, 3, 3, 4, 4, 4}, {0, 3, 6, 9}, marks);
+        EXPECT_EQ(marks, (Orvan::Array<bool>{marked, false, true})) << tolerance;
+    }
+}
+
+TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
+{
+    auto const mesh = MeshBuilder::tetrahedron().build();
+    forEachElementTypeName([&]<class T>(ElementType<T> type) {
+        Orvan::Array<T> values(4);
+        forEachScalar(type, values, []<class Scalar>(Scalar* scalars, std::size_t count) {
+            for (std::size_t i = 0; i != count; ++i)
+                scalars[i] = static_cast<Scalar>(i * i % 37);
+        });
+        addDataProperty<T>(type.name, sPointComp, std::move(values), *mesh);
+        addDataProperty<T>((std::string("face ") + type.name).c_str(), sFaceComp, Orvan::Array<T>(4), *mesh);
+    });
+    addRangeProperty("range", sPointComp, {0, 0, 0, 0}, *mesh);
+    addDataProperty<float>("of range", "range", {1}, *mesh);
+    addDataProperty<float>("of int", "int", {1}, *mesh);
+    addDataProperty<float>("of what targets int", "of int", {1}, *mesh);
+    addDataProperty<float>("of corners", sFaceVertexComp, Orvan::Array<float>(12), *mesh);
+    ASSERT_TRUE(subdivide(0.9f, *mesh));
+    long averaged = 0;
+    forEachElementTypeName([&]<class T>(ElementType<T> type) {
+        auto const shared = dataOf<T>(*mesh, type.name);
+        Orvan::Array<T> values = shared ? *shared : Orvan::Array<T>();
+        forEachScalar(type, values, [&]<class Scalar>(Scalar const* scalars, std::size_t count) {
+            ++averaged;
+            ASSERT_EQ(values.size, 8) << type.name;
+            std::size_t const n = count / 8;
+            Scalar const third = sizeof(Scalar) == 4 ? Scalar(0.33333334f) : Scalar(0.3333333333333333);
+            for (std::size_t i = 0; i != n; ++i) // the first face is that of points 0, 1 and 2
+                EXPECT_EQ(scalars[4 * n + i], (scalars[i] + scalars[n + i] + scalars[2 * n + i]) * third) << type.name;
+        });
+    });
+    EXPECT_EQ(averaged, 16);
+    EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sPointComp).size, 17) << "those and the positions";
+    EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceComp).size, 1);
+    EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceVertexComp).size, 1);
+    EXPECT_FALSE(mesh->hasProperty("of range") || mesh->hasProperty("of int"));
+    EXPECT_TRUE(mesh->hasProperty("of what targets int")) << "dropping goes one level deep";
+}
+
+TEST(Subdivide, keepsConstantAndLinearAttributes)
+{
+    auto const builder = graded(MeshBuilder::sphere(6));
+    auto const mesh = meshOf(builder);
+    auto const linearAt = [](float3 const& p) { return 2.0 * p.x - p.y + 0.5 * p.z + 3; };
+    Orvan::Array<double> linear(builder.points.size());
+    std::transform(builder.points.begin(), builder.points.end(), linear.data, linearAt);
+    addDataProperty<double>("linear", sPointComp, std::move(linear), *mesh);
+    addDataProperty<float>("constant", sPointComp, Orvan::Array<float>(builder.points.size(), 7.0f), *mesh);
+    ASSERT_TRUE(subdivide(0.05f, *mesh));
+    auto const places = dataOf<float3>(*mesh, "carried"); // not smoothed, as the other two
+    for (std::size_t v = 0; v != places->size; ++v) {
+        EXPECT_NEAR((*dataOf<double>(*mesh, "linear"))[v], linearAt((*places)[v]), 1e-5);
+        EXPECT_NEAR((*dataOf<float>(*mesh, "constant"))[v], 7.0f, 1e-5f);
+    }
+}
+
+TEST(Subdivide, doesNotDependOnNumbers)
+{
+    auto builder = graded(MeshBuilder::sphere(6));
+    for (float3& p : builder.points) // on a grid sums are exact, whatever their order
+        p = {std::round(p.x * 256) / 256, std::round(p.y * 256) / 256, std::round(p.z * 256) / 256};
+    auto const expected = placesOf(*refined(builder, 0.06f));
+    for (unsigned int const seed : {1u, 2u})
+        EXPECT_TRUE(placesOf(*refined(MeshBuilder(builder).shuffled(seed), 0.06f)) == expected);
+}
+
+TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
+{
+    auto const quad = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}}, {0, 1, 2, 3, 3, 2, 1, 0}, {0, 4, 8});
+    auto const open = MeshBuilder::sphere(3).withoutFace(5).build();
+    auto const incomplete = MeshBuilder::sphere(3).build();
+    incomplete->eraseProperty(sFaceOffset);
+    for (auto const* const mesh : {&quad, &open, &incomplete}) {
+        auto const before = deepCopy(**mesh);
+        addDataProperty<int>("number", sPointComp, {1, 2}, **mesh);
+        EXPECT_FALSE(subdivide(0.1f, **mesh));
+        EXPECT_TRUE(sameContents(**mesh, *before)) << "only what cannot follow is gone";
+    }
+    float const nan = std::numeric_limits<float>::quiet_NaN();
+    for (float const tolerance : {0.0f, -1.0f, 1.1920929e-7f, nan, 1.0f}) {
+        auto const mesh = refined(MeshBuilder::sphere(3), tolerance);
+        EXPECT_TRUE(sameContents(*mesh, *meshOf(MeshBuilder::sphere(3)))) << tolerance;
+    }
+    auto isolated = MeshBuilder::sphere(3);
+    isolated.points.push_back({1, 2, 3});
+    for (float const tolerance : {1.0f, 0.1f})
+        EXPECT_TRUE(
+            std::isnan((*dataOf<float3>(*refined(isolated, tolerance), sPointPosition))[isolated.points.size() - 1].x));
+    auto const pointsOnly = MeshBuilder::of({{1, 2, 3}}, {});
+    EXPECT_TRUE(sameContents(*refined(pointsOnly, 0.1f), *meshOf(pointsOnly)));
+}
+
+TEST(Subdivide, survivesWhatItIsNotMeantFor)
+{
+    Random random(1);
+    for (unsigned int run = 0; run != 150; ++run) {
+        MeshBuilder soup = MeshBuilder::sphere(2).withNoise(1, run);
+        for (unsigned int change = 0; change != 3; ++change)
+            soup.faces[random.below(32)][random.below(3)] = random.below(18);
+        for (std::size_t face = 0; face != 32; ++face) // closed, but not manifold: each face once more, turned
+            soup.faces.push_back({soup.faces[face][2], soup.faces[face][1], soup.faces[face][0]});
+        PlainSubdivision plain(soup);
+        plain.run(0.4f);
+        auto const expected = meshOf(MeshBuilder::of(plain.positions, plain.faces), plain.values);
+        EXPECT_TRUE(sameContents(*refined(soup, 0.4f), *expected)) << run;
+        soup.points[random.below(18)].x = std::numeric_limits<float>::quiet_NaN();
+        EXPECT_TRUE(isValid(*refined(soup, 0.4f))) << run;
+    }
+    EXPECT_TRUE(isValid(*refined(MeshBuilder::bipyramid(30'000), 0.4f)));
+}
+
+TEST(Subdivide, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
+{
+    auto const builder = graded(MeshBuilder::sphere(12)).withNoise(0.01f, 5).shuffled(6);
+    expectSameForThreads({1, 2, 8}, [&] { return refined(builder, 0.02f); });
+    EXPECT_EQ(fingerprint(*refined(builder, 0.02f)), 15911402519549515617u) << "unlike other builds";
+}
+
+TEST(Subdivide, canBeCancelledInEverySweep)
+{
+    auto const builder = graded(MeshBuilder::sphere(6));
+    auto const before = meshOf(builder), expected = refined(builder, 0.03f);
+    // \return whether it was cancelled
+    auto const isCancelled = [&](Steps::MarkFaces const& mark) {
+        auto const mesh = meshOf(builder);
+        bool hasThrown = false;
+        try {
+            EXPECT_TRUE(Steps::refineMesh(mark, *mesh));
+            EXPECT_TRUE(sameContents(*mesh, *expected));
+        } catch (std::runtime_error const&) {
+            hasThrown = true;
+            expectAsBefore(*mesh, *before);
+        }
+        Orvan::setJobCancelled(false);
+        return hasThrown;
+    };
+    auto const mark = [](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
+        Steps::markForSubdivision(0.03f, m.faceCount, m.positions, m.faceVertex, m.faceOffset, marks);
+    };
+    unsigned int last = 0, pass = 0;
+    auto const markAndCancel = [&](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
+        mark(m, marks);
+        Orvan::setJobCancelled(pass++ == last);
+    };
+    for (; isCancelled(markAndCancel); pass = 0) // in the first sweep of each pass
+        ++last;
+    EXPECT_GT(last, 3);
+
+    TSR::Canceller::resetCallCount();
+    EXPECT_FALSE(isCancelled(mark));
+    std::uint64_t const calls = TSR::Canceller::callCount();
+    for (std::uint64_t call = 1; call <= calls; call += 1 + calls / 40) { // in later sweeps, as near as threads meet
+        std::atomic<bool> isOver = false;
+        TSR::Canceller::resetCallCount();
+        std::thread canceller([&] {
+            while (TSR::Canceller::callCount() < call && !isOver) { }
+            Orvan::setJobCancelled(true);
+        });
+        isCancelled(mark);
+        isOver = true;
+        canceller.join();
+        Orvan::setJobCancelled(false);
+    }
+}
+
+TEST(Subdivide, leavesTheMeshAsItWasWhenMemoryRunsOut)
+{
+    for (auto const& builder : {MeshBuilder::tetrahedron(), graded(MeshBuilder::sphere(2))}) {
+        auto const expected = refined(builder, 0.3f);
+        sweepFailingAllocations([&](Attempt const& attempt) {
+            auto const mesh = meshOf(builder);
+            Object const other = *mesh;
+            auto const before = deepCopy(other);
+            if (attempt([&] { subdivide(0.3f, *mesh); }))
+                EXPECT_TRUE(sameContents(*mesh, *expected));
+            else
+                expectAsBefore(*mesh, *before);
+            EXPECT_TRUE(sameContents(other, *before)) << "other holders";
+        });
+    }
+}
