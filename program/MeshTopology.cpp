@@ -172,7 +172,8 @@ namespace {
         }
     }
 
-    void examineEdges(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
+    /// Calls `visit(lower point, sides in ascending order)` for each edge.
+    template <class Visit> void forEachEdge(MeshArrays const& mesh, Visit const& visit)
     {
         EdgeSides const edges = listEdgeSides(mesh);
         for (unsigned int point = 0; point != mesh.pointCount(); ++point) {
@@ -181,11 +182,18 @@ namespace {
                 unsigned int const higherPoint = first->higherPoint;
                 Side const* const last =
                     std::find_if(first, end, [=](Side const& side) { return side.higherPoint != higherPoint; });
-                examineEdge(mesh, point, {first, last}, topology);
-                joinFans(mesh, point, {first, last}, fans);
+                visit(point, std::span<Side const>(first, last));
                 first = last;
             }
         }
+    }
+
+    void examineEdges(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
+    {
+        forEachEdge(mesh, [&](unsigned int lower, std::span<Side const> sides) {
+            examineEdge(mesh, lower, sides, topology);
+            joinFans(mesh, lower, sides, fans);
+        });
     }
 
     void countPinchedPoints(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
@@ -295,6 +303,18 @@ MeshTopology analyseTopology(MeshArrays const& mesh)
         topology.genus = static_cast<std::int64_t>(topology.partCount) - eulerCharacteristic / 2;
     }
     return topology;
+}
+
+std::vector<unsigned int> boundaryPoints(MeshArrays const& mesh)
+{
+    std::vector<unsigned int> points;
+    forEachEdge(mesh, [&](unsigned int lower, std::span<Side const> sides) {
+        if (sides.size() == 1)
+            points.insert(points.end(), {lower, sides[0].higherPoint});
+    });
+    std::sort(points.begin(), points.end());
+    points.erase(std::unique(points.begin(), points.end()), points.end());
+    return points;
 }
 
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio)

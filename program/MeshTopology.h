@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <optional>
 #include <span>
+#include <vector>
 
 namespace ModelingProgram {
 
@@ -73,6 +74,9 @@ struct MeshTopology {
 
 /// Takes any valid mesh. Linear, but for sorting the edges at each point; takes up to 16 bytes a corner and 9 a point.
 MeshTopology analyseTopology(MeshArrays const& mesh);
+
+/// The points of open edges, ascending.
+std::vector<unsigned int> boundaryPoints(MeshArrays const& mesh);
 
 /// The faces whose shortest edge is shorter than `ratio` times their longest one, as the library measures them.
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio);

@@ -13,6 +13,7 @@
 #include <Modeling/mergePointClouds.h>
 #include <Modeling/mergeStrands.h>
 #include <Modeling/removeSlivers.h>
+#include <Modeling/smooth.h>
 #include <Modeling/subdivide.h>
 #include <Modeling/subdivisionSteps.h>
 #include <Modeling/triangulate.h>

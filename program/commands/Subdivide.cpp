@@ -5,6 +5,7 @@
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
 #include "Operation.h"
+#include "Triangulation.h"
 
 #include <Modeling/subdivide.h>
 #include <TessaraGeometry/Elements.h>
@@ -35,6 +36,7 @@ namespace {
         std::optional<float> tolerance;
         std::optional<float> relative;
         std::uint64_t maxMemory = 0;
+        bool triangulates = false;
     };
 
     /// A mesh that tells on standard error how many faces it has, whenever a pass has made more. It sees that from data of
@@ -166,6 +168,8 @@ namespace {
         requireWritable(options.out);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "subdivide", options.in);
+        if (options.triangulates)
+            *mesh = triangulatedAs(inFineUnits(*mesh), "*", *mesh);
         MeshTopology const topology = analyseTopology(arraysOf(*mesh));
         requireClosedTriangleMesh(
             arraysOf(*mesh), topology, faultsOfIsolatedPoints(arraysOf(*mesh), topology), "subdivide", options.in);
@@ -219,6 +223,7 @@ gives one level, s/6 two, s/10.4 three and s/18 four.)",
     size.add_option("--relative", options->relative, "The same, as a fraction of the diagonal of the bounding box")
         ->check(isPositive());
     size.require_option(1);
+    command.add_flag("--triangulate", options->triangulates, "Cut faces with more corners into triangles first");
     command.add_option("--max-memory", options->maxMemory, "Stop when the program takes more: 500MB, 4GB")
         ->type_name("")
         ->transform(CLI::AsSizeValue(true));

@@ -2,16 +2,12 @@
 #include "Failure.h"
 #include "Geometry.h"
 #include "Operation.h"
-#include "TriangulationCheck.h"
+#include "Triangulation.h"
 
-#include <Modeling/triangulate.h>
-#include <TessaraGeometry/Makers.h>
 #include <TessaraGeometryVolume/ChannelParser.h>
 
 #include <fmt/format.h>
 
-#include <algorithm>
-#include <cmath>
 #include <memory>
 
 namespace ModelingProgram {
@@ -76,31 +72,6 @@ namespace {
                 rows);
     }
 
-    /// The library looks at no face below 5e-5 square units. So the mesh is measured in units in which it is about a
-    /// million long; a power of two of its own, so that nothing rounds.
-    Orvan::Array<float3> inFineUnits(Orvan::Array<float3> const& positions, BoundingBox const& box)
-    {
-        constexpr int kExponent = 20;
-        float const size = std::max({box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z});
-        int const shift = std::isnormal(size) ? kExponent - std::ilogb(size) : 0;
-        Orvan::Array<float3> scaled = positions;
-        for (float3& p : scaled)
-            p = {std::ldexp(p.x, shift), std::ldexp(p.y, shift), std::ldexp(p.z, shift)};
-        return scaled;
-    }
-
-    /// The mesh as its faces are to be measured.
-    Object measuredMesh(Options const& options, Object const& mesh)
-    {
-        using namespace Tessara::Geometry;
-        Object measured = mesh;
-        std::optional<BoundingBox> const box = boundingBoxOf(mesh);
-        if (!options.keepsUnits && box)
-            addDataProperty(
-                sPointPosition, sPointComp, inFineUnits(*dataOf<float3>(mesh, sPointPosition), *box), measured);
-        return measured;
-    }
-
     void triangulate(Options const& options, Report& report)
     {
         requireChannels(options.channels);
@@ -110,10 +81,9 @@ namespace {
             throw Failure(ExitCode::Refused,
                 fmt::format("triangulate needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
 
-        Object const measured = measuredMesh(options, *mesh);
-        Object result = measured;
-        runOperation(report, [&] { Geometry::Mesh::triangulate(options.channels.c_str(), result); });
-        result.setProperty(Tessara::Geometry::sPointPosition, mesh->getProperty(Tessara::Geometry::sPointPosition));
+        Object const measured = options.keepsUnits ? *mesh : inFineUnits(*mesh);
+        Object result;
+        runOperation(report, [&] { result = triangulatedAs(measured, options.channels, *mesh); });
 
         std::vector<std::string> dropped = namesMissingIn(result, *mesh);
         for (std::string const& name : dropOutdatedProperties(result)) {

@@ -103,6 +103,34 @@ TEST_F(Commands, RemoveSliversKeepsPropertiesWhereNothingCollapses)
     EXPECT_EQ(runForJson("info out.obj")["properties"], runForJson("info cylinder.obj")["properties"]);
 }
 
+TEST_F(Commands, SmoothMovesPointsAndPinsThem)
+{
+    copySample("bunny.obj");
+    json const done = runForJson("smooth bunny.obj out.ply --amount 2");
+    EXPECT_EQ(done["exitCode"], 0);
+    EXPECT_EQ(done["before"]["faces"], done["after"]["faces"]);
+    EXPECT_LT(done["after"]["spreadOfEdgeLengths"], done["before"]["spreadOfEdgeLengths"]);
+    EXPECT_NEAR(done["after"]["volume"].get<double>() / done["before"]["volume"].get<double>(), 1, 0.02);
+    EXPECT_GT(done["meanDisplacement"], 0);
+
+    // A square of four triangles around a point, which alone is inside; the boundary moves unless it is pinned.
+    write(folder / "square.ply",
+        "ply\nformat ascii 1.0\nelement vertex 6\nproperty float x\nproperty float y\nproperty float z\n"
+        "property uchar locked\nproperty float soft\nelement face 4\nproperty list uchar int "
+        "vertex_indices\nend_header\n"
+        "0 0 0 1 0\n4 0 0 1 0\n4 4 0 1 0\n0 4 0 1 0\n1 1 0 0 0.5\n9 9 9 0 1\n3 0 1 4\n3 1 2 4\n3 2 3 4\n3 3 0 4\n");
+    Result const refused = run("smooth square.ply out.ply");
+    EXPECT_EQ(refused.exitCode, 5);
+    EXPECT_THAT(refused.messages, HasSubstr("1 of 6 points in square.ply belongs to no face"));
+    for (char const* const pins : {"--pin-boundary", "--pin-attribute locked", "--weights soft"}) {
+        json const pinned = runForJson("smooth square.ply out.ply --drop-isolated " + std::string(pins));
+        EXPECT_EQ(pinned["droppedPoints"], 1) << pins;
+        EXPECT_EQ(pinned["pinnedPoints"], 4) << pins;
+        EXPECT_EQ(runForJson("info out.ply")["boundingBox"], json({{"min", {0, 0, 0}}, {"max", {4, 4, 0}}})) << pins;
+    }
+    EXPECT_THAT(run("smooth square.ply out.ply --weights heat --drop-isolated").messages, HasSubstr("\"heat\""));
+}
+
 TEST_F(Commands, TriangulateKeepsWhatTheChannelsChoose)
 {
     write(
@@ -192,6 +220,10 @@ TEST_F(Commands, SubdivideCarriesWhatItCanAndSaysWhatItDrops)
     EXPECT_EQ(info["topology"]["closedManifold"], true);
     EXPECT_EQ(info["counts"]["faces"], done["after"]["faces"]);
     EXPECT_THAT(info["properties"].dump(), AllOf(HasSubstr("heat"), Not(HasSubstr("id"))));
+
+    copySample("mixed.obj");
+    EXPECT_EQ(run("subdivide mixed.obj out.obj --relative 0.1").exitCode, 5);
+    EXPECT_EQ(runForJson("subdivide mixed.obj out.obj --relative 0.1 --triangulate")["after"]["genus"], 0);
 
     // Relative to a diagonal of √12; on a terminal with a count for each pass, and in place with the same result.
     run("subdivide tetrahedron.ply again.ply --relative 0.0866025404 --threads 1");
@@ -289,7 +321,8 @@ TEST_F(Commands, InfoAndValidateTellAboutFiles)
     EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (0.1, 0, 0)"));
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
-    for (char const* const command : {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "remove-slivers "})
+    for (char const* const command :
+        {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "smooth ", "remove-slivers "})
         EXPECT_EQ(run(command + std::string("--help")).exitCode, 0) << command;
     EXPECT_EQ(run("--version").exitCode, 0);
 }

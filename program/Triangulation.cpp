@@ -1,15 +1,20 @@
-#include "TriangulationCheck.h"
+#include "Triangulation.h"
+
+#include "Geometry.h"
 
 #include <Modeling/triangulate.h>
 #include <TessaraGeometry/Makers.h>
 
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 
 namespace ModelingProgram {
 
+using namespace Tessara::Geometry;
+using Tessara::Object;
 using Tessara::Math::double3;
 using Tessara::Math::float3;
 using Corners = std::span<unsigned int const>;
@@ -85,8 +90,7 @@ namespace {
                 faceVertex.append(corners[(i + 1) % corners.size()]);
             faceOffset.append(static_cast<unsigned int>(faceVertex.size));
         }
-        auto const rotated =
-            Tessara::Geometry::makeMesh(*polygons.positions, std::move(faceVertex), std::move(faceOffset));
+        auto const rotated = makeMesh(*polygons.positions, std::move(faceVertex), std::move(faceOffset));
         MeshArrays const before = arraysOf(*rotated);
         Geometry::Mesh::triangulate("*", *rotated);
         MeshArrays const after = arraysOf(*rotated);
@@ -112,6 +116,30 @@ namespace {
         return kind;
     }
 
+}
+
+Object inFineUnits(Object const& mesh)
+{
+    constexpr int kExponent = 20;
+    std::optional<BoundingBox> const box = boundingBoxOf(mesh);
+    if (!box)
+        return mesh;
+    float const size = std::max({box->max.x - box->min.x, box->max.y - box->min.y, box->max.z - box->min.z});
+    int const shift = std::isnormal(size) ? kExponent - std::ilogb(size) : 0;
+    Orvan::Array<float3> scaled = *dataOf<float3>(mesh, sPointPosition);
+    for (float3& p : scaled)
+        p = {std::ldexp(p.x, shift), std::ldexp(p.y, shift), std::ldexp(p.z, shift)};
+    Object fine = mesh;
+    addDataProperty(sPointPosition, sPointComp, std::move(scaled), fine);
+    return fine;
+}
+
+Object triangulatedAs(Object const& measured, std::string const& channels, Object const& mesh)
+{
+    Object result = measured;
+    Geometry::Mesh::triangulate(channels.c_str(), result);
+    result.setProperty(sPointPosition, mesh.getProperty(sPointPosition));
+    return result;
 }
 
 std::vector<CutFaces> checkTriangulation(MeshArrays const& polygons, MeshArrays const& triangles)

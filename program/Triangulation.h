@@ -7,6 +7,15 @@
 
 namespace ModelingProgram {
 
+/// The mesh in units in which it is about a million long: the library cuts no face below 5e-5 square units well. They are
+/// a power of two of its own, so that nothing rounds.
+Tessara::Object inFineUnits(Tessara::Object const& mesh);
+
+/// The mesh with its faces cut into triangles as those of `measured` are, which differs by its unit only. The channels
+/// choose the properties of faces and corners to keep.
+Tessara::Object triangulatedAs(
+    Tessara::Object const& measured, std::string const& channels, Tessara::Object const& mesh);
+
 /// How well the faces of one kind have been cut into triangles.
 struct CutFaces {
     std::string corners; // "4", "9 to 16"

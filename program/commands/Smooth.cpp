@@ -1,0 +1,237 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "MeshTopology.h"
+#include "Operation.h"
+
+#include <Modeling/deleteFaces.h>
+#include <Modeling/smooth.h>
+#include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <cmath>
+#include <memory>
+
+#include <unistd.h>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using namespace Tessara::Geometry;
+    using Tessara::Object;
+    using Positions = Orvan::Array<float3>;
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path out;
+        float amount = 1;
+        std::string weights;
+        std::string pins;
+        bool pinsBoundary = false;
+        bool dropsIsolated = false;
+        bool* asJson = nullptr; // then standard output belongs to the document
+    };
+
+    /// A number for each point, from a property of any scalar type.
+    std::vector<float> pointNumbers(Object const& mesh, std::string const& name, std::filesystem::path const& file)
+    {
+        std::vector<float> numbers;
+        Orvan::Ptr<Object> const property = getDataGeoProperty(mesh, name.c_str());
+        if (property && getGeoPropTargetName(mesh, name.c_str()) == sPointComp)
+            visitArray(property->getProperty(sData), [&]<class T>(Orvan::Array<T> const& values, auto) {
+                if constexpr (std::is_arithmetic_v<T>)
+                    for (T const value : values)
+                        numbers.push_back(static_cast<float>(value));
+            });
+        if (numbers.size() != arraysOf(mesh).pointCount())
+            throw Failure(ExitCode::Refused,
+                fmt::format("\"{}\" is to be an attribute with one number for each point, which {} does not hold", name,
+                    file.string()));
+        return numbers;
+    }
+
+    /// Null where nothing is weighted or pinned.
+    std::unique_ptr<Orvan::Array<float>> weightsOf(Options const& options, Object const& mesh, Report& report)
+    {
+        if (options.weights.empty() && options.pins.empty() && !options.pinsBoundary)
+            return nullptr;
+        MeshArrays const arrays = arraysOf(mesh);
+        auto weights = std::make_unique<Orvan::Array<float>>(arrays.pointCount(), 1.0f);
+        if (!options.weights.empty()) {
+            std::vector<float> const numbers = pointNumbers(mesh, options.weights, options.in);
+            if (!std::all_of(numbers.begin(), numbers.end(), [](float number) { return std::isfinite(number); }))
+                throw Failure(ExitCode::Refused, fmt::format("the weights \"{}\" are not all finite", options.weights));
+            std::copy(numbers.begin(), numbers.end(), weights->begin());
+        }
+        if (!options.pins.empty()) {
+            std::vector<float> const numbers = pointNumbers(mesh, options.pins, options.in);
+            for (std::size_t point = 0; point != numbers.size(); ++point)
+                if (numbers[point] != 0)
+                    (*weights)[point] = 0;
+        }
+        if (options.pinsBoundary)
+            for (unsigned int const point : boundaryPoints(arrays))
+                (*weights)[point] = 0;
+        report.document["pinnedPoints"] =
+            std::count_if(weights->begin(), weights->end(), [](float weight) { return weight <= 0; });
+        return weights;
+    }
+
+    /// Points without a face have nowhere to move to.
+    void settleIsolatedPoints(Options const& options, MeshTopology const& topology, Object& mesh, Report& report)
+    {
+        Finding const& isolated = topology.isolatedPoints;
+        report.document["droppedPoints"] = isolated.count;
+        if (!isolated)
+            return;
+        if (!options.dropsIsolated)
+            throw Failure(ExitCode::Refused,
+                fmt::format("{} of {} in {} {} to no face, so that smoothing has nowhere to move {}; the first is "
+                            "point {} (counted from 0). --drop-isolated leaves them out.",
+                    groupDigits(isolated.count), countOf(arraysOf(mesh).pointCount(), "point"), options.in.string(),
+                    isolated.count == 1 ? "belongs" : "belong", isolated.count == 1 ? "it" : "them", isolated.first));
+        Orvan::Array<bool> const noFace(arraysOf(mesh).faceCount());
+        if (!Tessara::GeometryAlgorithms::deleteFaces(noFace, mesh))
+            throw Failure(
+                ExitCode::Refused, "the isolated points cannot be left out: a range of the points has several data");
+    }
+
+    /// Six times the volume that a closed mesh encloses, in double precision.
+    double volumeOf(MeshArrays const& mesh)
+    {
+        double volume = 0;
+        float3 const* const p = mesh.positions->data;
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+            auto const corners = mesh.corners(face);
+            for (std::size_t i = 2; i < corners.size(); ++i) {
+                float3 const &a = p[corners[0]], &b = p[corners[i - 1]], &c = p[corners[i]];
+                volume += a.x * (double{b.y} * c.z - double{b.z} * c.y) + a.y * (double{b.z} * c.x - double{b.x} * c.z)
+                    + a.z * (double{b.x} * c.y - double{b.y} * c.x);
+            }
+        }
+        return volume / 6;
+    }
+
+    double distance(float3 const& a, float3 const& b)
+    {
+        return std::hypot(double{a.x} - b.x, double{a.y} - b.y, double{a.z} - b.z);
+    }
+
+    struct EdgeLengths {
+        double mean = 0;
+        double spread = 0; // standard deviation as a fraction of the mean
+    };
+
+    EdgeLengths edgeLengthsOf(MeshArrays const& mesh)
+    {
+        double sum = 0, squares = 0, count = 0;
+        float3 const* const p = mesh.positions->data;
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+            auto const corners = mesh.corners(face);
+            for (std::size_t i = 0; i != corners.size(); ++i) {
+                double const length = distance(p[corners[i]], p[corners[(i + 1) % corners.size()]]);
+                sum += length;
+                squares += length * length;
+                ++count;
+            }
+        }
+        double const mean = count == 0 ? 0 : sum / count;
+        double const variance = count == 0 ? 0 : std::max(0.0, squares / count - mean * mean);
+        return {mean, mean > 0 ? std::sqrt(variance) / mean : 0};
+    }
+
+    Json describeMesh(Object const& mesh, bool isClosed)
+    {
+        MeshArrays const arrays = arraysOf(mesh);
+        EdgeLengths const edges = edgeLengthsOf(arrays);
+        Json values = countsOf(mesh);
+        values["volume"] = isClosed ? numberOf(static_cast<float>(volumeOf(arrays))) : Json();
+        values["meanEdgeLength"] = numberOf(static_cast<float>(edges.mean));
+        values["spreadOfEdgeLengths"] = numberOf(static_cast<float>(edges.spread));
+        return values;
+    }
+
+    void reportDisplacement(Positions const& before, Positions const& after, Report& report)
+    {
+        double sum = 0, largest = 0;
+        for (std::uint64_t point = 0; point != before.size; ++point) {
+            double const moved = distance(before[point], after[point]);
+            sum += moved;
+            largest = std::max(largest, moved);
+        }
+        double const mean = before.empty() ? 0 : sum / static_cast<double>(before.size);
+        report.document["meanDisplacement"] = numberOf(static_cast<float>(mean));
+        report.document["largestDisplacement"] = numberOf(static_cast<float>(largest));
+        report.text += fmt::format("\nPoints moved by {:.4g} on average, by {:.4g} at most.\n", mean, largest);
+    }
+
+    void smooth(Options const& options, Report& report)
+    {
+        requireWritable(options.out);
+        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
+        if (typeOf(*mesh) != GeometryType::Mesh)
+            throw Failure(ExitCode::Refused,
+                fmt::format("smooth needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+        MeshTopology const topology = analyseTopology(arraysOf(*mesh));
+        settleIsolatedPoints(options, topology, *mesh, report);
+        auto const weights = weightsOf(options, *mesh, report);
+        bool const isClosed = topology.isClosedManifold();
+        Json const before = describeMesh(*mesh, isClosed);
+
+        MeshArrays const arrays = arraysOf(*mesh);
+        Positions positions = *arrays.positions;
+        auto const run = [&](auto const& logger) {
+            Geometry::Mesh::smooth(options.amount, arrays.pointCount(), arrays.faceCount(), *arrays.faceVertex,
+                *arrays.faceOffset, weights.get(), positions, logger);
+        };
+        bool const showsSteps = !*options.asJson && ::isatty(STDOUT_FILENO) == 1;
+        runOperation(report, [&] { showsSteps ? run(CoreGL::ConsoleLogger()) : run(CoreGL::NOPLogger()); });
+
+        if (!std::all_of(positions.begin(), positions.end(),
+                [](float3 const& p) { return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z); }))
+            throw Failure(ExitCode::Refused, "the coordinates are too large to be smoothed in single precision");
+        addDataProperty(sPointPosition, sPointComp, positions, *mesh);
+        saveGeometry(*mesh, options.out, report);
+        report.document["amount"] = numberOf(options.amount);
+        reportOperation(before, describeMesh(*mesh, isClosed), {}, report);
+        reportDisplacement(*arrays.positions, positions, report);
+    }
+
+}
+
+void addSmooth(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    options->asJson = &invocation.asJson;
+    constexpr CommandHelp kHelp = {"smooth", "Relax the points of a mesh within its surface",
+        R"(Points slide along the surface, so that edges become more even and the shape stays. The amount is cut
+into steps of at most 0.9, in each of which every point goes so much of its way to the middle of the
+faces around it: an amount of 1 takes two steps and evens out most of what noise has made of the
+edges of a sphere, one of 9 takes ten or eleven and settles it. Normals of the file are not made anew.
+
+Points at a boundary move too, unless they are pinned. Attributes with a number for each point can
+scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",
+        "  modeling smooth scan.ply smooth.ply --amount 3\n"
+        "  modeling smooth cloth.obj cloth.obj --amount 1 --pin-boundary\n"
+        "  modeling smooth face.ply face.ply --weights quality --pin-attribute locked"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("IN", "Mesh to read", options->in, command);
+    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    command.add_option("--amount", options->amount, "How much smoothing")
+        ->check(CLI::Range(0.0f, 1000.0f).description("0..1000"))
+        ->capture_default_str();
+    command.add_option("--weights", options->weights, "Scale the moves of points by this attribute")
+        ->type_name("ATTRIBUTE");
+    command.add_option("--pin-attribute", options->pins, "Pin the points where this attribute is not 0")
+        ->type_name("ATTRIBUTE");
+    command.add_flag("--pin-boundary", options->pinsBoundary, "Pin the points of open edges");
+    command.add_flag("--drop-isolated", options->dropsIsolated, "Leave out points that belong to no face");
+    onSelected(command, invocation, [options](Report& report) { smooth(*options, report); });
+}
+
+}
