@@ -14,8 +14,8 @@ namespace Tessara::GeometryAlgorithms {
 /// \param output  Receives the merged cloud. Its other keys stay. Where the result is false it is as it was.
 /// \param runtimeServices  Not looked at; may be null.
 /// \return        False where no input is a valid point cloud, or there would be more than 2^32 - 1 points.
-/// \throws        std::bad_alloc, also where the data of a range does not fit 32 bits; the output may then hold part of
-///                the properties. Job cancellation is not looked at.
+/// \throws        std::bad_alloc, also where the data of a range does not fit 32 bits, with the output as it was. Job
+///                cancellation is not looked at.
 ///
 /// Runs in parallel over properties, inputs and elements, with the same result for any number of threads. Each byte of
 /// the result is written once; beside it next to nothing is taken.

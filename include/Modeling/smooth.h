@@ -27,14 +27,14 @@ namespace Geometry::Mesh {
 ///                     At 0 a point stays where it is.
 /// \param positions    One a point; read and changed in place.
 /// \pre                Arrays that fit the counts, offsets that ascend within the corners, point indices in range:
-///                     undefined otherwise. Every point is of a face: others become not-a-number in the first step,
+///                     undefined otherwise. Corners in front of the first face or behind the last count for nothing. Every point is of a face: others become not-a-number in the first step,
 ///                     whatever their weight.
 /// \throws             std::bad_alloc, with the positions as they were; what the logger throws, after whole steps. Job
 ///                     cancellation is not looked at.
 ///
 /// Runs in parallel over faces and points; sums are taken by ascending faces, so the result is the same for any number of
-/// threads. Linear in the corners for each step (where a face visits a point m times: m times its corners). Takes about 36
-/// bytes a point, 8 a corner and 24 a face, and nothing more with further steps.
+/// threads. Linear in the corners for each step (where a face visits a point m times: m times its corners). Takes about 32
+/// bytes a point, 8 a corner (12 at first) and 24 a face, and nothing more with further steps.
 template <class Logger> void smooth(float amount, unsigned int pointCount, unsigned int faceCount,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<float> const* weights, Orvan::Array<Tessara::Math::float3>& positions, Logger const& logger);

@@ -29,7 +29,7 @@ namespace {
     struct PointFaces {
         IndexArray offsets; // point count + 1
         IndexArray faces;
-        IndexArray corners; // by which the face holds the point
+        IndexArray corners; // by which the face holds the point, counted from its first one
     };
 
     /// What a face gives to its points in a step.
@@ -59,22 +59,27 @@ namespace {
 
     PointFaces findPointFaces(Topology const& mesh)
     {
-        std::size_t const cornerCount = mesh.faceCount == 0 ? 0 : mesh.faceOffset[mesh.faceCount];
+        // Corners in front of the first face or behind the last one count for nothing.
+        unsigned int const firstCorner = mesh.faceCount == 0 ? 0 : mesh.faceOffset[0];
+        unsigned int const cornerCount = mesh.faceCount == 0 ? 0 : mesh.faceOffset[mesh.faceCount] - firstCorner;
         IndexArray faceOfCorner = uninitializedArray<unsigned int>(cornerCount);
         unsigned int* const faceOf = faceOfCorner.data;
         // Each face writes the entries of its corners.
         parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kElementGrain), [=](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                std::fill(faceOf + mesh.faceOffset[face], faceOf + mesh.faceOffset[face + 1], face);
+                std::fill(faceOf + (mesh.faceOffset[face] - firstCorner),
+                    faceOf + (mesh.faceOffset[face + 1] - firstCorner), face);
         });
 
-        PointCorners around = cornersByPoint(mesh.pointCount, mesh.faceVertex, cornerCount);
+        PointCorners around = cornersByPoint(mesh.pointCount, mesh.faceVertex + firstCorner, cornerCount);
         IndexArray faces = uninitializedArray<unsigned int>(around.corners.size);
         // Each entry is written once.
         parallelFor(tbb::blocked_range<std::size_t>(0, faces.size, kElementGrain),
-            [face = faces.data, corner = around.corners.data, faceOf](auto const& entries) {
-                for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry)
+            [=, face = faces.data, corner = around.corners.data](auto const& entries) {
+                for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry) {
                     face[entry] = faceOf[corner[entry]];
+                    corner[entry] -= mesh.faceOffset[face[entry]] - firstCorner;
+                }
             });
         return {std::move(around.offsets), std::move(faces), std::move(around.corners)};
     }
@@ -94,8 +99,8 @@ namespace {
     void measureFaces(Topology const& mesh, float3 const* position, Orvan::Array<FaceTerms>& terms)
     {
         // Each face writes its own entry.
-        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kElementGrain),
-            [=, term = terms.data](auto const& faces) {
+        parallelFor(
+            tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [=, term = terms.data](auto const& faces) {
                 for (unsigned int face = faces.begin(); face != faces.end(); ++face)
                     term[face] = termsOf(mesh.faceVertex + mesh.faceOffset[face], mesh.size(face), position);
             });
@@ -160,7 +165,7 @@ namespace {
             bool const isAlone = (entry == begin || face[entry - 1] != face[entry])
                 && (entry + 1 == end || face[entry + 1] != face[entry]);
             if (isAlone)
-                fan.addAround(around.corners[entry] - mesh.faceOffset[face[entry]], sums);
+                fan.addAround(around.corners[entry], sums);
             else
                 fan.addAllAt(point, sums);
         }
@@ -170,7 +175,7 @@ namespace {
         float3 const* position, Orvan::Array<PointSums>& sums)
     {
         // Each point adds to its own sums; nobody moves meanwhile.
-        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.pointCount, kElementGrain), [&](auto const& points) {
+        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.pointCount, kFaceGrain), [&](auto const& points) {
             for (unsigned int point = points.begin(); point != points.end(); ++point)
                 addFacesAround(point, mesh, around, terms.data, position, sums[point]);
         });

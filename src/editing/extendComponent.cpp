@@ -116,7 +116,7 @@ namespace {
                 PropertyValue data = extendedData(name, *property, extension);
                 Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
                 changed->setProperty(sData, std::move(data));
-                writes.setGeoProp(name, std::move(changed));
+                writes.setProperty(name, Orvan::Ptr<Tessara::Object>(std::move(changed)));
             });
     }
 
@@ -131,7 +131,7 @@ namespace {
                 fillFrom(source->size, kInvalidIndex, indices);
                 Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
                 changed->setProperty(sIndices, Orvan::makePtr<IndexArray>(std::move(indices)));
-                writes.setGeoProp(name, std::move(changed));
+                writes.setProperty(name, Orvan::Ptr<Tessara::Object>(std::move(changed)));
             });
     }
 
@@ -163,7 +163,8 @@ bool extendComponent(Orvan::String const& component, std::uint64_t addCount, Orv
     prepareData(extension, object, writes);
     prepareRanges(extension, object, writes);
     if (!tag.empty())
-        writes.setGeoProp(tag, makeTag(extension)); // comes last, so that it replaces whatever has the name
+        writes.setProperty(tag,
+            Orvan::Ptr<Tessara::Object>(makeTag(extension))); // comes last, so that it replaces whatever has the name
     writes.commit();
     return true;
 }

@@ -38,14 +38,14 @@ bool PreparedWrites::setElementCount(Orvan::String const& component, unsigned in
 {
     if (!Tessara::Geometry::setElementCount(component, getElementCount(object_, component), object_))
         return false;
-    writes_.push_back({Write::Kind::Count, component, count, nullptr});
+    writes_.push_back({Write::Kind::Count, component, count, {}});
     return true;
 }
 
-void PreparedWrites::setGeoProp(Orvan::String const& key, Orvan::Ptr<Object>&& property)
+void PreparedWrites::setProperty(Orvan::String const& key, PropertyValue&& value)
 {
     if (!key.empty())
-        writes_.push_back({Write::Kind::Property, key, 0, std::move(property)});
+        writes_.push_back({Write::Kind::Property, key, 0, std::move(value)});
 }
 
 void PreparedWrites::writeValue(Orvan::String const& key, PropertyValue&& data)
@@ -55,7 +55,7 @@ void PreparedWrites::writeValue(Orvan::String const& key, PropertyValue&& data)
         return;
     Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
     changed->setProperty(sData, std::move(data));
-    setGeoProp(key, std::move(changed));
+    setProperty(key, Orvan::Ptr<Object>(std::move(changed)));
 }
 
 void PreparedWrites::setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices)
@@ -64,12 +64,12 @@ void PreparedWrites::setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan
     Orvan::MutablePtr<Object> const onlyRange = Tessara::createObject();
     onlyRange->setProperty(name, object_.getProperty(name));
     if (setRangeGeoPropIndices(name, std::move(indices), *onlyRange))
-        setGeoProp(name, objectAt(*onlyRange, name));
+        setProperty(name, objectAt(*onlyRange, name));
 }
 
 void PreparedWrites::eraseProperty(Orvan::String const& key)
 {
-    writes_.push_back({Write::Kind::Erasure, key, 0, nullptr});
+    writes_.push_back({Write::Kind::Erasure, key, 0, {}});
 }
 
 void PreparedWrites::addNewKeys()
@@ -98,7 +98,7 @@ void PreparedWrites::commit()
             Tessara::Geometry::setElementCount(write.key, write.count, object_);
             break;
         case Write::Kind::Property:
-            object_.setProperty(write.key, std::move(write.property));
+            object_.setProperty(write.key, std::move(write.value));
             break;
         case Write::Kind::Erasure:
             object_.eraseProperty(write.key);

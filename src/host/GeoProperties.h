@@ -60,7 +60,7 @@ public:
     }
 
     /// As `setProperty` of the object; without effect where the key is empty.
-    void setGeoProp(Orvan::String const& key, Orvan::Ptr<Tessara::Object>&& property);
+    void setProperty(Orvan::String const& key, Tessara::PropertyValue&& value);
 
     /// As `setRangeGeoPropIndices`; without effect where there is no range of that name.
     void setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices);
@@ -80,7 +80,7 @@ private:
         Kind kind;
         Orvan::String key;
         unsigned int count; // of a component
-        Orvan::Ptr<Tessara::Object> property; // that replaces the present one
+        Tessara::PropertyValue value; // that replaces the present one
     };
 
     void addNewKeys();

@@ -6,6 +6,7 @@
 #include <TessaraObject/Object.h>
 
 #include <cstddef>
+#include <functional>
 #include <optional>
 #include <vector>
 
@@ -16,17 +17,18 @@ namespace Modeling::Internal {
 using MergeInputs = Orvan::Array<Orvan::Ptr<Tessara::Object>>;
 using Offsets = Orvan::Array<unsigned int>;
 
-/// A data property of an input, or a range property.
+/// A data property of an input, with its target; or a range property, with the component that it belongs to in the end.
 struct GeoProperty {
     Orvan::String name;
-    Orvan::String target; // of data its own target, of a range the component that it belongs to in the end
+    Orvan::String owner;
     Orvan::Ptr<Tessara::Object> property;
 };
 
-/// The geo properties of one input, in the order of its keys. Looked up once for all components.
+/// What one input holds, in the order of its keys. Looked up once for all components.
 struct InputProperties {
     std::vector<GeoProperty> data;
     std::vector<GeoProperty> ranges;
+    std::vector<Orvan::String> others; // keys of what is no geo property
 };
 
 /// A data property that is being merged. `property` is that of the first input that qualifies: its default and target
@@ -41,7 +43,6 @@ struct DataPropertyMergeEntry {
 struct RangePropertyMergeEntry {
     Orvan::String name;
     Orvan::Ptr<Orvan::Array<unsigned int>> mergedIndices;
-    Orvan::Ptr<Tessara::Object> property;
     std::vector<DataPropertyMergeEntry> dependents;
 };
 
@@ -51,8 +52,11 @@ struct MergePlan {
     std::vector<InputProperties> properties; // one an input
 };
 
-/// Looks the properties of all inputs up, in parallel.
-MergePlan planMerge(MergeInputs&& validInputs);
+/// Looks the properties of those inputs up that are accepted, in parallel.
+/// \param accepts  `bool (Tessara::Object const&)`, called from several threads
+MergePlan planMerge(MergeInputs const& inputs, std::function<bool(Tessara::Object const&)> const& accepts);
+/// The same for inputs that all are accepted.
+MergePlan planMerge(MergeInputs const& validInputs);
 
 /// Where the elements of each input begin in the merged component, and as last entry how many there are. Nothing where
 /// that does not fit 32 bits.
@@ -76,5 +80,14 @@ template <class Validator> MergeInputs filterValid(MergeInputs const& inputs)
 /// References to the inputs that stay what they are, whatever is written to the output: where that is an input itself,
 /// a shallow copy stands for it. Null inputs are left out.
 MergeInputs holdInputs(MergeInputs const& inputs, Tessara::Object const& output);
+
+/// Gives an object what the inputs hold beside geometry: of each key the value of the first input that has it, unless the
+/// object has the key. (`copyNonGeoProperties`, for inputs whose properties have been looked up.)
+void copyOtherProperties(MergePlan const& plan, Tessara::Object& object);
+
+/// A shallow copy to build a result in, and the way back: the output gets all that has changed, or, where memory runs
+/// out, nothing.
+Orvan::MutablePtr<Tessara::Object> stagedCopy(Tessara::Object const& output);
+void publish(Tessara::Object const& staged, Tessara::Object& output);
 
 }

@@ -42,7 +42,9 @@ void rebaseRegions(Offsets const& regionOffsets, Orvan::Array<unsigned int>& val
 
 bool finishConnectivity(Connectivity const& connectivity, Offsets const& regionOffsets, Tessara::Object& output)
 {
-    if (connectivity.merged && readGeoPropData<unsigned int>(output, connectivity.name) == connectivity.merged)
+    if (!connectivity.merged)
+        return false; // what the output holds is not what was merged
+    if (readGeoPropData<unsigned int>(output, connectivity.name) == connectivity.merged)
         return true;
     return editGeoPropData<unsigned int>(connectivity.name, output, [&](Orvan::Array<unsigned int>& values) {
         if (connectivity.closingEntry)

@@ -5,8 +5,7 @@
 
 namespace Modeling::Internal {
 
-/// Moves a component with all that belongs to it, directly or through ranges, to the output, which then holds the only
-/// references to its arrays. Everything else in the source is dropped.
+/// Moves a component with all that belongs to it, directly or through ranges, to the output. Everything else in the source is dropped.
 void transferComponentProperties(Orvan::String const& component, Tessara::Object& source, Tessara::Object& output);
 
 /// Raises the values of each region by its base: region i is the part of `values` from entry i up to entry i + 1 of
@@ -16,7 +15,7 @@ void rebaseRegions(Offsets const& regionOffsets, Orvan::Array<unsigned int>& val
 /// Sees to it that the output's connectivity array means places in the merged components. Mostly it does already,
 /// raised while it was merged; but another property of that name may have taken its place.
 /// \param regionOffsets  where the elements of each input begin
-/// \return false where the output has no such array of `unsigned int`
+/// \return false where no such array of `unsigned int` was merged
 bool finishConnectivity(Connectivity const& connectivity, Offsets const& regionOffsets, Tessara::Object& output);
 
 }

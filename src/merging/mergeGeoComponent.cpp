@@ -20,7 +20,7 @@ namespace {
         NameSet admitted;
         for (InputProperties const& input : plan.properties)
             for (GeoProperty const& data : input.data)
-                if (data.target == component && admitted.insert(data.name.view()).second)
+                if (data.owner == component && admitted.insert(data.name.view()).second)
                     entries.push_back({data.name, data.property, {}});
         return entries;
     }
@@ -31,13 +31,13 @@ namespace {
         NameSet admitted;
         for (InputProperties const& input : plan.properties) {
             for (GeoProperty const& range : input.ranges) {
-                if (range.target != component || admitted.contains(range.name.view()))
+                if (range.owner != component || admitted.contains(range.name.view()))
                     continue;
                 std::vector<DataPropertyMergeEntry> dependents = collectDependentDataProperties(input, range.name);
                 if (dependents.empty())
                     continue; // a later input may still qualify
                 admitted.insert(range.name.view());
-                entries.push_back({range.name, nullptr, range.property, std::move(dependents)});
+                entries.push_back({range.name, nullptr, std::move(dependents)});
             }
         }
         return entries;

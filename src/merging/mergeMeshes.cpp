@@ -1,4 +1,3 @@
-#include <Modeling/copyNonGeoProperties.h>
 #include <Modeling/mergeMeshes.h>
 
 #include "MergedComponents.h"
@@ -21,22 +20,6 @@ using namespace Tessara::Geometry;
 
 namespace {
 
-    MergeInputs filterValidMeshes(MergeInputs const& inputs)
-    {
-        Orvan::Array<unsigned char> valid(inputs.size, Orvan::kUninitialized);
-        // Each input has its own entry.
-        parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size, kFaceGrain), [&](auto const& range) {
-            for (std::size_t input = range.begin(); input != range.end(); ++input)
-                valid[input] = validateMesh(*inputs[input]) ? 1 : 0;
-        });
-        MergeInputs validInputs;
-        validInputs.reserve(inputs.size);
-        for (std::uint64_t input = 0; input != inputs.size; ++input)
-            if (valid[input])
-                validInputs.append(inputs[input]);
-        return validInputs;
-    }
-
     struct MeshOffsets {
         std::optional<Offsets> points, corners, faces;
 
@@ -50,8 +33,7 @@ namespace {
         bool fit() const { return points && corners && faces; }
     };
 
-    /// Merges the three components side by side, each into an object of its own. Corners and faces mean places among
-    /// the points and corners of all inputs then.
+    /// Each component in an object of its own.
     struct MergedMesh {
         Connectivity faceVertex;
         Connectivity faceOffset;
@@ -61,6 +43,7 @@ namespace {
         std::array<std::atomic<bool>, 3> isDone{};
     };
 
+    /// Merges the components side by side. Corners and faces then mean places among the points and corners of all inputs.
     void mergeComponents(MergePlan const& plan, MeshOffsets const& offsets, MergedMesh& merged, Object& output)
     {
         runTasks(
@@ -86,7 +69,8 @@ namespace {
 
 bool mergeMeshes(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
 {
-    MergePlan const plan = planMerge(filterValidMeshes(holdInputs(inputs, output)));
+    MergePlan const plan =
+        planMerge(holdInputs(inputs, output), [](Object const& input) { return bool(validateMesh(input)); });
     MeshOffsets const offsets(plan.inputs);
     if (plan.inputs.empty() || !offsets.fit())
         return false;
@@ -94,22 +78,23 @@ bool mergeMeshes(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output,
     unsigned int const cornerCount = (*offsets.corners)[plan.inputs.size];
     MergedMesh merged{
         {sFaceVertex, *offsets.points, std::nullopt, nullptr}, {sFaceOffset, *offsets.corners, cornerCount, nullptr}};
-    mergeComponents(plan, offsets, merged, output);
+    Orvan::MutablePtr<Object> const staged = stagedCopy(output);
+    mergeComponents(plan, offsets, merged, *staged);
     auto const wasRun = [](std::atomic<bool> const& done) { return done.load(std::memory_order_relaxed); };
     if (!std::all_of(merged.isDone.begin(), merged.isDone.end(), wasRun)) {
         output.eraseAllProperties(); // an enclosing group was cancelled
         return false;
     }
 
-    transferComponentProperties(sPointComp, *merged.points, output);
-    transferComponentProperties(sFaceVertexComp, *merged.corners, output);
-    transferComponentProperties(sFaceComp, *merged.faces, output);
-    bool const hasCorners = finishConnectivity(merged.faceVertex, *offsets.corners, output);
-    bool const hasFaces = finishConnectivity(merged.faceOffset, *offsets.faces, output);
-    if (!hasCorners || !hasFaces)
-        return false;
-    copyNonGeoProperties(plan.inputs, output);
-    return true;
+    transferComponentProperties(sPointComp, *merged.points, *staged);
+    transferComponentProperties(sFaceVertexComp, *merged.corners, *staged);
+    transferComponentProperties(sFaceComp, *merged.faces, *staged);
+    bool const hasCorners = finishConnectivity(merged.faceVertex, *offsets.corners, *staged);
+    bool const hasFaces = finishConnectivity(merged.faceOffset, *offsets.faces, *staged);
+    if (hasCorners && hasFaces)
+        copyOtherProperties(plan, *staged);
+    publish(*staged, output);
+    return hasCorners && hasFaces;
 }
 
 }

@@ -1,4 +1,3 @@
-#include <Modeling/copyNonGeoProperties.h>
 #include <Modeling/mergePointClouds.h>
 
 #include "mergeGeoComponent.h"
@@ -19,9 +18,11 @@ bool mergePointClouds(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& ou
     if (plan.inputs.empty() || !pointOffsets)
         return false;
 
-    populatePointCloud(output);
-    mergeGeoComponent(plan, sPointComp, *pointOffsets, nullptr, output);
-    copyNonGeoProperties(plan.inputs, output);
+    Orvan::MutablePtr<Object> const staged = stagedCopy(output);
+    populatePointCloud(*staged);
+    mergeGeoComponent(plan, sPointComp, *pointOffsets, nullptr, *staged);
+    copyOtherProperties(plan, *staged);
+    publish(*staged, output);
     return true;
 }
 

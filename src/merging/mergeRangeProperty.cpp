@@ -27,7 +27,7 @@ namespace {
     {
         Orvan::Ptr<IndexArray> indices = getRangeGeoPropIndices(*plan.inputs[input], rangeName);
         bool const hasDependents = std::any_of(plan.properties[input].data.begin(), plan.properties[input].data.end(),
-            [&](GeoProperty const& data) { return data.target == rangeName; });
+            [&](GeoProperty const& data) { return data.owner == rangeName; });
         return hasDependents ? indices : nullptr;
     }
 

@@ -1,4 +1,3 @@
-#include <Modeling/copyNonGeoProperties.h>
 #include <Modeling/mergeStrands.h>
 
 #include "MergedComponents.h"
@@ -26,6 +25,7 @@ bool mergeStrands(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output
     Connectivity connectivity{sStrandOffset, *pointOffsets, (*pointOffsets)[plan.inputs.size], nullptr};
     Orvan::MutablePtr<Object> const points = createObject();
     Orvan::MutablePtr<Object> const strands = createObject();
+    Orvan::MutablePtr<Object> const staged = stagedCopy(output);
     runTasks(
         [&] {
             populateStrand(*points);
@@ -35,15 +35,16 @@ bool mergeStrands(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output
             populateStrand(*strands);
             mergeGeoComponent(plan, sStrandComp, *strandOffsets, &connectivity, *strands);
         },
-        [&] { populateStrand(output); });
+        [&] { populateStrand(*staged); });
 
     // Whether the tasks were run is not looked at, unlike with meshes: without them there are no strand offsets.
-    transferComponentProperties(sPointComp, *points, output);
-    transferComponentProperties(sStrandComp, *strands, output);
-    if (!finishConnectivity(connectivity, *strandOffsets, output))
-        return false;
-    copyNonGeoProperties(plan.inputs, output);
-    return true;
+    transferComponentProperties(sPointComp, *points, *staged);
+    transferComponentProperties(sStrandComp, *strands, *staged);
+    bool const hasStrands = finishConnectivity(connectivity, *strandOffsets, *staged);
+    if (hasStrands)
+        copyOtherProperties(plan, *staged);
+    publish(*staged, output);
+    return hasStrands;
 }
 
 }

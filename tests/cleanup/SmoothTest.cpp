@@ -240,6 +240,12 @@ TEST(Smooth, obeysWeightsAndKeepsToItsOddities)
     Weights const none(std::vector<float>(count + 1, 0.0f));
     EXPECT_TRUE(std::isnan(smoothed(isolated, 0.1f, none).back().x)) << "a point of no face goes, whatever its weight";
     EXPECT_TRUE(smoothed(PolygonMesh(), 1).empty());
+
+    PolygonMesh late = square; // its faces begin behind some corners that belong to none
+    late.faceVertex.insert(late.faceVertex.begin(), {3, 3, 4000000000u});
+    for (unsigned int& offset : late.faceOffset)
+        offset += 3;
+    EXPECT_TRUE(sameBits(smoothed(late, 2), smoothed(square, 2)));
 }
 
 TEST(Smooth, tellsEachStepToTheLogger)

@@ -10,6 +10,11 @@ namespace Tessara::Geometry::Internal {
 
 inline constexpr char const* sElementCount = "sElementCount"; // unsigned int, in component geo properties
 
+// The prototypes without a reference each: of those, all threads would write the one count.
+Object const& dataPrototype();
+Object const& rangePrototype();
+Object const& componentPrototype();
+
 /// The value that an object holds under a key, if it is of type `T`.
 template <class T> std::optional<T> valueOf(Object const& object, Orvan::String const& key)
 {

@@ -24,8 +24,8 @@ namespace {
     /// Whether it belongs to a target: data and ranges do.
     bool hasTarget(Object const& geoProperty)
     {
-        return Object::isA(geoProperty, *getDataGeoPropPrototype(sGenericDataGeoProp))
-            || Object::isA(geoProperty, *getRangeGeoPropPrototype());
+        return Object::isA(geoProperty, Internal::dataPrototype())
+            || Object::isA(geoProperty, Internal::rangePrototype());
     }
 
     Orvan::Ptr<Object> geoPropertyOf(Object const& object, Orvan::String const& name, Object const& prototype)
@@ -76,28 +76,28 @@ Orvan::String getGeoPropTargetName(Object const& object, Orvan::String const& na
 
 Orvan::String getTargetComponent(Object const& object, Orvan::String const& name)
 {
-    Orvan::Ptr<Object> const component = getComponentGeoPropPrototype();
-    Orvan::Ptr<Object> const range = getRangeGeoPropPrototype();
+    Orvan::String target = getGeoPropTargetName(object, name);
+    if (geoPropertyOf(object, target, Internal::componentPrototype()))
+        return target; // mostly
     // A chain without a loop is no longer than the object has keys.
-    std::uint64_t steps = object.keys()->size;
-    for (Orvan::String target = getGeoPropTargetName(object, name); steps != 0; --steps) {
-        if (geoPropertyOf(object, target, *component))
-            return target;
-        if (!geoPropertyOf(object, target, *range))
+    for (std::uint64_t steps = object.keys()->size; steps != 0; --steps) {
+        if (!geoPropertyOf(object, target, Internal::rangePrototype()))
             break;
         target = getGeoPropTargetName(object, target);
+        if (geoPropertyOf(object, target, Internal::componentPrototype()))
+            return target;
     }
     return {};
 }
 
 Orvan::Ptr<Object> getDataGeoProperty(Object const& object, Orvan::String const& name)
 {
-    return geoPropertyOf(object, name, *getDataGeoPropPrototype(sGenericDataGeoProp));
+    return geoPropertyOf(object, name, Internal::dataPrototype());
 }
 
 Orvan::Ptr<Object> getRangeGeoProperty(Object const& object, Orvan::String const& name)
 {
-    return geoPropertyOf(object, name, *getRangeGeoPropPrototype());
+    return geoPropertyOf(object, name, Internal::rangePrototype());
 }
 
 Orvan::Ptr<Orvan::Array<unsigned int>> getRangeGeoPropIndices(Object const& range)

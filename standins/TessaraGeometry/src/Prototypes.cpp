@@ -40,6 +40,24 @@ namespace {
         return prototype;
     }
 
+    Orvan::Ptr<Object> const& sharedComponentPrototype()
+    {
+        static Orvan::Ptr<Object> const prototype = makeComponentPrototype();
+        return prototype;
+    }
+
+    Orvan::Ptr<Object> const& sharedRangePrototype()
+    {
+        static Orvan::Ptr<Object> const prototype = makeRangePrototype();
+        return prototype;
+    }
+
+    Orvan::Ptr<Object> const& sharedDataPrototype()
+    {
+        static Orvan::Ptr<Object> const prototype = makeDataPrototype();
+        return prototype;
+    }
+
     Orvan::Ptr<Object> makeGeometryPrototype(std::initializer_list<char const*> components,
         std::initializer_list<char const*> data, std::initializer_list<Orvan::String> excluded)
     {
@@ -78,20 +96,32 @@ Orvan::Ptr<Object> getStrandPrototype()
 
 Orvan::Ptr<Object> getComponentGeoPropPrototype()
 {
-    static Orvan::Ptr<Object> const prototype = makeComponentPrototype();
-    return prototype;
+    return sharedComponentPrototype();
 }
 
 Orvan::Ptr<Object> getRangeGeoPropPrototype()
 {
-    static Orvan::Ptr<Object> const prototype = makeRangePrototype();
-    return prototype;
+    return sharedRangePrototype();
 }
 
 Orvan::Ptr<Object> getDataGeoPropPrototype(Orvan::String const& name)
 {
-    static Orvan::Ptr<Object> const prototype = makeDataPrototype();
-    return name == sGenericDataGeoProp ? prototype : nullptr;
+    return name == sGenericDataGeoProp ? sharedDataPrototype() : nullptr;
+}
+
+Object const& Internal::dataPrototype()
+{
+    return *sharedDataPrototype();
+}
+
+Object const& Internal::rangePrototype()
+{
+    return *sharedRangePrototype();
+}
+
+Object const& Internal::componentPrototype()
+{
+    return *sharedComponentPrototype();
 }
 
 }

@@ -42,7 +42,7 @@ namespace {
     Status checkComponent(Object const& object, char const* name)
     {
         Orvan::Ptr<Object> const component = Internal::objectAt(object, name);
-        if (component && Object::isA(*component, *getComponentGeoPropPrototype()))
+        if (component && Object::isA(*component, Internal::componentPrototype()))
             return {};
         return failure("the component " + std::string(name) + " is missing");
     }
@@ -135,7 +135,7 @@ Status PointCloudValidator::validate(Object const& pointCloud)
     unsigned int const pointCount = getElementCount(pointCloud, sPointComp);
     return firstFailure([&] { return checkComponent(pointCloud, sPointComp); },
         [&] {
-            auto const components = getGeoPropNamesByPrototype(pointCloud, *getComponentGeoPropPrototype());
+            auto const components = getGeoPropNamesByPrototype(pointCloud, Internal::componentPrototype());
             auto const other =
                 std::find_if(components.begin(), components.end(), [](auto const& name) { return name != sPointComp; });
             return other == components.end()

@@ -119,12 +119,12 @@ void Object::setProperty(Orvan::String const& key, PropertyValue&& value)
 
 bool Object::isA(Object const& object, Object const& prototype)
 {
-    Orvan::Ptr<Orvan::Array<Orvan::String>> const wantedKeys = prototype.keys();
-    return std::all_of(wantedKeys->begin(), wantedKeys->end(), [&](Orvan::String const& key) {
-        PropertyValue const wanted = prototype.getProperty(key);
-        if (key == kExcludedKeys)
-            return lacksAll(object, wanted);
-        return object.hasProperty(key) && valueConforms(object.getProperty(key), wanted);
+    // Values are looked at in place: a copy of a `Ptr` would have all threads write the count of one shared prototype.
+    return std::all_of(prototype.entries_.begin(), prototype.entries_.end(), [&](Entry const& wanted) {
+        if (wanted.key == kExcludedKeys)
+            return lacksAll(object, wanted.value);
+        Entry const* const entry = object.find(wanted.key);
+        return entry && valueConforms(entry->value, wanted.value);
     });
 }
 
