@@ -32,10 +32,11 @@ struct HalfEdge {
 /// edge in the same direction, the one with the lowest number stays (within a face the lowest corner), and the others are
 /// left out without a report: nothing here checks that a mesh is manifold.
 ///
-/// Any number of threads may read one structure. Building takes linear time whatever the numbering of the points (and
-/// sorts the edges at each point), on all threads and with the same result for any number of them. Looking an edge up
+/// Any number of threads may read one structure. Building takes linear time whatever the numbering of the points, but for
+/// sorting the edges at each point, on all threads and with the same result for any number of them. Looking an edge up
 /// takes a few steps, at points of high valence a bisection. Takes 8 bytes a corner and 4 a point, and 8 more a corner
-/// where not all faces are triangles; while it is built, 2 more a corner.
+/// where not all faces are triangles; while it is built, up to 8 more a corner at points of high valence, and where
+/// edges repeat.
 class HalfEdgeDataStructure {
 public:
     struct Neighbour {
@@ -72,7 +73,7 @@ public:
     /// The directed edges that end at the point, ascending by the points they come from.
     Neighbours neighbours(unsigned int point) const;
 
-    /// Leaves no points and no edges.
+    /// Leaves no points and no edges: nothing may be asked about a point then.
     MODELING_EXPORT void clear() noexcept;
     MODELING_EXPORT void swap(HalfEdgeDataStructure& other) noexcept;
 

@@ -33,11 +33,12 @@ namespace Tessara::GeometryAlgorithms {
 ///                   length, or there is no such component. False, without rollback: data that targets a range of the
 ///                   component has an element type beyond the forty, or no array, or the range has null or empty
 ///                   `sIndices` but data, or a data property follows one that has elements. The count and the properties
-///                   in front of that range, in the order of the object's keys, are done then.
+///                   in front of that range, in the order of the object's keys, are done then; and so is the data of
+///                   that range in front of what was refused, while its entries keep their old numbers.
 /// \throws           std::bad_alloc, with the object as it was. Job cancellation is not looked at.
 ///
-/// Linear in the elements. Arrays of plain values are compacted at the same time, each on one thread, into memory of
-/// the final size; texts and places one after the other. Takes 4 bytes for each element that stays, and up to 9 for each
+/// Linear in the elements. Arrays that somebody else holds are compacted side by side, each on one thread, into memory
+/// of the final size; the others in place, one after the other. Takes 4 bytes for each element that stays, and up to 9 for each
 /// value of a range's data.
 MODELING_EXPORT bool deleteComponents(
     Orvan::Array<unsigned int> const& remap, Orvan::String const& component, Tessara::Object& object);

@@ -35,8 +35,8 @@ MODELING_EXPORT bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned
 /// arrays and the point data of `object` describe the refined mesh, and `halfEdges` the mesh before it. Neither the
 /// standard properties of `object` nor its counts are touched.
 /// \throws std::runtime_error  when the job is cancelled, with changed `faceStates` and nothing else changed
-/// \throws std::bad_alloc      also when a count no longer fits 32 bits. The counts and the arrays of faces then describe
-///                             the mesh before the pass; those of points and the data of `object` may be longer.
+/// \throws std::bad_alloc      also when a count no longer fits 32 bits. The counts, `faceVertex` and `faceOffset` then
+///                             describe the mesh before the pass; `faceStates` may have changed, those of points and the data of `object` may be longer.
 MODELING_EXPORT void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& halfEdges,
     unsigned int& numPoints, unsigned int& numFaceVertices, unsigned int& numFaces,
     Orvan::Array<Tessara::Math::float3>& basePositions, Orvan::Array<Tessara::Math::float3>& limitPositions,

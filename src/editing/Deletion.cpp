@@ -9,6 +9,8 @@
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Prototypes.h>
 
+#include <algorithm>
+
 namespace Tessara::GeometryAlgorithms::Internal {
 
 using namespace Modeling;

@@ -4,11 +4,13 @@
 
 #include <tbb/parallel_reduce.h>
 
+#include <algorithm>
 #include <atomic>
 #include <bit>
 #include <functional>
 #include <limits>
 #include <new>
+#include <utility>
 #include <vector>
 
 namespace Geometry::Mesh {

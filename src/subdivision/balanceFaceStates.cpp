@@ -10,6 +10,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <limits>
 
 namespace Geometry::Mesh::Internal {
 
@@ -26,7 +27,7 @@ namespace {
     {
         unsigned int const level = levelOf(state);
         unsigned int marked = isMarked(state), split = isSplit(state);
-        unsigned int lowestLevel = kInvalidIndex;
+        unsigned int lowestLevel = std::numeric_limits<unsigned int>::max(); // above any level
         for (unsigned int const neighbour : across) {
             if (neighbour == kInvalidIndex)
                 continue;

@@ -1,7 +1,5 @@
 #include <Modeling/subdivisionSteps.h>
 
-#include "faceStates.h"
-
 #include "frame/ParallelFor.h"
 
 #include <cmath>

@@ -27,6 +27,9 @@ namespace {
 
     /// Of the floating point types of the host, those of doubles are aligned for them.
     template <class T> using ScalarOf = std::conditional_t<alignof(T) == alignof(double), double, float>;
+    template <class... T> constexpr std::size_t kDoubles = (std::size_t{std::is_same_v<ScalarOf<T>, double>} + ...);
+    static_assert(kDoubles<Tessara::Math::double2, Tessara::Math::double3, Tessara::Math::double4, double> == 4
+        && kDoubles<Tessara::Math::float2, Tessara::Math::float3, Tessara::Math::float4, Tessara::Math::float4x4> == 0);
     template <class T> using ScalarsOf = std::array<ScalarOf<T>, sizeof(T) / sizeof(ScalarOf<T>)>;
 
     constexpr float thirdOf(float sum)

@@ -185,6 +185,11 @@ void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& hal
     unsigned int const newCorners =
         sumOfCounts(numbering.keptCornerCount(), std::uint64_t{3} * numbering.emittedCount());
 
+    if (newPoints == numPoints && newFaces == numFaces && newCorners == faceVertex.size) {
+        transferPointProperties(faces, newPoints, object); // drops what cannot be refined
+        return; // nothing splits, and the arrays are what they are
+    }
+
     // All memory of the standard arrays is there before data of the object changes.
     FaceArrays refined = FaceArrays::ofSize(newFaces, newCorners);
     basePositions.resize(newPoints, Orvan::kUninitialized);
