@@ -88,8 +88,8 @@ inline bool pointInTriangle(Math::float2 const& p, Math::float2 const& a, Math::
     double const areaC = sign * Internal::doubledArea(p, a, b);
     // The signs are as good as random to a branch predictor, so that the first three tests go without a branch.
     bool const notOutside = (areaA >= 0.0) & (areaB >= 0.0) & (areaC >= 0.0);
-    bool const inside = notOutside && hasInside && p != a && p != b && p != c
-        && Internal::isBetween(p.x, a.x, b.x, c.x) && Internal::isBetween(p.y, a.y, b.y, c.y);
+    bool const inside = notOutside && hasInside && p != a && p != b && p != c && Internal::isBetween(p.x, a.x, b.x, c.x)
+        && Internal::isBetween(p.y, a.y, b.y, c.y);
 
     u = hasInside ? static_cast<float>(areaA / whole) : 0.0f;
     v = hasInside ? static_cast<float>(areaB / whole) : 0.0f;
