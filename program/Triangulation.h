@@ -7,8 +7,8 @@
 
 namespace ModelingProgram {
 
-/// The mesh in units in which it is about a million long: the library cuts no face below 5e-5 square units well. They are
-/// a power of two of its own, so that nothing rounds.
+/// The mesh in units in which it is about a million long: the library cuts no face below 5e-5 square units well. They
+/// are a power of two of its own, so that nothing rounds.
 Tessara::Object inFineUnits(Tessara::Object const& mesh);
 
 /// The mesh with its faces cut into triangles as those of `measured` are, which differs by its unit only. The channels
@@ -26,7 +26,8 @@ struct CutFaces {
 };
 
 /// Compares triangles with the polygons that they were cut from: areas in the plane of each polygon, in double
-/// precision. The kinds are numbers of corners; those that do not occur are left out. The firsts are faces of `polygons`.
+/// precision. The kinds are numbers of corners; those that do not occur are left out. The firsts are faces of
+/// `polygons`.
 /// \pre  `triangles` is what triangulating `polygons` gave; its positions are not looked at
 std::vector<CutFaces> checkTriangulation(MeshArrays const& polygons, MeshArrays const& triangles);
 

@@ -8,8 +8,8 @@
 
 namespace Benchmarks {
 
-/// VTK's filter that appends polygonal data, with all arrays of points and faces. Corners have no arrays there: the texture
-/// coordinates of meshes are not among them.
+/// VTK's filter that appends polygonal data, with all arrays of points and faces. Corners have no arrays there: the
+/// texture coordinates of meshes are not among them.
 class VtkAppend {
 public:
     explicit VtkAppend(Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs);

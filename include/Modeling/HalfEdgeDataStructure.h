@@ -24,19 +24,19 @@ struct HalfEdge {
 /// The adjacency of a mesh: for each point the directed edges that end there, found by the point they come from.
 ///
 /// The mesh itself stays in its flat arrays. The face across the edge from a to b of some face is the one that passes
-/// from b to a: `halfEdge(a, b)`, whose `corner` holds a and, in a triangle, is followed by the corner opposite the edge.
-/// On a closed manifold the points from which edges come are the neighbours of a point, and the faces of these edges the
-/// faces around it, each once.
+/// from b to a: `halfEdge(a, b)`, whose `corner` holds a and, in a triangle, is followed by the corner opposite the
+/// edge. On a closed manifold the points from which edges come are the neighbours of a point, and the faces of these
+/// edges the faces around it, each once.
 ///
 /// Faces may have any number of corners, though `corner` and `faceSize` are cut to 8 bits. Where several faces pass an
-/// edge in the same direction, the one with the lowest number stays (within a face the lowest corner), and the others are
-/// left out without a report: nothing here checks that a mesh is manifold.
+/// edge in the same direction, the one with the lowest number stays (within a face the lowest corner), and the others
+/// are left out without a report: nothing here checks that a mesh is manifold.
 ///
-/// Any number of threads may read one structure. Building takes linear time whatever the numbering of the points, but for
-/// sorting the edges at each point, on all threads and with the same result for any number of them. Looking an edge up
-/// takes a few steps, at points of high valence a bisection. Takes 8 bytes a corner and 4 a point, and 8 more a corner
-/// where not all faces are triangles; while it is built, up to 8 more a corner at points of high valence, and where
-/// edges repeat.
+/// Any number of threads may read one structure. Building takes linear time whatever the numbering of the points, but
+/// for sorting the edges at each point, on all threads and with the same result for any number of them. Looking an edge
+/// up takes a few steps, at points of high valence a bisection. Takes 8 bytes a corner and 4 a point, and 8 more a
+/// corner where not all faces are triangles; while it is built, up to 8 more a corner at points of high valence, and
+/// where edges repeat.
 class HalfEdgeDataStructure {
 public:
     struct Neighbour {
@@ -85,8 +85,8 @@ public:
 private:
     static constexpr std::ptrdiff_t kShortList = 24; // up to here looking at all is faster than a bisection
 
-    // An entry is the point that the edge comes from above the corner at which it ends: entries in ascending order are in
-    // the order of the points, and equal ones in the order of the faces.
+    // An entry is the point that the edge comes from above the corner at which it ends: entries in ascending order are
+    // in the order of the points, and equal ones in the order of the faces.
     static unsigned int startOf(std::uint64_t entry) { return static_cast<unsigned int>(entry >> 32); }
     static unsigned int cornerOf(std::uint64_t entry) { return static_cast<unsigned int>(entry); }
 

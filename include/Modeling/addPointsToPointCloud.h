@@ -23,9 +23,9 @@ namespace Tessara::GeometryAlgorithms {
 ///                   true for the new ones. What the object had under that name is replaced. Empty for no tag.
 /// \param object     A point cloud. Other holders of its properties and arrays see no change.
 /// \param services   Without effect; may be null.
-/// \return           False, with the object unchanged: it is no point cloud, it has further components, it has no float3
-///                   array of positions for its points, or the new count exceeds 32 bits. False, after all of the above
-///                   is done: the tag was named `sPointPosition`, and has replaced the positions.
+/// \return           False, with the object unchanged: it is no point cloud, it has further components, it has no
+///                   float3 array of positions for its points, or the new count exceeds 32 bits. False, after all of
+///                   the above is done: the tag was named `sPointPosition`, and has replaced the positions.
 /// \throws           std::bad_alloc, with the object as it was. Job cancellation is not looked at.
 ///
 /// Linear in the new number of points, in parallel. Each array is copied once, into memory with the capacity that

@@ -11,8 +11,8 @@ namespace Tessara::GeometryAlgorithms {
 ///
 /// \param deleted  One entry a face; true means that the face goes. May be an array of the mesh.
 /// \param mesh     Faces with any number of corners. The counts of `sPointComp`, `sFaceVertexComp` and `sFaceComp`
-///                 change, and everything that targets one of them, as `deleteComponents` says. `sFaceVertex` (one point
-///                 index a corner) and `sFaceOffset` (face count + 1 entries) are renumbered. Other holders of
+///                 change, and everything that targets one of them, as `deleteComponents` says. `sFaceVertex` (one
+///                 point index a corner) and `sFaceOffset` (face count + 1 entries) are renumbered. Other holders of
 ///                 properties and arrays see no change.
 /// \pre            Every face has corners, offsets do not fall, and indices are in range. Otherwise nothing is read or
 ///                 written outside the arrays, but entries may come out as sentinels: the offset of a face without

@@ -15,12 +15,12 @@ namespace Tessara::GeometryAlgorithms {
 ///                  `deleteComponents` says; other holders of properties and arrays see no change.
 /// \param services  Without effect; may be null.
 /// \return          True, also when `indices` is empty or names every point. False, with the object unchanged: it is no
-///                  point cloud, or one without points. False for range properties that `deleteComponents` refuses, with
-///                  what that says has been done.
+///                  point cloud, or one without points. False for range properties that `deleteComponents` refuses,
+///                  with what that says has been done.
 /// \throws          std::bad_alloc, with the object as it was. Job cancellation is not looked at.
 ///
-/// Linear in points and indices. Points are marked in parallel, and arrays compacted as `deleteComponents` says. Takes a
-/// byte a point beside that.
+/// Linear in points and indices. Points are marked in parallel, and arrays compacted as `deleteComponents` says. Takes
+/// a byte a point beside that.
 MODELING_EXPORT bool deletePointsInPointCloud(
     Orvan::Array<unsigned int> const& indices, Tessara::Object& object, Orvan::RuntimeServices const* services);
 MODELING_EXPORT bool deletePointsInPointCloud(

@@ -27,8 +27,8 @@ namespace Tessara::GeometryAlgorithms {
 ///                object may stand in it several times, and the output may be one of them: it counts as what it was
 ///                before the call.
 /// \param output  Receives the merged mesh. Its other keys stay. Where the result is false it is as it was, but: with
-///                all keys erased where an enclosing oneTBB group was cancelled; with the merged mesh, and without what is
-///                no geometry, where the first input has a connectivity array whose default is no `unsigned int`.
+///                all keys erased where an enclosing oneTBB group was cancelled; with the merged mesh, and without what
+///                is no geometry, where the first input has a connectivity array whose default is no `unsigned int`.
 /// \param runtimeServices  Not looked at; may be null.
 /// \return        False where no input is valid, or there would be more than 2^32 - 1 elements of a component.
 /// \throws        std::bad_alloc, also where the data of a range does not fit 32 bits, with the output as it was. Job

@@ -7,7 +7,8 @@
 
 namespace Geometry::Mesh {
 
-/// Relaxes the points of a polygon mesh within its surface: noise along the surface and uneven edges go, the shape stays.
+/// Relaxes the points of a polygon mesh within its surface: noise along the surface and uneven edges go, the shape
+/// stays.
 ///
 /// `amount` is cut into steps of at most 0.9. In a step of the increment i every point moves by i times the way to a
 /// target, without the part of it along the point's normal. The target is the mean of the centroids of the triangles
@@ -21,20 +22,20 @@ namespace Geometry::Mesh {
 /// \param amount       Without unit; at 0 and below, and where it is not a number, nothing moves.
 /// \param pointCount, faceCount  Of the mesh.
 /// \param faceVertex   One point index a corner.
-/// \param faceOffset   Face count + 1 entries: where the corners of a face begin, and as last entry where all end. Faces of
-///                     two corners count as flat, those of none not at all.
+/// \param faceOffset   Face count + 1 entries: where the corners of a face begin, and as last entry where all end.
+///                     Faces of two corners count as flat, those of none not at all.
 /// \param weights      One a point, by which its moves are scaled; below 0 counts as 0, above 1 as 1. Null: 1 for all.
 ///                     At 0 a point stays where it is.
 /// \param positions    One a point; read and changed in place.
 /// \pre                Arrays that fit the counts, offsets that ascend within the corners, point indices in range:
-///                     undefined otherwise. Corners in front of the first face or behind the last count for nothing. Every point is of a face: others become not-a-number in the first step,
-///                     whatever their weight.
+///                     undefined otherwise. Corners in front of the first face or behind the last count for nothing.
+///                     Every point is of a face: others become not-a-number in the first step, whatever their weight.
 /// \throws             std::bad_alloc, with the positions as they were; what the logger throws, after whole steps. Job
 ///                     cancellation is not looked at.
 ///
-/// Runs in parallel over faces and points; sums are taken by ascending faces, so the result is the same for any number of
-/// threads. Linear in the corners for each step (where a face visits a point m times: m times its corners). Takes about 32
-/// bytes a point, 8 a corner (12 at first) and 24 a face, and nothing more with further steps.
+/// Runs in parallel over faces and points; sums are taken by ascending faces, so the result is the same for any number
+/// of threads. Linear in the corners for each step (where a face visits a point m times: m times its corners). Takes
+/// about 32 bytes a point, 8 a corner (12 at first) and 24 a face, and nothing more with further steps.
 template <class Logger> void smooth(float amount, unsigned int pointCount, unsigned int faceCount,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<float> const* weights, Orvan::Array<Tessara::Math::float3>& positions, Logger const& logger);

@@ -13,15 +13,15 @@
 /// `vertexLevels` one a point; both are 0 in the coarse mesh. Of a state
 /// - bit 0 is set while refinement is asked for and has not come yet,
 /// - bit 1 says that the pass at hand removes the face,
-/// - bits 2 to 7 are the level, two to a step. A face of an odd level is a third of a split face whose outer edge has not
-///   turned over yet, because the face behind that edge has not split.
+/// - bits 2 to 7 are the level, two to a step. A face of an odd level is a third of a split face whose outer edge has
+///   not turned over yet, because the face behind that edge has not split.
 /// A point's level is the step at which it was made.
 ///
 /// Nothing is checked: arrays that do not fit together are undefined. Results are the same for any number of threads.
 namespace Geometry::Mesh::Internal {
 
-/// Sets the marks of faces that do not fit into twice `tolerance` along every axis, and clears none. Sets none where the
-/// tolerance is not above 1.1920929e-7. Coordinates that are no numbers count as no distance.
+/// Sets the marks of faces that do not fit into twice `tolerance` along every axis, and clears none. Sets none where
+/// the tolerance is not above 1.1920929e-7. Coordinates that are no numbers count as no distance.
 MODELING_EXPORT void markForSubdivision(float tolerance, unsigned int numFaces,
     Orvan::Array<Tessara::Math::float3> const& positions, Orvan::Array<unsigned int> const& faceVertex,
     Orvan::Array<unsigned int> const& faceOffset, Orvan::Array<bool>& marks);
@@ -31,19 +31,21 @@ MODELING_EXPORT bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<unsigned char> const& faceStates);
 
-/// One pass: settles across neighbours which faces split, replaces these, and adds their points. On return the counts, the
-/// arrays and the point data of `object` describe the refined mesh, and `halfEdges` the mesh before it. Neither the
+/// One pass: settles across neighbours which faces split, replaces these, and adds their points. On return the counts,
+/// the arrays and the point data of `object` describe the refined mesh, and `halfEdges` the mesh before it. Neither the
 /// standard properties of `object` nor its counts are touched.
 /// \throws std::runtime_error  when the job is cancelled, with changed `faceStates` and nothing else changed
 /// \throws std::bad_alloc      also when a count no longer fits 32 bits. The counts, `faceVertex` and `faceOffset` then
-///                             describe the mesh before the pass; `faceStates` may have changed, those of points and the data of `object` may be longer.
+///                             describe the mesh before the pass; `faceStates` may have changed, those of points and
+///                             the data of `object` may be longer.
 MODELING_EXPORT void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& halfEdges,
     unsigned int& numPoints, unsigned int& numFaceVertices, unsigned int& numFaces,
     Orvan::Array<Tessara::Math::float3>& basePositions, Orvan::Array<Tessara::Math::float3>& limitPositions,
     Orvan::Array<unsigned char>& vertexLevels, Orvan::Array<unsigned int>& faceVertex,
     Orvan::Array<unsigned int>& faceOffset, Orvan::Array<unsigned char>& faceStates, Tessara::Object& object);
 
-/// Where the points of the coarse mesh go on the limit surface. Resizes `limitPositions`. NaN for a point without a face.
+/// Where the points of the coarse mesh go on the limit surface. Resizes `limitPositions`. NaN for a point without a
+/// face.
 MODELING_EXPORT void computePositionsInfinity(HalfEdgeDataStructure const& halfEdges, unsigned int numPoints,
     Orvan::Array<Tessara::Math::float3> const& positions, Orvan::Array<Tessara::Math::float3>& limitPositions);
 

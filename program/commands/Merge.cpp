@@ -119,7 +119,8 @@ namespace {
         return totals;
     }
 
-    /// What became of a property: the files in which its elements got the default, for want of it or for its type there.
+    /// What became of a property: the files in which its elements got the default, for want of it or for its type
+    /// there.
     struct Outcome {
         Property property; // as merged
         std::vector<std::string> missingIn;

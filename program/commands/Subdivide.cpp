@@ -39,8 +39,8 @@ namespace {
         bool triangulates = false;
     };
 
-    /// A mesh that tells on standard error how many faces it has, whenever a pass has made more. It sees that from data of
-    /// its points, which follows each pass: on a closed mesh a new point brings two faces.
+    /// A mesh that tells on standard error how many faces it has, whenever a pass has made more. It sees that from data
+    /// of its points, which follows each pass: on a closed mesh a new point brings two faces.
     class TellingMesh : public Object {
     public:
         explicit TellingMesh(Object const& mesh)
@@ -119,8 +119,8 @@ namespace {
         float const tolerance =
             options.tolerance ? *options.tolerance : *options.relative * std::hypot(size.x, size.y, size.z);
 
-        // Below, the library refines nothing; and where points are as far from one another as numbers are, all faces stay
-        // large for ever.
+        // Below, the library refines nothing; and where points are as far from one another as numbers are, all faces
+        // stay large for ever.
         constexpr float kFinest = std::numeric_limits<float>::epsilon();
         float farthest = 0.25f;
         for (float const coordinate : {box.min.x, box.min.y, box.min.z, box.max.x, box.max.y, box.max.z})

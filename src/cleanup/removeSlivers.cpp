@@ -338,8 +338,8 @@ namespace {
         float3 opposite; // from the one to the other
     };
 
-    /// The normal of a face from before the first collapse: the cross product of the directions from its first corner to
-    /// the other two. Its length is the sine of the angle, on purpose.
+    /// The normal of a face from before the first collapse: the cross product of the directions from its first corner
+    /// to the other two. Its length is the sine of the angle, on purpose.
     float3 originalNormal(
         TriangleMesh const& original, CollapsingMesh const& mesh, FanFace const& around, FaceDirections const& now)
     {

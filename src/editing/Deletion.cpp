@@ -38,7 +38,8 @@ namespace {
 
         KeptElements kept{entries.size, uninitializedArray<unsigned int>(keptCount)};
         unsigned int* const source = kept.sources.data;
-        // Without a branch, which would go wrong half of the time: what is written for a deleted element is overwritten.
+        // Without a branch, which would go wrong half of the time: what is written for a deleted element is
+        // overwritten.
         std::uint64_t count = 0;
         for (unsigned int element = 0; count != keptCount; ++element) {
             source[count] = element;

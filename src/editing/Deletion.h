@@ -31,7 +31,8 @@ public:
     void renumber(Orvan::String const& key, IndexArray const& remap);
     void renumberOffsets(Orvan::String const& key, KeptElements const& kept);
 
-    /// Does what has been prepared. Takes no memory with a host that replaces values of present keys without taking any.
+    /// Does what has been prepared. Takes no memory with a host that replaces values of present keys without taking
+    /// any.
     void commit();
 
 private:

@@ -28,8 +28,8 @@ namespace {
         NewValues const& given;
     };
 
-    /// An array of `newCount` elements that begins as `source` does, with nothing behind that yet, and with the capacity
-    /// that a copy of `source` has after growing.
+    /// An array of `newCount` elements that begins as `source` does, with nothing behind that yet, and with the
+    /// capacity that a copy of `source` has after growing.
     template <class T> Orvan::Array<T> grownCopy(Orvan::Array<T> const& source, std::uint64_t newCount)
     {
         std::uint64_t const added = newCount - std::min(source.size, newCount);
@@ -76,8 +76,8 @@ namespace {
         return array;
     }
 
-    /// The value of `sData` for the new count. Empty where the property has no array, or one of a type that is not known
-    /// to be extended: such arrays are lost, on purpose.
+    /// The value of `sData` for the new count. Empty where the property has no array, or one of a type that is not
+    /// known to be extended: such arrays are lost, on purpose.
     PropertyValue extendedData(Orvan::String const& name, Object const& property, Extension const& extension)
     {
         PropertyValue const data = property.getProperty(sData);

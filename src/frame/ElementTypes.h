@@ -51,8 +51,8 @@ struct PlainForm {
 ///
 /// The rule takes `Form::Of<T>&`, deduced: `[&]<class T>(Orvan::Ptr<Orvan::Array<T>>& shared) { ...; return true; }`.
 /// It gets a copy of what is held, so an array is shared with the value while the rule runs, and `makeMutable` copies
-/// it. It may not change `*value` itself. Where `value` is null or empty, or holds no listed type in that form, no rule runs and `result` stays: the
-/// caller sets it to false beforehand, and what no match means differs from site to site.
+/// it. It may not change `*value` itself. Where `value` is null or empty, or holds no listed type in that form, no rule
+/// runs and `result` stays: the caller sets it to false beforehand, and what no match means differs from site to site.
 template <class Form, class Rule, class... T> void forEachElementType(
     ElementTypeList<T...>, Form, Tessara::PropertyValue const* value, bool* result, Rule const& rule)
 {

@@ -24,8 +24,8 @@ inline constexpr unsigned int kFaceGrain = 1; // a whole face, point neighbourho
 /// empty one is none. `body` walks its sub-range upwards and writes only what belongs to the elements at hand.
 ///
 /// \param isolated  True: a cancellation of an enclosing oneTBB group does not reach the loop. False: it does, and
-///                  after the loop the job's cancellation is looked at. Only the balance sweep of subdivision does that; all
-///                  other operations run to their end once started.
+///                  after the loop the job's cancellation is looked at. Only the balance sweep of subdivision does
+///                  that; all other operations run to their end once started.
 /// \throws          std::runtime_error with the text of `TSR::exceptionMessage` when not isolated and the job is
 ///                  cancelled; and what `body` throws, which ends the other sub-ranges as soon as they return.
 template <class Index, class Body>
@@ -42,8 +42,8 @@ void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool 
         throw std::runtime_error(TSR::exceptionMessage.c_str());
 }
 
-/// Runs tasks side by side and waits for all of them, also where one fails or cannot be started. They are left out where an
-/// enclosing oneTBB group has been cancelled: let each leave a mark that it was run.
+/// Runs tasks side by side and waits for all of them, also where one fails or cannot be started. They are left out
+/// where an enclosing oneTBB group has been cancelled: let each leave a mark that it was run.
 template <class... Task> void runTasks(Task const&... tasks)
 {
     tbb::task_group group;

@@ -81,8 +81,8 @@ template <class Validator> MergeInputs filterValid(MergeInputs const& inputs)
 /// a shallow copy stands for it. Null inputs are left out.
 MergeInputs holdInputs(MergeInputs const& inputs, Tessara::Object const& output);
 
-/// Gives an object what the inputs hold beside geometry: of each key the value of the first input that has it, unless the
-/// object has the key. (`copyNonGeoProperties`, for inputs whose properties have been looked up.)
+/// Gives an object what the inputs hold beside geometry: of each key the value of the first input that has it, unless
+/// the object has the key. (`copyNonGeoProperties`, for inputs whose properties have been looked up.)
 void copyOtherProperties(MergePlan const& plan, Tessara::Object& object);
 
 /// A shallow copy to build a result in, and the way back: the output gets all that has changed, or, where memory runs

@@ -5,7 +5,8 @@
 
 namespace Modeling::Internal {
 
-/// Moves a component with all that belongs to it, directly or through ranges, to the output. Everything else in the source is dropped.
+/// Moves a component with all that belongs to it, directly or through ranges, to the output. Everything else in the
+/// source is dropped.
 void transferComponentProperties(Orvan::String const& component, Tessara::Object& source, Tessara::Object& output);
 
 /// Raises the values of each region by its base: region i is the part of `values` from entry i up to entry i + 1 of

@@ -18,7 +18,8 @@ void copyRaised(unsigned int const* source, std::size_t count, unsigned int base
 
 /// Builds the merged array of one data property: its element type is that of the default of `entry.property`. An input
 /// gives its array of that name, whatever it targets: cut off where it is too long, filled up with the default where it
-/// is too short, missing or of another type. Leaves `entry.mergedData` empty where there is no default of a listed type.
+/// is too short, missing or of another type. Leaves `entry.mergedData` empty where there is no default of a listed
+/// type.
 /// \param offsets       where each input's values begin, and as last entry how many there are
 /// \param connectivity  where the property is to be raised; or null
 void mergeDataProperty(

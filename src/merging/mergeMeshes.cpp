@@ -43,7 +43,8 @@ namespace {
         std::array<std::atomic<bool>, 3> isDone{};
     };
 
-    /// Merges the components side by side. Corners and faces then mean places among the points and corners of all inputs.
+    /// Merges the components side by side. Corners and faces then mean places among the points and corners of all
+    /// inputs.
     void mergeComponents(MergePlan const& plan, MeshOffsets const& offsets, MergedMesh& merged, Object& output)
     {
         runTasks(

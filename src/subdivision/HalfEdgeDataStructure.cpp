@@ -42,9 +42,9 @@ namespace {
         return found.load(std::memory_order_relaxed);
     }
 
-    /// What the loops over all faces are cut into, and the points. Directed edges first go to the bucket of the point at
-    /// which they end, in the order of their corners, and then within the bucket to the point: so each step writes to few
-    /// places at a time, however the points are numbered.
+    /// What the loops over all faces are cut into, and the points. Directed edges first go to the bucket of the point
+    /// at which they end, in the order of their corners, and then within the bucket to the point: so each step writes
+    /// to few places at a time, however the points are numbered.
     struct Layout {
         unsigned int bucketBits; // a bucket is that many low bits of a point's number
         std::size_t bucketCount;
@@ -53,7 +53,8 @@ namespace {
 
         Layout(unsigned int pointCount, unsigned int faceCount)
         {
-            // A bucket and its copy fit the cache of a core; small meshes get some buckets too, for all threads to work.
+            // A bucket and its copy fit the cache of a core; small meshes get some buckets too, for all threads to
+            // work.
             bucketBits = std::clamp(static_cast<unsigned int>(std::bit_width(pointCount / 16)), 7u, 13u);
             bucketCount = (std::size_t{pointCount} + (std::size_t{1} << bucketBits) - 1) >> bucketBits;
             facesPerBlock = std::max<std::size_t>(std::size_t{1} << 14, faceCount / 64 + 1);
@@ -61,8 +62,8 @@ namespace {
         }
     };
 
-    /// Calls `visit(start, end, corner)` for the directed edges of a block of faces, each with the corner at its end, in
-    /// the order of these corners.
+    /// Calls `visit(start, end, corner)` for the directed edges of a block of faces, each with the corner at its end,
+    /// in the order of these corners.
     template <class Visit>
     void forEachEdge(Faces const& faces, Layout const& layout, std::size_t block, Visit const& visit)
     {
@@ -95,8 +96,8 @@ namespace {
         });
     }
 
-    /// Where each block writes its first edge of each bucket: a row a block. The row behind the last is where the buckets
-    /// begin, with the number of edges behind it.
+    /// Where each block writes its first edge of each bucket: a row a block. The row behind the last is where the
+    /// buckets begin, with the number of edges behind it.
     std::vector<std::size_t> findBlockStarts(Faces const& faces, Layout const& layout)
     {
         std::size_t const width = layout.bucketCount + 1;

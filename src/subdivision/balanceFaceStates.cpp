@@ -58,12 +58,12 @@ namespace {
         TSR::Canceller::cancelID(place);
     }
 
-    /// The sweeps of one pass. A sweep works only on faces at which something may change, and looks up what is across the
-    /// edges of these alone: mostly a pass has to do with few of the faces.
+    /// The sweeps of one pass. A sweep works only on faces at which something may change, and looks up what is across
+    /// the edges of these alone: mostly a pass has to do with few of the faces.
     class Balance {
     public:
-        /// \param areMutual  whether the neighbours of a face are those whose neighbour it is. Otherwise a face cannot tell
-        ///                   whom it concerns when its state changes, and all are looked at in each sweep.
+        /// \param areMutual  whether the neighbours of a face are those whose neighbour it is. Otherwise a face cannot
+        ///                   tell whom it concerns when its state changes, and all are looked at in each sweep.
         Balance(HalfEdgeDataStructure const& halfEdges, bool areMutual, unsigned int faceCount,
             unsigned int const* faceVertex, unsigned int const* faceOffset, unsigned char* states)
             : halfEdges_(halfEdges)

@@ -10,8 +10,8 @@ namespace Geometry::Mesh::Internal {
 /// floating point numbers, vectors or matrices. With each property go those that target it.
 void stripSubdivisionProperties(Tessara::Object& object);
 
-/// Extends the data of points, other than positions, to `numPoints` values: at a new point the mean of the corners of its
-/// face.
+/// Extends the data of points, other than positions, to `numPoints` values: at a new point the mean of the corners of
+/// its face.
 void transferPointProperties(SettledFaces const& faces, unsigned int numPoints, Tessara::Object& object);
 
 }

@@ -36,8 +36,8 @@ namespace Internal {
             return std::cos(6.2831855f / valence);
         }
 
-        /// λ raised to a number of steps. A point that is younger than the step asked for has a negative number of them,
-        /// which has wrapped around: λ is below 1/2, so that the power is 0, and the point is at its limit.
+        /// λ raised to a number of steps. A point that is younger than the step asked for has a negative number of
+        /// them, which has wrapped around: λ is below 1/2, so that the power is 0, and the point is at its limit.
         float remainingWeight(std::uint64_t valence, unsigned int steps)
         {
             constexpr unsigned int kWrapped = 1u << 31;
@@ -79,8 +79,8 @@ namespace Internal {
             return isSplitAroundPoint(state) && stepOf(state) == step;
         }
 
-        /// The sum of the points that a new point will have around it after its step: the corners of its face, and across
-        /// each edge the middle of the neighbour or, where that is split already, the point across the gate.
+        /// The sum of the points that a new point will have around it after its step: the corners of its face, and
+        /// across each edge the middle of the neighbour or, where that is split already, the point across the gate.
         float3 sumOfFutureNeighbours(SettledFaces const& faces, PointsInTime const& points, unsigned int face)
         {
             unsigned int const step = stepOf(faces.states[face]);
@@ -101,8 +101,8 @@ namespace Internal {
             return sum;
         }
 
-        /// γ for valence 6, which all new points have. Its cosine is the run-time library's, as everywhere else: compilers
-        /// would round it in their own way.
+        /// γ for valence 6, which all new points have. Its cosine is the run-time library's, as everywhere else:
+        /// compilers would round it in their own way.
         float limitWeightOfNewPoint()
         {
             float const volatile sector = 1.0471976f;

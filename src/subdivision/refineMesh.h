@@ -19,7 +19,8 @@ struct MarkableMesh {
 /// Sets the marks of the faces that are to split, and clears none. Called once a pass, on the calling thread.
 using MarkFaces = std::function<void(MarkableMesh const& mesh, Orvan::Array<bool>& marks)>;
 
-/// What all ways of subdividing have in common: passes until one changes no face, as include/Modeling/subdivide.h tells.
+/// What all ways of subdividing have in common: passes until one changes no face, as include/Modeling/subdivide.h
+/// tells.
 bool refineMesh(MarkFaces const& markFaces, Tessara::Object& object);
 
 }

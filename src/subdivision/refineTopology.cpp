@@ -33,8 +33,8 @@ namespace {
         });
     }
 
-    /// Which faces stay, and how many new ones and new points there are: entry f of each array counts what belongs to the
-    /// faces before f, and the last one is the total.
+    /// Which faces stay, and how many new ones and new points there are: entry f of each array counts what belongs to
+    /// the faces before f, and the last one is the total.
     struct Numbering {
         IndexArray newPointOffsets;
         IndexArray keptFaceOffsets;
@@ -47,8 +47,8 @@ namespace {
         unsigned int emittedCount() const { return emittedOffsets[emittedOffsets.size - 1]; }
     };
 
-    /// Calls `emit(a, b, c, level)` for the triangles that replace a face which splits around the point `centre`, in their
-    /// order: `point` gives the new point of a neighbour, and `pointAcross` the point behind its edge k.
+    /// Calls `emit(a, b, c, level)` for the triangles that replace a face which splits around the point `centre`, in
+    /// their order: `point` gives the new point of a neighbour, and `pointAcross` the point behind its edge k.
     template <class Emit> void replaceFace(SettledFaces const& faces, unsigned int face, Emit const& emit)
     {
         unsigned int const level = levelOf(faces.states[face]);

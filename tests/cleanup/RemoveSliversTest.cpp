@@ -378,7 +378,8 @@ TEST(RemoveSlivers, leavesBoundariesAndNonManifoldPlacesInPlace)
         auto const mesh = withoutSlivers(soup, 0.7f);
         EXPECT_TRUE(isValid(*mesh)) << "soup " << run;
         EXPECT_EQ(oddEdges(*mesh), oddEdges(*soup.build())) << "soup " << run;
-        // Where nothing is a number every face is a sliver for this ratio and no face turns over: topology alone decides.
+        // Where nothing is a number every face is a sliver for this ratio and no face turns over: topology alone
+        // decides.
         soup.points.assign(pointCount, float3{kNan, kNan, kNan});
         EXPECT_TRUE(isValid(*withoutSlivers(soup, -2))) << "soup " << run << " without positions";
     }

@@ -29,6 +29,8 @@ namespace {
         PropertyValue merged;
     };
 
+    template <class T, class... Others> constexpr bool kIsOneOf = (std::is_same_v<T, Others> || ...);
+
     std::vector<String> keysOf(Object const& object)
     {
         auto const keys = object.keys();
@@ -54,9 +56,7 @@ namespace {
                     merged.append(values && element < values->size ? (*values)[element] : fallback);
             }
             constexpr bool kIsGeometry =
-                std::is_same_v<T,
-                    Common::
-                        GeometryType> || std::is_same_v<T, Common::GeoLocation> || std::is_same_v<T, Mesh::FaceEdge> || std::is_same_v<T, Transform::GraphTransforms>;
+                kIsOneOf<T, Common::GeometryType, Common::GeoLocation, Mesh::FaceEdge, Transform::GraphTransforms>;
             if (withSlot && !kIsGeometry)
                 merged.append(fallback);
             entry.merged = Orvan::makePtr<Orvan::Array<T>>(std::move(merged));

@@ -144,8 +144,8 @@ TEST_F(Commands, TriangulateKeepsWhatTheChannelsChoose)
     EXPECT_EQ(runForJson("info out.obj")["properties"].size(), 4);
     EXPECT_EQ(runForJson("triangulate quad.obj out.obj --channels '* -uv'")["droppedProperties"], json({"uv"}));
 
-    // A concave face of some thousandths of a unit: too small for the library in its own units, but not for the program. The
-    // other face intersects itself.
+    // A concave face of some thousandths of a unit: too small for the library in its own units, but not for the
+    // program. The other face intersects itself.
     write(folder / "small.obj",
         "v 0.001 0.001 0\nv 0 0.003 0\nv 0 0 0\nv 0.003 0 0\nv 0 0 1\nv 1 1 1\nv 1 0 1\nv 0 2 1\nf 1 2 3 4\nf 5 6 7 "
         "8\n");

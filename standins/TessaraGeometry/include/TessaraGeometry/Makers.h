@@ -11,8 +11,8 @@ namespace Tessara::Geometry {
 // For host programs: whole objects in one call. Arrays are taken over, or made from a span or a list at the call:
 //     makePointCloud({{0, 0, 0}, {1, 0, 0}})
 //     makeMesh(Orvan::Array<float3>(positionSpan), ...)
-// Nothing is checked here but that counts fit 32 bits (std::length_error otherwise): the validators tell whether the arrays
-// fit together.
+// Nothing is checked here but that counts fit 32 bits (std::length_error otherwise): the validators tell whether the
+// arrays fit together.
 
 /// \param faceOffset  face count + 1 entries; an empty array counts as the one entry 0
 TESSARAGEOMETRY_EXPORT Orvan::MutablePtr<Object> makeMesh(

@@ -6,9 +6,9 @@
 namespace Tessara::Geometry {
 
 // Give an object the components (with the count 0) and the standard data properties (with empty arrays; offset arrays
-// with their one entry 0) of its kind, each with `sDefault`. Other keys of the object are left alone. When memory runs out
-// (std::bad_alloc) the object is as it was; so are those of the functions for single geo properties, which replace all
-// properties of the object they are given.
+// with their one entry 0) of its kind, each with `sDefault`. Other keys of the object are left alone. When memory runs
+// out (std::bad_alloc) the object is as it was; so are those of the functions for single geo properties, which replace
+// all properties of the object they are given.
 
 TESSARAGEOMETRY_EXPORT void populateMesh(Object& object);
 TESSARAGEOMETRY_EXPORT void populatePointCloud(Object& object);

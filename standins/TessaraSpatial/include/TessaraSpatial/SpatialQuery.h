@@ -67,8 +67,8 @@ inline PointEdgeOrientation pointEdgeOrientation(Math::float2 const& a, Math::fl
 
 /// Whether p lies in the triangle a, b, c, of either winding, edges included; but a point that equals a corner does
 /// not. Points on an edge that two triangles share are in both of them, and no point falls between the two (where the
-/// signs are exact). Nothing lies in a triangle whose corners are collinear or not all finite, and, however areas round,
-/// no point outside the corners' bounding box does: callers may look at that first.
+/// signs are exact). Nothing lies in a triangle whose corners are collinear or not all finite, and, however areas
+/// round, no point outside the corners' bounding box does: callers may look at that first.
 ///
 /// \param u, v, w  Always written: the barycentric values of p, the weights of a, b and c, also for p outside. They add
 ///                 up to 1 but for rounding. All 0 where nothing can lie in the triangle; without meaning where only p
