@@ -30,6 +30,7 @@ namespace {
     {
         InputProperties properties;
         Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = input.keys();
+        properties.data.reserve(keys->size);
         for (Orvan::String const& key : *keys) {
             if (Orvan::Ptr<Object> data = getDataGeoProperty(input, key)) {
                 Orvan::String target = targetOf(*data);
