@@ -1,0 +1,321 @@
+#include "PlainStitch.h"
+
+#include "support/FailingAllocations.h"
+#include "support/Random.h"
+
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <gtest/gtest.h>
+
+#include <cstring>
+
+using namespace Tessara::Geometry;
+using namespace TestSupport;
+using Tessara::Math::float3;
+using Tessara::Modeling::pair;
+using Tessara::Modeling::StitchTemplate;
+using Points = Orvan::Array<float3>;
+using Indices = Orvan::Array<unsigned int>;
+using Ends = Orvan::Array<pair>;
+
+namespace {
+
+constexpr unsigned int kNoEdge = 0xFFFFFFFF;
+
+template <class T> auto shared(Orvan::Array<T> const& array)
+{
+    return Orvan::makePtr<Orvan::Array<T>>(array);
+}
+
+StitchTemplate filled(Points const& polygon, Points const& positions, Indices const& offsets, bool strict)
+{
+    return {shared(polygon), shared(positions), shared(offsets), strict};
+}
+
+Points square(float side = 1, float z = 0)
+{
+    return {{0, 0, 0}, {side, 0, 0}, {side, side, z}, {0, side, 0}};
+}
+
+/// Corners around the origin at angles that ascend, without trigonometry so that all compilers make the same.
+Points randomPolygon(unsigned int corners, bool isConvex, bool isClockwise, Random& random)
+{
+    Points polygon(corners);
+    for (unsigned int i = 0; i != corners; ++i) {
+        float const t = 4 * (static_cast<float>(i) + 0.3f * random.coordinate()) / static_cast<float>(corners);
+        float const u = t - std::floor(t);
+        float const length =
+            std::sqrt(u * u + (1 - u) * (1 - u)) / (isConvex ? 1 : 0.65f + 0.35f * random.coordinate());
+        float3 const p{(1 - u) / length, u / length, 0};
+        float3 const turned[] = {p, {-p.y, p.x, 0}, {-p.x, -p.y, 0}, {p.y, -p.x, 0}};
+        polygon[isClockwise ? corners - 1 - i : i] = turned[(static_cast<int>(std::floor(t)) + 4) % 4];
+    }
+    return polygon;
+}
+
+float3 between(float3 const& a, float3 const& b, float t)
+{
+    return {a.x + t * (b.x - a.x), a.y + t * (b.y - a.y), a.z + t * (b.z - a.z)};
+}
+
+/// Inside, on an edge, beyond an edge on its line, near a corner, or anywhere.
+float3 randomPoint(Points const& polygon, Random& random)
+{
+    unsigned int const i = random.below(polygon.size);
+    float3 const &a = polygon[i], &b = polygon[(i + 1) % polygon.size];
+    float const t = 0.5f + 0.5f * random.coordinate();
+    switch (random.below(8)) {
+    case 0:
+        return between({0, 0, random.coordinate()}, between(a, b, t), 0.5f);
+    case 1:
+        return between(a, b, 2 * random.coordinate());
+    case 2:
+        return {a.x + 0.03f * random.coordinate(), a.y + 0.03f * random.coordinate(), 0};
+    case 3:
+        return {2 * random.coordinate(), 2 * random.coordinate(), random.coordinate()};
+    case 4:
+        return between(a, b, 0.5f); // several strands end there
+    default:
+        return between(a, b, t);
+    }
+}
+
+template <class A, class B> bool sameBits(A const& a, B const& b)
+{
+    return a.size == b.size() && std::memcmp(a.data, b.data(), a.size * sizeof a[0]) == 0;
+}
+
+void expectSame(StitchTemplate const& actual, PlainStitch::Template const& expected)
+{
+    EXPECT_EQ(actual.getPolySize(), expected.polySize);
+    EXPECT_EQ(actual.getErrors(), expected.errors.c_str());
+    EXPECT_EQ(actual.getTol(), expected.tol);
+    ASSERT_EQ(actual.getStrands().size, expected.strands.size());
+    for (std::size_t s = 0; s != expected.strands.size(); ++s) {
+        auto const& strand = actual.getStrands()[s];
+        EXPECT_EQ(strand.polySize, expected.polySize);
+        ASSERT_EQ(strand.controlPoints.size, expected.strands[s].size());
+        for (std::size_t p = 0; p != expected.strands[s].size(); ++p)
+            EXPECT_TRUE(sameBits(strand.controlPoints[p], expected.strands[s][p])) << "strand " << s << " point " << p;
+    }
+    ASSERT_EQ(actual.getEdgeEndpoints().size, expected.edges.size());
+    for (std::size_t e = 0; e != expected.edges.size(); ++e)
+        EXPECT_EQ(actual.getEdgeEndpoints()[e], Ends(expected.edges[e])) << "edge " << e;
+}
+
+TEST(StitchTemplate, AgreesWithPlainTemplates)
+{
+    for (unsigned int seed = 0; seed != 600; ++seed) {
+        SCOPED_TRACE(seed);
+        Random random(seed);
+        unsigned int const corners = seed % 8 == 0 ? 16 + random.below(3) : 3 + random.below(7);
+        Points polygon = randomPolygon(corners, random.below(2) == 0, random.below(2) == 0, random);
+        if (seed % 100 == 99)
+            polygon = Points(corners, float3{1, 1, 0}); // nothing guards the divisions
+        Points positions;
+        Indices offsets{0};
+        for (unsigned int strand = random.below(30); strand != 0; --strand) {
+            for (unsigned int point = random.below(4); point != 0; --point)
+                positions.append(randomPoint(polygon, random));
+            offsets.append(static_cast<unsigned int>(positions.size));
+        }
+        offsets.append(offsets[offsets.size - 1]);
+        bool const strict = random.below(2) == 0;
+        PlainStitch::Template plain;
+        plain.fill(polygon, positions, offsets, strict);
+        expectSame(filled(polygon, positions, offsets, strict), plain);
+    }
+}
+
+TEST(StitchTemplate, TellsWhatIsWrong)
+{
+    Points const across{{0.5f, 0, 0}, {0.5f, 0.5f, 0}, {0.5f, 1, 0}};
+    Indices const one{0, 3};
+    struct {
+        Points polygon, positions;
+        Indices offsets;
+        bool strict;
+        char const* errors;
+    } const cases[] = {
+        {{}, across, one, false, "---invalid input: polygon is empty---"},
+        {{{0, 0, 0}, {1, 0, 0}}, across, one, false, "---invalid input: polygon is degenerated---"},
+        {square(), across, {0}, false, "---invalid input: empty input strands offset---"},
+        {square(1, 0.02f), across, one, false, ""},
+        {square(10, 0.3f), {}, {0, 0}, false, "---invalid input: input polygon must lie in the xy plane---"},
+        {square(10, 0.19f), {}, {0, 0}, false, ""},
+        {square(), across, one, false, ""},
+        {square(), across, one, true,
+            "---polygon edge contains too few/many strand end points------polygon edge contains too few/many strand "
+            "end "
+            "points---"},
+        {square(), {{0.5f, 0.5f, 0}}, {0, 1}, false, ""},
+        {square(), {{0, 0, 0}}, {0, 1}, false, "---control point too close to polygon vertex---"},
+        {square(), {{0.5f, 3, 0}}, {0, 1}, false,
+            "---point lies too far out side of polygon------point lies too far out side of polygon---"},
+        // Offsets that fall, or lead beyond the positions.
+        {square(), across, {2, 1, 4}, false, ""},
+    };
+    for (auto const& c : cases) {
+        StitchTemplate const made = filled(c.polygon, c.positions, c.offsets, c.strict);
+        EXPECT_EQ(made.getErrors(), c.errors);
+        EXPECT_EQ(made.getPolySize(), c.polygon.size);
+    }
+    EXPECT_TRUE(filled(square(), across, {2, 1, 4}, false).getStrands()[1].controlPoints.empty());
+    EXPECT_EQ(StitchTemplate(shared(square()), nullptr, shared(one), false).getErrors(),
+        "---invalid input: missing polygon or strand---");
+
+    // Ends so near to corners that the other weight of the edge rounds to 0.
+    StitchTemplate loose;
+    loose.setErrors("");
+    loose.setTol(1e-12f);
+    loose.construct(shared(square()), shared(Points{{1e-9f, 0, 0}, {1, 1e-9f, 0}}), shared(Indices{0, 2}), false);
+    EXPECT_EQ(loose.getErrors(),
+        "---strand starting point on edge but outside of polygon------strand ending point on edge but outside of "
+        "polygon---");
+}
+
+TEST(StitchTemplate, TakesThePolygonFromTheOnlyFace)
+{
+    auto const strands = makeStrands({{0.5f, 0, 0}, {0.5f, 1, 0}}, {0, 2});
+    auto const errorsOf = [&](Tessara::Object const& mesh) {
+        return StitchTemplate(mesh, *strands, false).getErrors();
+    };
+    auto const mesh = makeMesh({{9, 9, 9}, {0, 1, 0}, {1, 1, 0}, {1, 0, 0}, {0, 0, 0}}, {4, 3, 2, 1}, {0, 4});
+    StitchTemplate const made(*mesh, *strands, false);
+    EXPECT_EQ(made.getErrors(), "");
+    EXPECT_EQ(
+        made.getStrands(), filled(square(), *dataOf<float3>(*strands, sPointPosition), {0, 2}, false).getStrands());
+
+    EXPECT_EQ(errorsOf(*makeMesh(square(), {0, 1, 2, 0, 2, 3}, {0, 3, 6})), "---input mesh not single polygon---");
+    EXPECT_EQ(errorsOf(*makeMesh(square(), {0, 1, 2, 4}, {0, 4})), "---invalid input: missing polygon or strand---");
+    EXPECT_EQ(StitchTemplate(*mesh, *mesh, false).getErrors(), "---invalid input: missing polygon or strand---");
+    mesh->eraseProperty(sPointPosition);
+    EXPECT_EQ(errorsOf(*mesh), "---input poly missing point_positions property---");
+    mesh->eraseProperty(sFaceVertex);
+    EXPECT_EQ(errorsOf(*mesh), "---input poly missing face_vertices property---");
+}
+
+TEST(StitchTemplate, OrdersStrandEndsAlongEdges)
+{
+    auto const onFirstEdge = [](std::vector<float> const& places, bool strict) {
+        Points positions;
+        Indices offsets{0};
+        for (float const place : places) {
+            positions.append({place, 0, 0});
+            positions.append({0.5f, 0.5f, 0});
+            offsets.append(static_cast<unsigned int>(positions.size));
+        }
+        return filled(square(), positions, offsets, strict).getEdgeEndpoints()[0];
+    };
+    EXPECT_EQ(onFirstEdge({0.75f, 0.25f}, true), (Ends{{1, false}, {0, false}}));
+    EXPECT_EQ(onFirstEdge({0.5f, 0.5f}, false), (Ends{{0, false}, {1, false}}));
+    EXPECT_EQ(onFirstEdge({0.75f, 0.5f, 0.25f}, true), (Ends{{0, false}, {1, false}, {2, false}}));
+    EXPECT_EQ(onFirstEdge({0.75f, 0.5f, 0.25f}, false), (Ends{{2, false}, {1, false}, {0, false}}));
+    EXPECT_EQ(onFirstEdge({0.75f, 0.25f, 0.75f}, false), (Ends{{1, false}, {2, false}})); // the later one stays
+}
+
+TEST(StitchTemplate, FillingClearsNothing)
+{
+    StitchTemplate made;
+    EXPECT_EQ(made.getErrors(), "---empty stitch template---");
+    EXPECT_EQ(made.getTol(), 0.02f);
+    auto const fill = [&](Points const& polygon, Points const& positions) {
+        made.construct(shared(polygon), shared(positions), shared(Indices{0, 2}), false);
+    };
+    fill(square(10), {{5, 0, 0}, {5, 10, 0}});
+    EXPECT_EQ(made.getErrors(), "---empty stitch template---");
+    EXPECT_EQ(made.getTol(), 0.02f * 10);
+    fill(square(10), {{2.5f, 0, 0}, {10, 5, 0}});
+    EXPECT_EQ(made.getTol(), 0.02f * 10 * 10);
+    EXPECT_EQ(made.getStrands().size, 2);
+    EXPECT_EQ(made.getEdgeEndpoints()[0], (Ends{{0, false}, {0, false}}));
+    fill({{0, 0, 0}, {90, 0, 0}, {0, 90, 0}}, {{30, 0, 0}, {30, 60, 0}}); // fewer corners than the old strands have
+    EXPECT_EQ(made.getEdgeEndpoints().size, 3);
+
+    StitchTemplate const copy = made;
+    StitchTemplate const moved = std::move(made);
+    EXPECT_EQ(moved.getStrands(), copy.getStrands());
+    EXPECT_EQ(moved.getEdgeEndpoints(), copy.getEdgeEndpoints());
+    made.setPolySize(7);
+    made.setStrands(copy.getStrands());
+    made.setEdgeEndpoints({{{99, true}, {98, true}}, {{0, true}, {50, false}, {1, true}}}); // of no strand
+    fill({{0, 0, 0}, {2, 0, 0}, {3, 1, 0}, {2, 2, 0}, {0, 2, 0}}, {{1, 0, 0}, {1, 1, 0}});
+    EXPECT_EQ(made.getPolySize(), 5);
+}
+
+TEST(StitchTemplate, CoordinatesGivePointsBack)
+{
+    for (unsigned int seed = 0; seed != 200; ++seed) {
+        SCOPED_TRACE(seed);
+        Random random(seed);
+        unsigned int const corners = 3 + random.below(18);
+        Points const polygon = randomPolygon(corners, true, false, random);
+        float3 const onEdge = between(polygon[0], polygon[1], 0.5f);
+        float3 const point = between({0, 0, random.coordinate()}, onEdge, 0.4f);
+        StitchTemplate made;
+        made.setErrors("");
+        made.setTol(1e-4f);
+        made.setPolySize(corners);
+        Orvan::Array<float> weights(corners + 1);
+        EXPECT_EQ(made.computeMeanValueCoordinates(polygon, point, weights, 0.5f), kNoEdge);
+        EXPECT_EQ(made.getErrors(), "");
+        EXPECT_EQ(weights[corners], point.z / 0.5f);
+        float sum = 0;
+        for (unsigned int i = 0; i != corners; ++i) {
+            EXPECT_GT(weights[i], 0);
+            sum += weights[i];
+        }
+        EXPECT_NEAR(sum, 1, 1e-5);
+        for (bool const flip : {false, true}) {
+            float3 plain{7, 7, 7}, blended{7, 7, 7};
+            made.findControlPointPos(polygon, weights, 0.5f, flip, plain);
+            made.findControlPointPos(polygon, weights, 0.5f, Points(corners, float3{0, 0, 3}), flip, blended);
+            for (float3 const& found : {plain, blended}) {
+                EXPECT_NEAR(found.x, point.x, 1e-5);
+                EXPECT_NEAR(found.y, point.y, 1e-5);
+                EXPECT_NEAR(found.z, flip ? -point.z : point.z, 1e-5);
+            }
+        }
+    }
+}
+
+TEST(StitchTemplate, StrandsMeetOnSharedEdges)
+{
+    // Mirrored ends on edges 1 and 3; the second quad lies beyond edge 1 of the first and is bent.
+    StitchTemplate const made = filled(square(), {{0, 0.25f, 0}, {0.5f, 0.5f, 0.2f}, {1, 0.25f, 0}}, {0, 3}, false);
+    EXPECT_EQ(made.getErrors(), "");
+    Points const left{{0, 0, 0}, {2, 0.5f, 1}, {3, 2, 1}, {0, 2, 0.5f}}, right{left[1], {5, 1, 0}, {4, 4, 1}, left[2]};
+    float3 end{}, start{};
+    made.findControlPointPos(left, made.getStrands()[0].controlPoints[2], 1, false, end);
+    made.findControlPointPos(right, made.getStrands()[0].controlPoints[0], 1, false, start);
+    EXPECT_EQ(std::memcmp(&end, &start, sizeof end), 0);
+
+    // Of short arrays what is there is taken; without a height or a triangle the point stays in the polygon.
+    Orvan::Array<float> const quarter{0.25f, 0.25f};
+    made.findControlPointPos(Points{{4, 8, 0}}, quarter, 1, false, end);
+    EXPECT_TRUE(end.x == 1 && end.y == 2 && end.z == 0);
+    made.findControlPointPos(Points{{4, 8, 0}, {4, 8, 4}}, quarter, 1, Points{}, false, end);
+    EXPECT_TRUE(end.x == 2 && end.y == 4 && end.z == 1);
+}
+
+TEST(StitchTemplate, FailingAllocationsLeaveTemplatesUsable)
+{
+    Random random(1);
+    auto const polygon = shared(randomPolygon(17, true, false, random));
+    auto const positions = shared(Points(6, between((*polygon)[0], (*polygon)[1], 0.5f)));
+    auto const offsets = shared(Indices{0, 2, 4, 6});
+    sweepFailingAllocations([&](Attempt const& attempt) {
+        StitchTemplate made;
+        made.setErrors("");
+        if (!attempt([&] { made.construct(polygon, positions, offsets, false); })) {
+            made = StitchTemplate();
+            made.setErrors("");
+            made.construct(polygon, positions, offsets, false);
+        }
+        EXPECT_EQ(made.getStrands().size, 3);
+        EXPECT_EQ(made.getEdgeEndpoints()[0], (Ends{{2, true}}));
+    });
+}
+
+}
