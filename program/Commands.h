@@ -45,6 +45,7 @@ void addDeletePoints(CLI::App& program, Invocation& invocation);
 void addDeleteFaces(CLI::App& program, Invocation& invocation);
 void addMerge(CLI::App& program, Invocation& invocation);
 void addRemoveSlivers(CLI::App& program, Invocation& invocation);
+void addStitch(CLI::App& program, Invocation& invocation);
 void addSubdivide(CLI::App& program, Invocation& invocation);
 void addTriangulate(CLI::App& program, Invocation& invocation);
 

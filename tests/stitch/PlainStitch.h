@@ -5,6 +5,7 @@
 #include <cmath>
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace PlainStitch {
@@ -25,11 +26,10 @@ struct Template {
     {
         unsigned int const n = polySize;
         weights[n] = point.z / scale;
-        std::vector<float3> s(n);
-        std::vector<float> r(n), area(n), dot(n);
+        std::vector<float> x(n), y(n), r(n), area(n), dot(n);
         for (unsigned int i = 0; i < n; ++i) {
-            s[i] = {polygon[i].x - point.x, polygon[i].y - point.y, polygon[i].z - point.z};
-            r[i] = std::sqrt(s[i].x * s[i].x + s[i].y * s[i].y);
+            x[i] = polygon[i].x - point.x, y[i] = polygon[i].y - point.y;
+            r[i] = std::sqrt(x[i] * x[i] + y[i] * y[i]);
             if (tol > r[i]) {
                 weights[i] = 1;
                 errors += "---control point too close to polygon vertex---";
@@ -39,8 +39,8 @@ struct Template {
         float const areaTol = tol * scale;
         for (unsigned int i = 0; i < n; ++i) {
             unsigned int const j = (i + 1) % n;
-            area[i] = (s[j].y * s[i].x - s[i].y * s[j].x) * 0.5f;
-            dot[i] = s[i].y * s[j].y + s[i].x * s[j].x;
+            area[i] = (y[j] * x[i] - y[i] * x[j]) * 0.5f;
+            dot[i] = y[i] * y[j] + x[i] * x[j];
             if (areaTol > std::fabs(area[i]) && 0.0f > dot[i]) {
                 weights[i] = r[j] / (r[j] + r[i]);
                 weights[j] = 1.0f - weights[i];
@@ -118,10 +118,9 @@ struct Template {
             std::map<float, std::size_t> places;
             for (std::size_t k = 0; k < ends.size(); ++k)
                 places[weightOf(ends[k], (i + 1) % polySize)] = k;
-            std::vector<pair> ordered;
+            std::vector<pair> const recorded = std::exchange(ends, {});
             for (auto const& [weight, k] : places)
-                ordered.push_back(ends[k]);
-            ends = ordered;
+                ends.push_back(recorded[k]);
         }
     }
 };
