@@ -137,7 +137,6 @@ TEST_F(Commands, StitchLaysTemplatesOnFacesWithAsManyCorners)
     write(folder / "mesh.obj", "v 0 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0\nv 2 0 1\nv 2 1 1\nf 1 2 3 4\nf 2 5 6 3\nf 1 4 6\n");
     std::string const rings = "stitch --on mesh.obj out.obj --template stitch-quad.obj stitch-quad-rings.obj";
     json const done = runForJson(rings);
-    EXPECT_EQ(done["exitCode"], 0);
     EXPECT_EQ(done["coveredFaces"], 2);
     EXPECT_EQ(done["otherFaces"], 1);
     EXPECT_EQ(runForJson("info out.obj")["counts"], json({{"points", 2 * 4 * 13}, {"strands", 2 * 4}}));
@@ -153,9 +152,8 @@ TEST_F(Commands, StitchLaysTemplatesOnFacesWithAsManyCorners)
     std::string const wrong = "stitch --on mesh.obj out.obj --template stitch-quad.obj stitch-wrong.obj";
     EXPECT_EQ(runForJson(wrong)["template"]["messages"].size(), 6);
     EXPECT_THAT(run(wrong).messages,
-        AllOf(HasSubstr("not on polygon edge: strand 0, control point 0\n"),
-            HasSubstr("vertex: strand 1, control point 1\n"),
-            HasSubstr("ending point not on polygon edge: strand 2, control point 1\n"), HasSubstr("points: edge 3\n")));
+        AllOf(HasSubstr("vertex: strand 1, control point 1\n"), HasSubstr("strand 2, control point 1\n  - polygon"),
+            HasSubstr("points: edge 3\n")));
     EXPECT_EQ(run(wrong + " --force").exitCode, 0);
     EXPECT_EQ(run("stitch --template stitch-quad.obj stitch-quad-rings.obj").exitCode, 2);
     EXPECT_EQ(run("stitch --check --template mesh.obj stitch-wrong.obj --force").exitCode, 5);
