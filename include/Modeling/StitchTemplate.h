@@ -103,8 +103,9 @@ public:
     /// `computeMeanValueCoordinates` come among them, in front of the other texts of their control point:
     /// "---strand starting point not on polygon edge---" and "---strand ending point not on polygon edge---": only if
     /// `strict`; otherwise such an end is just not recorded.
-    /// "---strand starting point on edge but outside of polygon---" and "---strand ending point on edge but outside of
-    /// polygon---" (in one line): a weight of a corner of that edge is not positive; not recorded.
+    /// "---strand starting point on edge but outside of polygon---",
+    /// "---strand ending point on edge but outside of polygon---": a weight of a corner of that edge is not positive; not
+    /// recorded.
     /// "---polygon edge contains too few/many strand end points---": once for each edge that holds no end or more than
     /// two; only if `strict`. Its ends stay in the order in which they were recorded.
     ///

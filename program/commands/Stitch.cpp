@@ -92,10 +92,10 @@ namespace {
             return faults; // they are about the whole
 
         MeshArrays const mesh = arraysOf(polygonMesh);
-        auto const polygon = Orvan::MutablePtr<Points>::make();
+        auto polygon = Orvan::MutablePtr<Points>::make();
         for (unsigned int const point : *mesh.faceVertex)
             polygon->append((*mesh.positions)[point]);
-        Orvan::Ptr<Points> const corners = Orvan::makePtr<Points>(*polygon);
+        Orvan::Ptr<Points> const corners = std::move(polygon);
         auto const positions = Tessara::Geometry::dataOf<float3>(strandSet, Tessara::Geometry::sPointPosition);
         auto const offsets = Tessara::Geometry::dataOf<unsigned int>(strandSet, Tessara::Geometry::sStrandOffset);
 
