@@ -46,6 +46,7 @@ void addDeleteFaces(CLI::App& program, Invocation& invocation);
 void addMerge(CLI::App& program, Invocation& invocation);
 void addRemoveSlivers(CLI::App& program, Invocation& invocation);
 void addSmooth(CLI::App& program, Invocation& invocation);
+void addStitch(CLI::App& program, Invocation& invocation);
 void addSubdivide(CLI::App& program, Invocation& invocation);
 void addTriangulate(CLI::App& program, Invocation& invocation);
 

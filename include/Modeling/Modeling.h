@@ -3,6 +3,7 @@
 // All operations of the library.
 
 #include <Modeling/HalfEdgeDataStructure.h>
+#include <Modeling/StitchTemplate.h>
 #include <Modeling/addPointsToPointCloud.h>
 #include <Modeling/computeDeletedComponentMapping.h>
 #include <Modeling/copyNonGeoProperties.h>

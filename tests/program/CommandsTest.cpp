@@ -157,6 +157,36 @@ TEST_F(Commands, TriangulateKeepsWhatTheChannelsChoose)
     EXPECT_THAT(run("triangulate small.obj out.ply --check").output, HasSubstr("1 (first: face 1)"));
 }
 
+TEST_F(Commands, StitchLaysTemplatesOnFacesWithAsManyCorners)
+{
+    for (char const* const name : {"stitch-quad.obj", "stitch-quad-rings.obj", "stitch-triangle.obj",
+             "stitch-triangle-rings.obj", "stitch-wrong.obj"})
+        copySample(name);
+    write(folder / "mesh.obj", "v 0 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0\nv 2 0 1\nv 2 1 1\nf 1 2 3 4\nf 2 5 6 3\nf 1 4 6\n");
+    std::string const rings = "stitch --on mesh.obj out.obj --template stitch-quad.obj stitch-quad-rings.obj";
+    json const done = runForJson(rings);
+    EXPECT_EQ(done["coveredFaces"], 2);
+    EXPECT_EQ(done["otherFaces"], 1);
+    EXPECT_EQ(runForJson("info out.obj")["counts"], json({{"points", 2 * 4 * 13}, {"strands", 2 * 4}}));
+    std::string const laid = contentsOf(folder / "out.obj");
+    for (char const* const option : {" --flip", " --normals faces", " --rotate 1"}) {
+        EXPECT_EQ(run(rings + option).exitCode, 0);
+        EXPECT_NE(contentsOf(folder / "out.obj"), laid) << option;
+    }
+    EXPECT_EQ(run(rings + " --rotate 4 --threads 1").exitCode, 0); // all around
+    EXPECT_EQ(contentsOf(folder / "out.obj"), laid);
+    EXPECT_EQ(run("stitch --check --template stitch-triangle.obj stitch-triangle-rings.obj").exitCode, 0);
+
+    std::string const wrong = "stitch --on mesh.obj out.obj --template stitch-quad.obj stitch-wrong.obj";
+    EXPECT_EQ(runForJson(wrong)["template"]["messages"].size(), 6);
+    EXPECT_THAT(run(wrong).messages,
+        AllOf(HasSubstr("vertex: strand 1, control point 1\n"), HasSubstr("strand 2, control point 1\n  - polygon"),
+            HasSubstr("points: edge 3\n")));
+    EXPECT_EQ(run(wrong + " --force").exitCode, 0);
+    EXPECT_EQ(run("stitch --template stitch-quad.obj stitch-quad-rings.obj").exitCode, 2);
+    EXPECT_EQ(run("stitch --check --template mesh.obj stitch-wrong.obj --force").exitCode, 5);
+}
+
 TEST_F(Commands, MergeTellsWhatBecameOfAttributes)
 {
     copySample("cube.ply");
@@ -322,7 +352,7 @@ TEST_F(Commands, InfoAndValidateTellAboutFiles)
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
     for (char const* const command :
-        {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "smooth ", "remove-slivers "})
+        {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "smooth ", "remove-slivers ", "stitch "})
         EXPECT_EQ(run(command + std::string("--help")).exitCode, 0) << command;
     EXPECT_EQ(run("--version").exitCode, 0);
 }

@@ -1,0 +1,394 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "MeshRequirements.h"
+#include "MeshTopology.h"
+#include "Operation.h"
+
+#include <Modeling/StitchTemplate.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+#include <tbb/blocked_range.h>
+#include <tbb/parallel_for.h>
+
+#include <algorithm>
+#include <atomic>
+#include <cmath>
+#include <limits>
+#include <memory>
+#include <optional>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using Tessara::Object;
+    using Tessara::Modeling::LocalStrand;
+    using Tessara::Modeling::StitchTemplate;
+    using Points = Orvan::Array<float3>;
+    using Indices = Orvan::Array<unsigned int>;
+
+    struct Options {
+        std::vector<std::filesystem::path> drawing; // the polygon and the strands
+        std::filesystem::path on;
+        std::filesystem::path out;
+        std::string normals = "points";
+        unsigned int rotate = 0;
+        bool isOpen = false;
+        bool flip = false;
+        bool force = false;
+        bool checkOnly = false;
+    };
+
+    /// A message of a template, and what it is about as far as that can be told.
+    struct Fault {
+        std::string message;
+        std::optional<std::uint64_t> strand, point, edge; // the point counts within its strand
+    };
+
+    /// The texts between the dashes.
+    std::vector<std::string> splitMessages(Orvan::String const& errors)
+    {
+        constexpr std::string_view kDashes = "---";
+        std::vector<std::string> messages;
+        std::string_view rest = errors.view();
+        while (rest.starts_with(kDashes)) {
+            rest.remove_prefix(kDashes.size());
+            std::size_t const end = std::min(rest.find(kDashes), rest.size());
+            messages.emplace_back(rest.substr(0, end));
+            rest.remove_prefix(std::min(end + kDashes.size(), rest.size()));
+        }
+        return messages;
+    }
+
+    /// What a template says of a control point: a template of that point alone tells.
+    struct PointFaults {
+        std::size_t messageCount = 0;
+        bool isEndFaulty = false; // where a strand begins or ends there
+    };
+
+    PointFaults faultsOfPoint(Orvan::Ptr<Points> const& polygon, float3 const& point, bool strict)
+    {
+        StitchTemplate const alone(
+            polygon, Orvan::makePtr<Points>(Points{point}), Orvan::makePtr<Indices>(Indices{0, 1}), false);
+        std::vector<std::string> const messages = splitMessages(alone.getErrors());
+        auto const ofEnds = static_cast<std::size_t>(std::count_if(messages.begin(), messages.end(),
+            [](std::string const& message) { return message.starts_with("strand "); }));
+        auto const& edges = alone.getEdgeEndpoints();
+        bool const isRecorded = std::any_of(edges.begin(), edges.end(), [](auto const& ends) { return !ends.empty(); });
+        return {messages.size() - ofEnds, !isRecorded && (strict || ofEnds != 0)};
+    }
+
+    /// Messages come in the order of the control points, and then of the edges, so that they can be counted off.
+    std::vector<Fault> locateFaults(
+        StitchTemplate const& made, Object const& polygonMesh, Object const& strandSet, bool strict)
+    {
+        std::vector<Fault> faults;
+        for (std::string& message : splitMessages(made.getErrors()))
+            faults.push_back({std::move(message), {}, {}, {}});
+        if (made.getStrands().empty())
+            return faults; // they are about the whole
+
+        MeshArrays const mesh = arraysOf(polygonMesh);
+        auto polygon = Orvan::MutablePtr<Points>::make();
+        for (unsigned int const point : *mesh.faceVertex)
+            polygon->append((*mesh.positions)[point]);
+        Orvan::Ptr<Points> const corners = std::move(polygon);
+        auto const positions = Tessara::Geometry::dataOf<float3>(strandSet, Tessara::Geometry::sPointPosition);
+        auto const offsets = Tessara::Geometry::dataOf<unsigned int>(strandSet, Tessara::Geometry::sStrandOffset);
+
+        auto fault = faults.begin();
+        for (std::uint64_t strand = 0; strand + 1 < offsets->size && fault != faults.end(); ++strand) {
+            std::uint64_t const first = (*offsets)[strand], end = (*offsets)[strand + 1];
+            for (std::uint64_t point = first; point != end; ++point) {
+                PointFaults const own = faultsOfPoint(corners, (*positions)[point], strict);
+                std::size_t count = own.messageCount;
+                if (own.isEndFaulty)
+                    count += std::size_t{point == first} + std::size_t{point + 1 == end};
+                for (; count != 0 && fault != faults.end(); --count, ++fault) {
+                    fault->strand = strand;
+                    fault->point = point - first;
+                }
+            }
+        }
+        auto const& edges = made.getEdgeEndpoints();
+        for (std::uint64_t edge = 0; edge != edges.size && fault != faults.end(); ++edge)
+            if (edges[edge].size != 1 && edges[edge].size != 2)
+                (fault++)->edge = edge;
+        return faults;
+    }
+
+    std::string describe(Fault const& fault)
+    {
+        if (fault.edge)
+            return fmt::format("{}: edge {}", fault.message, *fault.edge);
+        if (fault.strand)
+            return fmt::format("{}: strand {}, control point {}", fault.message, *fault.strand, *fault.point);
+        return fault.message;
+    }
+
+    Json describeFaults(std::vector<Fault> const& faults)
+    {
+        auto const valueOf = [](std::optional<std::uint64_t> const& value) { return value ? Json(*value) : Json(); };
+        Json list = Json::array();
+        for (Fault const& fault : faults)
+            list.push_back({{"message", fault.message}, {"strand", valueOf(fault.strand)},
+                {"point", valueOf(fault.point)}, {"edge", valueOf(fault.edge)}});
+        return list;
+    }
+
+    std::uint64_t controlPointCountOf(StitchTemplate const& made)
+    {
+        std::uint64_t count = 0;
+        for (LocalStrand const& strand : made.getStrands())
+            count += strand.controlPoints.size;
+        return count;
+    }
+
+    /// Refuses a template with faults, unless forced to take what there is of it.
+    StitchTemplate readTemplate(Options const& options, Report& report)
+    {
+        std::filesystem::path const &polygonFile = options.drawing[0], &strandFile = options.drawing[1];
+        Orvan::MutablePtr<Object> const polygon = loadGeometry(polygonFile, report);
+        requireMesh(*polygon, "stitch", polygonFile);
+        Orvan::MutablePtr<Object> const strands = loadGeometry(strandFile, report);
+        if (typeOf(*strands) != GeometryType::Strands)
+            throw Failure(ExitCode::Refused,
+                fmt::format("stitch needs strands, such as the lines of an OBJ file, and {} holds a {}",
+                    strandFile.string(), nameOf(typeOf(*strands))));
+
+        StitchTemplate made(*polygon, *strands, !options.isOpen);
+        std::vector<Fault> const faults = locateFaults(made, *polygon, *strands, !options.isOpen);
+        report.document["template"] = {{"corners", made.getPolySize()}, {"strands", made.getStrands().size},
+            {"controlPoints", controlPointCountOf(made)}, {"messages", describeFaults(faults)}};
+        std::vector<std::string> reasons;
+        for (Fault const& fault : faults)
+            reasons.push_back(describe(fault));
+        if (!faults.empty() && (!options.force || made.getStrands().empty()))
+            throw Failure(ExitCode::Refused, "the template is not usable", std::move(reasons));
+        for (std::string const& reason : reasons)
+            report.warn(reason);
+        return made;
+    }
+
+    struct Target {
+        MeshArrays mesh;
+        Indices faces; // those with as many corners as the template
+        Points pointNormals; // empty where those of the faces are wanted
+        float scale = 0; // the mean length of these faces' edges: one for all, so that raised strand ends meet too
+    };
+
+    float distance(float3 const& a, float3 const& b)
+    {
+        return std::hypot(b.x - a.x, b.y - a.y, b.z - a.z);
+    }
+
+    /// The normals of the faces around each point, weighted by area; of no particular length.
+    Points sumPointNormals(MeshArrays const& mesh)
+    {
+        Points normals(mesh.pointCount());
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+            std::span<unsigned int const> const corners = mesh.corners(face);
+            float3 sum{0, 0, 0};
+            for (std::size_t i = 0; i != corners.size(); ++i) {
+                float3 const& a = (*mesh.positions)[corners[i]];
+                float3 const& b = (*mesh.positions)[corners[(i + 1) % corners.size()]];
+                sum.x += (a.y - b.y) * (a.z + b.z);
+                sum.y += (a.z - b.z) * (a.x + b.x);
+                sum.z += (a.x - b.x) * (a.y + b.y);
+            }
+            for (unsigned int const point : corners)
+                normals[point] = {normals[point].x + sum.x, normals[point].y + sum.y, normals[point].z + sum.z};
+        }
+        for (float3& normal : normals) {
+            float const length = distance({}, normal);
+            if (length > 0)
+                normal = {normal.x / length, normal.y / length, normal.z / length};
+        }
+        return normals;
+    }
+
+    Target readTarget(Object const& object, unsigned int polySize, bool withPointNormals)
+    {
+        Target target{arraysOf(object), {}, {}, 0};
+        double length = 0;
+        for (unsigned int face = 0; face != target.mesh.faceCount(); ++face) {
+            std::span<unsigned int const> const corners = target.mesh.corners(face);
+            if (corners.size() != polySize)
+                continue;
+            target.faces.append(face);
+            for (std::size_t i = 0; i != corners.size(); ++i)
+                length += static_cast<double>(distance(
+                    (*target.mesh.positions)[corners[i]], (*target.mesh.positions)[corners[(i + 1) % corners.size()]]));
+        }
+        target.scale = static_cast<float>(length / (static_cast<double>(target.faces.size) * polySize));
+        if (withPointNormals)
+            target.pointNormals = sumPointNormals(target.mesh);
+        return target;
+    }
+
+    bool isFinite(float3 const& v)
+    {
+        return std::isfinite(v.x) && std::isfinite(v.y) && std::isfinite(v.z);
+    }
+
+    /// Lays all control points on one polygon. \return how many stay in it, as it has no normal there
+    std::size_t layOnPolygon(StitchTemplate const& made, Points const& corners, Points const& normals, float scale,
+        bool flip, float3* position)
+    {
+        std::size_t flatCount = 0;
+        for (LocalStrand const& strand : made.getStrands()) {
+            for (Orvan::Array<float> const& weights : strand.controlPoints) {
+                if (normals.empty())
+                    made.findControlPointPos(corners, weights, scale, flip, *position);
+                else
+                    made.findControlPointPos(corners, weights, scale, normals, flip, *position);
+                if (!isFinite(*position)) {
+                    ++flatCount;
+                    Orvan::Array<float> const flat(std::span<float const>(weights.data, made.getPolySize()));
+                    made.findControlPointPos(corners, flat, scale, flip, *position);
+                }
+                ++position;
+            }
+        }
+        return flatCount;
+    }
+
+    struct LaidStrands {
+        Points positions;
+        std::size_t flatCount = 0;
+    };
+
+    LaidStrands layOnFaces(StitchTemplate const& made, Target const& target, Options const& options)
+    {
+        std::uint64_t const perFace = controlPointCountOf(made);
+        unsigned int const polySize = made.getPolySize();
+        LaidStrands laid{Points(perFace * target.faces.size, Orvan::kUninitialized), 0};
+        std::atomic<std::size_t> flatCount = 0;
+        // Each face writes its own stretch.
+        tbb::parallel_for(tbb::blocked_range<std::size_t>(0, target.faces.size, 100), [&](auto const& faces) {
+            Points corners(polySize), normals(target.pointNormals.empty() ? 0 : polySize);
+            for (std::size_t i = faces.begin(); i != faces.end(); ++i) {
+                std::span<unsigned int const> const points = target.mesh.corners(target.faces[i]);
+                for (unsigned int corner = 0; corner != polySize; ++corner) {
+                    unsigned int const point = points[(corner + options.rotate % polySize) % polySize];
+                    corners[corner] = (*target.mesh.positions)[point];
+                    if (!normals.empty())
+                        normals[corner] = target.pointNormals[point];
+                }
+                flatCount +=
+                    layOnPolygon(made, corners, normals, target.scale, options.flip, laid.positions.data + i * perFace);
+            }
+        });
+        laid.flatCount = flatCount;
+        return laid;
+    }
+
+    Indices repeatOffsets(StitchTemplate const& made, std::uint64_t copies)
+    {
+        Indices offsets;
+        offsets.reserve(made.getStrands().size * copies + 1);
+        std::uint64_t offset = 0;
+        for (std::uint64_t copy = 0; copy != copies; ++copy) {
+            for (LocalStrand const& strand : made.getStrands()) {
+                offsets.append(static_cast<unsigned int>(offset));
+                offset += strand.controlPoints.size;
+            }
+        }
+        offsets.append(static_cast<unsigned int>(offset));
+        return offsets;
+    }
+
+    void requireFits(StitchTemplate const& made, Target const& target, std::filesystem::path const& file)
+    {
+        if (target.faces.empty())
+            throw Failure(ExitCode::Refused,
+                fmt::format(
+                    "the template has {} corners, and no face of {} has as many", made.getPolySize(), file.string()));
+        std::uint64_t const mostOfFace = std::max(controlPointCountOf(made), made.getStrands().size);
+        if (mostOfFace > (std::numeric_limits<unsigned int>::max() - 1) / target.faces.size)
+            throw Failure(ExitCode::Refused, "there would be more than 4,294,967,295 control points");
+    }
+
+    void reportLaying(Object const& mesh, Object const& result, Target const& target, Report& report)
+    {
+        std::uint64_t const covered = target.faces.size;
+        std::uint64_t const others = target.mesh.faceCount() - covered;
+        report.document["coveredFaces"] = covered;
+        report.document["otherFaces"] = others;
+        report.text += fmt::format("laid on {}; {} another number of corners\n\n", countOf(covered, "face"),
+            others == 1 ? "1 face has" : groupDigits(others) + " faces have");
+        Json const from = countsOf(mesh), to = countsOf(result);
+        std::vector<std::string> dropped;
+        for (Property const& property : propertiesOf(mesh))
+            if (!property.isStandard)
+                dropped.push_back(property.name);
+        reportOperation({{"faces", from["faces"]}, {"points", from["points"]}, {"strands", Json()}},
+            {{"faces", Json()}, {"points", to["points"]}, {"strands", to["strands"]}}, dropped, report);
+    }
+
+    void stitch(Options const& options, Report& report)
+    {
+        if (options.checkOnly) {
+            StitchTemplate const made = readTemplate(options, report);
+            report.text = fmt::format("{}: {}, {}, {}\n",
+                report.document["template"]["messages"].empty() ? "a usable template" : "a template with faults",
+                countOf(made.getPolySize(), "corner"), countOf(made.getStrands().size, "strand"),
+                countOf(controlPointCountOf(made), "control point"));
+            return;
+        }
+        if (options.on.empty() || options.out.empty())
+            throw Failure(ExitCode::CommandLine, "stitch takes --on MESH and the file to write, or --check");
+        requireWritable(options.out);
+        StitchTemplate const made = readTemplate(options, report);
+        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.on, report);
+        requireMesh(*mesh, "stitch", options.on);
+        Target const target = readTarget(*mesh, made.getPolySize(), options.normals == "points");
+        requireFits(made, target, options.on);
+
+        LaidStrands laid;
+        runOperation(report, [&] { laid = layOnFaces(made, target, options); });
+        if (laid.flatCount != 0)
+            report.warn(fmt::format("{} not raised, since the faces have no normal there",
+                laid.flatCount == 1 ? "1 control point was" : groupDigits(laid.flatCount) + " control points were"));
+        auto const result =
+            Tessara::Geometry::makeStrands(std::move(laid.positions), repeatOffsets(made, target.faces.size));
+        saveGeometry(*result, options.out, report);
+        reportLaying(*mesh, *result, target, report);
+    }
+
+}
+
+void addStitch(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"stitch", "Lay a pattern of strands on the faces of a mesh",
+        R"(A template is a polygon in the plane z = 0 (a mesh with one face) and strands drawn in it (the lines of an
+OBJ file). It is laid on every face with as many corners; heights are in units of the mean edge length, of
+the polygon and of the faces covered. Each strand has to begin and to end on edges of the polygon, and each
+edge to hold one or two ends, unless --open. Ends meet where they are placed alike from both ends of edges.)",
+        "  modeling stitch --check --template quad.obj loop.obj\n"
+        "  modeling stitch --template quad.obj loop.obj --on body.obj knitted.vtp"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    command.add_option("--template", options->drawing, "Files of the polygon and of the strands in it")
+        ->required()
+        ->expected(2)
+        ->option_text("POLYGON STRANDS");
+    command.add_option("--on", options->on, "Mesh to lay it on")->option_text("MESH");
+    command.add_option("OUT", options->out, "File of strands to write")->option_text(" ");
+    command.add_option("--normals", options->normals, "Raise along normals blended from the points, or of each face")
+        ->check(CLI::IsMember({"points", "faces"}))
+        ->capture_default_str();
+    command.add_option("--rotate", options->rotate, "Begin at the N-th corner of each face, from 0")
+        ->type_name("N")
+        ->check(CLI::NonNegativeNumber.description(""));
+    command.add_flag("--flip", options->flip, "Lower where the template raises");
+    command.add_flag("--open", options->isOpen, "Allow strand ends off the edges, and any number on an edge");
+    command.add_flag("--force", options->force, "Take a template in spite of its faults");
+    command.add_flag("--check", options->checkOnly, "Only tell whether the template is usable");
+    onSelected(command, invocation, [options](Report& report) { stitch(*options, report); });
+}
+
+}

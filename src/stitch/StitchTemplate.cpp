@@ -1,0 +1,423 @@
+#include <Modeling/StitchTemplate.h>
+
+#include "frame/VectorMath.h"
+#include "host/GeoProperties.h"
+
+#include <TessaraGeometry/Elements.h>
+
+#include <algorithm>
+#include <cmath>
+#include <optional>
+#include <span>
+#include <utility>
+#include <vector>
+
+namespace Tessara::Modeling {
+
+using namespace ::Modeling;
+
+namespace {
+
+    using Points = Orvan::Array<float3>;
+    using Indices = Orvan::Array<unsigned int>;
+    using Weights = Orvan::Array<float>;
+
+    constexpr unsigned int kNoEdge = 0xFFFFFFFF;
+    constexpr float kLowestWeight = -0.2f; // below that a point is too far outside
+
+    constexpr unsigned int nextCorner(unsigned int corner, unsigned int polySize)
+    {
+        return corner + 1 == polySize ? 0 : corner + 1;
+    }
+
+    /// A corner as seen from a point, in the plane, and the edge that begins there.
+    struct CornerView {
+        float x, y; // from the point to the corner
+        float r; // its length
+        float area; // of the triangle of the point and the edge, signed
+        float dot; // of the ways to the edge's ends
+    };
+
+    /// Takes memory only for polygons with more corners than anybody draws by hand.
+    class CornerViews {
+    public:
+        explicit CornerViews(std::size_t count)
+        {
+            if (count > kStackCorners)
+                onHeap_.resize(count, Orvan::kUninitialized);
+            first_ = count > kStackCorners ? onHeap_.data : onStack_;
+        }
+        CornerViews(CornerViews const&) = delete;
+        CornerViews& operator=(CornerViews const&) = delete;
+
+        CornerView* get() { return first_; }
+
+    private:
+        static constexpr std::size_t kStackCorners = 16;
+        CornerView onStack_[kStackCorners];
+        Orvan::Array<CornerView> onHeap_;
+        CornerView* first_;
+    };
+
+    /// Measures the ways to the corners. \return the first corner that is closer than the tolerance, or `polySize`
+    unsigned int findCloseCorner(
+        Points const& polygon, float3 const& point, unsigned int polySize, float tolerance, CornerView* corners)
+    {
+        for (unsigned int i = 0; i != polySize; ++i) {
+            CornerView& corner = corners[i];
+            corner.x = polygon[i].x - point.x;
+            corner.y = polygon[i].y - point.y;
+            corner.r = std::sqrt(corner.x * corner.x + corner.y * corner.y);
+            if (tolerance > corner.r)
+                return i;
+        }
+        return polySize;
+    }
+
+    /// Measures the triangles of the point and the edges. \return the first edge that the point lies on: the triangle
+    /// is flat, and the edge's ends are on opposite sides
+    unsigned int findEdge(unsigned int polySize, float areaTol, CornerView* corners)
+    {
+        for (unsigned int i = 0; i != polySize; ++i) {
+            CornerView& corner = corners[i];
+            CornerView const& next = corners[nextCorner(i, polySize)];
+            corner.area = (next.y * corner.x - corner.y * next.x) * 0.5f;
+            corner.dot = corner.y * next.y + corner.x * next.x;
+            if (areaTol > std::fabs(corner.area) && 0.0f > corner.dot)
+                return i;
+        }
+        return kNoEdge;
+    }
+
+    /// Adds to the weights what they come to off the edges, and normalises them. \return how many are too far below
+    /// zero
+    unsigned int weighCorners(unsigned int polySize, float areaTol, CornerView const* corners, float* weights)
+    {
+        float sum = 0;
+        CornerView const* previous = &corners[polySize - 1];
+        for (unsigned int i = 0; i != polySize; ++i) {
+            CornerView const& corner = corners[i];
+            // Near-flat triangles give no term: the point lies on the line of the edge, beyond its ends.
+            if (std::fabs(previous->area) >= areaTol)
+                weights[i] += (previous->r - previous->dot / corner.r) / previous->area;
+            if (std::fabs(corner.area) >= areaTol)
+                weights[i] += (corners[nextCorner(i, polySize)].r - corner.dot / corner.r) / corner.area;
+            sum += weights[i];
+            previous = &corner;
+        }
+        unsigned int outside = 0;
+        for (unsigned int i = 0; i != polySize; ++i) {
+            weights[i] /= sum;
+            outside += kLowestWeight > weights[i];
+        }
+        return outside;
+    }
+
+    float meanEdgeLength(Points const& polygon, unsigned int polySize)
+    {
+        float sum = 0;
+        for (unsigned int i = 0; i != polySize; ++i) {
+            float3 const edge = polygon[nextCorner(i, polySize)] - polygon[i];
+            sum += std::sqrt(edge.x * edge.x + edge.y * edge.y);
+        }
+        return sum / static_cast<float>(polySize);
+    }
+
+    bool isFlat(Points const& polygon, float tolerance)
+    {
+        return std::none_of(
+            polygon.begin(), polygon.end(), [=](float3 const& corner) { return std::fabs(corner.z) > tolerance; });
+    }
+
+    /// The positions of a face's corners; null where one is not there.
+    Orvan::Ptr<Points> cornersOfFace(Indices const& faceVertex, Points const& positions)
+    {
+        auto polygon = Orvan::MutablePtr<Points>::make(faceVertex.size, Orvan::kUninitialized);
+        for (std::uint64_t corner = 0; corner != faceVertex.size; ++corner) {
+            if (faceVertex[corner] >= positions.size)
+                return nullptr;
+            (*polygon)[corner] = positions[faceVertex[corner]];
+        }
+        return polygon;
+    }
+
+    /// A stretch of the positions; empty where the offsets fall or lead beyond them.
+    std::span<float3 const> pointsOfStrand(Indices const& offsets, std::uint64_t strand, Points const& positions)
+    {
+        unsigned int const first = offsets[strand];
+        unsigned int const last = offsets[strand + 1];
+        if (first >= last || last > positions.size)
+            return {};
+        return {positions.data + first, positions.data + last};
+    }
+
+    /// The weight of a corner at a strand end; 0 for strands that a template was given and that have no such weight.
+    float weightAt(pair const& place, unsigned int corner, Orvan::Array<LocalStrand> const& strands)
+    {
+        if (place.strand >= strands.size || strands[place.strand].controlPoints.empty())
+            return 0;
+        auto const& controlPoints = strands[place.strand].controlPoints;
+        Weights const& weights = controlPoints[place.end ? controlPoints.size - 1 : 0];
+        return corner < weights.size ? weights[corner] : 0;
+    }
+
+    /// Ascending by the weight of a corner; of equal ones only the last stays.
+    Orvan::Array<pair> sortEnds(
+        Orvan::Array<pair> const& ends, unsigned int corner, Orvan::Array<LocalStrand> const& strands)
+    {
+        std::vector<std::pair<float, std::uint64_t>> order;
+        order.reserve(ends.size);
+        for (std::uint64_t i = 0; i != ends.size; ++i) {
+            float const weight = weightAt(ends[i], corner, strands);
+            order.emplace_back(std::isnan(weight) ? 0.0f : weight, i); // recorded ends are never on NaN
+        }
+        std::sort(order.begin(), order.end());
+
+        Orvan::Array<pair> sorted;
+        sorted.reserve(ends.size);
+        for (std::size_t i = 0; i != order.size(); ++i)
+            if (i + 1 == order.size() || order[i].first != order[i + 1].first)
+                sorted.append(ends[order[i].second]);
+        return sorted;
+    }
+
+    float3 blend(Points const& vectors, Weights const& weights, unsigned int polySize)
+    {
+        std::uint64_t const count = std::min<std::uint64_t>({polySize, vectors.size, weights.size});
+        float3 sum{0, 0, 0};
+        for (std::uint64_t i = 0; i != count; ++i)
+            sum = sum + vectors[i] * weights[i];
+        return sum;
+    }
+
+    /// From the base of a control point to it. The normal may have any length.
+    float3 raise(float3 const& base, float3 const& normal, float height, float scale, bool flip)
+    {
+        float const norm = length(normal);
+        float3 const direction{normal.x / norm, normal.y / norm, normal.z / norm};
+        float3 const offset = (direction * height) * scale;
+        return flip ? base - offset : base + offset;
+    }
+
+}
+
+StitchTemplate::StitchTemplate()
+    : errors_("---empty stitch template---")
+{
+}
+
+StitchTemplate::StitchTemplate(Orvan::Ptr<Points> const& polygon, Orvan::Ptr<Points> const& strandPositions,
+    Orvan::Ptr<Indices> const& strandOffsets, bool strict)
+{
+    construct(polygon, strandPositions, strandOffsets, strict);
+}
+
+StitchTemplate::StitchTemplate(Tessara::Object const& mesh, Tessara::Object const& strandSet, bool strict)
+{
+    using namespace Tessara::Geometry;
+    if (getElementCount(mesh, sFaceComp) != 1) {
+        errors_ += "---input mesh not single polygon---";
+        return;
+    }
+    auto const positions = readGeoPropData<float3>(mesh, sPointPosition);
+    auto const faceVertex = readGeoPropData<unsigned int>(mesh, sFaceVertex);
+    if (!faceVertex) {
+        errors_ += "---input poly missing face_vertices property---";
+        return;
+    }
+    if (!positions) {
+        errors_ += "---input poly missing point_positions property---";
+        return;
+    }
+    construct(cornersOfFace(*faceVertex, *positions), readGeoPropData<float3>(strandSet, sPointPosition),
+        readGeoPropData<unsigned int>(strandSet, sStrandOffset), strict);
+}
+
+void StitchTemplate::construct(Orvan::Ptr<Points> const& polygon, Orvan::Ptr<Points> const& strandPositions,
+    Orvan::Ptr<Indices> const& strandOffsets, bool strict)
+{
+    std::optional<float> const scale = measurePolygon(polygon.get(), strandPositions.get(), strandOffsets.get());
+    if (!scale)
+        return;
+    std::uint64_t const strandCount = strandOffsets->size - 1;
+    strands_.reserve(strands_.size + strandCount);
+    for (std::uint64_t strand = 0; strand != strandCount; ++strand)
+        appendStrand(*polygon, pointsOfStrand(*strandOffsets, strand, *strandPositions),
+            static_cast<unsigned int>(strand), *scale, strict);
+    for (unsigned int edge = 0; edge != polySize_; ++edge)
+        orderEndsOnEdge(edge, strict);
+}
+
+std::optional<float> StitchTemplate::measurePolygon(
+    Points const* polygon, Points const* strandPositions, Indices const* strandOffsets)
+{
+    auto const refuse = [this](char const* error) {
+        errors_ += error;
+        return std::nullopt;
+    };
+    if (!polygon || !strandPositions || !strandOffsets)
+        return refuse("---invalid input: missing polygon or strand---");
+    polySize_ = static_cast<unsigned int>(polygon->size);
+    edgeEndpoints_.resize(polySize_);
+    if (polySize_ == 0)
+        return refuse("---invalid input: polygon is empty---");
+    if (polySize_ < 3)
+        return refuse("---invalid input: polygon is degenerated---");
+    if (strandOffsets->size < 2)
+        return refuse("---invalid input: empty input strands offset---");
+
+    float const scale = meanEdgeLength(*polygon, polySize_);
+    tol_ *= scale;
+    if (!isFlat(*polygon, tol_))
+        return refuse("---invalid input: input polygon must lie in the xy plane---");
+    return scale;
+}
+
+void StitchTemplate::appendStrand(
+    Points const& polygon, std::span<float3 const> points, unsigned int number, float scale, bool strict)
+{
+    LocalStrand strand{polySize_, {}};
+    strand.controlPoints.reserve(points.size());
+    for (std::size_t point = 0; point != points.size(); ++point) {
+        Weights weights(std::uint64_t{polySize_} + 1);
+        unsigned int const edge = computeMeanValueCoordinates(polygon, points[point], weights, scale);
+        if (point == 0)
+            recordEnd({number, false}, edge, weights, strict);
+        if (point == points.size() - 1)
+            recordEnd({number, true}, edge, weights, strict);
+        strand.controlPoints.append(std::move(weights));
+    }
+    strands_.append(std::move(strand));
+}
+
+void StitchTemplate::recordEnd(pair const& place, unsigned int edge, Weights const& weights, bool strict)
+{
+    if (edge == kNoEdge) {
+        if (strict)
+            errors_ += place.end ? "---strand ending point not on polygon edge---"
+                                 : "---strand starting point not on polygon edge---";
+    } else if (weights[edge] > 0 && weights[nextCorner(edge, polySize_)] > 0) {
+        edgeEndpoints_[edge].append(place);
+    } else {
+        errors_ += place.end ? "---strand ending point on edge but outside of polygon---"
+                             : "---strand starting point on edge but outside of polygon---";
+    }
+}
+
+void StitchTemplate::orderEndsOnEdge(unsigned int edge, bool strict)
+{
+    Orvan::Array<pair>& ends = edgeEndpoints_[edge];
+    if (ends.size == 2) {
+        // An end nearer to the edge's first corner comes first.
+        if (weightAt(ends[1], edge, strands_) > weightAt(ends[0], edge, strands_))
+            std::swap(ends[0], ends[1]);
+    } else if (ends.size != 1 && strict) {
+        errors_ += "---polygon edge contains too few/many strand end points---";
+    } else if (ends.size > 2) {
+        ends = sortEnds(ends, nextCorner(edge, polySize_), strands_);
+    }
+}
+
+unsigned int StitchTemplate::computeMeanValueCoordinates(
+    Points const& polygon, float3 const& point, Weights& weights, float scale)
+{
+    weights[polySize_] = point.z / scale;
+    if (polySize_ == 0)
+        return kNoEdge;
+
+    CornerViews views(polySize_);
+    CornerView* const corners = views.get();
+    unsigned int const close = findCloseCorner(polygon, point, polySize_, tol_, corners);
+    if (close != polySize_) {
+        weights[close] = 1.0f;
+        errors_ += "---control point too close to polygon vertex---";
+        return kNoEdge;
+    }
+
+    float const areaTol = tol_ * scale; // an area, where the corners were compared with a length
+    unsigned int const edge = findEdge(polySize_, areaTol, corners);
+    if (edge != kNoEdge) {
+        unsigned int const next = nextCorner(edge, polySize_);
+        weights[edge] = corners[next].r / (corners[next].r + corners[edge].r);
+        weights[next] = 1.0f - weights[edge];
+        if (kLowestWeight > weights[edge] || kLowestWeight > weights[next])
+            errors_ += "---point lies along polygon edge but too far out side of polygon---";
+        return edge;
+    }
+
+    for (unsigned int outside = weighCorners(polySize_, areaTol, corners, weights.data); outside != 0; --outside)
+        errors_ += "---point lies too far out side of polygon---";
+    return kNoEdge;
+}
+
+void StitchTemplate::findControlPointPos(Points const& polygon, Weights const& weights, float scale,
+    Points const& normals, bool flip, float3& position) const
+{
+    float3 const base = blend(polygon, weights, polySize_);
+    bool const hasHeight = weights.size > polySize_;
+    position = hasHeight ? raise(base, blend(normals, weights, polySize_), weights[polySize_], scale, flip) : base;
+}
+
+void StitchTemplate::findControlPointPos(
+    Points const& polygon, Weights const& weights, float scale, bool flip, float3& position) const
+{
+    float3 const base = blend(polygon, weights, polySize_);
+    if (polygon.size < 3 || weights.size <= polySize_) {
+        position = base;
+        return;
+    }
+    float3 const normal = cross(polygon[1] - polygon[0], polygon[2] - polygon[0]);
+    position = raise(base, normal, weights[polySize_], scale, flip);
+}
+
+unsigned int StitchTemplate::getPolySize() const
+{
+    return polySize_;
+}
+
+Orvan::Array<LocalStrand> const& StitchTemplate::getStrands() const
+{
+    return strands_;
+}
+
+Orvan::Array<Orvan::Array<pair>> const& StitchTemplate::getEdgeEndpoints() const
+{
+    return edgeEndpoints_;
+}
+
+Orvan::String const& StitchTemplate::getErrors() const
+{
+    return errors_;
+}
+
+float StitchTemplate::getTol() const
+{
+    return tol_;
+}
+
+void StitchTemplate::setPolySize(unsigned int polySize)
+{
+    polySize_ = polySize;
+}
+
+void StitchTemplate::setStrands(Orvan::Array<LocalStrand> const& strands)
+{
+    strands_ = strands;
+}
+
+void StitchTemplate::setEdgeEndpoints(Orvan::Array<Orvan::Array<pair>> const& edgeEndpoints)
+{
+    edgeEndpoints_ = edgeEndpoints;
+}
+
+void StitchTemplate::setErrors(Orvan::String const& errors)
+{
+    errors_ = errors;
+}
+
+void StitchTemplate::setTol(float tol)
+{
+    tol_ = tol;
+}
+
+}
