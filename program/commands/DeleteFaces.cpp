@@ -1,6 +1,7 @@
 #include "Commands.h"
 #include "Failure.h"
 #include "Geometry.h"
+#include "MeshRequirements.h"
 #include "MeshTopology.h"
 #include "Operation.h"
 #include "Selection.h"
@@ -40,10 +41,7 @@ namespace {
     {
         requireWritable(options.out);
         Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(options.in, report);
-        if (typeOf(*mesh) != GeometryType::Mesh)
-            throw Failure(ExitCode::Refused,
-                fmt::format(
-                    "delete-faces needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+        requireMesh(*mesh, "delete-faces", options.in);
         requireFacesWithCorners(*mesh, options.in);
         Json const before = countsOf(*mesh);
         Orvan::Array<bool> const picked = pickElements(options.selection, kFaces, *mesh, report);

@@ -1,6 +1,7 @@
 #include "Commands.h"
 #include "Failure.h"
 #include "Geometry.h"
+#include "MeshRequirements.h"
 #include "MeshTopology.h"
 #include "Operation.h"
 
@@ -174,9 +175,7 @@ namespace {
     {
         requireWritable(options.out);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        if (typeOf(*mesh) != GeometryType::Mesh)
-            throw Failure(ExitCode::Refused,
-                fmt::format("smooth needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+        requireMesh(*mesh, "smooth", options.in);
         MeshTopology const topology = analyseTopology(arraysOf(*mesh));
         settleIsolatedPoints(options, topology, *mesh, report);
         auto const weights = weightsOf(options, *mesh, report);

@@ -1,6 +1,7 @@
 #include "Commands.h"
 #include "Failure.h"
 #include "Geometry.h"
+#include "MeshRequirements.h"
 #include "Operation.h"
 #include "Triangulation.h"
 
@@ -77,9 +78,7 @@ namespace {
         requireChannels(options.channels);
         requireWritable(options.out);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        if (typeOf(*mesh) != GeometryType::Mesh)
-            throw Failure(ExitCode::Refused,
-                fmt::format("triangulate needs a mesh, and {} holds a {}", options.in.string(), nameOf(typeOf(*mesh))));
+        requireMesh(*mesh, "triangulate", options.in);
 
         Object const measured = options.keepsUnits ? *mesh : inFineUnits(*mesh);
         Object result;
