@@ -5,3 +5,6 @@
 #else
 #define MODELING_EXPORT
 #endif
+
+// A private member of an exported class.
+#define MODELING_NO_EXPORT __attribute__((visibility("hidden")))

@@ -4,6 +4,7 @@
 
 #include <Modeling/HalfEdgeDataStructure.h>
 #include <Modeling/StitchTemplate.h>
+#include <Modeling/VoxelSampler.h>
 #include <Modeling/addPointsToPointCloud.h>
 #include <Modeling/computeDeletedComponentMapping.h>
 #include <Modeling/copyNonGeoProperties.h>
@@ -16,5 +17,6 @@
 #include <Modeling/removeSlivers.h>
 #include <Modeling/smooth.h>
 #include <Modeling/subdivide.h>
+#include <Modeling/subdivideByVolume.h>
 #include <Modeling/subdivisionSteps.h>
 #include <Modeling/triangulate.h>

@@ -1,28 +1,15 @@
 #include <Modeling/subdivisionSteps.h>
 
+#include "faceSize.h"
+
 #include "frame/ParallelFor.h"
 
-#include <cmath>
 #include <limits>
 
 namespace Geometry::Mesh::Internal {
 
 using namespace Modeling;
 using Tessara::Math::float3;
-
-namespace {
-
-    /// The longest side of the triangle's box along the axes.
-    float longestBoxSide(float3 const& a, float3 const& b, float3 const& c)
-    {
-        float longest = 0;
-        for (float const side :
-            {b.x - a.x, b.y - a.y, b.z - a.z, c.x - b.x, c.y - b.y, c.z - b.z, a.x - c.x, a.y - c.y, a.z - c.z})
-            longest = std::abs(side) > longest ? std::abs(side) : longest;
-        return longest;
-    }
-
-}
 
 void markForSubdivision(float tolerance, unsigned int numFaces, Orvan::Array<float3> const& positions,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,

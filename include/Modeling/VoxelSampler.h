@@ -1,0 +1,151 @@
+#pragma once
+
+#include <Modeling/Export.h>
+#include <OrvanCore/String.h>
+#include <TessaraGeometryVolume/Channel.h>
+#include <TessaraGeometryVolume/Container.h>
+#include <TessaraGeometryVolume/VoxelTopology.h>
+#include <TessaraMathSupport/Types.h>
+
+#include <array>
+#include <cstdint>
+#include <vector>
+
+namespace TSR::TileTree3D {
+
+/// Reads values of a sparse volume at points. What kinds have in common: finding the tile, and the place in it.
+template <class Traits, class Value, class Point> class VoxelSampler;
+/// One that blends the eight values around a point.
+template <class Traits, class Value, int components, class Real, class Point, int, int> class VoxelSamplerLinear;
+
+template <class Traits> using LinearSampler = VoxelSamplerLinear<Traits, float, 1, float, Tessara::Math::float3, 0, 0>;
+
+template <class Traits> class MODELING_EXPORT VoxelSampler<Traits, float, Tessara::Math::float3> {
+public:
+    using ContainerType = Container<Traits>;
+    using TileType = typename ContainerType::TileType;
+
+    virtual ~VoxelSampler();
+    /// "kNone"
+    virtual Orvan::String name() const;
+
+protected:
+    /// Where a point is: its voxel in the tile's data, and how far towards the next voxel.
+    struct Place {
+        TreeIndex tile; // none outside all tiles
+        IJK voxel;
+        Tessara::Math::float3 fraction;
+    };
+
+    MODELING_NO_EXPORT VoxelSampler(
+        ContainerType const& container, float scale, Tessara::Math::float3 const& voxelOffset) noexcept;
+    // A copy looks for its tile anew.
+    MODELING_NO_EXPORT VoxelSampler(VoxelSampler const& other) noexcept;
+    VoxelSampler& operator=(VoxelSampler const&) = delete;
+
+    MODELING_NO_EXPORT Place locate(Tessara::Math::float3 const& point, int depth, int space);
+    MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }
+
+private:
+    typename ContainerType::ConstTileAccessor cursor_;
+    float scale_;
+    Tessara::Math::float3 voxelOffset_;
+    TileBinaryNonCompatible<Traits::kChildCount> const* tile_;
+    TileBinaryNonCompatible<Traits::kChildCount> noTile_;
+};
+
+/// What a sampler is told besides the volume.
+struct LinearSamplerSettings {
+    float scale = 1; // index units a unit of length of the points
+    Tessara::Math::float3 voxelOffset{0, 0, 0}; // in voxels; where the value of a voxel stands, from its lower corner
+    float background = 0; // outside all tiles
+    int minDepth = 0; // tiles above it count as missing
+    int maxDepth = 0x7FFFFFFF; // no deeper tile is read
+};
+
+/// Blends the eight values around a point along x, then y, then z. Where some of them lie in other tiles, it builds a
+/// copy of the tile with a layer of voxels more, and keeps the last one of each depth.
+///
+/// A sampler holds on to its place from one sample to the next, so each thread needs a copy of its own; copies begin
+/// with empty caches. It reads the volume only. A sample takes no memory, but for the first one of a copy that needs
+/// the caches.
+///
+/// What lies around a tile depends on the volume's offset type. With all bits set, samples read a layer across the upper
+/// faces: of neighbours where there are any (`setHaloTile`). Otherwise they read a layer all around, and
+/// - a tile without parent values has no neighbours there: along axes with a clear bit the layer mirrors the tile at
+///   `background`, along others it is `background`, as is then the tile's own first layer;
+/// - a tile with parent values looks for its neighbours at a fixed distance: 2 index units in `Traits2`, 5 in `Traits5`.
+///   Where tiles are wider than that, the upper neighbour is the tile itself.
+/// Volumes to guide a refinement are best built with all bits set.
+template <class Traits> class MODELING_EXPORT VoxelSamplerLinear<Traits, float, 1, float, Tessara::Math::float3, 0, 0>
+    : public VoxelSampler<Traits, float, Tessara::Math::float3> {
+public:
+    using ChannelType = Channel<Traits, float>;
+
+    /// \param haloChannel  Tiles with a layer more on their upper sides (`makeHaloChannel`), read instead of `channel`
+    ///                     where it is given: samples then need no cache. Below the first voxel there is nothing, so it
+    ///                     fits offsets that are not positive.
+    /// All of the volume has to outlive the sampler and its copies.
+    VoxelSamplerLinear(Container<Traits> const& container, ChannelType const& channel, VoxelTopology const& topology,
+        LinearSamplerSettings const& settings, ChannelType const* haloChannel = nullptr);
+    VoxelSamplerLinear(VoxelSamplerLinear const& other);
+    ~VoxelSamplerLinear() override;
+    /// "kLinear"
+    Orvan::String name() const override;
+
+    /// The value at a point, `background` where no tile holds data. Outside the range of 32-bit indices, and where a
+    /// coordinate is no number, there are no tiles.
+    /// \param depth  of the tiles to read; where the tree ends above, the tile that it ends in is read
+    /// \param space  2: `point` is in units of length; anything else: in index units
+    float sample(Tessara::Math::float3 const& point, int depth, int space);
+
+private:
+    using Base = VoxelSampler<Traits, float, Tessara::Math::float3>;
+    using typename Base::TileType;
+    enum : int { kSide = Traits::kSide };
+
+    enum : std::uint64_t { kNoKey = ~std::uint64_t{0} };
+    enum : std::uint32_t { kNoSlot = ~std::uint32_t{0} };
+
+    /// A tile with a layer around it, which belongs to the tile with the number `key`.
+    template <int side> struct HaloSlot {
+        std::uint64_t key = kNoKey;
+        TileData<float, side, 0> values;
+        std::uint64_t stamp = 0; // when it was used last
+    };
+    template <int side> using HaloCache = std::vector<HaloSlot<side>>;
+
+    MODELING_NO_EXPORT float samplePositive(typename Base::Place const& place);
+    MODELING_NO_EXPORT float sampleFull(typename Base::Place const& place);
+    template <int side> MODELING_NO_EXPORT HaloSlot<side> const& haloOf(TileType const& tile, HaloCache<side>& cache);
+    template <int side> MODELING_NO_EXPORT std::uint32_t findHalo(std::uint64_t key, int depth, HaloCache<side>& cache);
+    template <int side> MODELING_NO_EXPORT std::uint32_t buildHalo(TileType const& tile, HaloCache<side>& cache);
+    MODELING_NO_EXPORT bool drawsOnParent(TileType const& tile) const;
+    MODELING_NO_EXPORT void fillHalo(TileType const& tile, HaloSlot<kSide + 1>& slot);
+    MODELING_NO_EXPORT void fillHalo(TileType const& tile, HaloSlot<kSide + 2>& slot);
+    using TilesAround = std::array<ConstTileData<float, kSide, 0>, 27>;
+    MODELING_NO_EXPORT TilesAround tilesAround(TileType const& tile);
+
+    typename Container<Traits>::ConstTileAccessor neighbours_;
+    unsigned int offsetType_;
+    HaloCache<kSide + 1> positiveHaloCache_; // a slot a depth, once one is needed
+    HaloCache<kSide + 2> fullHaloCache_;
+    std::uint64_t stamp_ = 0;
+    std::uint64_t lastKey_[Traits::kDepthCount];
+    std::uint32_t lastSlot_[Traits::kDepthCount];
+    Container<Traits> const* container_;
+    ChannelType const* channel_;
+    ChannelType const* haloChannel_;
+    VoxelTopology const* topology_;
+    float background_;
+    int minDepth_;
+    int maxDepth_;
+    int coarsestDepth_; // with data
+};
+
+extern template class MODELING_EXPORT VoxelSampler<Traits2, float, Tessara::Math::float3>;
+extern template class MODELING_EXPORT VoxelSampler<Traits5, float, Tessara::Math::float3>;
+extern template class MODELING_EXPORT VoxelSamplerLinear<Traits2, float, 1, float, Tessara::Math::float3, 0, 0>;
+extern template class MODELING_EXPORT VoxelSamplerLinear<Traits5, float, 1, float, Tessara::Math::float3, 0, 0>;
+
+}

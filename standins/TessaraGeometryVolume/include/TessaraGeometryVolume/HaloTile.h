@@ -1,0 +1,35 @@
+#pragma once
+
+#include <TessaraGeometryVolume/Channel.h>
+#include <TessaraGeometryVolume/Container.h>
+
+namespace TSR::TileTree3D {
+
+/// A tile with a layer more on its upper sides: what a trilinear sample between its last voxels and the next ones
+/// reads.
+template <class Traits> using PositiveHalo = TileData<float, Traits::kSide + 1, 0>;
+
+/// Fills the halo tile of `tile`, coordinates 0 to `kSide`. Across the upper faces, edges and corner it takes the first
+/// layer of the neighbours of the same depth that hold data. What is missing continues the parent's values; without
+/// any, the outermost layer of the tile itself.
+///
+/// \param parentTile  May be null.
+/// \param parentHalo  That of the parent tile; may be empty, and then the parent's values are not used.
+/// \param order       How the parent's values are continued: 2, linear between them; 1, the one below.
+/// \param accessor    Fetches the neighbours.
+/// \param out         Empty afterwards where the tile holds no data.
+/// Takes no memory.
+template <class Traits> void setHaloTile(typename Container<Traits>::TileType const& tile,
+    typename Container<Traits>::TileType const* parentTile, Channel<Traits, float> const& channel,
+    PositiveHalo<Traits> const& parentHalo, int order, typename Container<Traits>::ConstTileAccessor& accessor,
+    PositiveHalo<Traits>& out);
+
+// Traits cannot be deduced through the types above.
+extern template TESSARAGEOMETRYVOLUME_EXPORT void setHaloTile<Traits2>(Container<Traits2>::TileType const&,
+    Container<Traits2>::TileType const*, Channel<Traits2, float> const&, PositiveHalo<Traits2> const&, int,
+    Container<Traits2>::ConstTileAccessor&, PositiveHalo<Traits2>&);
+extern template TESSARAGEOMETRYVOLUME_EXPORT void setHaloTile<Traits5>(Container<Traits5>::TileType const&,
+    Container<Traits5>::TileType const*, Channel<Traits5, float> const&, PositiveHalo<Traits5> const&, int,
+    Container<Traits5>::ConstTileAccessor&, PositiveHalo<Traits5>&);
+
+}

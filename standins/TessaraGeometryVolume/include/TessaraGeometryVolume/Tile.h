@@ -1,0 +1,54 @@
+#pragma once
+
+#include <TessaraGeometryVolume/TileTraits.h>
+
+namespace TSR::TileTree3D {
+
+/// What a tile is in a tree with `kChildCount` children to a tile, whatever their arrangement. Empty unless it belongs
+/// to a container: a cursor without a tile can rest on such a one.
+template <int childCount> struct TileBinaryNonCompatible {
+    // The corner with the lowest indices: a multiple of the tile's width, and so perhaps below what 32 bits hold.
+    std::int64_t i = 0, j = 0, k = 0;
+    std::int64_t parent = -1; // among the tiles one depth up; negative without one
+    std::uint32_t index = 0; // among the tiles of its depth
+    std::int32_t depth = -1;
+    bool valid = false;
+    bool isTerminal = false; // has values of its own: where the tree ends here, they stand for all that is deeper
+    bool hasChildren = false;
+
+    /// No tile where this is not a valid one.
+    TreeIndex treeIndex() const noexcept
+    {
+        return valid ? TreeIndex{index, static_cast<std::uint32_t>(depth)} : TreeIndex();
+    }
+};
+
+template <class Traits, int childCount> struct Tile : TileBinaryNonCompatible<childCount> {
+    static_assert(childCount == Traits::kChildCount);
+
+    /// No tile at depth 0.
+    TreeIndex parentTreeIndex() const noexcept
+    {
+        if (!this->valid || this->parent < 0)
+            return {};
+        return {static_cast<std::uint64_t>(this->parent), static_cast<std::uint32_t>(this->depth - 1)};
+    }
+
+    /// The position of this tile in its parent: 0 to `kChildrenPerAxis` - 1 along each axis.
+    IJK childIJK() const noexcept
+    {
+        std::int64_t const width = Traits::tileWidth(this->depth);
+        return {placeAmongSiblings(this->i / width), placeAmongSiblings(this->j / width),
+            placeAmongSiblings(this->k / width)};
+    }
+
+private:
+    // Of a tile's number along an axis, which may be negative.
+    static int placeAmongSiblings(std::int64_t number) noexcept
+    {
+        std::int64_t const remainder = number % Traits::kChildrenPerAxis;
+        return static_cast<int>(remainder < 0 ? remainder + Traits::kChildrenPerAxis : remainder);
+    }
+};
+
+}

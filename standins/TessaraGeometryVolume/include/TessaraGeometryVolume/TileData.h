@@ -1,0 +1,73 @@
+#pragma once
+
+#include <cstddef>
+
+namespace TSR::TileTree3D {
+
+/// The values of a cube of `side`³ voxels, x fastest, that stand somewhere else; or none.
+template <class T, int side, int> class ConstTileData {
+public:
+    ConstTileData() noexcept = default;
+    /// \param firstCoordinate  of the first voxel along all axes: -1 in a tile with a halo all around
+    explicit ConstTileData(T const* values, int firstCoordinate = 0) noexcept
+        : values_(values)
+        , first_(firstCoordinate)
+    {
+    }
+
+    explicit operator bool() const noexcept { return values_; }
+    T operator()(int linearIndex) const noexcept { return values_[linearIndex]; }
+    T operator()(int i, int j, int k) const noexcept
+    {
+        return values_[i - first_ + (j - first_ + (k - first_) * side) * side];
+    }
+    T const* values() const noexcept { return values_; }
+
+private:
+    T const* values_ = nullptr;
+    int first_ = 0;
+};
+
+/// The same with room of its own. Default constructed it has no values. A copy costs a copy of the room.
+template <class T, int side, int> class TileData {
+public:
+    static constexpr int kVoxelCount = side * side * side;
+
+    TileData() noexcept { } // leaves the room as it is
+    /// With room for all values, which are to be written yet.
+    explicit TileData(int firstCoordinate) noexcept
+        : first_(firstCoordinate)
+        , hasValues_(true)
+    {
+    }
+
+    explicit operator bool() const noexcept { return hasValues_; }
+    T& operator()(int linearIndex) noexcept { return values_[linearIndex]; }
+    T operator()(int linearIndex) const noexcept { return values_[linearIndex]; }
+    T& operator()(int i, int j, int k) noexcept { return values_[indexOf(i, j, k)]; }
+    T operator()(int i, int j, int k) const noexcept { return values_[indexOf(i, j, k)]; }
+    T const* values() const noexcept { return values_; }
+
+    /// Of what is here now, and for as long as it stays where it is.
+    operator ConstTileData<T, side, 0>() const noexcept
+    {
+        return hasValues_ ? ConstTileData<T, side, 0>(values_, first_) : ConstTileData<T, side, 0>();
+    }
+
+    /// For a room that is used again: values are to be written yet, or there are none.
+    void reset(int firstCoordinate) noexcept
+    {
+        first_ = firstCoordinate;
+        hasValues_ = true;
+    }
+    void clear() noexcept { hasValues_ = false; }
+
+private:
+    int indexOf(int i, int j, int k) const noexcept { return i - first_ + (j - first_ + (k - first_) * side) * side; }
+
+    T values_[kVoxelCount];
+    int first_ = 0;
+    bool hasValues_ = false;
+};
+
+}

@@ -1,0 +1,79 @@
+#pragma once
+
+#include <TessaraGeometryVolume/Channel.h>
+#include <TessaraGeometryVolume/Container.h>
+#include <TessaraGeometryVolume/VoxelTopology.h>
+
+#include <optional>
+#include <span>
+
+namespace TSR::TileTree3D {
+
+/// A sparse field of values: what there is of tiles, what stands in them, and what their values stand for.
+template <class Traits> struct Volume {
+    Container<Traits> container;
+    Channel<Traits, float> channel;
+    VoxelTopology topology;
+    float background = 0; // everywhere else
+};
+
+/// A value at a voxel, counted in voxels of its depth.
+struct Voxel {
+    int i, j, k;
+    float value;
+};
+
+/// Voxels of one depth. Of several values for the same voxel the last stands.
+struct VoxelList {
+    int depth;
+    std::span<Voxel const> voxels;
+};
+
+/// All voxels from `first` up to but without `end`, counted in voxels of the source's `depth`, of one value.
+struct ConstantBox {
+    IJK first, end;
+    float value;
+};
+
+/// All voxels of a box, x fastest: `size.i * size.j * size.k` values.
+struct DenseBlock {
+    IJK first, size;
+    float const* values;
+};
+
+/// What a volume is built from. Boxes come first, then lists from coarse to fine, then the block: where they overlap, what
+/// comes later stands, and the rest of a tile that is begun inside a coarser one has the coarser one's values.
+struct VolumeSource {
+    float background = 0;
+    unsigned int offsetType = 7; // see VoxelTopology
+    int depth; // of boxes and the block
+    std::span<ConstantBox const> boxes = {};
+    std::span<VoxelList const> lists = {};
+    DenseBlock block = {{0, 0, 0}, {0, 0, 0}, nullptr};
+    /// Tiles of all depths from this one on hold data, taken from those inside them. Never below that of the coarsest
+    /// list or box tile, which is also the default.
+    std::optional<int> coarsestDepth = {};
+};
+
+/// Builds the tree in one go. Boxes become tiles as coarse as they can be without a voxel more, or a value between
+/// voxels that is another than in voxels of `depth`. Tiles are numbered in the order in which they are first needed.
+///
+/// Coarse tiles above given ones take, along an axis with a set bit of `offsetType`, the value at the place of theirs,
+/// along one with a clear bit the mean of the voxels that they cover; `background` where there is none.
+///
+/// Linear in voxels, and for boxes in their surface. Memory is proportional to tiles with active voxels.
+/// \throws std::invalid_argument  for a depth that the layout does not have, a voxel beyond 32-bit indices, and an
+///                                `offsetType` above 7
+/// \throws std::bad_alloc         also for 2^32 - 1 tiles of one depth
+template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source);
+
+/// A channel with a layer more on the upper sides: what `setHaloTile` gives for every tile that has data. Twice the
+/// memory, and samples need no halo tiles of their own.
+template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume);
+
+extern template TESSARAGEOMETRYVOLUME_EXPORT Volume<Traits2> buildVolume(VolumeSource const& source);
+extern template TESSARAGEOMETRYVOLUME_EXPORT Volume<Traits5> buildVolume(VolumeSource const& source);
+extern template TESSARAGEOMETRYVOLUME_EXPORT Channel<Traits2, float> makeHaloChannel(Volume<Traits2> const& volume);
+extern template TESSARAGEOMETRYVOLUME_EXPORT Channel<Traits5, float> makeHaloChannel(Volume<Traits5> const& volume);
+
+}
