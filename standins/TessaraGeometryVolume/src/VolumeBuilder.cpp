@@ -111,7 +111,7 @@ namespace {
         {
             for (int coarser = depth - 1; coarser >= coarsestTerminal_; --coarser) {
                 Tile const& tile = volume_.container.find(origin.i, origin.j, origin.k, coarser);
-                if (!tile.valid)
+                if (!tile.isTerminal)
                     continue;
                 auto const coarse = volume_.channel.tileData(tile.treeIndex());
                 // In voxels of the new tile's depth.
@@ -258,7 +258,13 @@ namespace {
             int const coarsest = std::min(coarsestTerminal_, source_.coarsestDepth.value_or(Traits::kDepthCount));
             for (int depth = Traits::kDeepest; depth >= coarsest; --depth) {
                 std::size_t const tiles = volume_.container.tileCount(depth);
-                volume_.channel.values(depth).resize(tiles * Traits::kVoxelCount, volume_.background);
+                std::vector<float>& values = volume_.channel.values(depth);
+                std::size_t const known = values.size() / Traits::kVoxelCount;
+                values.resize(tiles * Traits::kVoxelCount, volume_.background);
+                for (std::size_t number = known; number < tiles; ++number) {
+                    Tile const& tile = volume_.container.tile(number, depth);
+                    takeFromCoarser({tile.i, tile.j, tile.k}, depth, values.data() + number * Traits::kVoxelCount);
+                }
                 if (depth < Traits::kDeepest)
                     for (std::size_t child = 0; child < volume_.container.tileCount(depth + 1); ++child)
                         restrictToParent(volume_.container.tile(child, depth + 1));
@@ -268,6 +274,8 @@ namespace {
         /// Along an axis with a set bit the voxel at the same place, along one with a clear bit the mean.
         void restrictToParent(Tile const& tile)
         {
+            if (volume_.container.tile(tile.parentTreeIndex()).isTerminal)
+                return; // its values were given
             auto const fine = volume_.channel.tileData(tile.treeIndex());
             float* const coarse = volume_.channel.values(tile.depth - 1).data()
                 + static_cast<std::size_t>(tile.parent) * Traits::kVoxelCount;

@@ -58,8 +58,9 @@ struct VolumeSource {
 /// Builds the tree in one go. Boxes become tiles as coarse as they can be without a voxel more, or a value between
 /// voxels that is another than in voxels of `depth`. Tiles are numbered in the order in which they are first needed.
 ///
-/// Coarse tiles above given ones take, along an axis with a set bit of `offsetType`, the value at the place of theirs,
-/// along one with a clear bit the mean of the voxels that they cover; `background` where there is none.
+/// Tiles between and above given ones take, along an axis with a set bit of `offsetType`, the value at the place of
+/// theirs, along one with a clear bit the mean of the voxels that they cover; where there is none, what a given tile
+/// above says, or `background`.
 ///
 /// Linear in voxels, and for boxes in their surface. Memory is proportional to tiles with active voxels.
 /// \throws std::invalid_argument  for a depth that the layout does not have, a voxel beyond 32-bit indices, and an

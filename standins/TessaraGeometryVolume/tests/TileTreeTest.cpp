@@ -1,0 +1,301 @@
+#include <TessaraGeometryVolume/HaloTile.h>
+#include <TessaraGeometryVolume/VolumeBuilder.h>
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <climits>
+#include <map>
+#include <random>
+#include <set>
+#include <stdexcept>
+#include <thread>
+#include <tuple>
+#include <vector>
+
+using namespace TSR::TileTree3D;
+
+namespace {
+
+template <class> class TileTree : public testing::Test {
+};
+using Layouts = testing::Types<Traits2, Traits5>;
+TYPED_TEST_SUITE(TileTree, Layouts);
+
+template <class Traits> VolumeSource sourceOf(float background = -1)
+{
+    VolumeSource source;
+    source.background = background;
+    source.depth = Traits::kUnitDepth;
+    return source;
+}
+
+template <class Traits> Volume<Traits> volumeOf(std::vector<Voxel> const& voxels, VolumeSource source)
+{
+    VoxelList const list{source.depth, voxels};
+    source.lists = {&list, 1};
+    return buildVolume<Traits>(source);
+}
+
+/// The value of the voxel that contains an index, wherever in the tree it stands.
+template <class Traits> float valueAt(Volume<Traits> const& volume, IJK index, int depth = Traits::kUnitDepth)
+{
+    typename Container<Traits>::ConstTileAccessor cursor(volume.container);
+    auto const& tile = cursor.tileImpl(index.i, index.j, index.k, depth);
+    auto const data = volume.channel.tileData(tile.treeIndex());
+    if (!data)
+        return volume.background;
+    std::int64_t const width = Traits::tileWidth(tile.depth);
+    auto const voxel = [&](std::int64_t from, int at) { return static_cast<int>((at - from) * Traits::kSide / width); };
+    return data(voxel(tile.i, index.i), voxel(tile.j, index.j), voxel(tile.k, index.k));
+}
+
+std::vector<Voxel> randomVoxels(std::size_t count, int reach, unsigned int seed)
+{
+    std::mt19937 random(seed);
+    auto const coordinate = [&] { return static_cast<int>(random() % static_cast<unsigned int>(2 * reach)) - reach; };
+    std::vector<Voxel> voxels(count);
+    for (Voxel& voxel : voxels)
+        voxel = {coordinate(), coordinate(), coordinate(), static_cast<float>(random() % 1000)};
+    return voxels;
+}
+
+/// A field that blends give back exactly, in index units.
+float linearField(float x, float y, float z)
+{
+    return 2 * x - 3 * y + 0.5f * z + 7;
+}
+
+std::vector<Voxel> linearBlock(IJK first, IJK end)
+{
+    std::vector<Voxel> voxels;
+    for (int k = first.k; k < end.k; ++k)
+        for (int j = first.j; j < end.j; ++j)
+            for (int i = first.i; i < end.i; ++i)
+                voxels.push_back({i, j, k, linearField(float(i), float(j), float(k))});
+    return voxels;
+}
+
+}
+
+TYPED_TEST(TileTree, holdsWhatItWasBuiltFromAndBackgroundElsewhere)
+{
+    std::vector<Voxel> voxels = randomVoxels(3000, 40, 1);
+    for (int const far : {INT_MIN, INT_MIN + 3, -1'000'000'007, INT_MAX - 3, INT_MAX})
+        voxels.push_back({far, -far / 2, far, 1234.5f});
+    std::map<std::tuple<int, int, int>, float> expected;
+    for (Voxel const& voxel : voxels)
+        expected[{voxel.i, voxel.j, voxel.k}] = voxel.value;
+    auto const volume = volumeOf<TypeParam>(voxels, sourceOf<TypeParam>());
+
+    for (auto const& [index, value] : expected)
+        ASSERT_EQ(valueAt(volume, {std::get<0>(index), std::get<1>(index), std::get<2>(index)}), value);
+    for (Voxel const& voxel : randomVoxels(3000, 60, 2)) {
+        auto const known = expected.find({voxel.i, voxel.j, voxel.k});
+        ASSERT_EQ(valueAt(volume, {voxel.i, voxel.j, voxel.k}), known == expected.end() ? -1 : known->second);
+    }
+}
+
+TYPED_TEST(TileTree, linksTilesWithTheirParents)
+{
+    auto const volume = volumeOf<TypeParam>(randomVoxels(500, 3000, 3), sourceOf<TypeParam>());
+    std::size_t linked = 0;
+    for (int depth = 0; depth < TypeParam::kDepthCount; ++depth)
+        for (std::size_t number = 0; number < volume.container.tileCount(depth); ++number) {
+            auto const& tile = volume.container.tile(number, depth);
+            ASSERT_TRUE(tile.valid);
+            ASSERT_EQ(tile.treeIndex(), (TreeIndex{number, static_cast<std::uint32_t>(depth)}));
+            ASSERT_EQ(tile.hasChildren, depth < TypeParam::kUnitDepth);
+            auto const& parent = volume.container.tile(tile.parentTreeIndex());
+            ASSERT_EQ(parent.valid, depth > 0);
+            if (!parent.valid)
+                continue;
+            ++linked;
+            auto const [i, j, k] = tile.childIJK();
+            std::int64_t const width = TypeParam::tileWidth(depth);
+            ASSERT_TRUE(std::max({i, j, k}) < TypeParam::kChildrenPerAxis && std::min({i, j, k}) >= 0);
+            ASSERT_EQ(parent.i + i * width, tile.i);
+            ASSERT_EQ(parent.j + j * width, tile.j);
+            ASSERT_EQ(parent.k + k * width, tile.k);
+        }
+    EXPECT_GT(linked, 500);
+    EXPECT_FALSE(volume.container.tile(TreeIndex()).treeIndex().isValid());
+    typename Container<TypeParam>::ConstTileAccessor cursor(volume.container);
+    EXPECT_FALSE(cursor.tileImpl(0, 0, 0, -1).valid);
+    EXPECT_FALSE(cursor.tileImpl(0, 0, 0, TypeParam::kDeepest + 1).valid);
+}
+
+TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
+{
+    std::vector<ConstantBox> const boxes{
+        {{-64, -64, -64}, {64, 64, 64}, 3}, {{70, 1, 2}, {83, 9, 4}, 4}, {{90, 0, 0}, {90, 5, 5}, 9}};
+    auto const isInside = [](ConstantBox const& box, IJK at) {
+        return box.first.i <= at.i && at.i < box.end.i && box.first.j <= at.j && at.j < box.end.j && box.first.k <= at.k
+            && at.k < box.end.k;
+    };
+    std::vector<Voxel> const voxel{{0, 0, 0, 5}};
+    VoxelList const list{TypeParam::kUnitDepth, voxel};
+    VolumeSource source = sourceOf<TypeParam>();
+    source.boxes = boxes;
+    source.lists = {&list, 1};
+    auto const volume = buildVolume<TypeParam>(source);
+
+    for (Voxel const& at : randomVoxels(20'000, 100, 4)) {
+        IJK const index{at.i, at.j, at.k};
+        float expected = -1;
+        for (ConstantBox const& box : boxes)
+            expected = isInside(box, index) ? box.value : expected;
+        if (index == IJK{0, 0, 0})
+            expected = 5;
+        ASSERT_EQ(valueAt(volume, index), expected) << at.i << ' ' << at.j << ' ' << at.k;
+    }
+    // The upper sides, where samples already blend with what is behind, are the only ones that need all their tiles.
+    std::size_t tiles = 0;
+    for (int depth = 0; depth < TypeParam::kDepthCount; ++depth)
+        tiles += volume.container.tileCount(depth);
+    std::size_t const side = 128 / TypeParam::kSide + 2;
+    EXPECT_LT(tiles, 3 * side * side * TypeParam::kChildrenPerAxis);
+    EXPECT_LT(volume.channel.coarsestDepth(), TypeParam::kUnitDepth);
+}
+
+TYPED_TEST(TileTree, blocksAndListsAgree)
+{
+    IJK const first{-7, 3, -11}, size{23, 9, 14};
+    std::vector<Voxel> const voxels = linearBlock(first, {first.i + size.i, first.j + size.j, first.k + size.k});
+    std::vector<float> values;
+    for (Voxel const& voxel : voxels)
+        values.push_back(voxel.value);
+    VolumeSource source = sourceOf<TypeParam>();
+    source.block = {first, size, values.data()};
+    auto const fromBlock = buildVolume<TypeParam>(source);
+    auto const fromList = volumeOf<TypeParam>(voxels, sourceOf<TypeParam>());
+    for (Voxel const& at : randomVoxels(5000, 30, 5))
+        ASSERT_EQ(valueAt(fromBlock, {at.i, at.j, at.k}), valueAt(fromList, {at.i, at.j, at.k}));
+    EXPECT_EQ(
+        fromBlock.container.tileCount(TypeParam::kUnitDepth), fromList.container.tileCount(TypeParam::kUnitDepth));
+}
+
+TYPED_TEST(TileTree, fineTilesInsideCoarseOnesKeepTheirValues)
+{
+    constexpr int kCoarse = TypeParam::kUnitDepth - 2;
+    int const ratio = TypeParam::kChildrenPerAxis * TypeParam::kChildrenPerAxis;
+    std::vector<Voxel> const coarse{{-1, 0, 0, 8}, {-2, 0, 0, 6}}, fine{{-1, 0, 0, 5}};
+    VoxelList const lists[] = {{TypeParam::kUnitDepth, fine}, {kCoarse, coarse}};
+    VolumeSource source = sourceOf<TypeParam>();
+    source.lists = lists;
+    auto const volume = buildVolume<TypeParam>(source);
+    EXPECT_EQ(valueAt(volume, {-1, 0, 0}), 5);
+    EXPECT_EQ(valueAt(volume, {-2, 0, 0}), 8);
+    EXPECT_EQ(valueAt(volume, {-ratio, ratio - 1, 0}), 8);
+    EXPECT_EQ(valueAt(volume, {-ratio - 1, 0, 0}), 6);
+    EXPECT_EQ(valueAt(volume, {-ratio - 1, ratio, 0}), -1);
+    EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, kCoarse), 8);
+    EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, kCoarse - 1), -1) << "coarser than any data";
+}
+
+TYPED_TEST(TileTree, coarserTilesTakeTheValueOrTheMean)
+{
+    constexpr int kSide = TypeParam::kSide, kChildren = TypeParam::kChildrenPerAxis;
+    int const end = 2 * kSide * kChildren;
+    std::vector<Voxel> const voxels = linearBlock({-end, -end, -end}, {end, end, end});
+    for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
+        VolumeSource source = sourceOf<TypeParam>();
+        source.offsetType = offsetType;
+        source.coarsestDepth = TypeParam::kUnitDepth - 2;
+        auto const volume = volumeOf<TypeParam>(voxels, source);
+        EXPECT_EQ(volume.channel.coarsestDepth(), TypeParam::kUnitDepth - 2);
+        for (int const levels : {1, 2}) {
+            int const span = levels == 1 ? kChildren : kChildren * kChildren;
+            auto const shift = [&](int axis) { return offsetType >> axis & 1 ? 0 : float(span - 1) / 2; };
+            for (IJK const coarse : {IJK{0, 0, 0}, IJK{-1, 1, -2}, IJK{1, -1, 0}}) {
+                IJK const index{coarse.i * span, coarse.j * span, coarse.k * span};
+                EXPECT_NEAR(valueAt(volume, index, TypeParam::kUnitDepth - levels),
+                    linearField(float(index.i) + shift(0), float(index.j) + shift(1), float(index.k) + shift(2)), 1e-4f)
+                    << offsetType << ", " << levels;
+            }
+        }
+    }
+}
+
+TYPED_TEST(TileTree, halosContinueNeighboursThenParentsThenTheTile)
+{
+    constexpr int kSide = TypeParam::kSide;
+    auto const isExact = [&](Volume<TypeParam> const& volume, IJK at, auto const& expected) {
+        auto const padded = makeHaloChannel(volume);
+        typename Container<TypeParam>::ConstTileAccessor cursor(volume.container);
+        auto const& tile = cursor.tileImpl(at.i, at.j, at.k, TypeParam::kUnitDepth);
+        auto const halo = padded.template tileData<kSide + 1>(tile.treeIndex());
+        ASSERT_TRUE(halo);
+        for (int k = 0; k <= kSide; ++k)
+            for (int j = 0; j <= kSide; ++j)
+                for (int i = 0; i <= kSide; ++i)
+                    ASSERT_EQ(halo(i, j, k), expected(i, j, k)) << i << ' ' << j << ' ' << k;
+    };
+    auto const own = [](int i, int j, int k) { return linearField(float(i), float(j), float(k)); };
+
+    std::vector<Voxel> const around = linearBlock({0, 0, 0}, {2 * kSide, 2 * kSide, 2 * kSide});
+    isExact(volumeOf<TypeParam>(around, sourceOf<TypeParam>()), {0, 0, 0}, own);
+
+    std::vector<Voxel> const alone = linearBlock({0, 0, 0}, {kSide, kSide, kSide});
+    isExact(volumeOf<TypeParam>(alone, sourceOf<TypeParam>()), {0, 0, 0}, [&](int i, int j, int k) {
+        return own(std::min(i, kSide - 1), std::min(j, kSide - 1), std::min(k, kSide - 1));
+    });
+
+    // Only x + 1 is missing at this depth; two depths up there is a tile instead.
+    std::vector<Voxel> someAround;
+    std::copy_if(around.begin(), around.end(), std::back_inserter(someAround), [](Voxel v) { return v.i < kSide; });
+    int const wide = static_cast<int>(TypeParam::tileWidth(TypeParam::kUnitDepth - 2));
+    for (Voxel& voxel : someAround)
+        voxel.i += wide - kSide; // the last tile before the next wide one
+    std::vector<ConstantBox> const box{{{wide, 0, 0}, {3 * wide, 3 * wide, 3 * wide}, 77}};
+    VoxelList const list{TypeParam::kUnitDepth, someAround};
+    VolumeSource source = sourceOf<TypeParam>();
+    source.boxes = box;
+    source.lists = {&list, 1};
+    isExact(buildVolume<TypeParam>(source), {wide - kSide, 0, 0},
+        [&](int i, int j, int k) { return i == kSide ? 77 : own(i, j, k); });
+}
+
+TYPED_TEST(TileTree, refusesWhatTheLayoutDoesNotHave)
+{
+    std::vector<Voxel> const far{{INT_MAX, 0, 0, 1}};
+    VolumeSource source = sourceOf<TypeParam>();
+    source.depth = TypeParam::kUnitDepth - 1; // there are not that many voxels of this size
+    EXPECT_THROW(volumeOf<TypeParam>(far, source), std::invalid_argument);
+    for (int const depth : {-1, TypeParam::kDeepest + 1}) {
+        source.depth = depth;
+        EXPECT_THROW(buildVolume<TypeParam>(source), std::invalid_argument);
+    }
+    source = sourceOf<TypeParam>();
+    source.offsetType = 8;
+    EXPECT_THROW(buildVolume<TypeParam>(source), std::invalid_argument);
+    EXPECT_EQ(buildVolume<TypeParam>(sourceOf<TypeParam>()).channel.coarsestDepth(), TypeParam::kDepthCount);
+}
+
+TYPED_TEST(TileTree, takesMemoryForActiveTilesOnlyAndIsReadByManyThreads)
+{
+    // The shell of a ball in 464³ voxels.
+    std::vector<Voxel> shell;
+    for (int k = -66; k <= 66; ++k)
+        for (int j = -66; j <= 66; ++j)
+            for (int i = -66; i <= 66; ++i)
+                if (int const squared = i * i + j * j + k * k; 65 * 65 < squared && squared < 66 * 66)
+                    shell.push_back({3 * i, 3 * j, 3 * k, float(squared)});
+    ASSERT_GT(shell.size(), 50'000);
+    auto const volume = volumeOf<TypeParam>(shell, sourceOf<TypeParam>());
+    std::size_t bytes = volume.container.memoryInBytes();
+    for (int depth = 0; depth < TypeParam::kDepthCount; ++depth)
+        bytes += volume.channel.values(depth).capacity() * sizeof(float);
+    EXPECT_LT(bytes, 60'000'000); // of 400 MB that a dense field would take
+
+    std::vector<std::thread> threads;
+    std::vector<std::size_t> wrong(4);
+    for (std::size_t& count : wrong)
+        threads.emplace_back([&] {
+            for (std::size_t v = 0; v < shell.size(); v += 7)
+                count += valueAt(volume, {shell[v].i, shell[v].j, shell[v].k}) != shell[v].value;
+        });
+    for (std::thread& thread : threads)
+        thread.join();
+    EXPECT_EQ(wrong, std::vector<std::size_t>(4));
+}
