@@ -1,0 +1,176 @@
+#include <Modeling/subdivideByVolume.h>
+
+#include "support/Compare.h"
+#include "support/FailingAllocations.h"
+#include "support/MeshBuilder.h"
+#include "support/MeshChecks.h"
+#include "support/Threads.h"
+
+#include <Modeling/subdivide.h>
+#include <TessaraGeometryVolume/VolumeBuilder.h>
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <limits>
+#include <vector>
+
+using namespace TSR::TileTree3D;
+using namespace TestSupport;
+using Geometry::Mesh::subdivide;
+using Tessara::Object;
+
+namespace {
+
+constexpr float kScale = 10; // voxels a unit
+
+template <class> class SubdivideByVolume : public testing::Test {
+};
+using Layouts = testing::Types<Traits2, Traits5>;
+TYPED_TEST_SUITE(SubdivideByVolume, Layouts);
+
+/// A field of constant value, or one that grows with x, around the origin.
+template <class Traits> Volume<Traits> volumeOf(float atCentre, float perUnit, float background)
+{
+    constexpr int kReach = 13; // the unit ball and a voxel more, up to where neighbours end
+    std::vector<float> values;
+    for (int k = -kReach; k < kReach; ++k)
+        for (int j = -kReach; j < kReach; ++j)
+            for (int i = -kReach; i < kReach; ++i)
+                values.push_back(atCentre + perUnit * static_cast<float>(i) / kScale);
+    VolumeSource source;
+    source.background = background;
+    source.depth = Traits::kUnitDepth;
+    source.block = {{-kReach, -kReach, -kReach}, {2 * kReach, 2 * kReach, 2 * kReach}, values.data()};
+    return buildVolume<Traits>(source);
+}
+
+template <class Traits>
+LinearSampler<Traits> samplerOf(Volume<Traits> const& volume, Channel<Traits, float> const* haloChannel = nullptr)
+{
+    return {volume.container, volume.channel, volume.topology, {.scale = kScale, .background = volume.background},
+        haloChannel};
+}
+
+template <class Traits> std::vector<bool> marksOf(
+    LinearSampler<Traits> const& sampler, MeshBuilder const& mesh, float tolerance, std::vector<bool> before = {})
+{
+    Orvan::Array<unsigned int> corners, offsets;
+    offsets.append(0);
+    for (auto const& face : mesh.faces) {
+        for (unsigned int const point : face)
+            corners.append(point);
+        offsets.append(static_cast<unsigned int>(corners.size));
+    }
+    before.resize(mesh.faces.size());
+    Orvan::Array<bool> marks;
+    for (bool const mark : before)
+        marks.append(mark);
+    Geometry::Mesh::Internal::markForSubdivision(sampler, static_cast<unsigned int>(mesh.faces.size()),
+        Orvan::Array<float3>(mesh.points), corners, offsets, marks, tolerance);
+    return std::vector<bool>(marks.begin(), marks.end());
+}
+
+}
+
+TYPED_TEST(SubdivideByVolume, doesWithAConstantVolumeWhatALengthDoes)
+{
+    for (auto const& builder : {MeshBuilder::sphere(6).withNoise(0.05f, 3).shuffled(4), MeshBuilder::torus(9, 7)}) {
+        auto const volume = volumeOf<TypeParam>(0.3f, 0, 0.3f);
+        auto const guided = builder.build(), plain = builder.build();
+        EXPECT_TRUE(subdivide(samplerOf(volume), *guided, 0.17f));
+        EXPECT_TRUE(subdivide(0.3f * 0.17f, *plain));
+        EXPECT_GT(countsOf(*guided).faces, countsOf(*builder.build()).faces);
+        EXPECT_TRUE(sameContents(*guided, *plain));
+    }
+}
+
+TYPED_TEST(SubdivideByVolume, refinesWhereTheVolumeSaysAndKeepsTheSurfaceClosed)
+{
+    auto const volume = volumeOf<TypeParam>(0.6f, 0.5f, 1); // 0.1 to 1.1 along x
+    auto const mesh = MeshBuilder::sphere(8).build();
+    ASSERT_TRUE(subdivide(samplerOf(volume), *mesh, 0.2f));
+    EXPECT_TRUE(isClosedManifold(*mesh));
+    EXPECT_EQ(eulerCharacteristic(*mesh), 2);
+    EXPECT_TRUE(isValid(*mesh));
+    auto const padded = makeHaloChannel(volume);
+    auto const again = MeshBuilder::sphere(8).build();
+    subdivide(samplerOf(volume, &padded), *again, 0.2f);
+    EXPECT_TRUE(sameContents(*again, *mesh)) << "padded channel";
+}
+
+TYPED_TEST(SubdivideByVolume, marksByTheSecondCornerForAnyNumberOfThreads)
+{
+    auto const volume = volumeOf<TypeParam>(0.6f, 0.5f, 1);
+    auto const sampler = samplerOf(volume);
+    auto const mesh = MeshBuilder::sphere(40).withNoise(0.02f, 1).shuffled(2);
+    float const tolerance = 0.04f;
+    std::vector<bool> expected;
+    for (auto const& face : mesh.faces) {
+        float3 const p = mesh.points[face[1]];
+        auto const mean = [](float c) { return (0 + c + c + c) / 3.0f; };
+        float const value =
+            LinearSampler<TypeParam>(sampler).sample({mean(p.x), mean(p.y), mean(p.z)}, TypeParam::kUnitDepth, 2);
+        float side = 0;
+        for (unsigned int k = 0; k < 3; ++k) {
+            float3 const a = mesh.points[face[k]], b = mesh.points[face[(k + 1) % 3]];
+            side = std::max({side, std::abs(b.x - a.x), std::abs(b.y - a.y), std::abs(b.z - a.z)});
+        }
+        expected.push_back(value * tolerance > 1.1920929e-7f && side > value * tolerance + value * tolerance);
+    }
+    auto const marked = std::count(expected.begin(), expected.end(), true);
+    EXPECT_GT(marked, 1000);
+    EXPECT_LT(marked, static_cast<long>(mesh.faces.size()) - 1000);
+    for (int const threads : {1, 2, 8})
+        EXPECT_EQ(withThreads(threads, [&] { return marksOf(sampler, mesh, tolerance); }), expected) << threads;
+}
+
+TYPED_TEST(SubdivideByVolume, leavesFacesAloneWithoutAPositiveTolerance)
+{
+    auto const mesh = MeshBuilder::sphere(3);
+    std::vector<bool> const none(mesh.faces.size(), false), all(mesh.faces.size(), true);
+    for (float const value : {0.0f, -2.0f, std::numeric_limits<float>::quiet_NaN(), 1e-7f}) {
+        auto const volume = volumeOf<TypeParam>(value, 0, value);
+        EXPECT_EQ(marksOf(samplerOf(volume), mesh, 1), none) << value;
+        EXPECT_EQ(marksOf(samplerOf(volume), mesh, 1, all), all) << "no mark is cleared";
+    }
+    auto const positive = volumeOf<TypeParam>(0.01f, 0, 0.01f), empty = volumeOf<TypeParam>(1, 0, 0);
+    EXPECT_EQ(marksOf(samplerOf(positive), mesh, 1), all);
+    EXPECT_EQ(marksOf(samplerOf(positive), mesh, -1), none);
+    auto far = mesh;
+    for (float3& point : far.points)
+        point.x += 50;
+    EXPECT_EQ(marksOf(samplerOf(empty), far, 1), none) << "background";
+    far.points[mesh.faces[5][1]].y = std::numeric_limits<float>::quiet_NaN();
+    EXPECT_EQ(marksOf(samplerOf(positive), far, 1)[5], true)
+        << "its other corners are apart, and the background counts";
+    EXPECT_EQ(marksOf(samplerOf(positive), MeshBuilder::of({}, {}), 1), std::vector<bool>());
+
+    auto const open = MeshBuilder::sphere(3).withoutFace(4).build(), before = deepCopy(*open);
+    EXPECT_FALSE(subdivide(samplerOf(positive), *open, 1));
+    EXPECT_TRUE(sameContents(*open, *before));
+}
+
+TYPED_TEST(SubdivideByVolume, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
+{
+    auto const volume = volumeOf<TypeParam>(0.6f, 0.5f, 1);
+    auto const refined = [&] {
+        auto mesh = MeshBuilder::sphere(12).withNoise(0.01f, 5).shuffled(6).build();
+        EXPECT_TRUE(subdivide(samplerOf(volume), *mesh, 0.1f));
+        return mesh;
+    };
+    expectSameForThreads({1, 2, 8}, refined);
+    // Both layouts read the same values: an even step from voxel to voxel.
+    EXPECT_EQ(fingerprint(*refined()), 12192136266283760578u) << "unlike other builds";
+}
+
+TYPED_TEST(SubdivideByVolume, leavesTheMeshAsItWasWhenMemoryRunsOut)
+{
+    auto const volume = volumeOf<TypeParam>(1, 0.5f, 1);
+    sweepFailingAllocations([&](Attempt const& attempt) {
+        auto const mesh = MeshBuilder::icosahedron().build(), before = deepCopy(*mesh);
+        if (!attempt([&] { subdivide(samplerOf(volume), *mesh, 0.5f); })) {
+            ASSERT_TRUE(sameContents(*mesh, *before));
+        }
+    });
+}
