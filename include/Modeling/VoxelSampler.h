@@ -8,6 +8,7 @@
 #include <TessaraMathSupport/Types.h>
 
 #include <array>
+#include <cstddef>
 #include <cstdint>
 #include <vector>
 
@@ -32,7 +33,6 @@ public:
 protected:
     /// Where a point is: its voxel in the tile's data, and how far towards the next voxel.
     struct Place {
-        TreeIndex tile; // none outside all tiles
         IJK voxel;
         Tessara::Math::float3 fraction;
     };
@@ -43,15 +43,36 @@ protected:
     MODELING_NO_EXPORT VoxelSampler(VoxelSampler const& other) noexcept;
     VoxelSampler& operator=(VoxelSampler const&) = delete;
 
+    /// Goes to the tile that contains the point, if there is one.
     MODELING_NO_EXPORT Place locate(Tessara::Math::float3 const& point, int depth, int space);
+    /// Raised whenever `locate` goes to another tile.
+    MODELING_NO_EXPORT std::uint64_t visit() const noexcept { return visit_; }
+    MODELING_NO_EXPORT bool hasTile() const noexcept { return tile_->valid; }
     MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }
+
+    MODELING_NO_EXPORT void leaveTile() noexcept;
+    MODELING_NO_EXPORT void enterTile(Tessara::Math::float3 const& p, int depth);
+
+    // The corners of the tile at hand in index units, as long as points inside are all its own. Otherwise nothing is
+    // between them. The fourth number makes them four lanes.
+    float tileBegin_[4];
+    float tileEnd_[4];
+    float voxelsPerUnit_ = 0;
+    int depth_ = -1; // that was asked for
 
 private:
     typename ContainerType::ConstTileAccessor cursor_;
+
+protected:
     float scale_;
     Tessara::Math::float3 voxelOffset_;
+
+private:
     TileBinaryNonCompatible<Traits::kChildCount> const* tile_;
     TileBinaryNonCompatible<Traits::kChildCount> noTile_;
+
+    Tessara::Math::float3 tileOrigin_{0, 0, 0};
+    std::uint64_t visit_ = 0;
 };
 
 /// What a sampler is told besides the volume.
@@ -99,10 +120,17 @@ public:
     /// \param space  2: `point` is in units of length; anything else: in index units
     float sample(Tessara::Math::float3 const& point, int depth, int space);
 
+    /// The same for `count` points in a row, which is faster where neighbours in the row are mostly in the same tile.
+    void sampleAll(Tessara::Math::float3 const* points, std::size_t count, int depth, int space, float* values);
+
 private:
     using Base = VoxelSampler<Traits, float, Tessara::Math::float3>;
     using typename Base::TileType;
     enum : int { kSide = Traits::kSide };
+
+    MODELING_NO_EXPORT void fetchValues();
+    template <int side> MODELING_NO_EXPORT void sampleRow(
+        Tessara::Math::float3 const* points, std::size_t count, int depth, int space, float* values);
 
     enum : std::uint64_t { kNoKey = ~std::uint64_t{0} };
     enum : std::uint32_t { kNoSlot = ~std::uint32_t{0} };
@@ -141,6 +169,10 @@ private:
     int minDepth_;
     int maxDepth_;
     int coarsestDepth_; // with data
+
+    // Of the tile that the base has come to.
+    std::uint64_t fetchedVisit_ = 0;
+    float const* values_ = nullptr; // null where there are none that may be read
 };
 
 extern template class MODELING_EXPORT VoxelSampler<Traits2, float, Tessara::Math::float3>;

@@ -2,13 +2,18 @@
 
 #include "haloTiles.h"
 
+#include "frame/Lanes.h"
+
 #include <TessaraGeometryVolume/HaloTile.h>
 
 #include <algorithm>
 #include <cmath>
+#include <cstring>
+#include <limits>
 
 namespace TSR::TileTree3D {
 
+using namespace Modeling;
 using Tessara::Math::float3;
 
 namespace {
@@ -21,19 +26,16 @@ namespace {
     template <> constexpr int kNeighbourStep<Traits2> = 2;
     template <> constexpr int kNeighbourStep<Traits5> = 5;
 
-    /// What `std::floor` gives, without a call: it is most of what a sample would cost.
-    float floorOf(float value)
-    {
-        constexpr float kAllWhole = 0x1p23f; // from here on
-        if (!(std::abs(value) < kAllWhole))
-            return value;
-        auto const whole = static_cast<float>(static_cast<int>(value));
-        return whole > value ? whole - 1 : whole;
-    }
-
     bool fitsIndex(float coordinate)
     {
         return coordinate >= -0x1p31f && coordinate < 0x1p31f;
+    }
+
+    /// Downwards, without a call of `floor`.
+    int indexOf(float coordinate)
+    {
+        int const towardsZero = static_cast<int>(coordinate);
+        return towardsZero - (static_cast<float>(towardsZero) > coordinate ? 1 : 0);
     }
 
     /// A coordinate in a tile, cut into voxel and fraction.
@@ -44,12 +46,15 @@ namespace {
 
     /// At the upper side the last voxel keeps what goes beyond. At the lower side nothing is read below the layer
     /// around a tile, wherever a wrong offset points.
-    template <int side> Coordinate coordinateOf(float value)
+    template <int side> inline Coordinate coordinateOf(float value)
     {
+        if (value >= 0) [[likely]] { // no call of `floor`: it is most of what a sample would cost
+            int const voxel = static_cast<int>(std::min(value, static_cast<float>(side - 1)));
+            return {voxel, value - static_cast<float>(voxel)};
+        }
         if (value > -kBelowTile)
-            value = std::max(value, 0.0f);
-        float const voxel = std::min(floorOf(value), static_cast<float>(side - 1));
-        return {voxel >= -1 ? static_cast<int>(voxel) : -1, value - voxel};
+            return {0, 0};
+        return {-1, value - std::floor(value)};
     }
 
     float blend(float from, float to, float fraction)
@@ -57,7 +62,17 @@ namespace {
         return (to - from) * fraction + from;
     }
 
-    template <int side> float interpolate(float const* values, int i, int j, int k, float3 const& fraction)
+    /// The two values that stand at each address.
+    inline Lanes loadPairs(float const* a, float const* b)
+    {
+        using Pairs = double __attribute__((vector_size(16)));
+        double first, second;
+        std::memcpy(&first, a, sizeof(first));
+        std::memcpy(&second, b, sizeof(second));
+        return reinterpret_cast<Lanes>(Pairs{first, second});
+    }
+
+    template <int side> inline float interpolate(float const* values, int i, int j, int k, float3 const& fraction)
     {
         constexpr int kNextRow = side, kNextLayer = side * side;
         float const* const v = values + (i + (j + k * side) * side);
@@ -68,8 +83,24 @@ namespace {
         return blend(near, far, fraction.z);
     }
 
+    /// The same at a place in voxels that is not below the first one, several lanes at a time.
+    template <int side> inline float interpolate(float const* values, Lanes place, float lastVoxel)
+    {
+        Lanes const last = everyLane(lastVoxel);
+        auto const voxel = __builtin_convertvector(place < last ? place : last, IntLanes);
+        Lanes const fraction = place - __builtin_convertvector(voxel, Lanes);
+        float const* const v = values + (voxel[0] + (voxel[1] + voxel[2] * side) * side);
+        Lanes const near = loadPairs(v, v + side), far = loadPairs(v + side * side, v + side * side + side);
+        auto const blendLanes = [](Lanes from, Lanes to, float share) { return (to - from) * everyLane(share) + from; };
+        Lanes const alongX = blendLanes(__builtin_shufflevector(near, far, 0, 2, 4, 6),
+            __builtin_shufflevector(near, far, 1, 3, 5, 7), fraction[0]);
+        Lanes const alongY = blendLanes(__builtin_shufflevector(alongX, alongX, 0, 2, 0, 2),
+            __builtin_shufflevector(alongX, alongX, 1, 3, 1, 3), fraction[1]);
+        return blend(alongY[0], alongY[1], fraction[2]);
+    }
+
     /// Where the array begins with the tile: a place below it reads the first voxels.
-    template <int side> float interpolateFromFirst(float const* values, IJK voxel, float3 const& fraction)
+    template <int side> inline float interpolateFromFirst(float const* values, IJK voxel, float3 const& fraction)
     {
         return interpolate<side>(values, std::max(voxel.i, 0), std::max(voxel.j, 0), std::max(voxel.k, 0), fraction);
     }
@@ -83,6 +114,7 @@ template <class Traits> VoxelSampler<Traits, float, float3>::VoxelSampler(
     , voxelOffset_(voxelOffset)
     , tile_(&noTile_)
 {
+    leaveTile();
 }
 
 template <class Traits> VoxelSampler<Traits, float, float3>::VoxelSampler(VoxelSampler const& other) noexcept
@@ -91,6 +123,7 @@ template <class Traits> VoxelSampler<Traits, float, float3>::VoxelSampler(VoxelS
     , voxelOffset_(other.voxelOffset_)
     , tile_(&noTile_)
 {
+    leaveTile();
 }
 
 template <class Traits> VoxelSampler<Traits, float, float3>::~VoxelSampler() = default;
@@ -100,22 +133,59 @@ template <class Traits> Orvan::String VoxelSampler<Traits, float, float3>::name(
     return "kNone";
 }
 
-template <class Traits> auto VoxelSampler<Traits, float, float3>::locate(float3 const& point, int depth, int space)
-    -> Place
+template <class Traits>
+inline auto VoxelSampler<Traits, float, float3>::locate(float3 const& point, int depth, int space) -> Place
 {
     float3 const p = space == kWorldSpace ? float3{point.x * scale_, point.y * scale_, point.z * scale_} : point;
+    bool const isInside = (depth == depth_) & (p.x >= tileBegin_[0]) & (p.y >= tileBegin_[1]) & (p.z >= tileBegin_[2])
+        & (p.x < tileEnd_[0]) & (p.y < tileEnd_[1]) & (p.z < tileEnd_[2]);
+    if (!isInside) {
+        enterTile(p, depth);
+        if (!tile_->valid)
+            return {};
+    }
+    constexpr int kSide = Traits::kSide;
+    Coordinate const x = coordinateOf<kSide>((p.x - tileOrigin_.x) * voxelsPerUnit_ - voxelOffset_.x);
+    Coordinate const y = coordinateOf<kSide>((p.y - tileOrigin_.y) * voxelsPerUnit_ - voxelOffset_.y);
+    Coordinate const z = coordinateOf<kSide>((p.z - tileOrigin_.z) * voxelsPerUnit_ - voxelOffset_.z);
+    return {{x.voxel, y.voxel, z.voxel}, {x.fraction, y.fraction, z.fraction}};
+}
+
+template <class Traits> void VoxelSampler<Traits, float, float3>::leaveTile() noexcept
+{
+    tile_ = &noTile_;
+    std::fill(std::begin(tileBegin_), std::end(tileBegin_), std::numeric_limits<float>::infinity());
+    std::fill(std::begin(tileEnd_), std::end(tileEnd_), std::numeric_limits<float>::infinity());
+}
+
+template <class Traits> void VoxelSampler<Traits, float, float3>::enterTile(float3 const& p, int depth)
+{
+    ++visit_;
+    depth_ = depth;
+    leaveTile();
     if (!(fitsIndex(p.x) && fitsIndex(p.y) && fitsIndex(p.z)))
-        return {TreeIndex(), {}, {}};
-    TileType const& tile = cursor_.tileImpl(
-        static_cast<int>(floorOf(p.x)), static_cast<int>(floorOf(p.y)), static_cast<int>(floorOf(p.z)), depth);
+        return;
+    TileType const& tile = cursor_.tileImpl(indexOf(p.x), indexOf(p.y), indexOf(p.z), depth);
     tile_ = &tile;
     if (!tile.valid)
-        return {TreeIndex(), {}, {}};
-    float const perUnit = Traits::voxelsPerUnit(tile.depth);
-    Coordinate const x = coordinateOf<Traits::kSide>((p.x - static_cast<float>(tile.i)) * perUnit - voxelOffset_.x);
-    Coordinate const y = coordinateOf<Traits::kSide>((p.y - static_cast<float>(tile.j)) * perUnit - voxelOffset_.y);
-    Coordinate const z = coordinateOf<Traits::kSide>((p.z - static_cast<float>(tile.k)) * perUnit - voxelOffset_.z);
-    return {tile.treeIndex(), {x.voxel, y.voxel, z.voxel}, {x.fraction, y.fraction, z.fraction}};
+        return;
+    std::int64_t const width = Traits::tileWidth(tile.depth);
+    auto const corner = [&](std::int64_t beyond) {
+        return float3{static_cast<float>(tile.i + beyond), static_cast<float>(tile.j + beyond),
+            static_cast<float>(tile.k + beyond)};
+    };
+    tileOrigin_ = corner(0);
+    voxelsPerUnit_ = Traits::voxelsPerUnit(tile.depth);
+
+    // Finer tiles may lie in a coarse one, and far away floats no longer tell where a tile ends.
+    constexpr std::int64_t kAllExact = std::int64_t{1} << 24;
+    bool const isExact = std::max({std::abs(tile.i), std::abs(tile.j), std::abs(tile.k)}) + width <= kAllExact;
+    if (isExact && (tile.depth == depth || !tile.hasChildren)) {
+        float3 const end = corner(width);
+        std::copy_n(
+            std::initializer_list<float>{tileOrigin_.x, tileOrigin_.y, tileOrigin_.z, 0}.begin(), 4, tileBegin_);
+        std::copy_n(std::initializer_list<float>{end.x, end.y, end.z, 1}.begin(), 4, tileEnd_);
+    }
 }
 
 template <class Traits> VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::VoxelSamplerLinear(
@@ -166,25 +236,77 @@ template <class Traits>
 float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sample(float3 const& point, int depth, int space)
 {
     typename Base::Place const place = Base::locate(point, std::min(maxDepth_, depth), space);
-    if (!place.tile.isValid() || static_cast<int>(place.tile.depth) < minDepth_)
+    if (Base::visit() != fetchedVisit_)
+        fetchValues();
+    if (!values_)
         return background_;
-    if (haloChannel_) {
-        auto const padded = haloChannel_->template tileData<kSide + 1>(place.tile);
-        return padded ? interpolateFromFirst<kSide + 1>(padded.values(), place.voxel, place.fraction) : background_;
-    }
+    if (haloChannel_)
+        return interpolateFromFirst<kSide + 1>(values_, place.voxel, place.fraction);
     ++stamp_;
     return offsetType_ == 7 ? samplePositive(place) : sampleFull(place);
+}
+
+template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleAll(
+    float3 const* points, std::size_t count, int depth, int space, float* values)
+{
+    if (haloChannel_)
+        sampleRow<kSide + 1>(points, count, depth, space, values);
+    else
+        sampleRow<kSide>(points, count, depth, space, values);
+}
+
+/// Points with all eight values in one array of that side take a short way.
+template <class Traits> template <int side> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleRow(
+    float3 const* points, std::size_t count, int depth, int space, float* values)
+{
+    constexpr float kAnywhere = std::numeric_limits<float>::infinity();
+    int const askedDepth = std::min(maxDepth_, depth);
+    Lanes const scale = everyLane(space == kWorldSpace ? Base::scale_ : 1);
+    Lanes const offset = lanesOf(Base::voxelOffset_);
+    float const first = side > kSide || offsetType_ == 7 ? 0 : 1, end = side > kSide ? kAnywhere : kSide - 1;
+    Lanes const firstVoxel{first, first, first, 0}, endVoxel{end, end, end, kAnywhere};
+    if (Base::depth_ != askedDepth)
+        Base::leaveTile();
+    Lanes tileBegin = loadLanes(Base::tileBegin_), tileEnd = loadLanes(Base::tileEnd_);
+    Lanes perUnit = everyLane(Base::voxelsPerUnit_);
+    for (std::size_t n = 0; n < count; ++n) {
+        Lanes const p = lanesOf(points[n]) * scale;
+        if (!areAll((p >= tileBegin) & (p < tileEnd))) {
+            Base::enterTile({p[0], p[1], p[2]}, askedDepth);
+            fetchValues();
+            tileBegin = loadLanes(Base::tileBegin_);
+            tileEnd = loadLanes(Base::tileEnd_);
+            perUnit = everyLane(Base::voxelsPerUnit_);
+        }
+        Lanes const place = (p - tileBegin) * perUnit - offset;
+        if (!values_)
+            values[n] = background_;
+        else if (areAll((place >= firstVoxel) & (place < endVoxel))) // and not where the tile cannot be kept
+            values[n] = interpolate<side>(values_, place, kSide - 1);
+        else
+            values[n] = sample(points[n], depth, space);
+    }
+}
+
+template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::fetchValues()
+{
+    fetchedVisit_ = Base::visit();
+    values_ = nullptr;
+    if (!Base::hasTile() || Base::currentTile().depth < minDepth_)
+        return;
+    TileType const& tile = Base::currentTile();
+    if (haloChannel_)
+        values_ = haloChannel_->template tileData<kSide + 1>(tile.treeIndex()).values();
+    else
+        values_ = channel_->tileData(tile.treeIndex()).values();
 }
 
 template <class Traits>
 float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::samplePositive(typename Base::Place const& place)
 {
-    auto const data = channel_->tileData(place.tile);
-    if (!data)
-        return background_;
     auto const [i, j, k] = place.voxel;
-    if (i + 1 < kSide && j + 1 < kSide && k + 1 < kSide)
-        return interpolateFromFirst<kSide>(data.values(), place.voxel, place.fraction);
+    if (std::max({i, j, k}) + 1 < kSide)
+        return interpolateFromFirst<kSide>(values_, place.voxel, place.fraction);
     auto const& halo = haloOf(Base::currentTile(), positiveHaloCache_).values;
     return interpolateFromFirst<kSide + 1>(halo.values(), place.voxel, place.fraction);
 }
@@ -192,12 +314,9 @@ float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::samplePositive(
 template <class Traits>
 float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleFull(typename Base::Place const& place)
 {
-    auto const data = channel_->tileData(place.tile);
-    if (!data)
-        return background_;
     auto const [i, j, k] = place.voxel;
     if (std::min({i, j, k}) > 0 && std::max({i, j, k}) + 1 < kSide)
-        return interpolate<kSide>(data.values(), i, j, k, place.fraction);
+        return interpolate<kSide>(values_, i, j, k, place.fraction);
     auto const& halo = haloOf(Base::currentTile(), fullHaloCache_).values;
     return interpolate<kSide + 2>(halo.values(), i + 1, j + 1, k + 1, place.fraction);
 }

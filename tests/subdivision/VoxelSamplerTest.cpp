@@ -78,6 +78,25 @@ template <class Traits> LinearSampler<Traits> samplerOf(
         {.scale = 1, .voxelOffset = offset, .background = volume.background}, haloChannel};
 }
 
+/// Rows of points give what single ones do. Points follow one another at random and on a line.
+template <class Traits>
+void expectSameInRows(LinearSampler<Traits> sampler, float reach, int depth = Traits::kUnitDepth)
+{
+    Random random(9);
+    std::vector<float3> points;
+    for (int n = 0; n < 300; ++n) {
+        float3 const from{reach * random.coordinate(), reach * random.coordinate(), reach * random.coordinate()};
+        for (int step = 0; step < 10; ++step)
+            points.push_back({from.x + 0.3f * float(step), from.y, from.z - 0.1f * float(step)});
+    }
+    points[5].y = kNaN;
+    std::vector<float> values(points.size()), expected;
+    sampler.sampleAll(points.data(), points.size(), depth, kIndexSpace, values.data());
+    for (float3 const p : points)
+        expected.push_back(LinearSampler<Traits>(sampler).sample(p, depth, kIndexSpace));
+    EXPECT_EQ(values, expected);
+}
+
 float blend(float u, float v, float f)
 {
     return (v - u) * f + u;
@@ -146,6 +165,10 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldInsideAndAcrossTiles)
         // Caches hold what they say, whichever tiles came before.
         ASSERT_EQ(LinearSampler<TypeParam>(sampler).sample(p, TypeParam::kUnitDepth, kIndexSpace), expected);
     }
+    for (float const offset : {0.0f, -0.3f, 0.4f}) {
+        expectSameInRows(samplerOf(volume, {offset, 0, offset}), 25);
+        expectSameInRows(samplerOf(volume, {offset, 0, offset}, &padded), 25);
+    }
 }
 
 TYPED_TEST(VoxelSampling, mirrorsTilesThatNothingIsKnownAround)
@@ -156,6 +179,7 @@ TYPED_TEST(VoxelSampling, mirrorsTilesThatNothingIsKnownAround)
         auto const volume = volumeOf<TypeParam>(field, offsetType);
         float3 const offset = offsetsOf(offsetType);
         auto sampler = samplerOf(volume, offset);
+        expectSameInRows(sampler, 2 * kSide);
         Random random(offsetType);
         for (int n = 0; n < 3000; ++n) {
             float const reach = 2 * kSide;
@@ -357,6 +381,7 @@ TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
     auto const coarseVolume = buildVolume<TypeParam>(source);
     auto sampler = samplerOf(coarseVolume);
     EXPECT_FLOAT_EQ(sampler.sample({0.25f * kWide, 0, 0}, kDepth, kIndexSpace), 5);
+    expectSameInRows(sampler, 3 * kWide);
     EXPECT_EQ(sampler.name().view(), "kLinear");
     EXPECT_EQ((static_cast<VoxelSampler<TypeParam, float, float3>&>(sampler)
                       .VoxelSampler<TypeParam, float, float3>::name()

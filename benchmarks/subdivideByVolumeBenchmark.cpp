@@ -1,0 +1,217 @@
+#include "Measuring.h"
+#ifdef MODELING_HAS_OPENVDB
+#include "peers/openvdbGrid.h"
+#endif
+
+#include "support/MeshBuilder.h"
+
+#include <Modeling/subdivideByVolume.h>
+#include <Modeling/subdivisionSteps.h>
+#include <TessaraGeometryVolume/VolumeBuilder.h>
+
+#include <cmath>
+#include <map>
+#include <vector>
+
+using namespace TSR::TileTree3D;
+using TestSupport::float3;
+using TestSupport::MeshBuilder;
+
+namespace {
+
+constexpr float kRadius = 28; // voxels
+constexpr float kTolerance = 0.01f;
+
+/// A band of voxels around a sphere, up to 3 voxels from it, with values that grow along x; a tenth of the surface is left
+/// out. 28 voxels of radius give 53,000 of them, a million take 122.
+std::vector<Voxel> bandOfVoxels(float radius)
+{
+    std::vector<Voxel> voxels;
+    int const reach = static_cast<int>(radius) + 4;
+    for (int k = static_cast<int>(-0.8f * radius); k <= reach; ++k)
+        for (int j = -reach; j <= reach; ++j)
+            for (int i = -reach; i <= reach; ++i)
+                if (std::abs(std::sqrt(static_cast<float>(i * i + j * j + k * k)) - radius) <= 3)
+                    voxels.push_back({i, j, k, 1.1f + static_cast<float>(i) / radius});
+    return voxels;
+}
+
+template <class Traits> struct Guide {
+    Volume<Traits> volume;
+    Channel<Traits, float> padded;
+
+    static Guide const& get()
+    {
+        static Guide const guide = [] {
+            std::vector<Voxel> const voxels = bandOfVoxels(kRadius);
+            VoxelList const list{Traits::kUnitDepth, voxels};
+            VolumeSource source;
+            source.background = 1;
+            source.depth = Traits::kUnitDepth;
+            source.lists = {&list, 1};
+            Guide made{buildVolume<Traits>(source), Channel<Traits, float>()};
+            made.padded = makeHaloChannel(made.volume);
+            return made;
+        }();
+        return guide;
+    }
+
+    LinearSampler<Traits> sampler(bool isPadded) const
+    {
+        return {volume.container, volume.channel, volume.topology, {.scale = kRadius, .background = volume.background},
+            isPadded ? &padded : nullptr};
+    }
+};
+
+struct FlatMesh {
+    Orvan::Array<float3> points;
+    Orvan::Array<unsigned int> corners, offsets;
+    unsigned int faces;
+};
+
+/// The unit sphere with a few faces more than asked for.
+FlatMesh const& sphereOf(std::size_t faces)
+{
+    static std::map<std::size_t, FlatMesh> made;
+    auto const [entry, isNew] = made.try_emplace(faces);
+    if (isNew) {
+        MeshBuilder const sphere = MeshBuilder::sphereWithFaces(faces);
+        FlatMesh& mesh = entry->second;
+        mesh.points = Orvan::Array<float3>(sphere.points);
+        mesh.offsets.append(0);
+        for (auto const& face : sphere.faces) {
+            for (unsigned int const point : face)
+                mesh.corners.append(point);
+            mesh.offsets.append(static_cast<unsigned int>(mesh.corners.size));
+        }
+        mesh.faces = static_cast<unsigned int>(sphere.faces.size());
+    }
+    return entry->second;
+}
+
+template <class Mark> void measureMarking(benchmark::State& state, Mark const& mark)
+{
+    FlatMesh const& mesh = sphereOf(static_cast<std::size_t>(state.range(0)));
+    Orvan::Array<bool> marks(mesh.faces);
+    for (auto _ : state) {
+        mark(mesh, marks);
+        benchmark::DoNotOptimize(marks.data);
+    }
+    Benchmarks::countElements(state, mesh.faces);
+}
+
+template <class Traits, bool isPadded> void markByVolume(benchmark::State& state)
+{
+    auto const sampler = Guide<Traits>::get().sampler(isPadded);
+    measureMarking(state, [&](FlatMesh const& mesh, Orvan::Array<bool>& marks) {
+        Geometry::Mesh::Internal::markForSubdivision(
+            sampler, mesh.faces, mesh.points, mesh.corners, mesh.offsets, marks, kTolerance);
+    });
+}
+
+void markByLength(benchmark::State& state)
+{
+    measureMarking(state, [](FlatMesh const& mesh, Orvan::Array<bool>& marks) {
+        Geometry::Mesh::Internal::markForSubdivision(
+            kTolerance, mesh.faces, mesh.points, mesh.corners, mesh.offsets, marks);
+    });
+}
+
+/// The second corners of the faces, in their order, that lie in the band.
+std::vector<float3> pointsInBand(std::size_t faces, float scale)
+{
+    FlatMesh const& mesh = sphereOf(faces);
+    std::vector<float3> points;
+    for (unsigned int face = 0; face < mesh.faces; ++face)
+        if (float3 const p = mesh.points[mesh.corners[3 * face + 1]]; p.z > -0.75f)
+            points.push_back({p.x * scale, p.y * scale, p.z * scale});
+    return points;
+}
+
+template <class Traits, bool isPadded> void sampleVolume(benchmark::State& state)
+{
+    std::vector<float3> const points = pointsInBand(static_cast<std::size_t>(state.range(0)), 1);
+    auto sampler = Guide<Traits>::get().sampler(isPadded);
+    std::vector<float> values(points.size());
+    for (auto _ : state) {
+        sampler.sampleAll(points.data(), points.size(), Traits::kUnitDepth, 2, values.data());
+        benchmark::DoNotOptimize(values.data());
+        benchmark::ClobberMemory();
+    }
+    Benchmarks::countElements(state, points.size());
+}
+
+#ifdef MODELING_HAS_OPENVDB
+void sampleOpenvdb(benchmark::State& state)
+{
+    std::vector<float3> const points = pointsInBand(static_cast<std::size_t>(state.range(0)), kRadius);
+    Benchmarks::OpenvdbGrid const grid(bandOfVoxels(kRadius), 1);
+    for (auto _ : state)
+        benchmark::DoNotOptimize(grid.sumOfSamples(points));
+    Benchmarks::countElements(state, points.size());
+}
+
+void buildOpenvdb(benchmark::State& state)
+{
+    std::vector<Voxel> const voxels = bandOfVoxels(static_cast<float>(state.range(0)));
+    for (auto _ : state)
+        benchmark::DoNotOptimize(Benchmarks::OpenvdbGrid(voxels, 1).sumOfSamples({}));
+    Benchmarks::countElements(state, voxels.size());
+}
+#endif
+
+template <class Traits> void build(benchmark::State& state)
+{
+    std::vector<Voxel> const voxels = bandOfVoxels(static_cast<float>(state.range(0)));
+    VoxelList const list{Traits::kUnitDepth, voxels};
+    VolumeSource source;
+    source.background = 1;
+    source.depth = Traits::kUnitDepth;
+    source.lists = {&list, 1};
+    for (auto _ : state)
+        benchmark::DoNotOptimize(buildVolume<Traits>(source));
+    state.counters["voxels"] = static_cast<double>(voxels.size());
+    Benchmarks::countElements(state, voxels.size());
+}
+
+void copyVoxels(benchmark::State& state)
+{
+    Benchmarks::copyBytes(state, bandOfVoxels(static_cast<float>(state.range(0))).size() * sizeof(Voxel));
+}
+
+void allFaceCounts(benchmark::internal::Benchmark* benchmark)
+{
+    for (std::int64_t const faces : {20'000, 200'000, 2'000'000})
+        benchmark->Arg(faces);
+    benchmark->UseRealTime();
+}
+
+void allRadii(benchmark::internal::Benchmark* benchmark)
+{
+    for (std::int64_t const voxels : {28, 122})
+        benchmark->Arg(voxels);
+    benchmark->UseRealTime();
+}
+
+}
+
+BENCHMARK(markByVolume<Traits2, true>)->Name("markByPaddedVolume")->Apply(allFaceCounts);
+BENCHMARK(markByLength)->Name("markByPaddedVolume:length")->Apply(allFaceCounts);
+BENCHMARK(markByVolume<Traits2, false>)->Name("markByVolume")->Apply(allFaceCounts);
+BENCHMARK(markByLength)->Name("markByVolume:length")->Apply(allFaceCounts);
+BENCHMARK(markByVolume<Traits5, true>)->Name("markByPaddedVolume5")->Apply(allFaceCounts);
+BENCHMARK(markByLength)->Name("markByPaddedVolume5:length")->Apply(allFaceCounts);
+
+BENCHMARK(sampleVolume<Traits2, true>)->Name("samplePaddedVolume")->Apply(allFaceCounts);
+BENCHMARK(sampleVolume<Traits2, false>)->Name("sampleVolume")->Apply(allFaceCounts);
+BENCHMARK(sampleVolume<Traits5, true>)->Name("samplePaddedVolume5")->Apply(allFaceCounts);
+
+BENCHMARK(build<Traits2>)->Name("buildVolume")->Apply(allRadii);
+BENCHMARK(build<Traits5>)->Name("buildVolume5")->Apply(allRadii);
+BENCHMARK(copyVoxels)->Name("buildVolume:memcpy")->Apply(allRadii);
+
+#ifdef MODELING_HAS_OPENVDB
+BENCHMARK(sampleOpenvdb)->Name("samplePaddedVolume:openvdb")->Apply(allFaceCounts);
+BENCHMARK(sampleOpenvdb)->Name("sampleVolume:openvdb")->Apply(allFaceCounts);
+BENCHMARK(buildOpenvdb)->Name("buildVolume:openvdb")->Apply(allRadii);
+#endif
