@@ -3,6 +3,7 @@
 #include "faceSize.h"
 #include "refineMesh.h"
 
+#include "frame/Lanes.h"
 #include "frame/ParallelFor.h"
 
 #include <algorithm>
@@ -20,10 +21,11 @@ namespace {
 
     constexpr int kWorldSpace = 2;
 
-    /// The mean of three equal coordinates, as floats give it.
-    float meanOfThree(float coordinate)
+    /// The mean of three equal points, as floats give it.
+    float3 meanOfThree(float3 const& point)
     {
-        return (0 + coordinate + coordinate + coordinate) / 3.0f;
+        Lanes const p = lanesOf(point), mean = (everyLane(0) + p + p + p) / everyLane(3);
+        return {mean[0], mean[1], mean[2]};
     }
 
     /// A loop body that is copied with each split of the range, and with it the sampler's cursors and caches: no two
@@ -39,10 +41,8 @@ namespace {
             float3 mean[kAtOnce];
             for (unsigned int first = points.begin(); first < points.end(); first += kAtOnce) {
                 unsigned int const count = std::min(kAtOnce, points.end() - first);
-                for (unsigned int n = 0; n < count; ++n) {
-                    float3 const p = position[first + n];
-                    mean[n] = {meanOfThree(p.x), meanOfThree(p.y), meanOfThree(p.z)};
-                }
+                for (unsigned int n = 0; n < count; ++n)
+                    mean[n] = meanOfThree(position[first + n]);
                 sampler.sampleAll(mean, count, Traits::kUnitDepth, kWorldSpace, value + first);
             }
         }
