@@ -21,6 +21,9 @@ template <class Traits, class Value, int components, class Real, class Point, in
 
 template <class Traits> using LinearSampler = VoxelSamplerLinear<Traits, float, 1, float, Tessara::Math::float3, 0, 0>;
 
+/// The space of points in units of length. In any other they are in index units.
+inline constexpr int kWorldSpace = 2;
+
 template <class Traits> class MODELING_EXPORT VoxelSampler<Traits, float, Tessara::Math::float3> {
 public:
     using ContainerType = Container<Traits>;
@@ -29,36 +32,6 @@ public:
     virtual ~VoxelSampler();
     /// "kNone"
     virtual Orvan::String name() const;
-
-protected:
-    /// Where a point is: its voxel in the tile's data, and how far towards the next voxel.
-    struct Place {
-        IJK voxel;
-        Tessara::Math::float3 fraction;
-    };
-
-    MODELING_NO_EXPORT VoxelSampler(
-        ContainerType const& container, float scale, Tessara::Math::float3 const& voxelOffset) noexcept;
-    // A copy looks for its tile anew.
-    MODELING_NO_EXPORT VoxelSampler(VoxelSampler const& other) noexcept;
-    VoxelSampler& operator=(VoxelSampler const&) = delete;
-
-    /// Goes to the tile that contains the point, if there is one.
-    MODELING_NO_EXPORT Place locate(Tessara::Math::float3 const& point, int depth, int space);
-    /// Raised whenever `locate` goes to another tile.
-    MODELING_NO_EXPORT std::uint64_t visit() const noexcept { return visit_; }
-    MODELING_NO_EXPORT bool hasTile() const noexcept { return tile_->valid; }
-    MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }
-
-    MODELING_NO_EXPORT void leaveTile() noexcept;
-    MODELING_NO_EXPORT void enterTile(Tessara::Math::float3 const& p, int depth);
-
-    // The corners of the tile at hand in index units, as long as points inside are all its own. Otherwise nothing is
-    // between them. The fourth number makes them four lanes.
-    float tileBegin_[4];
-    float tileEnd_[4];
-    float voxelsPerUnit_ = 0;
-    int depth_ = -1; // that was asked for
 
 private:
     typename ContainerType::ConstTileAccessor cursor_;
@@ -71,8 +44,37 @@ private:
     TileBinaryNonCompatible<Traits::kChildCount> const* tile_;
     TileBinaryNonCompatible<Traits::kChildCount> noTile_;
 
-    Tessara::Math::float3 tileOrigin_{0, 0, 0};
-    std::uint64_t visit_ = 0;
+protected:
+    /// Where a point is: its voxel in the tile's data, and how far towards the next voxel.
+    struct Place {
+        IJK voxel;
+        Tessara::Math::float3 fraction;
+    };
+    /// A corner of a tile in index units; the last number makes it four lanes.
+    struct Corner {
+        float x, y, z, w;
+    };
+
+    // As long as points are between these corners, the tile at hand is theirs; nothing is where it cannot be kept.
+    Corner tileBegin_;
+    Corner tileEnd_;
+    float voxelsPerUnit_ = 0;
+    int depth_ = -1; // that was asked for
+    std::uint64_t visit_ = 0; // raised whenever another tile is gone to
+
+    MODELING_NO_EXPORT VoxelSampler(
+        ContainerType const& container, float scale, Tessara::Math::float3 const& voxelOffset) noexcept;
+    VoxelSampler(VoxelSampler const&) = delete;
+    VoxelSampler& operator=(VoxelSampler const&) = delete;
+
+    /// Goes to the tile that contains the point, if there is one. \pre depth <= kDeepest, here and below
+    MODELING_NO_EXPORT Place locate(Tessara::Math::float3 const& point, int depth, int space);
+    MODELING_NO_EXPORT Tessara::Math::float3 distanceFromTile(Tessara::Math::float3 const& p) const noexcept;
+    MODELING_NO_EXPORT void enterTile(Tessara::Math::float3 const& p, int depth);
+    MODELING_NO_EXPORT void leaveTile() noexcept;
+    MODELING_NO_EXPORT bool hasTile() const noexcept { return tile_->valid; }
+    /// \pre  there is one
+    MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }
 };
 
 /// What a sampler is told besides the volume.
@@ -91,12 +93,13 @@ struct LinearSamplerSettings {
 /// with empty caches. It reads the volume only. A sample takes no memory, but for the first one of a copy that needs
 /// the caches.
 ///
-/// What lies around a tile depends on the volume's offset type. With all bits set, samples read a layer across the upper
-/// faces: of neighbours where there are any (`setHaloTile`). Otherwise they read a layer all around, and
+/// What lies around a tile depends on the volume's offset type. With all bits set, samples read a layer across the
+/// upper faces: of neighbours where there are any (`setHaloTile`). Otherwise they read a layer all around, and
 /// - a tile without parent values has no neighbours there: along axes with a clear bit the layer mirrors the tile at
 ///   `background`, along others it is `background`, as is then the tile's own first layer;
-/// - a tile with parent values looks for its neighbours at a fixed distance: 2 index units in `Traits2`, 5 in `Traits5`.
-///   Where tiles are wider than that, the upper neighbour is the tile itself.
+/// - a tile with parent values looks for its neighbours at a fixed distance: 2 index units in `Traits2`, 5 in
+///   `Traits5`. Where tiles are wider than that, the upper neighbour is the tile itself; where they are narrower, one
+///   further on.
 /// Volumes to guide a refinement are best built with all bits set.
 template <class Traits> class MODELING_EXPORT VoxelSamplerLinear<Traits, float, 1, float, Tessara::Math::float3, 0, 0>
     : public VoxelSampler<Traits, float, Tessara::Math::float3> {
@@ -106,7 +109,7 @@ public:
     /// \param haloChannel  Tiles with a layer more on their upper sides (`makeHaloChannel`), read instead of `channel`
     ///                     where it is given: samples then need no cache. Below the first voxel there is nothing, so it
     ///                     fits offsets that are not positive.
-    /// All of the volume has to outlive the sampler and its copies.
+    /// All of the volume has to outlive the sampler and its copies, and to stay as it is.
     VoxelSamplerLinear(Container<Traits> const& container, ChannelType const& channel, VoxelTopology const& topology,
         LinearSamplerSettings const& settings, ChannelType const* haloChannel = nullptr);
     VoxelSamplerLinear(VoxelSamplerLinear const& other);
@@ -117,7 +120,7 @@ public:
     /// The value at a point, `background` where no tile holds data. Outside the range of 32-bit indices, and where a
     /// coordinate is no number, there are no tiles.
     /// \param depth  of the tiles to read; where the tree ends above, the tile that it ends in is read
-    /// \param space  2: `point` is in units of length; anything else: in index units
+    /// \param space  `kWorldSpace`, or any other number for index units
     float sample(Tessara::Math::float3 const& point, int depth, int space);
 
     /// The same for `count` points in a row, which is faster where neighbours in the row are mostly in the same tile.
@@ -143,6 +146,7 @@ private:
     };
     template <int side> using HaloCache = std::vector<HaloSlot<side>>;
 
+    MODELING_NO_EXPORT int readDepth(int depth) const noexcept;
     MODELING_NO_EXPORT float samplePositive(typename Base::Place const& place);
     MODELING_NO_EXPORT float sampleFull(typename Base::Place const& place);
     template <int side> MODELING_NO_EXPORT HaloSlot<side> const& haloOf(TileType const& tile, HaloCache<side>& cache);

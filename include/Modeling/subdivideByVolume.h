@@ -11,8 +11,10 @@ namespace Geometry::Mesh {
 /// `tolerance` times the value of a volume at the face's second corner. So the volume paints where the mesh stays
 /// coarse and where it gets fine.
 ///
-/// Where the product is not above 1.1920929e-7, as where the volume is 0 or less, faces are left alone, but for those
-/// next to ones that split. The volume is looked up in each pass anew, where the smoothed mesh then is.
+/// Where the product is not above 1.1920929e-7, as where the volume is 0 or below and `tolerance` is not, faces are
+/// left alone, but for those next to ones that split. Where values pass from positive to negative ones the product
+/// comes close to 0, and faces there split for as long as there is memory. The volume is looked up in each pass anew,
+/// where the smoothed mesh then is.
 ///
 /// \param sampler    The volume; a constant one does what `subdivide` does with its value times `tolerance`. Only
 ///                   copies of it are used.

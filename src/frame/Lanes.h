@@ -22,10 +22,12 @@ inline Lanes everyLane(float value)
     return Lanes{value, value, value, value};
 }
 
-inline Lanes loadLanes(float const* values)
+/// Of four floats in a row.
+template <class Four> Lanes lanesOf(Four const& values)
 {
     Lanes lanes;
-    std::memcpy(&lanes, values, sizeof(lanes));
+    static_assert(sizeof(values) == sizeof(lanes));
+    std::memcpy(&lanes, &values, sizeof(lanes));
     return lanes;
 }
 
@@ -39,12 +41,6 @@ inline bool areAll(IntLanes comparison)
 {
     auto const halves = reinterpret_cast<Internal::Halves>(comparison);
     return (halves[0] & halves[1]) == ~std::uint64_t{0};
-}
-
-inline bool isAny(IntLanes comparison)
-{
-    auto const halves = reinterpret_cast<Internal::Halves>(comparison);
-    return (halves[0] | halves[1]) != 0;
 }
 
 }

@@ -18,7 +18,7 @@ using Tessara::Math::float3;
 
 namespace {
 
-    constexpr int kWorldSpace = 2;
+    constexpr unsigned int kAllBits = 7; // of the three axes
     constexpr float kBelowTile = 1e-5f; // voxels; what rounding can take a point below the tile that contains it
 
     /// How far the neighbours of a tile are looked for, in index units: at one depth its width, whatever the depth.
@@ -29,6 +29,11 @@ namespace {
     bool fitsIndex(float coordinate)
     {
         return coordinate >= -0x1p31f && coordinate < 0x1p31f;
+    }
+
+    int clampedIndex(std::int64_t index)
+    {
+        return static_cast<int>(std::clamp<std::int64_t>(index, INT32_MIN, INT32_MAX));
     }
 
     /// Downwards, without a call of `floor`.
@@ -112,16 +117,6 @@ template <class Traits> VoxelSampler<Traits, float, float3>::VoxelSampler(
     : cursor_(container)
     , scale_(scale)
     , voxelOffset_(voxelOffset)
-    , tile_(&noTile_)
-{
-    leaveTile();
-}
-
-template <class Traits> VoxelSampler<Traits, float, float3>::VoxelSampler(VoxelSampler const& other) noexcept
-    : cursor_(other.cursor_)
-    , scale_(other.scale_)
-    , voxelOffset_(other.voxelOffset_)
-    , tile_(&noTile_)
 {
     leaveTile();
 }
@@ -137,25 +132,38 @@ template <class Traits>
 inline auto VoxelSampler<Traits, float, float3>::locate(float3 const& point, int depth, int space) -> Place
 {
     float3 const p = space == kWorldSpace ? float3{point.x * scale_, point.y * scale_, point.z * scale_} : point;
-    bool const isInside = (depth == depth_) & (p.x >= tileBegin_[0]) & (p.y >= tileBegin_[1]) & (p.z >= tileBegin_[2])
-        & (p.x < tileEnd_[0]) & (p.y < tileEnd_[1]) & (p.z < tileEnd_[2]);
+    bool const isInside = (depth == depth_) & (p.x >= tileBegin_.x) & (p.y >= tileBegin_.y) & (p.z >= tileBegin_.z)
+        & (p.x < tileEnd_.x) & (p.y < tileEnd_.y) & (p.z < tileEnd_.z);
     if (!isInside) {
         enterTile(p, depth);
         if (!tile_->valid)
             return {};
     }
+    float3 const fromTile = distanceFromTile(p);
     constexpr int kSide = Traits::kSide;
-    Coordinate const x = coordinateOf<kSide>((p.x - tileOrigin_.x) * voxelsPerUnit_ - voxelOffset_.x);
-    Coordinate const y = coordinateOf<kSide>((p.y - tileOrigin_.y) * voxelsPerUnit_ - voxelOffset_.y);
-    Coordinate const z = coordinateOf<kSide>((p.z - tileOrigin_.z) * voxelsPerUnit_ - voxelOffset_.z);
+    Coordinate const x = coordinateOf<kSide>(fromTile.x * voxelsPerUnit_ - voxelOffset_.x);
+    Coordinate const y = coordinateOf<kSide>(fromTile.y * voxelsPerUnit_ - voxelOffset_.y);
+    Coordinate const z = coordinateOf<kSide>(fromTile.z * voxelsPerUnit_ - voxelOffset_.z);
     return {{x.voxel, y.voxel, z.voxel}, {x.fraction, y.fraction, z.fraction}};
+}
+
+template <class Traits>
+inline float3 VoxelSampler<Traits, float, float3>::distanceFromTile(float3 const& p) const noexcept
+{
+    if (tileBegin_.w == 0) [[likely]]
+        return {p.x - tileBegin_.x, p.y - tileBegin_.y, p.z - tileBegin_.z};
+    // Far away a float may not hold where the tile begins.
+    auto const distance = [](float from, std::int64_t to) {
+        return static_cast<float>(static_cast<double>(from) - static_cast<double>(to));
+    };
+    return {distance(p.x, tile_->i), distance(p.y, tile_->j), distance(p.z, tile_->k)};
 }
 
 template <class Traits> void VoxelSampler<Traits, float, float3>::leaveTile() noexcept
 {
+    constexpr float kNowhere = std::numeric_limits<float>::infinity();
     tile_ = &noTile_;
-    std::fill(std::begin(tileBegin_), std::end(tileBegin_), std::numeric_limits<float>::infinity());
-    std::fill(std::begin(tileEnd_), std::end(tileEnd_), std::numeric_limits<float>::infinity());
+    tileBegin_ = tileEnd_ = {kNowhere, kNowhere, kNowhere, kNowhere};
 }
 
 template <class Traits> void VoxelSampler<Traits, float, float3>::enterTile(float3 const& p, int depth)
@@ -169,22 +177,19 @@ template <class Traits> void VoxelSampler<Traits, float, float3>::enterTile(floa
     tile_ = &tile;
     if (!tile.valid)
         return;
-    std::int64_t const width = Traits::tileWidth(tile.depth);
-    auto const corner = [&](std::int64_t beyond) {
-        return float3{static_cast<float>(tile.i + beyond), static_cast<float>(tile.j + beyond),
-            static_cast<float>(tile.k + beyond)};
-    };
-    tileOrigin_ = corner(0);
     voxelsPerUnit_ = Traits::voxelsPerUnit(tile.depth);
 
     // Finer tiles may lie in a coarse one, and far away floats no longer tell where a tile ends.
     constexpr std::int64_t kAllExact = std::int64_t{1} << 24;
+    std::int64_t const width = Traits::tileWidth(tile.depth);
     bool const isExact = std::max({std::abs(tile.i), std::abs(tile.j), std::abs(tile.k)}) + width <= kAllExact;
     if (isExact && (tile.depth == depth || !tile.hasChildren)) {
-        float3 const end = corner(width);
-        std::copy_n(
-            std::initializer_list<float>{tileOrigin_.x, tileOrigin_.y, tileOrigin_.z, 0}.begin(), 4, tileBegin_);
-        std::copy_n(std::initializer_list<float>{end.x, end.y, end.z, 1}.begin(), 4, tileEnd_);
+        auto const corner = [&](std::int64_t beyond, float last) {
+            return Corner{static_cast<float>(tile.i + beyond), static_cast<float>(tile.j + beyond),
+                static_cast<float>(tile.k + beyond), last};
+        };
+        tileBegin_ = corner(0, 0);
+        tileEnd_ = corner(width, 1);
     }
 }
 
@@ -193,7 +198,7 @@ template <class Traits> VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0
     LinearSamplerSettings const& settings, ChannelType const* haloChannel)
     : Base(container, settings.scale, settings.voxelOffset)
     , neighbours_(container)
-    , offsetType_(topology.offsetType())
+    , offsetType_(topology.offsetType() & kAllBits)
     , container_(&container)
     , channel_(&channel)
     , haloChannel_(haloChannel)
@@ -209,20 +214,9 @@ template <class Traits> VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0
 
 template <class Traits>
 VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::VoxelSamplerLinear(VoxelSamplerLinear const& other)
-    : Base(other)
-    , neighbours_(*other.container_)
-    , offsetType_(other.offsetType_)
-    , container_(other.container_)
-    , channel_(other.channel_)
-    , haloChannel_(other.haloChannel_)
-    , topology_(other.topology_)
-    , background_(other.background_)
-    , minDepth_(other.minDepth_)
-    , maxDepth_(other.maxDepth_)
-    , coarsestDepth_(other.coarsestDepth_)
+    : VoxelSamplerLinear(*other.container_, *other.channel_, *other.topology_,
+        {other.scale_, other.voxelOffset_, other.background_, other.minDepth_, other.maxDepth_}, other.haloChannel_)
 {
-    std::fill(std::begin(lastKey_), std::end(lastKey_), kNoKey);
-    std::fill(std::begin(lastSlot_), std::end(lastSlot_), kNoSlot);
 }
 
 template <class Traits> VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::~VoxelSamplerLinear() = default;
@@ -233,17 +227,23 @@ template <class Traits> Orvan::String VoxelSamplerLinear<Traits, float, 1, float
 }
 
 template <class Traits>
+int VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::readDepth(int depth) const noexcept
+{
+    return std::min({depth, maxDepth_, Traits::kDeepest});
+}
+
+template <class Traits>
 float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sample(float3 const& point, int depth, int space)
 {
-    typename Base::Place const place = Base::locate(point, std::min(maxDepth_, depth), space);
-    if (Base::visit() != fetchedVisit_)
+    typename Base::Place const place = Base::locate(point, readDepth(depth), space);
+    if (Base::visit_ != fetchedVisit_)
         fetchValues();
     if (!values_)
         return background_;
     if (haloChannel_)
         return interpolateFromFirst<kSide + 1>(values_, place.voxel, place.fraction);
     ++stamp_;
-    return offsetType_ == 7 ? samplePositive(place) : sampleFull(place);
+    return offsetType_ == kAllBits ? samplePositive(place) : sampleFull(place);
 }
 
 template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleAll(
@@ -260,22 +260,22 @@ template <class Traits> template <int side> void VoxelSamplerLinear<Traits, floa
     float3 const* points, std::size_t count, int depth, int space, float* values)
 {
     constexpr float kAnywhere = std::numeric_limits<float>::infinity();
-    int const askedDepth = std::min(maxDepth_, depth);
+    int const askedDepth = readDepth(depth);
     Lanes const scale = everyLane(space == kWorldSpace ? Base::scale_ : 1);
     Lanes const offset = lanesOf(Base::voxelOffset_);
-    float const first = side > kSide || offsetType_ == 7 ? 0 : 1, end = side > kSide ? kAnywhere : kSide - 1;
+    float const first = side > kSide || offsetType_ == kAllBits ? 0 : 1, end = side > kSide ? kAnywhere : kSide - 1;
     Lanes const firstVoxel{first, first, first, 0}, endVoxel{end, end, end, kAnywhere};
     if (Base::depth_ != askedDepth)
         Base::leaveTile();
-    Lanes tileBegin = loadLanes(Base::tileBegin_), tileEnd = loadLanes(Base::tileEnd_);
+    Lanes tileBegin = lanesOf(Base::tileBegin_), tileEnd = lanesOf(Base::tileEnd_);
     Lanes perUnit = everyLane(Base::voxelsPerUnit_);
     for (std::size_t n = 0; n < count; ++n) {
         Lanes const p = lanesOf(points[n]) * scale;
         if (!areAll((p >= tileBegin) & (p < tileEnd))) {
             Base::enterTile({p[0], p[1], p[2]}, askedDepth);
             fetchValues();
-            tileBegin = loadLanes(Base::tileBegin_);
-            tileEnd = loadLanes(Base::tileEnd_);
+            tileBegin = lanesOf(Base::tileBegin_);
+            tileEnd = lanesOf(Base::tileEnd_);
             perUnit = everyLane(Base::voxelsPerUnit_);
         }
         Lanes const place = (p - tileBegin) * perUnit - offset;
@@ -290,7 +290,7 @@ template <class Traits> template <int side> void VoxelSamplerLinear<Traits, floa
 
 template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::fetchValues()
 {
-    fetchedVisit_ = Base::visit();
+    fetchedVisit_ = Base::visit_;
     values_ = nullptr;
     if (!Base::hasTile() || Base::currentTile().depth < minDepth_)
         return;
@@ -396,11 +396,14 @@ template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3,
     Internal::fillHaloFromNeighbours<Traits>(offsetType_, slot.values, tile.childIJK(), tilesAround(tile), parentHalo);
 }
 
-/// The data of the tiles of this depth at a fixed distance, on purpose: where tiles are wider than that, the tile is its
-/// own upper neighbour.
+/// The data of the tiles of this depth at a fixed distance, on purpose: where tiles are wider than that, the tile is
+/// its own upper neighbour.
 template <class Traits>
 auto VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::tilesAround(TileType const& tile) -> TilesAround
 {
+    auto const isIn = [](std::int64_t begin, std::int64_t index, int depth) {
+        return begin <= index && index < begin + Traits::tileWidth(depth);
+    };
     TilesAround around;
     std::size_t number = 0;
     for (int dz = -1; dz <= 1; ++dz)
@@ -408,12 +411,12 @@ auto VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::tilesAround(Tile
             for (int dx = -1; dx <= 1; ++dx, ++number) {
                 constexpr std::int64_t kStep = kNeighbourStep<Traits>;
                 std::int64_t const i = tile.i + dx * kStep, j = tile.j + dy * kStep, k = tile.k + dz * kStep;
-                if (std::min({i, j, k}) < INT32_MIN || std::max({i, j, k}) > INT32_MAX)
-                    continue;
-                TileType const& neighbour =
-                    neighbours_.tileImpl(static_cast<int>(i), static_cast<int>(j), static_cast<int>(k), tile.depth);
-                if (neighbour.depth == tile.depth)
-                    around[number] = channel_->tileData(neighbour.treeIndex());
+                // The outermost tiles reach beyond what 32 bits hold: what they hold of it is inside all the same.
+                TileType const& found =
+                    neighbours_.tileImpl(clampedIndex(i), clampedIndex(j), clampedIndex(k), tile.depth);
+                if (found.depth == tile.depth && isIn(found.i, i, found.depth) && isIn(found.j, j, found.depth)
+                    && isIn(found.k, k, found.depth))
+                    around[number] = channel_->tileData(found.treeIndex());
             }
     return around;
 }

@@ -4,9 +4,10 @@
 
 // How the parent's values are blended
 //
-// Along an axis, take the parent's values a tile's width apart: one for the tile before (a), the tile itself (b) and the
-// one behind (c). With a clear bit of the offset type they stand in the middle, each the mean of the parent's voxels
-// that its tile covers; with a set bit at the lower side, each the parent's voxel at that place. For tiles of 4 voxels:
+// Along an axis, take the parent's values a tile's width apart: one for the tile before (a), the tile itself (b) and
+// the one behind (c). With a clear bit of the offset type they stand in the middle, each the mean of the parent's
+// voxels that its tile covers; with a set bit at the lower side, each the parent's voxel at that place. For tiles of 4
+// voxels:
 //
 //                 tile before          tile            tile behind
 //              |               |               |               |
@@ -22,17 +23,18 @@
 //     -1: 0.25 a + 0.75 b    0: b    1: 0.25 c + 0.75 b    2: 0.5 c + 0.5 b    3: 0.75 c + 0.25 b    4: c
 //
 // Voxel 2 of the clear axis continues the line from a through b, so that values up to there depend on two of the
-// parent's only. Tiles of 5 voxels have tenths and fifths in the same way, with b alone in the middle. Axes multiply. What
-// the parent's own halo does not reach (half of a tile before its first child, or behind its last) is a straight line.
+// parent's only. Tiles of 5 voxels have fifths in the same way, with b alone in the middle. Axes multiply. What the
+// parent's own halo does not reach (half of a tile before its first child, or behind its last) is a straight line.
+// Blends are written as differences, so that those of equal values are that value to the bit.
 
 namespace TSR::TileTree3D::Internal {
 
 namespace {
 
-    /// Up to two values and their shares.
+    /// The second value's share, the first one has the rest of 1.
     struct Blend {
         int first, second;
-        float firstShare, secondShare;
+        float share;
     };
 
     bool isAtLowerSide(unsigned int offsetType, int axis)
@@ -49,8 +51,8 @@ namespace {
             atLowerSide ? static_cast<float>(voxel) / width : (static_cast<float>(2 * voxel + 1) - width) / (2 * width);
         bool const continuesLine = !atLowerSide && 2 * voxel == side;
         if (distance < 0 || continuesLine)
-            return {1, 0, 1 + distance, -distance};
-        return {1, 2, 1 - distance, distance};
+            return {1, 0, -distance};
+        return {1, 2, distance};
     }
 
     /// The value a tile's width apart, `tile` tiles from the tile's own, of voxels of the parent's halo.
@@ -61,26 +63,26 @@ namespace {
         int const first = (child + tile) * kCovered;
         int const last = first + kCovered - 1;
         if (first < -1) // a straight line through the first two
-            return atLowerSide ? Blend{-1, 0, 2, -1} : Blend{-1, 0, 1.5f, -0.5f};
+            return {-1, 0, atLowerSide ? -1 : -0.5f};
         if (atLowerSide || kCovered == 1)
-            return {first, first, 1, 0};
+            return {first, first, 0};
         if (last > Traits::kSide)
-            return {Traits::kSide, Traits::kSide - 1, 1.5f, -0.5f};
-        return {first, last, 0.5f, 0.5f};
+            return {Traits::kSide, Traits::kSide - 1, -0.5f};
+        return {first, last, 0.5f};
     }
 
     using Triple = std::array<Blend, 3>; // one an axis
 
     template <class ValueAt> float blended(Triple const& axes, ValueAt const& valueAt)
     {
+        auto const mix = [](float first, float second, float share) { return first + (second - first) * share; };
         auto const alongX = [&](int j, int k) {
-            return axes[0].firstShare * valueAt(axes[0].first, j, k)
-                + axes[0].secondShare * valueAt(axes[0].second, j, k);
+            return mix(valueAt(axes[0].first, j, k), valueAt(axes[0].second, j, k), axes[0].share);
         };
         auto const alongY = [&](int k) {
-            return axes[1].firstShare * alongX(axes[1].first, k) + axes[1].secondShare * alongX(axes[1].second, k);
+            return mix(alongX(axes[1].first, k), alongX(axes[1].second, k), axes[1].share);
         };
-        return axes[2].firstShare * alongY(axes[2].first) + axes[2].secondShare * alongY(axes[2].second);
+        return mix(alongY(axes[2].first), alongY(axes[2].second), axes[2].share);
     }
 
     /// The parent's values a tile's width apart, for the tile and those around it.

@@ -19,8 +19,6 @@ using TSR::TileTree3D::Traits5;
 
 namespace {
 
-    constexpr int kWorldSpace = 2;
-
     /// The mean of three equal points, as floats give it.
     float3 meanOfThree(float3 const& point)
     {
@@ -39,11 +37,12 @@ namespace {
         {
             constexpr unsigned int kAtOnce = 256;
             float3 mean[kAtOnce];
-            for (unsigned int first = points.begin(); first < points.end(); first += kAtOnce) {
-                unsigned int const count = std::min(kAtOnce, points.end() - first);
+            unsigned int count = 0;
+            for (unsigned int first = points.begin(); first != points.end(); first += count) {
+                count = std::min(kAtOnce, points.end() - first);
                 for (unsigned int n = 0; n < count; ++n)
                     mean[n] = meanOfThree(position[first + n]);
-                sampler.sampleAll(mean, count, Traits::kUnitDepth, kWorldSpace, value + first);
+                sampler.sampleAll(mean, count, Traits::kUnitDepth, TSR::TileTree3D::kWorldSpace, value + first);
             }
         }
     };

@@ -14,6 +14,7 @@
 #include <limits>
 #include <memory>
 #include <string>
+#include <tuple>
 #include <vector>
 
 using namespace TSR::TileTree3D;
@@ -23,7 +24,7 @@ using TestSupport::Random;
 
 namespace {
 
-constexpr int kWorldSpace = 2, kIndexSpace = 0;
+constexpr int kIndexSpace = 0;
 constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
 
 template <class> class VoxelSampling : public testing::Test {
@@ -90,11 +91,13 @@ void expectSameInRows(LinearSampler<Traits> sampler, float reach, int depth = Tr
             points.push_back({from.x + 0.3f * float(step), from.y, from.z - 0.1f * float(step)});
     }
     points[5].y = kNaN;
-    std::vector<float> values(points.size()), expected;
+    std::vector<float> values(points.size());
     sampler.sampleAll(points.data(), points.size(), depth, kIndexSpace, values.data());
-    for (float3 const p : points)
-        expected.push_back(LinearSampler<Traits>(sampler).sample(p, depth, kIndexSpace));
-    EXPECT_EQ(values, expected);
+    for (std::size_t n = 0; n < points.size(); ++n) {
+        float const single = LinearSampler<Traits>(sampler).sample(points[n], depth, kIndexSpace);
+        ASSERT_TRUE(values[n] == single || (std::isnan(values[n]) && std::isnan(single))) << n;
+        ASSERT_TRUE(single == sampler.sample(points[n], depth, kIndexSpace) || std::isnan(single)) << n;
+    }
 }
 
 float blend(float u, float v, float f)
@@ -333,16 +336,28 @@ TYPED_TEST(VoxelSampling, findsBackgroundOutsideAndNothingBeyondItsArrays)
     EXPECT_EQ(sampler.sample({0, 0, 0}, kDepth, kIndexSpace), field(0, 0, 0));
 
     // Offsets that fit no volume: voxels stay inside, fractions tell the distance.
-    for (float const offset : {-1000.0f, -1.5f, -0.3f, 0.4f, 2.5f, 77.0f, 1e20f, kNaN})
+    for (float const offset : {-1000.0f, -1.5f, -0.3f, 0.4f, 2.5f, 77.0f}) {
+        auto lost = samplerOf(volume, {offset, offset, offset});
+        Random random(5);
+        for (int n = 0; n < 200; ++n) {
+            auto const coordinate = [&] { return (random.coordinate() - 1) / 2 * kSide; }; // of the lowest tile
+            float3 const p{coordinate(), coordinate(), coordinate()};
+            std::array<Local, 3> at{
+                localOf<TypeParam>(p.x, offset), localOf<TypeParam>(p.y, offset), localOf<TypeParam>(p.z, offset)};
+            for (Local& axis : at)
+                axis.voxel = std::max(axis.voxel, 0);
+            float const expected = plainSample(at, [&](int i, int j, int k) {
+                return field(at[0].tileOrigin + i, at[1].tileOrigin + j, at[2].tileOrigin + k);
+            });
+            ASSERT_EQ(lost.sample(p, kDepth, kIndexSpace), expected) << offset;
+        }
+    }
+    for (float const offset : {-1000.0f, -1.5f, 0.4f, 77.0f, 1e20f, -1e20f, kNaN})
         for (unsigned int offsetType : {0u, 3u, 7u}) {
             auto const typed = volumeOf<TypeParam>(field, offsetType);
             auto const padded = makeHaloChannel(typed);
-            for (auto const* channel : {&padded, static_cast<decltype(&padded)>(nullptr)}) {
-                auto lost = samplerOf(typed, {offset, offset, offset}, channel);
-                Random random(5);
-                for (int n = 0; n < 200; ++n)
-                    lost.sample({random.coordinate() * kSide, random.coordinate() * kSide, 0}, kDepth, kIndexSpace);
-            }
+            expectSameInRows(samplerOf(typed, {offset, offset, offset}), kSide);
+            expectSameInRows(samplerOf(typed, {offset, offset, offset}, &padded), kSide);
         }
     auto shifted = samplerOf(volume, {-0.25f, 0, 0}); // the last voxel keeps what goes beyond
     EXPECT_EQ(shifted.sample({float(kSide) - 0.0625f - float(kSide), 0, 0}, kDepth, kIndexSpace),
@@ -351,6 +366,89 @@ TYPED_TEST(VoxelSampling, findsBackgroundOutsideAndNothingBeyondItsArrays)
     EXPECT_EQ(below.sample({0, 0, 0}, kDepth, kIndexSpace), blend(field(0, 0, 0), field(1, 0, 0), 0.75f));
     auto rounded = samplerOf(volume, {5e-6f, 0, 0});
     EXPECT_EQ(rounded.sample({0, 0, 0}, kDepth, kIndexSpace), field(0, 0, 0)) << "within rounding of the tile";
+}
+
+TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
+{
+    // Few fine voxels, some in coarse tiles, and borders with nothing behind.
+    std::vector<Voxel> coarse, fine;
+    Random random(11);
+    auto const at = [&](int reach) { return static_cast<int>(std::floor(random.coordinate() * float(reach))); };
+    for (int n = 0; n < 40; ++n)
+        coarse.push_back({at(5), at(5), at(5), random.coordinate()});
+    for (int n = 0; n < 300; ++n)
+        fine.push_back({at(30), at(30), at(30), random.coordinate()});
+    VoxelList const lists[] = {{TypeParam::kUnitDepth - 2, coarse}, {TypeParam::kUnitDepth, fine}};
+    VolumeSource source;
+    source.depth = TypeParam::kUnitDepth;
+    source.lists = lists;
+    for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
+        source.offsetType = offsetType;
+        auto const volume = buildVolume<TypeParam>(source);
+        expectSameInRows(samplerOf(volume, offsetsOf(offsetType)), 40);
+        if (offsetType != 7)
+            continue;
+        auto const padded = makeHaloChannel(volume);
+        auto plainSampler = samplerOf(volume), paddedSampler = samplerOf(volume, {0, 0, 0}, &padded);
+        expectSameInRows(paddedSampler, 40);
+        for (int n = 0; n < 10'000; ++n) {
+            float3 const p{40 * random.coordinate(), 40 * random.coordinate(), 40 * random.coordinate()};
+            int const depth = TypeParam::kDeepest + 1 - n % 5;
+            ASSERT_EQ(plainSampler.sample(p, depth, kIndexSpace), paddedSampler.sample(p, depth, kIndexSpace));
+        }
+        EXPECT_EQ(plainSampler.sample({0, 0, 0}, -1, kIndexSpace), 0);
+    }
+}
+
+TYPED_TEST(VoxelSampling, keepsConstantsToTheBit)
+{
+    float const value = 0.3f;
+    Field const field = Field::of(-13, 14, [&](int, int, int) { return value; });
+    for (unsigned int offsetType = 0; offsetType < 8; ++offsetType)
+        for (int const coarserLevels : {0, 1, 2}) {
+            VolumeSource source;
+            source.background = value;
+            source.offsetType = offsetType;
+            source.depth = TypeParam::kUnitDepth;
+            source.block = {{-13, -13, -13}, {27, 27, 27}, field.values.data()};
+            source.coarsestDepth = source.depth - coarserLevels;
+            auto const volume = buildVolume<TypeParam>(source);
+            auto sampler = samplerOf(volume, offsetsOf(offsetType));
+            Random random(6);
+            for (int n = 0; n < 1000; ++n)
+                ASSERT_EQ(sampler.sample({16 * random.coordinate(), 16 * random.coordinate(), 16 * random.coordinate()},
+                              source.depth, kIndexSpace),
+                    value)
+                    << offsetType << ", " << coarserLevels;
+        }
+}
+
+TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
+{
+    std::vector<Voxel> voxels;
+    Random random(8);
+    for (int n = 0; n < 2000; ++n) {
+        auto const far = [&](float reach) { return static_cast<int>(reach * random.coordinate()); };
+        float const reach = n % 2 ? 2147483520.0f : 30e6f;
+        voxels.push_back(
+            {far(reach), n % 3 ? far(reach) : std::numeric_limits<int>::min(), far(reach), random.coordinate()});
+    }
+    VoxelList const list{TypeParam::kUnitDepth, voxels};
+    VolumeSource source;
+    source.depth = TypeParam::kUnitDepth;
+    source.lists = {&list, 1};
+    for (unsigned int const offsetType : {0u, 7u}) {
+        source.offsetType = offsetType;
+        source.coarsestDepth = source.depth - 1;
+        auto const volume = buildVolume<TypeParam>(source);
+        auto sampler = samplerOf(volume);
+        for (Voxel const& v : voxels) {
+            float3 const p{float(v.i), float(v.j), float(v.k)}; // the list has numbers that floats hold
+            float row = 0;
+            sampler.sampleAll(&p, 1, source.depth, kIndexSpace, &row);
+            ASSERT_EQ(row, v.value) << v.i << ' ' << v.j << ' ' << v.k << ", " << offsetType;
+        }
+    }
 }
 
 TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
@@ -369,6 +467,13 @@ TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
     EXPECT_FLOAT_EQ(sampled({.maxDepth = kDepth - 1}, p), linearField(p)) << "coarser values, on the same line";
     EXPECT_EQ(sampled({.minDepth = kDepth, .maxDepth = kDepth - 1}, p), -1);
     EXPECT_EQ(sampled({.minDepth = kDepth}, p), linearField(p));
+    auto const padded = makeHaloChannel(volume);
+    for (auto const& [minDepth, channel, expected] : {std::tuple{kDepth, &padded, linearField(p)},
+             std::tuple{kDepth + 1, &padded, -1.0f}, std::tuple{0, &volume.channel, -1.0f /* not padded */}})
+        EXPECT_EQ(LinearSampler<TypeParam>(volume.container, volume.channel, volume.topology,
+                      {.background = -1, .minDepth = minDepth}, channel)
+                      .sample(p, kDepth, kIndexSpace),
+            expected);
     EXPECT_EQ(sampled({.scale = 2}, {p.x / 2, p.y / 2, p.z / 2}, kWorldSpace), linearField(p));
     EXPECT_EQ(sampled({.scale = 2}, p), linearField(p));
 

@@ -4,15 +4,11 @@
 
 namespace TSR::TileTree3D {
 
+using Internal::floorDivide;
+
 namespace {
 
     constexpr std::uint32_t kNoTile = ~std::uint32_t{0};
-
-    std::int64_t floorDivide(std::int64_t dividend, std::int64_t divisor)
-    {
-        std::int64_t const quotient = dividend / divisor;
-        return quotient - (dividend % divisor < 0 ? 1 : 0);
-    }
 
     template <class Traits> std::int64_t tileOrigin(std::int64_t index, int depth)
     {

@@ -8,6 +8,8 @@
 
 namespace TSR::TileTree3D {
 
+using Internal::floorDivide;
+
 namespace {
 
     struct Index {
@@ -32,12 +34,6 @@ namespace {
         }
     };
 
-    std::int64_t floorDivide(std::int64_t dividend, std::int64_t divisor)
-    {
-        std::int64_t const quotient = dividend / divisor;
-        return quotient - (dividend % divisor < 0 ? 1 : 0);
-    }
-
     int linearIndex(int side, int i, int j, int k)
     {
         return i + (j + k * side) * side;
@@ -56,8 +52,7 @@ namespace {
             check();
             for (ConstantBox const& box : source_.boxes)
                 addBox(box);
-            addLists();
-            addBlock();
+            addListsAndBlock();
             volume_.container.completeParents();
             fillCoarserTiles();
             return std::move(volume_);
@@ -195,13 +190,17 @@ namespace {
                             static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide))] = value;
         }
 
-        void addLists()
+        /// From coarse to fine, the block after lists of its depth.
+        void addListsAndBlock()
         {
             std::vector<VoxelList> lists(source_.lists.begin(), source_.lists.end());
             std::stable_sort(
                 lists.begin(), lists.end(), [](VoxelList const& a, VoxelList const& b) { return a.depth < b.depth; });
-            for (VoxelList const& list : lists)
-                addVoxels(list);
+            auto const finer = std::find_if(
+                lists.begin(), lists.end(), [&](VoxelList const& list) { return list.depth > source_.depth; });
+            std::for_each(lists.begin(), finer, [&](VoxelList const& list) { addVoxels(list); });
+            addBlock();
+            std::for_each(finer, lists.end(), [&](VoxelList const& list) { addVoxels(list); });
         }
 
         void addVoxels(VoxelList const& list)
@@ -286,13 +285,15 @@ namespace {
             for (int z = 0; z < kCovered; ++z)
                 for (int y = 0; y < kCovered; ++y)
                     for (int x = 0; x < kCovered; ++x) {
+                        // As differences: the mean of equal values is that value.
+                        float const first = fine(x * kChildren, y * kChildren, z * kChildren);
                         float sum = 0;
                         for (int k = 0; k < spanZ; ++k)
                             for (int j = 0; j < spanY; ++j)
                                 for (int i = 0; i < spanX; ++i)
-                                    sum += fine(x * kChildren + i, y * kChildren + j, z * kChildren + k);
+                                    sum += fine(x * kChildren + i, y * kChildren + j, z * kChildren + k) - first;
                         coarse[linearIndex(kSide, child.i * kCovered + x, child.j * kCovered + y,
-                            child.k * kCovered + z)] = sum / static_cast<float>(spanX * spanY * spanZ);
+                            child.k * kCovered + z)] = first + sum / static_cast<float>(spanX * spanY * spanZ);
                     }
         }
 

@@ -69,8 +69,9 @@ public:
     {
     }
 
-    /// The tile at `depth` that contains the index. Where the tree ends above that depth, the tile that it ends in, as
-    /// its values stand for all that is deeper. Otherwise one whose valid flag is false.
+    /// The tile at `depth` that contains the index. Where there is none, the deepest one above it with values of its
+    /// own, which stand for all that is deeper. Otherwise, and for a depth that the layout does not have, one whose
+    /// valid flag is false.
     TileType const& tileImpl(int i, int j, int k, int depth)
     {
         if (!(isAnswerAt(depth) && contains(*tile_, i, j, k)))
@@ -81,7 +82,8 @@ public:
 private:
     bool isAnswerAt(int depth) const noexcept
     {
-        return tile_->depth == depth || (tile_->depth < depth && tile_->isTerminal && !tile_->hasChildren);
+        return tile_->valid && depth <= Traits::kDeepest
+            && (tile_->depth == depth || (tile_->depth < depth && tile_->isTerminal && !tile_->hasChildren));
     }
     static bool contains(TileType const& tile, std::int64_t i, std::int64_t j, std::int64_t k) noexcept
     {

@@ -11,7 +11,7 @@ template <class Traits> using PositiveHalo = TileData<float, Traits::kSide + 1, 
 
 /// Fills the halo tile of `tile`, coordinates 0 to `kSide`. Across the upper faces, edges and corner it takes the first
 /// layer of the neighbours of the same depth that hold data. What is missing continues the parent's values; without
-/// any, the outermost layer of the tile itself.
+/// any, the outermost layer of the tile itself. Values are taken to stand at the lower sides of their voxels.
 ///
 /// \param parentTile  May be null.
 /// \param parentHalo  That of the parent tile; may be empty, and then the parent's values are not used.

@@ -8,6 +8,11 @@ namespace TSR::TileTree3D {
 
 namespace Internal {
 
+    constexpr std::int64_t floorDivide(std::int64_t dividend, std::int64_t divisor)
+    {
+        return dividend / divisor - (dividend % divisor < 0 ? 1 : 0);
+    }
+
     /// The depth at which a tile is one index unit wide, where tiles of depth 0 are as wide as 32-bit indices can tell.
     constexpr int deepestDepth(int childrenPerAxis)
     {

@@ -41,8 +41,9 @@ struct DenseBlock {
     float const* values;
 };
 
-/// What a volume is built from. Boxes come first, then lists from coarse to fine, then the block: where they overlap, what
-/// comes later stands, and the rest of a tile that is begun inside a coarser one has the coarser one's values.
+/// What a volume is built from. Boxes do not overlap one another. Otherwise the finer tile stands where sources
+/// overlap, and at one depth the list over the box, and the block over both; the rest of a tile that is begun inside a
+/// coarser one has the coarser one's values.
 struct VolumeSource {
     float background = 0;
     unsigned int offsetType = 7; // see VoxelTopology
