@@ -103,7 +103,9 @@ TEST(Triangulate, takesOddMeshesAndLeavesIncompleteOnes)
     setElementCount(sFaceComp, 2, *shortOffsets);
     auto const shortPositions = makeMesh(points, {0, 1, 2}, {0, 3});
     setElementCount(sPointComp, 4, *shortPositions);
-    for (auto const* const mesh : {&noCorners, &noPositions, &shortOffsets, &shortPositions}) {
+    auto const shortCorners = makeMesh(points, {0, 1, 2}, {0, 3});
+    setElementCount(sFaceVertexComp, 4, *shortCorners);
+    for (auto const* const mesh : {&noCorners, &noPositions, &shortOffsets, &shortPositions, &shortCorners}) {
         addDataProperty<int>("id", sFaceComp, {1}, **mesh);
         auto const before = deepCopy(**mesh);
         triangulate("", **mesh);

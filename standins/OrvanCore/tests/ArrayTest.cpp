@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include <cstddef>
+#include <cstring>
 #include <limits>
 #include <memory>
 #include <vector>
@@ -153,11 +154,15 @@ TEST(UntypedTypeRep, givesAlignedStorage)
         {UntypedTypeRep::of<char>(), UntypedTypeRep::of<double>(), UntypedTypeRep::of<Wide>()})
         for (std::uint64_t const bytes : {256u, 4096u, 1u << 22, (1u << 22) + 256u}) {
             std::uint64_t const count = bytes / rep.elementSize;
-            auto* const block = static_cast<unsigned char*>(rep.allocate(count));
             std::uint64_t const alignment = std::max<std::uint64_t>(rep.elementAlignment, bytes < 4096 ? 16 : 64);
-            EXPECT_EQ(reinterpret_cast<std::uintptr_t>(block) % alignment, 0u) << bytes << " bytes";
-            block[0] = block[bytes - 1] = 1;
-            rep.deallocate(block, count);
+            void* blocks[4]; // of several next to each other not all are aligned by chance
+            for (void*& block : blocks) {
+                block = rep.allocate(count);
+                EXPECT_EQ(reinterpret_cast<std::uintptr_t>(block) % alignment, 0u) << bytes << " bytes";
+                std::memset(block, 1, bytes);
+            }
+            for (void* const block : blocks)
+                rep.deallocate(block, count);
         }
     EXPECT_EQ(UntypedTypeRep::of<Wide>().allocate(0), nullptr);
     UntypedTypeRep::of<Wide>().deallocate(nullptr, 0);

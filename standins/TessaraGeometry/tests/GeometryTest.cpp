@@ -123,6 +123,9 @@ TEST(Lookup, findsGeoPropertiesByKindAndTarget)
     addRangeProperty("far", "range", {0}, *mesh);
     mesh->setProperty("text", Orvan::String(sPointComp));
     mesh->setProperty("null", Orvan::Ptr<Object>());
+    Orvan::MutablePtr<Object> other = Tessara::createObject(); // neither data nor a range
+    other->setProperty(sTarget, Orvan::String(sPointComp));
+    mesh->setProperty("other", Orvan::Ptr<Object>(std::move(other)));
 
     auto const data = getDataGeoPropPrototype(sGenericDataGeoProp);
     EXPECT_THAT(textsOf(getGeoPropNamesByPrototype(*mesh, *data)),

@@ -110,21 +110,23 @@ namespace {
 
     TEST(WritePly, writesBoolsAsBytesAndLongFaces)
     {
-        Orvan::Array<unsigned int> corners(300);
-        for (unsigned int corner = 0; corner < 300; ++corner)
-            corners[corner] = corner % 5;
-        Object const mesh = makeMesh(Orvan::Array<float3>(5), corners, {0, 300});
-        addDataProperty<bool>("chosen", sFaceComp, {true}, *mesh);
-        addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(300), *mesh);
-        addDataProperty<int>("two words", sFaceComp, {1}, *mesh);
-        addDataProperty<int>("x", sPointComp, someValues<int>(5), *mesh);
-        Written const file = written(*mesh, ".ply");
-        EXPECT_THAT(file.notes,
-            ElementsAre(HasSubstr("\"x\" (int, sPointComp) is left out"), HasSubstr("\"chosen\" is written as uchar"),
-                HasSubstr("\"two words\"")));
-        EXPECT_EQ(valuesOf<unsigned char>(*file.object, "chosen"), std::vector<unsigned char>{1});
-        EXPECT_EQ(valuesOf<unsigned int>(*file.object, sFaceVertex).size(), 300u);
-        EXPECT_EQ(valuesOf<float2>(*file.object, "uv"), valuesOf<float2>(*mesh, "uv"));
+        for (unsigned int const count : {127u, 200u, 300u}) { // lengths of two lists in bytes, of one, of none
+            Orvan::Array<unsigned int> corners(count);
+            for (unsigned int corner = 0; corner < count; ++corner)
+                corners[corner] = corner % 5;
+            Object const mesh = makeMesh(Orvan::Array<float3>(5), corners, {0, count});
+            addDataProperty<bool>("chosen", sFaceComp, {true}, *mesh);
+            addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(count), *mesh);
+            addDataProperty<int>("two words", sFaceComp, {1}, *mesh);
+            addDataProperty<int>("x", sPointComp, someValues<int>(5), *mesh);
+            Written const file = written(*mesh, ".ply");
+            EXPECT_THAT(file.notes,
+                ElementsAre(HasSubstr("\"x\" (int, sPointComp) is left out"),
+                    HasSubstr("\"chosen\" is written as uchar"), HasSubstr("\"two words\"")));
+            EXPECT_EQ(valuesOf<unsigned char>(*file.object, "chosen"), std::vector<unsigned char>{1});
+            EXPECT_EQ(valuesOf<unsigned int>(*file.object, sFaceVertex), valuesOf<unsigned int>(*mesh, sFaceVertex));
+            EXPECT_EQ(valuesOf<float2>(*file.object, "uv"), valuesOf<float2>(*mesh, "uv"));
+        }
     }
 
     TEST(WriteObj, bringsGeometryBackToTheBit)
