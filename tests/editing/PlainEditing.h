@@ -1,11 +1,6 @@
 #pragma once
 
-#include "support/PropertyBag.h"
-
-#include <TessaraGeometry/ElementTypes.h>
-#include <TessaraGeometry/Elements.h>
-#include <TessaraGeometry/Lookup.h>
-#include <TessaraGeometry/Makers.h>
+#include "support/Testing.h"
 
 #include <algorithm>
 
@@ -18,8 +13,7 @@ using Flags = Orvan::Array<bool>;
 using Indices = Orvan::Array<unsigned int>;
 using Tessara::Object;
 using Tessara::PropertyValue;
-using Tessara::Math::float3;
-using TestSupport::replaceIn;
+using namespace TestSupport;
 using namespace Tessara::Geometry;
 
 inline Indices mapping(Flags const& deleted)

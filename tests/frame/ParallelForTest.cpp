@@ -6,8 +6,6 @@
 
 #include <atomic>
 #include <new>
-#include <set>
-#include <thread>
 #include <vector>
 
 using namespace Modeling;
@@ -23,22 +21,6 @@ struct CancelledJob {
 
 auto const doNothing = [](Range const&) {};
 
-}
-
-TEST(ParallelFor, visitsEveryElementOnceForAnyGrain)
-{
-    for (std::size_t const size :
-        {std::size_t{0}, std::size_t{1}, std::size_t{1000}, std::size_t{1001}, std::size_t{54321}})
-        for (std::size_t const grain : {std::size_t{1}, std::size_t{1000}}) {
-            std::vector<int> visits(size);
-            TestSupport::withThreads(8, [&] {
-                parallelFor(Range(0, size, grain), [&](Range const& range) {
-                    for (std::size_t i = range.begin(); i != range.end(); ++i)
-                        ++visits[i];
-                });
-            });
-            EXPECT_EQ(visits, std::vector<int>(size, 1)) << size << " elements, grain " << grain;
-        }
 }
 
 TEST(ParallelFor, staysOnTheCallingThreadUpToItsGrain)

@@ -49,14 +49,6 @@ bool mergePlainly(Kind kind, Inputs const& inputs, Object& output)
                                     : PlainMerge::mergeStrands(inputs, output);
 }
 
-Orvan::Array<float3> randomPositions(std::size_t count, Random& random)
-{
-    Orvan::Array<float3> positions(count);
-    for (float3& p : positions)
-        p = {random.coordinate(), random.coordinate(), random.coordinate()};
-    return positions;
-}
-
 Orvan::Ptr<Object> randomInput(Kind kind, std::size_t size, Random& random)
 {
     std::size_t const pointCount = size + random.below(4);
@@ -123,12 +115,6 @@ void expectUnchanged(Inputs const& inputs, Inputs const& before)
 {
     for (std::size_t input = 0; input != inputs.size; ++input)
         EXPECT_TRUE(sameContents(*inputs[input], *before[input])) << "input " << input;
-}
-
-template <class T> std::vector<T> valuesOf(Object const& object, char const* name)
-{
-    auto const values = dataOf<T>(object, name);
-    return values ? std::vector<T>(values->begin(), values->end()) : std::vector<T>();
 }
 
 Indices indicesOf(Object const& object, char const* range)

@@ -1,14 +1,6 @@
 #include <Modeling/HalfEdgeDataStructure.h>
 
-#include "support/MeshBuilder.h"
-#include "support/Random.h"
-#include "support/Threads.h"
-
-#include <gtest/gtest.h>
-
-#include <map>
-#include <string>
-#include <vector>
+#include "support/Testing.h"
 
 using Geometry::Mesh::HalfEdge;
 using Geometry::Mesh::HalfEdgeDataStructure;
@@ -16,43 +8,30 @@ using namespace TestSupport;
 
 namespace {
 
-struct Polygons {
-    unsigned int pointCount;
-    unsigned int faceCount = 0;
-    Orvan::Array<unsigned int> faceVertex{};
-    Orvan::Array<unsigned int> faceOffset{0};
+using Array = Orvan::Array<unsigned int>;
 
-    template <class Face> Polygons& add(Face const& face)
-    {
-        for (unsigned int const point : face)
-            faceVertex.append(point);
-        faceOffset.append(static_cast<unsigned int>(faceVertex.size));
-        ++faceCount;
-        return *this;
-    }
-    HalfEdgeDataStructure build() const { return {pointCount, faceCount, faceVertex, faceOffset}; }
-    bool hasBoundary() const { return build().hasBoundary(faceCount, faceVertex, faceOffset); }
-};
-
-Polygons polygonsOf(MeshBuilder const& mesh)
+HalfEdgeDataStructure halfEdgesOf(PolygonMesh const& mesh)
 {
-    Polygons polygons{static_cast<unsigned int>(mesh.points.size())};
-    for (auto const& face : mesh.faces)
-        polygons.add(face);
-    return polygons;
+    return {static_cast<unsigned int>(mesh.points.size()), static_cast<unsigned int>(mesh.faceCount()),
+        Array(std::span(mesh.faceVertex)), Array(std::span(mesh.faceOffset))};
 }
 
-Polygons soup(unsigned int pointCount, unsigned int faceCount, std::size_t smallest, std::size_t largest)
+bool hasBoundary(PolygonMesh const& mesh)
+{
+    return halfEdgesOf(mesh).hasBoundary(static_cast<unsigned int>(mesh.faceCount()), Array(std::span(mesh.faceVertex)),
+        Array(std::span(mesh.faceOffset)));
+}
+
+PolygonMesh soup(unsigned int pointCount, std::size_t faceCount, std::size_t smallest, std::size_t largest)
 {
     Random random(pointCount);
-    Polygons polygons{pointCount};
-    while (polygons.faceCount != faceCount) {
-        std::vector<unsigned int> face(smallest + random.below(largest - smallest + 1));
-        for (unsigned int& point : face)
-            point = random.below(pointCount);
-        polygons.add(face);
+    PolygonMesh mesh{std::vector<float3>(pointCount), {}};
+    while (mesh.faceCount() != faceCount) {
+        for (std::size_t corner = smallest + random.below(largest - smallest + 1); corner != 0; --corner)
+            mesh.faceVertex.push_back(random.below(pointCount));
+        mesh.faceOffset.push_back(static_cast<unsigned int>(mesh.faceVertex.size()));
     }
-    return polygons;
+    return mesh;
 }
 
 using Edges = std::vector<std::map<unsigned int, HalfEdge>>;
@@ -75,43 +54,49 @@ Edges edgesOf(HalfEdgeDataStructure const& halfEdges, unsigned int pointCount)
 
 TEST(HalfEdgeDataStructure, agreesWithAMapForEachPoint)
 {
-    std::map<std::string, Polygons> const meshes{
-        {"nothing", {5}},
-        {"no points", {0}},
-        {"sphere", polygonsOf(MeshBuilder::sphere(40).shuffled(1))},
-        {"hub", polygonsOf(MeshBuilder::bipyramid(3000))},
+    std::map<std::string, PolygonMesh> const meshes{
+        {"nothing", soup(5, 0, 0, 0)},
+        {"no points", {}},
+        {"sphere", MeshBuilder::sphere(40).shuffled(1).polygons()},
+        {"hub", MeshBuilder::bipyramid(3000).polygons()},
         {"triangles at random", soup(40, 30'000, 3, 3)},
         {"polygons at random", soup(300, 500, 0, 7)},
         {"large polygons", soup(4000, 3, 300, 300)},
     };
     for (auto const& [name, mesh] : meshes) {
-        Edges expected(mesh.pointCount);
-        for (unsigned int face = 0; face != mesh.faceCount; ++face) {
+        auto const pointCount = static_cast<unsigned int>(mesh.points.size());
+        Edges expected(pointCount);
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
             unsigned int const first = mesh.faceOffset[face], size = mesh.faceOffset[face + 1] - first;
             for (unsigned int i = 0; i != size; ++i) // of equal edges the lowest face and corner
                 expected[mesh.faceVertex[first + i]].try_emplace(mesh.faceVertex[first + (i + size - 1) % size],
                     HalfEdge{face, static_cast<unsigned char>(i), static_cast<unsigned char>(size)});
         }
         for (int const threads : {1, 2, 8})
-            EXPECT_EQ(withThreads(threads, [&mesh = mesh] { return edgesOf(mesh.build(), mesh.pointCount); }), expected)
+            EXPECT_EQ(
+                withThreads(threads, [&mesh = mesh, pointCount] { return edgesOf(halfEdgesOf(mesh), pointCount); }),
+                expected)
                 << name << ", " << threads << " threads";
     }
 }
 
 TEST(HalfEdgeDataStructure, findsOpenEdgesOfTriangles)
 {
-    EXPECT_FALSE(polygonsOf(MeshBuilder::tetrahedron()).hasBoundary());
-    EXPECT_FALSE(Polygons{3}.hasBoundary());
-    EXPECT_TRUE(polygonsOf(MeshBuilder::sphere(30).withoutFace(4321)).hasBoundary());
-    EXPECT_TRUE(Polygons{4}.add(std::vector{0u, 1u, 2u, 3u}).add(std::vector{3u, 2u, 1u, 0u}).hasBoundary())
-        << "chords of quads";
-    for (std::size_t const size : {0u, 1u, 2u})
-        EXPECT_TRUE(polygonsOf(MeshBuilder::tetrahedron()).add(std::vector(size, 3u)).hasBoundary()) << size;
+    EXPECT_FALSE(hasBoundary(MeshBuilder::tetrahedron().polygons()));
+    EXPECT_FALSE(hasBoundary(soup(3, 0, 0, 0)));
+    EXPECT_TRUE(hasBoundary(MeshBuilder::sphere(30).withoutFace(4321).polygons()));
+    EXPECT_TRUE(hasBoundary({std::vector<float3>(4), {0, 1, 2, 3, 3, 2, 1, 0}, {0, 4, 8}})) << "chords of quads";
+    for (unsigned int const size : {0u, 1u, 2u}) {
+        PolygonMesh mesh = MeshBuilder::tetrahedron().polygons();
+        mesh.faceVertex.resize(12 + size, 3);
+        mesh.faceOffset.push_back(12 + size);
+        EXPECT_TRUE(hasBoundary(mesh)) << size;
+    }
 }
 
 TEST(HalfEdgeDataStructure, clearsSwapsAndStartsEmpty)
 {
-    HalfEdgeDataStructure edges(4), tetrahedron = polygonsOf(MeshBuilder::tetrahedron()).build();
+    HalfEdgeDataStructure edges(4), tetrahedron = halfEdgesOf(MeshBuilder::tetrahedron().polygons());
     EXPECT_EQ(edges.halfEdge(3, 0), (HalfEdge{Tessara::Geometry::kInvalidIndex, 0, 1}));
     edges.swap(tetrahedron);
     tetrahedron.clear();

@@ -83,21 +83,6 @@ namespace {
         return {};
     }
 
-    template <class T> PropertyValue deepCopyOf(T const& value)
-    {
-        return value;
-    }
-
-    template <class T> PropertyValue deepCopyOf(Orvan::Ptr<Orvan::Array<T>> const& array)
-    {
-        return array ? Orvan::makePtr<Orvan::Array<T>>(*array) : array;
-    }
-
-    PropertyValue deepCopyOf(Orvan::Ptr<Object> const& object)
-    {
-        return object ? Orvan::Ptr<Object>(deepCopy(*object)) : object;
-    }
-
 }
 
 testing::AssertionResult sameContents(Object const& actual, Object const& expected)
@@ -112,12 +97,18 @@ Orvan::MutablePtr<Object> deepCopy(Object const& object)
     Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = object.keys();
     for (Orvan::String const& key : *keys) {
         PropertyValue const value = object.getProperty(key);
-        PropertyValue copied = value;
+        copy->setProperty(key, PropertyValue(value));
+        auto const copyDeeply = [&]<class Held>(Orvan::Ptr<Held> const& held) {
+            if constexpr (std::is_same_v<Held, Object>)
+                copy->setProperty(key, held ? Orvan::Ptr<Object>(deepCopy(*held)) : held);
+            else
+                copy->setProperty(key, held ? Orvan::makePtr<Held>(*held) : held);
+        };
         forEachHeldType([&]<class T>() {
-            if (T const* const held = value.get<T>())
-                copied = deepCopyOf(*held);
+            if constexpr (requires(T const& held) { copyDeeply(held); })
+                if (T const* const held = value.get<T>())
+                    copyDeeply(*held);
         });
-        copy->setProperty(key, std::move(copied));
     }
     return copy;
 }

@@ -1,5 +1,7 @@
 #include "FailingAllocations.h"
 
+#include "Compare.h"
+
 #include <gtest/gtest.h>
 
 #include <atomic>
@@ -45,29 +47,6 @@ namespace {
         std::free(block);
     }
 
-    /// Whether an allocation failed in the action and, if so, ended it.
-    struct Outcome {
-        bool hasFailed = false;
-        bool isCompleted = false;
-    };
-
-    Outcome runWithFailure(std::function<void()> const& action, std::int64_t number, bool once)
-    {
-        Outcome outcome;
-        failsOnce = once;
-        allocationsLeft = number - 1;
-        try {
-            action();
-            outcome.isCompleted = true;
-        } catch (std::bad_alloc const&) {
-        } catch (...) {
-            allocationsLeft = kNever;
-            throw;
-        }
-        outcome.hasFailed = allocationsLeft.exchange(kNever) < 0;
-        return outcome;
-    }
-
 }
 
 void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
@@ -77,25 +56,45 @@ void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
         action();
         return true;
     });
-    for (bool const once : {true, false}) {
-        bool hasFailed = true;
-        for (std::int64_t number = 1; hasFailed && !testing::Test::HasFatalFailure(); ++number) {
+    bool hasFailed = true;
+    for (bool const once : {true, false})
+        for (std::int64_t number = 1; (number == 1 || hasFailed) && !testing::Test::HasFatalFailure(); ++number) {
             SCOPED_TRACE("allocation " + std::to_string(number) + (once ? " fails" : " and all later ones fail"));
             ASSERT_LT(number, 100'000) << "the action never succeeds";
             std::int64_t const before = liveBlocks;
-            {
-                Attempt const attempt = [&](std::function<void()> const& action) {
-                    Outcome const outcome = runWithFailure(action, number, once);
-                    hasFailed = outcome.hasFailed;
-                    EXPECT_TRUE(outcome.isCompleted || outcome.hasFailed)
-                        << "std::bad_alloc without a failed allocation";
-                    return outcome.isCompleted;
-                };
-                trial(attempt);
-            }
+            hasFailed = false;
+            trial([&](std::function<void()> const& action) {
+                bool isCompleted = false;
+                failsOnce = once;
+                allocationsLeft = number - 1;
+                try {
+                    action();
+                    isCompleted = true;
+                } catch (std::bad_alloc const&) {
+                } catch (...) {
+                    allocationsLeft = kNever;
+                    throw;
+                }
+                bool const isFailing = allocationsLeft.exchange(kNever) < 0;
+                hasFailed = hasFailed || isFailing;
+                EXPECT_TRUE(isCompleted || isFailing) << "std::bad_alloc without a failed allocation";
+                return isCompleted;
+            });
             EXPECT_EQ(liveBlocks, before) << "blocks leaked";
         }
-    }
+}
+
+void expectAllOrNothing(Tessara::Object const& source, std::function<void(Tessara::Object&)> const& edit)
+{
+    auto const before = deepCopy(source), expected = deepCopy(source);
+    edit(*expected);
+    for (bool const isShared : {true, false})
+        sweepFailingAllocations([&](Attempt const& attempt) {
+            Tessara::Object object = isShared ? source : *deepCopy(source);
+            bool const isDone = attempt([&] { edit(object); });
+            EXPECT_TRUE(sameContents(object, isDone ? *expected : *before));
+            EXPECT_TRUE(sameContents(source, *before)) << "somebody else sees a change";
+        });
 }
 
 }

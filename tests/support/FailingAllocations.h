@@ -1,6 +1,7 @@
 #pragma once
 
-#include <cstdint>
+#include <TessaraObject/Object.h>
+
 #include <functional>
 
 namespace TestSupport {
@@ -14,5 +15,9 @@ using Attempt = std::function<bool(std::function<void()> const& action)>;
 /// once, and in a second trial all from then on; for n = 1, 2, 3 and so on, until the action succeeds. The trial makes
 /// its inputs and checks what the action left of them; afterwards, nothing it took may still be taken.
 void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial);
+
+/// Edits copies of an object while allocations fail: each is then as it was, or edited as a whole. Copies share what
+/// they hold with the source, which stays as it is, or have it to themselves.
+void expectAllOrNothing(Tessara::Object const& source, std::function<void(Tessara::Object&)> const& edit);
 
 }

@@ -2,8 +2,6 @@
 
 #include "Random.h"
 
-#include <TessaraGeometry/Makers.h>
-
 #include <algorithm>
 #include <cmath>
 #include <numeric>
@@ -17,44 +15,6 @@ namespace {
     {
         auto const length = std::sqrt(static_cast<float>(x * x + y * y + z * z));
         return {static_cast<float>(x) / length, static_cast<float>(y) / length, static_cast<float>(z) / length};
-    }
-
-    /// Points of the octahedron |x| + |y| + |z| = n by rings of constant z: a ring of "radius" r has 4 r points, a pole
-    /// one.
-    struct OctahedronGrid {
-        int n;
-
-        static unsigned int ringSize(int radius) { return radius == 0 ? 1 : 4 * static_cast<unsigned int>(radius); }
-
-        float3 point(int z, unsigned int t) const
-        {
-            int const radius = n - std::abs(z);
-            if (radius == 0)
-                return onSphere(0, 0, z);
-            int const side = static_cast<int>(t) / radius;
-            int const step = static_cast<int>(t) % radius;
-            int const corners[4][2] = {{radius, 0}, {0, radius}, {-radius, 0}, {0, -radius}};
-            int const steps[4][2] = {{-1, 1}, {-1, -1}, {1, -1}, {1, 1}};
-            return onSphere(corners[side][0] + step * steps[side][0], corners[side][1] + step * steps[side][1], z);
-        }
-    };
-
-    /// The faces between a ring of radius r and the next smaller one.
-    void addBelt(unsigned int outerStart, unsigned int innerStart, int radius, bool isUpper,
-        std::vector<MeshBuilder::Triangle>& faces)
-    {
-        auto const r = static_cast<unsigned int>(radius);
-        auto const outer = [=](unsigned int t) { return outerStart + t % (4 * r); };
-        auto const inner = [=](unsigned int t) { return innerStart + t % OctahedronGrid::ringSize(radius - 1); };
-        auto const add = [&](unsigned int a, unsigned int b, unsigned int c) {
-            faces.push_back(isUpper ? MeshBuilder::Triangle{a, b, c} : MeshBuilder::Triangle{b, a, c});
-        };
-        for (unsigned int side = 0; side != 4; ++side)
-            for (unsigned int step = 0; step != r; ++step) {
-                add(outer(side * r + step), outer(side * r + step + 1), inner(side * (r - 1) + step));
-                if (step + 1 != r)
-                    add(inner(side * (r - 1) + step), outer(side * r + step + 1), inner(side * (r - 1) + step + 1));
-            }
     }
 
 }
@@ -74,21 +34,41 @@ MeshBuilder MeshBuilder::tetrahedron()
 
 MeshBuilder MeshBuilder::sphere(unsigned int segments)
 {
+    // Points of the octahedron |x| + |y| + |z| = n by rings of constant z: a ring of "radius" r has 4 r points, a pole
+    // one.
+    constexpr int kCorners[5][2] = {{1, 0}, {0, 1}, {-1, 0}, {0, -1}, {1, 0}};
     MeshBuilder mesh;
-    int const n = static_cast<int>(segments);
-    OctahedronGrid const grid{n};
     std::vector<unsigned int> ringStart;
+    int const n = static_cast<int>(segments);
     for (int z = n; z >= -n; --z) {
+        int const radius = n - std::abs(z);
         ringStart.push_back(static_cast<unsigned int>(mesh.points.size()));
-        for (unsigned int t = 0; t != OctahedronGrid::ringSize(n - std::abs(z)); ++t)
-            mesh.points.push_back(grid.point(z, t));
+        if (radius == 0)
+            mesh.points.push_back({0, 0, z < 0 ? -1.0f : 1.0f});
+        for (int t = 0; t != 4 * radius; ++t) {
+            int const side = t / radius, step = t % radius;
+            int const* const from = kCorners[side];
+            int const* const to = kCorners[side + 1];
+            mesh.points.push_back(
+                onSphere((radius - step) * from[0] + step * to[0], (radius - step) * from[1] + step * to[1], z));
+        }
     }
-    for (int radius = 1; radius <= n; ++radius) {
-        auto const r = static_cast<std::size_t>(radius);
-        auto const bottom = static_cast<std::size_t>(2 * n);
-        addBelt(ringStart[r], ringStart[r - 1], radius, true, mesh.faces);
-        addBelt(ringStart[bottom - r], ringStart[bottom - r + 1], radius, false, mesh.faces);
-    }
+    // The faces between a ring of radius r and the next smaller one.
+    for (unsigned int r = 1; r <= segments; ++r)
+        for (bool const isUpper : {true, false}) {
+            unsigned int const outerRing = isUpper ? r : 2 * segments - r, innerRing = isUpper ? r - 1 : outerRing + 1;
+            auto const outer = [&](unsigned int t) { return ringStart[outerRing] + t % (4 * r); };
+            auto const inner = [&](unsigned int t) { return ringStart[innerRing] + t % std::max(1u, 4 * (r - 1)); };
+            auto const add = [&](unsigned int a, unsigned int b, unsigned int c) {
+                mesh.faces.push_back(isUpper ? Triangle{a, b, c} : Triangle{b, a, c});
+            };
+            for (unsigned int t = 0; t != 4 * r; ++t) {
+                unsigned int const below = t - t / r; // without a point for each side before
+                add(outer(t), outer(t + 1), inner(below));
+                if (t % r + 1 != r)
+                    add(inner(below), outer(t + 1), inner(below + 1));
+            }
+        }
     return mesh;
 }
 
@@ -127,14 +107,11 @@ MeshBuilder MeshBuilder::torus(unsigned int rings, unsigned int sides)
             auto const [dx, dz] = onSquare(side, sides);
             mesh.points.push_back({cx * (3 + dx), cy * (3 + dx), dz});
         }
+    auto const at = [=](unsigned int ring, unsigned int side) { return ring % rings * sides + side % sides; };
     for (unsigned int ring = 0; ring != rings; ++ring)
         for (unsigned int side = 0; side != sides; ++side) {
-            unsigned int const a = ring * sides + side;
-            unsigned int const b = (ring + 1) % rings * sides + side;
-            unsigned int const c = (ring + 1) % rings * sides + (side + 1) % sides;
-            unsigned int const d = ring * sides + (side + 1) % sides;
-            mesh.faces.push_back({a, b, c});
-            mesh.faces.push_back({a, c, d});
+            mesh.faces.push_back({at(ring, side), at(ring + 1, side), at(ring + 1, side + 1)});
+            mesh.faces.push_back({at(ring, side), at(ring + 1, side + 1), at(ring, side + 1)});
         }
     return mesh;
 }
@@ -160,54 +137,45 @@ MeshBuilder MeshBuilder::bipyramid(unsigned int rim)
 
 MeshBuilder MeshBuilder::square(unsigned int segments)
 {
-    MeshBuilder mesh;
-    for (unsigned int y = 0; y <= segments; ++y)
-        for (unsigned int x = 0; x <= segments; ++x)
-            mesh.points.push_back({static_cast<float>(x), static_cast<float>(y), 0});
-    for (unsigned int y = 0; y != segments; ++y)
-        for (unsigned int x = 0; x != segments; ++x) {
-            unsigned int const a = y * (segments + 1) + x;
-            mesh.faces.push_back({a, a + 1, a + segments + 2});
-            mesh.faces.push_back({a, a + segments + 2, a + segments + 1});
-        }
+    PolygonMesh const quads = PolygonMesh::quads(segments);
+    MeshBuilder mesh = of(quads.points, {});
+    for (std::size_t c = 0; c != quads.faceVertex.size(); c += 4) {
+        unsigned int const* const corner = quads.faceVertex.data() + c;
+        mesh.faces.push_back({corner[0], corner[1], corner[2]});
+        mesh.faces.push_back({corner[0], corner[2], corner[3]});
+    }
     return mesh;
 }
 
 MeshBuilder MeshBuilder::withNeedles(std::size_t cuts, float fraction) &&
 {
-    struct HalfEdge {
-        unsigned int low, high;
-        std::size_t face;
-        unsigned int corner;
-    };
+    using HalfEdge = std::tuple<unsigned int, unsigned int, std::size_t, unsigned int>; // points, face, corner
     std::vector<HalfEdge> halfEdges;
     for (std::size_t face = 0; face != faces.size(); ++face)
         for (unsigned int k = 0; k != 3; ++k) {
             auto const [low, high] = std::minmax(faces[face][k], faces[face][(k + 1) % 3]);
-            halfEdges.push_back({low, high, face, k});
+            halfEdges.emplace_back(low, high, face, k);
         }
-    auto const key = [](HalfEdge const& h) { return std::tuple(h.low, h.high, h.face, h.corner); };
-    std::sort(halfEdges.begin(), halfEdges.end(), [&](auto const& a, auto const& b) { return key(a) < key(b); });
+    std::ranges::sort(halfEdges);
 
     std::vector<bool> isCut(faces.size());
     std::size_t const spacing = std::max<std::size_t>(1, halfEdges.size() / 2 / std::max<std::size_t>(1, cuts) / 2);
     for (std::size_t i = 0; cuts != 0 && i + 1 < halfEdges.size(); i += 2 * spacing) {
-        HalfEdge const f = halfEdges[i];
-        HalfEdge const g = halfEdges[i + 1];
-        bool const isEdge = f.low == g.low && f.high == g.high && f.face != g.face;
-        if (!isEdge || isCut[f.face] || isCut[g.face])
+        auto const [low, high, f, cornerF] = halfEdges[i];
+        auto const [otherLow, otherHigh, g, cornerG] = halfEdges[i + 1];
+        if (low != otherLow || high != otherHigh || f == g || isCut[f] || isCut[g])
             continue;
-        isCut[f.face] = isCut[g.face] = true;
+        isCut[f] = isCut[g] = true;
         --cuts;
-        Triangle const inF = faces[f.face], inG = faces[g.face];
-        unsigned int const a = inF[f.corner], b = inF[(f.corner + 1) % 3];
-        unsigned int const c = inF[(f.corner + 2) % 3], d = inG[(g.corner + 2) % 3];
+        Triangle const inF = faces[f], inG = faces[g];
+        unsigned int const a = inF[cornerF], b = inF[(cornerF + 1) % 3];
+        unsigned int const c = inF[(cornerF + 2) % 3], d = inG[(cornerG + 2) % 3];
         float3 const from = points[a], to = points[b];
         auto const middle = static_cast<unsigned int>(points.size());
         points.push_back({from.x + (to.x - from.x) * fraction, from.y + (to.y - from.y) * fraction,
             from.z + (to.z - from.z) * fraction});
-        faces[f.face] = {a, middle, c};
-        faces[g.face] = {middle, a, d};
+        faces[f] = {a, middle, c};
+        faces[g] = {middle, a, d};
         faces.push_back({middle, b, c});
         faces.push_back({b, middle, d});
     }
@@ -216,12 +184,7 @@ MeshBuilder MeshBuilder::withNeedles(std::size_t cuts, float fraction) &&
 
 MeshBuilder MeshBuilder::withNoise(float amount, unsigned int seed) &&
 {
-    Random random(seed);
-    for (float3& point : points) {
-        point.x += amount * random.coordinate();
-        point.y += amount * random.coordinate();
-        point.z += amount * random.coordinate();
-    }
+    addNoise(amount, seed, points);
     return std::move(*this);
 }
 
@@ -263,20 +226,15 @@ MeshBuilder MeshBuilder::joinedWith(MeshBuilder const& other, float3 offset) &&
     return std::move(*this);
 }
 
-Orvan::MutablePtr<Tessara::Object> MeshBuilder::build() const
+PolygonMesh MeshBuilder::polygons() const
 {
-    Orvan::Array<unsigned int> corners;
-    Orvan::Array<unsigned int> offsets;
-    corners.reserve(3 * faces.size());
-    offsets.reserve(faces.size() + 1);
-    offsets.append(0);
+    PolygonMesh mesh;
+    mesh.points = points;
     for (Triangle const& face : faces) {
-        for (unsigned int const corner : face)
-            corners.append(corner);
-        offsets.append(static_cast<unsigned int>(corners.size));
+        mesh.faceVertex.insert(mesh.faceVertex.end(), face.begin(), face.end());
+        mesh.faceOffset.push_back(static_cast<unsigned int>(mesh.faceVertex.size()));
     }
-    return Tessara::Geometry::makeMesh(
-        Orvan::Array<float3>(std::span<float3 const>(points)), std::move(corners), std::move(offsets));
+    return mesh;
 }
 
 }

@@ -1,14 +1,10 @@
 #pragma once
 
-#include <TessaraMathSupport/Types.h>
-#include <TessaraObject/Object.h>
+#include "PolygonMesh.h"
 
 #include <array>
-#include <vector>
 
 namespace TestSupport {
-
-using Tessara::Math::float3;
 
 /// Meshes in one line: `MeshBuilder::sphere(16).withNeedles(7).build()`. Positions come from exact arithmetic and
 /// square roots alone, so that every compiler makes the same mesh to the bit.
@@ -39,7 +35,8 @@ public:
     /// A second mesh beside this one, moved by `offset`.
     MeshBuilder joinedWith(MeshBuilder const& other, float3 offset) &&;
 
-    Orvan::MutablePtr<Tessara::Object> build() const;
+    PolygonMesh polygons() const;
+    Orvan::MutablePtr<Tessara::Object> build() const { return polygons().build(); }
 
     std::vector<float3> points;
     std::vector<Triangle> faces;

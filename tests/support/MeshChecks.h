@@ -1,10 +1,11 @@
 #pragma once
 
-#include <TessaraObject/Object.h>
+#include <TessaraGeometry/Makers.h>
 
 #include <gtest/gtest.h>
 
 #include <cstdint>
+#include <vector>
 
 namespace TestSupport {
 
@@ -15,6 +16,13 @@ struct Counts {
 
     friend bool operator==(Counts const&, Counts const&) = default;
 };
+
+/// The values of a data property; none where it is not there or of another type.
+template <class T> std::vector<T> valuesOf(Tessara::Object const& object, Orvan::String const& name)
+{
+    auto const values = Tessara::Geometry::dataOf<T>(object, name);
+    return values ? std::vector<T>(values->begin(), values->end()) : std::vector<T>();
+}
 
 Counts countsOf(Tessara::Object const& mesh);
 

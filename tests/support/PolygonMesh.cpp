@@ -9,6 +9,16 @@
 
 namespace TestSupport {
 
+void addNoise(float amount, unsigned int seed, std::vector<float3>& points)
+{
+    Random random(seed);
+    for (float3& p : points) {
+        p.x += amount * random.coordinate();
+        p.y += amount * random.coordinate();
+        p.z += amount * random.coordinate();
+    }
+}
+
 PolygonMesh PolygonMesh::quads(unsigned int segments)
 {
     PolygonMesh mesh;
@@ -55,12 +65,17 @@ PolygonMesh PolygonMesh::stars(std::size_t count, unsigned int minCorners, unsig
 
 PolygonMesh PolygonMesh::withNoise(float amount, unsigned int seed) &&
 {
-    Random random(seed);
-    for (float3& p : points) {
-        p.x += amount * random.coordinate();
-        p.y += amount * random.coordinate();
-        p.z += amount * random.coordinate();
-    }
+    addNoise(amount, seed, points);
+    return std::move(*this);
+}
+
+PolygonMesh PolygonMesh::joinedWith(PolygonMesh const& other) &&
+{
+    for (unsigned int const point : other.faceVertex)
+        faceVertex.push_back(static_cast<unsigned int>(points.size()) + point);
+    for (std::size_t face = 1; face != other.faceOffset.size(); ++face)
+        faceOffset.push_back(faceOffset.back() + other.faceOffset[face] - other.faceOffset[face - 1]);
+    points.insert(points.end(), other.points.begin(), other.points.end());
     return std::move(*this);
 }
 

@@ -10,6 +10,9 @@ namespace TestSupport {
 
 using Tessara::Math::float3;
 
+/// Moves every point by up to `amount` along each axis.
+void addNoise(float amount, unsigned int seed, std::vector<float3>& points);
+
 /// A mesh whose faces have any number of corners: `PolygonMesh::quads(100).build()`. As with `MeshBuilder`, every
 /// compiler makes the same mesh to the bit.
 struct PolygonMesh {
@@ -24,6 +27,8 @@ struct PolygonMesh {
     static PolygonMesh stars(std::size_t count, unsigned int minCorners, unsigned int maxCorners, unsigned int seed);
 
     PolygonMesh withNoise(float amount, unsigned int seed) &&;
+    /// A further mesh, with points of its own.
+    PolygonMesh joinedWith(PolygonMesh const& other) &&;
 
     std::size_t faceCount() const { return faceOffset.size() - 1; }
     /// A further face, with points of its own.

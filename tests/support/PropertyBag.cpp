@@ -120,6 +120,14 @@ void addAllTypes(Orvan::String const& component, Random& random, Object& object)
     });
 }
 
+Orvan::Array<Tessara::Math::float3> randomPositions(std::size_t count, Random& random)
+{
+    Orvan::Array<Tessara::Math::float3> positions(count);
+    for (auto& p : positions)
+        p = {random.coordinate(), random.coordinate(), random.coordinate()};
+    return positions;
+}
+
 Object held(Holders holders, Object const& object)
 {
     if (holders == Holders::Object)

@@ -2,6 +2,7 @@
 
 #include "Random.h"
 
+#include <TessaraMathSupport/Types.h>
 #include <TessaraObject/Object.h>
 
 namespace TestSupport {
@@ -15,6 +16,8 @@ void addRandomProperties(Orvan::String const& component, Random& random, Tessara
 
 /// One data property of each of the forty element types, as long as the component.
 void addAllTypes(Orvan::String const& component, Random& random, Tessara::Object& object);
+
+Orvan::Array<Tessara::Math::float3> randomPositions(std::size_t count, Random& random);
 
 /// References that somebody else holds to what an object holds.
 enum class Holders { None, Object, Properties, Arrays };

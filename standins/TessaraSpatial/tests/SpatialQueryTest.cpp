@@ -6,7 +6,6 @@
 #include <cmath>
 #include <limits>
 #include <random>
-#include <string>
 #include <vector>
 
 using namespace Tessara::SpatialQuery;
@@ -23,30 +22,20 @@ int turn(float2 const& a, float2 const& b, float2 const& c)
 }
 
 struct Answer {
-    bool inside;
     int place;
     float u, v, w;
+
+    bool isInside() const { return place >= kInsideTriangle && place <= kOnEdgeAB; }
 };
 
 Answer query(float2 const& p, float2 const& a, float2 const& b, float2 const& c)
 {
     Answer answer{};
-    answer.inside = pointInTriangle(p, a, b, c, answer.u, answer.v, answer.w, &answer.place);
-    EXPECT_EQ(answer.inside, answer.place >= kInsideTriangle && answer.place <= kOnEdgeAB);
+    bool const isInside = pointInTriangle(p, a, b, c, answer.u, answer.v, answer.w, &answer.place);
+    EXPECT_EQ(isInside, answer.isInside());
     float u = -1, v = -1, w = -1;
-    EXPECT_EQ(pointInTriangle(p, a, b, c, u, v, w, nullptr), answer.inside);
+    EXPECT_EQ(pointInTriangle(p, a, b, c, u, v, w, nullptr), isInside);
     return answer;
-}
-
-// Coordinates of very different sizes, where the areas round.
-float2 randomPoint(std::mt19937& random)
-{
-    auto const coordinate = [&] {
-        float const mantissa = static_cast<float>(random() % 65536) - 32768.0f;
-        return std::ldexp(mantissa, static_cast<int>(random() % 200) - 100);
-    };
-    float const x = coordinate();
-    return {x, coordinate()};
 }
 
 }
@@ -75,53 +64,47 @@ TEST(PointEdgeOrientation, tellsTheTurn)
         EXPECT_EQ(turn(a, b, c), expected) << name;
         EXPECT_EQ(turn(c, b, a), -expected) << name;
     }
-}
-
-TEST(PointEdgeOrientation, seesNoTurnBetweenEqualPoints)
-{
+    // Between equal points there is no turn, also where areas round.
     std::mt19937 random(1);
+    auto const coordinate = [&] {
+        auto const mantissa = static_cast<float>(random() % 65536);
+        return std::ldexp(mantissa - 32768, static_cast<int>(random() % 200) - 100);
+    };
     for (int i = 0; i < 20'000; ++i) {
-        float2 const a = randomPoint(random);
-        float2 const b = randomPoint(random);
-        ASSERT_EQ(turn(a, b, a), 0);
-        ASSERT_EQ(turn(a, a, b), 0);
-        ASSERT_EQ(turn(a, b, b), 0);
+        float2 const a{coordinate(), coordinate()}, b{coordinate(), coordinate()};
+        ASSERT_TRUE(turn(a, b, a) == 0 && turn(a, a, b) == 0 && turn(a, b, b) == 0);
     }
 }
 
 TEST(PointInTriangle, isClosedButForTheCorners)
 {
-    std::array<float2, 3> const corners{{{0, 0}, {4, 0}, {0, 4}}};
+    float2 const a{0, 0}, b{4, 0}, c{0, 4};
     struct Case {
         float2 p;
-        int place;
-        float u, v, w;
+        Answer answer;
     };
-    for (Case const& expected : std::vector<Case>{
-             {{1, 1}, kInsideTriangle, 0.5f, 0.25f, 0.25f},
-             {{2, 2}, kOnEdgeBC, 0, 0.5f, 0.5f},
-             {{0, 1}, kOnEdgeCA, 0.75f, 0, 0.25f},
-             {{3, 0}, kOnEdgeAB, 0.25f, 0.75f, 0},
-             {{0, -0.0f}, kAtCornerA, 1, 0, 0},
-             {{4, 0}, kAtCornerB, 0, 1, 0},
-             {{0, 4}, kAtCornerC, 0, 0, 1},
-             {{5, 0}, kOutsideTriangle, -0.25f, 1.25f, 0}, // on the line of an edge, behind its end
-             {{-1, 1}, kOutsideTriangle, 1, -0.25f, 0.25f},
-             {{3, 3}, kOutsideTriangle, -0.5f, 0.75f, 0.75f},
-             {{std::nextafter(0.0f, 1.0f), 0}, kOnEdgeAB, 1, 0, 0}, // beside a corner is not at it
-             {{2, std::nextafter(2.0f, 3.0f)}, kOutsideTriangle, 0, 0.5f, 0.5f},
+    for (auto const& [p, expected] : std::vector<Case>{
+             {{1, 1}, {kInsideTriangle, 0.5f, 0.25f, 0.25f}},
+             {{2, 2}, {kOnEdgeBC, 0, 0.5f, 0.5f}},
+             {{0, 1}, {kOnEdgeCA, 0.75f, 0, 0.25f}},
+             {{3, 0}, {kOnEdgeAB, 0.25f, 0.75f, 0}},
+             {{0, -0.0f}, {kAtCornerA, 1, 0, 0}},
+             {{4, 0}, {kAtCornerB, 0, 1, 0}},
+             {{0, 4}, {kAtCornerC, 0, 0, 1}},
+             {{5, 0}, {kOutsideTriangle, -0.25f, 1.25f, 0}}, // on the line of an edge, behind its end
+             {{-1, 1}, {kOutsideTriangle, 1, -0.25f, 0.25f}},
+             {{3, 3}, {kOutsideTriangle, -0.5f, 0.75f, 0.75f}},
+             {{std::nextafter(0.0f, 1.0f), 0}, {kOnEdgeAB, 1, 0, 0}}, // beside a corner is not at it
+             {{2, std::nextafter(2.0f, 3.0f)}, {kOutsideTriangle, 0, 0.5f, 0.5f}},
          }) {
-        std::string const name = "(" + std::to_string(expected.p.x) + ", " + std::to_string(expected.p.y) + ")";
-        Answer const answer = query(expected.p, corners[0], corners[1], corners[2]);
-        EXPECT_EQ(answer.place, expected.place) << name;
-        EXPECT_NEAR(answer.u, expected.u, 1e-6f) << name;
-        EXPECT_NEAR(answer.v, expected.v, 1e-6f) << name;
-        EXPECT_NEAR(answer.w, expected.w, 1e-6f) << name;
-
-        Answer const otherWinding = query(expected.p, corners[0], corners[2], corners[1]);
-        EXPECT_EQ(otherWinding.inside, answer.inside) << name;
-        EXPECT_EQ(otherWinding.v, answer.w) << name;
-        EXPECT_EQ(otherWinding.w, answer.v) << name;
+        SCOPED_TRACE(testing::PrintToString(p.x) + ", " + testing::PrintToString(p.y));
+        Answer const answer = query(p, a, b, c), otherWinding = query(p, a, c, b);
+        EXPECT_EQ(answer.place, expected.place);
+        EXPECT_NEAR(answer.u, expected.u, 1e-6f);
+        EXPECT_NEAR(answer.v, expected.v, 1e-6f);
+        EXPECT_NEAR(answer.w, expected.w, 1e-6f);
+        EXPECT_TRUE(
+            otherWinding.isInside() == answer.isInside() && otherWinding.v == answer.w && otherWinding.w == answer.v);
     }
 }
 
@@ -138,11 +121,11 @@ TEST(PointInTriangle, findsNothingWithoutAnArea)
     for (auto const& [a, b, c] : triangles)
         for (float2 const& p : {float2{1, 1}, float2{3, 3}, float2{0, 1}, float2{9, 9}, a, b, c}) {
             Answer const answer = query(p, a, b, c);
-            EXPECT_FALSE(answer.inside);
+            EXPECT_FALSE(answer.isInside());
             EXPECT_TRUE(answer.u == 0.0f && answer.v == 0.0f && answer.w == 0.0f);
         }
     for (float2 const& p : {float2{kNotANumber, 1}, float2{1, kInfinity}, float2{-kInfinity, kInfinity}})
-        EXPECT_FALSE(query(p, {0, 0}, {4, 0}, {0, 4}).inside);
+        EXPECT_FALSE(query(p, {0, 0}, {4, 0}, {0, 4}).isInside());
 }
 
 // Points about the shared edge of two triangles: whatever the rounding, each is in at least one of them.
@@ -157,7 +140,7 @@ TEST(PointInTriangle, leavesNoGapAtASharedEdge)
         float2 const right{5.0f + between(random), between(random)};
         float const t = 0.1f + 0.8f * between(random);
         float2 const p{a.x + t * (b.x - a.x), a.y + t * (b.y - a.y)};
-        ASSERT_TRUE(query(p, a, b, left).inside || query(p, a, b, right).inside);
-        ASSERT_EQ(query(p, a, b, left).inside, query(p, left, b, a).inside);
+        ASSERT_TRUE(query(p, a, b, left).isInside() || query(p, a, b, right).isInside());
+        ASSERT_EQ(query(p, a, b, left).isInside(), query(p, left, b, a).isInside());
     }
 }

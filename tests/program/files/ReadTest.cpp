@@ -1,22 +1,10 @@
 #include "FileSupport.h"
 
-#include "support/Compare.h"
-
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
-#include <map>
-
 namespace ModelingProgram {
 
 namespace {
 
-    using namespace Tessara::Geometry;
-    using namespace Tessara::Math;
-    using testing::ElementsAre;
-    using testing::HasSubstr;
-    using TestSupport::sameContents;
-
+    using testing::AllOf, testing::ElementsAre, testing::HasSubstr, testing::StartsWith;
     using Indices = std::vector<unsigned int>;
 
     TEST(ReadGeometryFile, takesWhatFormatsAllow)
@@ -92,65 +80,63 @@ namespace {
         struct Case {
             char const* extension;
             std::string content;
-            char const* refusal;
+            int line;
+            char const* words;
         };
         std::string const points = "v 0 0 0\nv 1 0 0\nv 0 1 0\n";
         std::string const ply = "ply\nformat ascii 1.0\nelement vertex 1\nproperty float x\nproperty float y\n";
         std::string const plyTail = "property float z\nend_header\n0 0 0\n";
-        std::string const tenZeros = "0 0 0 0 0 0 0 0 0 0\n";
+        std::string const plyMany =
+            "ply\nformat ascii 1.0\nelement vertex 4000000000\nproperty char x\nend_header\n0\n";
+        std::string const offPoints = "OFF\n3 1 0\n0 0 0\n1 0 0\n0 1 0\n",
+                          solid = "solid\nfacet\nouter\nvertex 0 0 0\n";
         std::vector<Case> const cases{
-            {".obj", "", " cannot be read: it is empty"},
-            {".obj", "hello\n", ", line 2: the file holds no points"},
-            {".obj", "v 0 nan 0", ", line 1: a coordinate is not finite"},
-            {".obj", "v 0 1e39 0", ", line 1: \"1e39\" stands for a coordinate, but is no number that fits"},
-            {".obj", "v 0 0\n", ", line 1: the line ends before a coordinate"},
-            {".obj", "v 0 0 1.2x\n", ", line 1: \"1.2x\" stands for a coordinate, but is no number that fits"},
-            {".obj", "v 0 0 +-1\n", ", line 1: \"+-1\" stands for a coordinate, but is no number that fits"},
-            {".obj", "v 0 0 0 1 1 1 1", ", line 1: \"1\" is more than belongs into this line"},
-            {".obj", points + "f 1 2 3 x", ", line 4: \"x\" stands for an index, but is no number that fits"},
-            {".obj", points + "f 1 2 3.5", ", line 4: \".5\" follows an index, but is none"},
-            {".obj", points + "f 0 1 2", ", line 4: the point 0 does not exist: the first one is 1"},
-            {".obj", points + "\nf 1 2 4", ", line 5: the point 4 does not exist: the file has 3"},
-            {".obj", "v 0 0 0\nf -1 -2 1\nv 0 0 0", ", line 2: the point -2 does not exist: 1 stand above"},
-            {".obj", points + "f 1 2", ", line 4: a face has fewer than three corners"},
-            {".obj", points + "f 1/1 2/1 3/1", ", line 4: the texture coordinate 1 does not exist: the file has 0"},
-            {".obj", points + "f 1 2 99999999999999999999",
-                ", line 4: \"99999999999999999999\" stands for an index, but is no number that fits"},
-            {".obj", points + "l\n", ", line 4: a polyline has no points"},
-            {".ply", "plx\n", ", line 1: the file does not begin with \"ply\""},
-            {".ply", ply, ", line 6: the file is cut off: its header has no \"end_header\""},
-            {".ply", "ply\nformat ascii 2.0\n", ", line 2: the format \"ascii\" is not known, or not of version 1.0"},
-            {".ply", ply + "property quux q\n" + plyTail, ", line 6: the type \"quux\" is not known"},
-            {".ply", ply + "property list float int q\n" + plyTail,
-                ", line 6: the length of a list is no whole number"},
-            {".ply", ply + "property char x\n" + plyTail, ", line 6: the property \"x\" is declared twice"},
-            {".ply", ply + "property uchar c\nproperty float z\nend_header\n0.0 0 0\n",
-                ", line 9: the line ends before z"},
-            {".ply", ply + "end_header\n0 0\n", ", line 7: points lack x, y or z"},
-            {".ply", ply + plyTail.substr(0, plyTail.size() - 2) + "zero\n",
-                ", line 8: \"zero\" stands for z, but is no number that fits"},
-            {".ply", ply + "property list char char q\n" + "property float z\nend_header\n0 0 -1 0\n",
-                ", line 9: the list \"q\" has a negative length"},
-            {".ply", "ply\nformat ascii 1.0\nelement vertex 4000000000\nproperty char x\nend_header\n0\n",
-                ", line 6: the file is cut off: it declares 4000000000 elements \"vertex\", but only 2 bytes follow"},
-            {".off", "off\n", ", line 1: the file does not begin with OFF, COFF, NOFF or the like, or is binary"},
-            {".off", "4OFF\n1 0 0\n" + tenZeros,
-                ", line 1: \"4OFF\" files are not known: points have three coordinates here"},
-            {".off", "OFF\n3 1 0\n0 0 0\n1 0 0\n0 1 0\n3 0 1 3\n",
-                ", line 6: a face names point 3, but the file has 3 points, counted from 0"},
-            {".off", "OFF\n1 0 0\n0 0 0 1 1\n", ", line 3: a colour has 2 values instead of 3 or 4"},
-            {".off", "OFF\n2 0 0\n0 0 0 #" + tenZeros, ", line 4: the file is cut off before point 2"},
-            {".xyz", "0 0 0\n1 2\n", ", line 2: there are 2 values; 3 make a point, 6 a point and its normal"},
-            {".xyz", "0 0 0\n1 2 3 0 0 1\n", ", line 2: some points have normals and some have none"},
-            {".stl", "solid\nfacet\nouter\nvertex 0 0 0\n", ", line 5: the file is cut off inside of a solid"},
-            {".stl", "solid\nfacet\nouter\nvertex 0 0 0\nendloop\n",
-                ", line 5: \"endloop\" stands where \"vertex\" belongs"},
-            {".stl", std::string(90, '\0'),
-                ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90"},
-            {".abc", "x", " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz"},
+            {".obj", "hello\n", 2, "the file holds no points"},
+            {".obj", "v 0 nan 0", 1, "a coordinate is not finite"},
+            {".obj", "v 0 1e39 0", 1, "\"1e39\" stands for a coordinate, but is no number that fits"},
+            {".obj", "v 0 0\n", 1, "the line ends before a coordinate"},
+            {".obj", "v 0 0 1.2x\n", 1, "\"1.2x\" stands for a coordinate, but is no number that fits"},
+            {".obj", "v 0 0 +-1\n", 1, "\"+-1\" stands for a coordinate, but is no number that fits"},
+            {".obj", "v 0 0 0 1 1 1 1", 1, "\"1\" is more than belongs into this line"},
+            {".obj", points + "f 1 2 3 x", 4, "\"x\" stands for an index, but is no number that fits"},
+            {".obj", points + "f 1 2 3.5", 4, "\".5\" follows an index, but is none"},
+            {".obj", points + "f 0 1 2", 4, "the point 0 does not exist: the first one is 1"},
+            {".obj", points + "\nf 1 2 4", 5, "the point 4 does not exist: the file has 3"},
+            {".obj", "v 0 0 0\nf -1 -2 1\nv 0 0 0", 2, "the point -2 does not exist: 1 stand above"},
+            {".obj", points + "f 1 2", 4, "a face has fewer than three corners"},
+            {".obj", points + "f 1/1 2/1 3/1", 4, "the texture coordinate 1 does not exist: the file has 0"},
+            {".obj", points + "f 1 2 99999999999999999999", 4, "stands for an index, but is no number that fits"},
+            {".obj", points + "l\n", 4, "a polyline has no points"},
+            {".ply", "plx\n", 1, "the file does not begin with \"ply\""},
+            {".ply", ply, 6, "the file is cut off: its header has no \"end_header\""},
+            {".ply", "ply\nformat ascii 2.0\n", 2, "the format \"ascii\" is not known, or not of version 1.0"},
+            {".ply", ply + "property quux q\n" + plyTail, 6, "the type \"quux\" is not known"},
+            {".ply", ply + "property list float int q\n" + plyTail, 6, "the length of a list is no whole number"},
+            {".ply", ply + "property char x\n" + plyTail, 6, "the property \"x\" is declared twice"},
+            {".ply", ply + "property uchar c\nproperty float z\nend_header\n0.0 0 0\n", 9, "the line ends before z"},
+            {".ply", ply + "end_header\n0 0\n", 7, "points lack x, y or z"},
+            {".ply", ply + "property float z\nend_header\n0 0 zero\n", 8, "\"zero\" stands for z"},
+            {".ply", ply + "property list char char q\nproperty float z\nend_header\n0 0 -1 0\n", 9,
+                "a negative length"},
+            {".ply", plyMany, 6, "it declares 4000000000 elements \"vertex\", but only 2 bytes follow"},
+            {".off", "off\n", 1, "the file does not begin with OFF, COFF, NOFF or the like, or is binary"},
+            {".off", "4OFF\n1 0 0\n0 0 0 0\n", 1, "\"4OFF\" files are not known: points have three coordinates here"},
+            {".off", offPoints + "3 0 1 3\n", 6, "a face names point 3, but the file has 3 points, counted from 0"},
+            {".off", "OFF\n1 0 0\n0 0 0 1 1\n", 3, "a colour has 2 values instead of 3 or 4"},
+            {".off", "OFF\n2 0 0\n0 0 0 # 0 0 0\n", 4, "the file is cut off before point 2"},
+            {".xyz", "0 0 0\n1 2\n", 2, "there are 2 values; 3 make a point, 6 a point and its normal"},
+            {".xyz", "0 0 0\n1 2 3 0 0 1\n", 2, "some points have normals and some have none"},
+            {".stl", solid, 5, "the file is cut off inside of a solid"},
+            {".stl", solid + "endloop\n", 5, "\"endloop\" stands where \"vertex\" belongs"},
         };
         for (Case const& test : cases)
-            EXPECT_EQ(refusalOf(test.extension, test.content), test.refusal) << test.content;
+            EXPECT_THAT(refusalOf(test.extension, test.content),
+                AllOf(StartsWith(", line " + std::to_string(test.line) + ": "), HasSubstr(test.words)))
+                << test.content;
+        EXPECT_EQ(refusalOf(".obj", ""), " cannot be read: it is empty");
+        EXPECT_EQ(refusalOf(".abc", "x"), " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz");
+        EXPECT_EQ(refusalOf(".stl", std::string(90, '\0')),
+            ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90");
 
         TemporaryFolder const folder;
         EXPECT_THROW(readGeometryFile(folder / "none.obj"), FileError);
@@ -158,29 +144,25 @@ namespace {
         EXPECT_THROW(readGeometryFile(folder / "folder.obj"), FileError);
     }
 
-    TEST(ReadObj, keepsPointsSharedAcrossSeams)
+    TEST(ReadObj, keepsPointsSharedAcrossSeamsAndTakesValuesAlongIntoStrands)
     {
         GeometryFile const file = readContent(".obj",
             "v 0 0 0 1 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0 0 0 1\nvt 0 0\nvt 1 0.5\nvt 0.25 1 0\nvn 0 0 1\n"
             "f 1/1/1 2/2/1 3/3/1\nf 1/3/1 3/2/1 4/1/1\n");
+        float2 const a{0, 0}, b{1, 0.5f}, c{0.25f, 1};
         EXPECT_EQ(getElementCount(*file.object, sPointComp), 4u);
-        EXPECT_THAT(valuesOf<float2>(*file.object, "uv"),
-            ElementsAre(
-                float2{0, 0}, float2{1, 0.5f}, float2{0.25f, 1}, float2{0.25f, 1}, float2{1, 0.5f}, float2{0, 0}));
+        EXPECT_THAT(valuesOf<float2>(*file.object, "uv"), ElementsAre(a, b, c, c, b, a));
         EXPECT_EQ(valuesOf<float3>(*file.object, "normal"), std::vector<float3>(6, {0, 0, 1}));
         EXPECT_THAT(valuesOf<float3>(*file.object, "color"),
             ElementsAre(float3{1, 0, 0}, float3{1, 1, 1}, float3{1, 1, 1}, float3{0, 0, 1}));
         EXPECT_THAT(file.notes, ElementsAre(HasSubstr("2 points have no colour")));
-    }
 
-    TEST(ReadObj, takesPointValuesAlongIntoStrands)
-    {
-        GeometryFile const file =
+        GeometryFile const strands =
             readContent(".obj", "v 0 0 0 1 0 0\nv 1 0 0 0 1 0\nv 2 0 0 0 0 1\nvn 1 0 0\nvn 0 1 0\nvn 0 0 1\nl 3 1\n");
-        EXPECT_THAT(valuesOf<float3>(*file.object, sPointPosition), ElementsAre(float3{2, 0, 0}, float3{0, 0, 0}));
-        EXPECT_THAT(valuesOf<float3>(*file.object, "color"), ElementsAre(float3{0, 0, 1}, float3{1, 0, 0}));
-        EXPECT_THAT(valuesOf<float3>(*file.object, "normal"), ElementsAre(float3{0, 0, 1}, float3{1, 0, 0}));
-        EXPECT_TRUE(StrandValidator().validate(*file.object));
+        EXPECT_THAT(valuesOf<float3>(*strands.object, sPointPosition), ElementsAre(float3{2, 0, 0}, float3{0, 0, 0}));
+        for (char const* const name : {"color", "normal"})
+            EXPECT_THAT(valuesOf<float3>(*strands.object, name), ElementsAre(float3{0, 0, 1}, float3{1, 0, 0})) << name;
+        EXPECT_TRUE(isValid(*strands.object));
     }
 
     std::string const kPlyProperties = "element vertex 3\n"
@@ -241,15 +223,13 @@ namespace {
 
         for (std::endian const order : {std::endian::little, std::endian::big})
             EXPECT_TRUE(sameContents(*readContent(".ply", plyOf(order)).object, mesh));
-    }
-
-    TEST(ReadPly, leavesOutListsOfSeveralLengths)
-    {
-        GeometryFile const file = readContent(".ply",
-            "ply\nformat ascii 1.0\nelement vertex 2\nproperty float x\nproperty float y\nproperty float z\n"
-            "property list uchar int neighbours\nproperty list uchar ushort three\nend_header\n"
-            "0 0 0 1 1 3 1 2 3\n1 0 0 2 0 0 3 1 2 3\n");
-        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("\"neighbours\""), HasSubstr("\"three\"")));
+        EXPECT_THAT(
+            readContent(".ply",
+                "ply\nformat ascii 1.0\nelement vertex 2\nproperty float x\nproperty float y\nproperty float z\n"
+                "property list uchar int neighbours\nproperty list uchar ushort three\nend_header\n"
+                "0 0 0 1 1 3 1 2 3\n1 0 0 2 0 0 3 1 2 3\n")
+                .notes,
+            ElementsAre(HasSubstr("\"neighbours\""), HasSubstr("\"three\"")));
     }
 
     TEST(ReadOff, tellsBytesFromFractions)
