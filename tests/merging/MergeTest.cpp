@@ -255,13 +255,14 @@ TEST(Merge, joinsConnectivity)
 TEST(Merge, refusesWhatItCannotMergeAndTouchesNothing)
 {
     // That many elements do not fit here, so only their counts are asked.
-    auto const huge = [] {
-        auto object = cloudOf(0);
-        addComponent(sPointComp, 3'000'000'000u, *object);
-        return object;
+    auto const huge = cloudOf(0);
+    addComponent(sPointComp, 3'000'000'000u, *huge);
+    auto const fits = [](std::vector<Object const*> objects) {
+        using namespace Modeling::Internal;
+        return computeElementOffsets(planMerge({std::move(objects), nullptr}, {sPointComp}), 0).has_value();
     };
-    EXPECT_TRUE(Modeling::Internal::computeElementOffsets(inputsOf(huge()), sPointComp));
-    EXPECT_FALSE(Modeling::Internal::computeElementOffsets(inputsOf(huge(), huge()), sPointComp));
+    EXPECT_TRUE(fits({huge.get()}));
+    EXPECT_FALSE(fits({huge.get(), huge.get()}));
 
     for (Kind const kind : {Kind::Meshes, Kind::PointClouds, Kind::Strands})
         for (Inputs const& inputs : {Inputs{}, Inputs{nullptr}}) {
