@@ -43,6 +43,7 @@ namespace {
         }
 
         std::vector<Orvan::String> components;
+        Orvan::String nobody; // owns what has no owner
         Orvan::String data = sData;
         Orvan::String target = sTarget;
         Orvan::Ptr<Object> dataPrototype = getDataGeoPropPrototype(sGenericDataGeoProp);
@@ -50,7 +51,7 @@ namespace {
         Orvan::Ptr<Object> componentPrototype = getComponentGeoPropPrototype();
     };
 
-    /// Looks inputs up, one after the other: what is like in the input before costs least.
+    /// Looks inputs up, one after the other: what is as in the input before costs least.
     class InputReader {
     public:
         explicit InputReader(Vocabulary const& words)
@@ -65,48 +66,64 @@ namespace {
             for (std::size_t component = 0; component != words_.components.size(); ++component)
                 result.counts[component] = getElementCount(input, words_.components[component]);
             Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = input.keys();
+            isNewLayout_ = !layout_ || roles_.size() != keys->size;
             roles_.resize(keys->size);
             likelyTypes_.resize(keys->size, HeldArray::kNoType);
             result.arrays.resize(keys->size);
             for (std::size_t place = 0; place != keys->size; ++place) {
-                roles_[place].name = keys->data[place];
+                update(roles_[place].name, keys->data[place]);
                 result.arrays[place] = readProperty(input, likelyTypes_[place], roles_[place]);
                 likelyTypes_[place] = result.arrays[place].type;
             }
-            if (!layout_ || layout_->roles() != roles_)
+            if (isNewLayout_)
                 layout_ = Orvan::makePtr<PropertyLayout>(roles_);
             result.layout = layout_;
             return result;
         }
 
     private:
-        HeldArray readProperty(Object const& input, unsigned char likelyType, PropertyRole& role) const
+        HeldArray readProperty(Object const& input, unsigned char likelyType, PropertyRole& role)
         {
             PropertyValue const value = input.getProperty(role.name);
-            auto const* const property = value.get<Orvan::Ptr<Object>>();
-            using Kind = PropertyRole::Kind;
-            role.kind = Kind::Other;
-            role.owner = Orvan::String();
-            if (!property || !*property)
+            auto const* const object = value.get<Orvan::Ptr<Object>>();
+            if (!object || !*object) {
+                updateRole(PropertyRole::Kind::Other, words_.nobody, role);
                 return {};
-            if (Object::isA(**property, *words_.dataPrototype)) {
-                role.kind = Kind::Data;
-                PropertyValue const target = (*property)->getProperty(words_.target);
-                if (auto const* const name = target.get<Orvan::String>())
-                    role.owner = *name;
-            } else if (Object::isA(**property, *words_.rangePrototype)) {
-                role.kind = Kind::Range;
-                role.owner = getTargetComponent(input, role.name);
-            } else if (Object::isA(**property, *words_.componentPrototype)) {
-                role.kind = Kind::Component;
             }
-            return HeldArray::in((*property)->getProperty(words_.data), likelyType);
+            Object const& property = **object;
+            if (Object::isA(property, *words_.dataPrototype)) {
+                PropertyValue const target = property.getProperty(words_.target);
+                auto const* const name = target.get<Orvan::String>();
+                updateRole(PropertyRole::Kind::Data, name ? *name : words_.nobody, role);
+            } else if (Object::isA(property, *words_.rangePrototype)) {
+                updateRole(PropertyRole::Kind::Range, getTargetComponent(input, role.name), role);
+            } else {
+                bool const isComponent = Object::isA(property, *words_.componentPrototype);
+                updateRole(
+                    isComponent ? PropertyRole::Kind::Component : PropertyRole::Kind::Other, words_.nobody, role);
+            }
+            return HeldArray::in(property.getProperty(words_.data), likelyType);
+        }
+
+        void updateRole(PropertyRole::Kind kind, Orvan::String const& owner, PropertyRole& role)
+        {
+            update(role.kind, kind);
+            update(role.owner, owner);
+        }
+
+        template <class Value> void update(Value& known, Value const& seen)
+        {
+            if (known == seen)
+                return;
+            known = seen;
+            isNewLayout_ = true;
         }
 
         Vocabulary const& words_;
         Orvan::Ptr<PropertyLayout> layout_; // of the input before
-        std::vector<PropertyRole> roles_; // filled anew for each input
+        std::vector<PropertyRole> roles_; // those of the layout, and brought up to date while an input is read
         std::vector<unsigned char> likelyTypes_; // of the arrays of the input before
+        bool isNewLayout_ = true;
     };
 
 }

@@ -49,9 +49,7 @@ struct PropertyRole {
 
     Orvan::String name;
     Orvan::String owner; // of data its target; of a range the component that it belongs to in the end
-    Kind kind;
-
-    friend bool operator==(PropertyRole const&, PropertyRole const&) = default;
+    Kind kind = Kind::Other;
 };
 
 inline bool isData(PropertyRole const& role)

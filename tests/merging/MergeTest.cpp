@@ -372,6 +372,42 @@ TEST(Merge, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
         thread.join();
 }
 
+TEST(Merge, joinsManySmallInputsThatAreAlikeOrNot)
+{
+    for (Kind const kind : {Kind::Meshes, Kind::PointClouds, Kind::Strands}) {
+        SCOPED_TRACE(static_cast<int>(kind));
+        Random random(7);
+        Inputs inputs;
+        while (inputs.size != 400) { // runs of equal properties, and of properties that change
+            auto const input = deepCopy(*randomInput(kind, 1 + random.below(5), random));
+            for (unsigned int alike = random.below(9); alike != 0 && inputs.size != 400; --alike) {
+                auto copy = deepCopy(*input);
+                // Data in some, another type of data in others; not even a geo property, but with values.
+                if (random.below(3) == 0)
+                    addDataProperty<int>("weight", sPointComp, {1, 2}, *copy, 5);
+                else if (random.below(3) == 0)
+                    addDataProperty<float>("weight", sPointComp, {1.5f}, *copy, 0.5f);
+                else if (random.below(3) == 0)
+                    copy->setProperty("weight", [] {
+                        auto loose = Tessara::createObject();
+                        loose->setProperty(sData, Orvan::makePtr<Orvan::Array<int>>(Orvan::Array<int>{7, 8, 9}));
+                        return Orvan::Ptr<Object>(std::move(loose));
+                    }());
+                inputs.append(std::move(copy));
+            }
+        }
+        auto const expected = Tessara::createObject();
+        ASSERT_TRUE(mergePlainly(kind, inputs, *expected));
+        auto const merged = [&] {
+            auto output = Tessara::createObject();
+            EXPECT_TRUE(merge(kind, inputs, *output));
+            return output;
+        };
+        EXPECT_TRUE(sameContents(*merged(), *expected));
+        expectSameForThreads({1, 2, 8}, merged);
+    }
+}
+
 TEST(Merge, leavesInputsAndOutputAsTheyWereWhenMemoryRunsOut)
 {
     for (unsigned int seed : {0u, 1u, 2u, 30u}) {
