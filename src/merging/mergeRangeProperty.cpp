@@ -1,7 +1,6 @@
 #include "mergeRangeProperty.h"
 
 #include "frame/Arrays.h"
-#include "frame/ElementTypes.h"
 #include "mergeDataProperty.h"
 
 #include <TessaraGeometry/Lookup.h>
