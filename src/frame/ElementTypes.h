@@ -7,6 +7,8 @@
 #include <TessaraMathSupport/Types.h>
 #include <TessaraObject/PropertyValue.h>
 
+#include <type_traits>
+
 namespace Modeling {
 
 template <class... T> struct ElementTypeList {
@@ -35,6 +37,20 @@ namespace Internal {
 using AllElementTypes = Internal::Appended<CoreElementTypes, Tessara::Geometry::Common::GeometryType,
     Tessara::Geometry::Common::GeoLocation, Tessara::Geometry::Mesh::FaceEdge,
     Tessara::Geometry::Transform::GraphTransforms>::Type;
+
+namespace Internal {
+
+    template <class Element, class... T> constexpr unsigned char placeIn(ElementTypeList<T...>)
+    {
+        unsigned char place = 0;
+        static_cast<void>(((std::is_same_v<Element, T> || (++place, false)) || ...));
+        return place;
+    }
+
+}
+
+/// Where an element type stands among all of them: for records that are not written over `T`.
+template <class T> constexpr unsigned char kPlaceOfElementType = Internal::placeIn<T>(AllElementTypes{});
 
 // The two forms in which an element type occurs; they are different types to a property value.
 

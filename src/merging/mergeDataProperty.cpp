@@ -14,18 +14,27 @@ using Tessara::PropertyValue;
 
 namespace {
 
-    /// What input i contributes to a merged array: `count` values, of which it has the first `available`.
+    /// The values that an input contributes to a merged array; the rest is filled up with the default.
     template <class T> struct Contribution {
-        Orvan::Ptr<Orvan::Array<T>> values;
-        std::uint64_t count;
-
-        std::uint64_t available() const { return values ? std::min(values->size, count) : 0; }
+        T const* values;
+        std::uint64_t available;
     };
 
-    template <class T> Contribution<T> contributionOf(
-        std::size_t input, MergeInputs const& inputs, Offsets const& offsets, Orvan::String const& name)
+    template <class T>
+    Contribution<T> contributionOf(MergeInput const& input, std::uint64_t count, PropertyFinder& find)
     {
-        return {readGeoPropData<T>(*inputs[input], name), offsets[input + 1] - offsets[input]};
+        HeldArray const array = find.arrayIn(input);
+        bool const fits = array.type == kPlaceOfElementType<T>;
+        return {static_cast<T const*>(array.data), fits ? std::min(array.size, count) : 0};
+    }
+
+    /// Small arrays lie here and there, and each begins with a wait for memory: this one is over when it is needed.
+    void prefetchStart(MergeInput const& input, PropertyFinder& find)
+    {
+        constexpr std::size_t kCacheLine = 64;
+        auto const* const bytes = static_cast<char const*>(find.arrayIn(input).data);
+        for (std::size_t line = 0; bytes && line != 4; ++line)
+            __builtin_prefetch(bytes + line * kCacheLine); // has no effect behind the end
     }
 
     /// One place more is reserved behind the array: a closing entry or a default is appended without another copy.
@@ -38,18 +47,20 @@ namespace {
     }
 
     template <class T> Orvan::Array<T> concatenate(
-        MergeInputs const& inputs, Offsets const& offsets, Orvan::String const& name, T const& defaultValue)
+        MergePlan const& plan, Offsets const& offsets, Orvan::String const& name, T const& defaultValue)
     {
         Orvan::Array<T> merged = arrayForMerging<T>(offsets);
         // Each input writes the elements from its own offset on.
-        parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size, kFaceGrain), [&](auto const& range) {
+        parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kFaceGrain), [&](auto const& range) {
+            PropertyFinder find(name);
             for (std::size_t input = range.begin(); input != range.end(); ++input) {
-                auto const contribution = contributionOf<T>(input, inputs, offsets, name);
-                std::uint64_t const available = contribution.available();
+                std::uint64_t const count = offsets[input + 1] - offsets[input];
+                if (input + 1 != range.end())
+                    prefetchStart(plan.inputs[input + 1], find);
+                auto const [values, available] = contributionOf<T>(plan.inputs[input], count, find);
                 T* const target = merged.data + offsets[input];
-                if (available != 0)
-                    copyElements(contribution.values->data, available, target);
-                fillElements(target + available, contribution.count - available, defaultValue);
+                copyElements(values, available, target);
+                fillElements(target + available, count - available, defaultValue);
             }
         });
         return merged;
@@ -57,19 +68,21 @@ namespace {
 
     /// As `concatenate`, and raised: in one pass over the memory.
     Orvan::Array<unsigned int> concatenateRaised(
-        MergeInputs const& inputs, Offsets const& offsets, Connectivity const& connectivity, unsigned int defaultValue)
+        MergePlan const& plan, Offsets const& offsets, Connectivity const& connectivity, unsigned int defaultValue)
     {
         Orvan::Array<unsigned int> merged = arrayForMerging<unsigned int>(offsets);
         // Each input writes the elements from its own offset on.
-        parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size, kFaceGrain), [&](auto const& range) {
+        parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kFaceGrain), [&](auto const& range) {
+            PropertyFinder find(connectivity.name);
             for (std::size_t input = range.begin(); input != range.end(); ++input) {
-                auto const contribution = contributionOf<unsigned int>(input, inputs, offsets, connectivity.name);
-                std::uint64_t const available = contribution.available();
+                std::uint64_t const count = offsets[input + 1] - offsets[input];
+                if (input + 1 != range.end())
+                    prefetchStart(plan.inputs[input + 1], find);
+                auto const [values, available] = contributionOf<unsigned int>(plan.inputs[input], count, find);
                 unsigned int* const target = merged.data + offsets[input];
                 unsigned int const base = connectivity.baseOffsets[input];
-                if (available != 0)
-                    copyRaised(contribution.values->data, available, base, target);
-                fillElements(target + available, contribution.count - available, defaultValue + base);
+                copyRaised(values, available, base, target);
+                fillElements(target + available, count - available, defaultValue + base);
             }
         });
         if (connectivity.closingEntry)
@@ -94,7 +107,7 @@ void copyRaised(unsigned int const* source, std::size_t count, unsigned int base
 }
 
 void mergeDataProperty(
-    MergeInputs const& inputs, Offsets const& offsets, Connectivity* connectivity, DataPropertyMergeEntry& entry)
+    MergePlan const& plan, Offsets const& offsets, Connectivity* connectivity, DataPropertyMergeEntry& entry)
 {
     PropertyValue const defaultValue = defaultOf(entry);
     bool ignored = false;
@@ -102,12 +115,12 @@ void mergeDataProperty(
         if constexpr (std::is_same_v<T, unsigned int>) {
             if (connectivity) {
                 connectivity->merged =
-                    Orvan::makePtr<Orvan::Array<T>>(concatenateRaised(inputs, offsets, *connectivity, value));
+                    Orvan::makePtr<Orvan::Array<T>>(concatenateRaised(plan, offsets, *connectivity, value));
                 entry.mergedData = connectivity->merged;
                 return true;
             }
         }
-        entry.mergedData = Orvan::makePtr<Orvan::Array<T>>(concatenate<T>(inputs, offsets, entry.name, value));
+        entry.mergedData = Orvan::makePtr<Orvan::Array<T>>(concatenate<T>(plan, offsets, entry.name, value));
         return true;
     });
 }

@@ -23,7 +23,7 @@ void copyRaised(unsigned int const* source, std::size_t count, unsigned int base
 /// \param offsets       where each input's values begin, and as last entry how many there are
 /// \param connectivity  where the property is to be raised; or null
 void mergeDataProperty(
-    MergeInputs const& inputs, Offsets const& offsets, Connectivity* connectivity, DataPropertyMergeEntry& entry);
+    MergePlan const& plan, Offsets const& offsets, Connectivity* connectivity, DataPropertyMergeEntry& entry);
 
 /// Appends the default to the merged array, if that is of a core type: data of the four geometry types gets none, and
 /// indices of its range that point at the default point behind its end. (Wanted.)

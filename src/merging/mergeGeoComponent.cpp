@@ -18,10 +18,11 @@ namespace {
     {
         std::vector<DataPropertyMergeEntry> entries;
         NameSet admitted;
-        for (InputProperties const& input : plan.properties)
-            for (GeoProperty const& data : input.data)
-                if (data.owner == component && admitted.insert(data.name.view()).second)
-                    entries.push_back({data.name, data.property, {}});
+        forEachLayout(plan, [&](MergeInput const& input) {
+            for (PropertyRole const& role : input.layout->roles())
+                if (isData(role) && role.owner == component && admitted.insert(role.name.view()).second)
+                    entries.push_back(dataEntry(input, role.name));
+        });
         return entries;
     }
 
@@ -29,28 +30,29 @@ namespace {
     {
         std::vector<RangePropertyMergeEntry> entries;
         NameSet admitted;
-        for (InputProperties const& input : plan.properties) {
-            for (GeoProperty const& range : input.ranges) {
-                if (range.owner != component || admitted.contains(range.name.view()))
+        forEachLayout(plan, [&](MergeInput const& input) {
+            for (PropertyRole const& role : input.layout->roles()) {
+                if (role.kind != PropertyRole::Kind::Range || role.owner != component
+                    || admitted.contains(role.name.view()))
                     continue;
-                std::vector<DataPropertyMergeEntry> dependents = collectDependentDataProperties(input, range.name);
+                std::vector<DataPropertyMergeEntry> dependents = collectDependentDataProperties(input, role.name);
                 if (dependents.empty())
                     continue; // a later input may still qualify
-                admitted.insert(range.name.view());
-                entries.push_back({range.name, nullptr, std::move(dependents)});
+                admitted.insert(role.name.view());
+                entries.push_back({role.name, nullptr, std::move(dependents)});
             }
-        }
+        });
         return entries;
     }
 
-    void mergeData(MergeInputs const& inputs, Offsets const& elementOffsets, Connectivity* connectivity,
+    void mergeData(MergePlan const& plan, Offsets const& elementOffsets, Connectivity* connectivity,
         std::vector<DataPropertyMergeEntry>& entries)
     {
         // Each property is one iteration's own.
         parallelFor(tbb::blocked_range<std::size_t>(0, entries.size(), kFaceGrain), [&](auto const& properties) {
             for (std::size_t i = properties.begin(); i != properties.end(); ++i) {
                 bool const isConnectivity = connectivity && entries[i].name == connectivity->name;
-                mergeDataProperty(inputs, elementOffsets, isConnectivity ? connectivity : nullptr, entries[i]);
+                mergeDataProperty(plan, elementOffsets, isConnectivity ? connectivity : nullptr, entries[i]);
             }
         });
     }
@@ -73,7 +75,7 @@ void mergeGeoComponent(MergePlan const& plan, Orvan::String const& component, Of
     Tessara::Geometry::setElementCount(component, elementOffsets[elementOffsets.size - 1], target);
 
     std::vector<DataPropertyMergeEntry> data = collectDataProperties(plan, component);
-    mergeData(plan.inputs, elementOffsets, connectivity, data);
+    mergeData(plan, elementOffsets, connectivity, data);
     for (DataPropertyMergeEntry const& entry : data)
         addMergedDataProperty(entry, target);
 

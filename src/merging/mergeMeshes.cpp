@@ -23,10 +23,10 @@ namespace {
     struct MeshOffsets {
         std::optional<Offsets> points, corners, faces;
 
-        explicit MeshOffsets(MergeInputs const& inputs)
-            : points(computeElementOffsets(inputs, sPointComp))
-            , corners(computeElementOffsets(inputs, sFaceVertexComp))
-            , faces(computeElementOffsets(inputs, sFaceComp))
+        explicit MeshOffsets(MergePlan const& plan)
+            : points(computeElementOffsets(plan, 0))
+            , corners(computeElementOffsets(plan, 1))
+            , faces(computeElementOffsets(plan, 2))
         {
         }
 
@@ -70,13 +70,13 @@ namespace {
 
 bool mergeMeshes(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
 {
-    MergePlan const plan =
-        planMerge(holdInputs(inputs, output), [](Object const& input) { return bool(validateMesh(input)); });
-    MeshOffsets const offsets(plan.inputs);
+    MergePlan const plan = planMerge(holdInputs(inputs, output), {sPointComp, sFaceVertexComp, sFaceComp},
+        [](Object const& input) { return bool(validateMesh(input)); });
+    MeshOffsets const offsets(plan);
     if (plan.inputs.empty() || !offsets.fit())
         return false;
 
-    unsigned int const cornerCount = (*offsets.corners)[plan.inputs.size];
+    unsigned int const cornerCount = (*offsets.corners)[plan.inputs.size()];
     MergedMesh merged{
         {sFaceVertex, *offsets.points, std::nullopt, nullptr}, {sFaceOffset, *offsets.corners, cornerCount, nullptr}};
     Orvan::MutablePtr<Object> const staged = stagedCopy(output);

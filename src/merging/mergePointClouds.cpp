@@ -13,8 +13,8 @@ using namespace Tessara::Geometry;
 
 bool mergePointClouds(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
 {
-    MergePlan const plan = planMerge(filterValid<PointCloudValidator>(holdInputs(inputs, output)));
-    std::optional<Offsets> const pointOffsets = computeElementOffsets(plan.inputs, sPointComp);
+    MergePlan const plan = planMerge(filterValid<PointCloudValidator>(holdInputs(inputs, output)), {sPointComp});
+    std::optional<Offsets> const pointOffsets = computeElementOffsets(plan, 0);
     if (plan.inputs.empty() || !pointOffsets)
         return false;
 

@@ -1,7 +1,6 @@
 #include "mergeRangeProperty.h"
 
 #include "frame/Arrays.h"
-#include "frame/ElementTypes.h"
 #include "mergeDataProperty.h"
 
 #include <TessaraGeometry/Lookup.h>
@@ -16,63 +15,58 @@ namespace Modeling::Internal {
 
 using namespace Tessara::Geometry;
 using Tessara::Object;
-using Tessara::PropertyValue;
 
 namespace {
 
     using IndexArray = Orvan::Array<unsigned int>;
 
     /// Its indices, where the input has the range and anything that targets it; otherwise null.
-    Orvan::Ptr<IndexArray> sourceIndices(MergePlan const& plan, std::size_t input, Orvan::String const& rangeName)
+    Orvan::Ptr<IndexArray> sourceIndices(MergeInput const& input, Orvan::String const& rangeName)
     {
-        Orvan::Ptr<IndexArray> indices = getRangeGeoPropIndices(*plan.inputs[input], rangeName);
-        bool const hasDependents = std::any_of(plan.properties[input].data.begin(), plan.properties[input].data.end(),
-            [&](GeoProperty const& data) { return data.owner == rangeName; });
+        Orvan::Ptr<IndexArray> indices = getRangeGeoPropIndices(*input.object, rangeName);
+        std::vector<PropertyRole> const& roles = input.layout->roles();
+        bool const hasDependents = std::any_of(roles.begin(), roles.end(),
+            [&](PropertyRole const& role) { return isData(role) && role.owner == rangeName; });
         return hasDependents ? indices : nullptr;
     }
 
     std::vector<Orvan::Ptr<IndexArray>> collectSourceIndices(MergePlan const& plan, Orvan::String const& rangeName)
     {
-        std::vector<Orvan::Ptr<IndexArray>> sources(plan.inputs.size);
+        std::vector<Orvan::Ptr<IndexArray>> sources(plan.inputs.size());
         // Each input has its own entry.
         parallelFor(tbb::blocked_range<std::size_t>(0, sources.size(), kFaceGrain), [&](auto const& inputs) {
             for (std::size_t input = inputs.begin(); input != inputs.end(); ++input)
-                sources[input] = sourceIndices(plan, input, rangeName);
+                sources[input] = sourceIndices(plan.inputs[input], rangeName);
         });
         return sources;
     }
 
     /// The length of the data in one input: that of the shortest array. Lengths count by their low 32 bits.
-    unsigned int smallestDependentSize(Object const& input, std::vector<DataPropertyMergeEntry> const& dependents)
+    unsigned int smallestDependentSize(MergeInput const& input, std::vector<PropertyFinder>& dependents)
     {
         unsigned int smallest = kInvalidIndex;
-        for (DataPropertyMergeEntry const& dependent : dependents) {
-            Orvan::Ptr<Object> const property = getDataGeoProperty(input, dependent.name);
-            if (!property)
-                continue;
-            PropertyValue const data = property->getProperty(sData);
-            bool ignored = false;
-            forEachElementType<AllElementTypes, ArrayForm>(
-                &data, &ignored, [&]<class T>(Orvan::Ptr<Orvan::Array<T>>& values) {
-                    if (values)
-                        smallest = std::min(smallest, static_cast<unsigned int>(values->size));
-                    return true;
-                });
+        for (PropertyFinder& find : dependents) {
+            std::optional<std::size_t> const place = find.placeIn(input);
+            if (place && isData(input.layout->roles()[*place]) && input.arrays[*place])
+                smallest = std::min(smallest, static_cast<unsigned int>(input.arrays[*place].size));
         }
         return smallest == kInvalidIndex ? 0 : smallest;
     }
 
-    Offsets computeDependentOffsets(MergeInputs const& inputs, std::vector<DataPropertyMergeEntry> const& dependents)
+    Offsets computeDependentOffsets(MergePlan const& plan, std::vector<DataPropertyMergeEntry> const& dependents)
     {
-        Offsets offsets(inputs.size + 1, Orvan::kUninitialized);
+        std::vector<PropertyFinder> finders;
+        for (DataPropertyMergeEntry const& dependent : dependents)
+            finders.emplace_back(dependent.name);
+        Offsets offsets(plan.inputs.size() + 1, Orvan::kUninitialized);
         std::uint64_t total = 0;
-        for (std::uint64_t input = 0; input != inputs.size; ++input) {
+        for (std::size_t input = 0; input != plan.inputs.size(); ++input) {
             offsets[input] = static_cast<unsigned int>(total);
-            total += smallestDependentSize(*inputs[input], dependents);
+            total += smallestDependentSize(plan.inputs[input], finders);
             if (total >= std::numeric_limits<unsigned int>::max()) // the default behind it has an index too
                 throw std::bad_alloc();
         }
-        offsets[inputs.size] = static_cast<unsigned int>(total);
+        offsets[plan.inputs.size()] = static_cast<unsigned int>(total);
         return offsets;
     }
 
@@ -126,14 +120,14 @@ namespace {
 void mergeRangeProperty(MergePlan const& plan, Offsets const& elementOffsets, RangePropertyMergeEntry& entry)
 {
     std::vector<Orvan::Ptr<IndexArray>> const sources = collectSourceIndices(plan, entry.name);
-    Offsets const dependentOffsets = computeDependentOffsets(plan.inputs, entry.dependents);
+    Offsets const dependentOffsets = computeDependentOffsets(plan, entry.dependents);
     entry.mergedIndices = Orvan::makePtr<IndexArray>(mergeIndices(sources, elementOffsets, dependentOffsets));
 
     bool const needsDefaultSlot = std::find(sources.begin(), sources.end(), nullptr) != sources.end();
     // Each dependent is one iteration's own.
     parallelFor(tbb::blocked_range<std::size_t>(0, entry.dependents.size(), kFaceGrain), [&](auto const& dependents) {
         for (std::size_t dependent = dependents.begin(); dependent != dependents.end(); ++dependent) {
-            mergeDataProperty(plan.inputs, dependentOffsets, nullptr, entry.dependents[dependent]);
+            mergeDataProperty(plan, dependentOffsets, nullptr, entry.dependents[dependent]);
             if (needsDefaultSlot)
                 appendDefaultValue(entry.dependents[dependent]);
         }

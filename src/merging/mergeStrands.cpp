@@ -16,13 +16,14 @@ using namespace Tessara::Geometry;
 
 bool mergeStrands(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
 {
-    MergePlan const plan = planMerge(filterValid<StrandValidator>(holdInputs(inputs, output)));
-    std::optional<Offsets> const pointOffsets = computeElementOffsets(plan.inputs, sPointComp);
-    std::optional<Offsets> const strandOffsets = computeElementOffsets(plan.inputs, sStrandComp);
+    MergePlan const plan =
+        planMerge(filterValid<StrandValidator>(holdInputs(inputs, output)), {sPointComp, sStrandComp});
+    std::optional<Offsets> const pointOffsets = computeElementOffsets(plan, 0);
+    std::optional<Offsets> const strandOffsets = computeElementOffsets(plan, 1);
     if (plan.inputs.empty() || !pointOffsets || !strandOffsets)
         return false;
 
-    Connectivity connectivity{sStrandOffset, *pointOffsets, (*pointOffsets)[plan.inputs.size], nullptr};
+    Connectivity connectivity{sStrandOffset, *pointOffsets, (*pointOffsets)[plan.inputs.size()], nullptr};
     Orvan::MutablePtr<Object> const points = createObject();
     Orvan::MutablePtr<Object> const strands = createObject();
     Orvan::MutablePtr<Object> const staged = stagedCopy(output);

@@ -241,13 +241,14 @@ TEST(Merge, joinsConnectivity)
 TEST(Merge, refusesWhatItCannotMergeAndTouchesNothing)
 {
     // That many elements do not fit here, so only their counts are asked.
-    auto const huge = [] {
-        auto object = cloudOf(0);
-        addComponent(sPointComp, 3'000'000'000u, *object);
-        return object;
+    auto const huge = cloudOf(0);
+    addComponent(sPointComp, 3'000'000'000u, *huge);
+    auto const fits = [](std::vector<Object const*> objects) {
+        using namespace Modeling::Internal;
+        return computeElementOffsets(planMerge({std::move(objects), nullptr}, {sPointComp}), 0).has_value();
     };
-    EXPECT_TRUE(Modeling::Internal::computeElementOffsets(inputsOf(huge()), sPointComp));
-    EXPECT_FALSE(Modeling::Internal::computeElementOffsets(inputsOf(huge(), huge()), sPointComp));
+    EXPECT_TRUE(fits({huge.get()}));
+    EXPECT_FALSE(fits({huge.get(), huge.get()}));
 
     for (Kind const kind : {Kind::Meshes, Kind::PointClouds, Kind::Strands})
         for (Inputs const& inputs : {Inputs{}, Inputs{nullptr}}) {
@@ -355,6 +356,42 @@ TEST(Merge, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
         threads.emplace_back([&] { EXPECT_TRUE(sameContents(*merged(), *expected)); });
     for (std::thread& thread : threads)
         thread.join();
+}
+
+TEST(Merge, joinsManySmallInputsThatAreAlikeOrNot)
+{
+    for (Kind const kind : {Kind::Meshes, Kind::PointClouds, Kind::Strands}) {
+        SCOPED_TRACE(static_cast<int>(kind));
+        Random random(7);
+        Inputs inputs;
+        while (inputs.size != 400) { // runs of equal properties, and of properties that change
+            auto const input = deepCopy(*randomInput(kind, 1 + random.below(5), random));
+            for (unsigned int alike = random.below(9); alike != 0 && inputs.size != 400; --alike) {
+                auto copy = deepCopy(*input);
+                // Data in some, another type of data in others; not even a geo property, but with values.
+                if (random.below(3) == 0)
+                    addDataProperty<int>("weight", sPointComp, {1, 2}, *copy, 5);
+                else if (random.below(3) == 0)
+                    addDataProperty<float>("weight", sPointComp, {1.5f}, *copy, 0.5f);
+                else if (random.below(3) == 0)
+                    copy->setProperty("weight", [] {
+                        auto loose = Tessara::createObject();
+                        loose->setProperty(sData, Orvan::makePtr<Orvan::Array<int>>(Orvan::Array<int>{7, 8, 9}));
+                        return Orvan::Ptr<Object>(std::move(loose));
+                    }());
+                inputs.append(std::move(copy));
+            }
+        }
+        auto const expected = Tessara::createObject();
+        ASSERT_TRUE(mergePlainly(kind, inputs, *expected));
+        auto const merged = [&] {
+            auto output = Tessara::createObject();
+            EXPECT_TRUE(merge(kind, inputs, *output));
+            return output;
+        };
+        EXPECT_TRUE(sameContents(*merged(), *expected));
+        expectSameForThreads({1, 2, 8}, merged);
+    }
 }
 
 TEST(Merge, leavesInputsAndOutputAsTheyWereWhenMemoryRunsOut)

@@ -7,17 +7,15 @@ namespace Tessara::Geometry {
 
 unsigned int getElementCount(Object const& object, Orvan::String const& component)
 {
-    Orvan::Ptr<Object> const geoProperty = Internal::objectAt(object, component);
-    return geoProperty ? Internal::valueOf<unsigned int>(*geoProperty, Internal::sElementCount).value_or(0) : 0;
+    Object const* const geoProperty = Internal::objectIn(object, component.view());
+    return geoProperty ? Internal::elementCountOf(*geoProperty) : 0;
 }
 
 bool setElementCount(Orvan::String const& component, unsigned int count, Object& object)
 {
-    {
-        Orvan::Ptr<Object> const geoProperty = Internal::objectAt(object, component);
-        if (!geoProperty || !Internal::valueOf<unsigned int>(*geoProperty, Internal::sElementCount))
-            return false;
-    }
+    Object const* const geoProperty = Internal::objectIn(object, component.view());
+    if (!geoProperty || !Internal::valueOf<unsigned int>(*geoProperty, Internal::sElementCount))
+        return false;
     Internal::setInGeoProp(component, Internal::sElementCount, count, object);
     return true;
 }

@@ -4,7 +4,7 @@
 #include <TessaraGeometry/Names.h>
 #include <TessaraObject/Object.h>
 
-#include <optional>
+#include <string_view>
 
 namespace Tessara::Geometry::Internal {
 
@@ -15,18 +15,32 @@ Object const& dataPrototype();
 Object const& rangePrototype();
 Object const& componentPrototype();
 
-/// The value that an object holds under a key, if it is of type `T`.
-template <class T> std::optional<T> valueOf(Object const& object, Orvan::String const& key)
+/// The value that an object holds under a key, in its place; null unless it is of type `T`.
+template <class T> T const* valueOf(Object const& object, std::string_view key)
 {
-    PropertyValue const value = object.getProperty(key);
-    T const* const held = value.get<T>();
-    return held ? std::optional<T>(*held) : std::nullopt;
+    PropertyValue const* const value = object.findProperty(key);
+    return value ? value->get<T>() : nullptr;
 }
 
-/// The object that an object holds under a key; null where there is none.
-inline Orvan::Ptr<Object> objectAt(Object const& object, Orvan::String const& key)
+/// The object that an object holds under a key, in its place; null where there is none.
+inline Object const* objectIn(Object const& object, std::string_view key)
 {
-    return valueOf<Orvan::Ptr<Object>>(object, key).value_or(nullptr);
+    auto const* const held = valueOf<Orvan::Ptr<Object>>(object, key);
+    return held ? held->get() : nullptr;
+}
+
+/// The same as a further reference.
+inline Orvan::Ptr<Object> objectAt(Object const& object, std::string_view key)
+{
+    auto const* const held = valueOf<Orvan::Ptr<Object>>(object, key);
+    return held ? *held : nullptr;
+}
+
+/// The count of a component; 0 for what is none.
+inline unsigned int elementCountOf(Object const& component)
+{
+    auto const* const count = valueOf<unsigned int>(component, sElementCount);
+    return count ? *count : 0;
 }
 
 /// Sets one value inside the geo property under `key`, which must be there. Takes memory only where the geo property is
@@ -41,7 +55,7 @@ inline void setInGeoProp(Orvan::String const& key, Orvan::String const& inner, P
         Orvan::MutablePtr<Object> changed;
 
         ~PutBack() { object.setProperty(key, changed ? Orvan::Ptr<Object>(std::move(changed)) : std::move(shared)); }
-    } putBack{key, object, objectAt(object, key), nullptr};
+    } putBack{key, object, objectAt(object, key.view()), nullptr};
 
     // Without the object's own reference the geo property is free to be changed in place.
     object.setProperty(key, Orvan::Ptr<Object>());

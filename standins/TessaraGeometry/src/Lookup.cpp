@@ -8,16 +8,16 @@ namespace Tessara::Geometry {
 
 namespace {
 
-    using Internal::objectAt;
+    using Internal::objectIn;
 
     /// Calls `visit(name, geoProperty)` for the objects that `object` holds, in the order of its keys.
     template <class Visit> void forEachObjectIn(Object const& object, Visit const& visit)
     {
         Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = object.keys();
         for (Orvan::String const& key : *keys) {
-            Orvan::Ptr<Object> const held = objectAt(object, key);
-            if (held)
-                visit(key, held);
+            auto const* const held = Internal::valueOf<Orvan::Ptr<Object>>(object, key.view());
+            if (held && *held)
+                visit(key, *held);
         }
     }
 
@@ -28,10 +28,23 @@ namespace {
             || Object::isA(geoProperty, Internal::rangePrototype());
     }
 
+    bool targets(Object const& geoProperty, Orvan::String const& target)
+    {
+        auto const* const name = Internal::valueOf<Orvan::String>(geoProperty, sTarget);
+        return name && *name == target;
+    }
+
+    /// Whether there is an object of that kind.
+    bool holds(Object const& object, Orvan::String const& name, Object const& prototype)
+    {
+        Object const* const geoProperty = objectIn(object, name.view());
+        return geoProperty && Object::isA(*geoProperty, prototype);
+    }
+
     Orvan::Ptr<Object> geoPropertyOf(Object const& object, Orvan::String const& name, Object const& prototype)
     {
-        Orvan::Ptr<Object> const geoProperty = objectAt(object, name);
-        return geoProperty && Object::isA(*geoProperty, prototype) ? geoProperty : nullptr;
+        auto const* const held = Internal::valueOf<Orvan::Ptr<Object>>(object, name.view());
+        return held && *held && Object::isA(**held, prototype) ? *held : nullptr;
     }
 
 }
@@ -60,7 +73,7 @@ Orvan::Array<Orvan::String> getGeoPropNamesByTarget(Object const& object, Orvan:
 {
     Orvan::Array<Orvan::String> names;
     forEachObjectIn(object, [&](Orvan::String const& name, Orvan::Ptr<Object> const& geoProperty) {
-        if (hasTarget(*geoProperty) && Internal::valueOf<Orvan::String>(*geoProperty, sTarget) == target)
+        if (hasTarget(*geoProperty) && targets(*geoProperty, target))
             names.append(name);
     });
     return names;
@@ -68,23 +81,23 @@ Orvan::Array<Orvan::String> getGeoPropNamesByTarget(Object const& object, Orvan:
 
 Orvan::String getGeoPropTargetName(Object const& object, Orvan::String const& name)
 {
-    Orvan::Ptr<Object> const geoProperty = objectAt(object, name);
-    return geoProperty && hasTarget(*geoProperty)
-        ? Internal::valueOf<Orvan::String>(*geoProperty, sTarget).value_or(Orvan::String())
-        : Orvan::String();
+    Object const* const geoProperty = objectIn(object, name.view());
+    bool const isTargeted = geoProperty && hasTarget(*geoProperty);
+    auto const* const target = isTargeted ? Internal::valueOf<Orvan::String>(*geoProperty, sTarget) : nullptr;
+    return target ? *target : Orvan::String();
 }
 
 Orvan::String getTargetComponent(Object const& object, Orvan::String const& name)
 {
     Orvan::String target = getGeoPropTargetName(object, name);
-    if (geoPropertyOf(object, target, Internal::componentPrototype()))
+    if (holds(object, target, Internal::componentPrototype()))
         return target; // mostly
     // A chain without a loop is no longer than the object has keys.
     for (std::uint64_t steps = object.keys()->size; steps != 0; --steps) {
-        if (!geoPropertyOf(object, target, Internal::rangePrototype()))
+        if (!holds(object, target, Internal::rangePrototype()))
             break;
         target = getGeoPropTargetName(object, target);
-        if (geoPropertyOf(object, target, Internal::componentPrototype()))
+        if (holds(object, target, Internal::componentPrototype()))
             return target;
     }
     return {};
@@ -102,7 +115,8 @@ Orvan::Ptr<Object> getRangeGeoProperty(Object const& object, Orvan::String const
 
 Orvan::Ptr<Orvan::Array<unsigned int>> getRangeGeoPropIndices(Object const& range)
 {
-    return Internal::valueOf<Orvan::Ptr<Orvan::Array<unsigned int>>>(range, sIndices).value_or(nullptr);
+    auto const* const indices = Internal::valueOf<Orvan::Ptr<Orvan::Array<unsigned int>>>(range, sIndices);
+    return indices ? *indices : nullptr;
 }
 
 Orvan::Ptr<Orvan::Array<unsigned int>> getRangeGeoPropIndices(Object const& object, Orvan::String const& name)
@@ -113,7 +127,7 @@ Orvan::Ptr<Orvan::Array<unsigned int>> getRangeGeoPropIndices(Object const& obje
 
 bool setRangeGeoPropIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>> indices, Object& object)
 {
-    if (!getRangeGeoProperty(object, name))
+    if (!holds(object, name, Internal::rangePrototype()))
         return false;
     Internal::setInGeoProp(name, sIndices, std::move(indices), object);
     return true;

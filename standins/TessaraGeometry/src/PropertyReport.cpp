@@ -93,7 +93,7 @@ namespace {
 
         void examineLength(Orvan::String const& name, Orvan::String const& target, std::uint64_t length)
         {
-            Orvan::Ptr<Object> const component = Internal::objectAt(object_, target);
+            Orvan::Ptr<Object> const component = Internal::objectAt(object_, target.view());
             if (!component || !Object::isA(*component, *getComponentGeoPropPrototype())) {
                 say(quoted(name) + " targets " + quoted(target) + ", which is not there");
                 return;

@@ -1,8 +1,7 @@
-#include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
-#include <TessaraGeometry/Makers.h>
 #include <TessaraGeometry/Prototypes.h>
 #include <TessaraGeometry/Validators.h>
+#include <TessaraMathSupport/Types.h>
 
 #include "GeoProps.h"
 
@@ -33,39 +32,73 @@ namespace {
         char const* indexed;
     };
 
+    /// What an object holds under the name of a component; null where there is none.
+    struct Component {
+        char const* name;
+        Object const* geoProperty;
+        unsigned int count = 0;
+
+        Component(Object const& object, char const* componentName)
+            : name(componentName)
+            , geoProperty(Internal::objectIn(object, name))
+        {
+            if (geoProperty)
+                count = Internal::elementCountOf(*geoProperty);
+        }
+    };
+
+    Status checkComponent(Component const& component)
+    {
+        if (component.geoProperty && Object::isA(*component.geoProperty, Internal::componentPrototype()))
+            return {};
+        return failure("the component " + std::string(component.name) + " is missing");
+    }
+
     struct StandardData {
-        std::string name;
-        std::string component;
+        char const* name;
+        Component const& component;
         std::uint64_t length; // that it must have
     };
 
-    Status checkComponent(Object const& object, char const* name)
+    /// \param values  receives the values of data that passes
+    template <class T>
+    Status checkStandardData(Object const& object, StandardData const& wanted, Orvan::Array<T> const** values = nullptr)
     {
-        Orvan::Ptr<Object> const component = Internal::objectAt(object, name);
-        if (component && Object::isA(*component, Internal::componentPrototype()))
-            return {};
-        return failure("the component " + std::string(name) + " is missing");
+        std::string const type = std::is_same_v<T, unsigned int> ? "unsigned int" : "float3";
+        Object const* const property = Internal::objectIn(object, wanted.name);
+        if (!property || !Object::isA(*property, Internal::dataPrototype()))
+            return failure("the data property " + std::string(wanted.name) + " is missing");
+        auto const* const data = Internal::valueOf<Orvan::Ptr<Orvan::Array<T>>>(*property, sData);
+        if (!data || !*data)
+            return failure(wanted.name + (" does not hold an array of " + type));
+        if (!Internal::valueOf<T>(*property, sDefault))
+            return failure(wanted.name + (" has no sDefault of type " + type));
+        auto const* const target = Internal::valueOf<Orvan::String>(*property, sTarget);
+        if (!target || *target != wanted.component.name)
+            return failure(
+                wanted.name + (" targets " + quoted(target ? *target : "")) + " instead of " + wanted.component.name);
+        if ((*data)->size != wanted.length)
+            return failure(wanted.name + (" has " + to_string((*data)->size)) + " entries instead of "
+                + to_string(wanted.length) + " for " + to_string(wanted.component.count) + " elements of "
+                + wanted.component.name);
+        if (values)
+            *values = data->get();
+        return {};
     }
 
-    template <class T> Status checkStandardData(Object const& object, StandardData const& wanted)
+    /// Whether any of `count` numbers is wrong. Looks at whole blocks, so that several are compared at once.
+    template <class IsWrong> bool anyWrong(std::uint64_t count, IsWrong const& isWrong)
     {
-        char const* const type = std::is_same_v<T, unsigned int> ? "unsigned int" : "float3";
-        Orvan::Ptr<Object> const property = getDataGeoProperty(object, wanted.name.c_str());
-        if (!property)
-            return failure("the data property " + wanted.name + " is missing");
-        auto const values = Internal::valueOf<Orvan::Ptr<Orvan::Array<T>>>(*property, sData);
-        if (!values || !*values)
-            return failure(wanted.name + " does not hold an array of " + type);
-        if (!Internal::valueOf<T>(*property, sDefault))
-            return failure(wanted.name + " has no sDefault of type " + type);
-        auto const target = Internal::valueOf<Orvan::String>(*property, sTarget).value_or("");
-        if (target != wanted.component.c_str())
-            return failure(wanted.name + " targets " + quoted(target) + " instead of " + wanted.component);
-        if ((*values)->size != wanted.length)
-            return failure(wanted.name + " has " + to_string((*values)->size) + " entries instead of "
-                + to_string(wanted.length) + " for " + to_string(getElementCount(object, wanted.component.c_str()))
-                + " elements of " + wanted.component);
-        return {};
+        constexpr std::uint64_t kBlock = 4096;
+        for (std::uint64_t begin = 0; begin < count; begin += kBlock) {
+            std::uint64_t const end = std::min(begin + kBlock, count);
+            unsigned int wrong = 0;
+            for (std::uint64_t i = begin; i != end; ++i)
+                wrong |= isWrong(i) ? ~0u : 0u;
+            if (wrong != 0)
+                return true;
+        }
+        return false;
     }
 
     /// Offsets start at 0, never fall, and end at `last`.
@@ -74,8 +107,8 @@ namespace {
     {
         if (offsets[0] != 0)
             return failure(std::string(name) + "[0] is " + to_string(offsets[0]) + " instead of 0");
-        unsigned int const* const fall = std::adjacent_find(offsets.begin(), offsets.end(), std::greater<>());
-        if (fall != offsets.end()) {
+        if (anyWrong(offsets.size - 1, [o = offsets.data](std::uint64_t i) { return o[i] > o[i + 1]; })) {
+            unsigned int const* const fall = std::adjacent_find(offsets.begin(), offsets.end(), std::greater<>());
             auto const entry = static_cast<std::uint64_t>(fall - offsets.begin()) + 1;
             return failure(std::string(name) + "[" + to_string(entry) + "] is " + to_string(fall[1])
                 + ", less than the " + to_string(fall[0]) + " before it");
@@ -89,8 +122,12 @@ namespace {
 
     Status checkPointIndices(Orvan::Array<unsigned int> const& faceVertex, unsigned int pointCount)
     {
-        unsigned int const* const beyond =
-            std::find_if(faceVertex.begin(), faceVertex.end(), [=](unsigned int point) { return point >= pointCount; });
+        auto const isBeyond = [=](unsigned int point) { return point >= pointCount; };
+        auto const isLater = [last = pointCount - 1, point = faceVertex.data](
+                                 std::uint64_t i) { return point[i] > last; };
+        if (pointCount != 0 && !anyWrong(faceVertex.size, isLater))
+            return {};
+        unsigned int const* const beyond = std::find_if(faceVertex.begin(), faceVertex.end(), isBeyond);
         if (beyond == faceVertex.end())
             return {};
         return failure("sFaceVertex[" + to_string(beyond - faceVertex.begin()) + "] is " + to_string(*beyond)
@@ -109,31 +146,31 @@ namespace {
 
 Status validateMesh(Object const& mesh)
 {
-    unsigned int const pointCount = getElementCount(mesh, sPointComp);
-    unsigned int const cornerCount = getElementCount(mesh, sFaceVertexComp);
-    std::uint64_t const faceCount = getElementCount(mesh, sFaceComp);
-    return firstFailure([&] { return checkComponent(mesh, sPointComp); },
-        [&] { return checkComponent(mesh, sFaceVertexComp); }, [&] { return checkComponent(mesh, sFaceComp); },
+    Component const points(mesh, sPointComp), corners(mesh, sFaceVertexComp), faces(mesh, sFaceComp);
+    std::uint64_t const faceCount = faces.count;
+    Orvan::Array<unsigned int> const* faceVertex = nullptr;
+    Orvan::Array<unsigned int> const* faceOffset = nullptr;
+    return firstFailure([&] { return checkComponent(points); }, [&] { return checkComponent(corners); },
+        [&] { return checkComponent(faces); },
         [&] {
-            return checkStandardData<Math::float3>(mesh, {sPointPosition, sPointComp, pointCount});
+            return checkStandardData<Math::float3>(mesh, {sPointPosition, points, points.count});
         },
         [&] {
-            return checkStandardData<unsigned int>(mesh, {sFaceVertex, sFaceVertexComp, cornerCount});
+            return checkStandardData<unsigned int>(mesh, {sFaceVertex, corners, corners.count}, &faceVertex);
         },
         [&] {
-            return checkStandardData<unsigned int>(mesh, {sFaceOffset, sFaceComp, faceCount + 1});
+            return checkStandardData<unsigned int>(mesh, {sFaceOffset, faces, faceCount + 1}, &faceOffset);
         },
         [&] {
-            return checkOffsets(
-                sFaceOffset, *dataOf<unsigned int>(mesh, sFaceOffset), cornerCount, {"mesh", "face corners"});
+            return checkOffsets(sFaceOffset, *faceOffset, corners.count, {"mesh", "face corners"});
         },
-        [&] { return checkPointIndices(*dataOf<unsigned int>(mesh, sFaceVertex), pointCount); });
+        [&] { return checkPointIndices(*faceVertex, points.count); });
 }
 
 Status PointCloudValidator::validate(Object const& pointCloud)
 {
-    unsigned int const pointCount = getElementCount(pointCloud, sPointComp);
-    return firstFailure([&] { return checkComponent(pointCloud, sPointComp); },
+    Component const points(pointCloud, sPointComp);
+    return firstFailure([&] { return checkComponent(points); },
         [&] {
             auto const components = getGeoPropNamesByPrototype(pointCloud, Internal::componentPrototype());
             auto const other =
@@ -143,27 +180,26 @@ Status PointCloudValidator::validate(Object const& pointCloud)
                 : failure("a point cloud has one component, but there is also " + quoted(*other));
         },
         [&] {
-            return checkStandardData<Math::float3>(pointCloud, {sPointPosition, sPointComp, pointCount});
+            return checkStandardData<Math::float3>(pointCloud, {sPointPosition, points, points.count});
         });
 }
 
 Status StrandValidator::validate(Object const& strands)
 {
-    unsigned int const pointCount = getElementCount(strands, sPointComp);
-    std::uint64_t const strandCount = getElementCount(strands, sStrandComp);
-    return firstFailure([&] { return checkComponent(strands, sPointComp); },
-        [&] { return checkComponent(strands, sStrandComp); },
+    Component const points(strands, sPointComp), lines(strands, sStrandComp);
+    std::uint64_t const strandCount = lines.count;
+    Orvan::Array<unsigned int> const* offsets = nullptr;
+    return firstFailure([&] { return checkComponent(points); }, [&] { return checkComponent(lines); },
         [&] {
-            return checkStandardData<Math::float3>(strands, {sPointPosition, sPointComp, pointCount});
+            return checkStandardData<Math::float3>(strands, {sPointPosition, points, points.count});
         },
         [&] {
-            return checkStandardData<unsigned int>(strands, {sStrandOffset, sStrandComp, strandCount + 1});
+            return checkStandardData<unsigned int>(strands, {sStrandOffset, lines, strandCount + 1}, &offsets);
         },
         [&] {
-            auto const offsets = dataOf<unsigned int>(strands, sStrandOffset);
             // Without strands the points belong to none of them: the one offset may be 0, or their number.
-            std::uint64_t const last = strandCount == 0 ? 0 : pointCount;
-            if (strandCount == 0 && (*offsets)[0] == pointCount)
+            std::uint64_t const last = strandCount == 0 ? 0 : points.count;
+            if (strandCount == 0 && (*offsets)[0] == points.count)
                 return Status();
             return checkOffsets(sStrandOffset, *offsets, last, {"strand set", "points"});
         });

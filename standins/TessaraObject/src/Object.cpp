@@ -8,19 +8,12 @@ namespace Tessara {
 
 namespace {
 
-    constexpr std::size_t kFewKeys = 8; // up to here comparing all keys is faster than hashing one
+    constexpr std::size_t kFewKeys = 16; // up to here comparing all keys is faster than hashing one
 
-    std::size_t hashOf(Orvan::String const& key)
+    /// As `==`. Keys of one length mostly end differently, and looking is faster than calling.
+    bool isSame(std::string_view a, std::string_view b)
     {
-        return std::hash<std::string_view>()(key.view());
-    }
-
-    bool lacksAll(Object const& object, PropertyValue const& excluded)
-    {
-        auto const* const names = excluded.get<Orvan::Ptr<Orvan::Array<Orvan::String>>>();
-        return !names || !*names || std::none_of((*names)->begin(), (*names)->end(), [&](Orvan::String const& name) {
-            return object.hasProperty(name);
-        });
+        return a.size() == b.size() && (a.empty() || (a.back() == b.back() && a == b));
     }
 
     bool valueConforms(PropertyValue const& value, PropertyValue const& wanted)
@@ -36,21 +29,25 @@ namespace {
 
 }
 
+// Inline, as they are what most time is spent in: calls within a shared library go through its tables.
+
 // The slot that holds the key, or the free slot where it would go.
-std::size_t Object::slotOf(Orvan::String const& key) const
+inline std::size_t Object::slotOf(std::string_view key) const
 {
     std::size_t const mask = slots_.size() - 1;
-    std::size_t slot = hashOf(key) & mask;
-    while (slots_[slot] != 0 && entries_[slots_[slot] - 1].key != key)
+    std::size_t slot = std::hash<std::string_view>()(key) & mask;
+    while (slots_[slot] != 0 && !isSame(entries_[slots_[slot] - 1].key.view(), key))
         slot = (slot + 1) & mask;
     return slot;
 }
 
-Object::Entry const* Object::find(Orvan::String const& key) const
+inline Object::Entry const* Object::find(std::string_view key) const
 {
     if (slots_.empty()) {
-        auto const entry = std::find_if(entries_.begin(), entries_.end(), [&](Entry const& e) { return e.key == key; });
-        return entry == entries_.end() ? nullptr : &*entry;
+        for (Entry const& entry : entries_)
+            if (isSame(entry.key.view(), key))
+                return &entry;
+        return nullptr;
     }
     std::uint32_t const number = slots_[slotOf(key)];
     return number == 0 ? nullptr : &entries_[number - 1];
@@ -60,23 +57,29 @@ void Object::rebuildSlots(std::size_t slotCount)
 {
     slots_.assign(slotCount, 0);
     for (std::size_t entry = 0; slotCount != 0 && entry < entries_.size(); ++entry)
-        slots_[slotOf(entries_[entry].key)] = static_cast<std::uint32_t>(entry + 1);
+        slots_[slotOf(entries_[entry].key.view())] = static_cast<std::uint32_t>(entry + 1);
 }
 
 bool Object::hasProperty(Orvan::String const& key) const
 {
-    return find(key) != nullptr;
+    return find(key.view()) != nullptr;
 }
 
 PropertyValue Object::getProperty(Orvan::String const& key) const
 {
-    Entry const* const entry = find(key);
+    Entry const* const entry = find(key.view());
     return entry ? entry->value : PropertyValue();
+}
+
+PropertyValue const* Object::findProperty(std::string_view key) const
+{
+    Entry const* const entry = find(key);
+    return entry ? &entry->value : nullptr;
 }
 
 void Object::eraseProperty(Orvan::String const& key)
 {
-    Entry const* const entry = find(key);
+    Entry const* const entry = find(key.view());
     if (!entry)
         return;
     entries_.erase(entries_.begin() + (entry - entries_.data()));
@@ -99,7 +102,7 @@ Orvan::Ptr<Orvan::Array<Orvan::String>> Object::keys() const
 
 void Object::setProperty(Orvan::String const& key, PropertyValue&& value)
 {
-    if (Entry const* const present = find(key)) {
+    if (Entry const* const present = find(key.view())) {
         entries_[static_cast<std::size_t>(present - entries_.data())].value = std::move(value);
         return;
     }
@@ -109,7 +112,7 @@ void Object::setProperty(Orvan::String const& key, PropertyValue&& value)
         if (count > kFewKeys && slots_.size() < 2 * count)
             rebuildSlots(std::max(4 * kFewKeys, 2 * slots_.size()));
         else if (!slots_.empty())
-            slots_[slotOf(key)] = static_cast<std::uint32_t>(count);
+            slots_[slotOf(key.view())] = static_cast<std::uint32_t>(count);
     } catch (...) {
         entries_.pop_back();
         throw;
@@ -120,10 +123,17 @@ void Object::setProperty(Orvan::String const& key, PropertyValue&& value)
 bool Object::isA(Object const& object, Object const& prototype)
 {
     // Values are looked at in place: a copy of a `Ptr` would have all threads write the count of one shared prototype.
+    constexpr std::string_view kExcluded = kExcludedKeys;
+    auto const lacksAll = [&](PropertyValue const& excluded) {
+        auto const* const names = excluded.get<Orvan::Ptr<Orvan::Array<Orvan::String>>>();
+        return !names || !*names || std::none_of((*names)->begin(), (*names)->end(), [&](Orvan::String const& name) {
+            return object.find(name.view());
+        });
+    };
     return std::all_of(prototype.entries_.begin(), prototype.entries_.end(), [&](Entry const& wanted) {
-        if (wanted.key == kExcludedKeys)
-            return lacksAll(object, wanted.value);
-        Entry const* const entry = object.find(wanted.key);
+        if (wanted.key.view() == kExcluded)
+            return lacksAll(wanted.value);
+        Entry const* const entry = object.find(wanted.key.view());
         return entry && valueConforms(entry->value, wanted.value);
     });
 }

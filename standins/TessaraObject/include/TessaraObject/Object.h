@@ -7,6 +7,7 @@
 #include <TessaraObject/PropertyValue.h>
 
 #include <cstdint>
+#include <string_view>
 #include <vector>
 
 namespace Tessara {
@@ -50,6 +51,10 @@ public:
     /// - any other value asks for a value of the same type.
     static bool isA(Object const& object, Object const& prototype);
 
+    /// The value under a key in its place, null when the key is absent: for the host's own libraries, to which copies of
+    /// values would be dear. It stays there until the object is changed.
+    PropertyValue const* findProperty(std::string_view key) const;
+
     static constexpr char const* kExcludedKeys = "excludedKeys";
 
 private:
@@ -58,8 +63,8 @@ private:
         PropertyValue value;
     };
 
-    Entry const* find(Orvan::String const& key) const;
-    std::size_t slotOf(Orvan::String const& key) const;
+    Entry const* find(std::string_view key) const;
+    std::size_t slotOf(std::string_view key) const;
     void rebuildSlots(std::size_t slotCount);
 
     std::vector<Entry> entries_;
