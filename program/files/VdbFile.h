@@ -1,0 +1,47 @@
+#pragma once
+
+#include "GeometryFile.h"
+
+#include <TessaraGeometryVolume/VolumeBuilder.h>
+
+#include <array>
+#include <cstdint>
+
+namespace ModelingProgram {
+
+/// A float grid of an OpenVDB file: values at the corners of a lattice of cubes, where they are active, and a background
+/// everywhere else. Voxel (i, j, k) stands at `(i, j, k) * voxelSize + translation`.
+struct SparseVolume {
+    std::string name;
+    double voxelSize = 1;
+    std::array<double, 3> translation{};
+    float background = 0;
+    std::vector<TSR::TileTree3D::Voxel> voxels;
+    std::vector<TSR::TileTree3D::ConstantBox> boxes; // these do not overlap, nor do they hold one of the voxels
+
+    /// Voxels and those in the boxes.
+    std::uint64_t activeCount() const;
+};
+
+struct VdbGrid {
+    std::string name; // "density", or "density[1]" where an earlier grid has that name
+    std::string type; // "float", "vec3s", ...
+};
+
+/// The grids of an OpenVDB file, in its order.
+/// \throws FileError  for what is no such file
+std::vector<VdbGrid> listVdbGrids(std::filesystem::path const& file);
+
+/// Reads a grid of the type "float", which may be stored in half precision.
+/// \param grid        which of the list
+/// \throws FileError  for a grid that is cut off or broken, has a value that is not finite, or voxels that are no cubes
+///                    along the axes
+/// \throws std::bad_alloc
+SparseVolume readVdbGrid(std::filesystem::path const& file, std::size_t grid);
+
+/// Writes a volume as an OpenVDB file with one grid; the same bytes for the same volume. The file appears under its name
+/// only when it is complete.
+/// \throws FileError  where the file cannot be written; a file of that name is then as it was
+void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file);
+
+}
