@@ -1,11 +1,11 @@
 #include "VdbFile.h"
 
+#include "OpenVdb.h"
 #include "OutputFile.h"
 #include "VdbOutline.h"
 
 #include <openvdb/io/Archive.h>
 #include <openvdb/io/GridDescriptor.h>
-#include <openvdb/openvdb.h>
 
 #include <algorithm>
 #include <cmath>
@@ -105,19 +105,6 @@ namespace {
             return openvdb::gridPtrCast<openvdb::FloatGrid>(grid);
         }
     };
-
-    openvdb::FloatGrid::Ptr readFloatGrid(
-        InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all)
-    {
-        checkVdbFloatGrid(file, entry, all);
-        try {
-            return GridArchive().read(file, entry, all);
-        } catch (std::bad_alloc const&) {
-            throw;
-        } catch (std::exception const& error) { // OpenVDB's, and those of streams
-            refuse(file.path, "grid \"" + entry.name + "\" is broken: " + error.what());
-        }
-    }
 
     /// Refuses what is more than cubes along the axes.
     void takeTransform(
@@ -223,16 +210,25 @@ std::vector<VdbGrid> listVdbGrids(std::filesystem::path const& file)
 
 SparseVolume readVdbGrid(std::filesystem::path const& file, std::size_t grid)
 {
-    initializeOpenVdb();
     InputFile const input(file);
     std::vector<VdbGridEntry> const entries = readVdbOutline(input);
     if (grid >= entries.size() || entries[grid].type != "float")
         refuse(file, "there is no such float grid");
-    auto const read = readFloatGrid(input, entries[grid], entries);
+    checkVdbFloatGrid(input, entries[grid], entries);
+    initializeOpenVdb();
     SparseVolume volume;
     volume.name = entries[grid].name;
-    takeTransform(read->transform(), file, volume);
-    takeValues(*read, file, volume);
+    try {
+        auto const read = GridArchive().read(input, entries[grid], entries);
+        takeTransform(read->transform(), file, volume);
+        takeValues(*read, file, volume);
+    } catch (FileError const&) {
+        throw;
+    } catch (std::bad_alloc const&) {
+        throw;
+    } catch (std::exception const& error) { // OpenVDB's, and those of streams
+        refuse(file, "grid \"" + volume.name + "\" is broken: " + error.what());
+    }
     return volume;
 }
 
@@ -240,7 +236,13 @@ void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file)
 {
     initializeOpenVdb();
     OutputFile out(file);
-    std::string content = GridArchive().write(makeGrid(volume));
+    std::string content;
+    try {
+        content = GridArchive().write(makeGrid(volume));
+    } catch (openvdb::Exception const& error) {
+        throw FileError(file.string() + " cannot be written: OpenVDB has no voxels of a size of "
+            + std::to_string(volume.voxelSize) + " (" + error.what() + ")");
+    }
     identifyByContent(content);
     out << content;
     out.commit();

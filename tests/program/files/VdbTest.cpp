@@ -1,9 +1,9 @@
 #include "FileSupport.h"
+#include "OpenVdb.h"
 #include "VdbFile.h"
 
 #include <openvdb/io/File.h>
 #include <openvdb/io/Stream.h>
-#include <openvdb/openvdb.h>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -97,10 +97,9 @@ namespace {
             [](Voxel const& a, Voxel const& b) { return !isBefore(a, b) && !isBefore(b, a) && a.value == b.value; }));
         EXPECT_EQ(volume.background, grid.background());
         openvdb::Vec3d const place = grid.indexToWorld(Coord(3, -4, 5));
-        for (int axis = 0; axis != 3; ++axis)
-            EXPECT_DOUBLE_EQ(place[axis],
-                std::array{3, -4, 5}[static_cast<std::size_t>(axis)] * volume.voxelSize
-                    + volume.translation[static_cast<std::size_t>(axis)]);
+        EXPECT_DOUBLE_EQ(place[0], 3 * volume.voxelSize + volume.translation[0]);
+        EXPECT_DOUBLE_EQ(place[1], -4 * volume.voxelSize + volume.translation[1]);
+        EXPECT_DOUBLE_EQ(place[2], 5 * volume.voxelSize + volume.translation[2]);
     }
 
     std::string refusalOfGrid(std::filesystem::path const& file, std::size_t grid = 0)
@@ -155,6 +154,10 @@ namespace {
         ASSERT_TRUE(grid);
         expectSame(volume, *grid);
         expectSame(readVdbGrid(folder / "b.vdb", 0), *grid);
+        SparseVolume tiny;
+        tiny.voxelSize = 1e-9;
+        EXPECT_THROW(writeVdbFile(tiny, folder / "b.vdb"), FileError);
+        EXPECT_EQ(contentOf(folder / "b.vdb"), contentOf(folder / "c.vdb"));
         EXPECT_EQ(folder.entryCount(), 3); // nothing temporary is left
     }
 
