@@ -43,6 +43,7 @@ void addValidate(CLI::App& program, Invocation& invocation);
 void addAddPoints(CLI::App& program, Invocation& invocation);
 void addDeletePoints(CLI::App& program, Invocation& invocation);
 void addDeleteFaces(CLI::App& program, Invocation& invocation);
+void addMakeVolume(CLI::App& program, Invocation& invocation);
 void addMerge(CLI::App& program, Invocation& invocation);
 void addRemoveSlivers(CLI::App& program, Invocation& invocation);
 void addSmooth(CLI::App& program, Invocation& invocation);

@@ -4,7 +4,12 @@
 #include "Geometry.h"
 #include "Report.h"
 
+#include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Lookup.h>
+
 #include <fmt/format.h>
+
+#include <type_traits>
 
 namespace ModelingProgram {
 
@@ -111,6 +116,24 @@ void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topol
                         "(points and faces are counted from 0):",
                 command, file.string()),
             std::move(reasons));
+}
+
+std::vector<float> pointNumbers(Tessara::Object const& mesh, std::string const& name, std::filesystem::path const& file)
+{
+    using namespace Tessara::Geometry;
+    std::vector<float> numbers;
+    Orvan::Ptr<Tessara::Object> const property = getDataGeoProperty(mesh, name.c_str());
+    if (property && getGeoPropTargetName(mesh, name.c_str()) == sPointComp)
+        visitArray(property->getProperty(sData), [&]<class T>(Orvan::Array<T> const& values, auto) {
+            if constexpr (std::is_arithmetic_v<T>)
+                for (T const value : values)
+                    numbers.push_back(static_cast<float>(value));
+        });
+    if (numbers.size() != arraysOf(mesh).pointCount())
+        throw Failure(ExitCode::Refused,
+            fmt::format("\"{}\" is to be an attribute with one number for each point, which {} does not hold", name,
+                file.string()));
+    return numbers;
 }
 
 }

@@ -25,4 +25,8 @@ void requireMesh(Tessara::Object const& object, char const* command, std::filesy
 void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
     std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file);
 
+/// A number for each point, from a property of any scalar type. Refuses a mesh that does not have it.
+std::vector<float> pointNumbers(
+    Tessara::Object const& mesh, std::string const& name, std::filesystem::path const& file);
+
 }

@@ -34,6 +34,17 @@ namespace {
         return static_cast<std::uint64_t>(usage.ru_maxrss) * 1024;
     }
 
+    /// Ends the report with a table of these rows and those that all commands have.
+    void addRun(std::vector<std::vector<std::string>> rows, Report& report)
+    {
+        Json& document = report.document;
+        document["peakMemoryBytes"] = peakMemory();
+        rows.push_back({"time", formatSeconds(document["seconds"].get<double>())});
+        rows.push_back({"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())});
+        rows.push_back({"written", document["output"].get<std::string>()});
+        report.text += "\n" + formatTable({{}, {}}, rows);
+    }
+
 }
 
 void requireWritable(fs::path const& file)
@@ -41,6 +52,11 @@ void requireWritable(fs::path const& file)
     if (!isWritableFormat(file))
         throw Failure(ExitCode::File,
             fmt::format("cannot write {}: the name has to end in .obj, .ply, .stl or .vtp", file.string()));
+    requirePlace(file);
+}
+
+void requirePlace(fs::path const& file)
+{
     std::error_code ignored;
     if (fs::is_directory(file, ignored))
         throw Failure(ExitCode::File, fmt::format("cannot write {}: it is a folder", file.string()));
@@ -139,7 +155,6 @@ void reportOperation(
     document["before"] = before;
     document["after"] = after;
     document["droppedProperties"] = droppedProperties;
-    document["peakMemoryBytes"] = peakMemory();
 
     report.text += formatValues({{"before", before}, {"after", after}});
     auto const listOf = [](std::vector<std::string> const& names) {
@@ -149,10 +164,12 @@ void reportOperation(
     if (document.contains("keptProperties"))
         rows.push_back({"kept properties", listOf(document["keptProperties"])});
     rows.push_back({"dropped properties", listOf(droppedProperties)});
-    rows.push_back({"time", formatSeconds(document["seconds"].get<double>())});
-    rows.push_back({"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())});
-    rows.push_back({"written", document["output"].get<std::string>()});
-    report.text += "\n" + formatTable({{}, {}}, rows);
+    addRun(rows, report);
+}
+
+void reportRun(Report& report)
+{
+    addRun({}, report);
 }
 
 }

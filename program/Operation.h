@@ -24,6 +24,8 @@ namespace ModelingProgram {
 
 /// Looks at the name before time is spent: the format, and the folder the file is to go to.
 void requireWritable(std::filesystem::path const& file);
+/// The latter alone.
+void requirePlace(std::filesystem::path const& file);
 
 /// Reads a file.
 Orvan::MutablePtr<Tessara::Object> readGeometry(std::filesystem::path const& file, Report& report);
@@ -53,5 +55,8 @@ Json countsOf(Tessara::Object const& object);
 /// there) and dropped properties, time and peak memory.
 void reportOperation(
     Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report);
+
+/// Ends the report with time, peak memory and the file written, for commands without such a table.
+void reportRun(Report& report);
 
 }

@@ -18,7 +18,7 @@ namespace ModelingProgram {
 namespace {
 
     constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints,
-        addDeleteFaces, addMerge, addTriangulate, addSubdivide, addSmooth, addRemoveSlivers, addStitch};
+        addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth, addRemoveSlivers, addStitch};
 
     constexpr char kFooter[] =
         R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply

@@ -38,24 +38,6 @@ namespace {
         bool* asJson = nullptr; // then standard output belongs to the document
     };
 
-    /// A number for each point, from a property of any scalar type.
-    std::vector<float> pointNumbers(Object const& mesh, std::string const& name, std::filesystem::path const& file)
-    {
-        std::vector<float> numbers;
-        Orvan::Ptr<Object> const property = getDataGeoProperty(mesh, name.c_str());
-        if (property && getGeoPropTargetName(mesh, name.c_str()) == sPointComp)
-            visitArray(property->getProperty(sData), [&]<class T>(Orvan::Array<T> const& values, auto) {
-                if constexpr (std::is_arithmetic_v<T>)
-                    for (T const value : values)
-                        numbers.push_back(static_cast<float>(value));
-            });
-        if (numbers.size() != arraysOf(mesh).pointCount())
-            throw Failure(ExitCode::Refused,
-                fmt::format("\"{}\" is to be an attribute with one number for each point, which {} does not hold", name,
-                    file.string()));
-        return numbers;
-    }
-
     /// Null where nothing is weighted or pinned.
     std::unique_ptr<Orvan::Array<float>> weightsOf(Options const& options, Object const& mesh, Report& report)
     {

@@ -1,6 +1,7 @@
 #include "Commands.h"
 #include "Failure.h"
 #include "Geometry.h"
+#include "GuideVolume.h"
 #include "MemoryLimit.h"
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
@@ -37,6 +38,7 @@ namespace {
         std::optional<float> relative;
         std::uint64_t maxMemory = 0;
         bool triangulates = false;
+        GuideOptions guide;
     };
 
     /// A mesh that tells on standard error how many faces it has, whenever a pass has made more. It sees that from data
@@ -86,14 +88,20 @@ namespace {
     };
 
     /// Where the user can see them, with the count of faces after each pass.
-    void refine(float tolerance, Object& mesh)
+    void refine(std::optional<GuideVolume> const& guide, float tolerance, Object& mesh)
     {
+        auto const run = [&](Object& object) {
+            if (guide)
+                guide->refine(tolerance, object);
+            else
+                Geometry::Mesh::subdivide(tolerance, object);
+        };
         if (!::isatty(STDERR_FILENO)) {
-            Geometry::Mesh::subdivide(tolerance, mesh);
+            run(mesh);
             return;
         }
         TellingMesh telling(mesh);
-        Geometry::Mesh::subdivide(tolerance, telling);
+        run(telling);
         mesh = telling.mesh();
     }
 
@@ -112,25 +120,37 @@ namespace {
         }
     }
 
-    float toleranceOf(Options const& options, Object const& mesh)
+    /// Below, the library refines nothing; and where points are as far from one another as numbers are, all faces stay
+    /// large for ever.
+    bool isTooFine(float tolerance, float farthest)
+    {
+        constexpr float kFinest = std::numeric_limits<float>::epsilon();
+        return !(tolerance > 4 * kFinest * farthest);
+    }
+
+    float toleranceOf(Options const& options, Object const& mesh, std::optional<GuideVolume> const& guide)
     {
         BoundingBox const box = boundingBoxOf(mesh).value_or(BoundingBox{});
         float3 const size{box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z};
         float const tolerance =
             options.tolerance ? *options.tolerance : *options.relative * std::hypot(size.x, size.y, size.z);
 
-        // Below, the library refines nothing; and where points are as far from one another as numbers are, all faces
-        // stay large for ever.
-        constexpr float kFinest = std::numeric_limits<float>::epsilon();
         float farthest = 0.25f;
         for (float const coordinate : {box.min.x, box.min.y, box.min.z, box.max.x, box.max.y, box.max.z})
             farthest = std::max(farthest, std::abs(coordinate));
-        if (!(tolerance > 4 * kFinest * farthest))
+        if (isTooFine(tolerance, farthest))
             throw Failure(ExitCode::Refused,
                 fmt::format(
                     "a tolerance of {} is finer than single precision can tell apart at coordinates of up to {}. "
                     "Take a larger one, scale a tiny mesh up, or move a far one to the origin.",
                     tolerance, farthest));
+        float const scale = guide ? guide->smallestPositiveValue().value_or(1) : 1;
+        if (isTooFine(tolerance * scale, farthest))
+            throw Failure(ExitCode::Refused,
+                fmt::format(
+                    "a tolerance of {} times the smallest positive value of grid \"{}\", {}, is finer than single "
+                    "precision can tell apart at coordinates of up to {}. Take a larger tolerance or --min-value.",
+                    tolerance, guide->grid(), scale, farthest));
         return tolerance;
     }
 
@@ -174,9 +194,12 @@ namespace {
         requireClosedTriangleMesh(
             arraysOf(*mesh), topology, faultsOfIsolatedPoints(arraysOf(*mesh), topology), "subdivide", options.in);
 
-        float const tolerance = toleranceOf(options, *mesh);
+        std::optional<GuideVolume> guide;
+        if (!options.guide.file.empty())
+            guide.emplace(options.guide, report).tellCoverage(arraysOf(*mesh), report);
+        float const tolerance = toleranceOf(options, *mesh, guide);
         Object result = *mesh;
-        runWithin(options.maxMemory, report, [&] { refine(tolerance, result); });
+        runWithin(options.maxMemory, report, [&] { refine(guide, tolerance, result); });
 
         std::vector<std::string> const dropped = explainDropped(*mesh, result, report);
         Json const after = describeMesh(result, analyseTopology(arraysOf(result)));
@@ -211,9 +234,14 @@ all other properties are dropped, with a warning that says why.
 
 Levels: one level divides edges by 1.73 and makes 3 times as many faces, two levels divide edges by 3.
 Where all faces are of the size s (the longest side of their box), a tolerance of s/2 leaves them, s/3.46
-gives one level, s/6 two, s/10.4 three and s/18 four.)",
+gives one level, s/6 two, s/10.4 three and s/18 four.
+
+A volume paints where the mesh gets fine: the tolerance of a face is multiplied by the value of the grid
+at the face's second corner. Faces are left alone where that is not above 0. "modeling make-volume" makes
+such files.)",
         "  modeling subdivide coarse.obj fine.ply --relative 0.01\n"
-        "  modeling subdivide part.stl fine.stl --tolerance 0.25 --max-memory 4GB"};
+        "  modeling subdivide part.stl fine.stl --tolerance 0.25 --max-memory 4GB\n"
+        "  modeling subdivide head.obj fine.obj --relative 0.01 --volume guide.vdb --grid scale"};
     CLI::App& command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
     addFile("OUT", "Mesh to write; may be IN", options->out, command);
@@ -224,6 +252,7 @@ gives one level, s/6 two, s/10.4 three and s/18 four.)",
         ->check(isPositive());
     size.require_option(1);
     command.add_flag("--triangulate", options->triangulates, "Cut faces with more corners into triangles first");
+    addGuideOptions(options->guide, command);
     command.add_option("--max-memory", options->maxMemory, "Stop when the program takes more: 500MB, 4GB")
         ->type_name("")
         ->transform(CLI::AsSizeValue(true));

@@ -240,9 +240,49 @@ TEST_F(Commands, SubdivideCarriesWhatItCanAndSaysWhatItDrops)
     EXPECT_TRUE(areEqual("tetrahedron.ply", "out.ply"));
 }
 
+TEST_F(Commands, MakeVolumeGuidesSubdivide)
+{
+    copySamples({"bunny.obj"});
+    json const made =
+        runForJson("make-volume bunny.obj guide.vdb --distance-to -3 7.5 0 --from 0.25 --to 3 --voxels 60");
+    EXPECT_EQ(at(made, {"exitCode", "output", "volume/smallestValue", "volume/largestValue"}),
+        json({0, "guide.vdb", 0.25, 3}));
+    run("make-volume bunny.obj again.vdb --distance-to -3 7.5 0 --from 0.25 --to 3 --voxels 60 --threads 1");
+    EXPECT_TRUE(areEqual("again.vdb", "guide.vdb"));
+
+    run("subdivide bunny.obj plain.ply --relative 0.01");
+    json const guided = runForJson("subdivide bunny.obj guided.ply --relative 0.01 --volume guide.vdb --grid scale");
+    json volume = made["volume"];
+    volume["coveredFaces"] = 3674;
+    EXPECT_EQ(guided["volume"], volume);
+    EXPECT_EQ(guided["inputs"][1]["format"], "OpenVDB");
+    // At the head there are more faces than without the volume, far from there fewer.
+    auto const facesIn = [&](char const* mesh, char const* box) {
+        return runForJson("delete-faces " + std::string(mesh) + " part.ply --box " + box)["picked"].get<int>();
+    };
+    EXPECT_GT(facesIn("guided.ply", "-5 6 -4 -1 9 4"), 2 * facesIn("plain.ply", "-5 6 -4 -1 9 4"));
+    EXPECT_LT(facesIn("guided.ply", "2 -9 -9 9 9 9"), facesIn("plain.ply", "2 -9 -9 9 9 9"));
+    run("subdivide bunny.obj again.ply --relative 0.01 --volume guide.vdb --tile-side 5 --threads 1");
+    EXPECT_TRUE(areEqual("again.ply", "guided.ply"));
+
+    store(folder / "square.ply",
+        plyOf(4,
+            "property short heat\nelement face 1\nproperty list uchar int vertex_indices\nend_header\n"
+            "0 0 0 1\n9 0 0 4\n9 9 0 4\n0 9 0 1\n4 0 1 2 3\n"));
+    json const heat =
+        runForJson("make-volume square.ply heat.vdb --attribute heat --voxel-size 1 --band 1 --grid heat");
+    EXPECT_EQ(heat["volume"],
+        json({{"grid", "heat"}, {"activeVoxels", 3 * 100 + 4 * 10}, {"voxelSize", 1}, {"smallestValue", 1},
+            {"largestValue", 4}, {"background", 1}}));
+    Result const away = run("subdivide bunny.obj out.ply --relative 0.1 --volume heat.vdb --min-value 2");
+    EXPECT_EQ(away.exitCode, 0);
+    EXPECT_THAT(away.output, HasSubstr("values from 2 to 4, background 2\n"));
+}
+
 TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
 {
-    copySamples({"cylinder.obj", "sphere-with-hole.stl", "cube.ply", "spider.obj"});
+    copySamples({"cylinder.obj", "sphere-with-hole.stl", "cube.ply", "spider.obj", "bunny.obj"});
+    ASSERT_EQ(run("make-volume bunny.obj tiny.vdb --distance-to 0 0 0 --from 1e-9 --to 1 --voxels 9").exitCode, 0);
     store(folder / "lines.obj", "v 0 0 0\nv 1 0 0\nl 1 2\n");
     store(folder / "cloud.ply", kCloud);
     store(folder / "list", "0 # the first\n 1 2 3 4 5 6 -1\n");
@@ -291,6 +331,14 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"delete-points cloud.ply out.obj --box 0 0 0 1 1", 2, "6 required"},
         {"delete-points cloud.ply out.obj --box 0 0 0 1 1 1 --indices list", 2, "Exactly 1"},
         {"add-points cloud.ply cube.ply out.obj --tag sPointPosition", 5, "would take the place of the points"},
+        {"subdivide bunny.obj out.obj --relative 0.1 --grid scale", 2, "--volume"},
+        {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb --grid no", 5, "There are: \"scale\" (float)"},
+        {"subdivide bunny.obj out.obj --relative 0.1 --volume bunny.obj", 3, "it is no OpenVDB file"},
+        {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb", 5, "times the smallest positive value"},
+        {"make-volume bunny.obj out.obj --distance-to 0 0 0", 3, "has to end in .vdb"},
+        {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --from 1", 2, "--to"},
+        {"make-volume bunny.obj out.vdb --attribute heat", 5, "\"heat\""},
+        {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --voxel-size 1e-9", 5, "too small"},
         {"", 2, "subcommand"},
         {"remove-splinters a b", 2, "There is no command remove-splinters"},
     };
@@ -317,8 +365,8 @@ TEST_F(Commands, InfoAndValidateTellAboutFiles)
     EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (0.1, 0, 0)"));
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
-    for (char const* const command :
-        {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "smooth ", "remove-slivers ", "stitch "})
+    for (char const* const command : {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "make-volume ",
+             "smooth ", "remove-slivers ", "stitch "})
         EXPECT_EQ(run(command + std::string("--help")).exitCode, 0) << command;
     EXPECT_EQ(run("--version").exitCode, 0);
 }

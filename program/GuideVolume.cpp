@@ -1,0 +1,264 @@
+#include "GuideVolume.h"
+
+#include "Failure.h"
+#include "files/VdbFile.h"
+
+#include <Modeling/subdivideByVolume.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+
+namespace ModelingProgram {
+
+using namespace TSR::TileTree3D;
+using Tessara::Math::float3;
+
+namespace {
+
+    [[noreturn]] void refuse(std::string const& sentence)
+    {
+        throw Failure(ExitCode::Refused, sentence);
+    }
+
+    std::string listOf(std::vector<VdbGrid> const& grids)
+    {
+        std::vector<std::string> texts;
+        for (VdbGrid const& grid : grids)
+            texts.push_back(fmt::format("\"{}\" ({})", grid.name, grid.type));
+        return texts.empty() ? "none" : fmt::format("{}", fmt::join(texts, ", "));
+    }
+
+    std::size_t chooseGrid(GuideOptions const& options, std::vector<VdbGrid> const& grids)
+    {
+        auto const isFloat = [](VdbGrid const& grid) { return grid.type == "float"; };
+        if (options.grid.empty()) {
+            auto const only = std::find_if(grids.begin(), grids.end(), isFloat);
+            if (std::count_if(grids.begin(), grids.end(), isFloat) != 1)
+                refuse(fmt::format("--grid has to say which float grid of {} to take. There are: {}",
+                    options.file.string(), listOf(grids)));
+            return static_cast<std::size_t>(only - grids.begin());
+        }
+        auto const named =
+            std::find_if(grids.begin(), grids.end(), [&](VdbGrid const& grid) { return grid.name == options.grid; });
+        if (named == grids.end())
+            refuse(fmt::format(
+                "there is no grid \"{}\" in {}. There are: {}", options.grid, options.file.string(), listOf(grids)));
+        if (!isFloat(*named))
+            refuse(fmt::format("grid \"{}\" in {} is a {} grid, and a float grid is needed. There are: {}",
+                options.grid, options.file.string(), named->type, listOf(grids)));
+        return static_cast<std::size_t>(named - grids.begin());
+    }
+
+    template <class Visit> void forEachActiveValue(SparseVolume& volume, Visit const& visit)
+    {
+        for (Voxel& voxel : volume.voxels)
+            visit(voxel.value);
+        for (ConstantBox& box : volume.boxes)
+            visit(box.value);
+    }
+
+    struct Range {
+        float least = std::numeric_limits<float>::infinity();
+        float most = -std::numeric_limits<float>::infinity();
+        std::optional<float> leastPositive;
+
+        void add(float value)
+        {
+            least = std::min(least, value);
+            most = std::max(most, value);
+            if (value > 0)
+                leastPositive = std::min(value, leastPositive.value_or(value));
+        }
+    };
+
+    void warnOfSigns(Range const& all, std::string const& grid, Report& report)
+    {
+        if (all.least > 0)
+            return;
+        if (!all.leastPositive)
+            report.warn(fmt::format("no value of grid \"{}\" is above 0, so that no face is refined", grid));
+        else
+            report.warn(fmt::format("grid \"{}\" has values above 0 and others, its background included. Faces are "
+                                    "left alone where the value "
+                                    "is not above 0, and get finer and finer towards there. --min-value ends that.",
+                grid));
+    }
+
+    void shiftIndex(int& index, double by, SparseVolume const& volume)
+    {
+        double const shifted = index + by;
+        if (!(shifted > std::numeric_limits<int>::min() && shifted < std::numeric_limits<int>::max()))
+            refuse(fmt::format(
+                "grid \"{}\" lies {} voxels from the origin, which is more than 32 bits can count", volume.name, by));
+        index = static_cast<int>(shifted);
+    }
+
+}
+
+template <class Traits> GuideVolume::Tiles<Traits>::Tiles(VolumeSource const& source)
+    : volume(buildVolume<Traits>(source))
+    , paddedChannel(makeHaloChannel(volume))
+{
+}
+
+GuideVolume::GuideVolume(GuideOptions const& options, Report& report)
+{
+    std::size_t const grid = chooseGrid(options, listVdbGrids(options.file));
+    SparseVolume volume = readVdbGrid(options.file, grid);
+    report.document["inputs"].push_back({{"file", options.file.string()}, {"format", "OpenVDB"}, {"kind", "volume"}});
+    if (options.leastValue) {
+        auto const raise = [&](float& value) { value = std::max(value, *options.leastValue); };
+        raise(volume.background);
+        forEachActiveValue(volume, raise);
+    }
+    describe(volume, report);
+    placeOnLattice(volume);
+    build(volume, options.tileSide);
+}
+
+void GuideVolume::describe(SparseVolume& volume, Report& report)
+{
+    Range active;
+    forEachActiveValue(volume, [&](float value) { active.add(value); });
+    Range all = active;
+    all.add(volume.background);
+    grid_ = volume.name;
+    background_ = volume.background;
+    smallestPositive_ = all.leastPositive;
+    auto const voxelSize = static_cast<float>(volume.voxelSize);
+    report.document["volume"] = {{"grid", volume.name}, {"activeVoxels", volume.activeCount()},
+        {"voxelSize", numberOf(voxelSize)}, {"smallestValue", numberOf(active.least)},
+        {"largestValue", numberOf(active.most)}, {"background", numberOf(volume.background)}};
+    report.text += fmt::format(
+        "grid \"{}\": {} of size {}", volume.name, countOf(volume.activeCount(), "active voxel"), voxelSize);
+    if (volume.activeCount() != 0)
+        report.text += fmt::format(", values from {} to {}", active.least, active.most);
+    report.text += fmt::format(", background {}\n", volume.background);
+    warnOfSigns(all, volume.name, report);
+}
+
+void GuideVolume::placeOnLattice(SparseVolume& volume)
+{
+    scale_ = static_cast<float>(1 / volume.voxelSize);
+    if (!std::isnormal(scale_) || !std::isnormal(static_cast<float>(volume.voxelSize)))
+        refuse(fmt::format("the voxels of grid \"{}\" have a size of {}, which single precision cannot hold",
+            volume.name, volume.voxelSize));
+    double whole[3];
+    float* const shifts[3] = {&shift_.x, &shift_.y, &shift_.z};
+    for (std::size_t axis = 0; axis != 3; ++axis) {
+        whole[axis] = std::round(volume.translation[axis] / volume.voxelSize);
+        *shifts[axis] = static_cast<float>(volume.translation[axis] - whole[axis] * volume.voxelSize);
+    }
+    auto const move = [&](int& i, int& j, int& k) {
+        shiftIndex(i, whole[0], volume);
+        shiftIndex(j, whole[1], volume);
+        shiftIndex(k, whole[2], volume);
+    };
+    for (Voxel& voxel : volume.voxels)
+        move(voxel.i, voxel.j, voxel.k);
+    for (ConstantBox& box : volume.boxes) {
+        move(box.first.i, box.first.j, box.first.k);
+        move(box.end.i, box.end.j, box.end.k);
+    }
+}
+
+void GuideVolume::build(SparseVolume const& volume, int tileSide)
+{
+    auto const buildAs = [&]<class Traits>(Traits) {
+        VoxelList const voxels{Traits::kUnitDepth, volume.voxels};
+        VolumeSource source;
+        source.background = volume.background;
+        source.depth = Traits::kUnitDepth;
+        source.boxes = volume.boxes;
+        source.lists = {&voxels, 1};
+        tiles_.emplace<Tiles<Traits>>(source);
+    };
+    if (tileSide == Traits5::kSide)
+        buildAs(Traits5());
+    else
+        buildAs(Traits2());
+}
+
+float3 GuideVolume::toLattice(float3 const& point) const
+{
+    return {point.x - shift_.x, point.y - shift_.y, point.z - shift_.z};
+}
+
+template <class Traits> LinearSampler<Traits> GuideVolume::samplerOf(Tiles<Traits> const& tiles, float background) const
+{
+    LinearSamplerSettings settings;
+    settings.scale = scale_;
+    settings.background = background;
+    return {tiles.volume.container, tiles.volume.channel, tiles.volume.topology, settings, &tiles.paddedChannel};
+}
+
+template <class Visit> void GuideVolume::visitTiles(Visit const& visit) const
+{
+    if (auto const* const fours = std::get_if<Tiles<Traits2>>(&tiles_))
+        visit(*fours);
+    else
+        visit(std::get<Tiles<Traits5>>(tiles_));
+}
+
+void GuideVolume::tellCoverage(MeshArrays const& mesh, Report& report) const
+{
+    constexpr int kWorldSpace = 2;
+    std::uint64_t covered = 0;
+    visitTiles([&]<class Traits>(Tiles<Traits> const& tiles) {
+        // No number stands for places outside all tiles.
+        LinearSampler<Traits> sampler = samplerOf(tiles, std::numeric_limits<float>::quiet_NaN());
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+            float3 const& decisive = (*mesh.positions)[mesh.corners(face)[1]];
+            covered += std::isnan(sampler.sample(toLattice(decisive), Traits::kDeepest, kWorldSpace)) ? 0u : 1u;
+        }
+    });
+    report.document["volume"]["coveredFaces"] = covered;
+    report.text += fmt::format("{} of {} lie in it\n\n", groupDigits(covered), countOf(mesh.faceCount(), "face"));
+    if (covered == 0)
+        report.warn(fmt::format(
+            "no face lies in the volume, so that all take the background of grid \"{}\", {}", grid_, background_));
+}
+
+void GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
+{
+    using namespace Tessara::Geometry;
+    // The sampler's offset of voxels would read beyond the neighbours of a tile: the mesh moves instead, by at most half a
+    // voxel, and back.
+    auto const movePoints = [&](float sign) {
+        if (shift_.x == 0 && shift_.y == 0 && shift_.z == 0)
+            return;
+        Orvan::Array<float3> positions = *dataOf<float3>(mesh, sPointPosition);
+        for (float3& p : positions)
+            p = {p.x + sign * shift_.x, p.y + sign * shift_.y, p.z + sign * shift_.z};
+        addDataProperty(sPointPosition, sPointComp, positions, mesh);
+    };
+    movePoints(-1);
+    visitTiles([&](auto const& tiles) { Geometry::Mesh::subdivide(samplerOf(tiles, background_), mesh, tolerance); });
+    movePoints(1);
+}
+
+void addGuideOptions(GuideOptions& options, CLI::App& command)
+{
+    CLI::Option* const file =
+        command.add_option("--volume", options.file, "Scale the tolerance by a float grid of this OpenVDB file")
+            ->type_name("FILE");
+    command.add_option("--grid", options.grid, "Which grid; can be left out where there is one float grid only")
+        ->type_name("NAME")
+        ->needs(file);
+    command.add_option("--min-value", options.leastValue, "Take this value for smaller ones of the grid")
+        ->type_name("V")
+        ->needs(file);
+    command.add_option("--tile-side", options.tileSide, "Voxels along a tile of the library's volume")
+        ->type_name("")
+        ->check(CLI::IsMember({4, 5}))
+        ->capture_default_str()
+        ->needs(file);
+}
+
+}

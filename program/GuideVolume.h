@@ -1,0 +1,72 @@
+#pragma once
+
+#include "MeshTopology.h"
+#include "Report.h"
+
+#include <CLI/CLI.hpp>
+#include <Modeling/VoxelSampler.h>
+#include <TessaraGeometryVolume/VolumeBuilder.h>
+#include <TessaraObject/Object.h>
+
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <variant>
+
+namespace ModelingProgram {
+
+struct SparseVolume;
+
+/// The volume that a command line asks for.
+struct GuideOptions {
+    std::filesystem::path file; // empty for none
+    std::string grid; // empty for the only float grid there is
+    int tileSide = 4; // voxels along a tile
+    std::optional<float> leastValue; // stands for those below it
+};
+
+/// Adds the options to a command.
+void addGuideOptions(GuideOptions& options, CLI::App& command);
+
+/// A grid of an OpenVDB file that scales the tolerance of a refinement.
+class GuideVolume {
+public:
+    /// Reads the grid, and tells what is in it. A value that is not above 0 leaves faces alone, with a warning.
+    /// \throws Failure, FileError  where there is no such grid, or the library cannot hold it
+    GuideVolume(GuideOptions const& options, Report& report);
+
+    std::string const& grid() const { return grid_; }
+    /// Nothing where no value is above 0.
+    std::optional<float> smallestPositiveValue() const { return smallestPositive_; }
+
+    /// Tells how much of the mesh the volume covers.
+    void tellCoverage(MeshArrays const& mesh, Report& report) const;
+
+    /// Refines by a tolerance that the volume scales.
+    void refine(float tolerance, Tessara::Object& mesh) const;
+
+private:
+    template <class Traits> struct Tiles {
+        explicit Tiles(TSR::TileTree3D::VolumeSource const& source);
+
+        TSR::TileTree3D::Volume<Traits> volume;
+        TSR::TileTree3D::Channel<Traits, float> paddedChannel;
+    };
+
+    void describe(SparseVolume& volume, Report& report);
+    void placeOnLattice(SparseVolume& volume);
+    void build(SparseVolume const& volume, int tileSide);
+    template <class Traits>
+    TSR::TileTree3D::LinearSampler<Traits> samplerOf(Tiles<Traits> const& tiles, float background) const;
+    template <class Visit> void visitTiles(Visit const& visit) const;
+    Tessara::Math::float3 toLattice(Tessara::Math::float3 const& point) const;
+
+    std::string grid_;
+    float background_ = 0;
+    std::optional<float> smallestPositive_;
+    float scale_ = 1; // voxels a unit of length
+    Tessara::Math::float3 shift_{0, 0, 0}; // of the voxels from whole multiples of their size
+    std::variant<std::monostate, Tiles<TSR::TileTree3D::Traits2>, Tiles<TSR::TileTree3D::Traits5>> tiles_;
+};
+
+}

@@ -1,0 +1,196 @@
+#include "Commands.h"
+#include "Failure.h"
+#include "Geometry.h"
+#include "MeshRequirements.h"
+#include "MeshTopology.h"
+#include "Operation.h"
+#include "SurfaceBand.h"
+#include "files/VdbFile.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <cmath>
+#include <memory>
+#include <optional>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using Tessara::Object;
+
+    struct Options {
+        std::filesystem::path in;
+        std::filesystem::path out;
+        std::string attribute;
+        std::vector<double> distanceTo; // three coordinates
+        std::optional<float> from;
+        std::optional<float> to;
+        std::optional<double> voxelSize;
+        unsigned int voxels = 100; // along the longest side of the mesh
+        double halfWidth = 3; // voxels
+        float background = 1;
+        std::string grid = "scale";
+    };
+
+    void requireVdb(std::filesystem::path const& file)
+    {
+        if (file.extension() != ".vdb")
+            throw Failure(ExitCode::File, fmt::format("cannot write {}: the name has to end in .vdb", file.string()));
+        requirePlace(file);
+    }
+
+    void requireFiniteSurface(MeshArrays const& mesh, std::filesystem::path const& file)
+    {
+        if (mesh.faceCount() == 0)
+            throw Failure(ExitCode::Refused, fmt::format("there are no faces in {}", file.string()));
+        auto const isFinite = [](float3 const& p) {
+            return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
+        };
+        if (!std::all_of(mesh.positions->begin(), mesh.positions->end(), isFinite))
+            throw Failure(ExitCode::Refused,
+                fmt::format("a point of {} lies nowhere: a coordinate is not finite", file.string()));
+    }
+
+    SurfaceValue surfaceValueOf(Options const& options, Object const& mesh)
+    {
+        SurfaceValue value;
+        if (!options.distanceTo.empty()) {
+            value.distanceTo = {options.distanceTo[0], options.distanceTo[1], options.distanceTo[2]};
+            return value;
+        }
+        value.pointNumbers = pointNumbers(mesh, options.attribute, options.in);
+        if (!std::all_of(
+                value.pointNumbers.begin(), value.pointNumbers.end(), [](float n) { return std::isfinite(n); }))
+            throw Failure(ExitCode::Refused, fmt::format("the values of \"{}\" are not all finite", options.attribute));
+        return value;
+    }
+
+    double voxelSizeOf(Options const& options, Object const& mesh)
+    {
+        if (options.voxelSize)
+            return *options.voxelSize;
+        BoundingBox const box = boundingBoxOf(mesh).value_or(BoundingBox{});
+        double const longest =
+            std::max({double{box.max.x} - box.min.x, double{box.max.y} - box.min.y, double{box.max.z} - box.min.z});
+        if (!(longest > 0))
+            throw Failure(ExitCode::Refused,
+                fmt::format("all points of {} lie in one place: --voxel-size has to say how large voxels are",
+                    options.in.string()));
+        return longest / options.voxels;
+    }
+
+    using Range = std::pair<float, float>;
+
+    Range rangeOf(std::vector<TSR::TileTree3D::Voxel> const& voxels)
+    {
+        auto const [least, most] = std::minmax_element(
+            voxels.begin(), voxels.end(), [](auto const& a, auto const& b) { return a.value < b.value; });
+        return least == voxels.end() ? Range() : Range(least->value, most->value);
+    }
+
+    /// The least value becomes `from`, the largest `to`, and those between what lies between in proportion.
+    void mapValues(float from, float to, std::vector<TSR::TileTree3D::Voxel>& voxels)
+    {
+        auto const [least, most] = rangeOf(voxels);
+        double const width = double{most} - least;
+        for (auto& voxel : voxels) {
+            double const t = width > 0 ? (double{voxel.value} - least) / width : 0;
+            voxel.value = static_cast<float>((1 - t) * from + t * to);
+        }
+    }
+
+    void describe(SparseVolume const& volume, Report& report)
+    {
+        auto const [least, most] = rangeOf(volume.voxels);
+        auto const voxelSize = static_cast<float>(volume.voxelSize);
+        report.document["volume"] = {{"grid", volume.name}, {"activeVoxels", volume.activeCount()},
+            {"voxelSize", numberOf(voxelSize)}, {"smallestValue", numberOf(least)}, {"largestValue", numberOf(most)},
+            {"background", numberOf(volume.background)}};
+        report.text += fmt::format("grid \"{}\": {} of size {}, values from {} to {}, background {}\n", volume.name,
+            countOf(volume.activeCount(), "active voxel"), voxelSize, least, most, volume.background);
+    }
+
+    void makeVolume(Options const& options, Report& report)
+    {
+        requireVdb(options.out);
+        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
+        requireMesh(*mesh, "make-volume", options.in);
+        MeshArrays const arrays = arraysOf(*mesh);
+        requireFiniteSurface(arrays, options.in);
+        SurfaceValue const value = surfaceValueOf(options, *mesh);
+
+        SparseVolume volume;
+        volume.name = options.grid;
+        volume.voxelSize = voxelSizeOf(options, *mesh);
+        volume.background = options.background;
+        runOperation(report, [&] {
+            volume.voxels = voxelsAround(arrays, value, volume.voxelSize, options.halfWidth);
+            if (options.from)
+                mapValues(*options.from, *options.to, volume.voxels);
+        });
+        describe(volume, report);
+        writeVdbFile(volume, options.out);
+        report.document["output"] = options.out.string();
+        reportRun(report);
+    }
+
+    void addValueOptions(Options& options, CLI::App& command)
+    {
+        CLI::Option_group& value = *command.add_option_group("Values", "one of these is required");
+        value.add_option("--attribute", options.attribute, "The numbers of points, blended over faces")
+            ->type_name("NAME");
+        value.add_option("--distance-to", options.distanceTo, "The distance to the place X Y Z")
+            ->type_name("NUMBER")
+            ->expected(3)
+            ->allow_extra_args(false); // positional arguments may follow
+        value.require_option(1);
+        CLI::Option* const from =
+            command.add_option("--from", options.from, "What the smallest of these values becomes")->type_name("V");
+        CLI::Option* const to =
+            command.add_option("--to", options.to, "What the largest becomes; others lie between in proportion")
+                ->type_name("V");
+        from->needs(to);
+        to->needs(from);
+        command.add_option("--background", options.background, "The value everywhere else")
+            ->type_name("V")
+            ->capture_default_str();
+    }
+
+}
+
+void addMakeVolume(CLI::App& program, Invocation& invocation)
+{
+    auto const options = std::make_shared<Options>();
+    constexpr CommandHelp kHelp = {"make-volume", "Make a volume around a mesh that guides its refinement",
+        R"(The volume is a float grid of an OpenVDB file, with voxels in a band around the surface. Each voxel
+takes what holds at the place of the surface that is nearest to it: a number of the points, blended over
+the face, or the distance to a place. Faces may have any number of corners.
+
+"modeling subdivide --volume" multiplies its tolerance by these values: small ones make fine faces.)",
+        "  modeling make-volume head.obj guide.vdb --distance-to 0 1.7 0.1 --from 0.25 --to 2\n"
+        "  modeling make-volume scan.ply guide.vdb --attribute quality --voxels 200 --band 5"};
+    CLI::App& command = addCommand(kHelp, program, invocation);
+    addFile("MESH", "Mesh to read", options->in, command);
+    addFile("OUT", "OpenVDB file to write", options->out, command);
+    addValueOptions(*options, command);
+    CLI::Option* const voxelSize =
+        command.add_option("--voxel-size", options->voxelSize, "Side of a voxel in model units")
+            ->type_name("S")
+            ->check(CLI::Range(1e-30, 1e30).description("> 0"));
+    command
+        .add_option("--voxels", options->voxels, "Voxels along the longest side of the mesh's box, in place of a size")
+        ->type_name("N")
+        ->check(CLI::Range(1, 1000000).description(""))
+        ->capture_default_str()
+        ->excludes(voxelSize);
+    command.add_option("--band", options->halfWidth, "How far from the surface there are voxels, in voxels")
+        ->type_name("N")
+        ->check(CLI::Range(1.0, 1000.0).description("1..1000"))
+        ->capture_default_str();
+    command.add_option("--grid", options->grid, "Name of the grid")->type_name("NAME")->capture_default_str();
+    onSelected(command, invocation, [options](Report& report) { makeVolume(*options, report); });
+}
+
+}
