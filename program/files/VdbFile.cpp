@@ -1,191 +1,22 @@
 #include "VdbFile.h"
 
-#include "OpenVdb.h"
 #include "OutputFile.h"
+#include "VdbCodec.h"
 #include "VdbOutline.h"
 
-#include <openvdb/io/Archive.h>
-#include <openvdb/io/GridDescriptor.h>
-
-#include <algorithm>
-#include <cmath>
-#include <cstdio>
-#include <istream>
-#include <limits>
-#include <sstream>
-#include <streambuf>
+#include <dlfcn.h>
 
 namespace ModelingProgram {
 
 namespace {
 
-    [[noreturn]] void refuse(std::filesystem::path const& file, std::string const& why)
+    template <class Function> Function* codec(char const* name)
     {
-        throw FileError(file.string() + " cannot be read: " + why);
-    }
-
-    constexpr double kSameSize = 1e-9; // what rounding may make of equal sizes of voxels, as a fraction
-
-    void initializeOpenVdb()
-    {
-        static bool const isDone = [] {
-            openvdb::initialize();
-            // Types whose sizes the file could contradict are read as bytes.
-            openvdb::Metadata::clearRegistry();
-            openvdb::BoolMetadata::registerType();
-            openvdb::StringMetadata::registerType();
-            return true;
-        }();
-        static_cast<void>(isDone);
-    }
-
-    /// Bytes in memory, as a stream takes them.
-    class ByteSource final : public std::streambuf {
-    public:
-        explicit ByteSource(InputFile const& file)
-        {
-            char* const first = file.bytes.get();
-            setg(first, first, first + file.size);
-        }
-
-    private:
-        pos_type seekoff(off_type offset, std::ios_base::seekdir from, std::ios_base::openmode) override
-        {
-            off_type const start = from == std::ios_base::beg ? 0
-                : from == std::ios_base::cur                  ? gptr() - eback()
-                                                              : egptr() - eback();
-            off_type const target = start + offset;
-            if (target < 0 || target > egptr() - eback())
-                return pos_type(off_type(-1));
-            setg(eback(), eback() + target, egptr());
-            return pos_type(target);
-        }
-
-        pos_type seekpos(pos_type position, std::ios_base::openmode mode) override
-        {
-            return seekoff(off_type(position), std::ios_base::beg, mode);
-        }
-    };
-
-    class GridArchive final : public openvdb::io::Archive {
-    public:
-        openvdb::FloatGrid::Ptr read(
-            InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all)
-        {
-            ByteSource source(file);
-            std::istream stream(&source);
-            stream.exceptions(std::ios::failbit | std::ios::badbit | std::ios::eofbit);
-            readHeader(stream);
-            setFormatVersion(stream);
-            setLibraryVersion(stream);
-            setDataCompression(stream);
-            openvdb::FloatGrid::Ptr const grid = readAt(entry, stream);
-            for (VdbGridEntry const& other : all)
-                if (!entry.treeOwner.empty() && other.uniqueName == entry.treeOwner)
-                    grid->setTree(readAt(other, stream)->treePtr());
-            return grid;
-        }
-
-        std::string write(openvdb::FloatGrid::ConstPtr const& grid) const
-        {
-            std::ostringstream stream(std::ios::binary);
-            stream.exceptions(std::ios::failbit | std::ios::badbit);
-            Archive::write(stream, openvdb::GridCPtrVec{grid}, true);
-            return std::move(stream).str();
-        }
-
-    private:
-        static openvdb::FloatGrid::Ptr readAt(VdbGridEntry const& entry, std::istream& stream)
-        {
-            stream.seekg(static_cast<std::streamoff>(entry.descriptor));
-            openvdb::io::GridDescriptor descriptor;
-            openvdb::GridBase::Ptr const grid = descriptor.read(stream);
-            descriptor.seekToGrid(stream);
-            readGrid(grid, descriptor, stream);
-            return openvdb::gridPtrCast<openvdb::FloatGrid>(grid);
-        }
-    };
-
-    /// Refuses what is more than cubes along the axes.
-    void takeTransform(
-        openvdb::math::Transform const& transform, std::filesystem::path const& file, SparseVolume& volume)
-    {
-        std::string const grid = "grid \"" + volume.name + "\"";
-        openvdb::Mat4d const m = transform.baseMap()->getAffineMap()->getMat4(); // translation in the last row
-        double const size = m(0, 0);
-        for (int row = 0; row != 4; ++row)
-            for (int column = 0; column != 3; ++column)
-                if (!std::isfinite(m(row, column)))
-                    refuse(file, grid + " has a transform that is not finite");
-        for (int row = 0; row != 3; ++row)
-            for (int column = 0; column != 3; ++column)
-                if (row != column && std::abs(m(row, column)) > kSameSize * std::abs(size))
-                    refuse(file, grid + " is rotated or sheared. Resample it along the axes first");
-        if (!(size > 0 && m(1, 1) > 0 && m(2, 2) > 0))
-            refuse(file,
-                grid + " is mirrored, or its voxels have no size. Resample it to voxels of a positive size first");
-        if (std::abs(m(1, 1) - size) > kSameSize * size || std::abs(m(2, 2) - size) > kSameSize * size)
-            refuse(file, grid + " has voxels that are no cubes. Resample it to cubic voxels first");
-        volume.voxelSize = size;
-        volume.translation = {m(3, 0), m(3, 1), m(3, 2)};
-    }
-
-    void takeValues(openvdb::FloatGrid const& grid, std::filesystem::path const& file, SparseVolume& volume)
-    {
-        volume.background = grid.background();
-        if (!std::isfinite(volume.background))
-            refuse(file, "the background of grid \"" + volume.name + "\" is not a finite number");
-        std::size_t voxelCount = 0;
-        for (auto leaf = grid.tree().cbeginLeaf(); leaf; ++leaf)
-            voxelCount += leaf->onVoxelCount();
-        volume.voxels.reserve(voxelCount);
-        for (auto at = grid.cbeginValueOn(); at; ++at) {
-            openvdb::CoordBBox const box = at.getBoundingBox();
-            openvdb::Coord const first = box.min(), last = box.max();
-            float const value = *at;
-            if (!std::isfinite(value))
-                refuse(file,
-                    "voxel (" + std::to_string(first[0]) + ", " + std::to_string(first[1]) + ", "
-                        + std::to_string(first[2]) + ") of grid \"" + volume.name + "\" holds no finite number");
-            if (at.isVoxelValue())
-                volume.voxels.push_back({first[0], first[1], first[2], value});
-            else if (std::max({last[0], last[1], last[2]}) == std::numeric_limits<int>::max())
-                refuse(file, "grid \"" + volume.name + "\" reaches beyond what indices of 32 bits can count");
-            else
-                volume.boxes.push_back(
-                    {{first[0], first[1], first[2]}, {last[0] + 1, last[1] + 1, last[2] + 1}, value});
-        }
-    }
-
-    openvdb::FloatGrid::Ptr makeGrid(SparseVolume const& volume)
-    {
-        auto const grid = openvdb::FloatGrid::create(volume.background);
-        grid->setName(volume.name);
-        auto const transform = openvdb::math::Transform::createLinearTransform(volume.voxelSize);
-        transform->postTranslate({volume.translation[0], volume.translation[1], volume.translation[2]});
-        grid->setTransform(transform);
-        for (auto const& [first, end, value] : volume.boxes)
-            grid->sparseFill({{first.i, first.j, first.k}, {end.i - 1, end.j - 1, end.k - 1}}, value);
-        auto accessor = grid->getAccessor();
-        for (auto const& [i, j, k, value] : volume.voxels)
-            accessor.setValueOn({i, j, k}, value);
-        return grid;
-    }
-
-    /// Puts a number that follows from the content in the place of the random one that the file is known by.
-    void identifyByContent(std::string& file)
-    {
-        constexpr std::size_t kIdentityAt = 21, kIdentityBytes = 36;
-        std::memset(file.data() + kIdentityAt, '0', kIdentityBytes);
-        std::uint64_t hashes[2] = {0xcbf29ce484222325u, 0x84222325cbf29ce4u}; // FNV-1a
-        for (char const byte : file)
-            for (std::uint64_t& hash : hashes)
-                hash = (hash ^ static_cast<unsigned char>(byte)) * 0x100000001b3u;
-        char text[kIdentityBytes + 1];
-        std::snprintf(text, sizeof(text), "%08x-%04x-4%03x-8%03x-%012llx", static_cast<unsigned int>(hashes[0] >> 32),
-            static_cast<unsigned int>(hashes[0] >> 16 & 0xffff), static_cast<unsigned int>(hashes[0] & 0xfff),
-            static_cast<unsigned int>(hashes[1] >> 52), static_cast<unsigned long long>(hashes[1] & 0xffffffffffff));
-        std::memcpy(file.data() + kIdentityAt, text, kIdentityBytes);
+        static void* const library = ::dlopen(kVdbCodec, RTLD_NOW | RTLD_LOCAL); // stays until the program ends
+        void* const symbol = library ? ::dlsym(library, name) : nullptr;
+        if (!symbol)
+            throw FileError(std::string("OpenVDB files can be neither read nor written: ") + ::dlerror());
+        return reinterpret_cast<Function*>(symbol);
     }
 
 }
@@ -213,38 +44,23 @@ SparseVolume readVdbGrid(std::filesystem::path const& file, std::size_t grid)
     InputFile const input(file);
     std::vector<VdbGridEntry> const entries = readVdbOutline(input);
     if (grid >= entries.size() || entries[grid].type != "float")
-        refuse(file, "there is no such float grid");
+        throw FileError(file.string() + " cannot be read: there is no such float grid");
     checkVdbFloatGrid(input, entries[grid], entries);
-    initializeOpenVdb();
     SparseVolume volume;
-    volume.name = entries[grid].name;
-    try {
-        auto const read = GridArchive().read(input, entries[grid], entries);
-        takeTransform(read->transform(), file, volume);
-        takeValues(*read, file, volume);
-    } catch (FileError const&) {
-        throw;
-    } catch (std::bad_alloc const&) {
-        throw;
-    } catch (std::exception const& error) { // OpenVDB's, and those of streams
-        refuse(file, "grid \"" + volume.name + "\" is broken: " + error.what());
-    }
+    codec<decltype(modelingReadVdb)>("modelingReadVdb")(input, entries[grid], entries, volume);
     return volume;
 }
 
 void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file)
 {
-    initializeOpenVdb();
     OutputFile out(file);
-    std::string content;
+    std::string bytes;
     try {
-        content = GridArchive().write(makeGrid(volume));
-    } catch (openvdb::Exception const& error) {
-        throw FileError(file.string() + " cannot be written: OpenVDB has no voxels of a size of "
-            + std::to_string(volume.voxelSize) + " (" + error.what() + ")");
+        codec<decltype(modelingWriteVdb)>("modelingWriteVdb")(volume, bytes);
+    } catch (FileError const& error) {
+        throw FileError(file.string() + " cannot be written: " + error.what());
     }
-    identifyByContent(content);
-    out << content;
+    out << bytes;
     out.commit();
 }
 
