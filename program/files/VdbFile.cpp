@@ -10,12 +10,25 @@ namespace ModelingProgram {
 
 namespace {
 
+    /// Stays until the program ends.
+    struct Codec {
+        Codec()
+            : library(::dlopen(kVdbCodec, RTLD_NOW | RTLD_LOCAL))
+        {
+            if (!library)
+                problem = ::dlerror();
+        }
+
+        void* library;
+        std::string problem;
+    };
+
     template <class Function> Function* codec(char const* name)
     {
-        static void* const library = ::dlopen(kVdbCodec, RTLD_NOW | RTLD_LOCAL); // stays until the program ends
-        void* const symbol = library ? ::dlsym(library, name) : nullptr;
+        static Codec const codec;
+        void* const symbol = codec.library ? ::dlsym(codec.library, name) : nullptr;
         if (!symbol)
-            throw FileError(std::string("OpenVDB files can be neither read nor written: ") + ::dlerror());
+            throw FileError("OpenVDB files can be neither read nor written: " + codec.problem);
         return reinterpret_cast<Function*>(symbol);
     }
 
