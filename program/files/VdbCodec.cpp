@@ -84,11 +84,11 @@ namespace {
             return grid;
         }
 
-        std::string write(openvdb::FloatGrid::ConstPtr const& grid) const
+        static std::string bytesOf(openvdb::FloatGrid::ConstPtr const& grid)
         {
             std::ostringstream stream(std::ios::binary);
             stream.exceptions(std::ios::failbit | std::ios::badbit);
-            Archive::write(stream, openvdb::GridCPtrVec{grid}, true);
+            GridArchive().Archive::write(stream, openvdb::GridCPtrVec{grid}, true);
             return std::move(stream).str();
         }
 
@@ -210,7 +210,7 @@ void modelingWriteVdb(SparseVolume const& volume, std::string& bytes)
 {
     initializeOpenVdb();
     try {
-        bytes = GridArchive().write(makeGrid(volume));
+        bytes = GridArchive::bytesOf(makeGrid(volume));
     } catch (openvdb::Exception const& error) {
         throw FileError(
             "OpenVDB has no voxels of a size of " + std::to_string(volume.voxelSize) + " (" + error.what() + ")");
