@@ -37,13 +37,13 @@ namespace {
 
 }
 
-std::int64_t peakBytesOf(std::function<void()> const& work)
+Memory memoryOf(std::function<void()> const& work)
 {
     taken = mostTaken = 0;
     isCounting = true;
     work();
     isCounting = false;
-    return mostTaken;
+    return {mostTaken, taken};
 }
 
 }

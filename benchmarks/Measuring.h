@@ -26,8 +26,17 @@ inline void copyBytes(benchmark::State& state, std::size_t bytes)
     state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
 }
 
-/// The most memory that the work has taken through `operator new` at one time, beyond what was taken before it.
-std::int64_t peakBytesOf(std::function<void()> const& work);
+/// What the work takes through `operator new`, beyond what was taken before it: the most at one time, and what is still
+/// taken when it is over.
+struct Memory {
+    std::int64_t peak;
+    std::int64_t kept;
+};
+Memory memoryOf(std::function<void()> const& work);
+inline std::int64_t peakBytesOf(std::function<void()> const& work)
+{
+    return memoryOf(work).peak;
+}
 
 /// Reports the wall time for each element.
 inline void countElements(benchmark::State& state, std::size_t elements)

@@ -68,7 +68,7 @@ std::size_t countIn(Inputs const& inputs, char const* component)
 
 using Merge = bool (*)(Inputs const&, Tessara::Object&, Orvan::RuntimeServices const*);
 
-void measure(benchmark::State& state, Inputs const& inputs, Merge merge, std::size_t elements, std::size_t resultBytes)
+void measure(benchmark::State& state, Inputs const& inputs, Merge merge, std::size_t elements)
 {
     for (auto _ : state) {
         auto output = Tessara::createObject();
@@ -79,8 +79,8 @@ void measure(benchmark::State& state, Inputs const& inputs, Merge merge, std::si
     }
     Benchmarks::countElements(state, elements);
     auto output = Tessara::createObject();
-    std::int64_t const peak = Benchmarks::peakBytesOf([&] { merge(inputs, *output, nullptr); });
-    state.counters["peak/result"] = static_cast<double>(peak) / static_cast<double>(resultBytes);
+    Benchmarks::Memory const memory = Benchmarks::memoryOf([&] { merge(inputs, *output, nullptr); });
+    state.counters["peak/result"] = static_cast<double>(memory.peak) / static_cast<double>(memory.kept);
 }
 
 std::size_t bytesOfMeshes(Inputs const& inputs)
@@ -91,14 +91,13 @@ std::size_t bytesOfMeshes(Inputs const& inputs)
 void meshes(benchmark::State& state)
 {
     Inputs const inputs = meshesOf(state);
-    measure(state, inputs, mergeMeshes, countIn(inputs, sFaceComp), bytesOfMeshes(inputs));
+    measure(state, inputs, mergeMeshes, countIn(inputs, sFaceComp));
 }
 
 void clouds(benchmark::State& state)
 {
     Inputs const inputs = cloudsOf(state);
-    std::size_t const points = countIn(inputs, sPointComp);
-    measure(state, inputs, mergePointClouds, points, 32 * points);
+    measure(state, inputs, mergePointClouds, countIn(inputs, sPointComp));
 }
 
 void copyMeshes(benchmark::State& state)

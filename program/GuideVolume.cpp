@@ -208,7 +208,6 @@ template <class Visit> void GuideVolume::visitTiles(Visit const& visit) const
 
 void GuideVolume::tellCoverage(MeshArrays const& mesh, Report& report) const
 {
-    constexpr int kWorldSpace = 2;
     std::uint64_t covered = 0;
     visitTiles([&]<class Traits>(Tiles<Traits> const& tiles) {
         // No number stands for places outside all tiles.

@@ -180,16 +180,12 @@ template <class Traits> void VoxelSampler<Traits, float, float3>::enterTile(floa
     voxelsPerUnit_ = Traits::voxelsPerUnit(tile.depth);
 
     // Finer tiles may lie in a coarse one, and far away floats no longer tell where a tile ends.
-    constexpr std::int64_t kAllExact = std::int64_t{1} << 24;
-    std::int64_t const width = Traits::tileWidth(tile.depth);
-    bool const isExact = std::max({std::abs(tile.i), std::abs(tile.j), std::abs(tile.k)}) + width <= kAllExact;
+    constexpr float kAllExact = 0x1p23f; // of tiles that begin and end within twice of that
+    auto const width = static_cast<float>(Traits::tileWidth(tile.depth));
+    bool const isExact = std::max({std::abs(p.x), std::abs(p.y), std::abs(p.z), width}) <= kAllExact;
     if (isExact && (tile.depth == depth || !tile.hasChildren)) {
-        auto const corner = [&](std::int64_t beyond, float last) {
-            return Corner{static_cast<float>(tile.i + beyond), static_cast<float>(tile.j + beyond),
-                static_cast<float>(tile.k + beyond), last};
-        };
-        tileBegin_ = corner(0, 0);
-        tileEnd_ = corner(width, 1);
+        tileBegin_ = {static_cast<float>(tile.i), static_cast<float>(tile.j), static_cast<float>(tile.k), 0};
+        tileEnd_ = {tileBegin_.x + width, tileBegin_.y + width, tileBegin_.z + width, 1};
     }
 }
 
