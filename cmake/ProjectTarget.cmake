@@ -31,11 +31,18 @@ function(modeling_use_flags target)
     set_target_properties(${target} PROPERTIES CXX_EXTENSIONS OFF)
 endfunction()
 
-# A test program; further arguments are its libraries. Each gtest case becomes a test of CTest.
+# A test program; further arguments are its libraries. Each gtest case becomes a test of CTest. The target tests_<LABEL>
+# builds all programs of a label.
 function(modeling_add_test name)
     cmake_parse_arguments(arg "" "LABEL" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     modeling_use_flags(${name})
+    # What is tested is in libraries; tests themselves take longer to optimise than to run.
+    target_compile_options(${name} PRIVATE $<$<CONFIG:Release>:-O1>)
     target_link_libraries(${name} PRIVATE ${arg_LIBRARIES} GTest::gmock GTest::gtest_main)
+    if(NOT TARGET tests_${arg_LABEL})
+        add_custom_target(tests_${arg_LABEL})
+    endif()
+    add_dependencies(tests_${arg_LABEL} ${name})
     gtest_discover_tests(${name} DISCOVERY_TIMEOUT 60 PROPERTIES LABELS "${arg_LABEL}" TIMEOUT 600)
 endfunction()

@@ -39,10 +39,12 @@ run_logged() {
     fi
 }
 
+# build_preset NAME OPTIONS...: with these options of cmake; only the targets in $targets where that is set.
 build_preset() {
     say "building preset $1"
     run_logged "configure-$1" cmake --preset "$1" "${@:2}"
-    run_logged "build-$1" cmake --build --preset "$1" --parallel "$(nproc)"
+    # shellcheck disable=SC2086 # several words
+    run_logged "build-$1" cmake --build --preset "$1" --parallel "$(nproc)" ${targets:+--target $targets}
 }
 
 build_packages=(g++ cmake ninja-build git ca-certificates libtbb-dev)
