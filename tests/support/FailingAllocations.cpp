@@ -104,6 +104,16 @@ void* operator new(std::size_t bytes)
     return TestSupport::take(bytes, alignof(std::max_align_t));
 }
 
+// What algorithms of the standard library take for the time of their work.
+void* operator new(std::size_t bytes, std::nothrow_t const&) noexcept
+{
+    try {
+        return operator new(bytes);
+    } catch (std::bad_alloc const&) {
+        return nullptr;
+    }
+}
+
 void* operator new(std::size_t bytes, std::align_val_t alignment)
 {
     return TestSupport::take(bytes, static_cast<std::size_t>(alignment));
