@@ -1,8 +1,7 @@
 #pragma once
 
+#include "CommandLine.h"
 #include "Report.h"
-
-#include <CLI/CLI.hpp>
 
 #include <filesystem>
 #include <functional>
@@ -18,37 +17,27 @@ struct Invocation {
     std::function<void(Report&)> run;
 };
 
-struct CommandHelp {
-    char const* name;
-    char const* summary; // a line in the list of commands
-    char const* details;
-    char const* examples; // command lines
-};
-
 /// Adds a command with the options that all have in common.
-CLI::App& addCommand(CommandHelp const& help, CLI::App& program, Invocation& invocation);
+Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation);
 
 /// Adds a file that has to stand on the command line.
-void addFile(char const* name, char const* description, std::filesystem::path& file, CLI::App& command);
+void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command);
 
 /// The invocation becomes that of `command` where it is the one on the command line.
-void onSelected(CLI::App& command, Invocation& invocation, std::function<void(Report&)> run);
-
-/// Takes numbers from 0 to 1.
-CLI::Validator isFraction();
+void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);
 
 // Each command is a source in commands/, and is listed in Program.cpp.
-void addInfo(CLI::App& program, Invocation& invocation);
-void addValidate(CLI::App& program, Invocation& invocation);
-void addAddPoints(CLI::App& program, Invocation& invocation);
-void addDeletePoints(CLI::App& program, Invocation& invocation);
-void addDeleteFaces(CLI::App& program, Invocation& invocation);
-void addMakeVolume(CLI::App& program, Invocation& invocation);
-void addMerge(CLI::App& program, Invocation& invocation);
-void addRemoveSlivers(CLI::App& program, Invocation& invocation);
-void addSmooth(CLI::App& program, Invocation& invocation);
-void addStitch(CLI::App& program, Invocation& invocation);
-void addSubdivide(CLI::App& program, Invocation& invocation);
-void addTriangulate(CLI::App& program, Invocation& invocation);
+void addInfo(CommandLine& program, Invocation& invocation);
+void addValidate(CommandLine& program, Invocation& invocation);
+void addAddPoints(CommandLine& program, Invocation& invocation);
+void addDeletePoints(CommandLine& program, Invocation& invocation);
+void addDeleteFaces(CommandLine& program, Invocation& invocation);
+void addMakeVolume(CommandLine& program, Invocation& invocation);
+void addMerge(CommandLine& program, Invocation& invocation);
+void addRemoveSlivers(CommandLine& program, Invocation& invocation);
+void addSmooth(CommandLine& program, Invocation& invocation);
+void addStitch(CommandLine& program, Invocation& invocation);
+void addSubdivide(CommandLine& program, Invocation& invocation);
+void addTriangulate(CommandLine& program, Invocation& invocation);
 
 }

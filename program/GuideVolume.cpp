@@ -242,22 +242,22 @@ void GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
     movePoints(1);
 }
 
-void addGuideOptions(GuideOptions& options, CLI::App& command)
+void addGuideOptions(GuideOptions& options, Command& command)
 {
-    CLI::Option* const file =
-        command.add_option("--volume", options.file, "Scale the tolerance by a float grid of this OpenVDB file")
-            ->type_name("FILE");
-    command.add_option("--grid", options.grid, "Which grid; can be left out where there is one float grid only")
-        ->type_name("NAME")
-        ->needs(file);
-    command.add_option("--min-value", options.leastValue, "Take this value for smaller ones of the grid")
-        ->type_name("V")
-        ->needs(file);
-    command.add_option("--tile-side", options.tileSide, "Voxels along a tile of the library's volume")
-        ->type_name("")
-        ->check(CLI::IsMember({4, 5}))
-        ->capture_default_str()
-        ->needs(file);
+    Option const file =
+        command.addOption("--volume", options.file, "Scale the tolerance by a float grid of this OpenVDB file")
+            .valueName("FILE");
+    command.addOption("--grid", options.grid, "Which grid; can be left out where there is one float grid only")
+        .valueName("NAME")
+        .needs(file);
+    command.addOption("--min-value", options.leastValue, "Take this value for smaller ones of the grid")
+        .valueName("V")
+        .needs(file);
+    command.addOption("--tile-side", options.tileSide, "Voxels along a tile of the library's volume")
+        .valueName("")
+        .oneOf({"4", "5"})
+        .showDefault()
+        .needs(file);
 }
 
 }

@@ -1,9 +1,9 @@
 #pragma once
 
+#include "CommandLine.h"
 #include "MeshTopology.h"
 #include "Report.h"
 
-#include <CLI/CLI.hpp>
 #include <Modeling/VoxelSampler.h>
 #include <TessaraGeometryVolume/VolumeBuilder.h>
 #include <TessaraObject/Object.h>
@@ -26,7 +26,7 @@ struct GuideOptions {
 };
 
 /// Adds the options to a command.
-void addGuideOptions(GuideOptions& options, CLI::App& command);
+void addGuideOptions(GuideOptions& options, Command& command);
 
 /// A grid of an OpenVDB file that scales the tolerance of a refinement.
 class GuideVolume {

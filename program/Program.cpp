@@ -8,7 +8,6 @@
 #include <fmt/format.h>
 #include <tbb/global_control.h>
 
-#include <charconv>
 #include <cstdio>
 #include <new>
 #include <optional>
@@ -17,7 +16,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr void (*kCommands[])(CLI::App&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints,
+    constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints,
         addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth, addRemoveSlivers, addStitch};
 
     constexpr char kFooter[] =
@@ -95,63 +94,36 @@ Exit codes:
     int parseAndRun(int argumentCount, char const* const* arguments)
     {
         Invocation invocation;
-        CLI::App program("Geometry algorithms for meshes, point clouds and strands, run on files.", "modeling");
-        program.set_version_flag("--version", "modeling " MODELING_VERSION, "Print the version and exit");
-        program.set_help_flag("-h,--help", "Print this help and exit");
-        program.footer(kFooter);
-        program.require_subcommand(1);
+        CommandLine program("modeling", "modeling " MODELING_VERSION,
+            "Geometry algorithms for meshes, point clouds and strands, run on files.", kFooter);
         for (auto const add : kCommands)
             add(program, invocation);
-        try {
-            program.parse(argumentCount, arguments);
-        } catch (CLI::RequiredError const& error) {
-            bool const isUnknown = program.get_subcommands().empty() && !program.remaining().empty();
-            std::string const message = isUnknown ? "There is no command " + program.remaining()[0] : error.what();
-            std::fprintf(stderr, "%s\nRun with --help for more information.\n", message.c_str());
-            return static_cast<int>(ExitCode::CommandLine);
-        } catch (CLI::ParseError const& error) {
-            return program.exit(error) == 0 ? 0 : static_cast<int>(ExitCode::CommandLine);
-        }
+        if (auto const exitCode = program.parse(argumentCount, arguments))
+            return *exitCode;
         return runCommand(invocation);
     }
 
 }
 
-CLI::App& addCommand(CommandHelp const& help, CLI::App& program, Invocation& invocation)
+Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation)
 {
-    CLI::App& command = *program.add_subcommand(help.name, help.summary);
-    command.set_help_flag("-h,--help", "Print this help and exit");
-    command.footer(fmt::format("{}\n\nExamples:\n{}", help.details, help.examples));
-    command.add_flag("--json", invocation.asJson, "Print one JSON document in place of text, also on failure");
-    command.add_option("--threads", invocation.threads, "Use at most N threads")
-        ->type_name("N")
-        ->check(CLI::Range(1, 1024).description(""));
+    Command command = program.addCommand(help);
+    command.addFlag("--json", invocation.asJson, "Print one JSON document in place of text, also on failure");
+    command.addOption("--threads", invocation.threads, "Use at most N threads").valueName("N").between(1, 1024);
     return command;
 }
 
-void addFile(char const* name, char const* description, std::filesystem::path& file, CLI::App& command)
+void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command)
 {
-    command.add_option(name, file, description)->required()->option_text(" ");
+    command.addOption(name, file, description).required().synopsis(" ");
 }
 
-void onSelected(CLI::App& command, Invocation& invocation, std::function<void(Report&)> run)
+void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run)
 {
-    command.callback([&invocation, name = command.get_name(), chosen = std::move(run)] {
+    command.onSelected([&invocation, name = command.name(), chosen = std::move(run)] {
         invocation.command = name;
         invocation.run = chosen;
     });
-}
-
-CLI::Validator isFraction()
-{
-    return CLI::Validator(
-        [](std::string const& text) {
-            double value = -1;
-            auto const [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
-            bool const isNumber = error == std::errc() && end == text.data() + text.size();
-            return isNumber && value >= 0 && value <= 1 ? std::string() : text + " is not a number from 0 to 1";
-        },
-        "0..1");
 }
 
 int runProgram(int argumentCount, char const* const* arguments)

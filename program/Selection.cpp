@@ -98,24 +98,19 @@ namespace {
 
 }
 
-void addSelection(Pickable const& elements, Selection& selection, CLI::App& command)
+void addSelection(Pickable const& elements, Selection& selection, Command& command)
 {
-    auto* const choice = command.add_option_group("Selection", fmt::format("Which {} to pick:", elements.plural));
-    choice->add_option("--indices", selection.indices, "Those that a text file names, counted from 0")
-        ->type_name("FILE");
-    choice->add_option("--box", selection.box, "Those inside a box between two corners, X0 Y0 Z0 X1 Y1 Z1")
-        ->type_name("NUMBER")
-        ->expected(6)
-        ->allow_extra_args(false) // positional arguments may follow
-        ->check(CLI::Validator(
-            [](std::string const& text) {
-                return std::isnan(std::strtof(text.c_str(), nullptr)) ? text + " is no number" : std::string();
-            },
-            ""));
-    choice->add_option("--attribute", selection.attribute, "Those whose boolean or integer attribute is not zero")
-        ->type_name("NAME");
-    choice->require_option(1);
-    command.add_flag("--invert", selection.isInverted, "Pick the others instead");
+    Command choice = command.addChoice("Selection", fmt::format("Which {} to pick:", elements.plural));
+    choice.addOption("--indices", selection.indices, "Those that a text file names, counted from 0").valueName("FILE");
+    choice.addOption("--box", selection.box, "Those inside a box between two corners, X0 Y0 Z0 X1 Y1 Z1")
+        .valueName("NUMBER")
+        .values(6)
+        .check([](std::string const& text) {
+            return std::isnan(std::strtof(text.c_str(), nullptr)) ? text + " is no number" : std::string();
+        });
+    choice.addOption("--attribute", selection.attribute, "Those whose boolean or integer attribute is not zero")
+        .valueName("NAME");
+    command.addFlag("--invert", selection.isInverted, "Pick the others instead");
 }
 
 Flags pickElements(Selection const& selection, Pickable const& elements, Tessara::Object const& object, Report& report)

@@ -1,8 +1,8 @@
 #pragma once
 
+#include "CommandLine.h"
 #include "Report.h"
 
-#include <CLI/CLI.hpp>
 #include <OrvanCore/Array.h>
 #include <TessaraObject/Object.h>
 
@@ -28,7 +28,7 @@ struct Pickable {
 };
 
 /// Adds the options to a command.
-void addSelection(Pickable const& elements, Selection& selection, CLI::App& command);
+void addSelection(Pickable const& elements, Selection& selection, Command& command);
 
 /// True for the elements that are picked. Adds to the report how many these are. A face is in the box when all its
 /// corners are, and points on the border are in it.

@@ -64,7 +64,7 @@ namespace {
 
 }
 
-void addAddPoints(CLI::App& program, Invocation& invocation)
+void addAddPoints(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"add-points", "Add the points of a file to a point cloud",
@@ -72,11 +72,11 @@ void addAddPoints(CLI::App& program, Invocation& invocation)
 Only their positions are taken: attributes that the point cloud has are zero for them, or what their
 default is. A tag is a new attribute of the points, true for those that were added.)",
         "  modeling add-points scan.ply second-scan.xyz both.ply --tag second"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Point cloud to read", options->in, command);
     addFile("POINTS", "File whose points are added", options->points, command);
     addFile("OUT", "Point cloud to write; may be IN", options->out, command);
-    command.add_option("--tag", options->tag, "Name of the attribute that marks the new points")->type_name("NAME");
+    command.addOption("--tag", options->tag, "Name of the attribute that marks the new points").valueName("NAME");
     onSelected(command, invocation, [options](Report& report) { addPoints(*options, report); });
 }
 

@@ -53,7 +53,7 @@ namespace {
 
 }
 
-void addDeleteFaces(CLI::App& program, Invocation& invocation)
+void addDeleteFaces(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"delete-faces", "Delete faces of a mesh, and the points that no other face uses",
@@ -63,7 +63,7 @@ whole numbers, separated by blanks or lines; what follows a # is a comment.)",
         "  modeling delete-faces bunny.obj half.obj --box -1 -1 -1 0 1 1\n"
         "  modeling delete-faces part.ply part.ply --indices bad-faces.txt\n"
         "  modeling delete-faces scan.ply kept.ply --attribute material --invert"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
     addFile("OUT", "Mesh to write; may be IN", options->out, command);
     addSelection(kFaces, options->selection, command);

@@ -51,7 +51,7 @@ namespace {
 
 }
 
-void addDeletePoints(CLI::App& program, Invocation& invocation)
+void addDeletePoints(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"delete-points", "Delete points of a point cloud",
@@ -60,7 +60,7 @@ separated by blanks or lines; what follows a # is a comment. Points on the borde
         "  modeling delete-points scan.ply clean.ply --indices outliers.txt\n"
         "  modeling delete-points scan.ply part.ply --box -1 -1 0 1 1 2.5 --invert\n"
         "  modeling delete-points scan.ply rest.ply --attribute label"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Point cloud to read", options->in, command);
     addFile("OUT", "Point cloud to write; may be IN", options->out, command);
     addSelection(kPoints, options->selection, command);

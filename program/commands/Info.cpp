@@ -92,7 +92,7 @@ namespace {
 
 }
 
-void addInfo(CLI::App& program, Invocation& invocation)
+void addInfo(CommandLine& program, Invocation& invocation)
 {
     auto const file = std::make_shared<std::filesystem::path>();
     constexpr CommandHelp kHelp = {"info", "Tell what a file holds, and how the faces of a mesh hang together",
@@ -102,7 +102,7 @@ together by edges there. The genus is given for closed manifolds, summed over th
 below 0.1 is a face whose shortest edge is shorter than 0.1 times its longest one.)",
         "  modeling info bunny.obj\n"
         "  modeling info bunny.obj --json | jq .topology.openEdges"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("FILE", "File to read", *file, command);
     onSelected(command, invocation, [file](Report& report) { describeFile(*file, report); });
 }

@@ -136,31 +136,26 @@ namespace {
         reportRun(report);
     }
 
-    void addValueOptions(Options& options, CLI::App& command)
+    void addValueOptions(Options& options, Command& command)
     {
-        CLI::Option_group& value = *command.add_option_group("Values", "one of these is required");
-        value.add_option("--attribute", options.attribute, "The numbers of points, blended over faces")
-            ->type_name("NAME");
-        value.add_option("--distance-to", options.distanceTo, "The distance to the place X Y Z")
-            ->type_name("NUMBER")
-            ->expected(3)
-            ->allow_extra_args(false); // positional arguments may follow
-        value.require_option(1);
-        CLI::Option* const from =
-            command.add_option("--from", options.from, "What the smallest of these values becomes")->type_name("V");
-        CLI::Option* const to =
-            command.add_option("--to", options.to, "What the largest becomes; others lie between in proportion")
-                ->type_name("V");
-        from->needs(to);
-        to->needs(from);
-        command.add_option("--background", options.background, "The value everywhere else")
-            ->type_name("V")
-            ->capture_default_str();
+        Command value = command.addChoice("Values", "one of these is required");
+        value.addOption("--attribute", options.attribute, "The numbers of points, blended over faces")
+            .valueName("NAME");
+        value.addOption("--distance-to", options.distanceTo, "The distance to the place X Y Z")
+            .valueName("NUMBER")
+            .values(3);
+        Option from =
+            command.addOption("--from", options.from, "What the smallest of these values becomes").valueName("V");
+        Option to = command.addOption("--to", options.to, "What the largest becomes; others lie between in proportion")
+                        .valueName("V");
+        from.needs(to);
+        to.needs(from);
+        command.addOption("--background", options.background, "The value everywhere else").valueName("V").showDefault();
     }
 
 }
 
-void addMakeVolume(CLI::App& program, Invocation& invocation)
+void addMakeVolume(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"make-volume", "Make a volume around a mesh that guides its refinement",
@@ -171,25 +166,24 @@ the face, or the distance to a place. Faces may have any number of corners.
 "modeling subdivide --volume" multiplies its tolerance by these values: small ones make fine faces.)",
         "  modeling make-volume head.obj guide.vdb --distance-to 0 1.7 0.1 --from 0.25 --to 2\n"
         "  modeling make-volume scan.ply guide.vdb --attribute quality --voxels 200 --band 5"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("MESH", "Mesh to read", options->in, command);
     addFile("OUT", "OpenVDB file to write", options->out, command);
     addValueOptions(*options, command);
-    CLI::Option* const voxelSize =
-        command.add_option("--voxel-size", options->voxelSize, "Side of a voxel in model units")
-            ->type_name("S")
-            ->check(CLI::Range(1e-30, 1e30).description("> 0"));
+    Option const voxelSize = command.addOption("--voxel-size", options->voxelSize, "Side of a voxel in model units")
+                                 .valueName("S")
+                                 .between(1e-30, 1e30, "> 0");
     command
-        .add_option("--voxels", options->voxels, "Voxels along the longest side of the mesh's box, in place of a size")
-        ->type_name("N")
-        ->check(CLI::Range(1, 1000000).description(""))
-        ->capture_default_str()
-        ->excludes(voxelSize);
-    command.add_option("--band", options->halfWidth, "How far from the surface there are voxels, in voxels")
-        ->type_name("N")
-        ->check(CLI::Range(1.0, 1000.0).description("1..1000"))
-        ->capture_default_str();
-    command.add_option("--grid", options->grid, "Name of the grid")->type_name("NAME")->capture_default_str();
+        .addOption("--voxels", options->voxels, "Voxels along the longest side of the mesh's box, in place of a size")
+        .valueName("N")
+        .between(1, 1000000)
+        .showDefault()
+        .excludes(voxelSize);
+    command.addOption("--band", options->halfWidth, "How far from the surface there are voxels, in voxels")
+        .valueName("N")
+        .between(1, 1000, "1..1000")
+        .showDefault();
+    command.addOption("--grid", options->grid, "Name of the grid").valueName("NAME").showDefault();
     onSelected(command, invocation, [options](Report& report) { makeVolume(*options, report); });
 }
 

@@ -210,7 +210,7 @@ namespace {
 
 }
 
-void addMerge(CLI::App& program, Invocation& invocation)
+void addMerge(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"merge", "Join meshes, point clouds or strand sets into one, with all attributes",
@@ -219,14 +219,14 @@ is not valid is skipped, and named. Of each attribute the first file that has it
 elements of files that do not have it, or have it with another type, get the default.)",
         "  modeling merge a.obj b.ply c.off all.ply\n"
         "  modeling merge scan-*.ply all.ply --source-attribute scan"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
-    command.add_option("FILES", options->files, "Files to read, and at the end the one to write (may be one of them)")
-        ->required()
-        ->option_text("IN... OUT");
+    Command command = addCommand(kHelp, program, invocation);
+    command.addOption("FILES", options->files, "Files to read, and at the end the one to write (may be one of them)")
+        .required()
+        .synopsis("IN... OUT");
     command
-        .add_option("--source-attribute", options->sourceAttribute,
+        .addOption("--source-attribute", options->sourceAttribute,
             "Store the number of the file, from 0, under that name: for each face, strand, or point of a cloud")
-        ->type_name("NAME");
+        .valueName("NAME");
     onSelected(command, invocation, [options](Report& report) { mergeFiles(*options, report); });
 }
 

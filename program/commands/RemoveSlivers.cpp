@@ -57,7 +57,7 @@ namespace {
 
 }
 
-void addRemoveSlivers(CLI::App& program, Invocation& invocation)
+void addRemoveSlivers(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"remove-slivers",
@@ -68,12 +68,12 @@ face over, so that some needles may stay. Points and faces are renumbered, and p
 the positions are dropped, unless nothing collapses.)",
         "  modeling remove-slivers part.stl clean.stl\n"
         "  modeling remove-slivers scan.ply scan.ply --ratio 0.1 --json"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
     addFile("OUT", "Mesh to write; may be IN", options->out, command);
-    command.add_option("--ratio", options->ratio, "Shortest edge over longest edge below which a face is a needle")
-        ->check(isFraction())
-        ->capture_default_str();
+    command.addOption("--ratio", options->ratio, "Shortest edge over longest edge below which a face is a needle")
+        .between(0, 1, "0..1")
+        .showDefault();
     onSelected(command, invocation, [options](Report& report) { removeSlivers(*options, report); });
 }
 

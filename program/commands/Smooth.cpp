@@ -185,7 +185,7 @@ namespace {
 
 }
 
-void addSmooth(CLI::App& program, Invocation& invocation)
+void addSmooth(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     options->asJson = &invocation.asJson;
@@ -200,18 +200,16 @@ scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",
         "  modeling smooth scan.ply smooth.ply --amount 3\n"
         "  modeling smooth cloth.obj cloth.obj --amount 1 --pin-boundary\n"
         "  modeling smooth face.ply face.ply --weights quality --pin-attribute locked"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
     addFile("OUT", "Mesh to write; may be IN", options->out, command);
-    command.add_option("--amount", options->amount, "How much smoothing")
-        ->check(CLI::Range(0.0f, 1000.0f).description("0..1000"))
-        ->capture_default_str();
-    command.add_option("--weights", options->weights, "Scale the moves of points by this attribute")
-        ->type_name("ATTRIBUTE");
-    command.add_option("--pin-attribute", options->pins, "Pin the points where this attribute is not 0")
-        ->type_name("ATTRIBUTE");
-    command.add_flag("--pin-boundary", options->pinsBoundary, "Pin the points of open edges");
-    command.add_flag("--drop-isolated", options->dropsIsolated, "Leave out points that belong to no face");
+    command.addOption("--amount", options->amount, "How much smoothing").between(0, 1000, "0..1000").showDefault();
+    command.addOption("--weights", options->weights, "Scale the moves of points by this attribute")
+        .valueName("ATTRIBUTE");
+    command.addOption("--pin-attribute", options->pins, "Pin the points where this attribute is not 0")
+        .valueName("ATTRIBUTE");
+    command.addFlag("--pin-boundary", options->pinsBoundary, "Pin the points of open edges");
+    command.addFlag("--drop-isolated", options->dropsIsolated, "Leave out points that belong to no face");
     onSelected(command, invocation, [options](Report& report) { smooth(*options, report); });
 }
 

@@ -361,7 +361,7 @@ namespace {
 
 }
 
-void addStitch(CLI::App& program, Invocation& invocation)
+void addStitch(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"stitch", "Lay a pattern of strands on the faces of a mesh",
@@ -371,23 +371,23 @@ the polygon and of the faces covered. Each strand has to begin and to end on edg
 edge to hold one or two ends, unless --open. Ends meet where they are placed alike from both ends of edges.)",
         "  modeling stitch --check --template quad.obj loop.obj\n"
         "  modeling stitch --template quad.obj loop.obj --on body.obj knitted.vtp"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
-    command.add_option("--template", options->drawing, "Files of the polygon and of the strands in it")
-        ->required()
-        ->expected(2)
-        ->option_text("POLYGON STRANDS");
-    command.add_option("--on", options->on, "Mesh to lay it on")->option_text("MESH");
-    command.add_option("OUT", options->out, "File of strands to write")->option_text(" ");
-    command.add_option("--normals", options->normals, "Raise along normals blended from the points, or of each face")
-        ->check(CLI::IsMember({"points", "faces"}))
-        ->capture_default_str();
-    command.add_option("--rotate", options->rotate, "Begin at the N-th corner of each face, from 0")
-        ->type_name("N")
-        ->check(CLI::NonNegativeNumber.description(""));
-    command.add_flag("--flip", options->flip, "Lower where the template raises");
-    command.add_flag("--open", options->isOpen, "Allow strand ends off the edges, and any number on an edge");
-    command.add_flag("--force", options->force, "Take a template in spite of its faults");
-    command.add_flag("--check", options->checkOnly, "Only tell whether the template is usable");
+    Command command = addCommand(kHelp, program, invocation);
+    command.addOption("--template", options->drawing, "Files of the polygon and of the strands in it")
+        .required()
+        .values(2)
+        .synopsis("POLYGON STRANDS");
+    command.addOption("--on", options->on, "Mesh to lay it on").synopsis("MESH");
+    command.addOption("OUT", options->out, "File of strands to write").synopsis(" ");
+    command.addOption("--normals", options->normals, "Raise along normals blended from the points, or of each face")
+        .oneOf({"points", "faces"})
+        .showDefault();
+    command.addOption("--rotate", options->rotate, "Begin at the N-th corner of each face, from 0")
+        .valueName("N")
+        .between(0, std::numeric_limits<unsigned int>::max());
+    command.addFlag("--flip", options->flip, "Lower where the template raises");
+    command.addFlag("--open", options->isOpen, "Allow strand ends off the edges, and any number on an edge");
+    command.addFlag("--force", options->force, "Take a template in spite of its faults");
+    command.addFlag("--check", options->checkOnly, "Only tell whether the template is usable");
     onSelected(command, invocation, [options](Report& report) { stitch(*options, report); });
 }
 

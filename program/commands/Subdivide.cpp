@@ -208,22 +208,9 @@ namespace {
         reportOperation(describeMesh(*mesh, topology), after, dropped, report);
     }
 
-    CLI::Validator isPositive()
-    {
-        return CLI::Validator(
-            [](std::string const& text) {
-                double value = 0;
-                bool const isNumber = CLI::detail::lexical_cast(text, value);
-                return isNumber && static_cast<float>(value) > 0 && std::isfinite(static_cast<float>(value))
-                    ? std::string()
-                    : text + " is not a positive number";
-            },
-            "> 0");
-    }
-
 }
 
-void addSubdivide(CLI::App& program, Invocation& invocation)
+void addSubdivide(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"subdivide",
@@ -242,20 +229,19 @@ such files.)",
         "  modeling subdivide coarse.obj fine.ply --relative 0.01\n"
         "  modeling subdivide part.stl fine.stl --tolerance 0.25 --max-memory 4GB\n"
         "  modeling subdivide head.obj fine.obj --relative 0.01 --volume guide.vdb --grid scale"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
     addFile("OUT", "Mesh to write; may be IN", options->out, command);
-    CLI::Option_group& size = *command.add_option_group("Size of faces", "one of these is required");
-    size.add_option("--tolerance", options->tolerance, "Half the size of the largest face that stays, in model units")
-        ->check(isPositive());
-    size.add_option("--relative", options->relative, "The same, as a fraction of the diagonal of the bounding box")
-        ->check(isPositive());
-    size.require_option(1);
-    command.add_flag("--triangulate", options->triangulates, "Cut faces with more corners into triangles first");
+    Command size = command.addChoice("Size of faces", "one of these is required");
+    size.addOption("--tolerance", options->tolerance, "Half the size of the largest face that stays, in model units")
+        .positive();
+    size.addOption("--relative", options->relative, "The same, as a fraction of the diagonal of the bounding box")
+        .positive();
+    command.addFlag("--triangulate", options->triangulates, "Cut faces with more corners into triangles first");
     addGuideOptions(options->guide, command);
-    command.add_option("--max-memory", options->maxMemory, "Stop when the program takes more: 500MB, 4GB")
-        ->type_name("")
-        ->transform(CLI::AsSizeValue(true));
+    command.addOption("--max-memory", options->maxMemory, "Stop when the program takes more: 500MB, 4GB")
+        .valueName("")
+        .bytes();
     onSelected(command, invocation, [options](Report& report) { subdivide(*options, report); });
 }
 

@@ -99,7 +99,7 @@ namespace {
 
 }
 
-void addTriangulate(CLI::App& program, Invocation& invocation)
+void addTriangulate(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"triangulate", "Cut the faces of a mesh into triangles",
@@ -115,14 +115,14 @@ matches a name decides. "*" keeps all, "" none, "* -tmp*" all but those that beg
 these two. Properties of points stay.)",
         "  modeling triangulate quads.obj triangles.ply\n"
         "  modeling triangulate cad.obj cad.stl --channels \"\" --check"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
     addFile("OUT", "Mesh to write; may be IN", options->out, command);
-    command.add_option("--channels", options->channels, "Which properties of faces and corners to keep")
-        ->type_name("LIST")
-        ->capture_default_str();
-    command.add_flag("--keep-units", options->keepsUnits, "Measure faces in the units of the file");
-    command.add_flag("--check", options->isToBeChecked,
+    command.addOption("--channels", options->channels, "Which properties of faces and corners to keep")
+        .valueName("LIST")
+        .showDefault();
+    command.addFlag("--keep-units", options->keepsUnits, "Measure faces in the units of the file");
+    command.addFlag("--check", options->isToBeChecked,
         "Compare the area of every face with that of its triangles, and count the fans");
     onSelected(command, invocation, [options](Report& report) { triangulate(*options, report); });
 }

@@ -31,7 +31,7 @@ namespace {
 
 }
 
-void addValidate(CLI::App& program, Invocation& invocation)
+void addValidate(CommandLine& program, Invocation& invocation)
 {
     auto const file = std::make_shared<std::filesystem::path>();
     constexpr CommandHelp kHelp = {"validate", "Tell whether a file holds valid geometry",
@@ -39,7 +39,7 @@ void addValidate(CLI::App& program, Invocation& invocation)
 further properties is a warning. How faces hang together does not matter here: "modeling info" tells
 that.)",
         "  modeling validate part.stl"};
-    CLI::App& command = addCommand(kHelp, program, invocation);
+    Command command = addCommand(kHelp, program, invocation);
     addFile("FILE", "File to read", *file, command);
     onSelected(command, invocation, [file](Report& report) { validateFile(*file, report); });
 }
