@@ -8,7 +8,6 @@
 
 #include <algorithm>
 #include <cstdint>
-#include <cstring>
 #include <functional>
 #include <limits>
 #include <new>
@@ -30,39 +29,36 @@ namespace Internal {
 
 }
 
+// Elements as bytes: compiled once for all types that may be copied so. With several threads where that pays.
+
+/// Copies between memory that does not overlap.
+void copyBytes(void const* source, std::size_t bytes, void* target);
+/// Gives `count` elements of `size` bytes each the value that lies at `value`, which is none of them.
+void fillBytes(void* target, std::size_t count, void const* value, std::size_t size);
+
 /// Copies elements between arrays that do not overlap, with several threads where that pays.
 template <class T> void copyElements(T const* source, std::size_t count, T* target)
 {
-    // Each block writes its own elements.
-    parallelFor(tbb::blocked_range<std::size_t>(0, count, Internal::kBlockGrain<T>), [=](auto const& block) {
-        if constexpr (std::is_trivially_copyable_v<T>)
-            std::memcpy(static_cast<void*>(target + block.begin()), source + block.begin(), block.size() * sizeof(T));
-        else
+    if constexpr (std::is_trivially_copyable_v<T>) {
+        copyBytes(source, count * sizeof(T), target);
+    } else {
+        // Each block writes its own elements.
+        parallelFor(tbb::blocked_range<std::size_t>(0, count, Internal::kBlockGrain<T>), [=](auto const& block) {
             std::copy(source + block.begin(), source + block.end(), target + block.begin());
-    });
-}
-
-namespace Internal {
-
-    /// `std::fill` that goes on by copying what it has filled, which is several times as fast for values of odd sizes.
-    template <class T> void fillBlock(T* target, std::size_t count, T const& value)
-    {
-        constexpr std::size_t kCopied = std::max<std::size_t>(1, 4096 / sizeof(T)); // stays in the nearest cache
-        std::size_t const first = std::is_trivially_copyable_v<T> ? std::min(count, kCopied) : count;
-        std::fill(target, target + first, value);
-        if constexpr (std::is_trivially_copyable_v<T>)
-            for (std::size_t filled = first; filled < count; filled += first)
-                std::memcpy(static_cast<void*>(target + filled), target, std::min(first, count - filled) * sizeof(T));
+        });
     }
-
 }
 
 /// Gives elements of an array one value, with several threads where that pays.
 template <class T> void fillElements(T* target, std::size_t count, T const& value)
 {
-    // Each block writes its own elements.
-    parallelFor(tbb::blocked_range<std::size_t>(0, count, Internal::kBlockGrain<T>),
-        [=, &value](auto const& block) { Internal::fillBlock(target + block.begin(), block.size(), value); });
+    if constexpr (std::is_trivially_copyable_v<T>) {
+        fillBytes(target, count, &value, sizeof(T));
+    } else {
+        // Each block writes its own elements.
+        parallelFor(tbb::blocked_range<std::size_t>(0, count, Internal::kBlockGrain<T>),
+            [=, &value](auto const& block) { std::fill_n(target + block.begin(), block.size(), value); });
+    }
 }
 
 /// A copy of the first `count` elements of an array, with a capacity of as many.

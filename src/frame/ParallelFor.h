@@ -1,15 +1,9 @@
 #pragma once
 
-#include <OrvanCppOpSDK/Job.h>
-#include <TessaraMathSupport/ExceptionMessage.h>
-
 #include <tbb/blocked_range.h>
-#include <tbb/parallel_for.h>
-#include <tbb/partitioner.h>
 #include <tbb/task_group.h>
 
 #include <cstddef>
-#include <stdexcept>
 
 namespace Modeling {
 
@@ -17,6 +11,19 @@ namespace Modeling {
 inline constexpr std::size_t kElementGrain = 1000; // a small fixed amount of work: copy, fill, transfer a value
 inline constexpr std::size_t kScatterGrain = 100; // scattering index lists into flag arrays
 inline constexpr unsigned int kFaceGrain = 1; // a whole face, point neighbourhood or property: large or uneven work
+
+namespace Internal {
+
+    /// What a loop does, without its type: so the loop itself is compiled once, and not again for each body and each
+    /// element type in it.
+    struct LoopBody {
+        void const* body;
+        void (*run)(void const* body, std::size_t begin, std::size_t end);
+    };
+
+    void runLoop(tbb::blocked_range<std::size_t> const& range, LoopBody const& body, bool isolated);
+
+}
 
 /// Runs `body` over sub-ranges of `range`, on the caller's thread and oneTBB's workers. All loops go through here.
 ///
@@ -36,10 +43,11 @@ void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool 
             body(range);
         return;
     }
-    tbb::task_group_context context(isolated ? tbb::task_group_context::isolated : tbb::task_group_context::bound);
-    tbb::parallel_for(range, body, tbb::auto_partitioner(), context);
-    if (!isolated && Orvan::isJobCancelled())
-        throw std::runtime_error(TSR::exceptionMessage.c_str());
+    auto const run = [](void const* erased, std::size_t begin, std::size_t end) {
+        (*static_cast<Body const*>(erased))(
+            tbb::blocked_range<Index>(static_cast<Index>(begin), static_cast<Index>(end)));
+    };
+    Internal::runLoop({range.begin(), range.end(), range.grainsize()}, {&body, run}, isolated);
 }
 
 /// Runs tasks side by side and waits for all of them, also where one fails or cannot be started. They are left out

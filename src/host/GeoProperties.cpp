@@ -108,6 +108,17 @@ void PreparedWrites::commit()
     writes_.clear();
 }
 
+Orvan::MutablePtr<Object> Internal::makeDataGeoProperty(PropertyValue&& data, PropertyValue&& defaultValue)
+{
+    Orvan::MutablePtr<Object> property = Tessara::createObject();
+    property->setProperty(sData, std::move(data));
+    property->setProperty(sTarget, Orvan::String(sNullString));
+    property->setProperty(sDependsOn, Orvan::makePtr<Orvan::Array<Orvan::String>>());
+    property->setProperty(sDefault, std::move(defaultValue));
+    property->setProperty(sInterp, static_cast<Common::DataInterpolationMode>(1));
+    return property;
+}
+
 std::vector<std::pair<Orvan::String, Orvan::MutablePtr<Object>>> collectGeoPropsByTarget(
     Object const& object, Orvan::String const& target)
 {

@@ -126,17 +126,17 @@ template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Te
     return true;
 }
 
+namespace Internal {
+
+    Orvan::MutablePtr<Tessara::Object> makeDataGeoProperty(
+        Tessara::PropertyValue&& data, Tessara::PropertyValue&& defaultValue);
+
+}
+
 /// A data property of element type `T` that holds no values yet and targets nothing.
 template <class T> Orvan::MutablePtr<Tessara::Object> populateDataGeoProperty(T const& defaultValue)
 {
-    using namespace Tessara::Geometry;
-    Orvan::MutablePtr<Tessara::Object> property = Tessara::createObject();
-    property->setProperty(sData, Orvan::makePtr<Orvan::Array<T>>());
-    property->setProperty(sTarget, Orvan::String(sNullString));
-    property->setProperty(sDependsOn, Orvan::makePtr<Orvan::Array<Orvan::String>>());
-    property->setProperty(sDefault, defaultValue);
-    property->setProperty(sInterp, static_cast<Common::DataInterpolationMode>(1));
-    return property;
+    return Internal::makeDataGeoProperty(Orvan::makePtr<Orvan::Array<T>>(), defaultValue);
 }
 
 /// The geo properties of every kind whose `sTarget` is `target`, in the order of the object's keys: names, and private

@@ -14,19 +14,13 @@ using Tessara::PropertyValue;
 
 namespace {
 
-    /// The values that an input contributes to a merged array; the rest is filled up with the default.
-    template <class T> struct Contribution {
-        T const* values;
+    /// The values that an input contributes to a merged array; the rest of its elements get the default.
+    struct Contribution {
+        void const* values;
         std::uint64_t available;
+        std::uint64_t count;
+        std::uint64_t first; // the place of its first element in the merged array
     };
-
-    template <class T>
-    Contribution<T> contributionOf(MergeInput const& input, std::uint64_t count, PropertyFinder& find)
-    {
-        HeldArray const array = find.arrayIn(input);
-        bool const fits = array.type == kPlaceOfElementType<T>;
-        return {static_cast<T const*>(array.data), fits ? std::min(array.size, count) : 0};
-    }
 
     /// Small arrays lie here and there, and each begins with a wait for memory: this one is over when it is needed.
     void prefetchStart(MergeInput const& input, PropertyFinder& find)
@@ -36,6 +30,49 @@ namespace {
         for (std::size_t line = 0; bytes && line != 4; ++line)
             __builtin_prefetch(bytes + line * kCacheLine); // has no effect behind the end
     }
+
+    /// Calls `write(input, contribution)` for all inputs, from several threads.
+    /// \param type  the place of the element type: arrays of others contribute nothing
+    template <class Write> void forEachContribution(MergePlan const& plan, Offsets const& offsets,
+        Orvan::String const& name, unsigned char type, Write const& write)
+    {
+        // Each input writes the elements from its own offset on.
+        parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kFaceGrain), [&](auto const& range) {
+            PropertyFinder find(name);
+            for (std::size_t input = range.begin(); input != range.end(); ++input) {
+                if (input + 1 != range.end())
+                    prefetchStart(plan.inputs[input + 1], find);
+                HeldArray const array = find.arrayIn(plan.inputs[input]);
+                std::uint64_t const count = offsets[input + 1] - offsets[input];
+                std::uint64_t const available = array.type == type ? std::min(array.size, count) : 0;
+                write(input, Contribution{array.data, available, count, offsets[input]});
+            }
+        });
+    }
+
+    /// Writes elements of any type that may be copied as bytes: one loop over the inputs serves them all.
+    struct ByteWriter {
+        std::byte* target;
+        std::size_t size; // of an element
+        void const* defaultValue;
+
+        void operator()(std::size_t, Contribution const& from) const
+        {
+            copyBytes(from.values, from.available * size, target + from.first * size);
+            fillBytes(target + (from.first + from.available) * size, from.count - from.available, defaultValue, size);
+        }
+    };
+
+    template <class T> struct ElementWriter {
+        T* target;
+        T const& defaultValue;
+
+        void operator()(std::size_t, Contribution const& from) const
+        {
+            copyElements(static_cast<T const*>(from.values), from.available, target + from.first);
+            fillElements(target + from.first + from.available, from.count - from.available, defaultValue);
+        }
+    };
 
     /// One place more is reserved behind the array: a closing entry or a default is appended without another copy.
     template <class T> Orvan::Array<T> arrayForMerging(Offsets const& offsets)
@@ -50,19 +87,12 @@ namespace {
         MergePlan const& plan, Offsets const& offsets, Orvan::String const& name, T const& defaultValue)
     {
         Orvan::Array<T> merged = arrayForMerging<T>(offsets);
-        // Each input writes the elements from its own offset on.
-        parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kFaceGrain), [&](auto const& range) {
-            PropertyFinder find(name);
-            for (std::size_t input = range.begin(); input != range.end(); ++input) {
-                std::uint64_t const count = offsets[input + 1] - offsets[input];
-                if (input + 1 != range.end())
-                    prefetchStart(plan.inputs[input + 1], find);
-                auto const [values, available] = contributionOf<T>(plan.inputs[input], count, find);
-                T* const target = merged.data + offsets[input];
-                copyElements(values, available, target);
-                fillElements(target + available, count - available, defaultValue);
-            }
-        });
+        if constexpr (std::is_trivially_copyable_v<T>)
+            forEachContribution(plan, offsets, name, kPlaceOfElementType<T>,
+                ByteWriter{reinterpret_cast<std::byte*>(merged.data), sizeof(T), &defaultValue});
+        else
+            forEachContribution(
+                plan, offsets, name, kPlaceOfElementType<T>, ElementWriter<T>{merged.data, defaultValue});
         return merged;
     }
 
@@ -71,20 +101,12 @@ namespace {
         MergePlan const& plan, Offsets const& offsets, Connectivity const& connectivity, unsigned int defaultValue)
     {
         Orvan::Array<unsigned int> merged = arrayForMerging<unsigned int>(offsets);
-        // Each input writes the elements from its own offset on.
-        parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kFaceGrain), [&](auto const& range) {
-            PropertyFinder find(connectivity.name);
-            for (std::size_t input = range.begin(); input != range.end(); ++input) {
-                std::uint64_t const count = offsets[input + 1] - offsets[input];
-                if (input + 1 != range.end())
-                    prefetchStart(plan.inputs[input + 1], find);
-                auto const [values, available] = contributionOf<unsigned int>(plan.inputs[input], count, find);
-                unsigned int* const target = merged.data + offsets[input];
+        forEachContribution(plan, offsets, connectivity.name, kPlaceOfElementType<unsigned int>,
+            [&, target = merged.data](std::size_t input, Contribution const& from) {
                 unsigned int const base = connectivity.baseOffsets[input];
-                copyRaised(values, available, base, target);
-                fillElements(target + available, count - available, defaultValue + base);
-            }
-        });
+                copyRaised(static_cast<unsigned int const*>(from.values), from.available, base, target + from.first);
+                fillElements(target + from.first + from.available, from.count - from.available, defaultValue + base);
+            });
         if (connectivity.closingEntry)
             merged.append(*connectivity.closingEntry);
         return merged;
@@ -143,14 +165,17 @@ void addMergedDataProperty(DataPropertyMergeEntry const& entry, Tessara::Object&
 {
     PropertyValue const defaultValue = defaultOf(entry);
     bool ignored = false;
-    forEachElementType<AllElementTypes, PlainForm>(&defaultValue, &ignored, [&]<class T>(T& value) {
-        Orvan::MutablePtr<Tessara::Object> property = populateDataGeoProperty(value);
-        property->setProperty(sTarget, entry.property->getProperty(sTarget));
-        property->setProperty(sData, PropertyValue(entry.mergedData));
-        if (!entry.name.empty())
-            target.setProperty(entry.name, Orvan::Ptr<Tessara::Object>(std::move(property)));
+    Orvan::MutablePtr<Tessara::Object> property;
+    forEachElementType<AllElementTypes, PlainForm>(&defaultValue, &ignored, [&](auto const& value) {
+        property = populateDataGeoProperty(value);
         return true;
     });
+    if (!property)
+        return;
+    property->setProperty(sTarget, entry.property->getProperty(sTarget));
+    property->setProperty(sData, PropertyValue(entry.mergedData));
+    if (!entry.name.empty())
+        target.setProperty(entry.name, Orvan::Ptr<Tessara::Object>(std::move(property)));
 }
 
 }

@@ -163,25 +163,41 @@ namespace {
         writes.writeGeoPropData(sFaceOffset, Orvan::makePtr<IndexArray>(std::move(faceOffset)));
     }
 
-    /// Whether the property is data of an element type of the list; then the transferred array is to be written.
-    template <class... T, class Transfer> bool transferData(ElementTypeList<T...>, Orvan::String const& name,
-        Transfer const& transfer, Tessara::Object const& mesh, PreparedWrites& writes)
+    /// What the triangles get of values of the faces or of their corners.
+    struct Transfer {
+        Triangulation const& triangulation;
+        bool ofCorners;
+
+        template <class T> Orvan::Array<T> operator()(Orvan::Array<T> const& values) const
+        {
+            return ofCorners ? transferToCorners(values, triangulation.sourceCorner)
+                             : transferToTriangles(values, triangulation.triangleOffset);
+        }
+    };
+
+    /// Whether the property is data of a core type; then the transferred array is to be written.
+    bool transferData(
+        Orvan::String const& name, Transfer const& transfer, Tessara::Object const& mesh, PreparedWrites& writes)
     {
-        auto const transferType = [&]<class Type>(Orvan::Ptr<Orvan::Array<Type>> const& values) {
-            if (values)
-                writes.writeGeoPropData(name, Orvan::makePtr<Orvan::Array<Type>>(transfer(*values)));
-            return values != nullptr;
-        };
-        bool isHandled = false;
-        ((isHandled |= transferType(readGeoPropData<T>(mesh, name))), ...);
-        return isHandled;
+        Orvan::Ptr<Tessara::Object> const property = dataPropertyAt(mesh, name);
+        if (!property)
+            return false;
+        Tessara::PropertyValue const data = property->getProperty(Tessara::Geometry::sData);
+        bool isTransferred = false;
+        forEachElementType<CoreElementTypes, ArrayForm>(
+            &data, &isTransferred, [&]<class T>(Orvan::Ptr<Orvan::Array<T>> const& values) {
+                if (values)
+                    writes.writeGeoPropData(name, Orvan::makePtr<Orvan::Array<T>>(transfer(*values)));
+                return values != nullptr;
+            });
+        return isTransferred;
     }
 
     /// Transfers or removes what targets a component, but for the standard property of it. What is neither data of a
     /// core type nor a range stays as it is.
-    template <class Transfer> void carryProperties(Orvan::String const& component,
-        Orvan::String const& standardProperty, TSR::Utils::ChannelParser const& channels, Transfer const& transfer,
-        Tessara::Object const& mesh, PreparedWrites& writes)
+    void carryProperties(Orvan::String const& component, Orvan::String const& standardProperty,
+        TSR::Utils::ChannelParser const& channels, Transfer const& transfer, Tessara::Object const& mesh,
+        PreparedWrites& writes)
     {
         using namespace Tessara::Geometry;
         Orvan::Array<Orvan::String> const names = getGeoPropNamesByTarget(mesh, component);
@@ -193,7 +209,7 @@ namespace {
                 for (Orvan::String const& dependent : dependents)
                     writes.eraseProperty(dependent);
                 writes.eraseProperty(name);
-            } else if (!transferData(CoreElementTypes{}, name, transfer, mesh, writes)) {
+            } else if (!transferData(name, transfer, mesh, writes)) {
                 // The index that a triangle or corner has into the range's data is its source's.
                 if (Orvan::Ptr<IndexArray> const indices = getRangeGeoPropIndices(mesh, name))
                     writes.setRangeIndices(name, Orvan::makePtr<IndexArray>(transfer(*indices)));
@@ -215,12 +231,8 @@ void triangulate(Orvan::String const& channels, Tessara::Object& mesh)
     writeTriangles(*polygons, triangulation, writes);
     TSR::Utils::ChannelParser parser;
     parser.parses(channels); // entries that are malformed are left out; that is no failure here
-    carryProperties(
-        sFaceVertexComp, sFaceVertex, parser,
-        [&](auto const& values) { return transferToCorners(values, triangulation.sourceCorner); }, mesh, writes);
-    carryProperties(
-        sFaceComp, sFaceOffset, parser,
-        [&](auto const& values) { return transferToTriangles(values, triangulation.triangleOffset); }, mesh, writes);
+    carryProperties(sFaceVertexComp, sFaceVertex, parser, Transfer{triangulation, true}, mesh, writes);
+    carryProperties(sFaceComp, sFaceOffset, parser, Transfer{triangulation, false}, mesh, writes);
     writes.commit();
 }
 

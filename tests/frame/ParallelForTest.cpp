@@ -2,6 +2,8 @@
 
 #include "support/Threads.h"
 
+#include <OrvanCppOpSDK/Job.h>
+#include <TessaraMathSupport/ExceptionMessage.h>
 #include <gtest/gtest.h>
 
 #include <atomic>
