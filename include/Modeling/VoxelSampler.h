@@ -14,6 +14,12 @@
 
 namespace TSR::TileTree3D {
 
+namespace Internal {
+
+    struct PointRow;
+
+}
+
 /// Reads values of a sparse volume at points. What kinds have in common: finding the tile, and the place in it.
 template <class Traits, class Value, class Point> class VoxelSampler;
 /// One that blends the eight values around a point.
@@ -50,14 +56,10 @@ protected:
         IJK voxel;
         Tessara::Math::float3 fraction;
     };
-    /// A corner of a tile in index units; the last number makes it four lanes.
-    struct Corner {
-        float x, y, z, w;
-    };
 
     // As long as points are between these corners, the tile at hand is theirs; nothing is where it cannot be kept.
-    Corner tileBegin_;
-    Corner tileEnd_;
+    Tessara::Math::float3 tileBegin_; // in index units
+    Tessara::Math::float3 tileEnd_;
     float voxelsPerUnit_ = 0;
     int depth_ = -1; // that was asked for
     std::uint64_t visit_ = 0; // raised whenever another tile is gone to
@@ -72,6 +74,10 @@ protected:
     MODELING_NO_EXPORT Tessara::Math::float3 distanceFromTile(Tessara::Math::float3 const& p) const noexcept;
     MODELING_NO_EXPORT void enterTile(Tessara::Math::float3 const& p, int depth);
     MODELING_NO_EXPORT void leaveTile() noexcept;
+    MODELING_NO_EXPORT TileType const& tileAt(IJK index, int depth)
+    {
+        return cursor_.tileImpl(index.i, index.j, index.k, depth);
+    }
     MODELING_NO_EXPORT bool hasTile() const noexcept { return tile_->valid; }
     /// \pre  there is one
     MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }
@@ -123,7 +129,8 @@ public:
     /// \param space  `kWorldSpace`, or any other number for index units
     float sample(Tessara::Math::float3 const& point, int depth, int space);
 
-    /// The same for `count` points in a row, which is faster where neighbours in the row are mostly in the same tile.
+    /// The same for `count` points in a row, which is faster, most of all where neighbours in the row are mostly in the
+    /// same tile. The first row of a copy takes 8 kilobytes.
     void sampleAll(Tessara::Math::float3 const* points, std::size_t count, int depth, int space, float* values);
 
 private:
@@ -132,6 +139,10 @@ private:
     enum : int { kSide = Traits::kSide };
 
     MODELING_NO_EXPORT void fetchValues();
+    MODELING_NO_EXPORT float const* valuesOf(TileType const& tile) const;
+    MODELING_NO_EXPORT bool fitsRows(int depth) const noexcept;
+    MODELING_NO_EXPORT void findTiles(std::size_t runCount, int depth, Internal::PointRow& row);
+    MODELING_NO_EXPORT void findTile(std::size_t run, int depth, Internal::PointRow& row);
     template <int side> MODELING_NO_EXPORT void sampleRow(
         Tessara::Math::float3 const* points, std::size_t count, int depth, int space, float* values);
 
@@ -145,6 +156,19 @@ private:
         std::uint64_t stamp = 0; // when it was used last
     };
     template <int side> using HaloCache = std::vector<HaloSlot<side>>;
+
+    /// What was found for a tile of a depth that was asked for, by its lower corner.
+    struct KnownTile {
+        IJK index{};
+        int depth = -1;
+        float const* values = nullptr;
+        TileType const* unlike = nullptr; // where it is of another depth, or has no values
+
+        bool isOf(IJK asked, int askedDepth) const noexcept
+        {
+            return ((index.i ^ asked.i) | (index.j ^ asked.j) | (index.k ^ asked.k) | (depth ^ askedDepth)) == 0;
+        }
+    };
 
     MODELING_NO_EXPORT int readDepth(int depth) const noexcept;
     MODELING_NO_EXPORT float samplePositive(typename Base::Place const& place);
@@ -173,6 +197,8 @@ private:
     int minDepth_;
     int maxDepth_;
     int coarsestDepth_; // with data
+
+    std::vector<KnownTile> knownTiles_; // once a row needs them
 
     // Of the tile that the base has come to.
     std::uint64_t fetchedVisit_ = 0;

@@ -1,21 +1,14 @@
 #pragma once
 
-#include <TessaraMathSupport/Types.h>
-
 #include <cstdint>
 #include <cstring>
 
 namespace Modeling {
 
-/// Four floats that are worked on at once, the first three mostly a vector: each lane gives what a float alone would.
+/// Four floats that are worked on at once: each lane gives what a float alone would.
 using Lanes = float __attribute__((vector_size(16)));
 /// The same of integers, and what comparisons of lanes give: all bits set, or none.
 using IntLanes = std::int32_t __attribute__((vector_size(16)));
-
-inline Lanes lanesOf(Tessara::Math::float3 const& v)
-{
-    return Lanes{v.x, v.y, v.z, 0};
-}
 
 inline Lanes everyLane(float value)
 {
@@ -23,23 +16,33 @@ inline Lanes everyLane(float value)
 }
 
 /// Of four floats in a row.
-template <class Four> Lanes lanesOf(Four const& values)
+inline Lanes loadLanes(float const* values)
 {
     Lanes lanes;
-    static_assert(sizeof(values) == sizeof(lanes));
-    std::memcpy(&lanes, &values, sizeof(lanes));
+    std::memcpy(&lanes, values, sizeof(lanes));
     return lanes;
 }
 
-namespace Internal {
+inline void storeLanes(Lanes lanes, float* values)
+{
+    std::memcpy(values, &lanes, sizeof(lanes));
+}
 
-    using Halves = std::uint64_t __attribute__((vector_size(16)));
+inline void storeLanes(IntLanes lanes, std::int32_t* values)
+{
+    std::memcpy(values, &lanes, sizeof(lanes));
+}
 
+/// The lanes where a comparison holds, and 0 in others.
+inline Lanes lanesWhere(IntLanes comparison, Lanes lanes)
+{
+    return reinterpret_cast<Lanes>(comparison & reinterpret_cast<IntLanes>(lanes));
 }
 
 inline bool areAll(IntLanes comparison)
 {
-    auto const halves = reinterpret_cast<Internal::Halves>(comparison);
+    std::uint64_t halves[2];
+    std::memcpy(halves, &comparison, sizeof(halves));
     return (halves[0] & halves[1]) == ~std::uint64_t{0};
 }
 

@@ -1,25 +1,24 @@
 #include <Modeling/VoxelSampler.h>
 
+#include "PointRow.h"
 #include "haloTiles.h"
-
-#include "frame/Lanes.h"
 
 #include <TessaraGeometryVolume/HaloTile.h>
 
 #include <algorithm>
 #include <cmath>
-#include <cstring>
 #include <limits>
 
 namespace TSR::TileTree3D {
 
-using namespace Modeling;
 using Tessara::Math::float3;
 
 namespace {
 
     constexpr unsigned int kAllBits = 7; // of the three axes
     constexpr float kBelowTile = 1e-5f; // voxels; what rounding can take a point below the tile that contains it
+    constexpr float kNowhere = std::numeric_limits<float>::quiet_NaN();
+    constexpr float kNothing[6 * 6 * 6] = {}; // read for points without values, and then left
 
     /// How far the neighbours of a tile are looked for, in index units: at one depth its width, whatever the depth.
     template <class Traits> constexpr int kNeighbourStep = 0;
@@ -62,19 +61,21 @@ namespace {
         return {-1, value - std::floor(value)};
     }
 
+    // Tiles that rows came to, by the upper bits of a hash. Few enough to be set up for each part of a loop.
+    constexpr int kKnownTileBits = 8;
+
+    std::size_t placeOfTile(IJK index)
+    {
+        auto const of = [](int coordinate, std::uint32_t factor) {
+            return static_cast<std::uint32_t>(coordinate) * factor;
+        };
+        return (of(index.i, 0x9E3779B1u) ^ of(index.j, 0x85EBCA77u) ^ of(index.k, 0xC2B2AE3Du))
+            >> (32 - kKnownTileBits);
+    }
+
     float blend(float from, float to, float fraction)
     {
         return (to - from) * fraction + from;
-    }
-
-    /// The two values that stand at each address.
-    inline Lanes loadPairs(float const* a, float const* b)
-    {
-        using Pairs = double __attribute__((vector_size(16)));
-        double first, second;
-        std::memcpy(&first, a, sizeof(first));
-        std::memcpy(&second, b, sizeof(second));
-        return reinterpret_cast<Lanes>(Pairs{first, second});
     }
 
     template <int side> inline float interpolate(float const* values, int i, int j, int k, float3 const& fraction)
@@ -86,22 +87,6 @@ namespace {
         float const far = blend(blend(v[kNextLayer], v[kNextLayer + 1], fraction.x),
             blend(v[kNextLayer + kNextRow], v[kNextLayer + kNextRow + 1], fraction.x), fraction.y);
         return blend(near, far, fraction.z);
-    }
-
-    /// The same at a place in voxels that is not below the first one, several lanes at a time.
-    template <int side> inline float interpolate(float const* values, Lanes place, float lastVoxel)
-    {
-        Lanes const last = everyLane(lastVoxel);
-        auto const voxel = __builtin_convertvector(place < last ? place : last, IntLanes);
-        Lanes const fraction = place - __builtin_convertvector(voxel, Lanes);
-        float const* const v = values + (voxel[0] + (voxel[1] + voxel[2] * side) * side);
-        Lanes const near = loadPairs(v, v + side), far = loadPairs(v + side * side, v + side * side + side);
-        auto const blendLanes = [](Lanes from, Lanes to, float share) { return (to - from) * everyLane(share) + from; };
-        Lanes const alongX = blendLanes(__builtin_shufflevector(near, far, 0, 2, 4, 6),
-            __builtin_shufflevector(near, far, 1, 3, 5, 7), fraction[0]);
-        Lanes const alongY = blendLanes(__builtin_shufflevector(alongX, alongX, 0, 2, 0, 2),
-            __builtin_shufflevector(alongX, alongX, 1, 3, 1, 3), fraction[1]);
-        return blend(alongY[0], alongY[1], fraction[2]);
     }
 
     /// Where the array begins with the tile: a place below it reads the first voxels.
@@ -150,7 +135,7 @@ inline auto VoxelSampler<Traits, float, float3>::locate(float3 const& point, int
 template <class Traits>
 inline float3 VoxelSampler<Traits, float, float3>::distanceFromTile(float3 const& p) const noexcept
 {
-    if (tileBegin_.w == 0) [[likely]]
+    if (std::isfinite(tileBegin_.x)) [[likely]]
         return {p.x - tileBegin_.x, p.y - tileBegin_.y, p.z - tileBegin_.z};
     // Far away a float may not hold where the tile begins.
     auto const distance = [](float from, std::int64_t to) {
@@ -161,9 +146,9 @@ inline float3 VoxelSampler<Traits, float, float3>::distanceFromTile(float3 const
 
 template <class Traits> void VoxelSampler<Traits, float, float3>::leaveTile() noexcept
 {
-    constexpr float kNowhere = std::numeric_limits<float>::infinity();
+    constexpr float kBeyond = std::numeric_limits<float>::infinity();
     tile_ = &noTile_;
-    tileBegin_ = tileEnd_ = {kNowhere, kNowhere, kNowhere, kNowhere};
+    tileBegin_ = tileEnd_ = {kBeyond, kBeyond, kBeyond};
 }
 
 template <class Traits> void VoxelSampler<Traits, float, float3>::enterTile(float3 const& p, int depth)
@@ -184,8 +169,8 @@ template <class Traits> void VoxelSampler<Traits, float, float3>::enterTile(floa
     auto const width = static_cast<float>(Traits::tileWidth(tile.depth));
     bool const isExact = std::max({std::abs(p.x), std::abs(p.y), std::abs(p.z), width}) <= kAllExact;
     if (isExact && (tile.depth == depth || !tile.hasChildren)) {
-        tileBegin_ = {static_cast<float>(tile.i), static_cast<float>(tile.j), static_cast<float>(tile.k), 0};
-        tileEnd_ = {tileBegin_.x + width, tileBegin_.y + width, tileBegin_.z + width, 1};
+        tileBegin_ = {static_cast<float>(tile.i), static_cast<float>(tile.j), static_cast<float>(tile.k)};
+        tileEnd_ = {tileBegin_.x + width, tileBegin_.y + width, tileBegin_.z + width};
     }
 }
 
@@ -245,56 +230,108 @@ float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sample(float3 c
 template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleAll(
     float3 const* points, std::size_t count, int depth, int space, float* values)
 {
-    if (haloChannel_)
-        sampleRow<kSide + 1>(points, count, depth, space, values);
-    else
-        sampleRow<kSide>(points, count, depth, space, values);
+    std::size_t const inRows = fitsRows(readDepth(depth)) ? count & ~std::size_t{3} : 0;
+    for (std::size_t first = 0; first < inRows; first += Internal::PointRow::kCapacity) {
+        std::size_t const length = std::min(Internal::PointRow::kCapacity, inRows - first);
+        if (haloChannel_)
+            sampleRow<kSide + 1>(points + first, length, depth, space, values + first);
+        else
+            sampleRow<kSide>(points + first, length, depth, space, values + first);
+    }
+    for (std::size_t n = inRows; n < count; ++n)
+        values[n] = sample(points[n], depth, space);
 }
 
-/// Points with all eight values in one array of that side take a short way.
+template <class Traits>
+bool VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::fitsRows(int depth) const noexcept
+{
+    float3 const& offset = Base::voxelOffset_;
+    return depth >= 0 && static_cast<float>(Traits::tileWidth(depth)) <= Internal::kWidestTile
+        && std::isfinite(offset.x) && std::isfinite(offset.y) && std::isfinite(offset.z);
+}
+
+/// Points with all eight values in one array of that side take the short way.
 template <class Traits> template <int side> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleRow(
     float3 const* points, std::size_t count, int depth, int space, float* values)
 {
-    constexpr float kAnywhere = std::numeric_limits<float>::infinity();
     int const askedDepth = readDepth(depth);
-    Lanes const scale = everyLane(space == kWorldSpace ? Base::scale_ : 1);
-    Lanes const offset = lanesOf(Base::voxelOffset_);
-    float const first = side > kSide || offsetType_ == kAllBits ? 0 : 1, end = side > kSide ? kAnywhere : kSide - 1;
-    Lanes const firstVoxel{first, first, first, 0}, endVoxel{end, end, end, kAnywhere};
-    if (Base::depth_ != askedDepth)
-        Base::leaveTile();
-    Lanes tileBegin = lanesOf(Base::tileBegin_), tileEnd = lanesOf(Base::tileEnd_);
-    Lanes perUnit = everyLane(Base::voxelsPerUnit_);
-    for (std::size_t n = 0; n < count; ++n) {
-        Lanes const p = lanesOf(points[n]) * scale;
-        if (!areAll((p >= tileBegin) & (p < tileEnd))) {
-            Base::enterTile({p[0], p[1], p[2]}, askedDepth);
-            fetchValues();
-            tileBegin = lanesOf(Base::tileBegin_);
-            tileEnd = lanesOf(Base::tileEnd_);
-            perUnit = everyLane(Base::voxelsPerUnit_);
-        }
-        Lanes const place = (p - tileBegin) * perUnit - offset;
-        if (!values_)
-            values[n] = background_;
-        else if (areAll((place >= firstVoxel) & (place < endVoxel))) // and not where the tile cannot be kept
-            values[n] = interpolate<side>(values_, place, kSide - 1);
-        else
+    Internal::PointRow row;
+    bool const isNear = Internal::placePoints(points, count, space == kWorldSpace ? Base::scale_ : 1,
+        static_cast<float>(Traits::tileWidth(askedDepth)), Traits::voxelsPerUnit(askedDepth), row);
+    if (!isNear) {
+        for (std::size_t n = 0; n < count; ++n)
             values[n] = sample(points[n], depth, space);
+        return;
     }
+    std::size_t const runCount = Internal::findRuns(count, row);
+    findTiles(runCount, askedDepth, row);
+    constexpr bool kIsPadded = side > kSide;
+    float const first = kIsPadded || offsetType_ == kAllBits ? 0 : 1;
+    if (Internal::interpolateRow<side, !kIsPadded>(count, {Base::voxelOffset_, first, kSide - 1}, row, values))
+        return;
+    for (std::size_t n = 0; n < count; ++n)
+        if (!row.hasValue[n])
+            values[n] = row.values[row.run[n]] == kNothing ? background_ : sample(points[n], depth, space);
+}
+
+/// First those that are known, without a branch that could not be foretold.
+template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::findTiles(
+    std::size_t runCount, int depth, Internal::PointRow& row)
+{
+    if (knownTiles_.empty())
+        knownTiles_.resize(std::size_t{1} << kKnownTileBits);
+    std::size_t openCount = 0;
+    for (std::size_t run = 0; run < runCount; ++run) {
+        IJK const index = row.tileOfRun(run);
+        KnownTile const& known = knownTiles_[placeOfTile(index)];
+        row.values[run] = known.values;
+        row.open[openCount] = static_cast<std::uint32_t>(run);
+        bool const isFound = known.isOf(index, depth) & (known.unlike == nullptr);
+        openCount += isFound ? 0 : 1;
+    }
+    for (std::size_t n = 0; n < openCount; ++n)
+        findTile(row.open[n], depth, row);
+}
+
+template <class Traits> inline void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::findTile(
+    std::size_t run, int depth, Internal::PointRow& row)
+{
+    IJK const index = row.tileOfRun(run);
+    KnownTile& known = knownTiles_[placeOfTile(index)];
+    if (!known.isOf(index, depth)) {
+        TileType const& tile = Base::tileAt(index, depth);
+        float const* const values = valuesOf(tile);
+        known = {index, depth, values ? values : kNothing, values && tile.depth == depth ? nullptr : &tile};
+    }
+    row.values[run] = known.values;
+    if (!known.unlike)
+        return;
+    TileType const& tile = *known.unlike;
+    bool const isPlace =
+        known.values != kNothing && static_cast<float>(Traits::tileWidth(tile.depth)) <= Internal::kWidestTile;
+    for (std::size_t n = run ? row.last[run - 1] + 1 : 0; n <= row.last[run]; ++n) {
+        std::size_t const at = Internal::PointRow::kFirstTile + n;
+        row.tileX[at] = isPlace ? static_cast<float>(tile.i) : kNowhere;
+        row.tileY[at] = isPlace ? static_cast<float>(tile.j) : 0;
+        row.tileZ[at] = isPlace ? static_cast<float>(tile.k) : 0;
+        row.voxelsPerUnit[n] = isPlace ? Traits::voxelsPerUnit(tile.depth) : 1;
+    }
+}
+
+/// Null where there are none that may be read.
+template <class Traits>
+inline float const* VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::valuesOf(TileType const& tile) const
+{
+    if (!tile.valid || tile.depth < minDepth_)
+        return nullptr;
+    return haloChannel_ ? haloChannel_->template tileData<kSide + 1>(tile.treeIndex()).values()
+                        : channel_->tileData(tile.treeIndex()).values();
 }
 
 template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::fetchValues()
 {
     fetchedVisit_ = Base::visit_;
-    values_ = nullptr;
-    if (!Base::hasTile() || Base::currentTile().depth < minDepth_)
-        return;
-    TileType const& tile = Base::currentTile();
-    if (haloChannel_)
-        values_ = haloChannel_->template tileData<kSide + 1>(tile.treeIndex()).values();
-    else
-        values_ = channel_->tileData(tile.treeIndex()).values();
+    values_ = Base::hasTile() ? valuesOf(Base::currentTile()) : nullptr;
 }
 
 template <class Traits>

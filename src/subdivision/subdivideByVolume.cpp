@@ -3,7 +3,6 @@
 #include "faceSize.h"
 #include "refineMesh.h"
 
-#include "frame/Lanes.h"
 #include "frame/ParallelFor.h"
 
 #include <algorithm>
@@ -19,19 +18,31 @@ using TSR::TileTree3D::Traits5;
 
 namespace {
 
-    /// The mean of three equal points, as floats give it.
-    float3 meanOfThree(float3 const& point)
+    /// Of each point the mean of three equal ones, as floats give it.
+    void writeMeans(float3 const* points, std::size_t count, float3* means)
     {
-        Lanes const p = lanesOf(point), mean = (everyLane(0) + p + p + p) / everyLane(3);
-        return {mean[0], mean[1], mean[2]};
+        float const* const coordinate = &points->x;
+        float* const mean = &means->x;
+        for (std::size_t n = 0; n < 3 * count; ++n)
+            mean[n] = (0 + coordinate[n] + coordinate[n] + coordinate[n]) / 3.0f;
     }
+
+    /// How long the sides of a face's box may be.
+    float longestSide(float tolerance)
+    {
+        constexpr float kAny = std::numeric_limits<float>::infinity();
+        return tolerance > std::numeric_limits<float>::epsilon() ? tolerance + tolerance : kAny;
+    }
+
+    constexpr unsigned int kPointGrain = 4096; // the tables of a copy of the sampler begin empty
 
     /// A loop body that is copied with each split of the range, and with it the sampler's cursors and caches: no two
     /// tasks share them.
     template <class Traits> struct SampleAtPoints {
         mutable LinearSampler<Traits> sampler;
         float3 const* position;
-        float* value;
+        float tolerance;
+        float* limit;
 
         void operator()(tbb::blocked_range<unsigned int> const& points) const
         {
@@ -40,25 +51,24 @@ namespace {
             unsigned int count = 0;
             for (unsigned int first = points.begin(); first != points.end(); first += count) {
                 count = std::min(kAtOnce, points.end() - first);
+                writeMeans(position + first, count, mean);
+                float* const row = limit + first;
+                sampler.sampleAll(mean, count, Traits::kUnitDepth, TSR::TileTree3D::kWorldSpace, row);
                 for (unsigned int n = 0; n < count; ++n)
-                    mean[n] = meanOfThree(position[first + n]);
-                sampler.sampleAll(mean, count, Traits::kUnitDepth, TSR::TileTree3D::kWorldSpace, value + first);
+                    row[n] = longestSide(row[n] * tolerance);
             }
         }
     };
 
-    /// Each face has the value at its second corner. Not in its middle, on purpose: it does not move with the others.
-    void markFaces(float const* value, float tolerance, unsigned int faceCount, float3 const* position,
-        unsigned int const* corner, unsigned int const* offset, bool* mark)
+    /// A face has the limit of its second corner. Not of its middle, on purpose: it does not move with the others.
+    void markFaces(float const* limit, unsigned int faceCount, float3 const* position, unsigned int const* corner,
+        unsigned int const* offset, bool* mark)
     {
         // Each face writes its own mark.
         parallelFor(tbb::blocked_range<unsigned int>(0, faceCount, kFaceGrain), [=](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
                 unsigned int const* const c = corner + offset[face];
-                float const localTolerance = value[c[1]] * tolerance;
-                if (localTolerance > std::numeric_limits<float>::epsilon()
-                    && Internal::longestBoxSide(position[c[0]], position[c[1]], position[c[2]])
-                        > localTolerance + localTolerance)
+                if (Internal::longestBoxSide(position[c[0]], position[c[1]], position[c[2]]) > limit[c[1]])
                     mark[face] = true;
             }
         });
@@ -73,12 +83,12 @@ namespace Internal {
         Orvan::Array<unsigned int> const& faceOffset, Orvan::Array<bool>& marks, float tolerance)
     {
         // Points are the second corners of two faces on average: to look each up once is half of the work, and they
-        // come in an order that stays in a tile for longer. Each point writes its own value.
+        // come in an order that stays in a tile for longer. Each point writes its own limit.
         auto const pointCount = static_cast<unsigned int>(positions.size);
-        Orvan::Array<float> values(pointCount, Orvan::kUninitialized);
-        SampleAtPoints<Traits> const sampleAtPoints{sampler, positions.data, values.data};
-        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kFaceGrain), sampleAtPoints);
-        markFaces(values.data, tolerance, numFaces, positions.data, faceVertex.data, faceOffset.data, marks.data);
+        Orvan::Array<float> limits(pointCount, Orvan::kUninitialized);
+        SampleAtPoints<Traits> const sampleAtPoints{sampler, positions.data, tolerance, limits.data};
+        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kPointGrain), sampleAtPoints);
+        markFaces(limits.data, numFaces, positions.data, faceVertex.data, faceOffset.data, marks.data);
     }
 
     template void markForSubdivision(LinearSampler<Traits2> const&, unsigned int, Orvan::Array<float3> const&,
