@@ -1,5 +1,7 @@
 #pragma once
 
+#include <TessaraMathSupport/Types.h>
+
 #include <cstdint>
 #include <cstring>
 
@@ -44,6 +46,22 @@ inline bool areAll(IntLanes comparison)
     std::uint64_t halves[2];
     std::memcpy(halves, &comparison, sizeof(halves));
     return (halves[0] & halves[1]) == ~std::uint64_t{0};
+}
+
+inline bool isAny(IntLanes comparison)
+{
+    std::uint64_t halves[2];
+    std::memcpy(halves, &comparison, sizeof(halves));
+    return (halves[0] | halves[1]) != 0;
+}
+
+/// And 0 in the last one.
+inline Lanes lanesOf(Tessara::Math::float3 const& v)
+{
+    using Pairs = double __attribute__((vector_size(16)));
+    double xy;
+    std::memcpy(&xy, &v, sizeof(xy));
+    return __builtin_shufflevector(reinterpret_cast<Lanes>(Pairs{xy, 0}), Lanes{v.z, 0, 0, 0}, 0, 1, 4, 5);
 }
 
 }

@@ -1,20 +1,23 @@
 #pragma once
 
+#include "frame/Lanes.h"
+
 #include <TessaraMathSupport/Types.h>
 
-#include <cmath>
+#include <cstdint>
 
 namespace Geometry::Mesh::Internal {
 
-/// The longest side of the triangle's box along the axes. Coordinates that are no numbers count as no distance.
-inline float longestBoxSide(
-    Tessara::Math::float3 const& a, Tessara::Math::float3 const& b, Tessara::Math::float3 const& c)
+/// Whether a side of the triangle's box along the axes is longer than in all lanes of `length`, at least 0. Coordinates
+/// that are no numbers count as no distance.
+inline bool isBoxLonger(Tessara::Math::float3 const& a, Tessara::Math::float3 const& b, Tessara::Math::float3 const& c,
+    Modeling::Lanes length)
 {
-    float longest = 0;
-    for (float const side :
-        {b.x - a.x, b.y - a.y, b.z - a.z, c.x - b.x, c.y - b.y, c.z - b.z, a.x - c.x, a.y - c.y, a.z - c.z})
-        longest = std::abs(side) > longest ? std::abs(side) : longest;
-    return longest;
+    using namespace Modeling;
+    Lanes const p = lanesOf(a), q = lanesOf(b), r = lanesOf(c);
+    IntLanes const magnitude = IntLanes{} + INT32_MAX;
+    return isAny((lanesWhere(magnitude, q - p) > length) | (lanesWhere(magnitude, r - q) > length)
+        | (lanesWhere(magnitude, p - r) > length));
 }
 
 }

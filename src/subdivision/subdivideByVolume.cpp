@@ -3,6 +3,7 @@
 #include "faceSize.h"
 #include "refineMesh.h"
 
+#include "frame/Lanes.h"
 #include "frame/ParallelFor.h"
 
 #include <algorithm>
@@ -68,7 +69,7 @@ namespace {
         parallelFor(tbb::blocked_range<unsigned int>(0, faceCount, kFaceGrain), [=](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
                 unsigned int const* const c = corner + offset[face];
-                if (Internal::longestBoxSide(position[c[0]], position[c[1]], position[c[2]]) > limit[c[1]])
+                if (Internal::isBoxLonger(position[c[0]], position[c[1]], position[c[2]], everyLane(limit[c[1]])))
                     mark[face] = true;
             }
         });
