@@ -94,20 +94,6 @@ testing::AssertionResult sameBits(std::vector<float3> const& actual, std::vector
     return testing::AssertionSuccess();
 }
 
-/// Faces of up to seven corners, also of none, over few points: many visit a point twice, and points may be of no face.
-PolygonMesh soup(Random& random)
-{
-    PolygonMesh mesh;
-    auto const positions = randomPositions(2 + random.below(9), random);
-    mesh.points = {positions.begin(), positions.end()};
-    for (unsigned int face = random.below(9); face != 0; --face) {
-        for (unsigned int corner = random.below(8); corner != 0; --corner)
-            mesh.faceVertex.push_back(random.below(mesh.points.size()));
-        mesh.faceOffset.push_back(static_cast<unsigned int>(mesh.faceVertex.size()));
-    }
-    return mesh;
-}
-
 }
 
 TEST(Smooth, agreesWithPlainSmoothingToTheBit)
@@ -116,7 +102,9 @@ TEST(Smooth, agreesWithPlainSmoothingToTheBit)
     float const amounts[] = {0.0f, 0.3f, 0.9f, 2.0f, 5.4f, -1.0f};
     for (int run = 0; run != 3000; ++run) {
         SCOPED_TRACE(run);
-        PolygonMesh const mesh = soup(random);
+        // Few points: many faces visit one twice, and points may be of no face.
+        std::size_t const points = 2 + random.below(9);
+        PolygonMesh const mesh = PolygonMesh::soup(points, random.below(9), 0, 7, random);
         Weights weights;
         if (run % 2)
             for (weights.emplace(); weights->size() != mesh.points.size();)

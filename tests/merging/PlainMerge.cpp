@@ -1,5 +1,7 @@
 #include "PlainMerge.h"
 
+#include "support/PropertyBag.h"
+
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
@@ -10,8 +12,6 @@
 
 #include <algorithm>
 #include <set>
-#include <string>
-#include <vector>
 
 namespace PlainMerge {
 
@@ -26,7 +26,6 @@ namespace {
     struct Entry {
         String name;
         Orvan::Ptr<Object> property;
-        PropertyValue merged;
     };
 
     template <class T, class... Others> constexpr bool kIsOneOf = (std::is_same_v<T, Others> || ...);
@@ -37,38 +36,25 @@ namespace {
         return {keys->begin(), keys->end()};
     }
 
-    template <class Rule> void forDefaultType(Entry const& entry, Rule const& rule)
+    void mergeData(Inputs const& inputs, Offsets const& offsets, bool withSlot, Entry const& entry, Object& target)
     {
-        PropertyValue const value = entry.property->getProperty(sDefault);
+        PropertyValue const held = entry.property->getProperty(sDefault);
         forEachElementTypeName([&]<class T>(ElementType<T>) {
-            if (T const* const held = value.get<T>())
-                rule(*held);
-        });
-    }
-
-    void mergeData(Inputs const& inputs, Offsets const& offsets, bool withSlot, Entry& entry)
-    {
-        forDefaultType(entry, [&]<class T>(T const& fallback) {
+            T const* const fallback = held.get<T>();
+            if (!fallback)
+                return;
             Orvan::Array<T> merged;
             for (std::size_t i = 0; i != inputs.size; ++i) {
                 auto const values = dataOf<T>(*inputs[i], entry.name);
                 for (std::uint64_t element = 0; element != offsets[i + 1] - offsets[i]; ++element)
-                    merged.append(values && element < values->size ? (*values)[element] : fallback);
+                    merged.append(values && element < values->size ? (*values)[element] : *fallback);
             }
             constexpr bool kIsGeometry =
                 kIsOneOf<T, Common::GeometryType, Common::GeoLocation, Mesh::FaceEdge, Transform::GraphTransforms>;
             if (withSlot && !kIsGeometry)
-                merged.append(fallback);
-            entry.merged = Orvan::makePtr<Orvan::Array<T>>(std::move(merged));
-        });
-    }
-
-    void publish(Entry const& entry, Object& target)
-    {
-        forDefaultType(entry, [&]<class T>(T const& fallback) {
-            auto property = makeDataProperty<T>("", nullptr, fallback);
+                merged.append(*fallback);
+            auto property = makeDataProperty<T>("", Orvan::makePtr<Orvan::Array<T>>(std::move(merged)), *fallback);
             property->setProperty(sTarget, entry.property->getProperty(sTarget));
-            property->setProperty(sData, PropertyValue(entry.merged));
             target.setProperty(entry.name, Orvan::Ptr<Object>(std::move(property)));
         });
     }
@@ -78,7 +64,7 @@ namespace {
         std::vector<Entry> dependents;
         for (String const& key : keysOf(input))
             if (getDataGeoProperty(input, key) && getGeoPropTargetName(input, key) == range)
-                dependents.push_back({key, getDataGeoProperty(input, key), {}});
+                dependents.push_back({key, getDataGeoProperty(input, key)});
         return dependents;
     }
 
@@ -93,12 +79,12 @@ namespace {
     }
 
     void mergeRange(
-        Inputs const& inputs, String const& component, Offsets const& offsets, Entry const& range, Object& target)
+        Inputs const& inputs, String const& component, Offsets const& offsets, String const& range, Object& target)
     {
         std::vector<Entry> dependents;
         for (std::size_t i = 0; dependents.empty(); ++i)
-            if (getTargetComponent(*inputs[i], range.name) == component && getRangeGeoProperty(*inputs[i], range.name))
-                dependents = dependentsOf(*inputs[i], range.name);
+            if (getTargetComponent(*inputs[i], range) == component && getRangeGeoProperty(*inputs[i], range))
+                dependents = dependentsOf(*inputs[i], range);
         Offsets bases{0};
         for (auto const& input : inputs)
             bases.push_back(bases.back() + dependentCount(*input, dependents));
@@ -106,49 +92,38 @@ namespace {
         bool needsSlot = false;
         for (bool const isOwnPart : {false, true}) { // what runs over the own elements is written first
             for (std::size_t i = 0; i != inputs.size; ++i) {
-                auto const source = getRangeGeoPropIndices(*inputs[i], range.name);
+                auto const source = getRangeGeoPropIndices(*inputs[i], range);
                 unsigned int const count = offsets[i + 1] - offsets[i];
-                bool const isThere = source && !dependentsOf(*inputs[i], range.name).empty();
+                bool const isThere = source && !dependentsOf(*inputs[i], range).empty();
                 needsSlot = needsSlot || !isThere;
                 for (std::uint64_t j = 0; j != (isThere ? source->size : count); ++j)
                     if ((j < count) == isOwnPart && offsets[i] + j < merged.size)
                         merged[offsets[i] + j] = isThere ? (*source)[j] + bases[i] : bases.back();
             }
         }
-        addRangeProperty(range.name, component, std::move(merged), target);
-        for (Entry& dependent : dependents) {
-            mergeData(inputs, bases, needsSlot, dependent);
-            publish(dependent, target);
-        }
-    }
-
-    Offsets offsetsOf(Inputs const& inputs, String const& component)
-    {
-        Offsets offsets{0};
-        for (auto const& input : inputs)
-            offsets.push_back(offsets.back() + getElementCount(*input, component));
-        return offsets;
+        addRangeProperty(range, component, std::move(merged), target);
+        for (Entry const& dependent : dependents)
+            mergeData(inputs, bases, needsSlot, dependent, target);
     }
 
     Offsets mergeComponent(Inputs const& inputs, String const& component, Object& target)
     {
-        Offsets offsets = offsetsOf(inputs, component);
+        Offsets offsets{0};
+        for (auto const& input : inputs)
+            offsets.push_back(offsets.back() + getElementCount(*input, component));
         setElementCount(component, offsets.back(), target);
         std::set<String> dataNames, rangeNames;
         for (auto const& input : inputs)
             for (String const& key : keysOf(*input)) {
                 auto const property = getDataGeoProperty(*input, key);
-                if (!property || getGeoPropTargetName(*input, key) != component || !dataNames.insert(key).second)
-                    continue;
-                Entry entry{key, property, {}};
-                mergeData(inputs, offsets, false, entry);
-                publish(entry, target);
+                if (property && getGeoPropTargetName(*input, key) == component && dataNames.insert(key).second)
+                    mergeData(inputs, offsets, false, {key, property}, target);
             }
         for (auto const& input : inputs)
             for (String const& key : keysOf(*input))
                 if (getRangeGeoProperty(*input, key) && getTargetComponent(*input, key) == component
                     && !dependentsOf(*input, key).empty() && rangeNames.insert(key).second)
-                    mergeRange(inputs, component, offsets, {key, nullptr, {}}, target);
+                    mergeRange(inputs, component, offsets, key, target);
         return offsets;
     }
 
@@ -168,9 +143,7 @@ namespace {
                 values[element] += bases[i];
         if (isOffsets)
             values.append(bases.back());
-        auto property = makeMutable(Orvan::Ptr<Object>(*output.getProperty(name).get<Orvan::Ptr<Object>>()));
-        property->setProperty(sData, Orvan::makePtr<Orvan::Array<unsigned int>>(std::move(values)));
-        output.setProperty(name, Orvan::Ptr<Object>(std::move(property)));
+        TestSupport::replaceIn(name, sData, Orvan::makePtr<Orvan::Array<unsigned int>>(std::move(values)), output);
     }
 
     void copyTheRest(Inputs const& inputs, Object& output)
@@ -187,62 +160,48 @@ namespace {
             }
     }
 
-    template <class Validate> Inputs validOnes(Inputs const& inputs, Validate const& validate)
+    bool isAccepted(Kind kind, Object const& input)
     {
-        Inputs valid;
-        for (auto const& input : inputs)
-            if (validate(*input))
-                valid.append(input);
-        return valid;
+        return bool(kind == Kind::Meshes ? validateMesh(input)
+                : kind == Kind::Strands  ? StrandValidator().validate(input)
+                                         : PointCloudValidator().validate(input));
     }
 
 }
 
-bool mergeMeshes(Inputs const& inputs, Object& output)
+std::vector<char const*> componentsOf(Kind kind)
 {
-    Inputs const valid = validOnes(inputs, validateMesh);
+    if (kind == Kind::Meshes)
+        return {sPointComp, sFaceVertexComp, sFaceComp};
+    return kind == Kind::Strands ? std::vector<char const*>{sPointComp, sStrandComp}
+                                 : std::vector<char const*>{sPointComp};
+}
+
+bool mergePlainly(Kind kind, Inputs const& inputs, Object& output)
+{
+    auto* const populate = kind == Kind::Meshes ? populateMesh
+        : kind == Kind::Strands                 ? populateStrand
+                                                : populatePointCloud;
+    Inputs valid;
+    for (auto const& input : inputs)
+        if (isAccepted(kind, *input))
+            valid.append(input);
     if (valid.empty())
         return false;
-    populateMesh(output);
+    populate(output);
     std::vector<Offsets> offsets;
-    for (char const* const component : {sPointComp, sFaceVertexComp, sFaceComp}) {
+    for (char const* const component : componentsOf(kind)) {
         Object merged;
-        populateMesh(merged);
+        populate(merged);
         offsets.push_back(mergeComponent(valid, component, merged));
         transfer(component, merged, output);
     }
-    raise(sFaceVertex, offsets[1], offsets[0], false, output);
-    raise(sFaceOffset, offsets[2], offsets[1], true, output);
-    copyTheRest(valid, output);
-    return true;
-}
-
-bool mergePointClouds(Inputs const& inputs, Object& output)
-{
-    Inputs const valid =
-        validOnes(inputs, [](Object const& input) { return bool(PointCloudValidator().validate(input)); });
-    if (valid.empty())
-        return false;
-    populatePointCloud(output);
-    mergeComponent(valid, sPointComp, output);
-    copyTheRest(valid, output);
-    return true;
-}
-
-bool mergeStrands(Inputs const& inputs, Object& output)
-{
-    Inputs const valid = validOnes(inputs, [](Object const& input) { return bool(StrandValidator().validate(input)); });
-    if (valid.empty())
-        return false;
-    populateStrand(output);
-    std::vector<Offsets> offsets;
-    for (char const* const component : {sPointComp, sStrandComp}) {
-        Object merged;
-        populateStrand(merged);
-        offsets.push_back(mergeComponent(valid, component, merged));
-        transfer(component, merged, output);
+    if (kind == Kind::Meshes) {
+        raise(sFaceVertex, offsets[1], offsets[0], false, output);
+        raise(sFaceOffset, offsets[2], offsets[1], true, output);
+    } else if (kind == Kind::Strands) {
+        raise(sStrandOffset, offsets[1], offsets[0], true, output);
     }
-    raise(sStrandOffset, offsets[1], offsets[0], true, output);
     copyTheRest(valid, output);
     return true;
 }

@@ -2,22 +2,24 @@
 
 #include "frame/VectorMath.h"
 
-#include "support/MeshBuilder.h"
+#include "support/Testing.h"
 
-#include <OrvanCore/Array.h>
-
-#include <algorithm>
-#include <cmath>
-#include <map>
 #include <set>
-#include <utility>
-#include <vector>
 
 namespace TestSupport {
 
-using Modeling::operator+;
-using Modeling::operator*;
-using Modeling::length;
+using namespace Modeling;
+
+/// Of the box around a face, along the axes.
+inline float largestSide(MeshBuilder::Triangle const& face, std::vector<float3> const& points)
+{
+    float side = 0;
+    for (unsigned int k = 0; k != 3; ++k) {
+        float3 const edge = points[face[(k + 1) % 3]] - points[face[k]];
+        side = std::max({side, std::abs(edge.x), std::abs(edge.y), std::abs(edge.z)});
+    }
+    return side;
+}
 
 /// The operation once more, written plainly: maps, every sweep over all faces, and no step left out. For meshes of
 /// triangles.
@@ -34,9 +36,7 @@ public:
         rebuild();
         for (unsigned int v = 0; v != positions.size(); ++v) {
             auto const n = static_cast<float>(neighbours_[v].size());
-            float3 sum{0, 0, 0};
-            for (unsigned int const u : neighbours_[v])
-                sum = sum + positions[u];
+            float3 const sum = sumOf(neighbours_[v], [this](unsigned int u) { return positions[u]; });
             points_.push_back({positions[v], limit(positions[v], sum, beta(n), n), 0});
         }
     }
@@ -47,20 +47,10 @@ public:
         while (before != faces.size()) {
             before = faces.size();
             Orvan::Array<bool> marks;
-            for (Triangle const& f : faces)
-                marks.append(isLarge(f, tolerance));
+            for (Triangle const& face : faces)
+                marks.append(largestSide(face, positions) > tolerance + tolerance);
             pass(marks);
         }
-    }
-
-    bool isLarge(Triangle const& f, float tolerance) const
-    {
-        float side = 0;
-        for (unsigned int k = 0; k != 3; ++k) {
-            float3 const p = positions[f[k]], q = positions[f[(k + 1) % 3]];
-            side = std::max({side, std::abs(q.x - p.x), std::abs(q.y - p.y), std::abs(q.z - p.z)});
-        }
-        return side > tolerance + tolerance;
     }
 
     void pass(Orvan::Array<bool> const& marks)
@@ -73,8 +63,7 @@ public:
             if (splits(f) && level(f) % 2 == 0) {
                 newPoint[f] = static_cast<unsigned int>(points_.size());
                 points_.push_back(pointIn(f));
-                auto const& [a, b, c] = faces[f];
-                values.push_back((float3{0, 0, 0} + values[a] + values[b] + values[c]) * 0.33333334f);
+                values.push_back(sumOf(faces[f], [this](unsigned int v) { return values[v]; }) * 0.33333334f);
             }
         replaceFaces(newPoint);
         positions.resize(points_.size());
@@ -97,6 +86,13 @@ private:
         unsigned int face, corner;
     };
 
+    template <class Points, class ValueAt> static float3 sumOf(Points const& points, ValueAt const& valueAt)
+    {
+        float3 sum{0, 0, 0};
+        for (unsigned int const point : points)
+            sum = sum + valueAt(point);
+        return sum;
+    }
     static float3 third(float3 a) { return {a.x / 3.0f, a.y / 3.0f, a.z / 3.0f}; }
     static float cosine(float angle)
     {
@@ -111,13 +107,12 @@ private:
         return p * (1 - gamma) + sum * (gamma / n);
     }
 
-    float3 after(unsigned int v, unsigned int e) const
+    float3 at(unsigned int v, unsigned int h) const
     {
         float const lambda = 0.6666667f - beta(static_cast<float>(neighbours_[v].size()));
-        float const w = std::pow(lambda, static_cast<float>(e));
+        float const w = std::pow(lambda, static_cast<float>(h - points_[v].level));
         return points_[v].limit * (1 - w) + points_[v].base * w;
     }
-    float3 at(unsigned int v, unsigned int h) const { return after(v, h - points_[v].level); }
 
     unsigned int level(std::size_t f) const { return states[f] >> 2; }
     bool splits(std::size_t f) const { return states[f] & 2; }
@@ -158,26 +153,19 @@ private:
     Point pointIn(unsigned int f) const
     {
         unsigned int const h = level(f) >> 1;
-        float3 current{0, 0, 0}, next{0, 0, 0};
+        auto const middle = [&](unsigned int face) {
+            return third(sumOf(faces[face], [&](unsigned int v) { return at(v, h); }));
+        };
+        float3 next{0, 0, 0};
         unsigned int newLevel = 0;
         for (unsigned int k = 0; k != 3; ++k) {
-            unsigned int const v = faces[f][k];
-            current = current + at(v, h);
-            next = next + at(v, h + 1);
-            newLevel = std::max(newLevel, points_[v].level + 1);
-            if (across(f, k) == kNone)
-                continue;
-            if (level(across(f, k)) % 2) {
-                next = next + at(pointAcross(f, k), h);
-            } else {
-                float3 sum{0, 0, 0};
-                for (unsigned int const u : faces[across(f, k)])
-                    sum = sum + at(u, h);
-                next = next + third(sum);
-            }
+            next = next + at(faces[f][k], h + 1);
+            newLevel = std::max(newLevel, points_[faces[f][k]].level + 1);
+            if (unsigned int const n = across(f, k); n != kNone)
+                next = next + (level(n) % 2 ? at(pointAcross(f, k), h) : middle(n));
         }
         float const betaOfSix = (4 - 2 * cosine(1.0471976f)) / 9;
-        return {third(current), limit(third(current), next, betaOfSix, 6), newLevel};
+        return {middle(f), limit(middle(f), next, betaOfSix, 6), newLevel};
     }
 
     void replaceFaces(std::vector<unsigned int> const& newPoint)

@@ -1,24 +1,15 @@
 #include <Modeling/subdivideByVolume.h>
 
-#include "support/Compare.h"
-#include "support/FailingAllocations.h"
-#include "support/MeshBuilder.h"
-#include "support/MeshChecks.h"
-#include "support/Threads.h"
+#include "PlainSubdivision.h"
+
+#include "support/Testing.h"
+#include "support/Volumes.h"
 
 #include <Modeling/subdivide.h>
-#include <TessaraGeometryVolume/VolumeBuilder.h>
-
-#include <gtest/gtest.h>
-
-#include <cmath>
-#include <limits>
-#include <vector>
 
 using namespace TSR::TileTree3D;
 using namespace TestSupport;
 using Geometry::Mesh::subdivide;
-using Tessara::Object;
 
 namespace {
 
@@ -33,16 +24,9 @@ TYPED_TEST_SUITE(SubdivideByVolume, Layouts);
 template <class Traits> Volume<Traits> volumeOf(float atCentre, float perUnit, float background)
 {
     constexpr int kReach = 13; // the unit ball and a voxel more, up to where neighbours end
-    std::vector<float> values;
-    for (int k = -kReach; k < kReach; ++k)
-        for (int j = -kReach; j < kReach; ++j)
-            for (int i = -kReach; i < kReach; ++i)
-                values.push_back(atCentre + perUnit * static_cast<float>(i) / kScale);
-    VolumeSource source;
-    source.background = background;
-    source.depth = Traits::kUnitDepth;
-    source.block = {{-kReach, -kReach, -kReach}, {2 * kReach, 2 * kReach, 2 * kReach}, values.data()};
-    return buildVolume<Traits>(source);
+    Field const field = Field::of(
+        -kReach, kReach, [=](int i, int, int) { return atCentre + perUnit * static_cast<float>(i) / kScale; });
+    return buildVolume<Traits>({.background = background, .depth = Traits::kUnitDepth, .block = field.block()});
 }
 
 template <class Traits>
@@ -55,19 +39,14 @@ LinearSampler<Traits> samplerOf(Volume<Traits> const& volume, Channel<Traits, fl
 template <class Traits> std::vector<bool> marksOf(
     LinearSampler<Traits> const& sampler, MeshBuilder const& mesh, float tolerance, std::vector<bool> before = {})
 {
-    Orvan::Array<unsigned int> corners, offsets;
-    offsets.append(0);
-    for (auto const& face : mesh.faces) {
-        for (unsigned int const point : face)
-            corners.append(point);
-        offsets.append(static_cast<unsigned int>(corners.size));
-    }
+    PolygonMesh const polygons = mesh.polygons();
     before.resize(mesh.faces.size());
     Orvan::Array<bool> marks;
     for (bool const mark : before)
         marks.append(mark);
     Geometry::Mesh::Internal::markForSubdivision(sampler, static_cast<unsigned int>(mesh.faces.size()),
-        Orvan::Array<float3>(mesh.points), corners, offsets, marks, tolerance);
+        Orvan::Array<float3>(mesh.points), Orvan::Array<unsigned int>(polygons.faceVertex),
+        Orvan::Array<unsigned int>(polygons.faceOffset), marks, tolerance);
     return std::vector<bool>(marks.begin(), marks.end());
 }
 
@@ -111,12 +90,8 @@ TYPED_TEST(SubdivideByVolume, marksByTheSecondCornerForAnyNumberOfThreads)
         auto const mean = [](float c) { return (0 + c + c + c) / 3.0f; };
         float const value =
             LinearSampler<TypeParam>(sampler).sample({mean(p.x), mean(p.y), mean(p.z)}, TypeParam::kUnitDepth, 2);
-        float side = 0;
-        for (unsigned int k = 0; k < 3; ++k) {
-            float3 const a = mesh.points[face[k]], b = mesh.points[face[(k + 1) % 3]];
-            side = std::max({side, std::abs(b.x - a.x), std::abs(b.y - a.y), std::abs(b.z - a.z)});
-        }
-        expected.push_back(value * tolerance > 1.1920929e-7f && side > value * tolerance + value * tolerance);
+        expected.push_back(value * tolerance > 1.1920929e-7f
+            && largestSide(face, mesh.points) > value * tolerance + value * tolerance);
     }
     auto const marked = std::count(expected.begin(), expected.end(), true);
     EXPECT_GT(marked, 1000);

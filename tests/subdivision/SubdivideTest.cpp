@@ -4,34 +4,16 @@
 
 #include "subdivision/refineMesh.h"
 
-#include "support/Compare.h"
-#include "support/FailingAllocations.h"
-#include "support/MeshChecks.h"
-#include "support/Random.h"
-#include "support/Threads.h"
-
 #include <Modeling/subdivisionSteps.h>
 #include <OrvanCppOpSDK/Job.h>
-#include <TessaraGeometry/ElementTypes.h>
-#include <TessaraGeometry/Elements.h>
-#include <TessaraGeometry/Lookup.h>
-#include <TessaraGeometry/Makers.h>
 #include <TessaraGeometryVolume/Canceller.h>
 
-#include <gtest/gtest.h>
-
-#include <array>
 #include <atomic>
-#include <cstring>
-#include <map>
-#include <new>
-#include <string>
 #include <thread>
 
 using namespace Tessara::Geometry;
 using namespace TestSupport;
 using Geometry::Mesh::subdivide;
-using Modeling::operator-;
 using Tessara::Object;
 namespace Steps = Geometry::Mesh::Internal;
 
@@ -111,22 +93,6 @@ struct Passes {
     Geometry::Mesh::HalfEdgeDataStructure halfEdges{numPoints, numFaces, faceVertex, faceOffset};
 };
 
-using Place = std::array<float, 3>;
-
-/// The corners of the faces, whatever their numbers.
-std::vector<std::array<Place, 3>> placesOf(Object const& mesh)
-{
-    auto const points = dataOf<float3>(mesh, sPointPosition);
-    auto const corners = dataOf<unsigned int>(mesh, sFaceVertex);
-    std::vector<std::array<Place, 3>> places(corners->size / 3);
-    for (std::size_t c = 0; c != corners->size; ++c)
-        std::memcpy(&places[c / 3][c % 3], &(*points)[(*corners)[c]], sizeof(Place));
-    for (auto& face : places)
-        std::rotate(face.begin(), std::min_element(face.begin(), face.end()), face.end());
-    std::sort(places.begin(), places.end());
-    return places;
-}
-
 /// Calls `visit(scalars, count)` for the values of a floating point type.
 template <class T, class Visit> void forEachScalar(ElementType<T> type, Orvan::Array<T>& values, Visit const& visit)
 {
@@ -161,7 +127,7 @@ TEST(Subdivide, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
             EXPECT_TRUE(isClosedManifold(*mesh));
             EXPECT_EQ(eulerCharacteristic(*mesh), eulerCharacteristic(*builder.build()));
             for (std::size_t f = 0; f != plain.faces.size(); ++f)
-                if (plain.isLarge(plain.faces[f], tolerance)) {
+                if (largestSide(plain.faces[f], plain.positions) > tolerance + tolerance) {
                     EXPECT_TRUE(plain.states[f] & 1) << "face " << f << " is large, but was not even asked to split";
                 }
         }
@@ -304,33 +270,6 @@ TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
     EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceVertexComp).size, 1);
     EXPECT_FALSE(mesh->hasProperty("of range") || mesh->hasProperty("of int"));
     EXPECT_TRUE(mesh->hasProperty("of what targets int")) << "dropping goes one level deep";
-}
-
-TEST(Subdivide, keepsConstantAndLinearAttributes)
-{
-    auto const builder = graded(MeshBuilder::sphere(6));
-    auto const mesh = meshOf(builder);
-    auto const linearAt = [](float3 const& p) { return 2.0 * p.x - p.y + 0.5 * p.z + 3; };
-    Orvan::Array<double> linear(builder.points.size());
-    std::transform(builder.points.begin(), builder.points.end(), linear.data, linearAt);
-    addDataProperty<double>("linear", sPointComp, std::move(linear), *mesh);
-    addDataProperty<float>("constant", sPointComp, Orvan::Array<float>(builder.points.size(), 7.0f), *mesh);
-    ASSERT_TRUE(subdivide(0.05f, *mesh));
-    auto const places = dataOf<float3>(*mesh, "carried"); // not smoothed, as the other two
-    for (std::size_t v = 0; v != places->size; ++v) {
-        EXPECT_NEAR((*dataOf<double>(*mesh, "linear"))[v], linearAt((*places)[v]), 1e-5);
-        EXPECT_NEAR((*dataOf<float>(*mesh, "constant"))[v], 7.0f, 1e-5f);
-    }
-}
-
-TEST(Subdivide, doesNotDependOnNumbers)
-{
-    auto builder = graded(MeshBuilder::sphere(6));
-    for (float3& p : builder.points) // on a grid sums are exact, whatever their order
-        p = {std::round(p.x * 256) / 256, std::round(p.y * 256) / 256, std::round(p.z * 256) / 256};
-    auto const expected = placesOf(*refined(builder, 0.06f));
-    for (unsigned int const seed : {1u, 2u})
-        EXPECT_TRUE(placesOf(*refined(MeshBuilder(builder).shuffled(seed), 0.06f)) == expected);
 }
 
 TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)

@@ -2,9 +2,7 @@
 
 #include "subdivision/haloTiles.h"
 
-#include "support/Random.h"
-
-#include <TessaraGeometryVolume/VolumeBuilder.h>
+#include "support/Volumes.h"
 
 #include <gtest/gtest.h>
 
@@ -12,19 +10,17 @@
 #include <array>
 #include <cmath>
 #include <limits>
-#include <memory>
-#include <string>
 #include <tuple>
-#include <vector>
 
 using namespace TSR::TileTree3D;
 using namespace TSR::TileTree3D::Internal;
+using namespace TestSupport;
 using Tessara::Math::float3;
-using TestSupport::Random;
 
 namespace {
 
 constexpr int kIndexSpace = 0;
+constexpr float kBackground = 0.3f;
 constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
 
 template <class> class VoxelSampling : public testing::Test {
@@ -32,44 +28,14 @@ template <class> class VoxelSampling : public testing::Test {
 using Layouts = testing::Types<Traits2, Traits5>;
 TYPED_TEST_SUITE(VoxelSampling, Layouts);
 
-/// Values for all voxels from `first` up to `end`, and a plain look-up.
-struct Field {
-    int first, end;
-    std::vector<float> values;
-
-    template <class Rule> static Field of(int first, int end, Rule const& rule)
-    {
-        Field field{first, end, {}};
-        for (int k = first; k < end; ++k)
-            for (int j = first; j < end; ++j)
-                for (int i = first; i < end; ++i)
-                    field.values.push_back(rule(i, j, k));
-        return field;
-    }
-    static Field random(int first, int end)
-    {
-        Random random(7);
-        return of(first, end, [&](int, int, int) { return random.coordinate(); });
-    }
-
-    float operator()(int i, int j, int k) const
-    {
-        int const side = end - first;
-        return values[static_cast<std::size_t>(((k - first) * side + (j - first)) * side + (i - first))];
-    }
-};
-
 template <class Traits> Volume<Traits> volumeOf(
     Field const& field, unsigned int offsetType = 7, int coarserLevels = 0, int depth = Traits::kUnitDepth)
 {
-    VolumeSource source;
-    source.background = 0.75f;
-    source.offsetType = offsetType;
-    source.depth = depth;
-    int const side = field.end - field.first;
-    source.block = {{field.first, field.first, field.first}, {side, side, side}, field.values.data()};
-    source.coarsestDepth = depth - coarserLevels;
-    return buildVolume<Traits>(source);
+    return buildVolume<Traits>({.background = kBackground,
+        .offsetType = offsetType,
+        .depth = depth,
+        .block = field.block(),
+        .coarsestDepth = depth - coarserLevels});
 }
 
 template <class Traits> LinearSampler<Traits> samplerOf(
@@ -79,24 +45,29 @@ template <class Traits> LinearSampler<Traits> samplerOf(
         {.scale = 1, .voxelOffset = offset, .background = volume.background}, haloChannel};
 }
 
+template <class Traits> float sampled(LinearSampler<Traits>& sampler, float3 p, int depth = Traits::kUnitDepth)
+{
+    return sampler.sample(p, depth, kIndexSpace);
+}
+
 /// Rows of points give what single ones do. Points follow one another at random and on a line.
-template <class Traits>
-void expectSameInRows(LinearSampler<Traits> sampler, float reach, int depth = Traits::kUnitDepth)
+template <class Traits> void expectSameInRows(LinearSampler<Traits> sampler, float reach)
 {
     Random random(9);
     std::vector<float3> points;
     for (int n = 0; n < 300; ++n) {
-        float3 const from{reach * random.coordinate(), reach * random.coordinate(), reach * random.coordinate()};
+        float3 const from = random.point(reach);
         for (int step = 0; step < 10; ++step)
             points.push_back({from.x + 0.3f * float(step), from.y, from.z - 0.1f * float(step)});
     }
     points[5].y = kNaN;
     std::vector<float> values(points.size());
-    sampler.sampleAll(points.data(), points.size(), depth, kIndexSpace, values.data());
+    sampler.sampleAll(points.data(), points.size(), Traits::kUnitDepth, kIndexSpace, values.data());
     for (std::size_t n = 0; n < points.size(); ++n) {
-        float const single = LinearSampler<Traits>(sampler).sample(points[n], depth, kIndexSpace);
+        LinearSampler<Traits> other(sampler);
+        float const single = sampled(other, points[n]);
         ASSERT_TRUE(values[n] == single || (std::isnan(values[n]) && std::isnan(single))) << n;
-        ASSERT_TRUE(single == sampler.sample(points[n], depth, kIndexSpace) || std::isnan(single)) << n;
+        ASSERT_TRUE(single == sampled(sampler, points[n]) || std::isnan(single)) << n;
     }
 }
 
@@ -122,6 +93,11 @@ template <class Traits> Local localOf(float p, float offset)
     return {origin, std::max(voxel, -1), x - float(voxel)};
 }
 
+template <class Traits> std::array<Local, 3> localOf(float3 p, float3 offset)
+{
+    return {localOf<Traits>(p.x, offset.x), localOf<Traits>(p.y, offset.y), localOf<Traits>(p.z, offset.z)};
+}
+
 /// `valueAt` takes voxels of the tile.
 template <class ValueAt> float plainSample(std::array<Local, 3> const& at, ValueAt const& valueAt)
 {
@@ -140,37 +116,47 @@ float3 offsetsOf(unsigned int offsetType)
     return {of(0), of(1), of(2)};
 }
 
-float linearField(float3 p)
-{
-    return 1.5f * p.x - 2 * p.y + 0.25f * p.z + 10;
 }
 
-}
-
-TYPED_TEST(VoxelSampling, agreesWithADenseFieldInsideAndAcrossTiles)
+TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
 {
     Field const field = Field::random(-20, 21);
     auto const volume = volumeOf<TypeParam>(field);
     auto const padded = makeHaloChannel(volume);
-    auto sampler = samplerOf(volume), paddedSampler = samplerOf(volume, {0, 0, 0}, &padded);
-    Random random(1);
-    for (int n = 0; n < 20'000; ++n) {
-        float3 p{19 * random.coordinate(), 19 * random.coordinate(), 19 * random.coordinate()};
-        if (n % 5 == 0) // on the border
-            p.x = std::floor(p.x / TypeParam::kSide) * TypeParam::kSide;
-        std::array<Local, 3> const at{
-            localOf<TypeParam>(p.x, 0), localOf<TypeParam>(p.y, 0), localOf<TypeParam>(p.z, 0)};
-        float const expected = plainSample(at, [&](int i, int j, int k) {
-            return field(at[0].tileOrigin + i, at[1].tileOrigin + j, at[2].tileOrigin + k);
-        });
-        ASSERT_EQ(sampler.sample(p, TypeParam::kUnitDepth, kIndexSpace), expected) << p.x << ' ' << p.y << ' ' << p.z;
-        ASSERT_EQ(paddedSampler.sample(p, TypeParam::kUnitDepth, kIndexSpace), expected);
-        // Caches hold what they say, whichever tiles came before.
-        ASSERT_EQ(LinearSampler<TypeParam>(sampler).sample(p, TypeParam::kUnitDepth, kIndexSpace), expected);
+    // With offsets that fit no volume voxels stay inside, and fractions tell the distance.
+    for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 0.4f, 2.5f, 77.0f}) {
+        float3 const offsets{offset, offset, offset};
+        auto sampler = samplerOf(volume, offsets), paddedSampler = samplerOf(volume, offsets, &padded);
+        Random random(1);
+        for (int n = 0; n < 4000; ++n) {
+            float3 p = random.point(19);
+            if (n % 5 == 0) // on the border
+                p.x = std::floor(p.x / TypeParam::kSide) * TypeParam::kSide;
+            std::array<Local, 3> at = localOf<TypeParam>(p, offsets);
+            for (Local& axis : at)
+                axis.voxel = std::max(axis.voxel, 0);
+            float const expected = plainSample(at, [&](int i, int j, int k) {
+                return field(at[0].tileOrigin + i, at[1].tileOrigin + j, at[2].tileOrigin + k);
+            });
+            ASSERT_EQ(sampled(sampler, p), expected) << p.x << ' ' << p.y << ' ' << p.z << ", offset " << offset;
+            ASSERT_EQ(sampled(paddedSampler, p), expected);
+            // Caches hold what they say, whichever tiles came before.
+            LinearSampler<TypeParam> other(sampler);
+            ASSERT_EQ(sampled(other, p), expected);
+        }
     }
-    for (float const offset : {0.0f, -0.3f, 0.4f}) {
-        expectSameInRows(samplerOf(volume, {offset, 0, offset}), 25);
-        expectSameInRows(samplerOf(volume, {offset, 0, offset}, &padded), 25);
+}
+
+TYPED_TEST(VoxelSampling, takesRowsAsItTakesPoints)
+{
+    Field const field = Field::random(-2 * TypeParam::kSide, 2 * TypeParam::kSide);
+    for (unsigned int const offsetType : {0u, 3u, 7u}) {
+        auto const volume = volumeOf<TypeParam>(field, offsetType);
+        auto const padded = makeHaloChannel(volume);
+        for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 0.4f, 77.0f, 1e20f, -1e20f, kNaN}) {
+            expectSameInRows(samplerOf(volume, {offset, 0, offset}), 3 * TypeParam::kSide);
+            expectSameInRows(samplerOf(volume, {offset, offset, 0}, &padded), 3 * TypeParam::kSide);
+        }
     }
 }
 
@@ -185,10 +171,8 @@ TYPED_TEST(VoxelSampling, mirrorsTilesThatNothingIsKnownAround)
         expectSameInRows(sampler, 2 * kSide);
         Random random(offsetType);
         for (int n = 0; n < 3000; ++n) {
-            float const reach = 2 * kSide;
-            float3 const p{reach * random.coordinate(), reach * random.coordinate(), reach * random.coordinate()};
-            std::array<Local, 3> const at{localOf<TypeParam>(p.x, offset.x), localOf<TypeParam>(p.y, offset.y),
-                localOf<TypeParam>(p.z, offset.z)};
+            float3 const p = random.point(2 * kSide);
+            std::array<Local, 3> const at = localOf<TypeParam>(p, offset);
             bool const isInside = std::all_of(
                 at.begin(), at.end(), [](Local const& axis) { return axis.voxel > 0 && axis.voxel + 1 < kSide; });
             float const expected = plainSample(at, [&](int i, int j, int k) {
@@ -208,29 +192,36 @@ TYPED_TEST(VoxelSampling, mirrorsTilesThatNothingIsKnownAround)
                     return volume.background;
                 return isMirrored ? volume.background + volume.background - nearest : nearest;
             });
-            ASSERT_EQ(sampler.sample(p, TypeParam::kUnitDepth, kIndexSpace), expected) << offsetType;
+            ASSERT_EQ(sampled(sampler, p), expected) << offsetType;
         }
     }
 }
 
-TYPED_TEST(VoxelSampling, keepsLinearFieldsAcrossTiles)
+TYPED_TEST(VoxelSampling, keepsConstantsToTheBitAndLinearFieldsAcrossTiles)
 {
     // Neighbours all around are looked for at the width of a tile of this depth.
     constexpr int kDepth = std::is_same_v<TypeParam, Traits2> ? TypeParam::kUnitDepth + 1 : TypeParam::kUnitDepth;
     float const perUnit = TypeParam::voxelsPerUnit(kDepth);
+    Field const constant = Field::of(-13, 14, [](int, int, int) { return kBackground; });
     for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
+        SCOPED_TRACE(offsetType);
         float3 const offset = offsetsOf(offsetType);
+        Random random(3);
+        for (int const coarserLevels : {0, 1, 2}) {
+            auto const volume = volumeOf<TypeParam>(constant, offsetType, coarserLevels);
+            auto sampler = samplerOf(volume, offset);
+            for (int n = 0; n < 1000; ++n)
+                ASSERT_EQ(sampled(sampler, random.point(16)), kBackground) << coarserLevels;
+        }
         Field const field = Field::of(-25, 25, [&](int i, int j, int k) {
             return linearField(
-                {(float(i) + offset.x) / perUnit, (float(j) + offset.y) / perUnit, (float(k) + offset.z) / perUnit});
+                (float(i) + offset.x) / perUnit, (float(j) + offset.y) / perUnit, (float(k) + offset.z) / perUnit);
         });
         auto const volume = volumeOf<TypeParam>(field, offsetType, 1, kDepth);
         auto sampler = samplerOf(volume, offset);
-        Random random(3);
         for (int n = 0; n < 3000; ++n) {
-            float const reach = 18 / perUnit;
-            float3 const p{reach * random.coordinate(), reach * random.coordinate(), reach * random.coordinate()};
-            ASSERT_NEAR(sampler.sample(p, kDepth, kIndexSpace), linearField(p), 2e-5f) << offsetType;
+            float3 const p = random.point(18 / perUnit);
+            ASSERT_NEAR(sampled(sampler, p, kDepth), linearField(p.x, p.y, p.z), 2e-5f);
         }
     }
 }
@@ -241,53 +232,45 @@ TEST(VoxelSampler, takesWideTilesForTheirOwnUpperNeighbours)
     Field const field = Field::of(-8, 8, [](int i, int, int) { return static_cast<float>(i); });
     auto const volume = volumeOf<Traits2>(field, 0, 1);
     auto sampler = samplerOf(volume, {0.5f, 0.5f, 0.5f});
-    EXPECT_EQ(sampler.sample({3.75f, 2, 2}, 28, kIndexSpace), blend(3, 0, 0.25f));
-    EXPECT_EQ(sampler.sample({0.25f, 2, 2}, 28, kIndexSpace), blend(-1, 0, 0.75f));
-    EXPECT_EQ(sampler.sample({1.75f, 2, 2}, 28, kIndexSpace), 1.25f);
+    EXPECT_EQ(sampled(sampler, {3.75f, 2, 2}), blend(3, 0, 0.25f));
+    EXPECT_EQ(sampled(sampler, {0.25f, 2, 2}), blend(-1, 0, 0.75f));
+    EXPECT_EQ(sampled(sampler, {1.75f, 2, 2}), 1.25f);
 }
 
 TYPED_TEST(VoxelSampling, continuesTheParentWhereNeighboursAreMissing)
 {
     constexpr int kSide = TypeParam::kSide;
-    auto const valueAt = [](float3 p) { return linearField(p); };
     for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
         float3 const offset = offsetsOf(offsetType);
+        // In voxels of the parent; of the tile, `kChildrenPerAxis` to each.
+        FullHalo<TypeParam> parent(-1), halo;
+        forEachVoxel(-1, kSide + 1, [&](int i, int j, int k) {
+            parent(i, j, k) = linearField(float(i) + offset.x, float(j) + offset.y, float(k) + offset.z);
+        });
         for (IJK const child : {IJK{0, 0, 0}, IJK{1, 0, 1}, IJK{TypeParam::kChildrenPerAxis - 1, 1, 0}}) {
-            // In voxels of the parent; of the tile, `kChildrenPerAxis` to each.
-            FullHalo<TypeParam> parent(-1);
-            for (int k = -1; k <= kSide; ++k)
-                for (int j = -1; j <= kSide; ++j)
-                    for (int i = -1; i <= kSide; ++i)
-                        parent(i, j, k) = valueAt({float(i) + offset.x, float(j) + offset.y, float(k) + offset.z});
             auto const expectedAt = [&](int i, int j, int k) {
                 auto const coordinate = [&](int c, int voxel, float shift) {
                     return float(c * TypeParam::kParentVoxels) + (float(voxel) + shift) / TypeParam::kChildrenPerAxis;
                 };
-                return valueAt({coordinate(child.i, i, offset.x), coordinate(child.j, j, offset.y),
-                    coordinate(child.k, k, offset.z)});
+                return linearField(coordinate(child.i, i, offset.x), coordinate(child.j, j, offset.y),
+                    coordinate(child.k, k, offset.z));
             };
             TileData<float, kSide, 0> tile(0), beside(0);
-            for (int k = 0; k < kSide; ++k)
-                for (int j = 0; j < kSide; ++j)
-                    for (int i = 0; i < kSide; ++i) {
-                        tile(i, j, k) = expectedAt(i, j, k);
-                        beside(i, j, k) = static_cast<float>(1000 + i + 10 * j + 100 * k);
-                    }
+            forEachVoxel(0, kSide, [&](int i, int j, int k) {
+                tile(i, j, k) = expectedAt(i, j, k);
+                beside(i, j, k) = static_cast<float>(1000 + i + 10 * j + 100 * k);
+            });
             TilesAround<TypeParam> around{};
             around[13] = tile;
             around[12] = beside; // x - 1
             for (bool const hasParent : {true, false}) {
-                FullHalo<TypeParam> halo;
                 fillHaloFromNeighbours<TypeParam>(
                     offsetType, halo, child, around, hasParent ? parent : FullHalo<TypeParam>());
-                for (int k = -1; k <= kSide; ++k)
-                    for (int j = -1; j <= kSide; ++j)
-                        for (int i = -1; i <= kSide; ++i) {
-                            bool const isBeside = i == -1 && std::min(j, k) >= 0 && std::max(j, k) < kSide;
-                            float const expected = isBeside ? beside(kSide - 1, j, k) : expectedAt(i, j, k);
-                            ASSERT_NEAR(halo(i, j, k), expected, 1e-4f)
-                                << offsetType << ": " << i << ' ' << j << ' ' << k << ", parent " << hasParent;
-                        }
+                forEachVoxel(-1, kSide + 1, [&](int i, int j, int k) {
+                    bool const isBeside = i == -1 && std::min(j, k) >= 0 && std::max(j, k) < kSide;
+                    ASSERT_NEAR(halo(i, j, k), isBeside ? beside(kSide - 1, j, k) : expectedAt(i, j, k), 1e-4f)
+                        << offsetType << ": " << i << ' ' << j << ' ' << k << ", parent " << hasParent;
+                });
             }
         }
     }
@@ -296,18 +279,12 @@ TYPED_TEST(VoxelSampling, continuesTheParentWhereNeighboursAreMissing)
 TEST(HaloTiles, blendTheParentInQuartersAndEighths)
 {
     // Along x, values a tile apart: the parent is 100 before the tile, 10 at and 1 behind, as far as it can be.
-    FullHalo<Traits2> parent(-1);
-    for (int k = -1; k <= 4; ++k)
-        for (int j = -1; j <= 4; ++j)
-            for (int i = -1; i <= 4; ++i)
-                parent(i, j, k) = i < 2 ? 100 : i < 4 ? 10 : 1;
-    parent(3, 1, 1) = 10; // the tile is the second child along x: voxels 2 and 3
-    TileData<float, 4, 0> tile(0);
-    for (int n = 0; n < 64; ++n)
-        tile(n) = 0;
+    FullHalo<Traits2> parent(-1), halo;
+    forEachVoxel(-1, 5, [&](int i, int j, int k) { parent(i, j, k) = i < 2 ? 100 : i < 4 ? 10 : 1; });
+    TileData<float, 4, 0> tile(0); // the second child along x: voxels 2 and 3
+    forEachVoxel(0, 4, [&](int i, int j, int k) { tile(i, j, k) = 0; });
     TilesAround<Traits2> around{};
     around[13] = tile;
-    FullHalo<Traits2> halo;
     auto const row = [&](unsigned int offsetType) { // across y, where no tile is
         fillHaloFromNeighbours<Traits2>(offsetType, halo, {1, 0, 0}, around, parent);
         return std::vector<float>{halo(0, 4, 1), halo(1, 4, 1), halo(2, 4, 1), halo(3, 4, 1)};
@@ -320,52 +297,18 @@ TEST(HaloTiles, blendTheParentInQuartersAndEighths)
         row(1), (std::vector<float>{b, 0.25f * next + 0.75f * b, 0.5f * next + 0.5f * b, 0.75f * next + 0.25f * b}));
 }
 
-TYPED_TEST(VoxelSampling, findsBackgroundOutsideAndNothingBeyondItsArrays)
+TYPED_TEST(VoxelSampling, findsBackgroundOutside)
 {
-    constexpr int kSide = TypeParam::kSide, kDepth = TypeParam::kUnitDepth;
-    Field const field = Field::random(-kSide, kSide);
+    Field const field = Field::random(-TypeParam::kSide, TypeParam::kSide);
     auto const volume = volumeOf<TypeParam>(field);
     auto sampler = samplerOf(volume);
-    float const nothing = volume.background;
     for (float const far :
         {kNaN, std::numeric_limits<float>::infinity(), -3e9f, 2147483648.0f, 1e30f, -2147483648.0f, 100.0f})
         for (float3 const p : {float3{far, 0, 0}, {0, far, 0}, {0, 0, far}})
-            EXPECT_EQ(sampler.sample(p, kDepth, kIndexSpace), nothing) << far;
-    EXPECT_EQ(sampler.sample({0, 0, 0}, kDepth - 1, kIndexSpace), nothing) << "no data at that depth";
-    EXPECT_EQ(sampler.sample({0, 0, 0}, -5, kIndexSpace), nothing);
-    EXPECT_EQ(sampler.sample({0, 0, 0}, kDepth, kIndexSpace), field(0, 0, 0));
-
-    // Offsets that fit no volume: voxels stay inside, fractions tell the distance.
-    for (float const offset : {-1000.0f, -1.5f, -0.3f, 0.4f, 2.5f, 77.0f}) {
-        auto lost = samplerOf(volume, {offset, offset, offset});
-        Random random(5);
-        for (int n = 0; n < 200; ++n) {
-            auto const coordinate = [&] { return (random.coordinate() - 1) / 2 * kSide; }; // of the lowest tile
-            float3 const p{coordinate(), coordinate(), coordinate()};
-            std::array<Local, 3> at{
-                localOf<TypeParam>(p.x, offset), localOf<TypeParam>(p.y, offset), localOf<TypeParam>(p.z, offset)};
-            for (Local& axis : at)
-                axis.voxel = std::max(axis.voxel, 0);
-            float const expected = plainSample(at, [&](int i, int j, int k) {
-                return field(at[0].tileOrigin + i, at[1].tileOrigin + j, at[2].tileOrigin + k);
-            });
-            ASSERT_EQ(lost.sample(p, kDepth, kIndexSpace), expected) << offset;
-        }
-    }
-    for (float const offset : {-1000.0f, -1.5f, 0.4f, 77.0f, 1e20f, -1e20f, kNaN})
-        for (unsigned int offsetType : {0u, 3u, 7u}) {
-            auto const typed = volumeOf<TypeParam>(field, offsetType);
-            auto const padded = makeHaloChannel(typed);
-            expectSameInRows(samplerOf(typed, {offset, offset, offset}), kSide);
-            expectSameInRows(samplerOf(typed, {offset, offset, offset}, &padded), kSide);
-        }
-    auto shifted = samplerOf(volume, {-0.25f, 0, 0}); // the last voxel keeps what goes beyond
-    EXPECT_EQ(shifted.sample({float(kSide) - 0.0625f - float(kSide), 0, 0}, kDepth, kIndexSpace),
-        blend(field(-1, 0, 0), field(0, 0, 0), 1.1875f));
-    auto below = samplerOf(volume, {0.25f, 0, 0}); // nothing is kept below the first; the fraction was taken before
-    EXPECT_EQ(below.sample({0, 0, 0}, kDepth, kIndexSpace), blend(field(0, 0, 0), field(1, 0, 0), 0.75f));
-    auto rounded = samplerOf(volume, {5e-6f, 0, 0});
-    EXPECT_EQ(rounded.sample({0, 0, 0}, kDepth, kIndexSpace), field(0, 0, 0)) << "within rounding of the tile";
+            EXPECT_EQ(sampled(sampler, p), kBackground) << far;
+    EXPECT_EQ(sampled(sampler, {0, 0, 0}, TypeParam::kUnitDepth - 1), kBackground) << "no data at that depth";
+    EXPECT_EQ(sampled(sampler, {0, 0, 0}, -5), kBackground);
+    EXPECT_EQ(sampled(sampler, {0, 0, 0}), field(0, 0, 0));
 }
 
 TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
@@ -379,12 +322,9 @@ TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
     for (int n = 0; n < 300; ++n)
         fine.push_back({at(30), at(30), at(30), random.coordinate()});
     VoxelList const lists[] = {{TypeParam::kUnitDepth - 2, coarse}, {TypeParam::kUnitDepth, fine}};
-    VolumeSource source;
-    source.depth = TypeParam::kUnitDepth;
-    source.lists = lists;
     for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
-        source.offsetType = offsetType;
-        auto const volume = buildVolume<TypeParam>(source);
+        auto const volume =
+            buildVolume<TypeParam>({.offsetType = offsetType, .depth = TypeParam::kUnitDepth, .lists = lists});
         expectSameInRows(samplerOf(volume, offsetsOf(offsetType)), 40);
         if (offsetType != 7)
             continue;
@@ -392,35 +332,11 @@ TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
         auto plainSampler = samplerOf(volume), paddedSampler = samplerOf(volume, {0, 0, 0}, &padded);
         expectSameInRows(paddedSampler, 40);
         for (int n = 0; n < 10'000; ++n) {
-            float3 const p{40 * random.coordinate(), 40 * random.coordinate(), 40 * random.coordinate()};
+            float3 const p = random.point(40);
             int const depth = TypeParam::kDeepest + 1 - n % 5;
-            ASSERT_EQ(plainSampler.sample(p, depth, kIndexSpace), paddedSampler.sample(p, depth, kIndexSpace));
+            ASSERT_EQ(sampled(plainSampler, p, depth), sampled(paddedSampler, p, depth));
         }
-        EXPECT_EQ(plainSampler.sample({0, 0, 0}, -1, kIndexSpace), 0);
     }
-}
-
-TYPED_TEST(VoxelSampling, keepsConstantsToTheBit)
-{
-    float const value = 0.3f;
-    Field const field = Field::of(-13, 14, [&](int, int, int) { return value; });
-    for (unsigned int offsetType = 0; offsetType < 8; ++offsetType)
-        for (int const coarserLevels : {0, 1, 2}) {
-            VolumeSource source;
-            source.background = value;
-            source.offsetType = offsetType;
-            source.depth = TypeParam::kUnitDepth;
-            source.block = {{-13, -13, -13}, {27, 27, 27}, field.values.data()};
-            source.coarsestDepth = source.depth - coarserLevels;
-            auto const volume = buildVolume<TypeParam>(source);
-            auto sampler = samplerOf(volume, offsetsOf(offsetType));
-            Random random(6);
-            for (int n = 0; n < 1000; ++n)
-                ASSERT_EQ(sampler.sample({16 * random.coordinate(), 16 * random.coordinate(), 16 * random.coordinate()},
-                              source.depth, kIndexSpace),
-                    value)
-                    << offsetType << ", " << coarserLevels;
-        }
 }
 
 TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
@@ -433,19 +349,16 @@ TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
         voxels.push_back(
             {far(reach), n % 3 ? far(reach) : std::numeric_limits<int>::min(), far(reach), random.coordinate()});
     }
-    VoxelList const list{TypeParam::kUnitDepth, voxels};
-    VolumeSource source;
-    source.depth = TypeParam::kUnitDepth;
-    source.lists = {&list, 1};
+    constexpr int kDepth = TypeParam::kUnitDepth;
+    VoxelList const lists[] = {{kDepth, voxels}};
     for (unsigned int const offsetType : {0u, 7u}) {
-        source.offsetType = offsetType;
-        source.coarsestDepth = source.depth - 1;
-        auto const volume = buildVolume<TypeParam>(source);
+        auto const volume = buildVolume<TypeParam>(
+            {.offsetType = offsetType, .depth = kDepth, .lists = lists, .coarsestDepth = kDepth - 1});
         auto sampler = samplerOf(volume);
         for (Voxel const& v : voxels) {
             float3 const p{float(v.i), float(v.j), float(v.k)}; // the list has numbers that floats hold
             float row = 0;
-            sampler.sampleAll(&p, 1, source.depth, kIndexSpace, &row);
+            sampler.sampleAll(&p, 1, kDepth, kIndexSpace, &row);
             ASSERT_EQ(row, v.value) << v.i << ' ' << v.j << ' ' << v.k << ", " << offsetType;
         }
     }
@@ -454,42 +367,32 @@ TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
 TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
 {
     constexpr int kDepth = TypeParam::kUnitDepth, kWide = TypeParam::kChildrenPerAxis;
-    Field const field = Field::of(-25, 25, [](int i, int j, int k) {
-        return linearField({float(i), float(j), float(k)});
-    });
-    auto const volume = volumeOf<TypeParam>(field, 7, 2);
-    auto const sampled = [&](LinearSamplerSettings settings, float3 p, int space = kIndexSpace) {
-        settings.background = -1;
-        return LinearSampler<TypeParam>(volume.container, volume.channel, volume.topology, settings)
-            .sample(p, kDepth, space);
-    };
-    float3 const p{1.5f, 2.25f, -3.75f};
-    EXPECT_FLOAT_EQ(sampled({.maxDepth = kDepth - 1}, p), linearField(p)) << "coarser values, on the same line";
-    EXPECT_EQ(sampled({.minDepth = kDepth, .maxDepth = kDepth - 1}, p), -1);
-    EXPECT_EQ(sampled({.minDepth = kDepth}, p), linearField(p));
+    auto const volume = volumeOf<TypeParam>(Field::linear(-25, 25), 7, 2);
     auto const padded = makeHaloChannel(volume);
-    for (auto const& [minDepth, channel, expected] : {std::tuple{kDepth, &padded, linearField(p)},
-             std::tuple{kDepth + 1, &padded, -1.0f}, std::tuple{0, &volume.channel, -1.0f /* not padded */}})
-        EXPECT_EQ(LinearSampler<TypeParam>(volume.container, volume.channel, volume.topology,
-                      {.background = -1, .minDepth = minDepth}, channel)
-                      .sample(p, kDepth, kIndexSpace),
-            expected);
-    EXPECT_EQ(sampled({.scale = 2}, {p.x / 2, p.y / 2, p.z / 2}, kWorldSpace), linearField(p));
-    EXPECT_EQ(sampled({.scale = 2}, p), linearField(p));
+    float3 const p{1.5f, 2.25f, -3.75f};
+    float const value = linearField(p.x, p.y, p.z), none = -1;
+    auto const with = [&](LinearSamplerSettings settings, Channel<TypeParam, float> const* channel = nullptr) {
+        settings.background = none;
+        return LinearSampler<TypeParam>(volume.container, volume.channel, volume.topology, settings, channel);
+    };
+    auto const sampledBy = [&](LinearSampler<TypeParam> sampler) { return sampled(sampler, p); };
+    EXPECT_FLOAT_EQ(sampledBy(with({.maxDepth = kDepth - 1})), value) << "coarser values, on the same line";
+    EXPECT_EQ(sampledBy(with({.minDepth = kDepth, .maxDepth = kDepth - 1})), none);
+    EXPECT_EQ(sampledBy(with({.minDepth = kDepth})), value);
+    EXPECT_EQ(sampledBy(with({.minDepth = kDepth}, &padded)), value);
+    EXPECT_EQ(sampledBy(with({.minDepth = kDepth + 1}, &padded)), none);
+    EXPECT_EQ(sampledBy(with({}, &volume.channel)), none) << "not padded";
+    EXPECT_EQ(sampledBy(with({.scale = 2})), value);
+    EXPECT_EQ(with({.scale = 2}).sample({p.x / 2, p.y / 2, p.z / 2}, kDepth, kWorldSpace), value);
 
     // A coarse tile, where the tree ends there.
     std::vector<Voxel> const coarse{{0, 0, 0, 4}, {1, 0, 0, 8}};
-    VoxelList const list{kDepth - 1, coarse};
-    VolumeSource source;
-    source.depth = kDepth;
-    source.lists = {&list, 1};
-    auto const coarseVolume = buildVolume<TypeParam>(source);
+    VoxelList const lists[] = {{kDepth - 1, coarse}};
+    auto const coarseVolume = buildVolume<TypeParam>({.depth = kDepth, .lists = lists});
     auto sampler = samplerOf(coarseVolume);
-    EXPECT_FLOAT_EQ(sampler.sample({0.25f * kWide, 0, 0}, kDepth, kIndexSpace), 5);
+    EXPECT_FLOAT_EQ(sampled(sampler, {0.25f * kWide, 0, 0}), 5);
     expectSameInRows(sampler, 3 * kWide);
     EXPECT_EQ(sampler.name().view(), "kLinear");
-    EXPECT_EQ((static_cast<VoxelSampler<TypeParam, float, float3>&>(sampler)
-                      .VoxelSampler<TypeParam, float, float3>::name()
-                      .view()),
-        "kNone");
+    using Base = VoxelSampler<TypeParam, float, float3>;
+    EXPECT_EQ(static_cast<Base&>(sampler).Base::name().view(), "kNone");
 }

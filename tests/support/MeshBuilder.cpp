@@ -92,19 +92,16 @@ MeshBuilder MeshBuilder::icosahedron()
 
 MeshBuilder MeshBuilder::torus(unsigned int rings, unsigned int sides)
 {
-    // Circles as chords of the rational parametrisation would be uneven; a square ring with a square section will do.
-    auto const onSquare = [](unsigned int i, unsigned int count) {
-        float const t = 8.0f * static_cast<float>(i) / static_cast<float>(count);
-        float const x = t < 1 ? 1.0f : t < 3 ? 2 - t : t < 5 ? -1.0f : t < 7 ? t - 6 : 1.0f;
-        float const y = t < 1 ? t : t < 3 ? 1.0f : t < 5 ? 4 - t : t < 7 ? -1.0f : t - 8;
+    auto const onCircle = [](unsigned int step, unsigned int stepCount) {
+        auto const [x, y] = aroundSquare(step, stepCount);
         float const length = std::sqrt(x * x + y * y);
-        return std::pair(x / length, y / length);
+        return OnSquare{x / length, y / length};
     };
     MeshBuilder mesh;
     for (unsigned int ring = 0; ring != rings; ++ring)
         for (unsigned int side = 0; side != sides; ++side) {
-            auto const [cx, cy] = onSquare(ring, rings);
-            auto const [dx, dz] = onSquare(side, sides);
+            auto const [cx, cy] = onCircle(ring, rings);
+            auto const [dx, dz] = onCircle(side, sides);
             mesh.points.push_back({cx * (3 + dx), cy * (3 + dx), dz});
         }
     auto const at = [=](unsigned int ring, unsigned int side) { return ring % rings * sides + side % sides; };
@@ -120,10 +117,7 @@ MeshBuilder MeshBuilder::bipyramid(unsigned int rim)
 {
     MeshBuilder mesh;
     for (unsigned int i = 0; i != rim; ++i) {
-        // Around a diamond, so that no angle functions are needed.
-        float const t = 4.0f * static_cast<float>(i) / static_cast<float>(rim);
-        float const x = t < 2 ? 1 - t : t - 3;
-        float const y = t < 1 ? t : t < 3 ? 2 - t : t - 4;
+        auto const [x, y] = aroundSquare(i, rim);
         mesh.points.push_back({x, y, 0});
     }
     mesh.points.push_back({0, 0, 1});

@@ -1,7 +1,5 @@
 #include "PolygonMesh.h"
 
-#include "Random.h"
-
 #include <TessaraGeometry/Makers.h>
 
 #include <cmath>
@@ -17,6 +15,14 @@ void addNoise(float amount, unsigned int seed, std::vector<float3>& points)
         p.y += amount * random.coordinate();
         p.z += amount * random.coordinate();
     }
+}
+
+OnSquare aroundSquare(unsigned int step, unsigned int stepCount)
+{
+    float const along = 8 * static_cast<float>(step) / static_cast<float>(stepCount);
+    float const side = std::floor(along / 2);
+    float const t = along - 2 * side - 1;
+    return {side == 0 ? t : side == 1 ? 1 : side == 2 ? -t : -1, side == 0 ? -1 : side == 1 ? t : side == 2 ? 1 : -t};
 }
 
 PolygonMesh PolygonMesh::quads(unsigned int segments)
@@ -43,22 +49,31 @@ PolygonMesh PolygonMesh::stars(std::size_t count, unsigned int minCorners, unsig
     for (std::size_t polygon = 0; polygon != count; ++polygon) {
         unsigned int const cornerCount = minCorners + random.below(maxCorners - minCorners + 1);
         // Two directions at a right angle, of any length: the plane.
-        float3 const u{random.coordinate(), random.coordinate(), random.coordinate()};
+        float3 const u = random.point();
         float3 const v = std::abs(u.x) > std::abs(u.z) ? float3{-u.y, u.x, 0} : float3{0, -u.z, u.y};
         std::vector<float3> corners;
         for (unsigned int i = 0; i != cornerCount; ++i) {
-            // Around the square, which takes no sines: its edges are as long as 8 in all.
-            float const along = 8 * static_cast<float>(i) / static_cast<float>(cornerCount);
-            float const side = std::floor(along / 2);
-            float const t = along - 2 * side - 1;
-            float const x = side == 0 ? t : side == 1 ? 1 : side == 2 ? -t : -1;
-            float const y = side == 0 ? -1 : side == 1 ? t : side == 2 ? 1 : -t;
+            auto const [x, y] = aroundSquare(i, cornerCount);
             float const radius = 1.1f + random.coordinate();
             float const column = static_cast<float>(polygon % 1000);
             corners.push_back({5 * column + radius * (x * u.x + y * v.x), radius * (x * u.y + y * v.y),
                 radius * (x * u.z + y * v.z)});
         }
         mesh.addPolygon(corners);
+    }
+    return mesh;
+}
+
+PolygonMesh PolygonMesh::soup(
+    std::size_t pointCount, std::size_t faceCount, unsigned int minCorners, unsigned int maxCorners, Random& random)
+{
+    PolygonMesh mesh;
+    while (mesh.points.size() != pointCount)
+        mesh.points.push_back(random.point());
+    while (mesh.faceCount() != faceCount) {
+        for (unsigned int corner = minCorners + random.below(maxCorners - minCorners + 1); corner != 0; --corner)
+            mesh.faceVertex.push_back(random.below(pointCount));
+        mesh.faceOffset.push_back(static_cast<unsigned int>(mesh.faceVertex.size()));
     }
     return mesh;
 }

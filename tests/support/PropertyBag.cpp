@@ -4,7 +4,6 @@
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
 
-#include <algorithm>
 #include <string>
 #include <type_traits>
 
@@ -33,11 +32,18 @@ namespace {
         return value;
     }
 
+    template <class T> Orvan::Array<T> randomValues(std::size_t length, Random& random)
+    {
+        Orvan::Array<T> values(length);
+        for (T& value : values)
+            value = randomValue<T>(random);
+        return values;
+    }
+
     template <class T> void addData(
         Orvan::String const& name, Orvan::String const& target, std::size_t length, Random& random, Object& object)
     {
-        Orvan::Array<T> values(length);
-        std::generate(values.begin(), values.end(), [&] { return randomValue<T>(random); });
+        Orvan::Array<T> values = randomValues<T>(length, random);
         addDataProperty<T>(name, target, std::move(values), object, randomValue<T>(random));
     }
 
@@ -116,7 +122,7 @@ void addAllTypes(Orvan::String const& component, Random& random, Object& object)
     forEachElementTypeName([&]<class T>(ElementType<T> type) {
         Orvan::String name = component;
         name += type.name;
-        addData<T>(name, component, getElementCount(object, component), random, object);
+        addDataProperty<T>(name, component, randomValues<T>(getElementCount(object, component), random), object);
     });
 }
 
@@ -124,7 +130,7 @@ Orvan::Array<Tessara::Math::float3> randomPositions(std::size_t count, Random& r
 {
     Orvan::Array<Tessara::Math::float3> positions(count);
     for (auto& p : positions)
-        p = {random.coordinate(), random.coordinate(), random.coordinate()};
+        p = random.point();
     return positions;
 }
 

@@ -14,7 +14,7 @@ void replaceIn(Orvan::String const& name, char const* key, Tessara::PropertyValu
 /// the component and some not, and ranges with and without data. Some hold null or no array.
 void addRandomProperties(Orvan::String const& component, Random& random, Tessara::Object& object);
 
-/// One data property of each of the forty element types, as long as the component.
+/// One data property of each of the forty element types, as long as the component and named after it and the type.
 void addAllTypes(Orvan::String const& component, Random& random, Tessara::Object& object);
 
 Orvan::Array<Tessara::Math::float3> randomPositions(std::size_t count, Random& random);

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <TessaraMathSupport/Types.h>
+
 #include <random>
 
 namespace TestSupport {
@@ -15,6 +17,10 @@ public:
     unsigned int below(std::size_t bound) { return static_cast<unsigned int>(engine_() % bound); }
     /// From -1 up to but excluding 1, in steps that single precision holds.
     float coordinate() { return static_cast<float>(below(0x10000)) / 32768.0f - 1.0f; }
+    Tessara::Math::float3 point(float reach = 1)
+    {
+        return {reach * coordinate(), reach * coordinate(), reach * coordinate()};
+    }
 
 private:
     std::mt19937 engine_;

@@ -5,15 +5,7 @@
 #include <openvdb/io/File.h>
 #include <openvdb/io/Stream.h>
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
-#include <algorithm>
-#include <limits>
-#include <map>
-#include <random>
 #include <sstream>
-#include <tuple>
 
 namespace ModelingProgram {
 
@@ -32,8 +24,6 @@ namespace {
     using openvdb::FloatGrid;
     using openvdb::math::Transform;
     using testing::HasSubstr;
-    using TSR::TileTree3D::ConstantBox;
-    using TSR::TileTree3D::Voxel;
 
     /// What OpenVDB writes.
     void write(std::filesystem::path const& file, openvdb::GridPtrVec const& grids,
@@ -59,10 +49,10 @@ namespace {
     FloatGrid::Ptr makeVariedGrid(char const* name)
     {
         FloatGrid::Ptr const grid = makeGrid(name);
-        std::mt19937 random(1); // the same values in every run
+        Random random(1);
         for (int i = -9; i != 9; ++i)
             for (int j = 0; j != 5; ++j)
-                grid->tree().setValueOn(Coord(i, j * j, -i), static_cast<float>(random() % 64) * 0.25f);
+                grid->tree().setValueOn(Coord(i, j * j, -i), static_cast<float>(random.below(64)) * 0.25f);
         grid->tree().setValueOff(Coord(1, 2, 0), 5.0f);
         grid->tree().setValueOff(Coord(1, 3, 0), -5.0f);
         grid->sparseFill(CoordBBox(Coord(64), Coord(95)), 0.5f);
@@ -70,39 +60,22 @@ namespace {
         return grid;
     }
 
-    bool isBefore(Voxel const& a, Voxel const& b)
-    {
-        return std::tuple(a.i, a.j, a.k) < std::tuple(b.i, b.j, b.k);
-    }
-
-    std::vector<Voxel> sorted(std::vector<Voxel> voxels)
-    {
-        std::sort(voxels.begin(), voxels.end(), isBefore);
-        return voxels;
-    }
+    using Boxes = std::map<std::array<int, 6>, float>; // by their first and last voxels
 
     void expectSame(SparseVolume const& volume, FloatGrid const& grid)
     {
-        std::vector<Voxel> expected;
-        std::size_t tiles = 0;
+        Boxes expected, found;
         for (auto at = grid.cbeginValueOn(); at; ++at) {
-            Coord const first = at.getCoord();
-            if (at.isVoxelValue()) {
-                expected.push_back({first[0], first[1], first[2], *at});
-                continue;
-            }
-            ++tiles;
-            EXPECT_TRUE(std::any_of(volume.boxes.begin(), volume.boxes.end(), [&](ConstantBox const& box) {
-                CoordBBox const tile = at.getBoundingBox();
-                return Coord(box.first.i, box.first.j, box.first.k) == tile.min()
-                    && Coord(box.end.i - 1, box.end.j - 1, box.end.k - 1) == tile.max() && box.value == *at;
-            }));
+            Coord const first = at.getBoundingBox().min(), last = at.getBoundingBox().max();
+            expected[{first[0], first[1], first[2], last[0], last[1], last[2]}] = *at;
         }
-        EXPECT_EQ(volume.boxes.size(), tiles);
+        for (auto const& [i, j, k, value] : volume.voxels)
+            found[{i, j, k, i, j, k}] = value;
+        for (auto const& [first, end, value] : volume.boxes)
+            found[{first.i, first.j, first.k, end.i - 1, end.j - 1, end.k - 1}] = value;
+        EXPECT_TRUE(found == expected);
+        EXPECT_EQ(volume.voxels.size() + volume.boxes.size(), expected.size());
         EXPECT_EQ(volume.activeCount(), grid.activeVoxelCount());
-        std::vector<Voxel> const voxels = sorted(volume.voxels);
-        EXPECT_TRUE(std::ranges::equal(voxels, sorted(expected),
-            [](Voxel const& a, Voxel const& b) { return !isBefore(a, b) && !isBefore(b, a) && a.value == b.value; }));
         EXPECT_EQ(volume.background, grid.background());
         openvdb::Vec3d const place = grid.indexToWorld(Coord(3, -4, 5));
         EXPECT_DOUBLE_EQ(place[0], 3 * volume.voxelSize + volume.translation[0]);
@@ -134,8 +107,9 @@ namespace {
                 same->setName("a");
                 FloatGrid::Ptr const empty = FloatGrid::create();
                 empty->setTransform(grid->transformPtr());
-                write(
-                    file, {openvdb::BoolGrid::create(), grid, openvdb::Vec3SGrid::create(), same, empty}, compression);
+                auto const bools = openvdb::GridBase::createGrid("Tree_bool_5_4_3");
+                auto const vectors = openvdb::GridBase::createGrid("Tree_vec3s_5_4_3");
+                write(file, {bools, grid, vectors, same, empty}, compression);
                 std::vector<VdbGrid> const grids = listVdbGrids(file);
                 ASSERT_EQ(grids.size(), 5);
                 EXPECT_EQ(grids[0].type + grids[1].type + grids[2].type, "boolfloatvec3s");
@@ -225,7 +199,7 @@ namespace {
         constexpr int kFilesEach = 600;
         TemporaryFolder const folder;
         std::filesystem::path const file = folder / "a.vdb";
-        std::mt19937 random(1); // the same files in every run
+        Random random(1);
         for (std::uint32_t const compression : {2u, 3u, 6u}) {
             write(file, {makeVariedGrid("a"), makeGrid("b")}, compression);
             std::string const whole = contentOf(file);
@@ -233,8 +207,8 @@ namespace {
                 std::string broken = whole;
                 // Half of them in what comes before the values.
                 std::size_t const end = i % 2 == 0 ? whole.size() : std::min<std::size_t>(whole.size(), 2000);
-                broken[random() % end] ^= static_cast<char>(1 << random() % 8);
-                broken[random() % end] = static_cast<char>(random());
+                broken[random.below(end)] ^= static_cast<char>(1 << random.below(8));
+                broken[random.below(end)] = static_cast<char>(random.below(256));
                 store(file, broken);
                 refusalOfGrid(file);
             }

@@ -65,14 +65,14 @@ namespace {
     TEST(WritePly, bringsPropertiesOfAllTypesBack)
     {
         Object const mesh = twoFaces();
-        for (std::string const prefix : {"", "face:"}) {
-            char const* const component = prefix.empty() ? sPointComp : sFaceComp;
-            forEachElementTypeName([&]<class T>(ElementType<T> type) {
-                if constexpr (std::is_trivially_copyable_v<T> && !std::is_same_v<T, bool>)
-                    addDataProperty<T>((prefix + "a_" + type.name).c_str(), component,
-                        someValues<T>(getElementCount(*mesh, component)), *mesh);
-            });
+        Random random(1);
+        for (char const* const component : {sPointComp, sFaceComp}) {
+            addAllTypes(component, random, *mesh);
+            for (std::string const type : {"bool", "string", "GeoLocation"}) // are tested below, or have no columns
+                mesh->eraseProperty((component + type).c_str());
         }
+        addDataProperty<float>("face:both", sFaceComp, {1, 2}, *mesh);
+        addDataProperty<float>("both", sPointComp, {1, 2, 3, 4, 5}, *mesh);
         addDataProperty<uchar4>("color", sPointComp, someValues<uchar4>(5), *mesh);
         addDataProperty<uchar3>("face:color", sFaceComp, someValues<uchar3>(2), *mesh);
         addDataProperty<double3>("normal", sPointComp, someValues<double3>(5), *mesh);
@@ -82,8 +82,8 @@ namespace {
         EXPECT_EQ(file.notes.size(), 2 * 7);
         for (std::string const type :
             {"long", "ulong", "float2x2", "double2x2", "GeometryType", "FaceEdge", "GraphTransforms"})
-            for (std::string const prefix : {"a_", "face:a_"})
-                mesh->eraseProperty((prefix + type).c_str());
+            for (std::string const component : {sPointComp, sFaceComp})
+                mesh->eraseProperty((component + type).c_str());
         EXPECT_TRUE(sameContents(*sorted(*file.object), *sorted(*mesh)));
     }
 
