@@ -11,10 +11,8 @@ namespace PlainEditing {
 
 using Flags = Orvan::Array<bool>;
 using Indices = Orvan::Array<unsigned int>;
-using Tessara::Object;
 using Tessara::PropertyValue;
 using namespace TestSupport;
-using namespace Tessara::Geometry;
 
 inline Indices mapping(Flags const& deleted)
 {

@@ -4,8 +4,6 @@
 
 using namespace Modeling;
 using namespace TestSupport;
-using namespace Tessara::Geometry;
-using Tessara::Object;
 using Indices = Orvan::Array<unsigned int>;
 
 namespace {

@@ -12,15 +12,14 @@
 
 #include <thread>
 
-using namespace Tessara::Geometry;
 using namespace Tessara::GeometryAlgorithms;
 using namespace TestSupport;
 using PlainMerge::Inputs, PlainMerge::Kind;
-using Tessara::Object;
 
 namespace {
 
 using Indices = std::vector<unsigned int>;
+using IndexArray = Orvan::Array<unsigned int>;
 
 bool merge(Kind kind, Inputs const& inputs, Object& output)
 {
@@ -138,9 +137,17 @@ TEST(Merge, joinsByHand)
     };
     auto const cloud = merged(
         Kind::PointClouds, inputsOf(with({0, 2, 1}, {10, 20, 30}), cloudOf(2), with({1, kInvalidIndex}, {40, 50})));
-    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "material"), (Orvan::Array<unsigned int>{0, 2, 1, 5, 5, 4, 2}));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "material"), (IndexArray{0, 2, 1, 5, 5, 4, 2}));
     EXPECT_EQ(valuesOf<int>(*cloud, "color"), (std::vector<int>{10, 20, 30, 40, 50, 77}));
     EXPECT_EQ(valuesOf<int>(*cloud, "weight"), (std::vector<int>{5, 3, 3, 3, 3, 5, 3}));
+
+    // Indices that are too many run on into the next one's elements, where that has none.
+    auto longer = with({1}, {30, 40});
+    replaceIn("material", sIndices, Orvan::makePtr<IndexArray>(IndexArray{1, 1, 1}), *longer);
+    auto shorter = with({0, 0}, {50});
+    replaceIn("material", sIndices, Orvan::makePtr<IndexArray>(IndexArray{0}), *shorter);
+    auto const odd = merged(Kind::PointClouds, inputsOf(with({0, 0}, {10, 20}), std::move(longer), std::move(shorter)));
+    EXPECT_EQ(*getRangeGeoPropIndices(*odd, "material"), (IndexArray{0, 0, 3, 4, 3}));
 
     Orvan::Ptr<Object> const triangle = makeMesh({{0, 0, 0}, {1, 0, 0}, {0, 1, 0}}, {0, 1, 2}, {0, 3});
     auto const mesh = merged(
@@ -280,7 +287,9 @@ TEST(Merge, joinsManySmallInputsThatAreAlikeOrNot)
                 auto copy = deepCopy(*input);
                 // Data in some, another type of data in others; not even a geo property, but with values.
                 if (random.below(3) == 0)
-                    addDataProperty<int>("weight", sPointComp, {1, 2}, *copy, 5);
+                    addDataProperty<int>("weight",
+                        PlainMerge::componentsOf(kind)[random.below(2) % PlainMerge::componentsOf(kind).size()], {1, 2},
+                        *copy, 5);
                 else if (random.below(3) == 0)
                     addDataProperty<float>("weight", sPointComp, {1.5f}, *copy, 0.5f);
                 else if (random.below(3) == 0)

@@ -88,9 +88,7 @@ TEST_F(Commands, RemoveSliversKeepsClosedManifolds)
     EXPECT_TRUE(areEqual("again.ply", "out.ply"));
 
     json const none = runForJson("remove-slivers cylinder.obj out.obj --ratio 0.01"); // nothing collapses
-    EXPECT_EQ(none["before"], none["after"]);
     EXPECT_TRUE(none["droppedProperties"].empty());
-    EXPECT_EQ(runForJson("info out.obj")["properties"], runForJson("info cylinder.obj")["properties"]);
     EXPECT_EQ(run("remove-slivers cylinder.obj cylinder.obj --ratio 0.1").exitCode, 0); // in place
     EXPECT_EQ(runForJson("info cylinder.obj")["counts"], info["counts"]);
 }
@@ -250,18 +248,13 @@ TEST_F(Commands, MakeVolumeGuidesSubdivide)
     run("make-volume bunny.obj again.vdb --distance-to -3 7.5 0 --from 0.25 --to 3 --voxels 60 --threads 1");
     EXPECT_TRUE(areEqual("again.vdb", "guide.vdb"));
 
-    run("subdivide bunny.obj plain.ply --relative 0.01");
     json const guided = runForJson("subdivide bunny.obj guided.ply --relative 0.01 --volume guide.vdb --grid scale");
     json volume = made["volume"];
     volume["coveredFaces"] = 3674;
     EXPECT_EQ(guided["volume"], volume);
     EXPECT_EQ(guided["inputs"][1]["format"], "OpenVDB");
-    // At the head there are more faces than without the volume, far from there fewer.
-    auto const facesIn = [&](char const* mesh, char const* box) {
-        return runForJson("delete-faces " + std::string(mesh) + " part.ply --box " + box)["picked"].get<int>();
-    };
-    EXPECT_GT(facesIn("guided.ply", "-5 6 -4 -1 9 4"), 2 * facesIn("plain.ply", "-5 6 -4 -1 9 4"));
-    EXPECT_LT(facesIn("guided.ply", "2 -9 -9 9 9 9"), facesIn("plain.ply", "2 -9 -9 9 9 9"));
+    // Coarse far from the head: fewer faces than without the volume.
+    EXPECT_LT(guided["after"]["faces"], runForJson("subdivide bunny.obj out.ply --relative 0.0025")["after"]["faces"]);
     run("subdivide bunny.obj again.ply --relative 0.01 --volume guide.vdb --tile-side 5 --threads 1");
     EXPECT_TRUE(areEqual("again.ply", "guided.ply"));
 
@@ -271,11 +264,9 @@ TEST_F(Commands, MakeVolumeGuidesSubdivide)
             "0 0 0 1\n9 0 0 4\n9 9 0 4\n0 9 0 1\n4 0 1 2 3\n"));
     json const heat =
         runForJson("make-volume square.ply heat.vdb --attribute heat --voxel-size 1 --band 1 --grid heat");
-    EXPECT_EQ(heat["volume"],
-        json({{"grid", "heat"}, {"activeVoxels", 3 * 100 + 4 * 10}, {"voxelSize", 1}, {"smallestValue", 1},
-            {"largestValue", 4}, {"background", 1}}));
+    EXPECT_EQ(at(heat, {"volume/grid", "volume/activeVoxels", "volume/largestValue", "volume/background"}),
+        json({"heat", 3 * 100 + 4 * 10, 4, 1}));
     Result const away = run("subdivide bunny.obj out.ply --relative 0.1 --volume heat.vdb --min-value 2");
-    EXPECT_EQ(away.exitCode, 0);
     EXPECT_THAT(away.output, HasSubstr("values from 2 to 4, background 2\n"));
 }
 
@@ -307,36 +298,24 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"subdivide isolated.obj out.obj --tolerance 1", 5, "1 point belongs to no face. The first is point 4"},
         {"subdivide cylinder.obj out.obj --relative 1e-9", 5, "finer than single precision"},
         {"subdivide cylinder.obj out.obj --relative 1e-3 --max-memory 1kB", 7, "which --max-memory allows"},
-        {"subdivide cylinder.obj out.obj", 2, "is required"},
         {"subdivide cylinder.obj out.obj --tolerance 0", 2, "0 is not a positive number"},
-        {"merge lines.obj cube.ply out.obj", 5, "lines.obj holds a strand set"},
         {"merge cube.ply spider.obj out.obj --source-attribute normal", 5, "already has a property"},
-        {"merge out.obj", 2, "and then the one to write"},
         {"triangulate lines.obj out.obj", 5, "lines.obj holds a strand set"},
         {"triangulate cube.ply out.obj --channels '* ^'", 2, "--channels: "},
-        {"remove-slivers missing.obj out.obj", 3, "missing.obj"},
         {"remove-slivers broken.obj out.obj", 3, "broken.obj"},
-        {"validate broken.obj", 3, "broken.obj"},
         {"remove-slivers cylinder.obj out.off", 3, "has to end in .obj, .ply, .stl or .vtp"},
         {"remove-slivers cylinder.obj nowhere/out.obj", 3, "there is no folder nowhere"},
         {"remove-slivers cylinder.obj folder.obj", 3, "it is a folder"},
         {"remove-slivers cylinder.obj out.obj --ratio 1.5", 2, "1.5 is not a number from 0 to 1"},
-        {"remove-slivers cylinder.obj out.obj --ratio nan", 2, "nan is not a number"},
         {"remove-slivers cylinder.obj out.obj --threads 0", 2, "--threads"},
-        {"remove-slivers cylinder.obj", 2, "OUT"},
         {"delete-faces cloud.ply out.obj --indices list", 5, "needs a mesh, and cloud.ply holds a point cloud"},
         {"delete-points cube.ply out.obj --indices list", 5, "needs a point cloud, and cube.ply holds a mesh"},
         {"delete-faces cube.ply out.obj --indices list", 3, "list, line 2: index 6 is out of range: there are 6 faces"},
         {"delete-points cloud.ply out.obj --attribute other", 5, "These have: label (uchar)"},
-        {"delete-points cloud.ply out.obj --box 0 0 0 1 1", 2, "6 required"},
-        {"delete-points cloud.ply out.obj --box 0 0 0 1 1 1 --indices list", 2, "Exactly 1"},
         {"add-points cloud.ply cube.ply out.obj --tag sPointPosition", 5, "would take the place of the points"},
-        {"subdivide bunny.obj out.obj --relative 0.1 --grid scale", 2, "--volume"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb --grid no", 5, "There are: \"scale\" (float)"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume bunny.obj", 3, "it is no OpenVDB file"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb", 5, "times the smallest positive value"},
-        {"make-volume bunny.obj out.obj --distance-to 0 0 0", 3, "has to end in .vdb"},
-        {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --from 1", 2, "--to"},
         {"make-volume bunny.obj out.vdb --attribute heat", 5, "\"heat\""},
         {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --voxel-size 1e-9", 5, "too small"},
         {"", 2, "subcommand"},

@@ -5,8 +5,6 @@
 
 #include "support/MeshBuilder.h"
 
-#include <Modeling/subdivide.h>
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -89,29 +87,6 @@ TEST(GuideVolume, ScalesTheToleranceWhereTheFileHasIt)
             EXPECT_LE(toleranceIn(0.1f, 2, arraysOf(refined)), before * 0.25f);
             EXPECT_GT(toleranceIn(-2, -0.3f, arraysOf(refined)), before * 0.5f);
         }
-}
-
-TEST(GuideVolume, OfOneValueIsATolerance)
-{
-    auto const sphere = MeshBuilder::sphereWithFaces(2000).build();
-    float const tolerance = toleranceIn(-2, 2, arraysOf(*sphere)) / 2;
-    Tessara::Object expected = *sphere;
-    Geometry::Mesh::subdivide(tolerance, expected);
-    SparseVolume volume;
-    volume.name = "constant";
-    volume.background = 0.5f;
-    volume.boxes = {{{-9, -9, -9}, {9, 9, 9}, 0.25f}};
-    GuideOptions options;
-    options.leastValue = 0.5f;
-    Report report("test");
-    GuideVolume const guide = throughFile(volume, report, options);
-    EXPECT_EQ(guide.smallestPositiveValue(), 0.5f);
-    Tessara::Object refined = *sphere;
-    guide.refine(2 * tolerance, refined);
-    MeshArrays const a = arraysOf(expected), b = arraysOf(refined);
-    ASSERT_EQ(a.pointCount(), b.pointCount());
-    EXPECT_TRUE(std::equal(a.positions->begin(), a.positions->end(), b.positions->begin()));
-    EXPECT_TRUE(std::equal(a.faceVertex->begin(), a.faceVertex->end(), b.faceVertex->begin()));
 }
 
 TEST(GuideVolume, SaysWhatItCannotHold)

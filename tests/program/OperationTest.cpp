@@ -60,15 +60,6 @@ TEST(Operation, DropsWhatBelongsToElements)
     EXPECT_TRUE(validate(*mesh));
 }
 
-TEST(Operation, RefusesInvalidGeometry)
-{
-    auto const mesh = MeshBuilder::tetrahedron().build();
-    EXPECT_EQ(exitCodeOf([&] { requireValid(*mesh, "a.obj"); }), ExitCode::Done);
-    setElementCount(sPointComp, 3, *mesh);
-    EXPECT_EQ(exitCodeOf([&] { requireValid(*mesh, "a.obj"); }), ExitCode::Invalid);
-    EXPECT_EQ(exitCodeOf([&] { requireValid(Tessara::Object(), "a.obj"); }), ExitCode::Invalid);
-}
-
 TEST(Operation, EndsAsCancelledWhenTheJobIs)
 {
     Report report("test");

@@ -6,7 +6,6 @@
 #include <bit>
 
 using namespace Modeling;
-using namespace Tessara::Geometry;
 using namespace TestSupport;
 using Tessara::Modeling::pair;
 using Tessara::Modeling::StitchTemplate;

@@ -147,6 +147,21 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
     }
 }
 
+TYPED_TEST(VoxelSampling, findsInCoarseBoxesWhatVoxelsWouldGive)
+{
+    ConstantBox const boxes[] = {{{-80, -80, -80}, {71, 71, 71}, 5}};
+    auto const coarse =
+        buildVolume<TypeParam>({.background = kBackground, .depth = TypeParam::kUnitDepth, .boxes = boxes});
+    auto const fine = volumeOf<TypeParam>(Field::of(-80, 71, [](int, int, int) { return 5.0f; }), 7,
+        TypeParam::kUnitDepth - coarse.channel.coarsestDepth());
+    auto coarseSampler = samplerOf(coarse), fineSampler = samplerOf(fine);
+    Random random(2);
+    for (int n = 0; n < 20'000; ++n) {
+        float3 const p = random.point(81);
+        ASSERT_EQ(sampled(coarseSampler, p), sampled(fineSampler, p)) << p.x << ' ' << p.y << ' ' << p.z;
+    }
+}
+
 TYPED_TEST(VoxelSampling, takesRowsAsItTakesPoints)
 {
     Field const field = Field::random(-2 * TypeParam::kSide, 2 * TypeParam::kSide);

@@ -25,3 +25,12 @@
 #include <map>
 #include <string>
 #include <vector>
+
+namespace TestSupport {
+
+using namespace Tessara::Geometry;
+using Tessara::Object;
+
+inline constexpr float kNan = std::numeric_limits<float>::quiet_NaN();
+
+}

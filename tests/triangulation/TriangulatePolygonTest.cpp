@@ -14,8 +14,6 @@ namespace {
 using Corners = std::vector<float3>;
 using Triangles = std::vector<unsigned int>;
 
-constexpr float kNan = std::numeric_limits<float>::quiet_NaN();
-
 Triangles triangulated(Corners const& corners)
 {
     static Modeling::Internal::PolygonStorage storage; // used again, as in a mesh

@@ -2,10 +2,8 @@
 
 #include "support/Testing.h"
 
-using namespace Tessara::Geometry;
 using namespace TestSupport;
 using Geometry::Mesh::triangulate;
-using Tessara::Object;
 
 namespace {
 
@@ -111,19 +109,6 @@ TEST(Triangulate, takesOddMeshesAndLeavesIncompleteOnes)
         triangulate("", **mesh);
         EXPECT_TRUE(sameContents(**mesh, *before));
     }
-}
-
-TEST(Triangulate, keepsAClosedSurfaceAndLeavesTrianglesAsTheyAre)
-{
-    auto const prism = makeMesh(
-        {{0, 0, 0}, {3, 0, 0}, {3, 3, 0}, {1, 1, 0}, {0, 3, 0}, {0, 0, 1}, {3, 0, 1}, {3, 3, 1}, {1, 1, 1}, {0, 3, 1}},
-        {4, 3, 2, 1, 0, 5, 6, 7, 8, 9, 0, 1, 6, 5, 1, 2, 7, 6, 2, 3, 8, 7, 3, 4, 9, 8, 4, 0, 5, 9},
-        {0, 5, 10, 14, 18, 22, 26, 30});
-    auto const cut = triangulated(*prism);
-    EXPECT_TRUE(isClosedManifold(*cut));
-    EXPECT_EQ(countsOf(*cut), (Counts{10, 48, 16}));
-    EXPECT_EQ(eulerCharacteristic(*cut), 2);
-    EXPECT_TRUE(sameContents(*triangulated(*cut), *cut));
 }
 
 TEST(Triangulate, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)

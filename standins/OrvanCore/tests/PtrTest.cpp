@@ -18,20 +18,6 @@ using Orvan::Ptr;
 
 using Ints = Array<int>;
 
-TEST(Ptr, nullHasNoControlBlock)
-{
-    TestSupport::sweepFailingAllocations([](TestSupport::Attempt const& attempt) {
-        EXPECT_TRUE(attempt([] { // takes no memory at all, so nothing can fail
-            Ptr<Ints> null;
-            Ptr<Ints> const fromMutable = MutablePtr<Ints>(nullptr);
-            null = fromMutable;
-            EXPECT_FALSE(makeMutable(std::move(null)));
-            EXPECT_EQ(fromMutable.useCount(), 0u);
-            EXPECT_EQ(fromMutable, nullptr);
-        }));
-    });
-}
-
 TEST(Ptr, countsItsReferences)
 {
     auto const watched = std::make_shared<int>(5);

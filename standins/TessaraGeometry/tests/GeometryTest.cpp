@@ -7,7 +7,6 @@
 #include <gmock/gmock.h>
 
 #include <functional>
-#include <thread>
 
 using namespace Tessara::Geometry;
 using Tessara::Object;
@@ -242,17 +241,4 @@ TEST(Validators, reportOddProperties)
     EXPECT_THAT(textsOf(reportProperties(*mesh)),
         ElementsAre("\"weight\" has 2 entries for 4 elements of sPointComp",
             "\"astray\" targets \"nowhere\", which is not there", "\"range\"[1] is 2, but \"tint\" has 2 values"));
-}
-
-TEST(Geometry, isReadByManyThreadsAtOnce)
-{
-    auto const mesh = twoTriangles();
-    std::vector<std::thread> readers;
-    for (int reader = 0; reader != 4; ++reader)
-        readers.emplace_back([&object = *mesh] {
-            for (int round = 0; round != 200; ++round)
-                EXPECT_TRUE(validateMesh(object) && reportProperties(object).empty());
-        });
-    for (std::thread& reader : readers)
-        reader.join();
 }

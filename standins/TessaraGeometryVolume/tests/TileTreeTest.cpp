@@ -147,20 +147,25 @@ TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
 
 TYPED_TEST(TileTree, fineTilesInsideCoarseOnesKeepTheirValues)
 {
-    constexpr int kCoarse = TypeParam::kUnitDepth - 2;
-    int const ratio = TypeParam::kChildrenPerAxis * TypeParam::kChildrenPerAxis;
-    std::vector<Voxel> const coarse{{-1, 0, 0, 8}, {-2, 0, 0, 6}}, fine{{-1, 0, 0, 5}};
-    VoxelList const lists[] = {{TypeParam::kUnitDepth, fine}, {kCoarse, coarse}};
-    VolumeSource source = sourceOf<TypeParam>();
-    source.lists = lists;
-    auto const volume = buildVolume<TypeParam>(source);
-    EXPECT_EQ(valueAt(volume, {-1, 0, 0}), 5);
-    EXPECT_EQ(valueAt(volume, {-2, 0, 0}), 8);
-    EXPECT_EQ(valueAt(volume, {-ratio, ratio - 1, 0}), 8);
-    EXPECT_EQ(valueAt(volume, {-ratio - 1, 0, 0}), 6);
-    EXPECT_EQ(valueAt(volume, {-ratio - 1, ratio, 0}), -1);
-    EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, kCoarse), 8);
-    EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, kCoarse - 1), -1) << "coarser than any data";
+    for (int const levels : {1, 2}) {
+        int const coarseDepth = TypeParam::kUnitDepth - levels;
+        int const ratio =
+            levels == 1 ? TypeParam::kChildrenPerAxis : TypeParam::kChildrenPerAxis * TypeParam::kChildrenPerAxis;
+        std::vector<Voxel> const coarse{{-1, 0, 0, 8}, {-2, 0, 0, 6}}, fine{{-1, 0, 0, 5}, {1000, 0, 0, 9}};
+        VoxelList const lists[] = {{TypeParam::kUnitDepth, fine}, {coarseDepth, coarse}};
+        VolumeSource source = sourceOf<TypeParam>();
+        source.lists = lists;
+        auto const volume = buildVolume<TypeParam>(source);
+        EXPECT_EQ(valueAt(volume, {-1, 0, 0}), 5);
+        EXPECT_EQ(valueAt(volume, {-2, 0, 0}), 8);
+        EXPECT_EQ(valueAt(volume, {-ratio, ratio - 1, 0}), 8);
+        EXPECT_EQ(valueAt(volume, {-ratio - 1, 0, 0}), 6);
+        EXPECT_EQ(valueAt(volume, {-ratio - 1, ratio, 0}), -1);
+        EXPECT_EQ(valueAt(volume, {1000, 0, 0}), 9);
+        EXPECT_EQ(valueAt(volume, {1000 + TypeParam::kSide, 0, 0}), -1) << "not the value of the tile above";
+        EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, coarseDepth), 8);
+        EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, coarseDepth - 1), -1) << "coarser than any data";
+    }
 }
 
 TYPED_TEST(TileTree, coarserTilesTakeTheValueOrTheMean)
@@ -236,19 +241,4 @@ TYPED_TEST(TileTree, refusesWhatTheLayoutDoesNotHave)
     source.offsetType = 8;
     EXPECT_THROW(buildVolume<TypeParam>(source), std::invalid_argument);
     EXPECT_EQ(buildVolume<TypeParam>(sourceOf<TypeParam>()).channel.coarsestDepth(), TypeParam::kDepthCount);
-}
-
-TYPED_TEST(TileTree, takesMemoryForActiveTilesOnly)
-{
-    // The shell of a ball in 464³ voxels.
-    std::vector<Voxel> shell;
-    forEachVoxel(-66, 67, [&](int i, int j, int k) {
-        if (int const squared = i * i + j * j + k * k; 65 * 65 < squared && squared < 66 * 66)
-            shell.push_back({3 * i, 3 * j, 3 * k, float(squared)});
-    });
-    auto const volume = volumeOf<TypeParam>(shell, sourceOf<TypeParam>());
-    std::size_t bytes = volume.container.memoryInBytes();
-    for (int depth = 0; depth < TypeParam::kDepthCount; ++depth)
-        bytes += volume.channel.values(depth).capacity() * sizeof(float);
-    EXPECT_LT(bytes, 60'000'000); // of 400 MB that a dense field would take
 }

@@ -1,4 +1,3 @@
-#include <TessaraMathSupport/ExceptionMessage.h>
 #include <TessaraMathSupport/Loggers.h>
 #include <TessaraMathSupport/Stepper.h>
 
@@ -126,9 +125,4 @@ TEST(Loggers, shareTheSinkBetweenThreads)
         thread.join();
     CoreGL::OrvanLogger::setSink(nullptr);
     EXPECT_LE(lineCount, 600);
-}
-
-TEST(ExceptionMessage, isTheTextOfCancelledJobs)
-{
-    EXPECT_STREQ(TSR::exceptionMessage.c_str(), "job cancelled");
 }

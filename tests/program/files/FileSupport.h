@@ -14,7 +14,6 @@
 
 namespace ModelingProgram {
 
-using namespace Tessara::Geometry;
 using namespace Tessara::Math;
 using namespace TestSupport;
 

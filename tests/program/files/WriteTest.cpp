@@ -49,16 +49,14 @@ namespace {
         return {contentOf(file), std::move(notes), extension == ".vtp" ? nullptr : readGeometryFile(file).object};
     }
 
-    /// The same in any order of keys.
+    /// The same, with its keys in alphabetical order.
     Object sorted(Tessara::Object const& object)
     {
-        auto const keys = object.keys();
-        std::map<std::string, Tessara::PropertyValue> properties;
-        for (Orvan::String const& key : *keys)
-            properties[key.c_str()] = object.getProperty(key);
+        auto keys = *object.keys();
+        std::sort(keys.begin(), keys.end());
         Object result = Tessara::createObject();
-        for (auto& [key, value] : properties)
-            result->setProperty(key.c_str(), std::move(value));
+        for (Orvan::String const& key : keys)
+            result->setProperty(key, object.getProperty(key));
         return result;
     }
 
