@@ -156,6 +156,14 @@ TEST(Merge, joinsByHand)
     EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, 3, 6}));
     EXPECT_EQ(countsOf(*mesh), (Counts{7, 6, 2}));
 
+    // One name on two components: each has what belongs to it, and the last one stays.
+    auto onPoints = deepCopy(*triangle), onFaces = deepCopy(*triangle);
+    addDataProperty<int>("tag", sPointComp, {1, 2, 3}, *onPoints);
+    addDataProperty<int>("tag", sFaceComp, {7}, *onFaces);
+    auto const tagged = merged(Kind::Meshes, inputsOf(std::move(onPoints), std::move(onFaces)));
+    EXPECT_EQ(getGeoPropTargetName(*tagged, "tag"), sFaceComp);
+    EXPECT_EQ(valuesOf<int>(*tagged, "tag"), (std::vector<int>{1, 7}));
+
     auto const strands = merged(Kind::Strands,
         inputsOf(makeStrands(Orvan::Array<float3>(10), {0, 4, 10}), makeStrands({{}, {}}, {0}),
             makeStrands(Orvan::Array<float3>(6), {0, 6})));
@@ -287,9 +295,7 @@ TEST(Merge, joinsManySmallInputsThatAreAlikeOrNot)
                 auto copy = deepCopy(*input);
                 // Data in some, another type of data in others; not even a geo property, but with values.
                 if (random.below(3) == 0)
-                    addDataProperty<int>("weight",
-                        PlainMerge::componentsOf(kind)[random.below(2) % PlainMerge::componentsOf(kind).size()], {1, 2},
-                        *copy, 5);
+                    addDataProperty<int>("weight", sPointComp, {1, 2}, *copy, 5);
                 else if (random.below(3) == 0)
                     addDataProperty<float>("weight", sPointComp, {1.5f}, *copy, 0.5f);
                 else if (random.below(3) == 0)

@@ -221,7 +221,9 @@ TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
     Random random(1);
     for (char const* const component : {sPointComp, sFaceVertexComp, sFaceComp})
         addAllTypes(component, random, *mesh);
-    addDataProperty<float>("sPointCompShort", sPointComp, {6}, *mesh);
+    Orvan::Array<float> tooShort(8, 6);
+    tooShort.resize(1); // what is behind its end is not for anybody to see
+    addDataProperty<float>("sPointCompShort", sPointComp, std::move(tooShort), *mesh);
     addRangeProperty("range", sPointComp, {0, 0, 0, 0}, *mesh);
     addDataProperty<float>("of range", "range", {1}, *mesh);
     addDataProperty<float>("of int", "sPointCompint", {1}, *mesh);

@@ -149,15 +149,17 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
 
 TYPED_TEST(VoxelSampling, findsInCoarseBoxesWhatVoxelsWouldGive)
 {
-    ConstantBox const boxes[] = {{{-80, -80, -80}, {71, 71, 71}, 5}};
+    // Up to where coarse tiles end: those there would blend with what is behind.
+    auto const end = static_cast<int>(2 * TypeParam::tileWidth(TypeParam::kUnitDepth - 1));
+    ConstantBox const boxes[] = {{{-end, -end, -end}, {end, end, end}, 5}};
     auto const coarse =
         buildVolume<TypeParam>({.background = kBackground, .depth = TypeParam::kUnitDepth, .boxes = boxes});
-    auto const fine = volumeOf<TypeParam>(Field::of(-80, 71, [](int, int, int) { return 5.0f; }), 7,
+    auto const fine = volumeOf<TypeParam>(Field::of(-end, end, [](int, int, int) { return 5.0f; }), 7,
         TypeParam::kUnitDepth - coarse.channel.coarsestDepth());
     auto coarseSampler = samplerOf(coarse), fineSampler = samplerOf(fine);
     Random random(2);
     for (int n = 0; n < 20'000; ++n) {
-        float3 const p = random.point(81);
+        float3 const p = random.point(static_cast<float>(end + 1));
         ASSERT_EQ(sampled(coarseSampler, p), sampled(fineSampler, p)) << p.x << ' ' << p.y << ' ' << p.z;
     }
 }
