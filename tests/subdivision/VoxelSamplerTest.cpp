@@ -149,12 +149,12 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
 
 TYPED_TEST(VoxelSampling, findsInCoarseBoxesWhatVoxelsWouldGive)
 {
-    // Up to where coarse tiles end: those there would blend with what is behind.
+    // Two boxes that meet where coarse tiles end: those there would blend with one another from too far away.
     auto const end = static_cast<int>(2 * TypeParam::tileWidth(TypeParam::kUnitDepth - 1));
-    ConstantBox const boxes[] = {{{-end, -end, -end}, {end, end, end}, 5}};
+    ConstantBox const boxes[] = {{{-end, -end, -end}, {0, end, end}, 5}, {{0, -end, -end}, {end, end, end}, 7}};
     auto const coarse =
         buildVolume<TypeParam>({.background = kBackground, .depth = TypeParam::kUnitDepth, .boxes = boxes});
-    auto const fine = volumeOf<TypeParam>(Field::of(-end, end, [](int, int, int) { return 5.0f; }), 7,
+    auto const fine = volumeOf<TypeParam>(Field::of(-end, end, [](int i, int, int) { return i < 0 ? 5.0f : 7.0f; }), 7,
         TypeParam::kUnitDepth - coarse.channel.coarsestDepth());
     auto coarseSampler = samplerOf(coarse), fineSampler = samplerOf(fine);
     Random random(2);
