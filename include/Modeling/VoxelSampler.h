@@ -164,7 +164,7 @@ private:
         float const* values = nullptr;
         TileType const* unlike = nullptr; // where it is of another depth, or has no values
 
-        bool isOf(IJK asked, int askedDepth) const noexcept
+        MODELING_NO_EXPORT bool isOf(IJK asked, int askedDepth) const noexcept
         {
             return ((index.i ^ asked.i) | (index.j ^ asked.j) | (index.k ^ asked.k) | (depth ^ askedDepth)) == 0;
         }

@@ -28,7 +28,8 @@ namespace Internal {
 /// Runs `body` over sub-ranges of `range`, on the caller's thread and oneTBB's workers. All loops go through here.
 ///
 /// A range not larger than its grain is one call of `body` on the calling thread: no task, no look at cancellation; an
-/// empty one is none. `body` walks its sub-range upwards and writes only what belongs to the elements at hand.
+/// empty one is none. `body` walks its sub-range upwards and writes only what belongs to the elements at hand. All
+/// threads share it: it is not copied.
 ///
 /// \param isolated  True: a cancellation of an enclosing oneTBB group does not reach the loop. False: it does, and
 ///                  after the loop the job's cancellation is looked at. Only the balance sweep of subdivision does

@@ -37,16 +37,16 @@ namespace {
 
     constexpr unsigned int kPointGrain = 4096; // the tables of a copy of the sampler begin empty
 
-    /// A loop body that is copied with each split of the range, and with it the sampler's cursors and caches: no two
-    /// tasks share them.
+    /// A loop body that works with its own copy of the sampler, whose cursors and caches no two tasks share.
     template <class Traits> struct SampleAtPoints {
-        mutable LinearSampler<Traits> sampler;
+        LinearSampler<Traits> const& original;
         float3 const* position;
         float tolerance;
         float* limit;
 
         void operator()(tbb::blocked_range<unsigned int> const& points) const
         {
+            LinearSampler<Traits> sampler = original;
             constexpr unsigned int kAtOnce = 256;
             float3 mean[kAtOnce];
             unsigned int count = 0;
