@@ -1,9 +1,8 @@
 #include "VdbCodec.h"
 
-#include "OpenVdb.h"
-
 #include <openvdb/io/Archive.h>
 #include <openvdb/io/GridDescriptor.h>
+#include <openvdb/openvdb.h>
 
 #include <algorithm>
 #include <cmath>

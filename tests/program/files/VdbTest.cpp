@@ -1,9 +1,9 @@
 #include "FileSupport.h"
-#include "OpenVdb.h"
 #include "VdbFile.h"
 
 #include <openvdb/io/File.h>
 #include <openvdb/io/Stream.h>
+#include <openvdb/openvdb.h>
 
 #include <sstream>
 
