@@ -9,8 +9,11 @@
 #include <Modeling/subdivisionSteps.h>
 #include <TessaraGeometryVolume/VolumeBuilder.h>
 
+#include <algorithm>
 #include <cmath>
 #include <map>
+#include <random>
+#include <string>
 #include <vector>
 
 using namespace TSR::TileTree3D;
@@ -128,17 +131,44 @@ std::vector<float3> pointsInBand(std::size_t faces, float scale)
     return points;
 }
 
-template <class Traits, bool isPadded> void sampleVolume(benchmark::State& state)
+void allFaceCounts(benchmark::internal::Benchmark* benchmark)
 {
-    std::vector<float3> const points = pointsInBand(static_cast<std::size_t>(state.range(0)), 1);
+    for (std::int64_t const faces : {20'000, 200'000, 2'000'000})
+        benchmark->Arg(faces);
+    benchmark->UseRealTime();
+}
+
+enum class Order { alongMesh, random };
+
+template <class Traits, bool isPadded, Order order, bool inRows> void sampleVolume(benchmark::State& state)
+{
+    std::vector<float3> points = pointsInBand(static_cast<std::size_t>(state.range(0)), 1);
+    if (order == Order::random)
+        std::shuffle(points.begin(), points.end(), std::mt19937(1));
     auto sampler = Guide<Traits>::get().sampler(isPadded);
     std::vector<float> values(points.size());
     for (auto _ : state) {
-        sampler.sampleAll(points.data(), points.size(), Traits::kUnitDepth, 2, values.data());
+        if (inRows)
+            sampler.sampleAll(points.data(), points.size(), Traits::kUnitDepth, kWorldSpace, values.data());
+        else
+            for (std::size_t n = 0; n < points.size(); ++n)
+                values[n] = sampler.sample(points[n], Traits::kUnitDepth, kWorldSpace);
         benchmark::DoNotOptimize(values.data());
         benchmark::ClobberMemory();
     }
     Benchmarks::countElements(state, points.size());
+}
+
+/// Rows of points, and beside them the same points one by one.
+template <class Traits, bool isPadded> void registerSampling(std::string const& name)
+{
+    auto const add = [](std::string const& full, void (*run)(benchmark::State&)) {
+        benchmark::RegisterBenchmark(full.c_str(), run)->Apply(allFaceCounts);
+    };
+    add(name, sampleVolume<Traits, isPadded, Order::alongMesh, true>);
+    add(name + ":single", sampleVolume<Traits, isPadded, Order::alongMesh, false>);
+    add(name + "AtRandom", sampleVolume<Traits, isPadded, Order::random, true>);
+    add(name + "AtRandom:single", sampleVolume<Traits, isPadded, Order::random, false>);
 }
 
 #ifdef MODELING_HAS_OPENVDB
@@ -179,13 +209,6 @@ void copyVoxels(benchmark::State& state)
     Benchmarks::copyBytes(state, bandOfVoxels(static_cast<float>(state.range(0))).size() * sizeof(Voxel));
 }
 
-void allFaceCounts(benchmark::internal::Benchmark* benchmark)
-{
-    for (std::int64_t const faces : {20'000, 200'000, 2'000'000})
-        benchmark->Arg(faces);
-    benchmark->UseRealTime();
-}
-
 void allRadii(benchmark::internal::Benchmark* benchmark)
 {
     for (std::int64_t const voxels : {28, 122})
@@ -201,10 +224,16 @@ BENCHMARK(markByVolume<Traits2, false>)->Name("markByVolume")->Apply(allFaceCoun
 BENCHMARK(markByLength)->Name("markByVolume:length")->Apply(allFaceCounts);
 BENCHMARK(markByVolume<Traits5, true>)->Name("markByPaddedVolume5")->Apply(allFaceCounts);
 BENCHMARK(markByLength)->Name("markByPaddedVolume5:length")->Apply(allFaceCounts);
+BENCHMARK(markByVolume<Traits5, false>)->Name("markByVolume5")->Apply(allFaceCounts);
+BENCHMARK(markByLength)->Name("markByVolume5:length")->Apply(allFaceCounts);
 
-BENCHMARK(sampleVolume<Traits2, true>)->Name("samplePaddedVolume")->Apply(allFaceCounts);
-BENCHMARK(sampleVolume<Traits2, false>)->Name("sampleVolume")->Apply(allFaceCounts);
-BENCHMARK(sampleVolume<Traits5, true>)->Name("samplePaddedVolume5")->Apply(allFaceCounts);
+[[maybe_unused]] bool const areSamplesRegistered = [] {
+    registerSampling<Traits2, true>("samplePaddedVolume");
+    registerSampling<Traits2, false>("sampleVolume");
+    registerSampling<Traits5, true>("samplePaddedVolume5");
+    registerSampling<Traits5, false>("sampleVolume5");
+    return true;
+}();
 
 BENCHMARK(build<Traits2>)->Name("buildVolume")->Apply(allRadii);
 BENCHMARK(build<Traits5>)->Name("buildVolume5")->Apply(allRadii);

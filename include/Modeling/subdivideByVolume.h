@@ -22,9 +22,9 @@ namespace Geometry::Mesh {
 /// \param tolerance  In scene units, for a value of 1.
 /// \return, \throws  As `subdivide`.
 ///
-/// The same result for any number of threads. Takes 4 bytes a point more than `subdivide`. The volume is read once a
-/// point and pass, fastest where the sampler has a padded channel: otherwise a thread builds a padded tile whenever it
-/// comes to the border of another one.
+/// The same result for any number of threads. Allocates 4 bytes per point more than `subdivide`, and per thread what
+/// `LinearSampler::sampleAll` does. The volume is read once per point and pass. That is fastest if the sampler has a
+/// padded channel: otherwise each thread builds a layer around the tiles that it comes to.
 template <class Traits>
 bool subdivide(TSR::TileTree3D::LinearSampler<Traits> const& sampler, Tessara::Object& object, float tolerance);
 

@@ -29,7 +29,7 @@ namespace {
         return nearest - lanesWhere(nearest > p, width);
     }
 
-    /// The two values that stand at each address.
+    /// The two values at each address.
     Lanes loadPairs(float const* a, float const* b)
     {
         using Pairs = double __attribute__((vector_size(16)));
@@ -44,29 +44,49 @@ namespace {
         return (to - from) * fraction + from;
     }
 
-    /// Along x, between the two values at an offset from each of four corners.
-    Lanes blendPairs(float const* const (&corners)[4], int offset, Lanes fraction)
+    /// Along x, between the two values at each of four addresses.
+    Lanes blendPairs(float const* const (&corners)[4], Lanes fraction)
     {
-        Lanes const ab = loadPairs(corners[0] + offset, corners[1] + offset);
-        Lanes const cd = loadPairs(corners[2] + offset, corners[3] + offset);
+        Lanes const ab = loadPairs(corners[0], corners[1]);
+        Lanes const cd = loadPairs(corners[2], corners[3]);
         return blendLanes(
             __builtin_shufflevector(ab, cd, 0, 2, 4, 6), __builtin_shufflevector(ab, cd, 1, 3, 5, 7), fraction);
     }
 
+    struct Coordinates {
+        Lanes voxel, fraction;
+    };
+
+    /// Places in a tile as voxel and fraction, from -1 on.
+    template <bool canBeBelow> Coordinates coordinatesOf(Lanes place, Lanes lastVoxel)
+    {
+        Lanes const inside = lowest(highest(place, Lanes{}), lastVoxel);
+        IntLanes const voxel = __builtin_convertvector(inside, IntLanes);
+        if constexpr (canBeBelow) {
+            IntLanes const isBelow = place <= everyLane(-kBelowTile);
+            Lanes const lower = __builtin_convertvector(voxel + isBelow, Lanes);
+            return {lower, lanesWhere(isBelow | (place >= Lanes{}), place - lower)};
+        } else {
+            Lanes const lower = __builtin_convertvector(voxel, Lanes);
+            return {lower, place - lower};
+        }
+    }
+
 }
 
-bool placePoints(
-    float3 const* points, std::size_t count, float scale, float tileWidth, float voxelsPerUnit, PointRow& row)
+bool placePoints(float3 const* points, std::size_t count, Placing const& placing, PointRow& row)
 {
-    Lanes const width = everyLane(tileWidth), perWidth = everyLane(1 / tileWidth);
+    Lanes const width = everyLane(placing.tileWidth), perWidth = everyLane(1 / placing.tileWidth);
     Lanes const farthest = everyLane(0x1p22f); // up to there all is exact
     IntLanes const noSign = IntLanes{} + INT32_MAX;
     IntLanes areNear = ~IntLanes{};
-    auto const place = [&](Lanes four, float* p, float* tile) {
-        Lanes const scaled = four * everyLane(scale);
-        areNear &= lanesWhere(noSign, scaled) <= farthest;
-        storeLanes(scaled, p);
-        storeLanes(tileBegin(scaled, width, perWidth), tile + PointRow::kFirstTile);
+    auto const place = [&](Lanes four, float offset, float* tile, float* places) {
+        Lanes const p = four * everyLane(placing.scale);
+        areNear &= lanesWhere(noSign, p) <= farthest;
+        Lanes const begin = tileBegin(p, width, perWidth);
+        Lanes const inTile = (p - begin) * everyLane(placing.voxelsPerUnit) - everyLane(offset);
+        storeLanes(begin, tile + PointRow::kFirstTile);
+        storeLanes(inTile, places);
     };
     for (std::size_t n = 0; n < count; n += 4) {
         float const* const first = &points[n].x;
@@ -74,10 +94,10 @@ bool placePoints(
         Lanes const yz01 = __builtin_shufflevector(a, b, 1, 2, 4, 5),
                     xy2zx3 = __builtin_shufflevector(b, c, 2, 3, 4, 5);
         Lanes const y23 = __builtin_shufflevector(b, c, 3, 3, 6, 6);
-        place(__builtin_shufflevector(a, xy2zx3, 0, 3, 4, 7), row.x + n, row.tileX + n);
-        place(__builtin_shufflevector(yz01, y23, 0, 2, 4, 6), row.y + n, row.tileY + n);
-        place(__builtin_shufflevector(yz01, c, 1, 3, 4, 7), row.z + n, row.tileZ + n);
-        storeLanes(everyLane(voxelsPerUnit), row.voxelsPerUnit + n);
+        float3 const& offset = placing.offset;
+        place(__builtin_shufflevector(a, xy2zx3, 0, 3, 4, 7), offset.x, row.tileX + n, row.x + n);
+        place(__builtin_shufflevector(yz01, y23, 0, 2, 4, 6), offset.y, row.tileY + n, row.y + n);
+        place(__builtin_shufflevector(yz01, c, 1, 3, 4, 7), offset.z, row.tileZ + n, row.z + n);
     }
     return areAll(areNear);
 }
@@ -91,59 +111,66 @@ std::size_t findRuns(std::size_t count, PointRow& row)
         auto const differs = [n](float const* tile) {
             return loadLanes(tile + kFirst + n - 1) != loadLanes(tile + kFirst + n);
         };
-        std::int32_t isNew[4]; // -1 where it is
+        std::int32_t isNew[4]; // -1 if it is
         storeLanes(differs(row.tileX) | differs(row.tileY) | differs(row.tileZ), isNew);
         for (std::size_t k = 0; k < 4; ++k) {
             run -= static_cast<std::uint32_t>(isNew[k]);
             row.run[n + k] = run;
             row.last[run] = static_cast<std::uint32_t>(n + k);
+            row.needsLayer[run] = 0;
         }
     }
     return run + 1;
 }
 
-template <int side, bool hasEnd>
-bool interpolateRow(std::size_t count, PlaceReading const& reading, PointRow& row, float* values)
+void findLayers(std::size_t count, float begin, float end, PointRow& row)
 {
-    Lanes const begin = everyLane(reading.begin), end = everyLane(reading.end), lastVoxel = everyLane(side - 2);
-    Lanes const offsetX = everyLane(reading.offset.x), offsetY = everyLane(reading.offset.y),
-                offsetZ = everyLane(reading.offset.z);
-    IntLanes haveValues = ~IntLanes{};
     for (std::size_t n = 0; n < count; n += 4) {
-        Lanes const perUnit = loadLanes(row.voxelsPerUnit + n);
-        auto const placeOf = [&](float const* p, float const* tile, Lanes offset) {
-            return (loadLanes(p + n) - loadLanes(tile + PointRow::kFirstTile + n)) * perUnit - offset;
-        };
-        Lanes const x = placeOf(row.x, row.tileX, offsetX), y = placeOf(row.y, row.tileY, offsetY),
-                    z = placeOf(row.z, row.tileZ, offsetZ);
-        IntLanes hasValue = lowest(lowest(z, y), x) >= begin; // x comes last: it alone may be no number
-        if constexpr (hasEnd)
-            hasValue &= highest(highest(z, y), x) < end;
-        storeLanes(hasValue, row.hasValue + n);
-        haveValues &= hasValue;
-
-        // Points without a value read something, too.
-        auto const voxelOf = [&](Lanes place) {
-            Lanes const inside = lowest(highest(place, Lanes{}), lastVoxel);
-            return __builtin_convertvector(__builtin_convertvector(inside, IntLanes), Lanes);
-        };
-        Lanes const i = voxelOf(x), j = voxelOf(y), k = voxelOf(z);
-        std::int32_t index[4];
-        storeLanes(__builtin_convertvector(i + (j + k * everyLane(side)) * everyLane(side), IntLanes), index);
-        std::uint32_t const* const run = row.run + n;
-        float const* const corners[4] = {row.values[run[0]] + index[0], row.values[run[1]] + index[1],
-            row.values[run[2]] + index[2], row.values[run[3]] + index[3]};
-        auto const alongX = [&](int offset) { return blendPairs(corners, offset, x - i); };
-        Lanes const near = blendLanes(alongX(0), alongX(side), y - j);
-        Lanes const far = blendLanes(alongX(side * side), alongX(side * side + side), y - j);
-        storeLanes(blendLanes(near, far, z - k), values + n);
+        Lanes const x = loadLanes(row.x + n), y = loadLanes(row.y + n), z = loadLanes(row.z + n);
+        IntLanes const isInside =
+            (lowest(lowest(x, y), z) >= everyLane(begin)) & (highest(highest(x, y), z) < everyLane(end));
+        std::int32_t isOutside[4];
+        storeLanes(isInside + 1, isOutside);
+        for (std::size_t k = 0; k < 4; ++k)
+            row.needsLayer[row.run[n + k]] |= static_cast<std::uint32_t>(isOutside[k]);
     }
-    return areAll(haveValues);
 }
 
-template bool interpolateRow<4, true>(std::size_t, PlaceReading const&, PointRow&, float*);
-template bool interpolateRow<5, true>(std::size_t, PlaceReading const&, PointRow&, float*);
-template bool interpolateRow<5, false>(std::size_t, PlaceReading const&, PointRow&, float*);
-template bool interpolateRow<6, false>(std::size_t, PlaceReading const&, PointRow&, float*);
+template <int onlySide>
+void interpolateRow(std::size_t count, TileArrays const& arrays, PointRow const& row, float* values)
+{
+    constexpr bool kIsPadded = onlySide != 0;
+    Lanes const lowestVoxel = everyLane(static_cast<float>(arrays.lowestVoxel));
+    Lanes const lastVoxel = everyLane(static_cast<float>(arrays.lastVoxel));
+    for (std::size_t n = 0; n < count; n += 4) {
+        std::uint32_t const* const run = row.run + n;
+        int side[4];
+        for (std::size_t k = 0; k < 4; ++k)
+            side[k] = kIsPadded ? onlySide : arrays.side[row.needsLayer[run[k]]];
+        Coordinates const x = coordinatesOf<!kIsPadded>(loadLanes(row.x + n), lastVoxel);
+        Coordinates const y = coordinatesOf<!kIsPadded>(loadLanes(row.y + n), lastVoxel);
+        Coordinates const z = coordinatesOf<!kIsPadded>(loadLanes(row.z + n), lastVoxel);
+        auto const readVoxel = [&](Lanes voxel) { return kIsPadded ? voxel : highest(voxel, lowestVoxel); };
+        Lanes const i = readVoxel(x.voxel), j = readVoxel(y.voxel), k = readVoxel(z.voxel);
+        Lanes const perRow = kIsPadded ? everyLane(onlySide)
+                                       : __builtin_convertvector(IntLanes{side[0], side[1], side[2], side[3]}, Lanes);
+        std::int32_t index[4];
+        storeLanes(__builtin_convertvector(i + (j + k * perRow) * perRow, IntLanes), index);
+        float const* const near[4] = {row.values[run[0]] + index[0], row.values[run[1]] + index[1],
+            row.values[run[2]] + index[2], row.values[run[3]] + index[3]};
+        float const* const far[4] = {near[0] + side[0] * side[0], near[1] + side[1] * side[1],
+            near[2] + side[2] * side[2], near[3] + side[3] * side[3]};
+        auto const layer = [&](float const* const(&corners)[4]) {
+            float const* const next[4] = {
+                corners[0] + side[0], corners[1] + side[1], corners[2] + side[2], corners[3] + side[3]};
+            return blendLanes(blendPairs(corners, x.fraction), blendPairs(next, x.fraction), y.fraction);
+        };
+        storeLanes(blendLanes(layer(near), layer(far), z.fraction), values + n);
+    }
+}
+
+template void interpolateRow<0>(std::size_t, TileArrays const&, PointRow const&, float*);
+template void interpolateRow<5>(std::size_t, TileArrays const&, PointRow const&, float*);
+template void interpolateRow<6>(std::size_t, TileArrays const&, PointRow const&, float*);
 
 }

@@ -6,28 +6,29 @@
 #include <cstddef>
 #include <cstdint>
 
-/// Samples of a row of points, in phases of four points at a time: where the points are; which of them are in one tile;
-/// and the values. To find the tiles is up to the caller, before the last phase: how long points stay in a tile cannot
-/// be foretold, and this way it does not hold up the rest.
+/// Samples of a row of points, in phases of four points at a time: where the points are; which of them share a tile;
+/// and the values. Finding the tiles is left to the caller, before the last phase: how long points stay in a tile is
+/// unpredictable, and a phase of its own keeps those branches out of the others.
 namespace TSR::TileTree3D::Internal {
 
 struct PointRow {
     static constexpr std::size_t kCapacity = 128;
     static constexpr std::size_t kFirstTile = 4; // there is no tile before
 
-    float x[kCapacity], y[kCapacity], z[kCapacity]; // in index units
-    // The lower corner of the tile that contains the point, from `kFirstTile` on. No number for points to be left out.
+    // The place of each point in its tile, in voxels.
+    float x[kCapacity], y[kCapacity], z[kCapacity];
+    // The lower corner of the tile that contains the point, from `kFirstTile` on.
     float tileX[kFirstTile + kCapacity], tileY[kFirstTile + kCapacity], tileZ[kFirstTile + kCapacity];
-    float voxelsPerUnit[kCapacity];
 
-    // Points that follow one another in one tile are a run.
+    // Consecutive points in one tile are a run.
     std::uint32_t run[kCapacity]; // of each point
     std::uint32_t last[kCapacity]; // point of each run
-    float const* values[kCapacity]; // that each run reads
-    std::uint32_t open[kCapacity]; // runs with tiles that are not found yet
+    std::uint32_t needsLayer[kCapacity]; // of each run: 1 if some point reads voxels of other tiles, else 0
+    float const* values[kCapacity]; // that each run reads, at voxel (0, 0, 0)
+    std::uint32_t open[kCapacity]; // runs whose tiles are still to be found
+    std::uint32_t empty[kCapacity]; // runs whose tiles hold no data
 
-    std::int32_t hasValue[kCapacity]; // all bits set, or none
-
+    std::size_t first(std::size_t number) const { return number ? last[number - 1] + 1 : 0; }
     IJK tileOfRun(std::size_t number) const
     {
         std::size_t const n = kFirstTile + last[number];
@@ -35,27 +36,40 @@ struct PointRow {
     }
 };
 
-/// What places in tiles are read with, in voxels.
-struct PlaceReading {
-    Tessara::Math::float3 offset; // finite
-    float begin, end; // places between them have all their values in the tile
+/// How points become places in tiles.
+struct Placing {
+    float scale;
+    float tileWidth; // up to `kWidestTile`
+    float voxelsPerUnit;
+    Tessara::Math::float3 offset; // in voxels, finite, up to `kLargestOffset`
 };
 
 /// The widest tiles that points are placed in.
 constexpr float kWidestTile = 0x1p23f;
+/// Larger ones would place points below the layer around a tile.
+constexpr float kLargestOffset = 1;
+
+constexpr float kBelowTile = 1e-5f; // voxels; how far rounding can put a point below the tile that contains it
+
+/// The arrays that runs read: index 0 for runs that need no layer, 1 for those that do.
+struct TileArrays {
+    int side[2];
+    int lowestVoxel; // 0, or -1 if there is a layer on the lower sides; points below that read it instead
+    int lastVoxel; // points beyond it are blended from it and the next one, however far they are
+};
 
 /// \pre     `count` is a multiple of 4, here and below
-/// \return  false where some point is no number, or too far away for exact steps
-bool placePoints(Tessara::Math::float3 const* points, std::size_t count, float scale, float tileWidth,
-    float voxelsPerUnit, PointRow& row);
+/// \return  false if some point is NaN, or too far away for exact steps
+bool placePoints(Tessara::Math::float3 const* points, std::size_t count, Placing const& placing, PointRow& row);
 
-/// Where the tile is another one than that of the point before, a run begins. \return how many there are
+/// Starts a run at each point whose tile differs from the one before. \return the number of runs
 std::size_t findRuns(std::size_t count, PointRow& row);
 
-/// \param side    of the arrays that are read
-/// \param hasEnd  Whether places may be beyond the last voxel that the arrays have a next one for.
-/// \return        false when there are points without a value
-template <int side, bool hasEnd>
-bool interpolateRow(std::size_t count, PlaceReading const& reading, PointRow& row, float* values);
+/// Places from `begin` up to `end` along all axes read voxels of their own tile only.
+void findLayers(std::size_t count, float begin, float end, PointRow& row);
+
+/// \tparam onlySide  That of all arrays if no place is below its tile; 0 to read `arrays.side`, wherever places are.
+template <int onlySide>
+void interpolateRow(std::size_t count, TileArrays const& arrays, PointRow const& row, float* values);
 
 }

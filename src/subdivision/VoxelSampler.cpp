@@ -6,7 +6,9 @@
 #include <TessaraGeometryVolume/HaloTile.h>
 
 #include <algorithm>
+#include <array>
 #include <cmath>
+#include <deque>
 #include <limits>
 
 namespace TSR::TileTree3D {
@@ -16,9 +18,6 @@ using Tessara::Math::float3;
 namespace {
 
     constexpr unsigned int kAllBits = 7; // of the three axes
-    constexpr float kBelowTile = 1e-5f; // voxels; what rounding can take a point below the tile that contains it
-    constexpr float kNowhere = std::numeric_limits<float>::quiet_NaN();
-    constexpr float kNothing[6 * 6 * 6] = {}; // read for points without values, and then left
 
     /// How far the neighbours of a tile are looked for, in index units: at one depth its width, whatever the depth.
     template <class Traits> constexpr int kNeighbourStep = 0;
@@ -56,21 +55,9 @@ namespace {
             int const voxel = static_cast<int>(std::min(value, static_cast<float>(side - 1)));
             return {voxel, value - static_cast<float>(voxel)};
         }
-        if (value > -kBelowTile)
+        if (value > -Internal::kBelowTile)
             return {0, 0};
         return {-1, value - std::floor(value)};
-    }
-
-    // Tiles that rows came to, by the upper bits of a hash. Few enough to be set up for each part of a loop.
-    constexpr int kKnownTileBits = 8;
-
-    std::size_t placeOfTile(IJK index)
-    {
-        auto const of = [](int coordinate, std::uint32_t factor) {
-            return static_cast<std::uint32_t>(coordinate) * factor;
-        };
-        return (of(index.i, 0x9E3779B1u) ^ of(index.j, 0x85EBCA77u) ^ of(index.k, 0xC2B2AE3Du))
-            >> (32 - kKnownTileBits);
     }
 
     float blend(float from, float to, float fraction)
@@ -94,6 +81,67 @@ namespace {
     {
         return interpolate<side>(values, std::max(voxel.i, 0), std::max(voxel.j, 0), std::max(voxel.k, 0), fraction);
     }
+
+    /// Where voxel (0, 0, 0) is in an array with a layer all around.
+    constexpr int firstInLayer(int side)
+    {
+        return 1 + (1 + side) * side;
+    }
+
+    constexpr float kNothingAround[7 * 7 * 7] = {}; // read for points without values, then overwritten
+    constexpr float const* kNothing = kNothingAround + firstInLayer(7);
+
+}
+
+namespace Internal {
+
+    /// A tile that rows came to, found by its lower corner and the depth that was asked for.
+    template <class Traits> struct KnownTile {
+        IJK index{};
+        int depth = -1;
+        typename Container<Traits>::TileType const* tile = nullptr; // null if it holds no data; may be a coarser one
+        // Of a tile of that depth: its own, and those with the layer that samples read, null until they are built.
+        float const* values[2] = {};
+
+        bool isOf(IJK asked, int askedDepth) const noexcept
+        {
+            return ((index.i ^ asked.i) | (index.j ^ asked.j) | (index.k ^ asked.k) | (depth ^ askedDepth)) == 0;
+        }
+    };
+
+    /// Tiles by the upper bits of a hash; a new one replaces the one before. Few enough to be set up for each part of a
+    /// loop.
+    template <class Traits> struct KnownTiles {
+        static constexpr int kBits = 9;
+        static constexpr std::size_t kCapacity = std::size_t{1} << kBits;
+        static_assert(kCapacity >= PointRow::kCapacity);
+
+        std::array<KnownTile<Traits>, kCapacity> tiles;
+        // Rows read halos where they are built, so none may be replaced within a row: if there is no room for as many
+        // as a row may need, all are forgotten before it. One of the two stays empty.
+        std::deque<PositiveHalo<Traits>> positiveHalos;
+        std::deque<FullHalo<Traits>> fullHalos;
+        std::size_t haloCount = 0;
+
+        KnownTile<Traits>& at(IJK index, int depth)
+        {
+            auto const of = [](int coordinate, std::uint32_t factor) {
+                return static_cast<std::uint32_t>(coordinate) * factor;
+            };
+            std::uint32_t const hash =
+                of(index.i, 0x9E3779B1u) ^ of(index.j, 0x85EBCA77u) ^ of(index.k, 0xC2B2AE3Du) ^ of(depth, 0x27D4EB2Fu);
+            return tiles[hash >> (32 - kBits)];
+        }
+
+        void makeRoomForHalos(std::size_t count)
+        {
+            if (haloCount + count <= kCapacity)
+                return;
+            haloCount = 0;
+            for (KnownTile<Traits>& known : tiles)
+                known.values[1] = nullptr;
+        }
+    };
 
 }
 
@@ -224,7 +272,7 @@ float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sample(float3 c
     if (haloChannel_)
         return interpolateFromFirst<kSide + 1>(values_, place.voxel, place.fraction);
     ++stamp_;
-    return offsetType_ == kAllBits ? samplePositive(place) : sampleFull(place);
+    return hasPositiveHalos() ? samplePositive(place) : sampleFull(place);
 }
 
 template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleAll(
@@ -233,10 +281,7 @@ template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3,
     std::size_t const inRows = fitsRows(readDepth(depth)) ? count & ~std::size_t{3} : 0;
     for (std::size_t first = 0; first < inRows; first += Internal::PointRow::kCapacity) {
         std::size_t const length = std::min(Internal::PointRow::kCapacity, inRows - first);
-        if (haloChannel_)
-            sampleRow<kSide + 1>(points + first, length, depth, space, values + first);
-        else
-            sampleRow<kSide>(points + first, length, depth, space, values + first);
+        sampleRow(points + first, length, depth, space, values + first);
     }
     for (std::size_t n = inRows; n < count; ++n)
         values[n] = sample(points[n], depth, space);
@@ -247,75 +292,141 @@ bool VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::fitsRows(int dep
 {
     float3 const& offset = Base::voxelOffset_;
     return depth >= 0 && static_cast<float>(Traits::tileWidth(depth)) <= Internal::kWidestTile
-        && std::isfinite(offset.x) && std::isfinite(offset.y) && std::isfinite(offset.z);
+        && std::isfinite(offset.x) && std::isfinite(offset.y) && std::isfinite(offset.z)
+        && std::max({offset.x, offset.y, offset.z}) <= Internal::kLargestOffset;
 }
 
-/// Points with all eight values in one array of that side take the short way.
-template <class Traits> template <int side> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleRow(
+template <class Traits>
+bool VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::hasPositiveHalos() const noexcept
+{
+    return offsetType_ == kAllBits;
+}
+
+template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sampleRow(
     float3 const* points, std::size_t count, int depth, int space, float* values)
 {
     int const askedDepth = readDepth(depth);
+    float const scale = space == kWorldSpace ? Base::scale_ : 1;
     Internal::PointRow row;
-    bool const isNear = Internal::placePoints(points, count, space == kWorldSpace ? Base::scale_ : 1,
-        static_cast<float>(Traits::tileWidth(askedDepth)), Traits::voxelsPerUnit(askedDepth), row);
-    if (!isNear) {
+    bool const areNear = Internal::placePoints(points, count,
+        {scale, static_cast<float>(Traits::tileWidth(askedDepth)), Traits::voxelsPerUnit(askedDepth),
+            Base::voxelOffset_},
+        row);
+    if (!areNear) {
         for (std::size_t n = 0; n < count; ++n)
             values[n] = sample(points[n], depth, space);
         return;
     }
     std::size_t const runCount = Internal::findRuns(count, row);
-    findTiles(runCount, askedDepth, row);
-    constexpr bool kIsPadded = side > kSide;
-    float const first = kIsPadded || offsetType_ == kAllBits ? 0 : 1;
-    if (Internal::interpolateRow<side, !kIsPadded>(count, {Base::voxelOffset_, first, kSide - 1}, row, values))
-        return;
-    for (std::size_t n = 0; n < count; ++n)
-        if (!row.hasValue[n])
-            values[n] = row.values[row.run[n]] == kNothing ? background_ : sample(points[n], depth, space);
+    bool const isPadded = haloChannel_, isPositive = isPadded || hasPositiveHalos();
+    if (!isPadded)
+        Internal::findLayers(count, isPositive ? -Internal::kLargestOffset : 1, kSide - 1, row);
+    std::size_t const emptyCount = findTiles(points, runCount, askedDepth, scale, row);
+    int const padded = kSide + (isPositive ? 1 : 2);
+    Internal::TileArrays const arrays{{isPadded ? padded : kSide, padded}, isPositive ? 0 : -1, kSide - 1};
+    if (isPadded && std::max({Base::voxelOffset_.x, Base::voxelOffset_.y, Base::voxelOffset_.z}) <= 0)
+        Internal::interpolateRow<kSide + 1>(count, arrays, row, values);
+    else
+        Internal::interpolateRow<0>(count, arrays, row, values);
+    for (std::size_t n = 0; n < emptyCount; ++n) {
+        std::uint32_t const run = row.empty[n];
+        std::fill(values + row.first(run), values + row.last[run] + 1, background_);
+    }
 }
 
-/// First those that are known, without a branch that could not be foretold.
-template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::findTiles(
-    std::size_t runCount, int depth, Internal::PointRow& row)
+/// First those that are known, without a branch that would be unpredictable.
+template <class Traits> std::size_t VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::findTiles(
+    float3 const* points, std::size_t runCount, int depth, float scale, Internal::PointRow& row)
 {
-    if (knownTiles_.empty())
-        knownTiles_.resize(std::size_t{1} << kKnownTileBits);
+    if (!knownTiles_)
+        knownTiles_ = std::make_unique<Internal::KnownTiles<Traits>>();
+    knownTiles_->makeRoomForHalos(runCount);
     std::size_t openCount = 0;
     for (std::size_t run = 0; run < runCount; ++run) {
         IJK const index = row.tileOfRun(run);
-        KnownTile const& known = knownTiles_[placeOfTile(index)];
-        row.values[run] = known.values;
+        Internal::KnownTile<Traits> const& known = knownTiles_->at(index, depth);
+        row.values[run] = known.values[row.needsLayer[run]];
         row.open[openCount] = static_cast<std::uint32_t>(run);
-        bool const isFound = known.isOf(index, depth) & (known.unlike == nullptr);
+        bool const isFound = known.isOf(index, depth) & (row.values[run] != nullptr);
         openCount += isFound ? 0 : 1;
     }
-    for (std::size_t n = 0; n < openCount; ++n)
-        findTile(row.open[n], depth, row);
+    std::size_t emptyCount = 0;
+    for (std::size_t n = 0; n < openCount; ++n) {
+        std::uint32_t const run = row.open[n];
+        row.values[run] = findValues(points, run, depth, scale, row);
+        row.empty[emptyCount] = run;
+        emptyCount += row.values[run] == kNothing ? 1 : 0;
+    }
+    return emptyCount;
 }
 
-template <class Traits> inline void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::findTile(
-    std::size_t run, int depth, Internal::PointRow& row)
+template <class Traits> float const* VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::findValues(
+    float3 const* points, std::size_t run, int depth, float scale, Internal::PointRow& row)
 {
-    IJK const index = row.tileOfRun(run);
-    KnownTile& known = knownTiles_[placeOfTile(index)];
+    Internal::KnownTile<Traits>* known = &knownTile(row.tileOfRun(run), depth);
+    if (!known->tile)
+        return kNothing;
+    TileType const& tile = *known->tile;
+    if (tile.depth != depth) {
+        placeInTile(points, run, tile, scale, row);
+        // The outermost tiles begin below what 32 bits hold.
+        known = &knownTile({clampedIndex(tile.i), clampedIndex(tile.j), clampedIndex(tile.k)}, tile.depth);
+    }
+    float const*& values = known->values[row.needsLayer[run]];
+    if (!values)
+        values = buildLayeredValues(tile);
+    return values;
+}
+
+template <class Traits> auto VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::knownTile(IJK index, int depth)
+    -> Internal::KnownTile<Traits>&
+{
+    Internal::KnownTile<Traits>& known = knownTiles_->at(index, depth);
     if (!known.isOf(index, depth)) {
         TileType const& tile = Base::tileAt(index, depth);
         float const* const values = valuesOf(tile);
-        known = {index, depth, values ? values : kNothing, values && tile.depth == depth ? nullptr : &tile};
+        known = {index, depth, values ? &tile : nullptr, {tile.depth == depth ? values : nullptr, nullptr}};
     }
-    row.values[run] = known.values;
-    if (!known.unlike)
-        return;
-    TileType const& tile = *known.unlike;
-    bool const isPlace =
-        known.values != kNothing && static_cast<float>(Traits::tileWidth(tile.depth)) <= Internal::kWidestTile;
-    for (std::size_t n = run ? row.last[run - 1] + 1 : 0; n <= row.last[run]; ++n) {
-        std::size_t const at = Internal::PointRow::kFirstTile + n;
-        row.tileX[at] = isPlace ? static_cast<float>(tile.i) : kNowhere;
-        row.tileY[at] = isPlace ? static_cast<float>(tile.j) : 0;
-        row.tileZ[at] = isPlace ? static_cast<float>(tile.k) : 0;
-        row.voxelsPerUnit[n] = isPlace ? Traits::voxelsPerUnit(tile.depth) : 1;
+    return known;
+}
+
+/// The points of a run in a coarser tile than the one that was asked for.
+template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::placeInTile(
+    float3 const* points, std::size_t run, TileType const& tile, float scale, Internal::PointRow& row) const
+{
+    bool const isPositive = hasPositiveHalos();
+    float const voxelsPerUnit = Traits::voxelsPerUnit(tile.depth);
+    float3 const& offset = Base::voxelOffset_;
+    bool isInside = true;
+    auto const place = [&](float coordinate, std::int64_t begin, float shift) {
+        // A float may not hold where a wide tile begins.
+        auto const distance = static_cast<float>(static_cast<double>(coordinate * scale) - static_cast<double>(begin));
+        float const inTile = distance * voxelsPerUnit - shift;
+        isInside &= inTile < kSide - 1 && (isPositive || inTile >= 1);
+        return inTile;
+    };
+    for (std::size_t n = row.first(run); n <= row.last[run]; ++n) {
+        row.x[n] = place(points[n].x, tile.i, offset.x);
+        row.y[n] = place(points[n].y, tile.j, offset.y);
+        row.z[n] = place(points[n].z, tile.k, offset.z);
     }
+    row.needsLayer[run] = isInside || haloChannel_ ? 0 : 1;
+}
+
+template <class Traits>
+float const* VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::buildLayeredValues(TileType const& tile)
+{
+    auto const build = [&](auto& halos) {
+        if (knownTiles_->haloCount == halos.size())
+            halos.emplace_back();
+        auto& halo = halos[knownTiles_->haloCount];
+        fillHalo(tile, halo);
+        ++knownTiles_->haloCount;
+        return halo.values();
+    };
+    if (hasPositiveHalos())
+        return build(knownTiles_->positiveHalos);
+    return build(knownTiles_->fullHalos) + firstInLayer(kSide + 2);
 }
 
 /// Null where there are none that may be read.
@@ -385,9 +496,8 @@ std::uint32_t VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::buildHa
         cache = HaloCache<side>(Traits::kDepthCount);
     auto const number = static_cast<std::uint32_t>(tile.depth);
     HaloSlot<side>& slot = cache[number];
-    slot.key = lastKey_[number] = kNoKey; // of what stood here
     slot.stamp = stamp_;
-    fillHalo(tile, slot);
+    fillHalo(tile, slot.values);
     slot.key = tile.index;
     lastKey_[number] = slot.key;
     return lastSlot_[number] = number;
@@ -401,32 +511,32 @@ bool VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::drawsOnParent(Ti
 }
 
 template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::fillHalo(
-    TileType const& tile, HaloSlot<kSide + 1>& slot)
+    TileType const& tile, TileData<float, kSide + 1, 0>& halo)
 {
     if (!drawsOnParent(tile)) {
-        setHaloTile<Traits>(tile, nullptr, *channel_, PositiveHalo<Traits>(), 2, neighbours_, slot.values);
+        setHaloTile<Traits>(tile, nullptr, *channel_, PositiveHalo<Traits>(), 2, neighbours_, halo);
         return;
     }
     TileType const& parent = container_->tile(tile.parentTreeIndex());
     PositiveHalo<Traits> const& parentHalo = haloOf(parent, positiveHaloCache_).values;
-    setHaloTile<Traits>(tile, &parent, *channel_, parentHalo, 2, neighbours_, slot.values);
+    setHaloTile<Traits>(tile, &parent, *channel_, parentHalo, 2, neighbours_, halo);
 }
 
 template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::fillHalo(
-    TileType const& tile, HaloSlot<kSide + 2>& slot)
+    TileType const& tile, TileData<float, kSide + 2, 0>& halo)
 {
     auto const own = channel_->tileData(tile.treeIndex());
     if (!own) {
-        slot.values.clear();
+        halo.clear();
         return;
     }
     if (!drawsOnParent(tile)) {
-        Internal::fillHaloFromTile<Traits>(offsetType_, background_, own, slot.values);
+        Internal::fillHaloFromTile<Traits>(offsetType_, background_, own, halo);
         return;
     }
     Internal::FullHalo<Traits> const& parentHalo =
         haloOf(container_->tile(tile.parentTreeIndex()), fullHaloCache_).values;
-    Internal::fillHaloFromNeighbours<Traits>(offsetType_, slot.values, tile.childIJK(), tilesAround(tile), parentHalo);
+    Internal::fillHaloFromNeighbours<Traits>(offsetType_, halo, tile.childIJK(), tilesAround(tile), parentHalo);
 }
 
 /// The data of the tiles of this depth at a fixed distance, on purpose: where tiles are wider than that, the tile is

@@ -106,6 +106,11 @@ TYPED_TEST(SubdivideByVolume, leavesFacesAloneWithoutAPositiveTolerance)
     EXPECT_EQ(marksOf(samplerOf(positive), far, 1)[5], true)
         << "its other corners are apart, and the background counts";
     EXPECT_EQ(marksOf(samplerOf(positive), MeshBuilder::of({}, {}), 1), std::vector<bool>());
+    auto wide = mesh;
+    wide.points[mesh.faces[5][1]].x = 2e38f; // the sum of three is infinite, and so is their mean
+    LinearSampler<TypeParam> const tiny(
+        empty.container, empty.channel, empty.topology, {.scale = 1e-38f, .background = 0});
+    EXPECT_EQ(marksOf(tiny, wide, 1)[5], false);
 
     auto const open = MeshBuilder::sphere(3).withoutFace(4).build(), before = deepCopy(*open);
     EXPECT_FALSE(subdivide(samplerOf(positive), *open, 1));

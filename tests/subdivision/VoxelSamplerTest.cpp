@@ -50,15 +50,19 @@ template <class Traits> float sampled(LinearSampler<Traits>& sampler, float3 p, 
     return sampler.sample(p, depth, kIndexSpace);
 }
 
-/// Rows of points give what single ones do. Points follow one another at random and on a line.
+/// Rows of points give what single ones do. Points follow one another at random and on a line; half of them are at
+/// multiples of a quarter, and so on borders and voxels.
 template <class Traits> void expectSameInRows(LinearSampler<Traits> sampler, float reach)
 {
     Random random(9);
     std::vector<float3> points;
-    for (int n = 0; n < 300; ++n) {
+    for (int n = 0; n < 400; ++n) {
+        bool const isSnapped = n % 2;
+        auto const snapped = [&](float c) { return isSnapped ? std::floor(4 * c) / 4 : c; };
         float3 const from = random.point(reach);
         for (int step = 0; step < 10; ++step)
-            points.push_back({from.x + 0.3f * float(step), from.y, from.z - 0.1f * float(step)});
+            points.push_back({snapped(from.x) + (isSnapped ? 0.25f : 0.3f) * float(step), snapped(from.y),
+                snapped(from.z) - (isSnapped ? 0.25f : 0.1f) * float(step)});
     }
     points[5].y = kNaN;
     std::vector<float> values(points.size());
@@ -124,7 +128,7 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
     auto const volume = volumeOf<TypeParam>(field);
     auto const padded = makeHaloChannel(volume);
     // With offsets that fit no volume voxels stay inside, and fractions tell the distance.
-    for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 0.4f, 2.5f, 77.0f}) {
+    for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 1e-5f, 0.4f, 2.5f, 77.0f}) {
         float3 const offsets{offset, offset, offset};
         auto sampler = samplerOf(volume, offsets), paddedSampler = samplerOf(volume, offsets, &padded);
         Random random(1);
@@ -166,13 +170,16 @@ TYPED_TEST(VoxelSampling, findsInCoarseBoxesWhatVoxelsWouldGive)
 
 TYPED_TEST(VoxelSampling, takesRowsAsItTakesPoints)
 {
-    Field const field = Field::random(-2 * TypeParam::kSide, 2 * TypeParam::kSide);
+    // More tiles than a sampler keeps, with a few values that show even where they are blended in with a share of 0.
+    Field field = Field::random(-5 * TypeParam::kSide, 5 * TypeParam::kSide);
+    for (std::size_t n = 0; n < field.values.size(); n += 37)
+        field.values[n] = std::numeric_limits<float>::infinity();
     for (unsigned int const offsetType : {0u, 3u, 7u}) {
         auto const volume = volumeOf<TypeParam>(field, offsetType);
         auto const padded = makeHaloChannel(volume);
-        for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 0.4f, 77.0f, 1e20f, -1e20f, kNaN}) {
-            expectSameInRows(samplerOf(volume, {offset, 0, offset}), 3 * TypeParam::kSide);
-            expectSameInRows(samplerOf(volume, {offset, offset, 0}, &padded), 3 * TypeParam::kSide);
+        for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 1e-5f, 0.5f, 1.0f, 77.0f, -1e20f, kNaN}) {
+            expectSameInRows(samplerOf(volume, {offset, 0, offset}), 6 * TypeParam::kSide);
+            expectSameInRows(samplerOf(volume, {offset, offset, 0}, &padded), 6 * TypeParam::kSide);
         }
     }
 }
@@ -358,27 +365,41 @@ TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
 
 TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
 {
+    constexpr int kDepth = TypeParam::kUnitDepth, kLowest = std::numeric_limits<int>::min();
     std::vector<Voxel> voxels;
     Random random(8);
     for (int n = 0; n < 2000; ++n) {
         auto const far = [&](float reach) { return static_cast<int>(reach * random.coordinate()); };
         float const reach = n % 2 ? 2147483520.0f : 30e6f;
-        voxels.push_back(
-            {far(reach), n % 3 ? far(reach) : std::numeric_limits<int>::min(), far(reach), random.coordinate()});
+        voxels.push_back({far(reach), n % 3 ? far(reach) : kLowest, far(reach), random.coordinate()});
     }
-    constexpr int kDepth = TypeParam::kUnitDepth;
+    std::vector<float3> points; // the list has numbers that floats hold
+    for (Voxel const& v : voxels)
+        points.push_back({float(v.i), float(v.j), float(v.k)});
     VoxelList const lists[] = {{kDepth, voxels}};
     for (unsigned int const offsetType : {0u, 7u}) {
         auto const volume = buildVolume<TypeParam>(
             {.offsetType = offsetType, .depth = kDepth, .lists = lists, .coarsestDepth = kDepth - 1});
         auto sampler = samplerOf(volume);
-        for (Voxel const& v : voxels) {
-            float3 const p{float(v.i), float(v.j), float(v.k)}; // the list has numbers that floats hold
-            float row = 0;
-            sampler.sampleAll(&p, 1, kDepth, kIndexSpace, &row);
-            ASSERT_EQ(row, v.value) << v.i << ' ' << v.j << ' ' << v.k << ", " << offsetType;
+        std::vector<float> values(points.size());
+        sampler.sampleAll(points.data(), points.size(), kDepth, kIndexSpace, values.data());
+        for (std::size_t n = 0; n < points.size(); ++n) {
+            ASSERT_EQ(values[n], voxels[n].value) << n << ", " << offsetType;
+            if (voxels[n].j == kLowest) {
+                EXPECT_EQ(sampled(sampler, {points[n].x, -points[n].y, points[n].z}), volume.background);
+            }
         }
     }
+
+    // In tiles of one unit, where a float no longer holds twice as much to the unit.
+    constexpr int kFar = 0x400001;
+    std::vector<Voxel> const one{{kFar * TypeParam::kSide, 0, 0, 7}};
+    VoxelList const deepest[] = {{TypeParam::kDeepest, one}};
+    auto const volume = buildVolume<TypeParam>({.depth = TypeParam::kDeepest, .lists = deepest});
+    std::vector<float3> const row(4, {float(kFar), 0, 0});
+    std::vector<float> values(4);
+    samplerOf(volume).sampleAll(row.data(), 4, TypeParam::kDeepest, kIndexSpace, values.data());
+    EXPECT_EQ(values, std::vector<float>(4, 7));
 }
 
 TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
