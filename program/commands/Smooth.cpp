@@ -153,6 +153,20 @@ namespace {
         report.text += fmt::format("\nPoints moved by {:.4g} on average, by {:.4g} at most.\n", mean, largest);
     }
 
+    /// Removes the normals of points, corners and faces, and returns their names: they belong to the surface as it was.
+    std::vector<std::string> dropNormals(Object& mesh)
+    {
+        std::vector<std::string> dropped;
+        for (Property const& property : propertiesOf(mesh)) {
+            std::string_view const name = property.name;
+            if (name != "normal" && !name.ends_with(":normal")) // which tells those of several components apart
+                continue;
+            mesh.eraseProperty(property.name.c_str());
+            dropped.push_back(property.name);
+        }
+        return dropped;
+    }
+
     void smooth(Options const& options, Report& report)
     {
         requireWritable(options.out);
@@ -176,10 +190,12 @@ namespace {
         if (!std::all_of(positions.begin(), positions.end(),
                 [](float3 const& p) { return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z); }))
             throw Failure(ExitCode::Refused, "the coordinates are too large to be smoothed in single precision");
+        bool const isMoved = !std::equal(positions.begin(), positions.end(), arrays.positions->begin());
+        std::vector<std::string> const dropped = isMoved ? dropNormals(*mesh) : std::vector<std::string>();
         addDataProperty(sPointPosition, sPointComp, positions, *mesh);
         saveGeometry(*mesh, options.out, report);
         report.document["amount"] = numberOf(options.amount);
-        reportOperation(before, describeMesh(*mesh, isClosed), {}, report);
+        reportOperation(before, describeMesh(*mesh, isClosed), dropped, report);
         reportDisplacement(*arrays.positions, positions, report);
     }
 
@@ -193,7 +209,8 @@ void addSmooth(CommandLine& program, Invocation& invocation)
         R"(Points slide along the surface, so that edges become more even and the shape stays. The amount is cut
 into steps of at most 0.9, in each of which every point goes so much of its way to the middle of the
 faces around it: an amount of 1 takes two steps and evens out most of what noise has made of the
-edges of a sphere, one of 9 takes ten or eleven and settles it. Normals of the file are not made anew.
+edges of a sphere, one of 9 takes ten or eleven and settles it. Normals would no longer fit the
+surface: they are dropped, and named.
 
 Points at a boundary move too, unless they are pinned. Attributes with a number for each point can
 scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",

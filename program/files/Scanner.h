@@ -118,6 +118,8 @@ public:
         , comments_(syntax != Syntax::Plain)
         , joinsLines_(syntax == Syntax::CommentsAndJoinedLines)
     {
+        if (start == 0)
+            skipByteOrderMark();
     }
 
     /// What is left of the line, comments aside, is blank.
@@ -221,6 +223,17 @@ protected:
     }
 
 private:
+    /// Editors and spreadsheets put a byte order mark in front of text. That of UTF-8 says nothing; that of UTF-16
+    /// says that the text has two bytes per character.
+    void skipByteOrderMark()
+    {
+        std::string_view const text(at_, remaining());
+        if (text.starts_with("\xFF\xFE") || text.starts_with("\xFE\xFF"))
+            refuse("the text is UTF-16; UTF-8 and ASCII are read");
+        if (text.starts_with("\xEF\xBB\xBF"))
+            at_ += 3;
+    }
+
     static bool isBlank(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\v' || c == '\f'; }
 
     /// The end of the line that the \ at `backslash` joins with the next one; null where it is just a character.

@@ -95,7 +95,10 @@ TEST_F(Commands, RemoveSliversKeepsClosedManifolds)
 
 TEST_F(Commands, SmoothMovesPointsAndPinsThem)
 {
-    copySamples({"bunny.obj"});
+    copySamples({"bunny.obj", "cylinder.obj"});
+    for (auto const& [amount, dropped] : {std::pair{"1", json({"normal"})}, {"0", json::array()}})
+        EXPECT_EQ(
+            runForJson("smooth cylinder.obj out.obj --amount " + std::string(amount))["droppedProperties"], dropped);
     json const done = runForJson("smooth bunny.obj out.ply --amount 2");
     EXPECT_EQ(done["exitCode"], 0);
     EXPECT_EQ(done["before"]["faces"], done["after"]["faces"]);
@@ -189,7 +192,9 @@ TEST_F(Commands, PointsAndFacesArePickedAndKeepTheirAttributes)
 {
     copySamples({"cube.ply"});
     store(folder / "cloud.ply", kCloud);
-    store(folder / "list", "5 0 # twice\n\n5\n");
+    store(folder / "list",
+        "\xEF\xBB\xBF"
+        "5 0 # twice\n\n5\n");
     for (auto const& [arguments, picked] : {std::pair{"points cloud.ply --indices list", 2},
              {"points cloud.ply --attribute label", 3}, {"points cloud.ply --box 4 9 9 1 -9 -9", 4},
              {"points cloud.ply --box 1 -9 -9 4 9 9 --invert", 3}, {"faces cube.ply --indices list", 2}}) {

@@ -65,6 +65,7 @@ namespace {
         for (auto const& [name, test] : cases) {
             SCOPED_TRACE(name);
             GeometryFile const file = readContent(test.extension, test.content);
+            EXPECT_TRUE(sameContents(*readContent(test.extension, "\xEF\xBB\xBF" + test.content).object, *file.object));
             EXPECT_EQ(getElementCount(*file.object, sPointComp), test.points);
             EXPECT_EQ(valuesOf<unsigned int>(*file.object, sFaceVertex), test.corners);
             bool const isMesh = !test.corners.empty();
@@ -107,6 +108,7 @@ namespace {
             {".obj", points + "f 1/1 2/1 3/1", 4, "the texture coordinate 1 does not exist: the file has 0"},
             {".obj", points + "f 1 2 99999999999999999999", 4, "stands for an index, but is no number that fits"},
             {".obj", points + "l\n", 4, "a polyline has no points"},
+            {".obj", "\xFF\xFEv", 1, "the text is UTF-16; UTF-8 and ASCII are read"},
             {".ply", "plx\n", 1, "the file does not begin with \"ply\""},
             {".ply", ply, 6, "the file is cut off: its header has no \"end_header\""},
             {".ply", "ply\nformat ascii 2.0\n", 2, "the format \"ascii\" is not known, or not of version 1.0"},
