@@ -66,6 +66,17 @@ void removeSliversOfSphere(benchmark::State& state)
         static_cast<double>(peak - resultBytes) / static_cast<double>(state.range(0));
 }
 
+/// The shortest edges of all faces lead to one of two hubs.
+void removeSliversOfWheel(benchmark::State& state)
+{
+    auto const source = MeshBuilder::wheel(static_cast<unsigned int>(facesOf(state) / 2)).build();
+    for (auto _ : state) {
+        Tessara::Object mesh = *source; // shares the arrays
+        Geometry::Mesh::removeSlivers(0.5f, mesh);
+    }
+    Benchmarks::countElements(state, facesOf(state));
+}
+
 /// What cannot be done without: adjacency, normals and one measuring sweep over flat arrays, and the copy that is
 /// edited.
 void flatPasses(benchmark::State& state)
@@ -132,6 +143,7 @@ void cgalNeedles(benchmark::State& state)
 
 #define MODELING_SIZES Arg(5'000)->Arg(50'000)->Arg(500'000)->UseRealTime()
 BENCHMARK(removeSliversOfSphere)->Name("removeSlivers")->MODELING_SIZES;
+BENCHMARK(removeSliversOfWheel)->Name("removeSlivers:hubs")->MODELING_SIZES;
 BENCHMARK(flatPasses)->Name("removeSlivers:flat passes")->MODELING_SIZES;
 BENCHMARK(copyMesh)->Name("removeSlivers:memcpy")->MODELING_SIZES;
 #ifdef MODELING_HAS_CGAL

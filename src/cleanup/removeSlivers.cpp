@@ -16,6 +16,8 @@
 #include <iterator>
 #include <limits>
 #include <optional>
+#include <unordered_map>
+#include <unordered_set>
 #include <utility>
 #include <vector>
 
@@ -51,13 +53,27 @@ namespace {
     /// What the sweep has to do with a face. Only slivers, and faces that a collapse has changed, can collapse.
     enum class FaceVisit : unsigned char { None = 0, Sliver = 1, Changed = 2 };
 
+    /// What a walk around a point of many faces has found. All its spokes may be the shortest edges of slivers, and a walk
+    /// for each of them would take quadratic time.
+    struct Hub {
+        enum class Fan : unsigned char {
+            Closed, // and no point is around it twice
+            Open, // at a boundary, or one of several fans
+            Tangled
+        };
+        Fan fan = Fan::Tangled;
+        std::unordered_set<unsigned int> ring; // the points around it if the fan is closed
+        std::array<unsigned int, 8> refusing{}; // the faces that refused collapses, the latest one first
+    };
+
     /// The mesh while its faces collapse. A removed face has `kInvalidIndex` at its first corner.
     struct CollapsingMesh {
         Orvan::Array<float3> positions;
         IndexArray faceVertex;
         Orvan::Array<Triangle> adjacency; // the faces across a face's edges
         IndexArray valence; // faces around each point; a fan that is no longer is not all around its point
-        Orvan::Array<FaceVisit> visits; // one a face
+        Orvan::Array<FaceVisit> visits; // one per face
+        std::unordered_map<unsigned int, Hub> hubs; // by their points; collapses keep them up to date
         std::vector<unsigned int> removedFaces;
         std::vector<unsigned int> removedPoints;
 
@@ -70,18 +86,23 @@ namespace {
     struct FanFace {
         unsigned int face;
         unsigned int entry;
+        friend bool operator==(FanFace const&, FanFace const&) = default;
     };
 
-    /// An edge that may collapse, its two faces, and the faces around both of its ends, which stay.
-    struct EdgeFans {
-        FanFace face{}; // around `start`
-        FanFace across{}; // around `end`, on the other side of the edge
-        unsigned int start = 0; // the point that stays, and moves to the midpoint
-        unsigned int end = 0;
+    /// One end of an edge that may collapse. `first` and `last` are the two faces of the edge, which are removed.
+    struct EdgeEnd {
+        FanFace first{};
+        FanFace last{}; // its entry is the other end
+        unsigned int point = 0;
+        std::vector<FanFace> fan; // the faces around the point from behind `first` up to but excluding `last`
+        std::vector<unsigned int> ring; // the points around the end without the other end, ascending
+    };
+
+    struct CollapsingEdge {
+        EdgeEnd start; // its point is kept, and moves to the midpoint
+        EdgeEnd end; // its point is removed
         float3 midpoint{};
-        std::vector<FanFace> startFan; // from behind `face` up to but excluding `across`
-        std::vector<FanFace> endFan; // from behind `across` up to but excluding `face`
-        std::vector<unsigned int> startRing, endRing, sharedRing; // the points around the ends, without the other end
+        std::vector<unsigned int> sharedRing;
     };
 
     bool hasOnlyTriangles(IndexArray const& faceOffset, unsigned int faceCount)
@@ -215,7 +236,7 @@ namespace {
     Orvan::Array<Triangle> buildFaceAdjacency(TriangleMesh const& mesh, PointCorners const& around)
     {
         Orvan::Array<Triangle> adjacency = uninitializedArray<Triangle>(mesh.faceCount);
-        Triangle* const neighbours = adjacency.data;
+        Triangle* const neighbors = adjacency.data;
         unsigned int const* const faceVertex = mesh.faceVertex->data;
         unsigned int const* const offset = around.offsets.data;
         unsigned int const* const corners = around.corners.data;
@@ -227,7 +248,7 @@ namespace {
                 for (unsigned int i = offset[point]; i != offset[point + 1]; ++i) {
                     unsigned int const face = corners[i] / 3;
                     unsigned int const edge = corners[i] % 3;
-                    neighbours[face][edge] = twins.faceFrom(faceVertex[std::size_t{3} * face + next(edge)]);
+                    neighbors[face][edge] = twins.faceFrom(faceVertex[std::size_t{3} * face + next(edge)]);
                 }
             }
         });
@@ -262,11 +283,11 @@ namespace {
         return collapsing;
     }
 
-    /// Which edge of `face` has `neighbour` on its other side.
-    unsigned int neighbourIndex(CollapsingMesh const& mesh, unsigned int face, unsigned int neighbour)
+    /// Which edge of `face` has `neighbor` on its other side.
+    unsigned int neighborIndex(CollapsingMesh const& mesh, unsigned int face, unsigned int neighbor)
     {
-        Triangle const& neighbours = mesh.adjacency[face];
-        return neighbours[0] == neighbour ? 0 : neighbours[1] == neighbour ? 1 : 2;
+        Triangle const& neighbors = mesh.adjacency[face];
+        return neighbors[0] == neighbor ? 0 : neighbors[1] == neighbor ? 1 : 2;
     }
 
     /// The face around the same point behind `current`. Nothing at a boundary, and where faces do not fit together.
@@ -275,60 +296,53 @@ namespace {
         unsigned int const face = mesh.adjacency[current.face][previous(current.entry)];
         if (face == kInvalidIndex || mesh.isRemoved(face))
             return std::nullopt;
-        unsigned int const entry = neighbourIndex(mesh, face, current.face);
+        unsigned int const entry = neighborIndex(mesh, face, current.face);
         bool const isMutual = mesh.adjacency[face][entry] == current.face
             && mesh.corners(face)[entry] == mesh.corners(current.face)[current.entry];
         return isMutual ? std::optional<FanFace>({face, entry}) : std::nullopt;
     }
 
-    /// Lists the faces around a point that lie between two neighbouring faces, behind `first` and before `last`.
-    /// False unless the fan closes and holds all faces of the point, which it does not around boundaries and
-    /// non-manifold points, and unless `accept` takes each of the listed faces: with the first that it does not the
-    /// walk ends, so that collapses at a hub are refused without going all around it.
-    template <class Accept> bool collectFan(CollapsingMesh const& mesh, FanFace const& first, FanFace const& last,
-        Accept const& accept, std::vector<FanFace>& fan)
+    /// Lists the faces around an end of the edge. False unless the fan closes and holds all faces of the point, which it
+    /// does not around boundaries and non-manifold points, and unless `accept` takes each of the listed faces. The walk
+    /// ends with the first face that it does not take.
+    template <class Accept> bool collectFan(CollapsingMesh const& mesh, Accept const& accept, EdgeEnd& end)
     {
-        fan.clear();
-        FanFace current = first;
-        for (unsigned int left = mesh.valence[mesh.corners(first.face)[first.entry]]; left > 1; --left) {
+        end.fan.clear();
+        FanFace current = end.first;
+        for (unsigned int left = mesh.valence[end.point]; left > 1; --left) {
             std::optional<FanFace> const around = nextAround(mesh, current);
-            if (!around || around->face == first.face)
+            if (!around || around->face == end.first.face)
                 return false;
-            if (around->face == last.face)
-                return left == 2 && mesh.adjacency[around->face][previous(around->entry)] == first.face;
+            if (around->face == end.last.face)
+                return left == 2 && mesh.adjacency[around->face][previous(around->entry)] == end.first.face;
             if (!accept(*around))
                 return false;
-            fan.push_back(*around);
+            end.fan.push_back(*around);
             current = *around;
         }
         return false;
     }
 
-    /// The points around an end of the edge, without the other end, ascending. The fan lacks
-    /// the face that closes it.
-    void collectRing(CollapsingMesh const& mesh, std::vector<FanFace> const& fan, unsigned int thirdPointOfLast,
-        std::vector<unsigned int>& ring)
+    void collectRing(CollapsingMesh const& mesh, EdgeEnd& end)
     {
-        ring.assign(1, thirdPointOfLast);
-        for (FanFace const& around : fan)
-            ring.push_back(mesh.corners(around.face)[next(around.entry)]);
-        std::sort(ring.begin(), ring.end());
+        end.ring.assign(1, mesh.corners(end.last.face)[previous(end.last.entry)]);
+        for (FanFace const& around : end.fan)
+            end.ring.push_back(mesh.corners(around.face)[next(around.entry)]);
+        std::sort(end.ring.begin(), end.ring.end());
     }
 
     /// Whether the ends of the edge have just the third points of its two faces in common, and are not both of valence
     /// 3: that collapse would close up a tetrahedron.
-    bool collapseKeepsLink(CollapsingMesh const& mesh, EdgeFans& fans)
+    bool collapseKeepsLink(
+        CollapsingMesh const& mesh, EdgeEnd const& smaller, EdgeEnd& larger, std::vector<unsigned int>& sharedRing)
     {
-        unsigned int const third = mesh.corners(fans.face.face)[previous(fans.face.entry)];
-        unsigned int const thirdAcross = mesh.corners(fans.across.face)[previous(fans.across.entry)];
-        collectRing(mesh, fans.startFan, thirdAcross, fans.startRing);
-        collectRing(mesh, fans.endFan, third, fans.endRing);
-        if (fans.startRing.size() == 2 && fans.endRing.size() == 2)
+        collectRing(mesh, larger);
+        if (smaller.ring.size() == 2 && larger.ring.size() == 2)
             return false;
-        fans.sharedRing.clear();
-        std::set_intersection(fans.startRing.begin(), fans.startRing.end(), fans.endRing.begin(), fans.endRing.end(),
-            std::back_inserter(fans.sharedRing));
-        return fans.sharedRing.size() == 2;
+        sharedRing.clear();
+        std::set_intersection(smaller.ring.begin(), smaller.ring.end(), larger.ring.begin(), larger.ring.end(),
+            std::back_inserter(sharedRing));
+        return sharedRing.size() == 2;
     }
 
     /// Unit vectors along the edges of a face around a point, which is its corner `entry`.
@@ -375,90 +389,229 @@ namespace {
         return !(dot(newNormal, originalNormal(original, mesh, around, now)) <= 0);
     }
 
-    /// Whether the edge has a face on both sides, both ends have closed fans, and no face around them turns over.
-    bool collectFans(TriangleMesh const& original, CollapsingMesh const& mesh, FanFace const& face, EdgeFans& fans)
+    constexpr unsigned int kHubValence = 48; // up to here a walk is cheaper than looking up what is known
+
+    Hub walkAround(CollapsingMesh const& mesh, FanFace const& first)
+    {
+        Hub hub;
+        hub.refusing.fill(kInvalidIndex);
+        std::size_t const valence = mesh.valence[mesh.corners(first.face)[first.entry]];
+        hub.ring.reserve(valence);
+        std::optional<FanFace> current = first;
+        do {
+            if (!hub.ring.insert(mesh.corners(current->face)[next(current->entry)]).second)
+                return hub;
+            current = nextAround(mesh, *current);
+        } while (current && current != first);
+        hub.fan = current && hub.ring.size() == valence ? Hub::Fan::Closed : Hub::Fan::Open;
+        return hub;
+    }
+
+    /// Whether the two faces of the edge follow each other around the end, and have it at one corner only.
+    bool fitsHub(CollapsingMesh const& mesh, EdgeEnd const& end, EdgeEnd const& other)
+    {
+        auto const hasOnce = [&](unsigned int face) {
+            return std::count(mesh.corners(face), mesh.corners(face) + 3, end.point) == 1;
+        };
+        return mesh.corners(end.first.face)[next(end.first.entry)] == other.point && hasOnce(end.first.face)
+            && hasOnce(end.last.face) && nextAround(mesh, {end.last.face, next(end.last.entry)}) == end.first;
+    }
+
+    /// What is known about the end of an edge with more faces. Null if that has few faces, or if a walk around it could
+    /// find something else for this edge than for others, which happens in meshes that are not manifold.
+    Hub* findHub(EdgeEnd const& end, EdgeEnd const& other, CollapsingMesh& mesh)
+    {
+        bool const isHub = mesh.valence[end.point] > kHubValence && fitsHub(mesh, end, other)
+            && std::adjacent_find(other.ring.begin(), other.ring.end()) == other.ring.end();
+        if (!isHub)
+            return nullptr;
+        auto entry = mesh.hubs.find(end.point);
+        if (entry == mesh.hubs.end())
+            entry = mesh.hubs.emplace(end.point, walkAround(mesh, end.first)).first;
+        return entry->second.fan == Hub::Fan::Tangled ? nullptr : &entry->second;
+    }
+
+    bool hubKeepsLink(Hub const& hub, EdgeEnd const& other)
+    {
+        auto const isShared = [&](unsigned int point) { return point != other.point && hub.ring.contains(point); };
+        return hub.fan == Hub::Fan::Closed && std::count_if(other.ring.begin(), other.ring.end(), isShared) == 2;
+    }
+
+    /// Lists the faces around a hub as `collectFan` does, but first asks those that refused other edges.
+    template <class Accept>
+    bool collectFanOfHub(CollapsingMesh const& mesh, Accept const& accept, Hub& hub, EdgeEnd& end)
+    {
+        for (unsigned int const face : hub.refusing) {
+            if (face == kInvalidIndex || mesh.isRemoved(face) || face == end.first.face || face == end.last.face)
+                continue;
+            unsigned int const* const corners = mesh.corners(face);
+            auto const entry = static_cast<unsigned int>(std::find(corners, corners + 3, end.point) - corners);
+            if (entry != 3 && !accept({face, entry}))
+                return false;
+        }
+        auto const acceptOrRemember = [&](FanFace const& around) {
+            bool const isAccepted = accept(around);
+            if (!isAccepted) {
+                std::copy_backward(hub.refusing.begin(), hub.refusing.end() - 1, hub.refusing.end());
+                hub.refusing.front() = around.face;
+            }
+            return isAccepted;
+        };
+        return collectFan(mesh, acceptOrRemember, end);
+    }
+
+    /// Whether the edge has a face on both sides, both ends have closed fans, no face around them turns over, and the
+    /// surface stays manifold.
+    bool canCollapse(TriangleMesh const& original, FanFace const& face, CollapsingMesh& mesh, CollapsingEdge& edge)
     {
         unsigned int const across = mesh.adjacency[face.face][face.entry];
         if (across == kInvalidIndex || across == face.face || mesh.isRemoved(across))
             return false;
-        fans.face = face;
-        fans.across = {across, neighbourIndex(mesh, across, face.face)};
-        fans.start = mesh.corners(face.face)[face.entry];
-        fans.end = mesh.corners(face.face)[next(face.entry)];
-        bool const isMutual = mesh.adjacency[across][fans.across.entry] == face.face
-            && mesh.corners(across)[fans.across.entry] == fans.end;
-        if (!isMutual || fans.start == fans.end)
+        auto& [start, end, midpoint, sharedRing] = edge;
+        start.first = end.last = face;
+        start.last = end.first = {across, neighborIndex(mesh, across, face.face)};
+        start.point = mesh.corners(face.face)[face.entry];
+        end.point = mesh.corners(face.face)[next(face.entry)];
+        bool const isMutual = mesh.adjacency[across][start.last.entry] == face.face
+            && mesh.corners(across)[start.last.entry] == end.point;
+        if (!isMutual || start.point == end.point)
             return false;
-        fans.midpoint = (mesh.positions[fans.start] + mesh.positions[fans.end]) * 0.5f;
-        auto const keepsOrientation = [&, midpoint = fans.midpoint](FanFace const& around) {
-            return faceKeepsOrientation(original, mesh, around, midpoint);
+        midpoint = (mesh.positions[start.point] + mesh.positions[end.point]) * 0.5f;
+        auto const keepsOrientation = [&, middle = midpoint](FanFace const& around) {
+            return faceKeepsOrientation(original, mesh, around, middle);
         };
-        return collectFan(mesh, fans.face, fans.across, keepsOrientation, fans.startFan)
-            && collectFan(mesh, fans.across, fans.face, keepsOrientation, fans.endFan);
+        // The end with fewer faces first: most collapses that are refused cost no more than a walk around that.
+        bool const isStartLarger = mesh.valence[start.point] > mesh.valence[end.point];
+        EdgeEnd& smaller = isStartLarger ? end : start;
+        EdgeEnd& larger = isStartLarger ? start : end;
+        if (!collectFan(mesh, keepsOrientation, smaller))
+            return false;
+        collectRing(mesh, smaller);
+        if (Hub* const hub = findHub(larger, smaller, mesh))
+            return hubKeepsLink(*hub, smaller) && collectFanOfHub(mesh, keepsOrientation, *hub, larger);
+        return collectFan(mesh, keepsOrientation, larger) && collapseKeepsLink(mesh, smaller, larger, sharedRing);
     }
 
-    void replaceNeighbour(unsigned int face, unsigned int from, unsigned int to, CollapsingMesh& mesh)
+    bool isNeighborOnce(CollapsingMesh const& mesh, unsigned int face, unsigned int neighbor)
     {
-        Triangle& neighbours = mesh.adjacency[face];
-        auto const first = std::find(neighbours.begin(), neighbours.end(), from);
-        if (first != neighbours.end())
+        return std::count(mesh.adjacency[face].begin(), mesh.adjacency[face].end(), neighbor) == 1;
+    }
+
+    /// Whether the face across an edge of `face` has that edge reversed, and the two have no other edge in common.
+    bool fitsAcross(CollapsingMesh const& mesh, unsigned int face, unsigned int edge)
+    {
+        unsigned int const across = mesh.adjacency[face][edge];
+        unsigned int const entry = neighborIndex(mesh, across, face);
+        return mesh.corners(across)[entry] == mesh.corners(face)[next(edge)]
+            && mesh.corners(across)[next(entry)] == mesh.corners(face)[edge] && isNeighborOnce(mesh, face, across)
+            && isNeighborOnce(mesh, across, face);
+    }
+
+    /// Whether the two faces behind a face that is removed will have just the edge in common along which they are joined.
+    bool joinsPlainly(CollapsingMesh const& mesh, FanFace const& removed)
+    {
+        auto const [face, edge] = removed;
+        Triangle const& beyond = mesh.adjacency[mesh.adjacency[face][next(edge)]];
+        return fitsAcross(mesh, face, edge) && fitsAcross(mesh, face, next(edge))
+            && fitsAcross(mesh, face, previous(edge))
+            && std::find(beyond.begin(), beyond.end(), mesh.adjacency[face][previous(edge)]) == beyond.end();
+    }
+
+    /// Carries what is known about hubs over the collapse that comes next.
+    void updateHubs(CollapsingEdge const& edge, CollapsingMesh& mesh)
+    {
+        if (mesh.hubs.empty())
+            return;
+        unsigned int const kept = edge.start.point, removed = edge.end.point;
+        for (FanFace const& face : {edge.start.first, edge.end.first})
+            if (!joinsPlainly(mesh, face))
+                for (unsigned int const side : {next(face.entry), previous(face.entry)}) {
+                    unsigned int const* const corners = mesh.corners(mesh.adjacency[face.face][side]);
+                    std::for_each(corners, corners + 3, [&](unsigned int point) { mesh.hubs.erase(point); });
+                }
+        for (FanFace const& around : edge.end.fan)
+            for (unsigned int const entry : {next(around.entry), previous(around.entry)}) {
+                auto const hub = mesh.hubs.find(mesh.corners(around.face)[entry]);
+                if (hub != mesh.hubs.end() && hub->second.ring.erase(removed) != 0)
+                    hub->second.ring.insert(kept);
+            }
+
+        bool const isStartLarger = mesh.valence[kept] > mesh.valence[removed];
+        EdgeEnd const& larger = isStartLarger ? edge.start : edge.end;
+        EdgeEnd const& smaller = isStartLarger ? edge.end : edge.start;
+        auto joined = mesh.hubs.extract(larger.point);
+        mesh.hubs.erase(smaller.point);
+        if (joined.empty() || joined.mapped().fan != Hub::Fan::Closed)
+            return;
+        joined.key() = kept;
+        joined.mapped().ring.erase(smaller.point);
+        joined.mapped().ring.insert(smaller.ring.begin(), smaller.ring.end());
+        mesh.hubs.insert(std::move(joined));
+    }
+
+    void replaceNeighbor(unsigned int face, unsigned int from, unsigned int to, CollapsingMesh& mesh)
+    {
+        Triangle& neighbors = mesh.adjacency[face];
+        auto const first = std::find(neighbors.begin(), neighbors.end(), from);
+        if (first != neighbors.end())
             *first = to;
     }
 
-    /// Joins the faces on both sides of the two faces that go.
-    void glueHoles(EdgeFans const& fans, CollapsingMesh& mesh)
+    /// Joins the faces on both sides of the two faces that are removed.
+    void glueHoles(CollapsingEdge const& collapse, CollapsingMesh& mesh)
     {
-        auto const [f, edge] = fans.face;
-        auto const [g, edgeAcross] = fans.across;
+        auto const [f, edge] = collapse.start.first;
+        auto const [g, edgeAcross] = collapse.end.first;
         // All four are read before anything changes.
         unsigned int const behindEnd = mesh.adjacency[f][next(edge)];
         unsigned int const behindStart = mesh.adjacency[f][previous(edge)];
         unsigned int const acrossBehindStart = mesh.adjacency[g][next(edgeAcross)];
         unsigned int const acrossBehindEnd = mesh.adjacency[g][previous(edgeAcross)];
-        replaceNeighbour(behindEnd, f, behindStart, mesh);
-        replaceNeighbour(behindStart, f, behindEnd, mesh);
-        replaceNeighbour(acrossBehindEnd, g, acrossBehindStart, mesh);
-        replaceNeighbour(acrossBehindStart, g, acrossBehindEnd, mesh);
+        replaceNeighbor(behindEnd, f, behindStart, mesh);
+        replaceNeighbor(behindStart, f, behindEnd, mesh);
+        replaceNeighbor(acrossBehindEnd, g, acrossBehindStart, mesh);
+        replaceNeighbor(acrossBehindStart, g, acrossBehindEnd, mesh);
     }
 
     /// Marks a face of the edge as removed. It still has the end of the edge at a corner, which counts for the start
     /// now.
-    void removeFace(unsigned int face, EdgeFans const& fans, CollapsingMesh& mesh)
+    void removeFace(unsigned int face, CollapsingEdge const& edge, CollapsingMesh& mesh)
     {
         unsigned int* const corners = mesh.corners(face);
         for (unsigned int k = 0; k != 3; ++k)
-            --mesh.valence[corners[k] == fans.end ? fans.start : corners[k]];
+            --mesh.valence[corners[k] == edge.end.point ? edge.start.point : corners[k]];
         corners[0] = kInvalidIndex;
         mesh.removedFaces.push_back(face);
     }
 
-    void collapseEdge(EdgeFans const& fans, CollapsingMesh& mesh)
+    void collapse(CollapsingEdge const& edge, CollapsingMesh& mesh)
     {
-        mesh.positions[fans.start] = fans.midpoint;
-        mesh.removedPoints.push_back(fans.end);
-        for (FanFace const& around : fans.endFan)
-            std::replace(mesh.corners(around.face), mesh.corners(around.face) + 3, fans.end, fans.start);
-        glueHoles(fans, mesh);
+        unsigned int const kept = edge.start.point, removed = edge.end.point;
+        updateHubs(edge, mesh);
+        mesh.positions[kept] = edge.midpoint;
+        mesh.removedPoints.push_back(removed);
+        for (FanFace const& around : edge.end.fan)
+            std::replace(mesh.corners(around.face), mesh.corners(around.face) + 3, removed, kept);
+        glueHoles(edge, mesh);
 
-        mesh.valence[fans.start] += std::exchange(mesh.valence[fans.end], 0);
-        removeFace(fans.face.face, fans, mesh);
-        removeFace(fans.across.face, fans, mesh);
-        for (std::vector<FanFace> const* const fan : {&fans.startFan, &fans.endFan})
-            for (FanFace const& around : *fan)
+        mesh.valence[kept] += std::exchange(mesh.valence[removed], 0);
+        removeFace(edge.start.first.face, edge, mesh);
+        removeFace(edge.end.first.face, edge, mesh);
+        for (EdgeEnd const* const end : {&edge.start, &edge.end})
+            for (FanFace const& around : end->fan)
                 mesh.visits[around.face] = FaceVisit::Changed;
     }
 
     void collapseSlivers(TriangleMesh const& original, float ratio, CollapsingMesh& mesh)
     {
-        EdgeFans fans;
+        CollapsingEdge edge;
         for (unsigned int face = nextVisit(mesh.visits, 0); face != original.faceCount;
              face = nextVisit(mesh.visits, std::uint64_t{face} + 1)) {
             if (mesh.isRemoved(face))
                 continue;
             EdgeLengths const lengths = measureEdges(mesh.corners(face), mesh.positions.data);
-            if (isSliver(lengths, ratio) && collectFans(original, mesh, {face, lengths.shortestEdge}, fans)
-                && collapseKeepsLink(mesh, fans))
-                collapseEdge(fans, mesh);
+            if (isSliver(lengths, ratio) && canCollapse(original, {face, lengths.shortestEdge}, mesh, edge))
+                collapse(edge, mesh);
         }
     }
 

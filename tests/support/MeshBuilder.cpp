@@ -129,6 +129,18 @@ MeshBuilder MeshBuilder::bipyramid(unsigned int rim)
     return mesh;
 }
 
+MeshBuilder MeshBuilder::wheel(unsigned int rim)
+{
+    MeshBuilder mesh = bipyramid(rim);
+    for (unsigned int point = 0; point < rim; point += 2) {
+        mesh.points[point].x *= 0.02f;
+        mesh.points[point].y *= 0.02f;
+    }
+    mesh.points[rim].z = 0.001f;
+    mesh.points[rim + 1].z = -0.001f;
+    return mesh;
+}
+
 MeshBuilder MeshBuilder::square(unsigned int segments)
 {
     PolygonMesh const quads = PolygonMesh::quads(segments);
