@@ -39,7 +39,12 @@ std::vector<Voxel> bandOfVoxels(float radius)
     return voxels;
 }
 
-template <class Traits> struct Guide {
+/// How samples come by the values across the border of a tile: from a padded channel, from a layer on the upper sides, or
+/// from one all around, since values are in the middle of their voxels.
+enum class Layers { padded, positive, full };
+
+template <class Traits, Layers layers> struct Guide {
+    static constexpr bool kIsFull = layers == Layers::full;
     Volume<Traits> volume;
     Channel<Traits, float> padded;
 
@@ -50,19 +55,23 @@ template <class Traits> struct Guide {
             VoxelList const list{Traits::kUnitDepth, voxels};
             VolumeSource source;
             source.background = 1;
+            source.offsetType = kIsFull ? 0 : 7;
             source.depth = Traits::kUnitDepth;
             source.lists = {&list, 1};
             Guide made{buildVolume<Traits>(source), Channel<Traits, float>()};
-            made.padded = makeHaloChannel(made.volume);
+            if (layers == Layers::padded)
+                made.padded = makeHaloChannel(made.volume);
             return made;
         }();
         return guide;
     }
 
-    LinearSampler<Traits> sampler(bool isPadded) const
+    LinearSampler<Traits> sampler() const
     {
-        return {volume.container, volume.channel, volume.topology, {.scale = kRadius, .background = volume.background},
-            isPadded ? &padded : nullptr};
+        float const offset = kIsFull ? 0.5f : 0;
+        return {volume.container, volume.channel, volume.topology,
+            {.scale = kRadius, .voxelOffset = {offset, offset, offset}, .background = volume.background},
+            layers == Layers::padded ? &padded : nullptr};
     }
 };
 
@@ -103,9 +112,9 @@ template <class Mark> void measureMarking(benchmark::State& state, Mark const& m
     Benchmarks::countElements(state, mesh.faces);
 }
 
-template <class Traits, bool isPadded> void markByVolume(benchmark::State& state)
+template <class Traits, Layers layers> void markByVolume(benchmark::State& state)
 {
-    auto const sampler = Guide<Traits>::get().sampler(isPadded);
+    auto const sampler = Guide<Traits, layers>::get().sampler();
     measureMarking(state, [&](FlatMesh const& mesh, Orvan::Array<bool>& marks) {
         Geometry::Mesh::Internal::markForSubdivision(
             sampler, mesh.faces, mesh.points, mesh.corners, mesh.offsets, marks, kTolerance);
@@ -140,12 +149,12 @@ void allFaceCounts(benchmark::internal::Benchmark* benchmark)
 
 enum class Order { alongMesh, random };
 
-template <class Traits, bool isPadded, Order order, bool inRows> void sampleVolume(benchmark::State& state)
+template <class Traits, Layers layers, Order order, bool inRows> void sampleVolume(benchmark::State& state)
 {
     std::vector<float3> points = pointsInBand(static_cast<std::size_t>(state.range(0)), 1);
     if (order == Order::random)
         std::shuffle(points.begin(), points.end(), std::mt19937(1));
-    auto sampler = Guide<Traits>::get().sampler(isPadded);
+    auto sampler = Guide<Traits, layers>::get().sampler();
     std::vector<float> values(points.size());
     for (auto _ : state) {
         if (inRows)
@@ -160,15 +169,15 @@ template <class Traits, bool isPadded, Order order, bool inRows> void sampleVolu
 }
 
 /// Rows of points, and beside them the same points one by one.
-template <class Traits, bool isPadded> void registerSampling(std::string const& name)
+template <class Traits, Layers layers> void registerSampling(std::string const& name)
 {
     auto const add = [](std::string const& full, void (*run)(benchmark::State&)) {
         benchmark::RegisterBenchmark(full.c_str(), run)->Apply(allFaceCounts);
     };
-    add(name, sampleVolume<Traits, isPadded, Order::alongMesh, true>);
-    add(name + ":single", sampleVolume<Traits, isPadded, Order::alongMesh, false>);
-    add(name + "AtRandom", sampleVolume<Traits, isPadded, Order::random, true>);
-    add(name + "AtRandom:single", sampleVolume<Traits, isPadded, Order::random, false>);
+    add(name, sampleVolume<Traits, layers, Order::alongMesh, true>);
+    add(name + ":single", sampleVolume<Traits, layers, Order::alongMesh, false>);
+    add(name + "AtRandom", sampleVolume<Traits, layers, Order::random, true>);
+    add(name + "AtRandom:single", sampleVolume<Traits, layers, Order::random, false>);
 }
 
 #ifdef MODELING_HAS_OPENVDB
@@ -218,20 +227,22 @@ void allRadii(benchmark::internal::Benchmark* benchmark)
 
 }
 
-BENCHMARK(markByVolume<Traits2, true>)->Name("markByPaddedVolume")->Apply(allFaceCounts);
+BENCHMARK(markByVolume<Traits2, Layers::padded>)->Name("markByPaddedVolume")->Apply(allFaceCounts);
 BENCHMARK(markByLength)->Name("markByPaddedVolume:length")->Apply(allFaceCounts);
-BENCHMARK(markByVolume<Traits2, false>)->Name("markByVolume")->Apply(allFaceCounts);
+BENCHMARK(markByVolume<Traits2, Layers::positive>)->Name("markByVolume")->Apply(allFaceCounts);
 BENCHMARK(markByLength)->Name("markByVolume:length")->Apply(allFaceCounts);
-BENCHMARK(markByVolume<Traits5, true>)->Name("markByPaddedVolume5")->Apply(allFaceCounts);
+BENCHMARK(markByVolume<Traits5, Layers::padded>)->Name("markByPaddedVolume5")->Apply(allFaceCounts);
 BENCHMARK(markByLength)->Name("markByPaddedVolume5:length")->Apply(allFaceCounts);
-BENCHMARK(markByVolume<Traits5, false>)->Name("markByVolume5")->Apply(allFaceCounts);
+BENCHMARK(markByVolume<Traits5, Layers::positive>)->Name("markByVolume5")->Apply(allFaceCounts);
 BENCHMARK(markByLength)->Name("markByVolume5:length")->Apply(allFaceCounts);
 
 [[maybe_unused]] bool const areSamplesRegistered = [] {
-    registerSampling<Traits2, true>("samplePaddedVolume");
-    registerSampling<Traits2, false>("sampleVolume");
-    registerSampling<Traits5, true>("samplePaddedVolume5");
-    registerSampling<Traits5, false>("sampleVolume5");
+    registerSampling<Traits2, Layers::padded>("samplePaddedVolume");
+    registerSampling<Traits2, Layers::positive>("sampleVolume");
+    registerSampling<Traits2, Layers::full>("sampleCenteredVolume");
+    registerSampling<Traits5, Layers::padded>("samplePaddedVolume5");
+    registerSampling<Traits5, Layers::positive>("sampleVolume5");
+    registerSampling<Traits5, Layers::full>("sampleCenteredVolume5");
     return true;
 }();
 

@@ -177,7 +177,7 @@ TYPED_TEST(VoxelSampling, takesRowsAsItTakesPoints)
     for (unsigned int const offsetType : {0u, 3u, 7u}) {
         auto const volume = volumeOf<TypeParam>(field, offsetType);
         auto const padded = makeHaloChannel(volume);
-        for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 1e-5f, 0.5f, 1.0f, 77.0f, -1e20f, kNaN}) {
+        for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 1e-5f, 0.5f, 1.0f, 1.5f, 77.0f, -1e20f, kNaN}) {
             expectSameInRows(samplerOf(volume, {offset, 0, offset}), 6 * TypeParam::kSide);
             expectSameInRows(samplerOf(volume, {offset, offset, 0}, &padded), 6 * TypeParam::kSide);
         }
@@ -424,12 +424,17 @@ TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
     EXPECT_EQ(with({.scale = 2}).sample({p.x / 2, p.y / 2, p.z / 2}, kDepth, kWorldSpace), value);
 
     // A coarse tile, where the tree ends there.
-    std::vector<Voxel> const coarse{{0, 0, 0, 4}, {1, 0, 0, 8}};
+    std::vector<Voxel> const coarse{{0, 0, 0, 4}, {1, 0, 0, 8}, {0, 2, 0, std::numeric_limits<float>::infinity()}};
     VoxelList const lists[] = {{kDepth - 1, coarse}};
     auto const coarseVolume = buildVolume<TypeParam>({.depth = kDepth, .lists = lists});
     auto sampler = samplerOf(coarseVolume);
     EXPECT_FLOAT_EQ(sampled(sampler, {0.25f * kWide, 0, 0}), 5);
     expectSameInRows(sampler, 3 * kWide);
+    // The next value in memory does not count at a tile's last voxel.
+    std::vector<float3> const row(4, {static_cast<float>(kWide * (TypeParam::kSide - 1)), kWide, 0});
+    std::vector<float> values(4);
+    sampler.sampleAll(row.data(), 4, kDepth, kIndexSpace, values.data());
+    EXPECT_EQ(values, std::vector<float>(4, coarseVolume.background));
     EXPECT_EQ(sampler.name().view(), "kLinear");
     using Base = VoxelSampler<TypeParam, float, float3>;
     EXPECT_EQ(static_cast<Base&>(sampler).Base::name().view(), "kNone");
