@@ -30,7 +30,8 @@ namespace Tessara::GeometryAlgorithms {
 ///                all keys erased where an enclosing oneTBB group was cancelled; with the merged mesh, and without what
 ///                is no geometry, where the first input has a connectivity array whose default is no `unsigned int`.
 /// \param runtimeServices  Not looked at; may be null.
-/// \return        False where no input is valid, or there would be more than 2^32 - 1 elements of a component.
+/// \return        False if no input is valid, there would be more than 2^32 - 1 elements of a component, or oneTBB skipped
+///                part of the work because an enclosing task group was cancelled.
 /// \throws        std::bad_alloc, also where the data of a range does not fit 32 bits, with the output as it was. Job
 ///                cancellation is not looked at.
 ///

@@ -11,12 +11,12 @@ namespace Tessara::GeometryAlgorithms {
 /// Joins strand sets into one: points and strands of all inputs in their order, with all properties. What becomes of
 /// properties, of invalid inputs and of an output that is an input is as in `mergeMeshes`.
 ///
-/// \param output  Receives the merged strands. Its other keys stay. Where the result is false it is as it was, but:
-///                with the merged strands, and without what is no geometry, where the first input has strand offsets
-///                whose default is no `unsigned int`; with nothing merged where an enclosing oneTBB group was
-///                cancelled.
+/// \param output  Receives the merged strands. Its other keys stay. Where the result is false it is as it was, but
+///                with the merged strands, and without what is no geometry, if the first input has strand offsets
+///                whose default is no `unsigned int`.
 /// \param runtimeServices  Not looked at; may be null.
-/// \return        False where no input is a valid strand set, or there would be more than 2^32 - 1 points or strands.
+/// \return        False if no input is a valid strand set, there would be more than 2^32 - 1 points or strands, or
+///                oneTBB skipped part of the work because an enclosing task group was cancelled.
 /// \throws        std::bad_alloc, also where the data of a range does not fit 32 bits, with the output as it was. Job
 ///                cancellation is not looked at.
 ///

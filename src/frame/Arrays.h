@@ -83,7 +83,8 @@ template <class T> Orvan::Array<T> zeroedArray(std::uint64_t count)
 
 /// The sums of the counts before each element, and of all of them: entry i is where the things of element i begin, and
 /// the array is one entry longer than the elements.
-/// \param countOf  `unsigned int (std::size_t element)`, called up to twice an element and from several threads
+/// \param countOf  `unsigned int (std::size_t element)`, called several times per element and from several threads; does
+///                 not throw
 /// \throws std::bad_alloc  when memory runs out or the sum does not fit 32 bits
 template <class CountOf> Orvan::Array<unsigned int> offsetsFromCounts(std::size_t elementCount, CountOf const& countOf)
 {
@@ -100,10 +101,9 @@ template <class CountOf> Orvan::Array<unsigned int> offsetsFromCounts(std::size_
         return sum;
     };
     tbb::blocked_range<std::size_t> const all(0, elementCount, kElementGrain);
-    if (elementCount <= kElementGrain)
+    if (elementCount <= kElementGrain
+        || !runIsolated([&] { total = tbb::parallel_scan(all, std::uint64_t{0}, addUp, std::plus<>()); }))
         total = addUp(all, 0, true);
-    else
-        runIsolated([&] { total = tbb::parallel_scan(all, std::uint64_t{0}, addUp, std::plus<>()); });
     if (total > std::numeric_limits<unsigned int>::max())
         throw std::bad_alloc();
     offset[elementCount] = static_cast<unsigned int>(total);

@@ -3,6 +3,7 @@
 #include <tbb/blocked_range.h>
 #include <tbb/task_group.h>
 
+#include <atomic>
 #include <cstddef>
 
 namespace Modeling {
@@ -19,9 +20,19 @@ namespace Internal {
     struct LoopBody {
         void const* body;
         void (*run)(void const* body, std::size_t begin, std::size_t end);
+
+        template <class Index, class Body> static LoopBody of(Body const& body)
+        {
+            return {&body, [](void const* erased, std::size_t begin, std::size_t end) {
+                        (*static_cast<Body const*>(erased))(
+                            tbb::blocked_range<Index>(static_cast<Index>(begin), static_cast<Index>(end)));
+                    }};
+        }
     };
 
     void runLoop(tbb::blocked_range<std::size_t> const& range, LoopBody const& body, bool isolated);
+
+    void throwIfJobIsCancelled();
 
 }
 
@@ -35,7 +46,9 @@ namespace Internal {
 ///                  after the loop the job's cancellation is looked at. Only the balance sweep of subdivision does
 ///                  that; all other operations run to their end once started.
 /// \throws          std::runtime_error with the text of `TSR::exceptionMessage` when not isolated and the job is
-///                  cancelled; and what `body` throws, which ends the other sub-ranges as soon as they return.
+///                  cancelled; the first exception of `body`, which ends the other sub-ranges as soon as they return.
+///                  If oneTBB can allocate no tasks or start no worker thread, the whole range runs on the calling
+///                  thread; std::bad_alloc if by then part of the range has run.
 template <class Index, class Body>
 void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool isolated = true)
 {
@@ -44,34 +57,46 @@ void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool 
             body(range);
         return;
     }
-    auto const run = [](void const* erased, std::size_t begin, std::size_t end) {
-        (*static_cast<Body const*>(erased))(
-            tbb::blocked_range<Index>(static_cast<Index>(begin), static_cast<Index>(end)));
-    };
-    Internal::runLoop({range.begin(), range.end(), range.grainsize()}, {&body, run}, isolated);
+    Internal::runLoop({range.begin(), range.end(), range.grainsize()}, Internal::LoopBody::of<Index>(body), isolated);
+    if (!isolated)
+        Internal::throwIfJobIsCancelled();
 }
 
-/// Runs tasks side by side and waits for all of them, also where one fails or cannot be started. They are left out
-/// where an enclosing oneTBB group has been cancelled: let each leave a mark that it was run.
-template <class... Task> void runTasks(Task const&... tasks)
+/// Runs tasks concurrently and waits for all of them, even if one throws. Failures are those of `parallelFor`.
+/// \return false if some were skipped, which oneTBB does silently if an enclosing task group is cancelled
+template <class... Task> [[nodiscard]] bool runTasks(Task const&... tasks)
 {
-    tbb::task_group group;
-    try {
-        (group.run([&tasks] { tasks(); }), ...);
-    } catch (...) {
-        group.wait();
-        throw;
-    }
-    group.wait();
+    std::atomic<std::size_t> runCount = 0;
+    auto const runOne = [&](std::size_t wanted) {
+        std::size_t place = 0;
+        ((place++ == wanted ? tasks() : void()), ...);
+        runCount.fetch_add(1, std::memory_order_relaxed);
+    };
+    auto const runSome = [&](tbb::blocked_range<std::size_t> const& places) {
+        for (std::size_t place = places.begin(); place != places.end(); ++place)
+            runOne(place);
+    };
+    Internal::runLoop({0, sizeof...(Task), 1}, Internal::LoopBody::of<std::size_t>(runSome), false);
+    return runCount.load(std::memory_order_relaxed) == sizeof...(Task);
 }
 
-/// Runs `work` out of reach of a cancellation of an enclosing oneTBB group: for scans and reductions, which oneTBB
-/// would otherwise leave out silently.
-template <class Work> void runIsolated(Work const& work)
+/// Runs a scan or reduction of oneTBB out of reach of a cancellation of an enclosing task group, which would make
+/// oneTBB skip it silently.
+/// \param work  Its loop bodies do not throw.
+/// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work is done then
+template <class Work> [[nodiscard]] bool runIsolated(Work const& work)
 {
     tbb::task_group_context context(tbb::task_group_context::isolated);
     tbb::task_group group(context);
-    group.run_and_wait(work);
+    bool isDone = false;
+    group.run_and_wait([&] {
+        try {
+            work();
+            isDone = true;
+        } catch (...) { // of oneTBB; if it passed through the group, oneTBB would allocate for it once more
+        }
+    });
+    return isDone;
 }
 
 }

@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <functional>
+#include <new>
 
 namespace Modeling {
 
@@ -40,7 +41,10 @@ namespace {
             return sum;
         };
         tbb::blocked_range<std::size_t> const all(0, pointCount, kElementGrain);
-        runIsolated([&] { tbb::parallel_scan(all, 0u, addUp, std::plus<>()); });
+        if (pointCount <= kFewPoints)
+            addUp(all, 0, true);
+        else if (!runIsolated([&] { tbb::parallel_scan(all, 0u, addUp, std::plus<>()); }))
+            throw std::bad_alloc(); // part of the counts may be sums already
     }
 
 }

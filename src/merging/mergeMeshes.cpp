@@ -8,10 +8,6 @@
 #include <TessaraGeometry/Populate.h>
 #include <TessaraGeometry/Validators.h>
 
-#include <algorithm>
-#include <array>
-#include <atomic>
-
 namespace Tessara::GeometryAlgorithms {
 
 using namespace Modeling;
@@ -40,28 +36,25 @@ namespace {
         Orvan::MutablePtr<Object> points = createObject();
         Orvan::MutablePtr<Object> corners = createObject();
         Orvan::MutablePtr<Object> faces = createObject();
-        std::array<std::atomic<bool>, 3> isDone{};
     };
 
     /// Merges the components side by side. Corners and faces then mean places among the points and corners of all
     /// inputs.
-    void mergeComponents(MergePlan const& plan, MeshOffsets const& offsets, MergedMesh& merged, Object& output)
+    /// \return false if an enclosing task group was cancelled
+    bool mergeComponents(MergePlan const& plan, MeshOffsets const& offsets, MergedMesh& merged, Object& output)
     {
-        runTasks(
+        return runTasks(
             [&] {
                 populateMesh(*merged.points);
                 mergeGeoComponent(plan, sPointComp, *offsets.points, nullptr, *merged.points);
-                merged.isDone[0].store(true, std::memory_order_relaxed);
             },
             [&] {
                 populateMesh(*merged.corners);
                 mergeGeoComponent(plan, sFaceVertexComp, *offsets.corners, &merged.faceVertex, *merged.corners);
-                merged.isDone[1].store(true, std::memory_order_relaxed);
             },
             [&] {
                 populateMesh(*merged.faces);
                 mergeGeoComponent(plan, sFaceComp, *offsets.faces, &merged.faceOffset, *merged.faces);
-                merged.isDone[2].store(true, std::memory_order_relaxed);
             },
             [&] { populateMesh(output); });
     }
@@ -80,10 +73,8 @@ bool mergeMeshes(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output,
     MergedMesh merged{
         {sFaceVertex, *offsets.points, std::nullopt, nullptr}, {sFaceOffset, *offsets.corners, cornerCount, nullptr}};
     Orvan::MutablePtr<Object> const staged = stagedCopy(output);
-    mergeComponents(plan, offsets, merged, *staged);
-    auto const wasRun = [](std::atomic<bool> const& done) { return done.load(std::memory_order_relaxed); };
-    if (!std::all_of(merged.isDone.begin(), merged.isDone.end(), wasRun)) {
-        output.eraseAllProperties(); // an enclosing group was cancelled
+    if (!mergeComponents(plan, offsets, merged, *staged)) {
+        output.eraseAllProperties();
         return false;
     }
 

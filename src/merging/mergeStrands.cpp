@@ -27,7 +27,7 @@ bool mergeStrands(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output
     Orvan::MutablePtr<Object> const points = createObject();
     Orvan::MutablePtr<Object> const strands = createObject();
     Orvan::MutablePtr<Object> const staged = stagedCopy(output);
-    runTasks(
+    bool const isMerged = runTasks(
         [&] {
             populateStrand(*points);
             mergeGeoComponent(plan, sPointComp, *pointOffsets, nullptr, *points);
@@ -37,8 +37,8 @@ bool mergeStrands(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output
             mergeGeoComponent(plan, sStrandComp, *strandOffsets, &connectivity, *strands);
         },
         [&] { populateStrand(*staged); });
-
-    // Whether the tasks were run is not looked at, unlike with meshes: without them there are no strand offsets.
+    if (!isMerged)
+        return false; // an enclosing task group was cancelled
     transferComponentProperties(sPointComp, *points, *staged);
     transferComponentProperties(sStrandComp, *strands, *staged);
     bool const hasStrands = finishConnectivity(connectivity, *strandOffsets, *staged);

@@ -289,22 +289,20 @@ void HalfEdgeDataStructure::swap(HalfEdgeDataStructure& other) noexcept
 bool HalfEdgeDataStructure::hasBoundary(unsigned int numFaces, Orvan::Array<unsigned int> const& faceVertex,
     Orvan::Array<unsigned int> const& faceOffset) const
 {
+    auto const isOpenIn = [&](tbb::blocked_range<unsigned int> const& faces, bool found) {
+        for (unsigned int face = faces.begin(); !found && face != faces.end(); ++face) {
+            if (faceOffset[face + std::uint64_t{1}] - faceOffset[face] < 3)
+                return true;
+            unsigned int const* const c = faceVertex.data + faceOffset[face];
+            found = !find(c[0], c[1]) || !find(c[1], c[2]) || !find(c[2], c[0]);
+        }
+        return found;
+    };
+    tbb::blocked_range<unsigned int> const all(0, numFaces);
     bool isOpen = false;
-    runIsolated([&] {
-        isOpen = tbb::parallel_reduce(
-            tbb::blocked_range<unsigned int>(0, numFaces), false,
-            [&](tbb::blocked_range<unsigned int> const& faces, bool found) {
-                for (unsigned int face = faces.begin(); !found && face != faces.end(); ++face) {
-                    if (faceOffset[face + std::uint64_t{1}] - faceOffset[face] < 3)
-                        return true;
-                    unsigned int const* const c = faceVertex.data + faceOffset[face];
-                    found = !find(c[0], c[1]) || !find(c[1], c[2]) || !find(c[2], c[0]);
-                }
-                return found;
-            },
-            std::logical_or<>(), tbb::auto_partitioner());
-    });
-    return isOpen;
+    bool const isDone = runIsolated(
+        [&] { isOpen = tbb::parallel_reduce(all, false, isOpenIn, std::logical_or<>(), tbb::auto_partitioner()); });
+    return isDone ? isOpen : isOpenIn(all, false);
 }
 
 }

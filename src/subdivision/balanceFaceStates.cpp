@@ -218,13 +218,14 @@ bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
         }
         return largest;
     };
+    tbb::blocked_range<unsigned int> const all(0, numFaces);
     unsigned int largest = 0;
-    runIsolated([&] {
+    bool const isDone = runIsolated([&] {
         largest = tbb::parallel_reduce(
-            tbb::blocked_range<unsigned int>(0, numFaces), 0u, largestDifference,
-            [](unsigned int a, unsigned int b) { return std::max(a, b); }, tbb::auto_partitioner());
+            all, 0u, largestDifference, [](unsigned int a, unsigned int b) { return std::max(a, b); },
+            tbb::auto_partitioner());
     });
-    return largest < 2;
+    return (isDone ? largest : largestDifference(all, 0)) < 2;
 }
 
 }

@@ -1,5 +1,7 @@
-#include "frame/ParallelFor.h"
+#include "frame/Arrays.h"
 
+#include "support/FailingAllocations.h"
+#include "support/FailingThreads.h"
 #include "support/Threads.h"
 
 #include <OrvanCppOpSDK/Job.h>
@@ -7,8 +9,9 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <cstdlib>
 #include <new>
-#include <vector>
+#include <optional>
 
 using namespace Modeling;
 using Range = tbb::blocked_range<std::size_t>;
@@ -61,18 +64,74 @@ TEST(ParallelFor, isOutOfReachOfACancelledGroupWhenIsolated)
     group.run_and_wait([&] {
         group.cancel();
         parallelFor(Range(0, 5000, 1), [&](Range const& range) { visited += range.size(); });
-        runIsolated([&] { hasRun = true; });
+        EXPECT_TRUE(runIsolated([&] { hasRun = true; }));
     });
     EXPECT_EQ(visited, 5000u);
     EXPECT_TRUE(hasRun);
 }
 
-TEST(ParallelFor, carriesExceptionsToTheCaller)
+TEST(ParallelFor, carriesExceptionsToTheCallerEvenIfMemoryIsExhausted)
 {
-    auto const fails = [](Range const& range) {
-        if (range.begin() <= 700 && 700 < range.end())
-            throw std::bad_alloc();
+    std::optional<TestSupport::ExhaustedMemory> exhausted;
+    auto const caught = [&](auto const& work) {
+        bool isCaught = false;
+        try {
+            work([&] {
+                exhausted.emplace();
+                throw std::bad_alloc();
+            });
+        } catch (std::bad_alloc const&) {
+            isCaught = true;
+        }
+        exhausted.reset();
+        return isCaught;
     };
-    EXPECT_THROW(parallelFor(Range(0, 2000, 1), fails), std::bad_alloc);
-    EXPECT_THROW(parallelFor(Range(0, 1000, 1000), fails), std::bad_alloc);
+    auto const loopOf = [](std::size_t grain) {
+        return [=](auto const& fail) {
+            parallelFor(Range(0, 1000, grain), [&](Range const& range) {
+                if (range.begin() <= 700 && 700 < range.end())
+                    fail();
+            });
+        };
+    };
+    auto const tasks = [](auto const& fail) { EXPECT_TRUE(runTasks([] {}, fail, [] {})); };
+    TestSupport::withThreads(1, [&] { // which keeps the memory of its tasks for the next loop
+        loopOf(1)([] {});
+        EXPECT_TRUE(caught(loopOf(1)));
+        EXPECT_TRUE(caught(loopOf(1000)));
+        EXPECT_TRUE(caught(tasks));
+    });
+    EXPECT_THROW(loopOf(1)([] { throw CancelledJob(); }), CancelledJob) << "with several threads";
+}
+
+TEST(ParallelFor, runsOnTheCallingThreadIfNoOtherCanBeCreated)
+{
+    GTEST_FLAG_SET(death_test_style, "threadsafe"); // in a process that has no worker threads yet
+    auto const runEverything = [] {
+        TestSupport::NoNewThreads const none;
+        std::size_t visited = 0;
+        for (bool const isolated : {true, false})
+            parallelFor(
+                Range(0, 5000, 1), [&](Range const& range) { visited += range.size(); }, isolated);
+        bool const isDone = runTasks([&] { ++visited; }, [&] { ++visited; });
+        return isDone && visited == 10'002 && offsetsFromCounts(5000, [](std::size_t) { return 2u; })[5000] == 10'000;
+    };
+    EXPECT_EXIT(std::_Exit(TestSupport::withThreads(8, runEverything) ? 0 : 1), testing::ExitedWithCode(0), "");
+}
+
+TEST(RunTasks, tellWhetherAllWereRun)
+{
+    EXPECT_TRUE(runTasks([] {}, [] {}, [] {}));
+    std::atomic<int> runCount = 0;
+    TestSupport::withThreads(1, [&] {
+        tbb::task_group group;
+        group.run_and_wait([&] {
+            auto const task = [&] {
+                ++runCount;
+                group.cancel();
+            };
+            EXPECT_FALSE(runTasks(task, task, task));
+        });
+    });
+    EXPECT_EQ(runCount, 1);
 }

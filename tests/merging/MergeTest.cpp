@@ -243,20 +243,32 @@ TEST(Merge, raisesAnArrayThatHasTakenThePlaceOfTheConnectivity)
     EXPECT_FALSE(finishConnectivity(connectivity, regions, *output));
 }
 
-TEST(Merge, leavesCancelledGroupsWithoutAResult)
+TEST(Merge, isWholeOrRefusedIfAnEnclosingGroupIsCancelled)
 {
-    Orvan::Ptr<Object> const mesh = PolygonMesh::quads(3).build();
-    Orvan::Ptr<Object> const strands = makeStrands(Orvan::Array<float3>(4), {0, 4});
-    auto const meshOutput = cloudOf(1);
-    auto const strandOutput = deepCopy(*strands);
-    tbb::task_group group;
-    group.run_and_wait([&] {
-        group.cancel();
-        EXPECT_FALSE(mergeMeshes(inputsOf(mesh, mesh), *meshOutput, nullptr));
-        EXPECT_FALSE(mergeStrands(inputsOf(strands, strands), *strandOutput, nullptr));
-    });
-    EXPECT_TRUE(meshOutput->keys()->empty());
-    EXPECT_TRUE(sameContents(*strandOutput, *strands));
+    std::map<Kind, Orvan::Ptr<Object>> const inputs{{Kind::Meshes, PolygonMesh::quads(3).build()},
+        {Kind::PointClouds, cloudOf(3)}, {Kind::Strands, makeStrands(Orvan::Array<float3>(4), {0, 4})}};
+    Object const before = *cloudOf(1);
+    for (auto const& [kind, input] : inputs) {
+        Object expected = before;
+        EXPECT_TRUE(merge(kind, inputsOf(input, input), expected));
+        Object const refused = kind == Kind::Meshes ? Object() : before;
+        bool isReached = true;
+        for (int number = 1; isReached; ++number) {
+            SCOPED_TRACE("cancelled in allocation " + std::to_string(number));
+            Object output = before;
+            bool isMerged = false;
+            withThreads(1, [&] {
+                tbb::task_group group;
+                group.run_and_wait([&] {
+                    isReached = runDuringAllocation(
+                        number, [&] { group.cancel(); },
+                        [&] { isMerged = merge(kind, inputsOf(input, input), output); });
+                });
+            });
+            EXPECT_TRUE(sameContents(output, isMerged ? expected : refused));
+            EXPECT_TRUE(isMerged || kind != Kind::PointClouds);
+        }
+    }
 }
 
 TEST(Merge, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)

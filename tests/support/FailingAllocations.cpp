@@ -6,8 +6,11 @@
 
 #include <atomic>
 #include <cstdlib>
+#include <cstring>
 #include <limits>
 #include <new>
+
+#include <dlfcn.h>
 
 namespace TestSupport {
 
@@ -17,23 +20,34 @@ namespace {
 
     std::atomic<std::int64_t> allocationsLeft = kNever; // before the one that fails
     std::atomic<bool> failsOnce = false;
+    std::atomic<bool> isExhausted = false;
+    std::function<void()> const* atNumber = nullptr; // what happens instead of a failure
     std::atomic<std::int64_t> liveBlocks = 0;
 
     bool mustFail()
     {
+        if (isExhausted.load(std::memory_order_relaxed))
+            return true;
         if (allocationsLeft.load(std::memory_order_relaxed) == kNever)
             return false;
         std::int64_t const left = allocationsLeft.fetch_sub(1);
+        if (atNumber) {
+            if (left == 0)
+                (*atNumber)();
+            return false;
+        }
         return failsOnce ? left == 0 : left <= 0;
+    }
+
+    void* systemBlock(std::size_t bytes, std::size_t alignment)
+    {
+        std::size_t const whole = (std::max<std::size_t>(bytes, 1) + alignment - 1) / alignment * alignment;
+        return alignment <= alignof(std::max_align_t) ? std::malloc(whole) : std::aligned_alloc(alignment, whole);
     }
 
     void* take(std::size_t bytes, std::size_t alignment)
     {
-        if (mustFail())
-            throw std::bad_alloc();
-        std::size_t const whole = (std::max<std::size_t>(bytes, 1) + alignment - 1) / alignment * alignment;
-        void* const block =
-            alignment <= alignof(std::max_align_t) ? std::malloc(whole) : std::aligned_alloc(alignment, whole);
+        void* const block = mustFail() ? nullptr : systemBlock(bytes, alignment);
         if (!block)
             throw std::bad_alloc();
         liveBlocks.fetch_add(1, std::memory_order_relaxed);
@@ -82,6 +96,26 @@ void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
             });
             EXPECT_EQ(liveBlocks, before) << "blocks leaked";
         }
+}
+
+ExhaustedMemory::ExhaustedMemory()
+{
+    isExhausted = true;
+}
+
+ExhaustedMemory::~ExhaustedMemory()
+{
+    isExhausted = false;
+}
+
+bool runDuringAllocation(
+    std::int64_t number, std::function<void()> const& meanwhile, std::function<void()> const& action)
+{
+    atNumber = &meanwhile;
+    allocationsLeft = number - 1;
+    action();
+    atNumber = nullptr;
+    return allocationsLeft.exchange(kNever) < 0;
 }
 
 void expectAllOrNothing(Tessara::Object const& source, std::function<void(Tessara::Object&)> const& edit)
@@ -137,4 +171,35 @@ void operator delete(void* block, std::align_val_t) noexcept
 void operator delete(void* block, std::size_t, std::align_val_t) noexcept
 {
     TestSupport::giveBack(block);
+}
+
+// oneTBB loads an allocator of its own if it can. Here it cannot, and takes the functions below, which may fail. It keeps
+// the memory of its tasks for later loops, so these blocks are not counted.
+extern "C" {
+
+void* dlopen(char const* file, int mode) noexcept
+{
+    static auto const open = reinterpret_cast<decltype(&dlopen)>(dlsym(RTLD_NEXT, "dlopen"));
+    return file && std::strstr(file, "libtbbmalloc") ? nullptr : open(file, mode);
+}
+
+void* scalable_malloc(std::size_t bytes)
+{
+    return TestSupport::isExhausted ? nullptr : std::malloc(bytes);
+}
+
+void* scalable_aligned_malloc(std::size_t bytes, std::size_t alignment)
+{
+    return TestSupport::isExhausted ? nullptr : TestSupport::systemBlock(bytes, alignment);
+}
+
+void scalable_free(void* block)
+{
+    std::free(block);
+}
+
+void scalable_aligned_free(void* block)
+{
+    std::free(block);
+}
 }

@@ -2,6 +2,7 @@
 
 #include <TessaraObject/Object.h>
 
+#include <cstdint>
 #include <functional>
 
 namespace TestSupport {
@@ -15,6 +16,17 @@ using Attempt = std::function<bool(std::function<void()> const& action)>;
 /// once, and in a second trial all from then on; for n = 1, 2, 3 and so on, until the action succeeds. The trial makes
 /// its inputs and checks what the action left of them; afterwards, nothing it took may still be taken.
 void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial);
+
+/// While one lives, no allocation succeeds on any thread, not those of oneTBB either.
+struct ExhaustedMemory {
+    ExhaustedMemory();
+    ~ExhaustedMemory();
+};
+
+/// Runs an action, and `meanwhile` inside its allocation of that number.
+/// \return false if the action has fewer allocations
+bool runDuringAllocation(
+    std::int64_t number, std::function<void()> const& meanwhile, std::function<void()> const& action);
 
 /// Edits copies of an object while allocations fail: each is then as it was, or edited as a whole. Copies share what
 /// they hold with the source, which stays as it is, or have it to themselves.
