@@ -74,10 +74,6 @@ protected:
     MODELING_NO_EXPORT Tessara::Math::float3 distanceFromTile(Tessara::Math::float3 const& p) const noexcept;
     MODELING_NO_EXPORT void enterTile(Tessara::Math::float3 const& p, int depth);
     MODELING_NO_EXPORT void leaveTile() noexcept;
-    MODELING_NO_EXPORT TileType const& tileAt(IJK index, int depth)
-    {
-        return cursor_.tileImpl(index.i, index.j, index.k, depth);
-    }
     MODELING_NO_EXPORT bool hasTile() const noexcept { return tile_->valid; }
     /// \pre  there is one
     MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }

@@ -299,7 +299,7 @@ template <class Traits> inline void VoxelSamplerLinear<Traits, float, 1, float, 
     IJK const index = row.tileOfRun(run);
     KnownTile& known = knownTiles_[placeOfTile(index)];
     if (!known.isOf(index, depth)) {
-        TileType const& tile = Base::tileAt(index, depth);
+        TileType const& tile = neighbours_.tileImpl(index.i, index.j, index.k, depth);
         float const* const values = valuesOf(tile);
         known = {index, depth, values ? values : kNothing, values && tile.depth == depth ? nullptr : &tile};
     }
@@ -307,6 +307,8 @@ template <class Traits> inline void VoxelSamplerLinear<Traits, float, 1, float, 
     if (!known.unlike)
         return;
     TileType const& tile = *known.unlike;
+    if (tile.isRepeated)
+        known.depth = -1; // the next look-up takes its place
     bool const isPlace =
         known.values != kNothing && static_cast<float>(Traits::tileWidth(tile.depth)) <= Internal::kWidestTile;
     for (std::size_t n = run ? row.last[run - 1] + 1 : 0; n <= row.last[run]; ++n) {
