@@ -59,6 +59,8 @@ namespace {
     {
         for (Voxel& voxel : volume.voxels)
             visit(voxel.value);
+        for (float& value : volume.cubeValues)
+            visit(value);
         for (ConstantBox& box : volume.boxes)
             visit(box.value);
     }
@@ -99,12 +101,6 @@ namespace {
         index = static_cast<int>(shifted);
     }
 
-}
-
-template <class Traits> GuideVolume::Tiles<Traits>::Tiles(VolumeSource const& source)
-    : volume(buildVolume<Traits>(source))
-    , paddedChannel(makeHaloChannel(volume))
-{
 }
 
 GuideVolume::GuideVolume(GuideOptions const& options, Report& report)
@@ -162,6 +158,11 @@ void GuideVolume::placeOnLattice(SparseVolume& volume)
     };
     for (Voxel& voxel : volume.voxels)
         move(voxel.i, voxel.j, voxel.k);
+    for (VoxelCube& cube : volume.cubes) {
+        IJK last{cube.first.i + 7, cube.first.j + 7, cube.first.k + 7};
+        move(cube.first.i, cube.first.j, cube.first.k);
+        move(last.i, last.j, last.k);
+    }
     for (ConstantBox& box : volume.boxes) {
         move(box.first.i, box.first.j, box.first.k);
         move(box.end.i, box.end.j, box.end.k);
@@ -177,7 +178,10 @@ void GuideVolume::build(SparseVolume const& volume, int tileSide)
         source.depth = Traits::kUnitDepth;
         source.boxes = volume.boxes;
         source.lists = {&voxels, 1};
-        tiles_.emplace<Tiles<Traits>>(source);
+        source.cubes = volume.cubes;
+        source.cubeValues = volume.cubeValues;
+        source.isPadded = true;
+        volume_ = buildVolume<Traits>(source);
     };
     if (tileSide == Traits5::kSide)
         buildAs(Traits5());
@@ -190,28 +194,29 @@ float3 GuideVolume::toLattice(float3 const& point) const
     return {point.x - shift_.x, point.y - shift_.y, point.z - shift_.z};
 }
 
-template <class Traits> LinearSampler<Traits> GuideVolume::samplerOf(Tiles<Traits> const& tiles, float background) const
+template <class Traits>
+LinearSampler<Traits> GuideVolume::samplerOf(Volume<Traits> const& volume, float background) const
 {
     LinearSamplerSettings settings;
     settings.scale = scale_;
     settings.background = background;
-    return {tiles.volume.container, tiles.volume.channel, tiles.volume.topology, settings, &tiles.paddedChannel};
+    return {volume.container, volume.channel, volume.topology, settings, &volume.channel};
 }
 
-template <class Visit> void GuideVolume::visitTiles(Visit const& visit) const
+template <class Visit> void GuideVolume::visitVolume(Visit const& visit) const
 {
-    if (auto const* const fours = std::get_if<Tiles<Traits2>>(&tiles_))
+    if (auto const* const fours = std::get_if<Volume<Traits2>>(&volume_))
         visit(*fours);
     else
-        visit(std::get<Tiles<Traits5>>(tiles_));
+        visit(std::get<Volume<Traits5>>(volume_));
 }
 
 void GuideVolume::tellCoverage(MeshArrays const& mesh, Report& report) const
 {
     std::uint64_t covered = 0;
-    visitTiles([&]<class Traits>(Tiles<Traits> const& tiles) {
+    visitVolume([&]<class Traits>(Volume<Traits> const& volume) {
         // No number stands for places outside all tiles.
-        LinearSampler<Traits> sampler = samplerOf(tiles, std::numeric_limits<float>::quiet_NaN());
+        LinearSampler<Traits> sampler = samplerOf(volume, std::numeric_limits<float>::quiet_NaN());
         for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
             float3 const& decisive = (*mesh.positions)[mesh.corners(face)[1]];
             covered += std::isnan(sampler.sample(toLattice(decisive), Traits::kDeepest, kWorldSpace)) ? 0u : 1u;
@@ -238,7 +243,8 @@ void GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
         addDataProperty(sPointPosition, sPointComp, positions, mesh);
     };
     movePoints(-1);
-    visitTiles([&](auto const& tiles) { Geometry::Mesh::subdivide(samplerOf(tiles, background_), mesh, tolerance); });
+    visitVolume(
+        [&](auto const& volume) { Geometry::Mesh::subdivide(samplerOf(volume, background_), mesh, tolerance); });
     movePoints(1);
 }
 

@@ -46,19 +46,12 @@ public:
     void refine(float tolerance, Tessara::Object& mesh) const;
 
 private:
-    template <class Traits> struct Tiles {
-        explicit Tiles(TSR::TileTree3D::VolumeSource const& source);
-
-        TSR::TileTree3D::Volume<Traits> volume;
-        TSR::TileTree3D::Channel<Traits, float> paddedChannel;
-    };
-
     void describe(SparseVolume& volume, Report& report);
     void placeOnLattice(SparseVolume& volume);
     void build(SparseVolume const& volume, int tileSide);
-    template <class Traits>
-    TSR::TileTree3D::LinearSampler<Traits> samplerOf(Tiles<Traits> const& tiles, float background) const;
-    template <class Visit> void visitTiles(Visit const& visit) const;
+    template <class Traits> TSR::TileTree3D::LinearSampler<Traits> samplerOf(
+        TSR::TileTree3D::Volume<Traits> const& volume, float background) const;
+    template <class Visit> void visitVolume(Visit const& visit) const;
     Tessara::Math::float3 toLattice(Tessara::Math::float3 const& point) const;
 
     std::string grid_;
@@ -66,7 +59,9 @@ private:
     std::optional<float> smallestPositive_;
     float scale_ = 1; // voxels a unit of length
     Tessara::Math::float3 shift_{0, 0, 0}; // of the voxels from whole multiples of their size
-    std::variant<std::monostate, Tiles<TSR::TileTree3D::Traits2>, Tiles<TSR::TileTree3D::Traits5>> tiles_;
+    std::variant<std::monostate, TSR::TileTree3D::Volume<TSR::TileTree3D::Traits2>,
+        TSR::TileTree3D::Volume<TSR::TileTree3D::Traits5>>
+        volume_; // padded
 };
 
 }

@@ -77,10 +77,6 @@ protected:
     MODELING_NO_EXPORT Tessara::Math::float3 distanceFromTile(Tessara::Math::float3 const& p) const noexcept;
     MODELING_NO_EXPORT void enterTile(Tessara::Math::float3 const& p, int depth);
     MODELING_NO_EXPORT void leaveTile() noexcept;
-    MODELING_NO_EXPORT TileType const& tileAt(IJK index, int depth)
-    {
-        return cursor_.tileImpl(index.i, index.j, index.k, depth);
-    }
     MODELING_NO_EXPORT bool hasTile() const noexcept { return tile_->valid; }
     /// \pre  there is one
     MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }
@@ -133,7 +129,7 @@ public:
     float sample(Tessara::Math::float3 const& point, int depth, int space);
 
     /// The same for `count` points, to the bit. It is faster than `sample`, most of all if consecutive points are mostly
-    /// in the same tile. Allocates 20 kilobytes for the first row of a copy, and without `haloChannel` 0.5 to 1.4
+    /// in the same tile. Allocates 48 kilobytes for the first row of a copy, and without `haloChannel` 0.5 to 1.4
     /// kilobytes for each tile that a layer is built around, until there are 512: it keeps them from one row to the next.
     /// \throws std::bad_alloc  some of `values` may have been written; the sampler can be used again
     void sampleAll(Tessara::Math::float3 const* points, std::size_t count, int depth, int space, float* values);

@@ -127,30 +127,57 @@ namespace {
         volume.translation = {m(3, 0), m(3, 1), m(3, 2)};
     }
 
+    [[noreturn]] void refuseValue(openvdb::Coord const& at, std::filesystem::path const& file, std::string const& grid)
+    {
+        refuse(file,
+            "voxel (" + std::to_string(at[0]) + ", " + std::to_string(at[1]) + ", " + std::to_string(at[2])
+                + ") of grid \"" + grid + "\" holds no finite number");
+    }
+
+    void takeLeaf(openvdb::FloatTree::LeafNodeType const& leaf, std::filesystem::path const& file, SparseVolume& volume)
+    {
+        using Leaf = openvdb::FloatTree::LeafNodeType;
+        static_assert(Leaf::DIM == 8);
+        openvdb::Coord const first = leaf.origin();
+        TSR::TileTree3D::VoxelCube cube{{first[0], first[1], first[2]}, {}, volume.cubeValues.size()};
+        for (int k = 0; k != 8; ++k)
+            for (int place = 0; place != 64; ++place) {
+                openvdb::Coord const at(place % 8, place / 8, k);
+                openvdb::Index const offset = Leaf::coordToOffset(at);
+                if (!leaf.isValueOn(offset))
+                    continue;
+                float const value = leaf.getValue(offset);
+                if (!std::isfinite(value))
+                    refuseValue(first + at, file, volume.name);
+                cube.active[static_cast<std::size_t>(k)] |= std::uint64_t{1} << place;
+                volume.cubeValues.push_back(value);
+            }
+        if (cube.firstValue != volume.cubeValues.size())
+            volume.cubes.push_back(cube);
+    }
+
     void takeValues(openvdb::FloatGrid const& grid, std::filesystem::path const& file, SparseVolume& volume)
     {
         volume.background = grid.background();
         if (!std::isfinite(volume.background))
             refuse(file, "the background of grid \"" + volume.name + "\" is not a finite number");
-        std::size_t voxelCount = 0;
-        for (auto leaf = grid.tree().cbeginLeaf(); leaf; ++leaf)
+        std::size_t voxelCount = 0, leafCount = 0;
+        for (auto leaf = grid.tree().cbeginLeaf(); leaf; ++leaf, ++leafCount)
             voxelCount += leaf->onVoxelCount();
-        volume.voxels.reserve(voxelCount);
-        for (auto at = grid.cbeginValueOn(); at; ++at) {
+        volume.cubeValues.reserve(voxelCount);
+        volume.cubes.reserve(leafCount);
+        for (auto leaf = grid.tree().cbeginLeaf(); leaf; ++leaf)
+            takeLeaf(*leaf, file, volume);
+        auto at = grid.cbeginValueOn();
+        at.setMaxDepth(openvdb::FloatTree::DEPTH - 2); // above leaves
+        for (; at; ++at) {
             openvdb::CoordBBox const box = at.getBoundingBox();
             openvdb::Coord const first = box.min(), last = box.max();
-            float const value = *at;
-            if (!std::isfinite(value))
-                refuse(file,
-                    "voxel (" + std::to_string(first[0]) + ", " + std::to_string(first[1]) + ", "
-                        + std::to_string(first[2]) + ") of grid \"" + volume.name + "\" holds no finite number");
-            if (at.isVoxelValue())
-                volume.voxels.push_back({first[0], first[1], first[2], value});
-            else if (std::max({last[0], last[1], last[2]}) == std::numeric_limits<int>::max())
+            if (!std::isfinite(*at))
+                refuseValue(first, file, volume.name);
+            if (std::max({last[0], last[1], last[2]}) == std::numeric_limits<int>::max())
                 refuse(file, "grid \"" + volume.name + "\" reaches beyond what indices of 32 bits can count");
-            else
-                volume.boxes.push_back(
-                    {{first[0], first[1], first[2]}, {last[0] + 1, last[1] + 1, last[2] + 1}, value});
+            volume.boxes.push_back({{first[0], first[1], first[2]}, {last[0] + 1, last[1] + 1, last[2] + 1}, *at});
         }
     }
 
@@ -164,8 +191,7 @@ namespace {
         for (auto const& [first, end, value] : volume.boxes)
             grid->sparseFill({{first.i, first.j, first.k}, {end.i - 1, end.j - 1, end.k - 1}}, value);
         auto accessor = grid->getAccessor();
-        for (auto const& [i, j, k, value] : volume.voxels)
-            accessor.setValueOn({i, j, k}, value);
+        volume.forEachVoxel([&](int i, int j, int k, float value) { accessor.setValueOn({i, j, k}, value); });
         return grid;
     }
 

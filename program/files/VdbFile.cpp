@@ -36,7 +36,7 @@ namespace {
 
 std::uint64_t SparseVolume::activeCount() const
 {
-    std::uint64_t count = voxels.size();
+    std::uint64_t count = voxels.size() + cubeValues.size();
     for (auto const& [first, end, value] : boxes)
         count += static_cast<std::uint64_t>(std::int64_t{end.i} - first.i)
             * static_cast<std::uint64_t>(std::int64_t{end.j} - first.j)

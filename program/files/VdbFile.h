@@ -5,22 +5,42 @@
 #include <TessaraGeometryVolume/VolumeBuilder.h>
 
 #include <array>
+#include <bit>
 #include <cstdint>
+#include <vector>
 
 namespace ModelingProgram {
 
 /// A float grid of an OpenVDB file: values at the corners of a lattice of cubes, where they are active, and a background
-/// everywhere else. Voxel (i, j, k) stands at `(i, j, k) * voxelSize + translation`.
+/// everywhere else. Voxel (i, j, k) is at `(i, j, k) * voxelSize + translation`.
 struct SparseVolume {
     std::string name;
     double voxelSize = 1;
     std::array<double, 3> translation{};
     float background = 0;
     std::vector<TSR::TileTree3D::Voxel> voxels;
+    // What is read comes in cubes, which take a quarter of the memory.
+    std::vector<TSR::TileTree3D::VoxelCube> cubes;
+    std::vector<float> cubeValues;
     std::vector<TSR::TileTree3D::ConstantBox> boxes; // these do not overlap, nor do they hold one of the voxels
 
     /// Voxels and those in the boxes.
     std::uint64_t activeCount() const;
+
+    /// Calls `visit(i, j, k, value)` for all voxels outside the boxes.
+    template <class Visit> void forEachVoxel(Visit const& visit) const
+    {
+        for (auto const& [i, j, k, value] : voxels)
+            visit(i, j, k, value);
+        for (auto const& [first, active, firstValue] : cubes) {
+            float const* value = cubeValues.data() + firstValue;
+            for (int k = 0; k != 8; ++k)
+                for (std::uint64_t left = active[static_cast<std::size_t>(k)]; left != 0; left &= left - 1) {
+                    int const place = std::countr_zero(left);
+                    visit(first.i + place % 8, first.j + place / 8, first.k + k, *value++);
+                }
+        }
+    }
 };
 
 struct VdbGrid {

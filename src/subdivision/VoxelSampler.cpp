@@ -99,7 +99,8 @@ namespace Internal {
     template <class Traits> struct KnownTile {
         IJK index{};
         int depth = -1;
-        typename Container<Traits>::TileType const* tile = nullptr; // null if it holds no data; may be a coarser one
+        typename Container<Traits>::TileType tile; // a copy, as repeated tiles are not stored; may be a coarser one
+        bool hasData = false;
         // Of a tile of that depth: its own, and those with the layer that samples read, null until they are built.
         float const* values[2] = {};
 
@@ -364,9 +365,9 @@ template <class Traits> float const* VoxelSamplerLinear<Traits, float, 1, float,
     float3 const* points, std::size_t run, int depth, float scale, Internal::PointRow& row)
 {
     Internal::KnownTile<Traits>* known = &knownTile(row.tileOfRun(run), depth);
-    if (!known->tile)
+    if (!known->hasData)
         return kNothing;
-    TileType const& tile = *known->tile;
+    TileType const tile = known->tile; // the entry may be replaced
     if (tile.depth != depth) {
         placeInTile(points, run, tile, scale, row);
         // The outermost tiles begin below what 32 bits hold.
@@ -383,9 +384,9 @@ template <class Traits> auto VoxelSamplerLinear<Traits, float, 1, float, float3,
 {
     Internal::KnownTile<Traits>& known = knownTiles_->at(index, depth);
     if (!known.isOf(index, depth)) {
-        TileType const& tile = Base::tileAt(index, depth);
+        TileType const& tile = neighbours_.tileImpl(index.i, index.j, index.k, depth);
         float const* const values = valuesOf(tile);
-        known = {index, depth, values ? &tile : nullptr, {tile.depth == depth ? values : nullptr, nullptr}};
+        known = {index, depth, tile, values != nullptr, {tile.depth == depth ? values : nullptr, nullptr}};
     }
     return known;
 }

@@ -151,20 +151,69 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
     }
 }
 
-TYPED_TEST(VoxelSampling, findsInCoarseBoxesWhatVoxelsWouldGive)
+TYPED_TEST(VoxelSampling, takesBoxesForTheirVoxels)
 {
-    // Two boxes that meet where coarse tiles end: those there would blend with one another from too far away.
-    auto const end = static_cast<int>(2 * TypeParam::tileWidth(TypeParam::kUnitDepth - 1));
-    ConstantBox const boxes[] = {{{-end, -end, -end}, {0, end, end}, 5}, {{0, -end, -end}, {end, end, end}, 7}};
-    auto const coarse =
-        buildVolume<TypeParam>({.background = kBackground, .depth = TypeParam::kUnitDepth, .boxes = boxes});
-    auto const fine = volumeOf<TypeParam>(Field::of(-end, end, [](int i, int, int) { return i < 0 ? 5.0f : 7.0f; }), 7,
-        TypeParam::kUnitDepth - coarse.channel.coarsestDepth());
-    auto coarseSampler = samplerOf(coarse), fineSampler = samplerOf(fine);
     Random random(2);
-    for (int n = 0; n < 20'000; ++n) {
-        float3 const p = random.point(static_cast<float>(end + 1));
-        ASSERT_EQ(sampled(coarseSampler, p), sampled(fineSampler, p)) << p.x << ' ' << p.y << ' ' << p.z;
+    auto const below = [&](int count) { return static_cast<int>(random.below(static_cast<std::size_t>(count))); };
+    for (int round = 0; round < 16; ++round) {
+        SCOPED_TRACE(round);
+        // Boxes that touch, with other voxels beside and inside, at this depth and others.
+        int const depth = TypeParam::kUnitDepth + below(3) - 1;
+        std::array<std::array<int, 3>, 3> cuts;
+        std::vector<ConstantBox> boxes;
+        std::vector<Voxel> voxels, listed, finer, coarser;
+        for (auto& [first, middle, end] : cuts)
+            first = -below(3) * 8 - 9, middle = below(12) - 6, end = below(3) * 8 + 7;
+        for (std::size_t cell = 0; cell < 8; ++cell) {
+            std::size_t const i = cell & 1, j = cell >> 1 & 1, k = cell >> 2;
+            if (below(3) == 0)
+                continue;
+            boxes.push_back({{cuts[0][i], cuts[1][j], cuts[2][k]}, {cuts[0][i + 1], cuts[1][j + 1], cuts[2][k + 1]},
+                below(2) ? 2.0f : 5.0f});
+            auto const& [first, end, value] = boxes.back();
+            for (int z = first.k; z < end.k; ++z)
+                for (int y = first.j; y < end.j; ++y)
+                    for (int x = first.i; x < end.i; ++x)
+                        voxels.push_back({x, y, z, value});
+        }
+        for (int n = below(3); n > 0; --n)
+            listed.push_back({below(60) - 30, below(60) - 30, below(60) - 30, random.coordinate()});
+        (round % 4 == 1 ? coarser : finer).push_back({below(20) - 10, below(20) - 10, 1, 9});
+        VoxelList const lists[] = {{depth, voxels}, {depth, listed}, {depth - (round % 4 == 1), coarser},
+            {std::min(depth + 1, TypeParam::kDeepest), round % 4 == 2 ? finer : listed}};
+
+        VolumeSource source{.background = kBackground, .depth = depth, .lists = lists};
+        source.offsetType = round % 3 ? 7 : static_cast<unsigned int>(below(7));
+        if (round % 4 == 3)
+            source.coarsestDepth = depth - 2;
+        auto const plain = buildVolume<TypeParam>(source);
+        source.boxes = boxes;
+        source.lists = source.lists.subspan(1);
+        auto const boxed = buildVolume<TypeParam>(source);
+        source.isPadded = true;
+        auto const padded = buildVolume<TypeParam>(source);
+        auto const haloChannel = makeHaloChannel(boxed);
+
+        float3 const offset = offsetsOf(source.offsetType);
+        auto plainSampler = samplerOf(plain, offset), boxedSampler = samplerOf(boxed, offset),
+             haloSampler = samplerOf(boxed, {0, 0, 0}, &haloChannel),
+             paddedSampler = samplerOf(padded, {0, 0, 0}, &padded.channel);
+        float const unit = 1 / TypeParam::voxelsPerUnit(depth);
+        for (int n = 0; n < 3000; ++n) {
+            float3 p = random.point(30);
+            if (n % 2) // the last voxels of boxes, and the first ones behind
+                p.z = float(cuts[2][static_cast<std::size_t>(below(3))]) + random.coordinate();
+            p = {p.x * unit, p.y * unit, p.z * unit};
+            int const asked = depth + below(3) - (source.coarsestDepth ? 2 : 0);
+            float const expected = sampled(plainSampler, p, asked);
+            ASSERT_EQ(sampled(boxedSampler, p, asked), expected) << p.x << ' ' << p.y << ' ' << p.z << ", " << asked;
+            if (source.offsetType == 7) {
+                ASSERT_EQ(sampled(paddedSampler, p, asked), expected);
+                ASSERT_EQ(sampled(haloSampler, p, asked), expected);
+            }
+        }
+        expectSameInRows(boxedSampler, 30 * unit);
+        expectSameInRows(paddedSampler, 30 * unit);
     }
 }
 

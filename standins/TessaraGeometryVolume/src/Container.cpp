@@ -1,6 +1,8 @@
 #include <TessaraGeometryVolume/Container.h>
 
+#include <algorithm>
 #include <new>
+#include <utility>
 
 namespace TSR::TileTree3D {
 
@@ -85,7 +87,7 @@ std::uint32_t Container<Traits>::findOrInsert(std::int64_t i, std::int64_t j, st
         return known.index;
 
     Level& level = levels_[static_cast<std::size_t>(depth)];
-    if (level.tiles.size() >= kNoTile)
+    if (level.tiles.size() >= kFirstRepeated)
         throw std::bad_alloc();
     growSlots(level);
     TileType tile;
@@ -122,15 +124,72 @@ template <class Traits> void Container<Traits>::completeParents()
     }
 }
 
+template <class Traits>
+std::uint32_t Container<Traits>::addRepeated(std::int64_t i, std::int64_t j, std::int64_t k, int depth)
+{
+    if (repeated_.size() >= kNoTile - kFirstRepeated)
+        throw std::bad_alloc();
+    TileType tile;
+    tile.i = i;
+    tile.j = j;
+    tile.k = k;
+    tile.index = kFirstRepeated + static_cast<std::uint32_t>(repeated_.size());
+    tile.depth = depth;
+    tile.valid = tile.isTerminal = tile.isRepeated = true;
+    repeated_.push_back(tile);
+    repeatedDepth_ = depth;
+    return tile.index;
+}
+
+template <class Traits> std::int32_t Container<Traits>::addDivision(Division division)
+{
+    divisions_.push_back(std::move(division));
+    return static_cast<std::int32_t>(divisions_.size() - 1);
+}
+
+template <class Traits> void Container<Traits>::divide(std::uint32_t index, int depth, std::int32_t division)
+{
+    levels_[static_cast<std::size_t>(depth)].tiles[index].division = division;
+    setTerminal(index, depth);
+}
+
+template <class Traits> auto Container<Traits>::repeatedTile(
+    TileType const& divided, std::int64_t i, std::int64_t j, std::int64_t k, TileType& room) const -> TileType const&
+{
+    Division const& division = divisions_[static_cast<std::size_t>(divided.division)];
+    std::int64_t const width = Traits::tileWidth(repeatedDepth_);
+    std::int64_t const number[3] = {(i - divided.i) / width, (j - divided.j) / width, (k - divided.k) / width};
+    std::size_t part[3];
+    for (std::size_t axis = 0; axis < 3; ++axis) {
+        auto const& begins = division.begins[axis];
+        part[axis] =
+            static_cast<std::size_t>(std::upper_bound(begins.begin(), begins.end(), number[axis]) - begins.begin() - 1);
+    }
+    std::uint32_t const index =
+        division.tiles[part[0] + division.begins[0].size() * (part[1] + division.begins[1].size() * part[2])];
+    if (index == Division::kNoRepeated)
+        return noTile();
+    room = repeated_[index - kFirstRepeated];
+    room.i = divided.i + number[0] * width;
+    room.j = divided.j + number[1] * width;
+    room.k = divided.k + number[2] * width;
+    return room;
+}
+
 template <class Traits> std::size_t Container<Traits>::memoryInBytes() const
 {
-    std::size_t bytes = sizeof(*this);
+    std::size_t bytes = sizeof(*this) + repeated_.capacity() * sizeof(TileType);
+    for (Division const& division : divisions_) {
+        bytes += sizeof(division) + division.tiles.capacity() * sizeof(std::uint32_t);
+        for (auto const& begins : division.begins)
+            bytes += begins.capacity() * sizeof(std::uint32_t);
+    }
     for (Level const& level : levels_)
         bytes += level.tiles.capacity() * sizeof(TileType) + level.slots.capacity() * sizeof(std::uint32_t);
     return bytes;
 }
 
-template <class Traits> auto Container<Traits>::ConstTileAccessor::lookUp(int i, int j, int k, int depth) const
+template <class Traits> auto Container<Traits>::ConstTileAccessor::lookUp(int i, int j, int k, int depth)
     -> TileType const&
 {
     if (depth < 0 || depth > Traits::kDeepest)
@@ -141,7 +200,10 @@ template <class Traits> auto Container<Traits>::ConstTileAccessor::lookUp(int i,
     for (int coarser = depth - 1; coarser >= 0 && terminalDepths & ((std::uint32_t{2} << coarser) - 1); --coarser) {
         if (!(terminalDepths >> coarser & 1))
             continue;
-        if (TileType const& tile = container_->find(i, j, k, coarser); tile.isTerminal)
+        TileType const& tile = container_->find(i, j, k, coarser);
+        if (tile.division >= 0 && depth >= container_->repeatedDepth_)
+            return container_->repeatedTile(tile, i, j, k, repeated_);
+        if (tile.isTerminal)
             return tile;
     }
     return noTile();

@@ -1,4 +1,4 @@
-#include <TessaraGeometryVolume/HaloTile.h>
+#include "upperLayer.h"
 
 #include <algorithm>
 
@@ -24,7 +24,9 @@ namespace {
         return (to - from) * fraction + from;
     }
 
-    template <class Traits> float valueOfParent(PositiveHalo<Traits> const& halo, IJK child, IJK voxel, int order)
+    template <class Traits> using PaddedData = ConstTileData<float, Traits::kSide + 1, 0>;
+
+    template <class Traits> float valueOfParent(PaddedData<Traits> const& halo, IJK child, IJK voxel, int order)
     {
         PlaceInParent const x = placeInParent<Traits>(child.i, voxel.i);
         PlaceInParent const y = placeInParent<Traits>(child.j, voxel.j);
@@ -70,25 +72,48 @@ namespace {
     }
 
     template <class Traits>
-    ConstTileData<float, Traits::kSide, 0> neighbourData(typename Container<Traits>::TileType const& tile,
-        IJK direction, Channel<Traits, float> const& channel, typename Container<Traits>::ConstTileAccessor& accessor)
+    typename Container<Traits>::TileType const& tileAcross(typename Container<Traits>::TileType const& tile,
+        IJK direction, typename Container<Traits>::ConstTileAccessor& accessor)
     {
+        static constexpr typename Container<Traits>::TileType kNone{};
         std::int64_t const width = Traits::tileWidth(tile.depth);
         std::int64_t const i = tile.i + direction.i * width, j = tile.j + direction.j * width,
                            k = tile.k + direction.k * width;
         if (std::max({i, j, k}) > INT32_MAX)
-            return {};
+            return kNone;
         // A tile may begin below what 32 bits hold; what they hold of it is inside all the same.
         auto const inRange = [](std::int64_t index) {
             return static_cast<int>(std::max<std::int64_t>(index, INT32_MIN));
         };
-        auto const& neighbour = accessor.tileImpl(inRange(i), inRange(j), inRange(k), tile.depth);
-        // A coarser one's values come by way of the parent.
-        if (neighbour.depth != tile.depth)
-            return {};
-        return channel.tileData(neighbour.treeIndex());
+        return accessor.tileImpl(inRange(i), inRange(j), inRange(k), tile.depth);
     }
 
+}
+
+template <class Traits, int channelSide> void Internal::fillUpperLayer(typename Container<Traits>::TileType const& tile,
+    float const* parentHalo, Channel<Traits, float> const& channel, int order,
+    typename Container<Traits>::ConstTileAccessor& accessor, float* out)
+{
+    constexpr int kSide = Traits::kSide;
+    PaddedData<Traits> const parent(parentHalo), own(out);
+    IJK const child = tile.childIJK();
+    for (int across = 1; across < 8; ++across) {
+        IJK const direction{across & 1, across >> 1 & 1, across >> 2 & 1};
+        auto const& found = tileAcross<Traits>(tile, direction, accessor);
+        auto const data = channel.template tileData<channelSide>(found.treeIndex());
+        bool const isNeighbour = data && found.depth == tile.depth;
+        bool const isInCoarser = data && found.depth < tile.depth && parent;
+        forEachVoxel(regionAcross<Traits>(direction), [&](IJK voxel) {
+            float& value = out[voxel.i + (voxel.j + voxel.k * (kSide + 1)) * (kSide + 1)];
+            if (isNeighbour)
+                value =
+                    data(voxel.i - direction.i * kSide, voxel.j - direction.j * kSide, voxel.k - direction.k * kSide);
+            else if (isInCoarser)
+                value = valueOfParent<Traits>(parent, child, voxel, order);
+            else
+                value = own(std::min(voxel.i, kSide - 1), std::min(voxel.j, kSide - 1), std::min(voxel.k, kSide - 1));
+        });
+    }
 }
 
 template <class Traits> void setHaloTile(typename Container<Traits>::TileType const& tile,
@@ -96,7 +121,6 @@ template <class Traits> void setHaloTile(typename Container<Traits>::TileType co
     PositiveHalo<Traits> const& parentHalo, int order, typename Container<Traits>::ConstTileAccessor& accessor,
     PositiveHalo<Traits>& out)
 {
-    constexpr int kSide = Traits::kSide;
     auto const own = channel.tileData(tile.treeIndex());
     if (!own) {
         out.clear();
@@ -104,22 +128,8 @@ template <class Traits> void setHaloTile(typename Container<Traits>::TileType co
     }
     out.reset(0);
     copyInterior<Traits>(own, out);
-    bool const hasParent = parentTile && parentHalo;
-    IJK const child = tile.childIJK();
-    for (int across = 1; across < 8; ++across) {
-        IJK const direction{across & 1, across >> 1 & 1, across >> 2 & 1};
-        auto const neighbour = neighbourData<Traits>(tile, direction, channel, accessor);
-        forEachVoxel(regionAcross<Traits>(direction), [&](IJK voxel) {
-            float& value = out(voxel.i, voxel.j, voxel.k);
-            if (neighbour)
-                value = neighbour(
-                    voxel.i - direction.i * kSide, voxel.j - direction.j * kSide, voxel.k - direction.k * kSide);
-            else if (hasParent)
-                value = valueOfParent<Traits>(parentHalo, child, voxel, order);
-            else
-                value = own(std::min(voxel.i, kSide - 1), std::min(voxel.j, kSide - 1), std::min(voxel.k, kSide - 1));
-        });
-    }
+    float const* const parentValues = parentTile && parentHalo ? parentHalo.values() : nullptr;
+    Internal::fillUpperLayer<Traits, Traits::kSide>(tile, parentValues, channel, order, accessor, &out(0));
 }
 
 template void setHaloTile<Traits2>(Container<Traits2>::TileType const&, Container<Traits2>::TileType const*,
@@ -128,5 +138,11 @@ template void setHaloTile<Traits2>(Container<Traits2>::TileType const&, Containe
 template void setHaloTile<Traits5>(Container<Traits5>::TileType const&, Container<Traits5>::TileType const*,
     Channel<Traits5, float> const&, PositiveHalo<Traits5> const&, int, Container<Traits5>::ConstTileAccessor&,
     PositiveHalo<Traits5>&);
+
+// For a padded channel.
+template void Internal::fillUpperLayer<Traits2, Traits2::kSide + 1>(Container<Traits2>::TileType const&, float const*,
+    Channel<Traits2, float> const&, int, Container<Traits2>::ConstTileAccessor&, float*);
+template void Internal::fillUpperLayer<Traits5, Traits5::kSide + 1>(Container<Traits5>::TileType const&, float const*,
+    Channel<Traits5, float> const&, int, Container<Traits5>::ConstTileAccessor&, float*);
 
 }

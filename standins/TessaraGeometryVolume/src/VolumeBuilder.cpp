@@ -1,60 +1,67 @@
 #include <TessaraGeometryVolume/VolumeBuilder.h>
 
-#include <TessaraGeometryVolume/HaloTile.h>
+#include "boxParts.h"
+#include "upperLayer.h"
 
-#include <algorithm>
+#include <bit>
 #include <stdexcept>
 #include <string>
+#include <unordered_map>
+#include <utility>
 
 namespace TSR::TileTree3D {
 
 using Internal::floorDivide;
+using Internal::Index;
+using Internal::ValuedRange;
+using Internal::VoxelRange;
 
 namespace {
-
-    struct Index {
-        std::int64_t i, j, k;
-    };
-
-    /// Counted in voxels of one depth; `end` is outside.
-    struct VoxelRange {
-        Index first, end;
-
-        bool isEmpty() const { return first.i >= end.i || first.j >= end.j || first.k >= end.k; }
-        VoxelRange overlapWith(VoxelRange const& other) const
-        {
-            return {
-                {std::max(first.i, other.first.i), std::max(first.j, other.first.j), std::max(first.k, other.first.k)},
-                {std::min(end.i, other.end.i), std::min(end.j, other.end.j), std::min(end.k, other.end.k)}};
-        }
-        bool holds(VoxelRange const& other) const
-        {
-            return first.i <= other.first.i && first.j <= other.first.j && first.k <= other.first.k
-                && other.end.i <= end.i && other.end.j <= end.j && other.end.k <= end.k;
-        }
-    };
 
     int linearIndex(int side, int i, int j, int k)
     {
         return i + (j + k * side) * side;
     }
 
+    Index sum(Index const& a, Index const& b)
+    {
+        return {a.i + b.i, a.j + b.j, a.k + b.k};
+    }
+
+    /// The tile and the seven above it, as steps.
+    template <class Visit> bool anyUpwards(Visit const& visit)
+    {
+        for (int across = 0; across < 8; ++across)
+            if (visit(Index{across & 1, across >> 1 & 1, across >> 2 & 1}))
+                return true;
+        return false;
+    }
+
     template <class Traits> class Builder {
     public:
         explicit Builder(VolumeSource const& source)
             : source_(source)
-            , volume_{{}, Channel<Traits, float>(), VoxelTopology(source.offsetType), source.background}
+            , side_(Traits::kSide + (source.isPadded ? 1 : 0))
+            , volume_{{}, Channel<Traits, float>(side_), VoxelTopology(source.offsetType), source.background}
         {
         }
 
         Volume<Traits> build()
         {
             check();
-            for (ConstantBox const& box : source_.boxes)
-                addBox(box);
-            addListsAndBlock();
+            addLists([&](int depth) { return depth < source_.depth; });
+            insertTiles();
+            prepareBoxes();
+            forEachRoot([&](Index const& root, Boxes boxes) { fillListedTiles(root, 0, std::move(boxes)); });
+            addLists([&](int depth) { return depth == source_.depth; });
+            addCubes();
+            addBlock();
+            forEachRoot([&](Index const& root, Boxes boxes) { addBoxes(root, 0, std::move(boxes)); });
+            addLists([&](int depth) { return depth > source_.depth; });
             volume_.container.completeParents();
             fillCoarserTiles();
+            if (source_.isPadded)
+                fillUpperLayers();
             return std::move(volume_);
         }
 
@@ -62,6 +69,7 @@ namespace {
         static constexpr int kSide = Traits::kSide;
         static constexpr int kChildren = Traits::kChildrenPerAxis;
         using Tile = typename Container<Traits>::TileType;
+        using Boxes = std::vector<ValuedRange>;
 
         static void requireDepth(int depth)
         {
@@ -80,57 +88,189 @@ namespace {
                 throw std::invalid_argument("the offset type has a bit beyond the three axes");
         }
 
-        /// The tile that is `number` tiles away from the origin along each axis, with all its voxels.
-        float* valuesOfTile(Index number, int depth)
+        /// The lower corner of the tile that is `number` tiles away from the origin along each axis.
+        static Index originOf(Index const& number, int depth)
         {
             std::int64_t const width = Traits::tileWidth(depth);
             Index const origin{number.i * width, number.j * width, number.k * width};
             for (std::int64_t const index : {origin.i, origin.j, origin.k})
                 if (index + width <= INT32_MIN || index > INT32_MAX)
                     throw std::invalid_argument("a voxel lies beyond 32-bit indices");
+            return origin;
+        }
+
+        static TreeIndex treeIndex(std::uint32_t tile, int depth) { return {tile, static_cast<std::uint32_t>(depth)}; }
+
+        TreeIndex insertTile(Index const& number, int depth)
+        {
+            Index const origin = originOf(number, depth);
             bool isNew = false;
-            std::uint32_t const tile = volume_.container.findOrInsert(origin.i, origin.j, origin.k, depth, isNew);
-            std::vector<float>& values = volume_.channel.values(depth);
+            return treeIndex(volume_.container.findOrInsert(origin.i, origin.j, origin.k, depth, isNew), depth);
+        }
+
+        bool hasValues(TreeIndex tile) const { return valuesAt(tile) != nullptr; }
+        float const* valuesAt(TreeIndex tile) const
+        {
+            return source_.isPadded ? volume_.channel.template tileData<kSide + 1>(tile).values()
+                                    : volume_.channel.tileData(tile).values();
+        }
+
+        /// The values of a given tile, which begin as what a coarser one says.
+        float* valuesOfTile(Index const& number, int depth)
+        {
+            TreeIndex const tile = insertTile(number, depth);
+            bool const isNew = !hasValues(tile);
+            float* const values = volume_.channel.values(tile);
             if (isNew) {
-                volume_.container.setTerminal(tile, depth);
+                volume_.container.setTerminal(static_cast<std::uint32_t>(tile.index), depth);
+                takeFromCoarser(originOf(number, depth), depth, values);
                 coarsestTerminal_ = std::min(coarsestTerminal_, depth);
-                values.insert(values.end(), Traits::kVoxelCount, volume_.background);
-                if (coarsestTerminal_ < depth)
-                    takeFromCoarser(origin, depth, values.data() + values.size() - Traits::kVoxelCount);
             }
-            return values.data() + std::size_t{tile} * Traits::kVoxelCount;
+            return values;
+        }
+
+        template <class Rule> static void forEachVoxelOfTile(Rule const& rule)
+        {
+            for (int k = 0; k < kSide; ++k)
+                for (int j = 0; j < kSide; ++j)
+                    for (int i = 0; i < kSide; ++i)
+                        rule(i, j, k);
         }
 
         /// What a coarser tile says of the voxels of a new one that it contains: each takes the coarse voxel it is in.
-        void takeFromCoarser(Index origin, int depth, float* values) const
+        void takeFromCoarser(Index const& origin, int depth, float* values) const
         {
             for (int coarser = depth - 1; coarser >= coarsestTerminal_; --coarser) {
                 Tile const& tile = volume_.container.find(origin.i, origin.j, origin.k, coarser);
-                if (!tile.isTerminal)
+                if (!tile.isTerminal || tile.division >= 0)
                     continue;
-                auto const coarse = volume_.channel.tileData(tile.treeIndex());
+                float const* const coarse = valuesAt(tile.treeIndex());
                 // In voxels of the new tile's depth.
                 std::int64_t const width = Traits::tileWidth(depth);
                 std::int64_t const ratio = Traits::tileWidth(coarser) / width;
                 auto const coarseVoxel = [=](std::int64_t tileOrigin, std::int64_t from, int voxel) {
                     return static_cast<int>(((tileOrigin - from) / width * kSide + voxel) / ratio);
                 };
-                for (int k = 0; k < kSide; ++k)
-                    for (int j = 0; j < kSide; ++j)
-                        for (int i = 0; i < kSide; ++i)
-                            values[linearIndex(kSide, i, j, k)] = coarse(coarseVoxel(origin.i, tile.i, i),
-                                coarseVoxel(origin.j, tile.j, j), coarseVoxel(origin.k, tile.k, k));
+                forEachVoxelOfTile([&](int i, int j, int k) {
+                    values[linearIndex(side_, i, j, k)] = coarse[linearIndex(side_, coarseVoxel(origin.i, tile.i, i),
+                        coarseVoxel(origin.j, tile.j, j), coarseVoxel(origin.k, tile.k, k))];
+                });
                 return;
+            }
+            forEachVoxelOfTile([&](int i, int j, int k) { values[linearIndex(side_, i, j, k)] = source_.background; });
+        }
+
+        // ---- Listed voxels
+
+        /// Neighbors in a list are mostly neighbors in space.
+        struct TileOfVoxel {
+            Index number{};
+            float* values = nullptr;
+        };
+
+        float& valueOfVoxel(std::int64_t i, std::int64_t j, std::int64_t k, int depth, TileOfVoxel& current)
+        {
+            Index const tile{floorDivide(i, kSide), floorDivide(j, kSide), floorDivide(k, kSide)};
+            if (!current.values || tile.i != current.number.i || tile.j != current.number.j
+                || tile.k != current.number.k)
+                current = {tile, valuesOfTile(tile, depth)};
+            return current.values[linearIndex(side_, static_cast<int>(i - tile.i * kSide),
+                static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide))];
+        }
+
+        /// From coarse to fine.
+        template <class IsTaken> void addLists(IsTaken const& isTaken)
+        {
+            std::vector<VoxelList> lists(source_.lists.begin(), source_.lists.end());
+            std::erase_if(lists, [&](VoxelList const& list) { return !isTaken(list.depth); });
+            std::stable_sort(
+                lists.begin(), lists.end(), [](VoxelList const& a, VoxelList const& b) { return a.depth < b.depth; });
+            for (VoxelList const& list : lists) {
+                TileOfVoxel current;
+                for (Voxel const& voxel : list.voxels)
+                    valueOfVoxel(voxel.i, voxel.j, voxel.k, list.depth, current) = voxel.value;
             }
         }
 
-        void addBox(ConstantBox const& box)
+        /// Calls `visit(i, j, k, value)` for the voxels of all cubes.
+        template <class Visit> void forEachVoxelOfCubes(Visit const& visit) const
         {
-            VoxelRange const range{{box.first.i, box.first.j, box.first.k}, {box.end.i, box.end.j, box.end.k}};
-            if (range.isEmpty())
-                return;
-            addBoxWithin(range, box.value, 0, {range, voxelsOfTile(0)});
+            for (VoxelCube const& cube : source_.cubes) {
+                float const* value = source_.cubeValues.data() + cube.firstValue;
+                for (int k = 0; k < 8; ++k)
+                    for (std::uint64_t left = cube.active[static_cast<std::size_t>(k)]; left; left &= left - 1) {
+                        int const bit = std::countr_zero(left);
+                        visit(std::int64_t{cube.first.i} + bit % 8, std::int64_t{cube.first.j} + bit / 8,
+                            std::int64_t{cube.first.k} + k, *value++);
+                    }
+            }
         }
+
+        void addCubes()
+        {
+            TileOfVoxel current;
+            forEachVoxelOfCubes([&](std::int64_t i, std::int64_t j, std::int64_t k, float value) {
+                valueOfVoxel(i, j, k, source_.depth, current) = value;
+            });
+        }
+
+        /// All tiles with voxels of lists, cubes and the block, and those above: boxes need to know where they are.
+        void insertTiles()
+        {
+            if (source_.boxes.empty())
+                return;
+            auto const inserter = [&](int depth) {
+                return [this, depth, current = Index{INT64_MAX, 0, 0}](
+                           std::int64_t i, std::int64_t j, std::int64_t k) mutable {
+                    Index const tile{floorDivide(i, kSide), floorDivide(j, kSide), floorDivide(k, kSide)};
+                    if (tile.i != current.i || tile.j != current.j || tile.k != current.k)
+                        insertTile(tile, depth);
+                    current = tile;
+                };
+            };
+            for (VoxelList const& list : source_.lists) {
+                hasCoarserData_ |= list.depth < source_.depth && !list.voxels.empty();
+                auto insert = inserter(list.depth);
+                for (Voxel const& voxel : list.voxels)
+                    insert(voxel.i, voxel.j, voxel.k);
+            }
+            auto insert = inserter(source_.depth);
+            forEachVoxelOfCubes([&](std::int64_t i, std::int64_t j, std::int64_t k, float) { insert(i, j, k); });
+            forEachTileOfBlock([&](Index const& tile, VoxelRange const&) { insertTile(tile, source_.depth); });
+            hasCoarserData_ |= source_.coarsestDepth.value_or(source_.depth) < source_.depth;
+            volume_.container.completeParents();
+        }
+
+        /// Calls `visit(number, voxels)` for tiles with voxels of the block.
+        template <class Visit> void forEachTileOfBlock(Visit const& visit) const
+        {
+            DenseBlock const& block = source_.block;
+            VoxelRange const range{{block.first.i, block.first.j, block.first.k},
+                {std::int64_t{block.first.i} + block.size.i, std::int64_t{block.first.j} + block.size.j,
+                    std::int64_t{block.first.k} + block.size.k}};
+            if (!range.isEmpty())
+                forEachTileIn(
+                    range, kSide, [&](Index const& tile) { visit(tile, range.overlapWith(rangeOfTile(tile, kSide))); });
+        }
+
+        void addBlock()
+        {
+            DenseBlock const& block = source_.block;
+            forEachTileOfBlock([&](Index const& tile, VoxelRange const& inside) {
+                float* const values = valuesOfTile(tile, source_.depth);
+                for (std::int64_t k = inside.first.k; k < inside.end.k; ++k)
+                    for (std::int64_t j = inside.first.j; j < inside.end.j; ++j) {
+                        std::int64_t const rowBegin =
+                            ((k - block.first.k) * block.size.j + (j - block.first.j)) * block.size.i - block.first.i;
+                        std::copy(block.values + rowBegin + inside.first.i, block.values + rowBegin + inside.end.i,
+                            values
+                                + linearIndex(side_, static_cast<int>(inside.first.i - tile.i * kSide),
+                                    static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide)));
+                    }
+            });
+        }
+
+        // ---- Boxes
 
         /// How many voxels of the source's depth a tile has along an axis.
         std::int64_t voxelsOfTile(int depth) const
@@ -138,131 +278,282 @@ namespace {
             return Traits::tileWidth(depth) / Traits::tileWidth(source_.depth) * kSide;
         }
 
-        /// The tiles of one depth that overlap a range, by their numbers.
-        struct TileRange {
-            Index first, end;
-            TileRange(VoxelRange const& range, std::int64_t voxels)
-                : first{floorDivide(range.first.i, voxels), floorDivide(range.first.j, voxels),
-                    floorDivide(range.first.k, voxels)}
-                , end{floorDivide(range.end.i - 1, voxels) + 1, floorDivide(range.end.j - 1, voxels) + 1,
-                      floorDivide(range.end.k - 1, voxels) + 1}
-            {
-            }
-        };
-
-        /// A coarse tile has one value and its neighbours others; between them samples blend. That must begin only
-        /// behind the box, so a tile is taken whole where the voxels that its samples read lie in the box too.
-        VoxelRange readAround(VoxelRange const& tile, int depth) const
+        static VoxelRange rangeOfTile(Index const& number, std::int64_t voxels)
         {
-            std::int64_t const coarseVoxel = voxelsOfTile(depth) / kSide;
-            auto const isAtLowerSide = [&](int axis) { return source_.offsetType >> axis & 1; };
-            auto const below = [&](int axis) { return isAtLowerSide(axis) ? 0 : coarseVoxel; };
-            auto const above = [&](int axis) { return isAtLowerSide(axis) ? 1 : coarseVoxel; };
-            return {{tile.first.i - below(0), tile.first.j - below(1), tile.first.k - below(2)},
-                {tile.end.i + above(0), tile.end.j + above(1), tile.end.k + above(2)}};
+            return {{number.i * voxels, number.j * voxels, number.k * voxels},
+                {(number.i + 1) * voxels, (number.j + 1) * voxels, (number.k + 1) * voxels}};
         }
 
-        void addBoxWithin(VoxelRange const& box, float value, int depth, TileRange const& tiles)
+        /// What samples in a tile can depend on: its voxels, and its upper neighbors at the source's depth.
+        static VoxelRange withUpperNeighbors(VoxelRange const& tile)
         {
-            std::int64_t const voxels = voxelsOfTile(depth);
-            for (std::int64_t k = tiles.first.k; k < tiles.end.k; ++k)
-                for (std::int64_t j = tiles.first.j; j < tiles.end.j; ++j)
-                    for (std::int64_t i = tiles.first.i; i < tiles.end.i; ++i) {
-                        VoxelRange const tile{{i * voxels, j * voxels, k * voxels},
-                            {(i + 1) * voxels, (j + 1) * voxels, (k + 1) * voxels}};
-                        VoxelRange const inside = box.overlapWith(tile);
-                        if (depth == source_.depth)
-                            fillVoxels({i, j, k}, inside, value);
-                        else if (box.holds(readAround(tile, depth)))
-                            std::fill_n(valuesOfTile({i, j, k}, depth), Traits::kVoxelCount, value);
-                        else
-                            addBoxWithin(box, value, depth + 1, {inside, voxelsOfTile(depth + 1)});
+            return {tile.first, {tile.end.i + kSide, tile.end.j + kSide, tile.end.k + kSide}};
+        }
+
+        template <class Visit>
+        static void forEachTileIn(VoxelRange const& range, std::int64_t voxels, Visit const& visit)
+        {
+            for (std::int64_t k = floorDivide(range.first.k, voxels); k * voxels < range.end.k; ++k)
+                for (std::int64_t j = floorDivide(range.first.j, voxels); j * voxels < range.end.j; ++j)
+                    for (std::int64_t i = floorDivide(range.first.i, voxels); i * voxels < range.end.i; ++i)
+                        visit(Index{i, j, k});
+        }
+
+        void prepareBoxes()
+        {
+            for (ConstantBox const& box : source_.boxes) {
+                VoxelRange const range{{box.first.i, box.first.j, box.first.k}, {box.end.i, box.end.j, box.end.k}};
+                if (range.isEmpty())
+                    continue;
+                for (Index const& corner : {range.first, Index{range.end.i - 1, range.end.j - 1, range.end.k - 1}})
+                    originOf({floorDivide(corner.i, kSide), floorDivide(corner.j, kSide), floorDivide(corner.k, kSide)},
+                        source_.depth);
+                boxes_.push_back({range, box.value});
+            }
+        }
+
+        /// Calls `visit(number, boxes)` for the tiles of depth 0.
+        template <class Visit> void forEachRoot(Visit const& visit) const
+        {
+            if (boxes_.empty())
+                return;
+            VoxelRange all = boxes_.front().range;
+            for (ValuedRange const& box : boxes_)
+                all = {{std::min(all.first.i, box.range.first.i), std::min(all.first.j, box.range.first.j),
+                           std::min(all.first.k, box.range.first.k)},
+                    {std::max(all.end.i, box.range.end.i), std::max(all.end.j, box.range.end.j),
+                        std::max(all.end.k, box.range.end.k)}};
+            forEachTileIn(all, voxelsOfTile(0), [&](Index const& root) {
+                VoxelRange const read = withUpperNeighbors(rangeOfTile(root, voxelsOfTile(0)));
+                Boxes boxes;
+                std::copy_if(boxes_.begin(), boxes_.end(), std::back_inserter(boxes),
+                    [&](ValuedRange const& box) { return box.range.overlaps(read); });
+                visit(root, std::move(boxes));
+            });
+        }
+
+        /// Calls `visit(number, boxes)` for the children of a tile, with the boxes that samples in them depend on.
+        template <class Visit> void forEachChild(Index const& number, int depth, Boxes boxes, Visit const& visit) const
+        {
+            std::int64_t const voxels = voxelsOfTile(depth + 1);
+            VoxelRange const children{{number.i * kChildren, number.j * kChildren, number.k * kChildren},
+                {(number.i + 1) * kChildren, (number.j + 1) * kChildren, (number.k + 1) * kChildren}};
+            auto const place = [&](Index const& child) {
+                return static_cast<std::size_t>(linearIndex(kChildren, static_cast<int>(child.i - children.first.i),
+                    static_cast<int>(child.j - children.first.j), static_cast<int>(child.k - children.first.k)));
+            };
+            std::array<Boxes, Traits::kChildCount> boxesOfChild;
+            for (ValuedRange const& box : boxes) {
+                Index const& first = box.range.first;
+                VoxelRange const dependent{{first.i - kSide, first.j - kSide, first.k - kSide}, box.range.end};
+                VoxelRange const inside = dependent.overlapWith(rangeOfTile(number, voxelsOfTile(depth)));
+                if (!inside.isEmpty())
+                    forEachTileIn(
+                        inside, voxels, [&](Index const& child) { boxesOfChild[place(child)].push_back(box); });
+            }
+            Boxes().swap(boxes); // there may be many, and levels
+            forEachTileIn(children, 1, [&](Index const& child) {
+                if (!boxesOfChild[place(child)].empty())
+                    visit(child, std::move(boxesOfChild[place(child)]));
+            });
+        }
+
+        bool isInserted(Index const& number, int depth) const
+        {
+            std::int64_t const width = Traits::tileWidth(depth);
+            Tile const& tile = volume_.container.find(number.i * width, number.j * width, number.k * width, depth);
+            return tile.valid && tile.division < 0;
+        }
+
+        /// What boxes say of tiles with listed voxels, beneath these.
+        void fillListedTiles(Index const& number, int depth, Boxes boxes)
+        {
+            if (!isInserted(number, depth))
+                return;
+            if (depth == source_.depth)
+                fillVoxels(number, boxes);
+            else
+                forEachChild(number, depth, std::move(boxes),
+                    [&](Index const& child, Boxes inside) { fillListedTiles(child, depth + 1, std::move(inside)); });
+        }
+
+        void fillVoxels(Index const& number, Boxes const& boxes)
+        {
+            VoxelRange const tile = rangeOfTile(number, kSide);
+            for (ValuedRange const& box : boxes)
+                if (VoxelRange const inside = box.range.overlapWith(tile); !inside.isEmpty())
+                    fillVoxels(number, inside, box.value, valuesOfTile(number, source_.depth));
+        }
+
+        void fillVoxels(Index const& number, VoxelRange const& inside, float value, float* values) const
+        {
+            for (std::int64_t k = inside.first.k; k < inside.end.k; ++k)
+                for (std::int64_t j = inside.first.j; j < inside.end.j; ++j)
+                    std::fill_n(values
+                            + linearIndex(side_, static_cast<int>(inside.first.i - number.i * kSide),
+                                static_cast<int>(j - number.j * kSide), static_cast<int>(k - number.k * kSide)),
+                        inside.end.i - inside.first.i, value);
+        }
+
+        void addBoxes(Index const& number, int depth, Boxes boxes)
+        {
+            VoxelRange const tile = rangeOfTile(number, voxelsOfTile(depth));
+            if (std::none_of(
+                    boxes.begin(), boxes.end(), [&](ValuedRange const& box) { return box.range.overlaps(tile); }))
+                return;
+            if (depth == source_.depth)
+                addTileOfBoxes(number, boxes);
+            else if (hasCoarserData_ || isAmongListed(number, depth) || !divide(number, depth, boxes))
+                forEachChild(number, depth, std::move(boxes),
+                    [&](Index const& child, Boxes inside) { addBoxes(child, depth + 1, std::move(inside)); });
+        }
+
+        /// Whether samples in the tile may depend on listed voxels.
+        bool isAmongListed(Index const& number, int depth) const
+        {
+            return anyUpwards([&](Index const& step) { return isInserted(sum(number, step), depth); });
+        }
+
+        void addTileOfBoxes(Index const& number, Boxes const& boxes)
+        {
+            if (isInserted(number, source_.depth)) // and filled
+                return;
+            auto const value = hasCoarserData_ ? std::nullopt : commonValue(boxes, rangeOfTile(number, kSide));
+            if (!value || (source_.isPadded && !continuesAbove(number, boxes, *value))) {
+                fillVoxels(number, boxes);
+                return;
+            }
+            TreeIndex const tile = insertTile(number, source_.depth);
+            volume_.container.setTerminal(static_cast<std::uint32_t>(tile.index), source_.depth);
+            coarsestTerminal_ = std::min(coarsestTerminal_, source_.depth);
+            shareConstant(tile, *value);
+        }
+
+        /// Whether the upper layer of a tile of one value has that value.
+        bool continuesAbove(Index const& number, Boxes const& boxes, float value) const
+        {
+            return !anyUpwards([&](Index const& step) {
+                Index const above = sum(number, step);
+                VoxelRange const tile = rangeOfTile(above, kSide);
+                auto const thickness = [](std::int64_t isAbove) { return isAbove ? 1 : kSide; };
+                VoxelRange const layer{tile.first,
+                    {tile.first.i + thickness(step.i), tile.first.j + thickness(step.j),
+                        tile.first.k + thickness(step.k)}};
+                if (!isInserted(above, source_.depth))
+                    return std::any_of(boxes.begin(), boxes.end(), [&](ValuedRange const& box) {
+                        return box.range.overlaps(tile);
+                    }) && commonBits(commonValue(boxes, layer)) != commonBits(value);
+                std::int64_t const width = Traits::tileWidth(source_.depth);
+                float const* const values =
+                    valuesAt(volume_.container.find(above.i * width, above.j * width, above.k * width, source_.depth)
+                                 .treeIndex());
+                bool isOther = !values;
+                if (values)
+                    forEachTileIn(layer, 1, [&](Index const& voxel) {
+                        isOther |=
+                            commonBits(values[linearIndex(side_, static_cast<int>(voxel.i - tile.first.i),
+                                static_cast<int>(voxel.j - tile.first.j), static_cast<int>(voxel.k - tile.first.k))])
+                            != commonBits(value);
+                    });
+                return isOther;
+            });
+        }
+
+        static std::optional<std::uint32_t> commonBits(std::optional<float> value)
+        {
+            return value ? std::optional(std::bit_cast<std::uint32_t>(*value)) : std::nullopt;
+        }
+
+        /// Lets a tile of the source's depth have one value everywhere.
+        void shareConstant(TreeIndex tile, float value)
+        {
+            auto const [known, isNew] = constants_.try_emplace(std::bit_cast<std::uint32_t>(value), tile);
+            if (isNew)
+                std::fill_n(volume_.channel.values(tile), side_ * side_ * side_, value);
+            else
+                volume_.channel.share(tile, known->second);
+        }
+
+        /// Makes repeated tiles of a tile, if that saves some.
+        bool divide(Index const& number, int depth, Boxes const& boxes)
+        {
+            VoxelRange const tile = rangeOfTile(number, voxelsOfTile(depth));
+            std::int32_t division;
+            if (auto const value = commonValue(boxes, withUpperNeighbors(tile))) {
+                auto const [known, isNew] = constantDivisions_.try_emplace(std::bit_cast<std::uint32_t>(*value), 0);
+                if (isNew) {
+                    std::uint32_t const repeated = addRepeated(tile.first);
+                    shareConstant(treeIndex(repeated, source_.depth), *value);
+                    known->second = volume_.container.addDivision({{{{0}, {0}, {0}}}, {repeated}});
+                }
+                division = known->second;
+            } else {
+                constexpr std::size_t kMostBoxes = 64, kMostParts = 512, kWorthwhile = 4;
+                if (boxes.size() > kMostBoxes)
+                    return false;
+                Division parts{Internal::partsOf(tile, kSide, boxes), {}};
+                std::size_t const partCount = parts.begins[0].size() * parts.begins[1].size() * parts.begins[2].size();
+                double const along = static_cast<double>(voxelsOfTile(depth) / kSide);
+                if (partCount > kMostParts || static_cast<double>(kWorthwhile * partCount) > along * along * along)
+                    return false;
+                fillParts(tile.first, boxes, parts);
+                division = volume_.container.addDivision(std::move(parts));
+            }
+            TreeIndex const divided = insertTile(number, depth);
+            volume_.container.divide(static_cast<std::uint32_t>(divided.index), depth, division);
+            return true;
+        }
+
+        /// \param first  a tile's lower corner, in voxels
+        std::uint32_t addRepeated(Index const& first)
+        {
+            std::int64_t const width = Traits::tileWidth(source_.depth);
+            return volume_.container.addRepeated(
+                first.i / kSide * width, first.j / kSide * width, first.k / kSide * width, source_.depth);
+        }
+
+        void fillParts(Index const& first, Boxes const& boxes, Division& parts)
+        {
+            for (std::uint32_t const k : parts.begins[2])
+                for (std::uint32_t const j : parts.begins[1])
+                    for (std::uint32_t const i : parts.begins[0]) {
+                        Index const voxel{first.i + std::int64_t{i} * kSide, first.j + std::int64_t{j} * kSide,
+                            first.k + std::int64_t{k} * kSide};
+                        Index const number{voxel.i / kSide, voxel.j / kSide, voxel.k / kSide};
+                        parts.tiles.push_back(fillPart(number, boxes));
                     }
         }
 
-        void fillVoxels(Index tile, VoxelRange const& inside, float value)
+        std::uint32_t fillPart(Index const& number, Boxes const& boxes)
         {
-            float* const values = valuesOfTile(tile, source_.depth);
-            for (std::int64_t k = inside.first.k; k < inside.end.k; ++k)
-                for (std::int64_t j = inside.first.j; j < inside.end.j; ++j)
-                    for (std::int64_t i = inside.first.i; i < inside.end.i; ++i)
-                        values[linearIndex(kSide, static_cast<int>(i - tile.i * kSide),
-                            static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide))] = value;
-        }
-
-        /// From coarse to fine, the block after lists of its depth.
-        void addListsAndBlock()
-        {
-            std::vector<VoxelList> lists(source_.lists.begin(), source_.lists.end());
-            std::stable_sort(
-                lists.begin(), lists.end(), [](VoxelList const& a, VoxelList const& b) { return a.depth < b.depth; });
-            auto const finer = std::find_if(
-                lists.begin(), lists.end(), [&](VoxelList const& list) { return list.depth > source_.depth; });
-            std::for_each(lists.begin(), finer, [&](VoxelList const& list) { addVoxels(list); });
-            addBlock();
-            std::for_each(finer, lists.end(), [&](VoxelList const& list) { addVoxels(list); });
-        }
-
-        void addVoxels(VoxelList const& list)
-        {
-            // Neighbours in the list are mostly neighbours in space.
-            Index current{};
+            VoxelRange const tile = rangeOfTile(number, kSide);
+            std::uint32_t repeated = Division::kNoRepeated;
             float* values = nullptr;
-            for (Voxel const& voxel : list.voxels) {
-                Index const tile{floorDivide(voxel.i, kSide), floorDivide(voxel.j, kSide), floorDivide(voxel.k, kSide)};
-                if (!values || tile.i != current.i || tile.j != current.j || tile.k != current.k) {
-                    values = valuesOfTile(tile, list.depth);
-                    current = tile;
+            for (ValuedRange const& box : boxes) {
+                VoxelRange const inside = box.range.overlapWith(tile);
+                if (inside.isEmpty())
+                    continue;
+                if (!values) {
+                    repeated = addRepeated(tile.first);
+                    values = volume_.channel.values(treeIndex(repeated, source_.depth));
+                    std::fill_n(values, side_ * side_ * side_, source_.background);
                 }
-                values[linearIndex(kSide, static_cast<int>(voxel.i - tile.i * kSide),
-                    static_cast<int>(voxel.j - tile.j * kSide), static_cast<int>(voxel.k - tile.k * kSide))] =
-                    voxel.value;
+                fillVoxels(number, inside, box.value, values);
             }
+            return repeated;
         }
 
-        void addBlock()
-        {
-            DenseBlock const& block = source_.block;
-            VoxelRange const range{{block.first.i, block.first.j, block.first.k},
-                {std::int64_t{block.first.i} + block.size.i, std::int64_t{block.first.j} + block.size.j,
-                    std::int64_t{block.first.k} + block.size.k}};
-            if (range.isEmpty())
-                return;
-            TileRange const tiles(range, kSide);
-            for (std::int64_t k = tiles.first.k; k < tiles.end.k; ++k)
-                for (std::int64_t j = tiles.first.j; j < tiles.end.j; ++j)
-                    for (std::int64_t i = tiles.first.i; i < tiles.end.i; ++i)
-                        copyFromBlock(range, {i, j, k});
-        }
-
-        void copyFromBlock(VoxelRange const& range, Index tile)
-        {
-            Index const first{tile.i * kSide, tile.j * kSide, tile.k * kSide};
-            VoxelRange const inside = range.overlapWith({first, {first.i + kSide, first.j + kSide, first.k + kSide}});
-            float* const values = valuesOfTile(tile, source_.depth);
-            for (std::int64_t k = inside.first.k; k < inside.end.k; ++k)
-                for (std::int64_t j = inside.first.j; j < inside.end.j; ++j) {
-                    std::int64_t const rowBegin =
-                        ((k - range.first.k) * source_.block.size.j + (j - range.first.j)) * source_.block.size.i;
-                    std::copy_n(source_.block.values + rowBegin + (inside.first.i - range.first.i),
-                        inside.end.i - inside.first.i,
-                        values
-                            + linearIndex(kSide, static_cast<int>(inside.first.i - first.i),
-                                static_cast<int>(j - first.j), static_cast<int>(k - first.k)));
-                }
-        }
+        // ---- Tiles above
 
         void fillCoarserTiles()
         {
-            int const coarsest = std::min(coarsestTerminal_, source_.coarsestDepth.value_or(Traits::kDepthCount));
+            int const coarsest =
+                std::min(volume_.channel.coarsestDepth(), source_.coarsestDepth.value_or(Traits::kDepthCount));
             for (int depth = Traits::kDeepest; depth >= coarsest; --depth) {
-                std::size_t const tiles = volume_.container.tileCount(depth);
-                std::vector<float>& values = volume_.channel.values(depth);
-                std::size_t const known = values.size() / Traits::kVoxelCount;
-                values.resize(tiles * Traits::kVoxelCount, volume_.background);
-                for (std::size_t number = known; number < tiles; ++number) {
+                for (std::size_t number = 0; number < volume_.container.tileCount(depth); ++number) {
                     Tile const& tile = volume_.container.tile(number, depth);
-                    takeFromCoarser({tile.i, tile.j, tile.k}, depth, values.data() + number * Traits::kVoxelCount);
+                    if (!hasValues(tile.treeIndex()) && tile.division < 0)
+                        takeFromCoarser({tile.i, tile.j, tile.k}, depth, volume_.channel.values(tile.treeIndex()));
                 }
                 if (depth < Traits::kDeepest)
                     for (std::size_t child = 0; child < volume_.container.tileCount(depth + 1); ++child)
@@ -275,9 +566,9 @@ namespace {
         {
             if (volume_.container.tile(tile.parentTreeIndex()).isTerminal)
                 return; // its values were given
-            auto const fine = volume_.channel.tileData(tile.treeIndex());
-            float* const coarse = volume_.channel.values(tile.depth - 1).data()
-                + static_cast<std::size_t>(tile.parent) * Traits::kVoxelCount;
+            float const* const fine = valuesAt(tile.treeIndex());
+            float* const coarse = volume_.channel.values(tile.parentTreeIndex());
+            auto const fineValue = [&](int i, int j, int k) { return fine[linearIndex(side_, i, j, k)]; };
             IJK const child = tile.childIJK();
             auto const spanAlong = [&](int axis) { return source_.offsetType >> axis & 1 ? 1 : kChildren; };
             int const spanX = spanAlong(0), spanY = spanAlong(1), spanZ = spanAlong(2);
@@ -286,20 +577,45 @@ namespace {
                 for (int y = 0; y < kCovered; ++y)
                     for (int x = 0; x < kCovered; ++x) {
                         // As differences: the mean of equal values is that value.
-                        float const first = fine(x * kChildren, y * kChildren, z * kChildren);
+                        float const first = fineValue(x * kChildren, y * kChildren, z * kChildren);
                         float sum = 0;
                         for (int k = 0; k < spanZ; ++k)
                             for (int j = 0; j < spanY; ++j)
                                 for (int i = 0; i < spanX; ++i)
-                                    sum += fine(x * kChildren + i, y * kChildren + j, z * kChildren + k) - first;
-                        coarse[linearIndex(kSide, child.i * kCovered + x, child.j * kCovered + y,
+                                    sum += fineValue(x * kChildren + i, y * kChildren + j, z * kChildren + k) - first;
+                        coarse[linearIndex(side_, child.i * kCovered + x, child.j * kCovered + y,
                             child.k * kCovered + z)] = first + sum / static_cast<float>(spanX * spanY * spanZ);
                     }
         }
 
+        // ---- Padding
+
+        /// Parents first.
+        void fillUpperLayers()
+        {
+            typename Container<Traits>::ConstTileAccessor accessor(volume_.container);
+            auto const fill = [&](Tile const& tile) {
+                if (!hasValues(tile.treeIndex()))
+                    return;
+                Internal::fillUpperLayer<Traits, kSide + 1>(tile, valuesAt(tile.parentTreeIndex()), volume_.channel, 2,
+                    accessor, volume_.channel.values(tile.treeIndex()));
+            };
+            for (int depth = volume_.channel.coarsestDepth(); depth < Traits::kDepthCount; ++depth)
+                for (std::size_t number = 0; number < volume_.container.tileCount(depth); ++number)
+                    fill(volume_.container.tile(number, depth));
+            for (std::uint32_t number = 0; number < volume_.container.repeatedCount(); ++number)
+                fill(volume_.container.tile(kFirstRepeated + number, volume_.container.repeatedDepth()));
+        }
+
         VolumeSource const& source_;
+        int side_; // of stored tiles
         Volume<Traits> volume_;
         int coarsestTerminal_ = Traits::kDepthCount;
+        bool hasCoarserData_ = false; // besides the source's depth
+        Boxes boxes_;
+        // By the bits of the value.
+        std::unordered_map<std::uint32_t, TreeIndex> constants_;
+        std::unordered_map<std::uint32_t, std::int32_t> constantDivisions_;
     };
 
 }
@@ -311,26 +627,24 @@ template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source)
 
 template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume)
 {
-    constexpr std::size_t kHaloCount = PositiveHalo<Traits>::kVoxelCount;
-    Channel<Traits, float> padded(Traits::kSide + 1);
+    constexpr int kSide = Traits::kSide, kPadded = kSide + 1;
+    Channel<Traits, float> padded(kPadded);
     typename Container<Traits>::ConstTileAccessor accessor(volume.container);
-    PositiveHalo<Traits> halo, parentHalo;
-    for (int depth = volume.channel.coarsestDepth(); depth < Traits::kDepthCount; ++depth) {
-        std::vector<float>& values = padded.values(depth);
-        values.resize(volume.container.tileCount(depth) * kHaloCount);
-        for (std::size_t number = 0; number < volume.container.tileCount(depth); ++number) {
-            auto const& tile = volume.container.tile(number, depth);
-            typename Container<Traits>::TileType const* parent = nullptr;
-            if (depth > volume.channel.coarsestDepth()) {
-                parent = &volume.container.tile(tile.parentTreeIndex());
-                auto const ofParent = padded.template tileData<Traits::kSide + 1>(parent->treeIndex());
-                parentHalo.reset(0);
-                std::copy_n(ofParent.values(), kHaloCount, &parentHalo(0));
-            }
-            setHaloTile<Traits>(tile, parent, volume.channel, parentHalo, 2, accessor, halo);
-            std::copy_n(halo.values(), kHaloCount, values.data() + number * kHaloCount);
-        }
-    }
+    auto const pad = [&](typename Container<Traits>::TileType const& tile) {
+        auto const own = volume.channel.tileData(tile.treeIndex());
+        if (!own)
+            return;
+        float* const values = padded.values(tile.treeIndex());
+        for (int row = 0; row < kSide * kSide; ++row)
+            std::copy_n(own.values() + row * kSide, kSide, values + linearIndex(kPadded, 0, row % kSide, row / kSide));
+        Internal::fillUpperLayer<Traits, kSide>(tile,
+            padded.template tileData<kPadded>(tile.parentTreeIndex()).values(), volume.channel, 2, accessor, values);
+    };
+    for (int depth = volume.channel.coarsestDepth(); depth < Traits::kDepthCount; ++depth)
+        for (std::size_t number = 0; number < volume.container.tileCount(depth); ++number)
+            pad(volume.container.tile(number, depth));
+    for (std::uint32_t number = 0; number < volume.container.repeatedCount(); ++number)
+        pad(volume.container.tile(kFirstRepeated + number, volume.container.repeatedDepth()));
     return padded;
 }
 

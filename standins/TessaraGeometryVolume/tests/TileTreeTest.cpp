@@ -118,8 +118,9 @@ TYPED_TEST(TileTree, linksTilesWithTheirParents)
 
 TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
 {
-    std::vector<ConstantBox> const boxes{
-        {{-64, -64, -64}, {64, 64, 64}, 3}, {{70, 1, 2}, {83, 9, 4}, 4}, {{90, 0, 0}, {90, 5, 5}, 9}};
+    // Two wide ones touch, and neither ends with tiles.
+    std::vector<ConstantBox> const boxes{{{-64, -64, -64}, {64, 64, 64}, 3},
+        {{64, -3001, -3001}, {4097, 3001, 3001}, 6}, {{70, 4001, 2}, {83, 4009, 4}, 4}, {{90, 0, 0}, {90, 5, 5}, 9}};
     auto const isInside = [](ConstantBox const& box, IJK at) {
         return box.first.i <= at.i && at.i < box.end.i && box.first.j <= at.j && at.j < box.end.j && box.first.k <= at.k
             && at.k < box.end.k;
@@ -137,25 +138,39 @@ TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
             expected = 5;
         ASSERT_EQ(valueAt(volume, index), expected) << at.i << ' ' << at.j << ' ' << at.k;
     }
-    // The upper sides, where samples already blend with what is behind, are the only ones that need all their tiles.
-    std::size_t tiles = 0;
-    for (int depth = 0; depth < TypeParam::kDepthCount; ++depth)
-        tiles += volume.container.tileCount(depth);
-    std::size_t const side = 128 / TypeParam::kSide + 2;
-    EXPECT_LT(tiles, 4 * side * side * TypeParam::kChildrenPerAxis);
-    EXPECT_LT(volume.channel.coarsestDepth(), TypeParam::kUnitDepth);
+    auto const bytesOf = [](Volume<TypeParam> const& made) {
+        return made.container.memoryInBytes() + made.channel.memoryInBytes();
+    };
+    EXPECT_LT(bytesOf(volume), 2'000'000);
+
+    // Many boxes that are one, and values with two sides each: more than fit one division.
+    std::vector<ConstantBox> same, others;
+    forEachVoxel(0, 16, [&](int i, int j, int k) {
+        same.push_back({{8 * i, 8 * j, 8 * k}, {8 * i + 8, 8 * j + 8, 8 * k + 8}, 5});
+        if (std::max({i, j, k}) < 4)
+            others.push_back(
+                {{128 * i, 128 * j, 128 * k}, {128 * i + 128, 128 * j + 128, 128 * k + 128}, float(i + j + k)});
+    });
+    for (auto const* const many : {&same, &others}) {
+        source.boxes = *many;
+        EXPECT_LT(bytesOf(buildVolume<TypeParam>(source)), 5'000'000);
+    }
 }
 
 TYPED_TEST(TileTree, fineTilesInsideCoarseOnesKeepTheirValues)
 {
-    for (int const levels : {1, 2}) {
+    for (int const variant : {0, 1, 2, 3}) {
+        int const levels = 1 + variant % 2;
+        bool const asBoxes = variant > 1;
         int const coarseDepth = TypeParam::kUnitDepth - levels;
         int const ratio =
             levels == 1 ? TypeParam::kChildrenPerAxis : TypeParam::kChildrenPerAxis * TypeParam::kChildrenPerAxis;
         std::vector<Voxel> const coarse{{-1, 0, 0, 8}, {-2, 0, 0, 6}}, fine{{-1, 0, 0, 5}, {1000, 0, 0, 9}};
-        VoxelList const lists[] = {{TypeParam::kUnitDepth, fine}, {coarseDepth, coarse}};
+        VoxelList const lists[] = {{coarseDepth, coarse}, {TypeParam::kUnitDepth, fine}};
+        std::vector<ConstantBox> const boxes{{{-1, 0, 0}, {0, 1, 1}, 5}, {{1000, 0, 0}, {1001, 1, 1}, 9}};
         VolumeSource source = sourceOf<TypeParam>();
-        source.lists = lists;
+        source.boxes = std::span(boxes).first(asBoxes ? 2 : 0);
+        source.lists = std::span(lists, asBoxes ? 1 : 2);
         auto const volume = buildVolume<TypeParam>(source);
         EXPECT_EQ(valueAt(volume, {-1, 0, 0}), 5);
         EXPECT_EQ(valueAt(volume, {-2, 0, 0}), 8);
@@ -211,9 +226,12 @@ TYPED_TEST(TileTree, halosContinueNeighboursThenParentsThenTheTile)
     source.block = around.block();
     isExact(buildVolume<TypeParam>(source), 0, around);
     source.block = alone.block();
-    isExact(buildVolume<TypeParam>(source), 0, [&](int i, int j, int k) {
-        return alone(std::min(i, kSide - 1), std::min(j, kSide - 1), std::min(k, kSide - 1));
-    });
+    for (int const coarserLevels : {0, 2}) { // the parent has nothing there either
+        source.coarsestDepth = TypeParam::kUnitDepth - coarserLevels;
+        isExact(buildVolume<TypeParam>(source), 0, [&](int i, int j, int k) {
+            return alone(std::min(i, kSide - 1), std::min(j, kSide - 1), std::min(k, kSide - 1));
+        });
+    }
 
     // Only x + 1 is missing at this depth; two depths up there is a tile instead.
     int const wide = static_cast<int>(TypeParam::tileWidth(TypeParam::kUnitDepth - 2));
@@ -222,10 +240,12 @@ TYPED_TEST(TileTree, halosContinueNeighboursThenParentsThenTheTile)
         if (i < kSide)
             someAround.push_back({wide - kSide + i, j, k, around(i, j, k)});
     });
-    std::vector<ConstantBox> const box{{{wide, 0, 0}, {3 * wide, 3 * wide, 3 * wide}, 77}};
+    std::vector<Voxel> coarse;
+    forEachVoxel(0, kSide, [&](int i, int j, int k) { coarse.push_back({kSide + i, j, k, 77}); });
+    VoxelList const lists[] = {{TypeParam::kUnitDepth - 2, coarse}, {TypeParam::kUnitDepth, someAround}};
     source = sourceOf<TypeParam>();
-    source.boxes = box;
-    isExact(volumeOf<TypeParam>(someAround, source), wide - kSide,
+    source.lists = lists;
+    isExact(buildVolume<TypeParam>(source), wide - kSide,
         [&](int i, int j, int k) { return i == kSide ? 77 : around(i, j, k); });
 }
 
@@ -255,9 +275,7 @@ TYPED_TEST(TileTree, takesMemoryForActiveTilesOnlyAndIsReadByManyThreads)
                     shell.push_back({3 * i, 3 * j, 3 * k, float(squared)});
     ASSERT_GT(shell.size(), 50'000);
     auto const volume = volumeOf<TypeParam>(shell, sourceOf<TypeParam>());
-    std::size_t bytes = volume.container.memoryInBytes();
-    for (int depth = 0; depth < TypeParam::kDepthCount; ++depth)
-        bytes += volume.channel.values(depth).capacity() * sizeof(float);
+    std::size_t const bytes = volume.container.memoryInBytes() + volume.channel.memoryInBytes();
     EXPECT_LT(bytes, 60'000'000); // of 400 MB that a dense field would take
 
     std::vector<std::thread> threads;

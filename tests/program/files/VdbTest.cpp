@@ -69,12 +69,11 @@ namespace {
             Coord const first = at.getBoundingBox().min(), last = at.getBoundingBox().max();
             expected[{first[0], first[1], first[2], last[0], last[1], last[2]}] = *at;
         }
-        for (auto const& [i, j, k, value] : volume.voxels)
-            found[{i, j, k, i, j, k}] = value;
+        volume.forEachVoxel([&](int i, int j, int k, float value) { found[{i, j, k, i, j, k}] = value; });
         for (auto const& [first, end, value] : volume.boxes)
             found[{first.i, first.j, first.k, end.i - 1, end.j - 1, end.k - 1}] = value;
         EXPECT_TRUE(found == expected);
-        EXPECT_EQ(volume.voxels.size() + volume.boxes.size(), expected.size());
+        EXPECT_EQ(volume.cubeValues.size() + volume.boxes.size(), expected.size());
         EXPECT_EQ(volume.activeCount(), grid.activeVoxelCount());
         EXPECT_EQ(volume.background, grid.background());
         openvdb::Vec3d const place = grid.indexToWorld(Coord(3, -4, 5));

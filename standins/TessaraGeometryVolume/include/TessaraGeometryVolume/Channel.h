@@ -1,6 +1,7 @@
 #pragma once
 
 #include <TessaraGeometryVolume/Export.h>
+#include <TessaraGeometryVolume/Tile.h>
 #include <TessaraGeometryVolume/TileData.h>
 #include <TessaraGeometryVolume/TileTraits.h>
 
@@ -10,7 +11,8 @@
 
 namespace TSR::TileTree3D {
 
-/// The values of a volume: `side`³ a tile, for all tiles of the depths that hold data. Read by any number of threads.
+/// The values of a volume: `side`³ per tile that holds data. Tiles of equal values can share them. Read by any number of
+/// threads.
 template <class Traits, class T> class TESSARAGEOMETRYVOLUME_EXPORT Channel {
 public:
     /// Without data. \param side  that of a tile, or one more for tiles that are padded on their upper sides
@@ -24,34 +26,96 @@ public:
     Channel& operator=(Channel&&) noexcept = default;
     virtual ~Channel() = default;
 
-    /// Above it no tile has data. The deepest depth and one more where no tile has any.
+    /// Above it no tile has data. The deepest depth plus one if there is no data at all.
     virtual int coarsestDepth() const noexcept
     {
         int depth = 0;
-        while (depth < Traits::kDepthCount && levels_[static_cast<std::size_t>(depth)].empty())
+        while (depth < Traits::kDepthCount && levels_[static_cast<std::size_t>(depth)].roomCount == 0)
             ++depth;
         return depth;
     }
 
-    /// Nothing where the tile holds no data, and where tiles of this channel have another side.
+    /// Empty if the tile holds no data, and if tiles of this channel have another side.
     template <int side = Traits::kSide> ConstTileData<T, side, 0> tileData(TreeIndex tile) const noexcept
     {
-        constexpr std::size_t kVoxelCount = std::size_t{side} * side * side;
         if (!tile.isValid() || side != side_)
             return {};
-        std::vector<T> const& level = levels_[tile.depth];
-        std::size_t const first = static_cast<std::size_t>(tile.index) * kVoxelCount;
-        return first < level.size() ? ConstTileData<T, side, 0>(level.data() + first) : ConstTileData<T, side, 0>();
+        Level const& level = levels_[tile.depth];
+        std::uint32_t const room = level.roomOf(tile.index);
+        return room == kNoRoom ? ConstTileData<T, side, 0>()
+                               : ConstTileData<T, side, 0>(level.valuesOf(room, voxelCount()));
     }
 
     int side() const noexcept { return side_; }
-    /// All values of a depth, tile after tile, for those who fill them. Empty, or as long as there are tiles.
-    std::vector<T>& values(int depth) { return levels_[static_cast<std::size_t>(depth)]; }
-    std::vector<T> const& values(int depth) const { return levels_[static_cast<std::size_t>(depth)]; }
+
+    /// For those who fill a channel: the values of a tile, which are 0 when they are asked for first. \pre  not shared
+    T* values(TreeIndex tile)
+    {
+        Level& level = levels_[tile.depth];
+        std::uint32_t& room = level.entryOf(tile.index);
+        if (room == kNoRoom) {
+            if (level.roomCount % kPageRooms == 0)
+                level.pages.emplace_back(kPageRooms * voxelCount());
+            room = level.roomCount++;
+        }
+        return level.valuesOf(room, voxelCount());
+    }
+    /// Lets a tile have the values of another one of its depth, which are stored once.
+    void share(TreeIndex tile, TreeIndex other)
+    {
+        Level& level = levels_[tile.depth];
+        std::uint32_t const room = level.roomOf(other.index);
+        level.entryOf(tile.index) = room;
+    }
+
+    std::size_t memoryInBytes() const
+    {
+        std::size_t bytes = sizeof(*this);
+        for (Level const& level : levels_)
+            bytes += (level.rooms.capacity() + level.repeatedRooms.capacity()) * sizeof(std::uint32_t)
+                + level.pages.size() * (kPageRooms * voxelCount() * sizeof(T) + sizeof(level.pages[0]));
+        return bytes;
+    }
 
 private:
+    static constexpr std::uint32_t kNoRoom = ~std::uint32_t{0};
+    static constexpr std::size_t kPageRooms = 64; // so that growing copies nothing
+
+    struct Level {
+        std::vector<std::uint32_t> rooms, repeatedRooms; // of stored tiles, and of those from `kFirstRepeated` on
+        std::vector<std::vector<T>> pages;
+        std::uint32_t roomCount = 0;
+
+        std::uint32_t roomOf(std::uint64_t tile) const noexcept
+        {
+            bool const isRepeated = tile >= kFirstRepeated;
+            std::vector<std::uint32_t> const& table = isRepeated ? repeatedRooms : rooms;
+            auto const number = static_cast<std::size_t>(isRepeated ? tile - kFirstRepeated : tile);
+            return number < table.size() ? table[number] : kNoRoom;
+        }
+        std::uint32_t& entryOf(std::uint64_t tile)
+        {
+            bool const isRepeated = tile >= kFirstRepeated;
+            std::vector<std::uint32_t>& table = isRepeated ? repeatedRooms : rooms;
+            auto const number = static_cast<std::size_t>(isRepeated ? tile - kFirstRepeated : tile);
+            if (number >= table.size())
+                table.resize(number + 1, kNoRoom);
+            return table[number];
+        }
+        T const* valuesOf(std::uint32_t room, std::size_t voxelCount) const noexcept
+        {
+            return pages[room / kPageRooms].data() + room % kPageRooms * voxelCount;
+        }
+        T* valuesOf(std::uint32_t room, std::size_t voxelCount) noexcept
+        {
+            return pages[room / kPageRooms].data() + room % kPageRooms * voxelCount;
+        }
+    };
+
+    std::size_t voxelCount() const noexcept { return static_cast<std::size_t>(side_) * side_ * side_; }
+
     int side_;
-    std::array<std::vector<T>, Traits::kDepthCount> levels_;
+    std::array<Level, Traits::kDepthCount> levels_;
 };
 
 }

@@ -8,6 +8,15 @@
 
 namespace TSR::TileTree3D {
 
+/// How a coarse tile is made of finer ones, of which most are alike: along each axis it is cut into parts, and all finer
+/// tiles in the same three parts have the same values.
+struct Division {
+    std::array<std::vector<std::uint32_t>, 3> begins; // of parts, in finer tiles from the coarse tile's lower corner
+    std::vector<std::uint32_t> tiles; // by part, x fastest: index of a repeated tile, or `kNoRepeated`
+
+    static constexpr std::uint32_t kNoRepeated = ~std::uint32_t{0};
+};
+
 /// A tree of tiles: which parts of space a volume has values in. Any number of threads may read it at once, each with
 /// accessors of its own.
 template <class Traits> class TESSARAGEOMETRYVOLUME_EXPORT Container {
@@ -15,9 +24,11 @@ public:
     using TileType = Tile<Traits, Traits::kChildCount>;
     class ConstTileAccessor;
 
-    /// \pre  the tile is there
+    /// For the index of repeated tiles: the first of them. \pre  the tile is there
     TileType const& tile(std::uint64_t index, int depth) const
     {
+        if (index >= kFirstRepeated)
+            return repeated_[static_cast<std::size_t>(index - kFirstRepeated)];
         return levels_[static_cast<std::size_t>(depth)].tiles[static_cast<std::size_t>(index)];
     }
 
@@ -28,6 +39,9 @@ public:
     }
 
     std::size_t tileCount(int depth) const { return levels_[static_cast<std::size_t>(depth)].tiles.size(); }
+    /// How many indices repeated tiles have, all at one depth.
+    std::uint32_t repeatedCount() const noexcept { return static_cast<std::uint32_t>(repeated_.size()); }
+    int repeatedDepth() const noexcept { return repeatedDepth_; }
     /// Of all depths, with the tables to find them by.
     std::size_t memoryInBytes() const;
 
@@ -37,13 +51,20 @@ public:
     /// The tile of this depth that contains the index, made with its values to come when it is not there.
     /// \pre     the index fits 32 bits, and nothing else uses the container
     /// \return  its number among the tiles of this depth
-    /// \throws  std::bad_alloc  also for 2^32 - 1 tiles; nothing has changed then
+    /// \throws  std::bad_alloc  also for 2^31 tiles; nothing has changed then
     std::uint32_t findOrInsert(std::int64_t i, std::int64_t j, std::int64_t k, int depth, bool& isNew);
 
     /// Makes a tile one that has values of its own.
     void setTerminal(std::uint32_t index, int depth);
     /// Makes the parents that are missing, up to depth 0.
     void completeParents();
+
+    /// Adds an index of repeated tiles. \param i, j, k  the lower corner of the first of them
+    std::uint32_t addRepeated(std::int64_t i, std::int64_t j, std::int64_t k, int depth);
+    /// \return  the number to divide tiles by
+    std::int32_t addDivision(Division division);
+    /// Lets a tile stand for the finer ones of the division. \pre  no finer tile is inside
+    void divide(std::uint32_t index, int depth, std::int32_t division);
 
 private:
     struct Level {
@@ -52,11 +73,16 @@ private:
     };
 
     static TileType const& noTile();
+    TileType const& repeatedTile(
+        TileType const& divided, std::int64_t i, std::int64_t j, std::int64_t k, TileType& room) const;
     static std::size_t firstSlot(Level const& level, std::int64_t i, std::int64_t j, std::int64_t k);
     static void growSlots(Level& level);
 
     std::array<Level, Traits::kDepthCount> levels_;
-    std::uint32_t terminalDepths_ = 0; // bit d: some tile of depth d has values of its own
+    std::uint32_t terminalDepths_ = 0; // bit d: some tile of depth d has values of its own, or a division
+    std::vector<TileType> repeated_;
+    std::vector<Division> divisions_;
+    int repeatedDepth_ = Traits::kDepthCount;
 };
 
 /// A cursor that remembers the tile it was at, so that the next look-up nearby costs a comparison. Cheap to copy; it is
@@ -68,10 +94,21 @@ public:
         , tile_(&noTile())
     {
     }
+    /// The copy remembers no tile.
+    ConstTileAccessor(ConstTileAccessor const& other) noexcept
+        : ConstTileAccessor(*other.container_)
+    {
+    }
+    ConstTileAccessor& operator=(ConstTileAccessor const& other) noexcept
+    {
+        container_ = other.container_;
+        tile_ = &noTile();
+        return *this;
+    }
 
-    /// The tile at `depth` that contains the index. Where there is none, the deepest one above it with values of its
-    /// own, which stand for all that is deeper. Otherwise, and for a depth that the layout does not have, one whose
-    /// valid flag is false.
+    /// The tile at `depth` that contains the index. If there is none, the deepest one above it with values of its
+    /// own, which are valid for all that is deeper. Otherwise, and for a depth that the layout does not have, one whose
+    /// valid flag is false. A repeated tile is valid until the next call.
     TileType const& tileImpl(int i, int j, int k, int depth)
     {
         if (!(isAnswerAt(depth) && contains(*tile_, i, j, k)))
@@ -83,7 +120,8 @@ private:
     bool isAnswerAt(int depth) const noexcept
     {
         return tile_->valid && depth <= Traits::kDeepest
-            && (tile_->depth == depth || (tile_->depth < depth && tile_->isTerminal && !tile_->hasChildren));
+            && (tile_->depth == depth
+                || (tile_->depth < depth && tile_->isTerminal && !tile_->hasChildren && tile_->division < 0));
     }
     static bool contains(TileType const& tile, std::int64_t i, std::int64_t j, std::int64_t k) noexcept
     {
@@ -92,10 +130,11 @@ private:
         return static_cast<std::uint64_t>(i - tile.i) < width && static_cast<std::uint64_t>(j - tile.j) < width
             && static_cast<std::uint64_t>(k - tile.k) < width;
     }
-    TileType const& lookUp(int i, int j, int k, int depth) const;
+    TileType const& lookUp(int i, int j, int k, int depth);
 
     Container const* container_;
     TileType const* tile_;
+    TileType repeated_;
 };
 
 extern template class TESSARAGEOMETRYVOLUME_EXPORT Container<Traits2>;

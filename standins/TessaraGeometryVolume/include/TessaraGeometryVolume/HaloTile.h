@@ -10,15 +10,16 @@ namespace TSR::TileTree3D {
 template <class Traits> using PositiveHalo = TileData<float, Traits::kSide + 1, 0>;
 
 /// Fills the halo tile of `tile`, coordinates 0 to `kSide`. Across the upper faces, edges and corner it takes the first
-/// layer of the neighbours of the same depth that hold data. What is missing continues the parent's values; without
-/// any, the outermost layer of the tile itself. Values are taken to stand at the lower sides of their voxels.
+/// layer of the neighbors of the same depth that hold data. If a coarser tile holds the data there, it continues the
+/// parent's values; if no tile does, the outermost layer of the tile itself, whatever the parent says. Values are at the
+/// lower sides of their voxels.
 ///
 /// \param parentTile  May be null.
 /// \param parentHalo  That of the parent tile; may be empty, and then the parent's values are not used.
 /// \param order       How the parent's values are continued: 2, linear between them; 1, the one below.
-/// \param accessor    Fetches the neighbours.
-/// \param out         Empty afterwards where the tile holds no data.
-/// Takes no memory.
+/// \param accessor    Fetches the neighbors.
+/// \param out         Empty afterwards if the tile holds no data.
+/// Allocates nothing.
 template <class Traits> void setHaloTile(typename Container<Traits>::TileType const& tile,
     typename Container<Traits>::TileType const* parentTile, Channel<Traits, float> const& channel,
     PositiveHalo<Traits> const& parentHalo, int order, typename Container<Traits>::ConstTileAccessor& accessor,

@@ -4,17 +4,24 @@
 
 namespace TSR::TileTree3D {
 
+/// Stored tiles have lower indices.
+inline constexpr std::uint32_t kFirstRepeated = std::uint32_t{1} << 31;
+
 /// What a tile is in a tree with `kChildCount` children to a tile, whatever their arrangement. Empty unless it belongs
 /// to a container: a cursor without a tile can rest on such a one.
 template <int childCount> struct TileBinaryNonCompatible {
     // The corner with the lowest indices: a multiple of the tile's width, and so perhaps below what 32 bits hold.
     std::int64_t i = 0, j = 0, k = 0;
     std::int64_t parent = -1; // among the tiles one depth up; negative without one
-    std::uint32_t index = 0; // among the tiles of its depth
+    std::uint32_t index = 0; // among the tiles of its depth; repeated tiles share one from `kFirstRepeated` on
     std::int32_t depth = -1;
     bool valid = false;
     bool isTerminal = false; // has values of its own: where the tree ends here, they stand for all that is deeper
     bool hasChildren = false;
+    // One of many tiles with the same values. It is not stored: it lasts until the accessor that made it looks elsewhere.
+    bool isRepeated = false;
+    std::int32_t division =
+        -1; // which division of the container describes the finer tiles inside; negative without one
 
     /// No tile where this is not a valid one.
     TreeIndex treeIndex() const noexcept
