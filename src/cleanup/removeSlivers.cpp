@@ -181,7 +181,7 @@ namespace {
         return visits;
     }
 
-    /// The first face from `face` on that has to be visited; the face count where there is none.
+    /// The first face from `face` on that has to be visited; the face count if there is none.
     unsigned int nextVisit(Orvan::Array<FaceVisit> const& visits, std::uint64_t face)
     {
         // Mostly there is nothing to do: eight faces at a time.
@@ -192,7 +192,7 @@ namespace {
         }
         while (face < visits.size && visits[face] == FaceVisit::None)
             ++face;
-        return static_cast<unsigned int>(std::min(face, visits.size));
+        return static_cast<unsigned int>(face);
     }
 
     /// A half-edge into the point at hand: where it comes from, and its face.

@@ -147,7 +147,7 @@ std::multiset<std::array<float, 6>> oddEdges(Object const& mesh)
 
 TEST(RemoveSlivers, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
 {
-    std::map<std::string, MeshBuilder> const meshes{
+    std::map<std::string, MeshBuilder> meshes{
         {"tetrahedron", MeshBuilder::tetrahedron()},
         {"octahedron", MeshBuilder::sphere(1)},
         {"needles", MeshBuilder::sphere(8).withNeedles(40)},
@@ -162,6 +162,15 @@ TEST(RemoveSlivers, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
         {"two parts",
             MeshBuilder::sphere(5).withNeedles(9).joinedWith(MeshBuilder::torus(9, 9).withNeedles(5), {9, 0, 0})},
     };
+    static float const kScales[] = {1, 1, 1e6f, 1e-18f};
+    Random random(1);
+    for (unsigned int run = 0; run != 60; ++run) { // dot products of 0: right angles on a lattice, and underflow
+        MeshBuilder& mesh = meshes["lattice " + std::to_string(run)] = MeshBuilder::sphere(2);
+        for (float3& p : mesh.points)
+            p = float3{std::floor(2 * random.coordinate()), std::floor(2 * random.coordinate()),
+                    std::floor(2 * random.coordinate())}
+                * kScales[random.below(4)];
+    }
     for (auto const& [name, builder] : meshes)
         for (float const ratio : {0.0f, 0.03f, 0.3f, 0.8f, 2.0f}) {
             SCOPED_TRACE(name + ", ratio " + std::to_string(ratio));
@@ -183,10 +192,16 @@ TEST(RemoveSlivers, leavesWhatItIsNotMeantFor)
     addDataProperty<int>(sFaceVertex, sFaceVertexComp, {1, 2, 3}, *otherType);
     auto const empty = MeshBuilder().build();
     auto const open = MeshBuilder::square(1).withNeedles(1).build();
-    for (auto const* const mesh : {&polygons, &mixed, &incomplete, &otherType, &empty, &open}) {
+    auto const shortOffsets = MeshBuilder::sphere(4).withNeedles(9).build();
+    auto offsets = *dataOf<unsigned int>(*shortOffsets, sFaceOffset);
+    offsets.resize(offsets.size - 1); // the last one is still in the memory behind
+    addDataProperty<unsigned int>(sFaceOffset, sFaceComp, std::move(offsets), *shortOffsets);
+    for (auto const* const mesh : {&polygons, &mixed, &incomplete, &otherType, &empty, &open, &shortOffsets}) {
         auto const before = deepCopy(**mesh);
+        auto const positions = dataOf<float3>(**mesh, sPointPosition);
         EXPECT_TRUE(removeSlivers(0.9f, **mesh));
         EXPECT_TRUE(sameContents(**mesh, *before));
+        EXPECT_EQ(dataOf<float3>(**mesh, sPointPosition), positions) << "written";
     }
 }
 

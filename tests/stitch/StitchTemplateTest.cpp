@@ -285,9 +285,11 @@ TEST(StitchTemplate, FillingClearsNothing)
     fill({{0, 0, 0}, {90, 0, 0}, {0, 90, 0}}, {{30, 0, 0}, {30, 60, 0}}); // fewer corners than the old strands have
     EXPECT_EQ(made.getEdgeEndpoints().size, 3);
 
-    made.setEdgeEndpoints({{{99, true}, {98, true}}, {{0, true}, {50, false}, {1, true}}}); // of no strand
+    // Of no strand, and of one with too few weights for edge 3.
+    made.setEdgeEndpoints({{{99, true}, {98, true}}, {}, {}, {{2, true}, {50, false}, {2, true}}});
     fill({{0, 0, 0}, {2, 0, 0}, {3, 1, 0}, {2, 2, 0}, {0, 2, 0}}, {{1, 0, 0}, {1, 1, 0}});
     EXPECT_EQ(made.getPolySize(), 5);
+    EXPECT_EQ(made.getEdgeEndpoints()[3], (Ends{{2, true}}));
 }
 
 TEST(StitchTemplate, CoordinatesGivePointsBack)
@@ -311,6 +313,26 @@ TEST(StitchTemplate, CoordinatesGivePointsBack)
             EXPECT_TRUE(length(found[0] - expected) < 1e-5f && length(found[1] - expected) < 1e-5f);
         }
     }
+}
+
+TEST(StitchTemplate, TolerancesAndRightAnglesDoNotCountAsNear)
+{
+    StitchTemplate made;
+    float3 found{};
+    Weights weights(5);
+    made.setPolySize(4);
+    made.setTol(0.125f); // the area of the point and edge 3
+    EXPECT_EQ(made.computeMeanValueCoordinates(square(), {0.25f, 0.5f, 0}, weights, 1), 0xFFFFFFFF);
+    made.findControlPointPos(square(), weights, 1, false, found);
+    EXPECT_LT(length(found - float3{0.25f, 0.5f, 0}), 1e-6f);
+    // The point sees a short edge under a right angle, in a triangle that is smaller than the tolerance.
+    EXPECT_EQ(made.computeMeanValueCoordinates({{0.25f, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0.25f, 0}}, {}, weights, 1),
+        0xFFFFFFFF);
+
+    Weights noHeight{0.25f, 0.25f, 0.25f, 0.25f, 9};
+    noHeight.resize(4); // the 9 is still in the memory behind
+    made.findControlPointPos(square(), noHeight, 1, false, found);
+    EXPECT_TRUE(found.x == 0.5f && found.y == 0.5f && found.z == 0);
 }
 
 TEST(StitchTemplate, StrandsMeetOnSharedEdges)
