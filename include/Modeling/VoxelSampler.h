@@ -23,14 +23,14 @@ namespace Internal {
 
 }
 
-/// Reads values of a sparse volume at points. What kinds have in common: finding the tile, and the place in it.
+/// Reads values of a sparse volume at points. What all kinds share: finding the tile, and the place in it.
 template <class Traits, class Value, class Point> class VoxelSampler;
-/// One that blends the eight values around a point.
+/// Trilinear: blends the eight values around a point.
 template <class Traits, class Value, int components, class Real, class Point, int, int> class VoxelSamplerLinear;
 
 template <class Traits> using LinearSampler = VoxelSamplerLinear<Traits, float, 1, float, Tessara::Math::float3, 0, 0>;
 
-/// The space of points in units of length. In any other they are in index units.
+/// Points are in units of length. In any other space they are in index units.
 inline constexpr int kWorldSpace = 2;
 
 template <class Traits> class MODELING_EXPORT VoxelSampler<Traits, float, Tessara::Math::float3> {
@@ -54,25 +54,25 @@ private:
     TileBinaryNonCompatible<Traits::kChildCount> noTile_;
 
 protected:
-    /// Where a point is: its voxel in the tile's data, and how far towards the next voxel.
+    /// Where a point is: its voxel in the tile's data, and the fraction of the way to the next voxel.
     struct Place {
         IJK voxel;
         Tessara::Math::float3 fraction;
     };
 
-    // As long as points are between these corners, the tile at hand is theirs; nothing is where it cannot be kept.
+    // Points between these corners are in the current tile. Empty if the tile may not be kept for the next point.
     Tessara::Math::float3 tileBegin_; // in index units
     Tessara::Math::float3 tileEnd_;
     float voxelsPerUnit_ = 0;
     int depth_ = -1; // that was asked for
-    std::uint64_t visit_ = 0; // raised whenever another tile is gone to
+    std::uint64_t visit_ = 0; // incremented for each tile that is entered
 
     MODELING_NO_EXPORT VoxelSampler(
         ContainerType const& container, float scale, Tessara::Math::float3 const& voxelOffset) noexcept;
     VoxelSampler(VoxelSampler const&) = delete;
     VoxelSampler& operator=(VoxelSampler const&) = delete;
 
-    /// Goes to the tile that contains the point, if there is one. \pre depth <= kDeepest, here and below
+    /// Enters the tile that contains the point, if there is one. \pre depth <= kDeepest, here and below
     MODELING_NO_EXPORT Place locate(Tessara::Math::float3 const& point, int depth, int space);
     MODELING_NO_EXPORT Tessara::Math::float3 distanceFromTile(Tessara::Math::float3 const& p) const noexcept;
     MODELING_NO_EXPORT void enterTile(Tessara::Math::float3 const& p, int depth);
@@ -82,39 +82,38 @@ protected:
     MODELING_NO_EXPORT TileType const& currentTile() const noexcept { return static_cast<TileType const&>(*tile_); }
 };
 
-/// What a sampler is told besides the volume.
+/// The parameters of a sampler besides the volume.
 struct LinearSamplerSettings {
-    float scale = 1; // index units a unit of length of the points
-    Tessara::Math::float3 voxelOffset{0, 0, 0}; // in voxels; where the value of a voxel stands, from its lower corner
+    float scale = 1; // index units per unit of length of the points
+    Tessara::Math::float3 voxelOffset{0, 0, 0}; // in voxels; where the value of a voxel is, from its lower corner
     float background = 0; // outside all tiles
-    int minDepth = 0; // tiles above it count as missing
-    int maxDepth = 0x7FFFFFFF; // no deeper tile is read
+    int minDepth = 0; // coarser tiles count as missing
+    int maxDepth = 0x7FFFFFFF; // finer tiles are not read
 };
 
-/// Blends the eight values around a point along x, then y, then z. Where some of them lie in other tiles, it builds a
-/// copy of the tile with a layer of voxels more, and keeps the last one of each depth.
+/// Blends the eight values around a point along x, then y, then z. If some of them are in other tiles, it builds a copy of
+/// the tile with an additional layer of voxels. Single samples keep the last such copy of each depth, rows many more.
 ///
 /// A sampler holds on to its place from one sample to the next, so each thread needs a copy of its own; copies begin
 /// with empty caches. It reads the volume only. A single sample allocates nothing, except the first one of a copy that
 /// needs the caches.
 ///
-/// What lies around a tile depends on the volume's offset type. With all bits set, samples read a layer across the
-/// upper faces: of neighbours where there are any (`setHaloTile`). Otherwise they read a layer all around, and
-/// - a tile without parent values has no neighbours there: along axes with a clear bit the layer mirrors the tile at
-///   `background`, along others it is `background`, as is then the tile's own first layer;
-/// - a tile with parent values looks for its neighbours at a fixed distance: 2 index units in `Traits2`, 5 in
-///   `Traits5`. Where tiles are wider than that, the upper neighbour is the tile itself; where they are narrower, one
-///   further on.
-/// Volumes to guide a refinement are best built with all bits set.
+/// The layer depends on the volume's offset type. With all bits set, it is across the upper faces and holds values of the
+/// neighbors, if there are any (`setHaloTile`). Otherwise it is all around, and
+/// - for a tile without parent values, neighbors are ignored: along axes with a clear bit the layer mirrors the tile at
+///   `background`; along the others it is `background`, and so is the tile's own first layer;
+/// - for a tile with parent values, neighbors are looked up at a fixed distance: 2 index units in `Traits2`, 5 in
+///   `Traits5`. A wider tile is therefore its own upper neighbor, and a narrower one takes a tile further away.
+/// Volumes that guide a refinement are best built with all bits set.
 template <class Traits> class MODELING_EXPORT VoxelSamplerLinear<Traits, float, 1, float, Tessara::Math::float3, 0, 0>
     : public VoxelSampler<Traits, float, Tessara::Math::float3> {
 public:
     using ChannelType = Channel<Traits, float>;
 
-    /// \param haloChannel  Tiles with a layer more on their upper sides (`makeHaloChannel`), read instead of `channel`
-    ///                     where it is given: samples then need no cache. Below the first voxel there is nothing, so it
-    ///                     fits offsets that are not positive.
-    /// All of the volume has to outlive the sampler and its copies, and to stay as it is.
+    /// \param haloChannel  Tiles with an additional layer on their upper sides (`makeHaloChannel`). If given, it is read
+    ///                     instead of `channel`, and samples need no cache. It has no layer below the first voxel, so
+    ///                     offsets should not be positive.
+    /// \pre  All of the volume outlives the sampler and its copies, unchanged.
     VoxelSamplerLinear(Container<Traits> const& container, ChannelType const& channel, VoxelTopology const& topology,
         LinearSamplerSettings const& settings, ChannelType const* haloChannel = nullptr);
     VoxelSamplerLinear(VoxelSamplerLinear const& other);
@@ -122,16 +121,17 @@ public:
     /// "kLinear"
     Orvan::String name() const override;
 
-    /// The value at a point, `background` where no tile holds data. Outside the range of 32-bit indices, and where a
-    /// coordinate is no number, there are no tiles.
-    /// \param depth  of the tiles to read; where the tree ends above, the tile that it ends in is read
+    /// The value at a point; `background` if no tile there holds data, if the point is outside the range of 32-bit
+    /// indices, or if a coordinate is NaN.
+    /// \param depth  Of the tiles to read. If the tree ends at a coarser tile, that one is read.
     /// \param space  `kWorldSpace`, or any other number for index units
     float sample(Tessara::Math::float3 const& point, int depth, int space);
 
-    /// The same for `count` points, to the bit. It is faster than `sample`, most of all if consecutive points are mostly
-    /// in the same tile. Allocates 48 kilobytes for the first row of a copy, and without `haloChannel` 0.5 to 1.4
-    /// kilobytes for each tile that a layer is built around, until there are 512: it keeps them from one row to the next.
-    /// \throws std::bad_alloc  some of `values` may have been written; the sampler can be used again
+    /// The same for `count` points, to the bit. Faster than `sample`, most of all if consecutive points are mostly in the
+    /// same tile; as fast if points are beyond 2^22 index units, or if an offset is greater than 1. The first row of a
+    /// copy allocates 48 kilobytes. Without `haloChannel`, rows allocate 0.5 to 1.4 kilobytes for each tile that they build
+    /// a layer around, up to 512 tiles, which they keep.
+    /// \throws std::bad_alloc  Some of `values` may have been written; the sampler remains usable.
     void sampleAll(Tessara::Math::float3 const* points, std::size_t count, int depth, int space, float* values);
 
 private:
@@ -157,7 +157,7 @@ private:
     enum : std::uint64_t { kNoKey = ~std::uint64_t{0} };
     enum : std::uint32_t { kNoSlot = ~std::uint32_t{0} };
 
-    /// A tile with a layer around it, which belongs to the tile with the number `key`.
+    /// The tile with index `key`, with a layer around it.
     template <int side> struct HaloSlot {
         std::uint64_t key = kNoKey;
         TileData<float, side, 0> values;
@@ -180,7 +180,7 @@ private:
 
     typename Container<Traits>::ConstTileAccessor neighbours_;
     unsigned int offsetType_;
-    HaloCache<kSide + 1> positiveHaloCache_; // a slot a depth, once one is needed
+    HaloCache<kSide + 1> positiveHaloCache_; // one slot per depth, once one is needed
     HaloCache<kSide + 2> fullHaloCache_;
     std::uint64_t stamp_ = 0;
     std::uint64_t lastKey_[Traits::kDepthCount];
@@ -196,9 +196,9 @@ private:
 
     std::unique_ptr<Internal::KnownTiles<Traits>> knownTiles_; // once a row needs them
 
-    // Of the tile that the base has come to.
+    // Of the tile that the base has entered.
     std::uint64_t fetchedVisit_ = 0;
-    float const* values_ = nullptr; // null where there are none that may be read
+    float const* values_ = nullptr; // null if there are none that may be read
 };
 
 extern template class MODELING_EXPORT VoxelSampler<Traits2, float, Tessara::Math::float3>;

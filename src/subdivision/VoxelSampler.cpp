@@ -19,7 +19,7 @@ namespace {
 
     constexpr unsigned int kAllBits = 7; // of the three axes
 
-    /// How far the neighbours of a tile are looked for, in index units: at one depth its width, whatever the depth.
+    /// The distance at which the neighbors of a tile are looked up, in index units. It does not change with the depth.
     template <class Traits> constexpr int kNeighbourStep = 0;
     template <> constexpr int kNeighbourStep<Traits2> = 2;
     template <> constexpr int kNeighbourStep<Traits5> = 5;
@@ -335,7 +335,7 @@ template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3,
     }
 }
 
-/// First those that are known, without a branch that would be unpredictable.
+/// Known tiles first, without an unpredictable branch.
 template <class Traits> std::size_t VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::findTiles(
     float3 const* points, std::size_t runCount, int depth, float scale, Internal::PointRow& row)
 {
@@ -430,7 +430,7 @@ float const* VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::buildLay
     return build(knownTiles_->fullHalos) + firstInLayer(kSide + 2);
 }
 
-/// Null where there are none that may be read.
+/// Null if there are none that may be read.
 template <class Traits>
 inline float const* VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::valuesOf(TileType const& tile) const
 {
@@ -504,7 +504,7 @@ std::uint32_t VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::buildHa
     return lastSlot_[number] = number;
 }
 
-/// Whether the tile above may know what lies around.
+/// Whether the parent can supply values around the tile.
 template <class Traits>
 bool VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::drawsOnParent(TileType const& tile) const
 {
@@ -540,8 +540,8 @@ template <class Traits> void VoxelSamplerLinear<Traits, float, 1, float, float3,
     Internal::fillHaloFromNeighbours<Traits>(offsetType_, halo, tile.childIJK(), tilesAround(tile), parentHalo);
 }
 
-/// The data of the tiles of this depth at a fixed distance, on purpose: where tiles are wider than that, the tile is
-/// its own upper neighbour.
+/// The data of the tiles of this depth at a fixed distance, which makes a wider tile its own upper neighbor: existing
+/// volumes depend on it.
 template <class Traits>
 auto VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::tilesAround(TileType const& tile) -> TilesAround
 {

