@@ -1,6 +1,7 @@
 #include "GuideVolume.h"
 
 #include "Failure.h"
+#include "LargeFaces.h"
 #include "files/VdbFile.h"
 
 #include <Modeling/subdivideByVolume.h>
@@ -229,7 +230,7 @@ void GuideVolume::tellCoverage(MeshArrays const& mesh, Report& report) const
             "no face lies in the volume, so that all take the background of grid \"{}\", {}", grid_, background_));
 }
 
-void GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
+std::uint64_t GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
 {
     using namespace Tessara::Geometry;
     // The sampler's offset of voxels would read beyond the neighbours of a tile: the mesh moves instead, by at most half a
@@ -242,10 +243,19 @@ void GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
             p = {p.x + sign * shift_.x, p.y + sign * shift_.y, p.z + sign * shift_.z};
         addDataProperty(sPointPosition, sPointComp, positions, mesh);
     };
+    std::uint64_t largeFaces = 0;
     movePoints(-1);
-    visitVolume(
-        [&](auto const& volume) { Geometry::Mesh::subdivide(samplerOf(volume, background_), mesh, tolerance); });
+    visitVolume([&](auto const& volume) {
+        auto const sampler = samplerOf(volume, background_);
+        Geometry::Mesh::subdivide(sampler, mesh, tolerance);
+        // Before the points move back, which rounds away the smallest faces.
+        largeFaces = countLargeFaces(mesh, [&](MeshArrays const& refined, Orvan::Array<bool>& marks) {
+            Geometry::Mesh::Internal::markForSubdivision(sampler, refined.faceCount(), *refined.positions,
+                *refined.faceVertex, *refined.faceOffset, marks, tolerance);
+        });
+    });
     movePoints(1);
+    return largeFaces;
 }
 
 void addGuideOptions(GuideOptions& options, Command& command)

@@ -42,8 +42,8 @@ public:
     /// Tells how much of the mesh the volume covers.
     void tellCoverage(MeshArrays const& mesh, Report& report) const;
 
-    /// Refines by a tolerance that the volume scales.
-    void refine(float tolerance, Tessara::Object& mesh) const;
+    /// Refines by a tolerance that the volume scales. \return how many faces are still too large, by `countLargeFaces`
+    std::uint64_t refine(float tolerance, Tessara::Object& mesh) const;
 
 private:
     void describe(SparseVolume& volume, Report& report);

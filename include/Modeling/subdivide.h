@@ -12,8 +12,13 @@ namespace Geometry::Mesh {
 /// faces next to them split as far as it takes to keep sizes graded: levels across an edge differ by less than two. Two
 /// steps divide edges by 3, one by √3. Points move: the surface is smoothed, and each point lies where its own number
 /// of steps has taken it between its place in the coarse mesh and its place on the limit surface. What is measured is
-/// the smoothed mesh. The run ends with a pass in which no face splits; a face that is still too large then could not
-/// split, because the faces around it did not.
+/// the smoothed mesh. The run ends with a pass in which no face splits.
+///
+/// A face is the result of at most 31 steps, which divide edges by 25 million, and is then left as it is, even if it is
+/// still too large. That takes few faces if the tolerance is out of reach in single places only, such as a point one
+/// float away from the points around it, where floats are farther apart than the tolerance. `markForSubdivision` of
+/// `subdivisionSteps.h` finds the faces of a result that are still too large; on a closed manifold, all of them have
+/// come to this limit.
 ///
 /// Old points keep their numbers, and new ones follow. In each pass faces that stay keep their order, and new ones
 /// follow in the order of the faces that they replace. New faces keep the orientation of the old ones. Levels are not
@@ -26,8 +31,8 @@ namespace Geometry::Mesh {
 /// shorter than 1.
 ///
 /// \param tolerance  In scene units. At or below 1.1920929e-7, and where all faces fit, nothing splits, but data is
-///                   dropped all the same. There is no other limit: a step multiplies the faces by 3, until memory
-///                   ends.
+///                   dropped all the same. A step multiplies the faces by 3: a tolerance that is too small ends with
+///                   the memory, or for single places at the limit of 31 steps.
 /// \param object     Reads and rewrites `sPointPosition` (one float3 a point), `sFaceVertex` (one point index a corner)
 ///                   and `sFaceOffset` (face count + 1 entries), and the counts of `sPointComp`, `sFaceVertexComp` and
 ///                   `sFaceComp`. Other holders of arrays see no change.
@@ -37,6 +42,8 @@ namespace Geometry::Mesh {
 /// \return           False where some face has an edge without a face that passes it in the other direction; the mesh
 ///                   has then lost the dropped data and nothing else. Faces are taken for triangles of their first
 ///                   three corners there, so that mostly polygons give false too, and so does a missing standard array.
+///                   If an enclosing oneTBB group is cancelled, faces that are too large are left as they are: the
+///                   result is then true, with a closed but coarser mesh.
 /// \throws           std::bad_alloc when memory runs out or a count no longer fits 32 bits; std::runtime_error with the
 ///                   text of `TSR::exceptionMessage` when the job is cancelled, which is looked at several times a
 ///                   pass. The mesh is then as it was but for dropped data and for data of points, which may be longer

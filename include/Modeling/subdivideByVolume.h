@@ -12,15 +12,16 @@ namespace Geometry::Mesh {
 /// coarse and where it gets fine.
 ///
 /// Where the product is not above 1.1920929e-7, as where the volume is 0 or below and `tolerance` is not, faces are
-/// left alone, but for those next to ones that split. Where values pass from positive to negative ones the product
-/// comes close to 0, and faces there split for as long as there is memory. The volume is looked up in each pass anew,
-/// where the smoothed mesh then is.
+/// left alone, but for those next to ones that split. If values fall to 0 along a curve, faces there split until memory
+/// ends; if they do so near a single place only, faces there come to the limit of 31 steps, and are left as they are.
+/// The volume is looked up in each pass anew, where the smoothed mesh then is. `Internal::markForSubdivision` with the
+/// same sampler finds the faces of a result that are still too large.
 ///
 /// \param sampler    The volume; a constant one does what `subdivide` does with its value times `tolerance`. Only
 ///                   copies of it are used.
 /// \param object     As for `subdivide`: what it reads, rewrites and drops, and what it refuses.
 /// \param tolerance  In scene units, for a value of 1.
-/// \return, \throws  As `subdivide`.
+/// \return, \throws  As `subdivide`, also if an enclosing oneTBB group is cancelled.
 ///
 /// The same result for any number of threads. Allocates 4 bytes per point more than `subdivide`, and per thread what
 /// `LinearSampler::sampleAll` does. The volume is read once per point and pass. That is fastest if the sampler has a

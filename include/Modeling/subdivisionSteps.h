@@ -14,7 +14,8 @@
 /// - bit 0 is set while refinement is asked for and has not come yet,
 /// - bit 1 says that the pass at hand removes the face,
 /// - bits 2 to 7 are the level, two to a step. A face of an odd level is a third of a split face whose outer edge has
-///   not turned over yet, because the face behind that edge has not split.
+///   not turned over yet, because the face behind that edge has not split. A face of level 62 takes no mark and never
+///   splits, since the levels of its replacements would not fit.
 /// A point's level is the step at which it was made.
 ///
 /// Nothing is checked: arrays that do not fit together are undefined. Results are the same for any number of threads.

@@ -2,6 +2,7 @@
 #include "Failure.h"
 #include "Geometry.h"
 #include "GuideVolume.h"
+#include "LargeFaces.h"
 #include "MemoryLimit.h"
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
@@ -9,6 +10,7 @@
 #include "Triangulation.h"
 
 #include <Modeling/subdivide.h>
+#include <Modeling/subdivisionSteps.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
 #include <TessaraGeometry/Names.h>
@@ -87,22 +89,38 @@ namespace {
         unsigned int pass_ = 0;
     };
 
-    /// Where the user can see them, with the count of faces after each pass.
-    void refine(std::optional<GuideVolume> const& guide, float tolerance, Object& mesh)
+    /// \return  How many faces are still too large.
+    std::uint64_t refineBy(std::optional<GuideVolume> const& guide, float tolerance, Object& object)
     {
-        auto const run = [&](Object& object) {
-            if (guide)
-                guide->refine(tolerance, object);
-            else
-                Geometry::Mesh::subdivide(tolerance, object);
-        };
-        if (!::isatty(STDERR_FILENO)) {
-            run(mesh);
-            return;
-        }
+        if (guide)
+            return guide->refine(tolerance, object);
+        Geometry::Mesh::subdivide(tolerance, object);
+        return countLargeFaces(object, [=](MeshArrays const& refined, Orvan::Array<bool>& marks) {
+            Geometry::Mesh::Internal::markForSubdivision(
+                tolerance, refined.faceCount(), *refined.positions, *refined.faceVertex, *refined.faceOffset, marks);
+        });
+    }
+
+    /// The same. On a terminal the count of faces is printed after each pass.
+    std::uint64_t refine(std::optional<GuideVolume> const& guide, float tolerance, Object& mesh)
+    {
+        if (!::isatty(STDERR_FILENO))
+            return refineBy(guide, tolerance, mesh);
         TellingMesh telling(mesh);
-        run(telling);
+        std::uint64_t const largeFaces = refineBy(guide, tolerance, telling);
         mesh = telling.mesh();
+        return largeFaces;
+    }
+
+    void reportLargeFaces(std::uint64_t count, bool isGuided, Report& report)
+    {
+        report.document["tooLargeFaces"] = count;
+        if (count != 0)
+            report.warn(
+                fmt::format("{} still larger than the tolerance: they come from 31 steps, which divide edges by "
+                            "25 million, and refinement ends there.{}",
+                    count == 1 ? "1 face is" : groupDigits(count) + " faces are",
+                    isGuided ? " --min-value keeps the tolerance away from 0." : ""));
     }
 
     void runWithin(std::uint64_t maxMemory, Report& report, std::function<void()> const& operation)
@@ -199,8 +217,10 @@ namespace {
             guide.emplace(options.guide, report).tellCoverage(arraysOf(*mesh), report);
         float const tolerance = toleranceOf(options, *mesh, guide);
         Object result = *mesh;
-        runWithin(options.maxMemory, report, [&] { refine(guide, tolerance, result); });
+        std::uint64_t largeFaces = 0;
+        runWithin(options.maxMemory, report, [&] { largeFaces = refine(guide, tolerance, result); });
 
+        reportLargeFaces(largeFaces, guide.has_value(), report);
         std::vector<std::string> const dropped = explainDropped(*mesh, result, report);
         Json const after = describeMesh(result, analyseTopology(arraysOf(result)));
         saveGeometry(result, options.out, report);
@@ -225,7 +245,10 @@ gives one level, s/6 two, s/10.4 three and s/18 four.
 
 A volume paints where the mesh gets fine: the tolerance of a face is multiplied by the value of the grid
 at the face's second corner. Faces are left alone where that is not above 0. "modeling make-volume" makes
-such files.)",
+such files.
+
+A face splits in at most 31 steps one after the other. If it is still too large then, a warning says so: that
+happens where the values of a volume fall to 0 at a single place.)",
         "  modeling subdivide coarse.obj fine.ply --relative 0.01\n"
         "  modeling subdivide part.stl fine.stl --tolerance 0.25 --max-memory 4GB\n"
         "  modeling subdivide head.obj fine.obj --relative 0.01 --volume guide.vdb --grid scale"};

@@ -44,7 +44,20 @@ constexpr bool isSplitAroundPoint(unsigned char state)
 {
     return isSplit(state) && !isThird(state);
 }
-/// A new face. Level 64 would wrap to 0: far beyond what fits in memory.
+
+/// The finest level. A face of it takes no mark: its replacements would be of levels 63 and 64, and six bits end at 63.
+///
+/// No face gets beyond it, however faces meet. New faces come from marked faces of even level, at most two levels up.
+/// A face of this level is not marked by its neighbors either, because only a finer neighbor marks a face of even
+/// level. So it is like any face that nobody asks to split: a pass stays balanced and closed for all sets of marks. No
+/// other face is held up by it, since faces wait for coarser neighbors only.
+inline constexpr unsigned int kFinestLevel = 62;
+
+constexpr bool canTakeMark(unsigned char state)
+{
+    return levelOf(state) < kFinestLevel;
+}
+/// The state of a new face.
 constexpr unsigned char stateOfLevel(unsigned int level)
 {
     return static_cast<unsigned char>(level << 2);

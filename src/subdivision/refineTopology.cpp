@@ -29,7 +29,8 @@ namespace {
         // Each face writes its own state.
         parallelFor(tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [=](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                state[face] |= mark[face] ? kMarkedBit : 0;
+                if (mark[face] && canTakeMark(state[face]))
+                    state[face] |= kMarkedBit;
         });
     }
 

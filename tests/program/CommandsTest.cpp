@@ -273,6 +273,17 @@ TEST_F(Commands, MakeVolumeGuidesSubdivide)
         json({"heat", 3 * 100 + 4 * 10, 4, 1}));
     Result const away = run("subdivide bunny.obj out.ply --relative 0.1 --volume heat.vdb --min-value 2");
     EXPECT_THAT(away.output, HasSubstr("values from 2 to 4, background 2\n"));
+
+    // A hexagonal cone whose rim lies around the place of distance 0.
+    store(folder / "cap.obj",
+        "v 0 0 0\nv 0 0 -10\nv 10 0 0\nv 5 8.66 0\nv -5 8.66 0\nv -10 0 0\nv -5 -8.66 0\nv 5 -8.66 0\n"
+        "f 1 3 4\nf 1 4 5\nf 1 5 6\nf 1 6 7\nf 1 7 8\nf 1 8 3\nf 2 4 3\nf 2 5 4\nf 2 6 5\nf 2 7 6\nf 2 8 7\nf 2 3 8\n");
+    run("make-volume cap.obj cap.vdb --distance-to 0 0 0 --voxels 20");
+    json const cap = runForJson("subdivide cap.obj out.ply --tolerance 0.1 --volume cap.vdb");
+    EXPECT_EQ(at(cap, {"exitCode", "after/genus"}), json({0, 0}));
+    EXPECT_GT(cap["tooLargeFaces"], 0);
+    EXPECT_THAT(cap["warnings"].dump(), HasSubstr(" faces are still larger than the tolerance"));
+    EXPECT_EQ(guided["tooLargeFaces"], 0);
 }
 
 TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)

@@ -56,7 +56,7 @@ public:
     void pass(Orvan::Array<bool> const& marks)
     {
         for (std::size_t f = 0; f != faces.size(); ++f)
-            states[f] |= marks[f] ? 1u : 0u;
+            states[f] |= marks[f] && level(f) < kFinestLevel ? 1u : 0u;
         while (sweep()) { }
         std::vector<unsigned int> newPoint(faces.size());
         for (unsigned int f = 0; f != faces.size(); ++f)
@@ -71,6 +71,9 @@ public:
         for (unsigned int v = 0; v != positions.size(); ++v)
             positions[v] = at(v, finest_[v] >> 1);
     }
+
+    static constexpr unsigned int kFinestLevel = 62; // which takes no mark: 64 does not fit the bits
+    unsigned int level(std::size_t f) const { return states[f] >> 2; }
 
     std::vector<Triangle> faces;
     std::vector<float3> positions, values;
@@ -114,7 +117,6 @@ private:
         return points_[v].limit * (1 - w) + points_[v].base * w;
     }
 
-    unsigned int level(std::size_t f) const { return states[f] >> 2; }
     bool splits(std::size_t f) const { return states[f] & 2; }
     Owner twin(std::size_t f, unsigned int k) const
     {

@@ -29,24 +29,35 @@ template <class Traits> Volume<Traits> volumeOf(float atCentre, float perUnit, f
     return buildVolume<Traits>({.background = background, .depth = Traits::kUnitDepth, .block = field.block()});
 }
 
-template <class Traits>
-LinearSampler<Traits> samplerOf(Volume<Traits> const& volume, Channel<Traits, float> const* haloChannel = nullptr)
+/// Two pyramids whose hexagonal bases have their centers at the origin, where these stay.
+MeshBuilder twoCaps()
 {
-    return {volume.container, volume.channel, volume.topology, {.scale = kScale, .background = volume.background},
-        haloChannel};
+    MeshBuilder cap = MeshBuilder::bipyramid(6), turned = cap;
+    cap.points[6] = {0, 0, 0};
+    turned.points[6] = {0, 0, 0};
+    for (float3& point : cap.points)
+        point = point * 20;
+    for (float3& point : turned.points)
+        point = {point.z * 3, point.x * 3, point.y * 3};
+    return std::move(cap).joinedWith(turned, {0, 0, 0});
+}
+
+template <class Traits> LinearSampler<Traits> samplerOf(Volume<Traits> const& volume, float scale = kScale)
+{
+    return {
+        volume.container, volume.channel, volume.topology, {.scale = scale, .background = volume.background}, nullptr};
 }
 
 template <class Traits> std::vector<bool> marksOf(
-    LinearSampler<Traits> const& sampler, MeshBuilder const& mesh, float tolerance, std::vector<bool> before = {})
+    LinearSampler<Traits> const& sampler, Object const& mesh, float tolerance, std::vector<bool> before = {})
 {
-    PolygonMesh const polygons = mesh.polygons();
-    before.resize(mesh.faces.size());
+    auto const faceCount = static_cast<unsigned int>(countsOf(mesh).faces);
+    before.resize(faceCount);
     Orvan::Array<bool> marks;
     for (bool const mark : before)
         marks.append(mark);
-    Geometry::Mesh::Internal::markForSubdivision(sampler, static_cast<unsigned int>(mesh.faces.size()),
-        Orvan::Array<float3>(mesh.points), Orvan::Array<unsigned int>(polygons.faceVertex),
-        Orvan::Array<unsigned int>(polygons.faceOffset), marks, tolerance);
+    Geometry::Mesh::Internal::markForSubdivision(sampler, faceCount, *dataOf<float3>(mesh, sPointPosition),
+        *dataOf<unsigned int>(mesh, sFaceVertex), *dataOf<unsigned int>(mesh, sFaceOffset), marks, tolerance);
     return std::vector<bool>(marks.begin(), marks.end());
 }
 
@@ -83,34 +94,36 @@ TYPED_TEST(SubdivideByVolume, marksByTheSecondCornerForAnyNumberOfThreads)
     EXPECT_GT(marked, 1000);
     EXPECT_LT(marked, static_cast<long>(mesh.faces.size()) - 1000);
     for (int const threads : {1, 2, 8})
-        EXPECT_EQ(withThreads(threads, [&] { return marksOf(sampler, mesh, tolerance); }), expected) << threads;
+        EXPECT_EQ(withThreads(threads, [&] { return marksOf(sampler, *mesh.build(), tolerance); }), expected)
+            << threads;
 }
 
 TYPED_TEST(SubdivideByVolume, leavesFacesAloneWithoutAPositiveTolerance)
 {
-    auto const mesh = MeshBuilder::sphere(3);
-    std::vector<bool> const none(mesh.faces.size(), false), all(mesh.faces.size(), true);
+    auto const sphere = MeshBuilder::sphere(3);
+    auto const mesh = sphere.build();
+    std::vector<bool> const none(sphere.faces.size(), false), all(sphere.faces.size(), true);
     for (float const value : {0.0f, -2.0f, kNan, 1e-7f}) {
         auto const volume = volumeOf<TypeParam>(value, 0, value);
-        EXPECT_EQ(marksOf(samplerOf(volume), mesh, 1), none) << value;
-        EXPECT_EQ(marksOf(samplerOf(volume), mesh, 1, all), all) << "no mark is cleared";
+        EXPECT_EQ(marksOf(samplerOf(volume), *mesh, 1), none) << value;
+        EXPECT_EQ(marksOf(samplerOf(volume), *mesh, 1, all), all) << "no mark is cleared";
     }
     auto const positive = volumeOf<TypeParam>(0.01f, 0, 0.01f), empty = volumeOf<TypeParam>(1, 0, 0);
-    EXPECT_EQ(marksOf(samplerOf(positive), mesh, 1), all);
-    EXPECT_EQ(marksOf(samplerOf(positive), mesh, -1), none);
-    auto far = mesh;
+    EXPECT_EQ(marksOf(samplerOf(positive), *mesh, 1), all);
+    EXPECT_EQ(marksOf(samplerOf(positive), *mesh, -1), none);
+    auto far = sphere;
     for (float3& point : far.points)
         point.x += 50;
-    EXPECT_EQ(marksOf(samplerOf(empty), far, 1), none) << "background";
-    far.points[mesh.faces[5][1]].y = kNan;
-    EXPECT_EQ(marksOf(samplerOf(positive), far, 1)[5], true)
+    EXPECT_EQ(marksOf(samplerOf(empty), *far.build(), 1), none) << "background";
+    far.points[sphere.faces[5][1]].y = kNan;
+    EXPECT_EQ(marksOf(samplerOf(positive), *far.build(), 1)[5], true)
         << "its other corners are apart, and the background counts";
-    EXPECT_EQ(marksOf(samplerOf(positive), MeshBuilder::of({}, {}), 1), std::vector<bool>());
-    auto wide = mesh;
-    wide.points[mesh.faces[5][1]].x = 2e38f; // the sum of three is infinite, and so is their mean
+    EXPECT_EQ(marksOf(samplerOf(positive), *MeshBuilder::of({}, {}).build(), 1), std::vector<bool>());
+    auto wide = sphere;
+    wide.points[sphere.faces[5][1]].x = 2e38f; // the sum of three is infinite, and so is their mean
     LinearSampler<TypeParam> const tiny(
         empty.container, empty.channel, empty.topology, {.scale = 1e-38f, .background = 0});
-    EXPECT_EQ(marksOf(tiny, wide, 1)[5], false);
+    EXPECT_EQ(marksOf(tiny, *wide.build(), 1)[5], false);
 
     auto const open = MeshBuilder::sphere(3).withoutFace(4).build(), before = deepCopy(*open);
     EXPECT_FALSE(subdivide(samplerOf(positive), *open, 1));
@@ -128,6 +141,26 @@ TYPED_TEST(SubdivideByVolume, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompi
     expectSameForThreads({1, 2, 8}, refined);
     // Both layouts read the same values: an even step from voxel to voxel.
     EXPECT_EQ(fingerprint(*refined()), 12192136266283760578u) << "unlike other builds";
+}
+
+TYPED_TEST(SubdivideByVolume, endsAtTheFinestLevelTowardsPlacesOfNoTolerance)
+{
+    // Distances to the origin, where both parts have a point that stays there.
+    Field const field =
+        Field::of(-4, 4, [](int i, int j, int k) { return std::sqrt(static_cast<float>(i * i + j * j + k * k)); });
+    auto const volume =
+        buildVolume<TypeParam>({.background = 4, .depth = TypeParam::kUnitDepth, .block = field.block()});
+    auto const refined = [&] {
+        auto mesh = twoCaps().build();
+        EXPECT_TRUE(subdivide(samplerOf(volume, 1), *mesh, 0.2f));
+        return mesh;
+    };
+    expectSameForThreads({1, 2, 8}, refined);
+    auto const mesh = refined();
+    std::vector<bool> const large = marksOf(samplerOf(volume, 1), *mesh, 0.2f);
+    EXPECT_GT(std::count(large.begin(), large.end(), true), 0);
+    EXPECT_TRUE(isClosedManifold(*mesh));
+    EXPECT_EQ(eulerCharacteristic(*mesh), 4);
 }
 
 TYPED_TEST(SubdivideByVolume, leavesTheMeshAsItWasWhenMemoryRunsOut)

@@ -40,6 +40,15 @@ MeshBuilder graded(MeshBuilder mesh)
     return mesh;
 }
 
+/// Only the tips differ from all other points: by one float, so that they stay there however fine the faces get.
+MeshBuilder tipsOneFloatApart()
+{
+    MeshBuilder mesh = MeshBuilder::bipyramid(8).shuffled(1);
+    for (float3& point : mesh.points)
+        point = {0, 0, point.z == 0 ? 0x1p25f : 0x1p25f - 2};
+    return mesh;
+}
+
 std::map<std::string, MeshBuilder> closedMeshes()
 {
     return {
@@ -49,6 +58,7 @@ std::map<std::string, MeshBuilder> closedMeshes()
         {"torus", MeshBuilder::torus(12, 9).withNoise(0.3f, 1).shuffled(9)},
         {"needles", MeshBuilder::sphere(3).withNeedles(20, 0.02f).shuffled(2)},
         {"bipyramid", MeshBuilder::bipyramid(60).withNoise(0.01f, 7)},
+        {"tips one float apart", tipsOneFloatApart()},
         {"two parts", MeshBuilder::icosahedron().joinedWith(MeshBuilder::torus(5, 4), {9, 0, 0})},
     };
 }
@@ -129,10 +139,14 @@ TEST(Subdivide, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
             EXPECT_TRUE(sameContents(*mesh, *meshOf(MeshBuilder::of(plain.positions, plain.faces), plain.values)));
             EXPECT_TRUE(isClosedManifold(*mesh));
             EXPECT_EQ(eulerCharacteristic(*mesh), eulerCharacteristic(*builder.build()));
-            for (std::size_t f = 0; f != plain.faces.size(); ++f)
+            unsigned int finestLevel = 0;
+            for (std::size_t f = 0; f != plain.faces.size(); ++f) {
+                finestLevel = std::max(finestLevel, plain.level(f));
                 if (largestSide(plain.faces[f], plain.positions) > tolerance + tolerance) {
-                    EXPECT_TRUE(plain.states[f] & 1) << "face " << f << " is large, but was not even asked to split";
+                    EXPECT_EQ(plain.level(f), PlainSubdivision::kFinestLevel) << "face " << f << " is large";
                 }
+            }
+            EXPECT_EQ(finestLevel == PlainSubdivision::kFinestLevel, name == "tips one float apart");
         }
 }
 
