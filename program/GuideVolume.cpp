@@ -181,7 +181,6 @@ void GuideVolume::build(SparseVolume const& volume, int tileSide)
         source.lists = {&voxels, 1};
         source.cubes = volume.cubes;
         source.cubeValues = volume.cubeValues;
-        source.isPadded = true;
         volume_ = buildVolume<Traits>(source);
     };
     if (tileSide == Traits5::kSide)
@@ -201,7 +200,7 @@ LinearSampler<Traits> GuideVolume::samplerOf(Volume<Traits> const& volume, float
     LinearSamplerSettings settings;
     settings.scale = scale_;
     settings.background = background;
-    return {volume.container, volume.channel, volume.topology, settings, &volume.channel};
+    return {volume.container, volume.channel, volume.topology, settings};
 }
 
 template <class Visit> void GuideVolume::visitVolume(Visit const& visit) const

@@ -61,7 +61,7 @@ private:
     Tessara::Math::float3 shift_{0, 0, 0}; // of the voxels from whole multiples of their size
     std::variant<std::monostate, TSR::TileTree3D::Volume<TSR::TileTree3D::Traits2>,
         TSR::TileTree3D::Volume<TSR::TileTree3D::Traits5>>
-        volume_; // padded
+        volume_; // not padded: that would double the memory for hardly any time
 };
 
 }

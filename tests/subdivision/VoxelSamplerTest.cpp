@@ -190,14 +190,11 @@ TYPED_TEST(VoxelSampling, takesBoxesForTheirVoxels)
         source.boxes = boxes;
         source.lists = source.lists.subspan(1);
         auto const boxed = buildVolume<TypeParam>(source);
-        source.isPadded = true;
-        auto const padded = buildVolume<TypeParam>(source);
-        auto const haloChannel = makeHaloChannel(boxed);
+        auto const padded = makeHaloChannel(boxed);
 
         float3 const offset = offsetsOf(source.offsetType);
         auto plainSampler = samplerOf(plain, offset), boxedSampler = samplerOf(boxed, offset),
-             haloSampler = samplerOf(boxed, {0, 0, 0}, &haloChannel),
-             paddedSampler = samplerOf(padded, {0, 0, 0}, &padded.channel);
+             paddedSampler = samplerOf(boxed, {0, 0, 0}, &padded);
         float const unit = 1 / TypeParam::voxelsPerUnit(depth);
         for (int n = 0; n < 3000; ++n) {
             float3 p = random.point(30);
@@ -207,10 +204,7 @@ TYPED_TEST(VoxelSampling, takesBoxesForTheirVoxels)
             int const asked = depth + below(3) - (source.coarsestDepth ? 2 : 0);
             float const expected = sampled(plainSampler, p, asked);
             ASSERT_EQ(sampled(boxedSampler, p, asked), expected) << p.x << ' ' << p.y << ' ' << p.z << ", " << asked;
-            if (source.offsetType == 7) {
-                ASSERT_EQ(sampled(paddedSampler, p, asked), expected);
-                ASSERT_EQ(sampled(haloSampler, p, asked), expected);
-            }
+            ASSERT_TRUE(source.offsetType != 7 || sampled(paddedSampler, p, asked) == expected);
         }
         expectSameInRows(boxedSampler, 30 * unit);
         expectSameInRows(paddedSampler, 30 * unit);

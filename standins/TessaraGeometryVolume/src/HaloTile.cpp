@@ -1,4 +1,4 @@
-#include "upperLayer.h"
+#include <TessaraGeometryVolume/HaloTile.h>
 
 #include <algorithm>
 
@@ -24,9 +24,7 @@ namespace {
         return (to - from) * fraction + from;
     }
 
-    template <class Traits> using PaddedData = ConstTileData<float, Traits::kSide + 1, 0>;
-
-    template <class Traits> float valueOfParent(PaddedData<Traits> const& halo, IJK child, IJK voxel, int order)
+    template <class Traits> float valueOfParent(PositiveHalo<Traits> const& halo, IJK child, IJK voxel, int order)
     {
         PlaceInParent const x = placeInParent<Traits>(child.i, voxel.i);
         PlaceInParent const y = placeInParent<Traits>(child.j, voxel.j);
@@ -90,37 +88,12 @@ namespace {
 
 }
 
-template <class Traits, int channelSide> void Internal::fillUpperLayer(typename Container<Traits>::TileType const& tile,
-    float const* parentHalo, Channel<Traits, float> const& channel, int order,
-    typename Container<Traits>::ConstTileAccessor& accessor, float* out)
-{
-    constexpr int kSide = Traits::kSide;
-    PaddedData<Traits> const parent(parentHalo), own(out);
-    IJK const child = tile.childIJK();
-    for (int across = 1; across < 8; ++across) {
-        IJK const direction{across & 1, across >> 1 & 1, across >> 2 & 1};
-        auto const& found = tileAcross<Traits>(tile, direction, accessor);
-        auto const data = channel.template tileData<channelSide>(found.treeIndex());
-        bool const isNeighbour = data && found.depth == tile.depth;
-        bool const isInCoarser = data && found.depth < tile.depth && parent;
-        forEachVoxel(regionAcross<Traits>(direction), [&](IJK voxel) {
-            float& value = out[voxel.i + (voxel.j + voxel.k * (kSide + 1)) * (kSide + 1)];
-            if (isNeighbour)
-                value =
-                    data(voxel.i - direction.i * kSide, voxel.j - direction.j * kSide, voxel.k - direction.k * kSide);
-            else if (isInCoarser)
-                value = valueOfParent<Traits>(parent, child, voxel, order);
-            else
-                value = own(std::min(voxel.i, kSide - 1), std::min(voxel.j, kSide - 1), std::min(voxel.k, kSide - 1));
-        });
-    }
-}
-
 template <class Traits> void setHaloTile(typename Container<Traits>::TileType const& tile,
     typename Container<Traits>::TileType const* parentTile, Channel<Traits, float> const& channel,
     PositiveHalo<Traits> const& parentHalo, int order, typename Container<Traits>::ConstTileAccessor& accessor,
     PositiveHalo<Traits>& out)
 {
+    constexpr int kSide = Traits::kSide;
     auto const own = channel.tileData(tile.treeIndex());
     if (!own) {
         out.clear();
@@ -128,8 +101,25 @@ template <class Traits> void setHaloTile(typename Container<Traits>::TileType co
     }
     out.reset(0);
     copyInterior<Traits>(own, out);
-    float const* const parentValues = parentTile && parentHalo ? parentHalo.values() : nullptr;
-    Internal::fillUpperLayer<Traits, Traits::kSide>(tile, parentValues, channel, order, accessor, &out(0));
+    bool const hasParent = parentTile && parentHalo;
+    IJK const child = tile.childIJK();
+    for (int across = 1; across < 8; ++across) {
+        IJK const direction{across & 1, across >> 1 & 1, across >> 2 & 1};
+        auto const& found = tileAcross<Traits>(tile, direction, accessor);
+        auto const data = channel.tileData(found.treeIndex());
+        bool const isNeighbor = data && found.depth == tile.depth;
+        bool const isInCoarser = data && found.depth < tile.depth && hasParent;
+        forEachVoxel(regionAcross<Traits>(direction), [&](IJK voxel) {
+            float& value = out(voxel.i, voxel.j, voxel.k);
+            if (isNeighbor)
+                value =
+                    data(voxel.i - direction.i * kSide, voxel.j - direction.j * kSide, voxel.k - direction.k * kSide);
+            else if (isInCoarser)
+                value = valueOfParent<Traits>(parentHalo, child, voxel, order);
+            else
+                value = own(std::min(voxel.i, kSide - 1), std::min(voxel.j, kSide - 1), std::min(voxel.k, kSide - 1));
+        });
+    }
 }
 
 template void setHaloTile<Traits2>(Container<Traits2>::TileType const&, Container<Traits2>::TileType const*,
@@ -138,11 +128,5 @@ template void setHaloTile<Traits2>(Container<Traits2>::TileType const&, Containe
 template void setHaloTile<Traits5>(Container<Traits5>::TileType const&, Container<Traits5>::TileType const*,
     Channel<Traits5, float> const&, PositiveHalo<Traits5> const&, int, Container<Traits5>::ConstTileAccessor&,
     PositiveHalo<Traits5>&);
-
-// For a padded channel.
-template void Internal::fillUpperLayer<Traits2, Traits2::kSide + 1>(Container<Traits2>::TileType const&, float const*,
-    Channel<Traits2, float> const&, int, Container<Traits2>::ConstTileAccessor&, float*);
-template void Internal::fillUpperLayer<Traits5, Traits5::kSide + 1>(Container<Traits5>::TileType const&, float const*,
-    Channel<Traits5, float> const&, int, Container<Traits5>::ConstTileAccessor&, float*);
 
 }

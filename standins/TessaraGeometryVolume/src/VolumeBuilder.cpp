@@ -1,7 +1,8 @@
 #include <TessaraGeometryVolume/VolumeBuilder.h>
 
 #include "boxParts.h"
-#include "upperLayer.h"
+
+#include <TessaraGeometryVolume/HaloTile.h>
 
 #include <bit>
 #include <stdexcept>
@@ -13,7 +14,7 @@ namespace TSR::TileTree3D {
 
 using Internal::floorDivide;
 using Internal::Index;
-using Internal::ValuedRange;
+using Internal::rangeOf;
 using Internal::VoxelRange;
 
 namespace {
@@ -41,8 +42,7 @@ namespace {
     public:
         explicit Builder(VolumeSource const& source)
             : source_(source)
-            , side_(Traits::kSide + (source.isPadded ? 1 : 0))
-            , volume_{{}, Channel<Traits, float>(side_), VoxelTopology(source.offsetType), source.background}
+            , volume_{{}, Channel<Traits, float>(), VoxelTopology(source.offsetType), source.background}
         {
         }
 
@@ -60,8 +60,6 @@ namespace {
             addLists([&](int depth) { return depth > source_.depth; });
             volume_.container.completeParents();
             fillCoarserTiles();
-            if (source_.isPadded)
-                fillUpperLayers();
             return std::move(volume_);
         }
 
@@ -69,7 +67,7 @@ namespace {
         static constexpr int kSide = Traits::kSide;
         static constexpr int kChildren = Traits::kChildrenPerAxis;
         using Tile = typename Container<Traits>::TileType;
-        using Boxes = std::vector<ValuedRange>;
+        using Boxes = std::vector<ConstantBox const*>;
 
         static void requireDepth(int depth)
         {
@@ -109,11 +107,7 @@ namespace {
         }
 
         bool hasValues(TreeIndex tile) const { return valuesAt(tile) != nullptr; }
-        float const* valuesAt(TreeIndex tile) const
-        {
-            return source_.isPadded ? volume_.channel.template tileData<kSide + 1>(tile).values()
-                                    : volume_.channel.tileData(tile).values();
-        }
+        float const* valuesAt(TreeIndex tile) const { return volume_.channel.tileData(tile).values(); }
 
         /// The values of a given tile, which begin as what a coarser one says.
         float* valuesOfTile(Index const& number, int depth)
@@ -152,12 +146,12 @@ namespace {
                     return static_cast<int>(((tileOrigin - from) / width * kSide + voxel) / ratio);
                 };
                 forEachVoxelOfTile([&](int i, int j, int k) {
-                    values[linearIndex(side_, i, j, k)] = coarse[linearIndex(side_, coarseVoxel(origin.i, tile.i, i),
+                    values[linearIndex(kSide, i, j, k)] = coarse[linearIndex(kSide, coarseVoxel(origin.i, tile.i, i),
                         coarseVoxel(origin.j, tile.j, j), coarseVoxel(origin.k, tile.k, k))];
                 });
                 return;
             }
-            forEachVoxelOfTile([&](int i, int j, int k) { values[linearIndex(side_, i, j, k)] = source_.background; });
+            forEachVoxelOfTile([&](int i, int j, int k) { values[linearIndex(kSide, i, j, k)] = source_.background; });
         }
 
         // ---- Listed voxels
@@ -168,13 +162,18 @@ namespace {
             float* values = nullptr;
         };
 
+        static Index tileOfVoxel(Index const& voxel)
+        {
+            return {floorDivide(voxel.i, kSide), floorDivide(voxel.j, kSide), floorDivide(voxel.k, kSide)};
+        }
+
         float& valueOfVoxel(std::int64_t i, std::int64_t j, std::int64_t k, int depth, TileOfVoxel& current)
         {
-            Index const tile{floorDivide(i, kSide), floorDivide(j, kSide), floorDivide(k, kSide)};
+            Index const tile = tileOfVoxel({i, j, k});
             if (!current.values || tile.i != current.number.i || tile.j != current.number.j
                 || tile.k != current.number.k)
                 current = {tile, valuesOfTile(tile, depth)};
-            return current.values[linearIndex(side_, static_cast<int>(i - tile.i * kSide),
+            return current.values[linearIndex(kSide, static_cast<int>(i - tile.i * kSide),
                 static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide))];
         }
 
@@ -222,7 +221,7 @@ namespace {
             auto const inserter = [&](int depth) {
                 return [this, depth, current = Index{INT64_MAX, 0, 0}](
                            std::int64_t i, std::int64_t j, std::int64_t k) mutable {
-                    Index const tile{floorDivide(i, kSide), floorDivide(j, kSide), floorDivide(k, kSide)};
+                    Index const tile = tileOfVoxel({i, j, k});
                     if (tile.i != current.i || tile.j != current.j || tile.k != current.k)
                         insertTile(tile, depth);
                     current = tile;
@@ -264,7 +263,7 @@ namespace {
                             ((k - block.first.k) * block.size.j + (j - block.first.j)) * block.size.i - block.first.i;
                         std::copy(block.values + rowBegin + inside.first.i, block.values + rowBegin + inside.end.i,
                             values
-                                + linearIndex(side_, static_cast<int>(inside.first.i - tile.i * kSide),
+                                + linearIndex(kSide, static_cast<int>(inside.first.i - tile.i * kSide),
                                     static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide)));
                     }
             });
@@ -301,14 +300,14 @@ namespace {
 
         void prepareBoxes()
         {
+            boxes_.reserve(source_.boxes.size());
             for (ConstantBox const& box : source_.boxes) {
-                VoxelRange const range{{box.first.i, box.first.j, box.first.k}, {box.end.i, box.end.j, box.end.k}};
-                if (range.isEmpty())
+                auto const [first, end] = rangeOf(box);
+                if (rangeOf(box).isEmpty())
                     continue;
-                for (Index const& corner : {range.first, Index{range.end.i - 1, range.end.j - 1, range.end.k - 1}})
-                    originOf({floorDivide(corner.i, kSide), floorDivide(corner.j, kSide), floorDivide(corner.k, kSide)},
-                        source_.depth);
-                boxes_.push_back({range, box.value});
+                for (Index const& corner : {first, Index{end.i - 1, end.j - 1, end.k - 1}})
+                    originOf(tileOfVoxel(corner), source_.depth); // or refuses
+                boxes_.push_back(&box);
             }
         }
 
@@ -317,17 +316,14 @@ namespace {
         {
             if (boxes_.empty())
                 return;
-            VoxelRange all = boxes_.front().range;
-            for (ValuedRange const& box : boxes_)
-                all = {{std::min(all.first.i, box.range.first.i), std::min(all.first.j, box.range.first.j),
-                           std::min(all.first.k, box.range.first.k)},
-                    {std::max(all.end.i, box.range.end.i), std::max(all.end.j, box.range.end.j),
-                        std::max(all.end.k, box.range.end.k)}};
+            VoxelRange all = rangeOf(*boxes_.front());
+            for (ConstantBox const* const box : boxes_)
+                all = all.boundsWith(rangeOf(*box));
             forEachTileIn(all, voxelsOfTile(0), [&](Index const& root) {
                 VoxelRange const read = withUpperNeighbors(rangeOfTile(root, voxelsOfTile(0)));
                 Boxes boxes;
                 std::copy_if(boxes_.begin(), boxes_.end(), std::back_inserter(boxes),
-                    [&](ValuedRange const& box) { return box.range.overlaps(read); });
+                    [&](ConstantBox const* const box) { return rangeOf(*box).overlaps(read); });
                 visit(root, std::move(boxes));
             });
         }
@@ -343,9 +339,9 @@ namespace {
                     static_cast<int>(child.j - children.first.j), static_cast<int>(child.k - children.first.k)));
             };
             std::array<Boxes, Traits::kChildCount> boxesOfChild;
-            for (ValuedRange const& box : boxes) {
-                Index const& first = box.range.first;
-                VoxelRange const dependent{{first.i - kSide, first.j - kSide, first.k - kSide}, box.range.end};
+            for (ConstantBox const* const box : boxes) {
+                auto const [first, end] = rangeOf(*box);
+                VoxelRange const dependent{{first.i - kSide, first.j - kSide, first.k - kSide}, end};
                 VoxelRange const inside = dependent.overlapWith(rangeOfTile(number, voxelsOfTile(depth)));
                 if (!inside.isEmpty())
                     forEachTileIn(
@@ -380,9 +376,9 @@ namespace {
         void fillVoxels(Index const& number, Boxes const& boxes)
         {
             VoxelRange const tile = rangeOfTile(number, kSide);
-            for (ValuedRange const& box : boxes)
-                if (VoxelRange const inside = box.range.overlapWith(tile); !inside.isEmpty())
-                    fillVoxels(number, inside, box.value, valuesOfTile(number, source_.depth));
+            for (ConstantBox const* const box : boxes)
+                if (VoxelRange const inside = rangeOf(*box).overlapWith(tile); !inside.isEmpty())
+                    fillVoxels(number, inside, box->value, valuesOfTile(number, source_.depth));
         }
 
         void fillVoxels(Index const& number, VoxelRange const& inside, float value, float* values) const
@@ -390,7 +386,7 @@ namespace {
             for (std::int64_t k = inside.first.k; k < inside.end.k; ++k)
                 for (std::int64_t j = inside.first.j; j < inside.end.j; ++j)
                     std::fill_n(values
-                            + linearIndex(side_, static_cast<int>(inside.first.i - number.i * kSide),
+                            + linearIndex(kSide, static_cast<int>(inside.first.i - number.i * kSide),
                                 static_cast<int>(j - number.j * kSide), static_cast<int>(k - number.k * kSide)),
                         inside.end.i - inside.first.i, value);
         }
@@ -398,8 +394,8 @@ namespace {
         void addBoxes(Index const& number, int depth, Boxes boxes)
         {
             VoxelRange const tile = rangeOfTile(number, voxelsOfTile(depth));
-            if (std::none_of(
-                    boxes.begin(), boxes.end(), [&](ValuedRange const& box) { return box.range.overlaps(tile); }))
+            if (std::none_of(boxes.begin(), boxes.end(),
+                    [&](ConstantBox const* const box) { return rangeOf(*box).overlaps(tile); }))
                 return;
             if (depth == source_.depth)
                 addTileOfBoxes(number, boxes);
@@ -419,7 +415,7 @@ namespace {
             if (isInserted(number, source_.depth)) // and filled
                 return;
             auto const value = hasCoarserData_ ? std::nullopt : commonValue(boxes, rangeOfTile(number, kSide));
-            if (!value || (source_.isPadded && !continuesAbove(number, boxes, *value))) {
+            if (!value) {
                 fillVoxels(number, boxes);
                 return;
             }
@@ -429,47 +425,12 @@ namespace {
             shareConstant(tile, *value);
         }
 
-        /// Whether the upper layer of a tile of one value has that value.
-        bool continuesAbove(Index const& number, Boxes const& boxes, float value) const
-        {
-            return !anyUpwards([&](Index const& step) {
-                Index const above = sum(number, step);
-                VoxelRange const tile = rangeOfTile(above, kSide);
-                auto const thickness = [](std::int64_t isAbove) { return isAbove ? 1 : kSide; };
-                VoxelRange const layer{tile.first,
-                    {tile.first.i + thickness(step.i), tile.first.j + thickness(step.j),
-                        tile.first.k + thickness(step.k)}};
-                if (!isInserted(above, source_.depth))
-                    return std::any_of(boxes.begin(), boxes.end(), [&](ValuedRange const& box) {
-                        return box.range.overlaps(tile);
-                    }) && commonBits(commonValue(boxes, layer)) != commonBits(value);
-                std::int64_t const width = Traits::tileWidth(source_.depth);
-                float const* const values =
-                    valuesAt(volume_.container.find(above.i * width, above.j * width, above.k * width, source_.depth)
-                                 .treeIndex());
-                bool isOther = !values;
-                if (values)
-                    forEachTileIn(layer, 1, [&](Index const& voxel) {
-                        isOther |=
-                            commonBits(values[linearIndex(side_, static_cast<int>(voxel.i - tile.first.i),
-                                static_cast<int>(voxel.j - tile.first.j), static_cast<int>(voxel.k - tile.first.k))])
-                            != commonBits(value);
-                    });
-                return isOther;
-            });
-        }
-
-        static std::optional<std::uint32_t> commonBits(std::optional<float> value)
-        {
-            return value ? std::optional(std::bit_cast<std::uint32_t>(*value)) : std::nullopt;
-        }
-
         /// Lets a tile of the source's depth have one value everywhere.
         void shareConstant(TreeIndex tile, float value)
         {
             auto const [known, isNew] = constants_.try_emplace(std::bit_cast<std::uint32_t>(value), tile);
             if (isNew)
-                std::fill_n(volume_.channel.values(tile), side_ * side_ * side_, value);
+                std::fill_n(volume_.channel.values(tile), Traits::kVoxelCount, value);
             else
                 volume_.channel.share(tile, known->second);
         }
@@ -482,7 +443,7 @@ namespace {
             if (auto const value = commonValue(boxes, withUpperNeighbors(tile))) {
                 auto const [known, isNew] = constantDivisions_.try_emplace(std::bit_cast<std::uint32_t>(*value), 0);
                 if (isNew) {
-                    std::uint32_t const repeated = addRepeated(tile.first);
+                    std::uint32_t const repeated = addRepeated(tileOfVoxel(tile.first));
                     shareConstant(treeIndex(repeated, source_.depth), *value);
                     known->second = volume_.container.addDivision({{{{0}, {0}, {0}}}, {repeated}});
                 }
@@ -496,7 +457,7 @@ namespace {
                 double const along = static_cast<double>(voxelsOfTile(depth) / kSide);
                 if (partCount > kMostParts || static_cast<double>(kWorthwhile * partCount) > along * along * along)
                     return false;
-                fillParts(tile.first, boxes, parts);
+                fillParts(tileOfVoxel(tile.first), boxes, parts);
                 division = volume_.container.addDivision(std::move(parts));
             }
             TreeIndex const divided = insertTile(number, depth);
@@ -504,24 +465,18 @@ namespace {
             return true;
         }
 
-        /// \param first  a tile's lower corner, in voxels
-        std::uint32_t addRepeated(Index const& first)
+        std::uint32_t addRepeated(Index const& number)
         {
-            std::int64_t const width = Traits::tileWidth(source_.depth);
-            return volume_.container.addRepeated(
-                first.i / kSide * width, first.j / kSide * width, first.k / kSide * width, source_.depth);
+            Index const origin = originOf(number, source_.depth);
+            return volume_.container.addRepeated(origin.i, origin.j, origin.k, source_.depth);
         }
 
         void fillParts(Index const& first, Boxes const& boxes, Division& parts)
         {
             for (std::uint32_t const k : parts.begins[2])
                 for (std::uint32_t const j : parts.begins[1])
-                    for (std::uint32_t const i : parts.begins[0]) {
-                        Index const voxel{first.i + std::int64_t{i} * kSide, first.j + std::int64_t{j} * kSide,
-                            first.k + std::int64_t{k} * kSide};
-                        Index const number{voxel.i / kSide, voxel.j / kSide, voxel.k / kSide};
-                        parts.tiles.push_back(fillPart(number, boxes));
-                    }
+                    for (std::uint32_t const i : parts.begins[0])
+                        parts.tiles.push_back(fillPart(sum(first, {i, j, k}), boxes));
         }
 
         std::uint32_t fillPart(Index const& number, Boxes const& boxes)
@@ -529,16 +484,16 @@ namespace {
             VoxelRange const tile = rangeOfTile(number, kSide);
             std::uint32_t repeated = Division::kNoRepeated;
             float* values = nullptr;
-            for (ValuedRange const& box : boxes) {
-                VoxelRange const inside = box.range.overlapWith(tile);
+            for (ConstantBox const* const box : boxes) {
+                VoxelRange const inside = rangeOf(*box).overlapWith(tile);
                 if (inside.isEmpty())
                     continue;
                 if (!values) {
-                    repeated = addRepeated(tile.first);
+                    repeated = addRepeated(number);
                     values = volume_.channel.values(treeIndex(repeated, source_.depth));
-                    std::fill_n(values, side_ * side_ * side_, source_.background);
+                    std::fill_n(values, Traits::kVoxelCount, source_.background);
                 }
-                fillVoxels(number, inside, box.value, values);
+                fillVoxels(number, inside, box->value, values);
             }
             return repeated;
         }
@@ -568,7 +523,7 @@ namespace {
                 return; // its values were given
             float const* const fine = valuesAt(tile.treeIndex());
             float* const coarse = volume_.channel.values(tile.parentTreeIndex());
-            auto const fineValue = [&](int i, int j, int k) { return fine[linearIndex(side_, i, j, k)]; };
+            auto const fineValue = [&](int i, int j, int k) { return fine[linearIndex(kSide, i, j, k)]; };
             IJK const child = tile.childIJK();
             auto const spanAlong = [&](int axis) { return source_.offsetType >> axis & 1 ? 1 : kChildren; };
             int const spanX = spanAlong(0), spanY = spanAlong(1), spanZ = spanAlong(2);
@@ -583,32 +538,12 @@ namespace {
                             for (int j = 0; j < spanY; ++j)
                                 for (int i = 0; i < spanX; ++i)
                                     sum += fineValue(x * kChildren + i, y * kChildren + j, z * kChildren + k) - first;
-                        coarse[linearIndex(side_, child.i * kCovered + x, child.j * kCovered + y,
+                        coarse[linearIndex(kSide, child.i * kCovered + x, child.j * kCovered + y,
                             child.k * kCovered + z)] = first + sum / static_cast<float>(spanX * spanY * spanZ);
                     }
         }
 
-        // ---- Padding
-
-        /// Parents first.
-        void fillUpperLayers()
-        {
-            typename Container<Traits>::ConstTileAccessor accessor(volume_.container);
-            auto const fill = [&](Tile const& tile) {
-                if (!hasValues(tile.treeIndex()))
-                    return;
-                Internal::fillUpperLayer<Traits, kSide + 1>(tile, valuesAt(tile.parentTreeIndex()), volume_.channel, 2,
-                    accessor, volume_.channel.values(tile.treeIndex()));
-            };
-            for (int depth = volume_.channel.coarsestDepth(); depth < Traits::kDepthCount; ++depth)
-                for (std::size_t number = 0; number < volume_.container.tileCount(depth); ++number)
-                    fill(volume_.container.tile(number, depth));
-            for (std::uint32_t number = 0; number < volume_.container.repeatedCount(); ++number)
-                fill(volume_.container.tile(kFirstRepeated + number, volume_.container.repeatedDepth()));
-        }
-
         VolumeSource const& source_;
-        int side_; // of stored tiles
         Volume<Traits> volume_;
         int coarsestTerminal_ = Traits::kDepthCount;
         bool hasCoarserData_ = false; // besides the source's depth
@@ -627,18 +562,20 @@ template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source)
 
 template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume)
 {
-    constexpr int kSide = Traits::kSide, kPadded = kSide + 1;
+    constexpr int kPadded = Traits::kSide + 1;
     Channel<Traits, float> padded(kPadded);
     typename Container<Traits>::ConstTileAccessor accessor(volume.container);
+    PositiveHalo<Traits> halo, parentHalo;
     auto const pad = [&](typename Container<Traits>::TileType const& tile) {
-        auto const own = volume.channel.tileData(tile.treeIndex());
-        if (!own)
-            return;
-        float* const values = padded.values(tile.treeIndex());
-        for (int row = 0; row < kSide * kSide; ++row)
-            std::copy_n(own.values() + row * kSide, kSide, values + linearIndex(kPadded, 0, row % kSide, row / kSide));
-        Internal::fillUpperLayer<Traits, kSide>(tile,
-            padded.template tileData<kPadded>(tile.parentTreeIndex()).values(), volume.channel, 2, accessor, values);
+        auto const& parent = volume.container.tile(tile.parentTreeIndex());
+        parentHalo.clear();
+        if (auto const ofParent = padded.template tileData<kPadded>(parent.treeIndex())) {
+            parentHalo.reset(0);
+            std::copy_n(ofParent.values(), halo.kVoxelCount, &parentHalo(0));
+        }
+        setHaloTile<Traits>(tile, &parent, volume.channel, parentHalo, 2, accessor, halo);
+        if (halo)
+            std::copy_n(halo.values(), halo.kVoxelCount, padded.values(tile.treeIndex()));
     };
     for (int depth = volume.channel.coarsestDepth(); depth < Traits::kDepthCount; ++depth)
         for (std::size_t number = 0; number < volume.container.tileCount(depth); ++number)

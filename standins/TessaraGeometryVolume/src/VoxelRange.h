@@ -1,5 +1,7 @@
 #pragma once
 
+#include <TessaraGeometryVolume/VolumeBuilder.h>
+
 #include <algorithm>
 #include <cstdint>
 
@@ -19,6 +21,11 @@ struct VoxelRange {
         return {{std::max(first.i, other.first.i), std::max(first.j, other.first.j), std::max(first.k, other.first.k)},
             {std::min(end.i, other.end.i), std::min(end.j, other.end.j), std::min(end.k, other.end.k)}};
     }
+    VoxelRange boundsWith(VoxelRange const& other) const
+    {
+        return {{std::min(first.i, other.first.i), std::min(first.j, other.first.j), std::min(first.k, other.first.k)},
+            {std::max(end.i, other.end.i), std::max(end.j, other.end.j), std::max(end.k, other.end.k)}};
+    }
     bool overlaps(VoxelRange const& other) const { return !overlapWith(other).isEmpty(); }
     bool holds(VoxelRange const& other) const
     {
@@ -30,9 +37,9 @@ struct VoxelRange {
     std::int64_t longestSide() const { return std::max({end.i - first.i, end.j - first.j, end.k - first.k}); }
 };
 
-struct ValuedRange {
-    VoxelRange range;
-    float value;
-};
+inline VoxelRange rangeOf(ConstantBox const& box)
+{
+    return {{box.first.i, box.first.j, box.first.k}, {box.end.i, box.end.j, box.end.k}};
+}
 
 }

@@ -61,32 +61,32 @@ namespace {
 
 }
 
-std::optional<float> commonValue(std::span<ValuedRange const> boxes, VoxelRange const& range)
+std::optional<float> commonValue(std::span<ConstantBox const* const> boxes, VoxelRange const& range)
 {
     constexpr std::int64_t kCountable = std::int64_t{1} << 20;
     std::int64_t covered = 0;
     std::optional<float> value;
-    for (ValuedRange const& box : boxes) {
-        if (box.range.holds(range))
-            return box.value;
-        VoxelRange const shared = box.range.overlapWith(range);
+    for (ConstantBox const* const box : boxes) {
+        if (rangeOf(*box).holds(range))
+            return box->value;
+        VoxelRange const shared = rangeOf(*box).overlapWith(range);
         if (shared.isEmpty())
             continue;
-        if (range.longestSide() > kCountable || (value && !isSame(*value, box.value)))
+        if (range.longestSide() > kCountable || (value && !isSame(*value, box->value)))
             return {};
-        value = box.value;
+        value = box->value;
         covered += shared.voxelCount();
     }
     return value && covered == range.voxelCount() ? value : std::nullopt;
 }
 
 std::array<std::vector<std::uint32_t>, 3> partsOf(
-    VoxelRange const& range, int tileSide, std::span<ValuedRange const> boxes)
+    VoxelRange const& range, int tileSide, std::span<ConstantBox const* const> boxes)
 {
     auto const along = [&](std::int64_t Index::*axis) {
         std::vector<Interval> intervals;
-        for (ValuedRange const& box : boxes)
-            intervals.push_back({box.range.first.*axis, box.range.end.*axis});
+        for (ConstantBox const* const box : boxes)
+            intervals.push_back({rangeOf(*box).first.*axis, rangeOf(*box).end.*axis});
         return partsAlong({range.first.*axis, range.end.*axis}, tileSide, intervals);
     };
     return {along(&Index::i), along(&Index::j), along(&Index::k)};

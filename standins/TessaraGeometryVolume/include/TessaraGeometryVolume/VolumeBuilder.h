@@ -66,9 +66,6 @@ struct VolumeSource {
     /// Tiles of all depths from this one on hold data, taken from those inside them. Never below that of the coarsest
     /// source, which is also the default.
     std::optional<int> coarsestDepth = {};
-    /// Whether tiles are stored with a layer more on their upper sides, as `makeHaloChannel` adds it. The channel is then
-    /// one for samplers to read as their padded channel, without another one.
-    bool isPadded = false;
 };
 
 /// Builds the tree in one go. A box is the same as all its voxels: any sample gives the same value to the bit. But if
@@ -89,7 +86,7 @@ struct VolumeSource {
 template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source);
 
 /// A channel with a layer more on the upper sides: what `setHaloTile` gives for every tile that has data. Twice the
-/// memory, and samples need no halo tiles of their own. \pre  the volume is not padded
+/// memory, and samples need no halo tiles of their own.
 template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume);
 
 extern template TESSARAGEOMETRYVOLUME_EXPORT Volume<Traits2> buildVolume(VolumeSource const& source);
