@@ -58,7 +58,7 @@ TEST(CommandLine, TakesAnyArgumentsWithoutHarm)
         "-", "--", "--=", "-=", "---", "[]", "{}", "[a,b]", "%%", "=", "\"", "'", " ", "\n", "\xff", "info", "--help",
         "--version"};
     TestSupport::Random random(1);
-    for (int i = 0; i != 3000; ++i) {
+    for (int i = 0; i != 2000; ++i) {
         std::vector<std::string> line;
         if (random.below(20) != 0)
             line.push_back(kCommands[random.below(kCommands.size())]);
