@@ -1,9 +1,11 @@
 #include "Cancellation.h"
 
 #include "Failure.h"
+#include "files/OutputFile.h"
 
 #include <OrvanCppOpSDK/Job.h>
 
+#include <atomic>
 #include <cerrno>
 
 #include <unistd.h>
@@ -12,13 +14,32 @@ namespace ModelingProgram {
 
 namespace {
 
-    // Runs in the middle of anything: no memory, no locks, no buffered output.
-    void cancelJob(int)
+    constexpr int kCancelling[] = {SIGINT, SIGTERM};
+    constexpr int kEnding[] = {SIGHUP, SIGPIPE, SIGQUIT};
+
+    std::atomic<bool> isStopping = false;
+
+    // The handlers run in the middle of anything: no memory, no locks, no buffered output.
+
+    void endProgram(int signal)
+    {
+        OutputFile::removeUnfinished();
+        struct sigaction action = {};
+        action.sa_handler = SIG_DFL;
+        ::sigaction(signal, &action, nullptr);
+        ::raise(signal); // arrives when the handler returns, and ends the program as if there were no handler
+    }
+
+    void cancelJob(int signal)
     {
         constexpr char kText[] = "\nmodeling: stopping; once more ends the program at once\n";
+        if (isStopping.exchange(true)) {
+            endProgram(signal);
+            return;
+        }
         int const oldError = errno;
         Orvan::setJobCancelled(true);
-        // Nobody is left to tell when this fails.
+        // Nobody is left to tell if this fails.
         [[maybe_unused]] auto const written = ::write(STDERR_FILENO, kText, sizeof kText - 1);
         errno = oldError;
     }
@@ -27,19 +48,31 @@ namespace {
 
 CancelOnSignal::CancelOnSignal()
 {
-    struct sigaction action = {};
-    action.sa_handler = cancelJob;
-    sigemptyset(&action.sa_mask);
-    // Back to the default after the first signal, and no read or write of a file fails because of it.
-    action.sa_flags = static_cast<int>(SA_RESETHAND) | SA_RESTART;
-    ::sigaction(SIGINT, &action, &oldInterrupt_);
-    ::sigaction(SIGTERM, &action, &oldTerminate_);
+    isStopping = false;
+    for (int const signal : kCancelling)
+        handle(signal, cancelJob);
+    for (int const signal : kEnding)
+        handle(signal, endProgram);
+    handle(SIGXFSZ, SIG_IGN); // then writing fails like on a full disk
 }
 
 CancelOnSignal::~CancelOnSignal()
 {
-    ::sigaction(SIGINT, &oldInterrupt_, nullptr);
-    ::sigaction(SIGTERM, &oldTerminate_, nullptr);
+    for (auto const& [signal, action] : oldActions_)
+        ::sigaction(signal, &action, nullptr);
+}
+
+void CancelOnSignal::handle(int signal, void (*handler)(int))
+{
+    struct sigaction action = {};
+    if (::sigaction(signal, nullptr, &action) != 0 || action.sa_handler == SIG_IGN)
+        return; // who starts a program with nohup or in the background has signals ignored
+    oldActions_.emplace_back(signal, action);
+    action = {};
+    action.sa_handler = handler;
+    sigemptyset(&action.sa_mask);
+    action.sa_flags = SA_RESTART; // no read or write of a file fails because of a signal
+    ::sigaction(signal, &action, nullptr);
 }
 
 void stopIfCancelled()

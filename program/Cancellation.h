@@ -1,11 +1,13 @@
 #pragma once
 
 #include <csignal>
+#include <utility>
+#include <vector>
 
 namespace ModelingProgram {
 
-/// While it lives, the first Ctrl-C (or SIGTERM) asks the running operation to stop, and a second one ends the program
-/// at once.
+/// While it lives, the first Ctrl-C (or SIGTERM) asks the running operation to stop. A second one ends the program at once,
+/// and so do SIGHUP, SIGPIPE and SIGQUIT; the file that is being written is removed first.
 class CancelOnSignal {
 public:
     CancelOnSignal();
@@ -14,8 +16,9 @@ public:
     ~CancelOnSignal();
 
 private:
-    struct sigaction oldInterrupt_ = {};
-    struct sigaction oldTerminate_ = {};
+    void handle(int signal, void (*handler)(int));
+
+    std::vector<std::pair<int, struct sigaction>> oldActions_;
 };
 
 /// \throws Failure  once the job is cancelled

@@ -5,14 +5,19 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include <algorithm>
+#include <charconv>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
+#include <type_traits>
 
 namespace ModelingProgram {
 
 namespace {
+
+    constexpr std::size_t kHelpColumns = 100;
 
     double numberIn(std::string const& text)
     {
@@ -20,6 +25,255 @@ namespace {
         double const number = std::strtod(text.c_str(), &end);
         return !text.empty() && end == text.c_str() + text.size() ? number : std::nan("");
     }
+
+    template <class T> struct ValueOf {
+        using Type = T;
+    };
+    template <class T> struct ValueOf<std::optional<T>> : ValueOf<T> {
+    };
+    template <class T> struct ValueOf<std::vector<T>> : ValueOf<T> {
+    };
+
+    /// Why a text is not a value of the type; empty if it is one.
+    template <class T> std::string faultIn(std::string const& text)
+    {
+        if constexpr (std::is_integral_v<T>) {
+            T value{};
+            auto const [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+            if (error != std::errc{} || end != text.data() + text.size())
+                return text + " is not a whole number";
+        } else if constexpr (std::is_floating_point_v<T>) {
+            if (!std::isfinite(static_cast<T>(numberIn(text))))
+                return text + " is not a number";
+        }
+        return {};
+    }
+
+    bool isOption(std::string const& argument)
+    {
+        return argument.size() > 1 && argument[0] == '-' && std::isnan(numberIn(argument));
+    }
+
+    /// Insertions, deletions, replacements and swaps of neighbors that make one text of the other.
+    std::size_t editDistance(std::string const& a, std::string const& b)
+    {
+        std::vector<std::vector<std::size_t>> distance(a.size() + 1, std::vector<std::size_t>(b.size() + 1));
+        for (std::size_t i = 0; i <= a.size(); ++i) {
+            for (std::size_t j = 0; j <= b.size(); ++j) {
+                std::size_t& least = distance[i][j];
+                least = std::max(i, j);
+                if (i == 0 || j == 0)
+                    continue;
+                bool const isEqual = a[i - 1] == b[j - 1];
+                least = std::min(
+                    {distance[i - 1][j] + 1, distance[i][j - 1] + 1, distance[i - 1][j - 1] + (isEqual ? 0u : 1u)});
+                if (i > 1 && j > 1 && a[i - 1] == b[j - 2] && a[i - 2] == b[j - 1])
+                    least = std::min(least, distance[i - 2][j - 2] + 1);
+            }
+        }
+        return distance[a.size()][b.size()];
+    }
+
+    /// "; did you mean ...?" with the name that is most like the text, or nothing if none is.
+    std::string suggestionFor(std::string const& text, std::vector<std::string> const& names)
+    {
+        constexpr std::size_t kLongestName = 40; // also bounds the time that a long argument takes
+        if (text.size() > kLongestName)
+            return {};
+        std::string const* best = nullptr;
+        std::size_t bestDistance = 1 + (text.size() + 1) / 3;
+        for (std::string const& name : names) {
+            std::size_t const distance = name.starts_with(text) && text.size() > 2 ? 0 : editDistance(text, name);
+            if (distance < bestDistance) {
+                best = &name;
+                bestDistance = distance;
+            }
+        }
+        return best ? fmt::format("; did you mean {}?", *best) : std::string();
+    }
+
+    /// Those of an application and of the groups in it.
+    std::vector<CLI::Option const*> optionsOf(CLI::App const& app)
+    {
+        std::vector<CLI::Option const*> options = app.get_options([](CLI::Option const*) { return true; });
+        for (CLI::App const* group : app.get_subcommands([](CLI::App const* sub) { return sub->get_name().empty(); }))
+            for (CLI::Option const* option : optionsOf(*group))
+                options.push_back(option);
+        return options;
+    }
+
+    std::vector<std::string> namesOf(std::vector<CLI::Option const*> const& options)
+    {
+        std::vector<std::string> names;
+        for (CLI::Option const* option : options)
+            if (option->nonpositional())
+                names.push_back(option->get_name(false, false));
+        return names;
+    }
+
+    /// The options of a group, which has a --help of its own too.
+    std::vector<CLI::Option const*> choicesOf(CLI::App const& group)
+    {
+        return group.get_options([&](CLI::Option const* option) { return option != group.get_help_ptr(); });
+    }
+
+    std::string describeUnknownOption(
+        std::string const& argument, std::vector<std::string> const& names, CLI::App const& app)
+    {
+        std::string const name = argument.substr(0, argument.find('='));
+        if (std::find(names.begin(), names.end(), name) != names.end())
+            return fmt::format("{} belongs after the command: {} {}", name, app.get_name(), name);
+        return fmt::format("{} has no option {}{}", app.get_name(), name, suggestionFor(name, names));
+    }
+
+    /// A command line without one of the commands.
+    std::string describeWithoutCommand(CLI::App const& program)
+    {
+        std::vector<std::string> const arguments = program.remaining();
+        auto const word = std::find_if_not(arguments.begin(), arguments.end(), isOption);
+        if (word != arguments.end()) {
+            std::vector<std::string> commands;
+            for (CLI::App const* command : program.get_subcommands([](CLI::App const*) { return true; }))
+                commands.push_back(command->get_name());
+            return fmt::format("there is no command {}{}", *word, suggestionFor(*word, commands));
+        }
+        if (!arguments.empty())
+            return describeUnknownOption(arguments[0], {"--help", "--version"}, program);
+        return "no command is given";
+    }
+
+    /// What a command line lacks, or has too much of a group.
+    std::string describeMissing(CLI::App const& command, std::string const& fallback)
+    {
+        std::vector<std::string> missing;
+        for (CLI::Option const* option : optionsOf(command))
+            if (option->get_required() && option->count() == 0)
+                missing.push_back(option->get_name(option->get_positional(), false));
+        if (!missing.empty())
+            return fmt::format("{} needs {}", command.get_name(), fmt::join(missing, " and "));
+        for (CLI::App const* group :
+            command.get_subcommands([](CLI::App const* sub) { return sub->get_name().empty(); })) {
+            std::vector<CLI::Option const*> const options = choicesOf(*group);
+            auto const given = std::count_if(
+                options.begin(), options.end(), [](CLI::Option const* option) { return option->count() != 0; });
+            if (given != 1)
+                return fmt::format("{} {} {}", command.get_name(), given == 0 ? "needs one of" : "takes only one of",
+                    fmt::join(namesOf(options), ", "));
+        }
+        return fallback;
+    }
+
+    std::string describeMismatch(CLI::App const& command, std::string const& fallback)
+    {
+        for (CLI::Option const* option : optionsOf(command)) {
+            auto const count = static_cast<int>(option->count());
+            if (count > option->get_items_expected_max())
+                return fmt::format(
+                    "{} is given more than once, or with too many values", option->get_name(false, false));
+            if (count != 0 && count < option->get_items_expected_min())
+                return fmt::format("{} takes {} values, and there {} {}", option->get_name(false, false),
+                    option->get_items_expected_min(), count == 1 ? "is" : "are", count);
+        }
+        for (CLI::Option const* option : optionsOf(command))
+            if (fallback.starts_with(option->get_name(false, false) + ":"))
+                return fmt::format("{} needs a value", option->get_name(false, false));
+        return fallback;
+    }
+
+    /// The mistake in a command line, in a sentence. Unknown names come first: they explain what is missing.
+    std::string describeMistake(CLI::ParseError const& error, CLI::App const& program)
+    {
+        std::vector<CLI::App*> const commands = program.get_subcommands();
+        if (commands.empty())
+            return describeWithoutCommand(program);
+        CLI::App const& command = *commands[0];
+        std::vector<std::string> const rest = program.remaining(true);
+        auto const unknown = std::find_if(rest.begin(), rest.end(), isOption);
+        if (unknown != rest.end())
+            return describeUnknownOption(*unknown, namesOf(optionsOf(command)), command);
+        if (dynamic_cast<CLI::RequiredError const*>(&error))
+            return describeMissing(command, error.what());
+        if (dynamic_cast<CLI::ArgumentMismatch const*>(&error))
+            return describeMismatch(command, error.what());
+        if (!rest.empty())
+            return fmt::format("\"{}\" is one argument more than {} takes", rest[0], command.get_name());
+        return error.what();
+    }
+
+    /// The arguments in their order without the name of the program, or nothing if one is empty. No name and no number is
+    /// empty: scripts pass such an argument when a variable is not set, and the program must not take it for a default.
+    std::optional<std::vector<std::string>> argumentsOf(int count, char const* const* arguments)
+    {
+        std::vector<std::string> result;
+        for (int i = 1; i < count; ++i) {
+            std::string argument = arguments[i];
+            if (argument.empty() || (argument.starts_with("--") && argument.ends_with('=')))
+                return std::nullopt;
+            if (argument.starts_with("-.") && !std::isnan(numberIn(argument)))
+                argument.insert(1, "0"); // the parser takes -.5 for an option, but not -0.5
+            result.push_back(std::move(argument));
+        }
+        return result;
+    }
+
+    /// A text in lines of at most that width, behind one another and each but the first one indented.
+    std::string wrapped(std::string const& text, std::size_t width, std::size_t indent)
+    {
+        std::string result;
+        std::size_t column = 0;
+        for (std::size_t start = 0; start < text.size();) {
+            std::size_t const end = std::min(text.find(' ', start), text.size());
+            if (column != 0 && column + 1 + end - start > width) {
+                result += "\n" + std::string(indent, ' ');
+                column = 0;
+            }
+            result += (column == 0 ? "" : " ") + text.substr(start, end - start);
+            column += (column == 0 ? 0 : 1) + end - start;
+            start = end + 1;
+        }
+        return result;
+    }
+
+    /// Paragraphs, which empty lines separate, in lines of the width of the help.
+    std::string reflowed(std::string_view text)
+    {
+        std::string result;
+        while (!text.empty()) {
+            std::size_t const end = std::min(text.find("\n\n"), text.size());
+            std::string paragraph(text.substr(0, end));
+            std::replace(paragraph.begin(), paragraph.end(), '\n', ' ');
+            result += (result.empty() ? "" : "\n\n") + wrapped(paragraph, kHelpColumns, 0);
+            text.remove_prefix(std::min(end + 2, text.size()));
+        }
+        return result;
+    }
+
+    /// Keeps the help within the width of a terminal.
+    class HelpFormatter : public CLI::Formatter {
+    public:
+        std::string make_option(CLI::Option const* option, bool isPositional) const override
+        {
+            return row(make_option_name(option, isPositional) + make_option_opts(option), make_option_desc(option));
+        }
+
+        std::string make_description(CLI::App const* app) const override { return app->get_description() + "\n"; }
+
+        std::string make_subcommand(CLI::App const* sub) const override
+        {
+            return row(sub->get_name(), sub->get_description());
+        }
+
+    private:
+        std::string row(std::string const& name, std::string const& description) const
+        {
+            constexpr std::size_t kGroupIndent = 2; // that options of a choice get on top
+            std::size_t const left = get_column_width();
+            std::string const start = "  " + name;
+            std::string const gap =
+                start.size() < left ? std::string(left - start.size(), ' ') : "\n" + std::string(left, ' ');
+            return start + gap + wrapped(description, kHelpColumns - left - kGroupIndent, left) + "\n";
+        }
+    };
 
 }
 
@@ -65,32 +319,28 @@ Option& Option::excludes(Option const& other)
     return *this;
 }
 
-Option& Option::check(std::function<std::string(std::string const&)> const& fault, char const* shown)
-{
-    option_->check(CLI::Validator([fault](std::string const& text) { return fault(text); }, shown));
-    return *this;
-}
-
 Option& Option::between(double least, double most, char const* shown)
 {
-    return check(
+    option_->check(CLI::Validator(
         [=](std::string const& text) {
             double const number = numberIn(text);
             return number >= least && number <= most
                 ? std::string()
                 : fmt::format("{} is not a number from {} to {}", text, least, most);
         },
-        shown);
+        shown));
+    return *this;
 }
 
 Option& Option::positive()
 {
-    return check(
+    option_->check(CLI::Validator(
         [](std::string const& text) {
             auto const number = static_cast<float>(numberIn(text));
             return number > 0 && std::isfinite(number) ? std::string() : text + " is not a positive number";
         },
-        "> 0");
+        "> 0"));
+    return *this;
 }
 
 Option& Option::oneOf(std::vector<std::string> const& texts)
@@ -101,7 +351,17 @@ Option& Option::oneOf(std::vector<std::string> const& texts)
 
 Option& Option::bytes()
 {
-    option_->transform(CLI::AsSizeValue(true));
+    option_->transform(CLI::Validator(
+        [](std::string& text) {
+            std::string const given = text;
+            try {
+                if (CLI::AsSizeValue(true)(text).empty() && faultIn<std::uint64_t>(text).empty())
+                    return std::string();
+            } catch (CLI::ValidationError const&) { // an unknown unit
+            }
+            return given + " is not a number of bytes, such as 500MB or 4GB";
+        },
+        ""));
     return *this;
 }
 
@@ -112,7 +372,9 @@ std::string Command::name() const
 
 template <class T> Option Command::addOption(char const* name, T& value, std::string const& description)
 {
-    return Option(*app_->add_option(name, value, description));
+    CLI::Option& option = *app_->add_option(name, value, description);
+    option.check(CLI::Validator([](std::string const& text) { return faultIn<typename ValueOf<T>::Type>(text); }, ""));
+    return Option(option);
 }
 
 template Option Command::addOption(char const*, double&, std::string const&);
@@ -128,9 +390,9 @@ template Option Command::addOption(char const*, std::vector<double>&, std::strin
 template Option Command::addOption(char const*, std::vector<float>&, std::string const&);
 template Option Command::addOption(char const*, std::vector<std::filesystem::path>&, std::string const&);
 
-void Command::addFlag(char const* name, bool& isSet, char const* description)
+void Command::addFlag(char const* names, bool& isSet, char const* description)
 {
-    app_->add_flag(name, isSet, description);
+    app_->add_flag(names, isSet, description);
 }
 
 Command Command::addChoice(char const* title, std::string const& description)
@@ -152,6 +414,7 @@ CommandLine::CommandLine(char const* name, char const* version, char const* desc
     app_->set_help_flag("-h,--help", "Print this help and exit");
     app_->footer(footer);
     app_->require_subcommand(1);
+    app_->formatter(std::make_shared<HelpFormatter>());
 }
 
 CommandLine::~CommandLine() = default;
@@ -160,24 +423,29 @@ Command CommandLine::addCommand(CommandHelp const& help)
 {
     CLI::App& command = *app_->add_subcommand(help.name, help.summary);
     command.set_help_flag("-h,--help", "Print this help and exit");
-    command.footer(fmt::format("{}\n\nExamples:\n{}", help.details, help.examples));
+    command.footer(fmt::format("{}\n\nExamples:\n{}", reflowed(help.details), help.examples));
     return Command(command);
 }
 
 std::optional<int> CommandLine::parse(int argumentCount, char const* const* arguments)
 {
-    constexpr int kMistake = static_cast<int>(ExitCode::CommandLine);
-    try {
-        app_->parse(argumentCount, arguments);
-        return std::nullopt;
-    } catch (CLI::RequiredError const& error) {
-        bool const isUnknown = app_->get_subcommands().empty() && !app_->remaining().empty();
-        std::string const message = isUnknown ? "There is no command " + app_->remaining()[0] : error.what();
-        std::fprintf(stderr, "%s\nRun with --help for more information.\n", message.c_str());
-        return kMistake;
-    } catch (CLI::ParseError const& error) {
-        return app_->exit(error) == 0 ? 0 : kMistake;
+    std::string mistake = "an argument is empty";
+    if (auto given = argumentsOf(argumentCount, arguments)) {
+        std::reverse(given->begin(), given->end()); // as the parser takes them
+        try {
+            app_->parse(std::move(*given));
+            return std::nullopt;
+        } catch (CLI::ParseError const& error) {
+            if (error.get_exit_code() == 0)
+                return app_->exit(error);
+            mistake = describeMistake(error, *app_);
+        }
     }
+    std::vector<CLI::App*> const commands = app_->get_subcommands();
+    std::string const help = app_->get_name() + (commands.empty() ? "" : " " + commands[0]->get_name()) + " --help";
+    std::fprintf(
+        stderr, "%s: %s\nRun \"%s\" for more information.\n", app_->get_name().c_str(), mistake.c_str(), help.c_str());
+    return static_cast<int>(ExitCode::CommandLine);
 }
 
 }

@@ -36,10 +36,8 @@ public:
     Option& needs(Option const& other);
     Option& excludes(Option const& other);
 
-    // What a value has to be; `shown` stands in the help.
+    // What a value has to be, besides a finite number if the variable is one; the help shows `shown`.
 
-    /// \param fault  what is wrong with a text, or an empty string
-    Option& check(std::function<std::string(std::string const&)> const& fault, char const* shown = "");
     Option& between(double least, double most, char const* shown = "");
     /// A number above 0 that single precision can hold.
     Option& positive();
@@ -63,7 +61,7 @@ public:
 
     /// \tparam T  a type that is instantiated in CommandLine.cpp
     template <class T> Option addOption(char const* name, T& value, std::string const& description);
-    void addFlag(char const* name, bool& isSet, char const* description);
+    void addFlag(char const* names, bool& isSet, char const* description);
     /// Options of which exactly one has to be given.
     Command addChoice(char const* title, std::string const& description);
 

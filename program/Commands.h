@@ -9,6 +9,8 @@
 
 namespace ModelingProgram {
 
+struct Output;
+
 /// What the command line asked for.
 struct Invocation {
     std::string command;
@@ -20,8 +22,16 @@ struct Invocation {
 /// Adds a command with the options that all have in common.
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation);
 
-/// Adds a file that has to stand on the command line.
-void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command);
+enum class Needed { Always, Sometimes };
+
+/// Adds a file that has to be on the command line.
+void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command,
+    Needed needed = Needed::Always);
+
+/// Adds OUT, and --force, which allows to replace an existing file.
+void addOutput(char const* description, Output& out, Command& command, Needed needed = Needed::Always);
+/// The latter alone.
+void addForce(Output& out, Command& command);
 
 /// The invocation becomes that of `command` where it is the one on the command line.
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);

@@ -70,6 +70,17 @@ std::string nameOf(GeometryType type)
     return "object of no known kind";
 }
 
+void makeEmpty(GeometryType type, Object& object)
+{
+    Orvan::MutablePtr<Object> const empty = type == GeometryType::Mesh ? makeMesh({}, {}, {})
+        : type == GeometryType::Strands                                ? makeStrands({}, {})
+                                                                       : makePointCloud({});
+    for (Property const& property : propertiesOf(object))
+        if (!property.isStandard && property.component == sPointComp)
+            empty->setProperty(property.name.c_str(), object.getProperty(property.name.c_str()));
+    object = *empty;
+}
+
 GeoValidator::Status validate(Object const& object)
 {
     switch (typeOf(object)) {

@@ -19,6 +19,10 @@ GeometryType typeOf(Tessara::Object const& object);
 /// "mesh", "strand set", "point cloud", or "object of no known kind".
 std::string nameOf(GeometryType type);
 
+/// Makes an object without points an empty one of that type, with the attributes that its points had: a file without points
+/// does not tell what it is.
+void makeEmpty(GeometryType type, Tessara::Object& object);
+
 /// The verdict of the host's validator for the kind of the object.
 Tessara::Geometry::GeoValidator::Status validate(Tessara::Object const& object);
 

@@ -121,6 +121,10 @@ GuideVolume::GuideVolume(GuideOptions const& options, Report& report)
 
 void GuideVolume::describe(SparseVolume& volume, Report& report)
 {
+    bool hasNumbers = !std::isnan(volume.background);
+    forEachActiveValue(volume, [&](float value) { hasNumbers = hasNumbers && !std::isnan(value); });
+    if (!hasNumbers)
+        refuse(fmt::format("grid \"{}\" has values that are not numbers", volume.name));
     Range active;
     forEachActiveValue(volume, [&](float value) { active.add(value); });
     Range all = active;
@@ -269,7 +273,7 @@ void addGuideOptions(GuideOptions& options, Command& command)
         .valueName("V")
         .needs(file);
     command.addOption("--tile-side", options.tileSide, "Voxels along a tile of the library's volume")
-        .valueName("")
+        .valueName("N")
         .oneOf({"4", "5"})
         .showDefault()
         .needs(file);

@@ -5,6 +5,7 @@
 #include "Report.h"
 
 #include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
 
 #include <fmt/format.h>
@@ -56,7 +57,7 @@ std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopo
                         "that meet there.",
                 countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
     if (Finding const& edges = topology.flippedEdges)
-        faults.push_back(fmt::format("At {} neighbouring faces look to opposite sides. The first is the {}. Turn faces "
+        faults.push_back(fmt::format("At {} neighboring faces point to opposite sides. The first is the {}. Turn faces "
                                      "over until all look outwards.",
             countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
     if (Finding const& points = topology.pinchedPoints)
@@ -95,8 +96,10 @@ std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopo
     return faults;
 }
 
-void requireMesh(Tessara::Object const& object, char const* command, std::filesystem::path const& file)
+void requireMesh(Tessara::Object& object, char const* command, std::filesystem::path const& file)
 {
+    if (Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
+        makeEmpty(GeometryType::Mesh, object);
     if (typeOf(object) != GeometryType::Mesh)
         throw Failure(ExitCode::Refused,
             fmt::format("{} needs a mesh, and {} holds a {}", command, file.string(), nameOf(typeOf(object))));

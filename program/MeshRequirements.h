@@ -20,8 +20,8 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
 /// Points of no face: operations that smooth have nothing to go by there.
 std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopology const& topology);
 
-/// Refuses what is no mesh for `command`, or has one of the faults.
-void requireMesh(Tessara::Object const& object, char const* command, std::filesystem::path const& file);
+/// Refuses what is not a mesh for `command`, or has one of the faults. An object without points becomes an empty mesh.
+void requireMesh(Tessara::Object& object, char const* command, std::filesystem::path const& file);
 void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
     std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file);
 

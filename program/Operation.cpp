@@ -3,13 +3,16 @@
 #include "Cancellation.h"
 #include "Failure.h"
 #include "Geometry.h"
-#include "files/GeometryFile.h"
+#include "MeshTopology.h"
+#include "files/OutputFile.h"
 
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Names.h>
 
 #include <fmt/format.h>
 
+#include <algorithm>
+#include <cctype>
 #include <chrono>
 #include <cstdlib>
 #include <fstream>
@@ -45,25 +48,68 @@ namespace {
         report.text += "\n" + formatTable({{}, {}}, rows);
     }
 
+    [[noreturn]] void refuseOutput(Output const& out, std::string const& why)
+    {
+        throw Failure(ExitCode::File, fmt::format("{} cannot be written: {}", out.file.string(), why));
+    }
+
+    bool hasExtension(Output const& out, std::string_view extension)
+    {
+        std::string const own = out.file.extension().string();
+        return std::equal(own.begin(), own.end(), extension.begin(), extension.end(),
+            [](char a, char b) { return std::tolower(static_cast<unsigned char>(a)) == b; });
+    }
+
 }
 
-void requireWritable(fs::path const& file)
+void requireWritable(Output const& out, GeometryType type)
 {
-    if (!isWritableFormat(file))
-        throw Failure(ExitCode::File,
-            fmt::format("cannot write {}: the name has to end in .obj, .ply, .stl or .vtp", file.string()));
-    requirePlace(file);
+    if (!isWritableFormat(out.file))
+        refuseOutput(out, "the name has to end in .obj, .ply, .stl or .vtp");
+    if (type == GeometryType::Strands && (hasExtension(out, ".ply") || hasExtension(out, ".stl")))
+        refuseOutput(out, "such files hold no strands; OBJ and VTP files do");
+    if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
+        refuseOutput(out, "STL files hold no point clouds; OBJ, PLY and VTP files do");
+    requirePlace(out);
 }
 
-void requirePlace(fs::path const& file)
+void requirePlace(Output const& out)
 {
     std::error_code ignored;
-    if (fs::is_directory(file, ignored))
-        throw Failure(ExitCode::File, fmt::format("cannot write {}: it is a folder", file.string()));
-    fs::path const folder = file.has_parent_path() ? file.parent_path() : fs::path(".");
+    if (fs::is_directory(out.file, ignored))
+        refuseOutput(out, "it is a folder");
+    fs::path const folder = out.file.has_parent_path() ? out.file.parent_path() : fs::path(".");
     if (!fs::is_directory(folder, ignored))
+        refuseOutput(out, fmt::format("there is no folder {}", folder.string()));
+    if (!out.replaces && fs::is_regular_file(out.file, ignored))
+        refuseOutput(out, "the file exists; --force replaces it");
+    OutputFile::tryOut(out.file, out.existing());
+}
+
+void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
+{
+    if (!hasExtension(out, ".stl"))
+        return;
+    MeshArrays const arrays = arraysOf(mesh);
+    for (unsigned int face = 0; face != arrays.faceCount(); ++face)
+        if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
+            refuseOutput(out,
+                fmt::format("STL files hold triangles only, and face {} has {}; OBJ, PLY and VTP files hold it", face,
+                    countOf(corners, "corner")));
+}
+
+void requireAttribute(Output const& out, char const* option, std::string const& name)
+{
+    if (!hasExtension(out, ".ply") && !hasExtension(out, ".vtp"))
+        throw Failure(ExitCode::Refused,
+            fmt::format(
+                "{}: {} cannot hold the attribute \"{}\"; PLY and VTP files can", option, out.file.string(), name));
+    constexpr std::string_view kTaken[] = {"x", "y", "z", "vertex_index", "vertex_indices"};
+    if (hasExtension(out, ".ply")
+        && (name.find_first_of(" \t\n\r\v\f") != std::string::npos
+            || std::find(std::begin(kTaken), std::end(kTaken), name) != std::end(kTaken)))
         throw Failure(
-            ExitCode::File, fmt::format("cannot write {}: there is no folder {}", file.string(), folder.string()));
+            ExitCode::Refused, fmt::format("{}: PLY files cannot hold an attribute of the name \"{}\"", option, name));
 }
 
 Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& report)
@@ -92,8 +138,10 @@ void requireValid(Tessara::Object const& object, fs::path const& file)
             fmt::format("{} holds no valid {}: {}", file.string(), nameOf(typeOf(object)), status.message().view()));
 }
 
-void requirePointCloud(char const* command, Tessara::Object const& object, fs::path const& file)
+void requirePointCloud(char const* command, Tessara::Object& object, fs::path const& file)
 {
+    if (Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
+        makeEmpty(GeometryType::PointCloud, object);
     if (typeOf(object) != GeometryType::PointCloud)
         throw Failure(ExitCode::Refused,
             fmt::format("{} needs a point cloud, and {} holds a {}", command, file.string(), nameOf(typeOf(object))));
@@ -125,16 +173,16 @@ void runOperation(Report& report, std::function<void()> const& operation)
     report.document["seconds"] = time.count();
 }
 
-void saveGeometry(Tessara::Object const& object, fs::path const& file, Report& report)
+void saveGeometry(Tessara::Object const& object, Output const& out, Report& report)
 {
     auto const status = validate(object);
     if (!status)
         throw Failure(ExitCode::Unexpected,
             fmt::format("the result is not valid, so nothing was written: {}", status.message().view()));
     stopIfCancelled();
-    for (std::string const& note : writeGeometryFile(object, file))
+    for (std::string const& note : writeGeometryFile(object, out.file, out.existing()))
         report.warn(note);
-    report.document["output"] = file.string();
+    report.document["output"] = out.file.string();
 }
 
 Json countsOf(Tessara::Object const& object)

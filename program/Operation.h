@@ -1,6 +1,8 @@
 #pragma once
 
+#include "Geometry.h"
 #include "Report.h"
+#include "files/GeometryFile.h"
 
 #include <TessaraObject/Object.h>
 
@@ -12,20 +14,33 @@ namespace ModelingProgram {
 
 // The frame of a command that makes a file from files:
 //
-//     requireWritable(out);
+//     requireWritable(out, GeometryType::Mesh);
 //     Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(in, report);
 //     refuse what the operation cannot take
 //     runOperation(report, [&] { Geometry::Mesh::...(*mesh); });
 //     saveGeometry(*mesh, out, report);
 //     reportOperation(before, after, report);
 //
-// Each step ends the command with a `Failure` or `FileError` where it cannot do its work, and where the user has
-// cancelled the job. Before `saveGeometry` nothing is written; that replaces a file only by a complete one.
+// Each step ends the command with a `Failure` or `FileError` if it cannot do its work, or if the user has cancelled the
+// job. Before `saveGeometry` nothing is written; that replaces a file only by a complete one.
 
-/// Looks at the name before time is spent: the format, and the folder the file is to go to.
-void requireWritable(std::filesystem::path const& file);
-/// The latter alone.
-void requirePlace(std::filesystem::path const& file);
+/// A file to write.
+struct Output {
+    std::filesystem::path file;
+    bool replaces = false; // an existing file, which is otherwise refused
+
+    Existing existing() const { return replaces ? Existing::Replace : Existing::Keep; }
+};
+
+/// Refuses, before time is spent, what `saveGeometry` would refuse: a format that cannot hold this type of geometry, and
+/// what `requirePlace` refuses. `GeometryType::None` stands for a type that is not known yet.
+void requireWritable(Output const& out, GeometryType type);
+/// Refuses a folder that does not exist or cannot be written, and an existing file that is not to be replaced.
+void requirePlace(Output const& out);
+/// Refuses a mesh with faces that the format of the file cannot hold.
+void requireWritableFaces(Output const& out, Tessara::Object const& mesh);
+/// Refuses a file whose format cannot hold a new attribute, which `option` asks for.
+void requireAttribute(Output const& out, char const* option, std::string const& name);
 
 /// Reads a file.
 Orvan::MutablePtr<Tessara::Object> readGeometry(std::filesystem::path const& file, Report& report);
@@ -36,8 +51,8 @@ Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& fil
 /// Refuses an object that the validator finds fault with. `file` is where it comes from.
 void requireValid(Tessara::Object const& object, std::filesystem::path const& file);
 
-/// Refuses an object of another kind.
-void requirePointCloud(char const* command, Tessara::Object const& object, std::filesystem::path const& file);
+/// Refuses an object of another kind. One without points becomes an empty point cloud.
+void requirePointCloud(char const* command, Tessara::Object& object, std::filesystem::path const& file);
 
 /// Refuses the input where an operation has done so.
 void requireDone(char const* command, bool isDone);
@@ -46,7 +61,7 @@ void requireDone(char const* command, bool isDone);
 void runOperation(Report& report, std::function<void()> const& operation);
 
 /// Validates the result and writes it.
-void saveGeometry(Tessara::Object const& object, std::filesystem::path const& file, Report& report);
+void saveGeometry(Tessara::Object const& object, Output const& out, Report& report);
 
 /// The numbers of elements: points, corners, faces, strands.
 Json countsOf(Tessara::Object const& object);

@@ -3,6 +3,7 @@
 #include "Cancellation.h"
 #include "Commands.h"
 #include "Failure.h"
+#include "Operation.h"
 #include "files/GeometryFile.h"
 
 #include <fmt/format.h>
@@ -21,8 +22,9 @@ namespace {
 
     constexpr char kFooter[] =
         R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply
-.stl .vtp. OUT may be IN: a file is replaced only by a complete one, and is left as it was when
-anything fails. Results go to standard output, messages to standard error.
+.stl .vtp. An existing file is replaced only with --force, also if OUT is IN, and only by a complete
+one; if anything fails it stays as it was. Results go to standard output, messages to standard
+error.
 
 Exit codes:
   0  done
@@ -113,9 +115,22 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
     return command;
 }
 
-void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command)
+void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command, Needed needed)
 {
-    command.addOption(name, file, description).required().synopsis(" ");
+    Option option = command.addOption(name, file, description).synopsis(" ");
+    if (needed == Needed::Always)
+        option.required();
+}
+
+void addOutput(char const* description, Output& out, Command& command, Needed needed)
+{
+    addFile("OUT", description, out.file, command, needed);
+    addForce(out, command);
+}
+
+void addForce(Output& out, Command& command)
+{
+    command.addFlag("-f,--force", out.replaces, "Replace the file to write if it exists");
 }
 
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run)

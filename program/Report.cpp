@@ -98,12 +98,21 @@ std::string countOf(std::uint64_t number, std::string_view singular, std::string
 
 std::string formatSeconds(double seconds)
 {
-    return seconds < 1 ? fmt::format("{:.3g} ms", seconds * 1e3) : fmt::format("{:.2f} s", seconds);
+    if (seconds < 1e-3)
+        return fmt::format("{:.3g} µs", seconds * 1e6);
+    if (seconds < 1)
+        return fmt::format("{:.3g} ms", seconds * 1e3);
+    return seconds < 100 ? fmt::format("{:.2f} s", seconds) : fmt::format("{:.1f} min", seconds / 60);
 }
 
 std::string formatBytes(std::uint64_t bytes)
 {
-    return fmt::format("{:.1f} MB", static_cast<double>(bytes) * 1e-6);
+    constexpr char const* kUnits[] = {"bytes", "kB", "MB", "GB", "TB"};
+    auto number = static_cast<double>(bytes);
+    std::size_t unit = 0;
+    for (; number >= 1000 && unit + 1 != std::size(kUnits); ++unit)
+        number /= 1000;
+    return unit == 0 ? countOf(bytes, "byte") : fmt::format("{:.1f} {}", number, kUnits[unit]);
 }
 
 std::string formatTable(std::vector<Column> const& columns, std::vector<std::vector<std::string>> const& rows)

@@ -32,9 +32,9 @@ Json numberOf(float value);
 std::string groupDigits(std::uint64_t number);
 /// "1 edge", "1,234 edges".
 std::string countOf(std::uint64_t number, std::string_view singular, std::string_view plural = {});
-/// "1.25 ms", "3.1 s".
+/// "80 µs", "1.25 ms", "3.10 s", "2.5 min".
 std::string formatSeconds(double seconds);
-/// "8.1 MB".
+/// "512 bytes", "8.1 MB", "2.0 GB".
 std::string formatBytes(std::uint64_t bytes);
 
 struct Column {

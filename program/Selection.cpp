@@ -13,7 +13,6 @@
 #include <fmt/format.h>
 
 #include <algorithm>
-#include <cmath>
 #include <type_traits>
 
 namespace ModelingProgram {
@@ -104,10 +103,7 @@ void addSelection(Pickable const& elements, Selection& selection, Command& comma
     choice.addOption("--indices", selection.indices, "Those that a text file names, counted from 0").valueName("FILE");
     choice.addOption("--box", selection.box, "Those inside a box between two corners, X0 Y0 Z0 X1 Y1 Z1")
         .valueName("NUMBER")
-        .values(6)
-        .check([](std::string const& text) {
-            return std::isnan(std::strtof(text.c_str(), nullptr)) ? text + " is no number" : std::string();
-        });
+        .values(6);
     choice.addOption("--attribute", selection.attribute, "Those whose boolean or integer attribute is not zero")
         .valueName("NAME");
     command.addFlag("--invert", selection.isInverted, "Pick the others instead");

@@ -20,7 +20,7 @@ namespace {
     struct Options {
         std::filesystem::path in;
         std::filesystem::path points;
-        std::filesystem::path out;
+        Output out;
         std::string tag;
     };
 
@@ -46,7 +46,9 @@ namespace {
 
     void addPoints(Options const& options, Report& report)
     {
-        requireWritable(options.out);
+        requireWritable(options.out, GeometryType::PointCloud);
+        if (!options.tag.empty())
+            requireAttribute(options.out, "--tag", options.tag);
         Orvan::MutablePtr<Object> const cloud = loadGeometry(options.in, report);
         requirePointCloud("add-points", *cloud, options.in);
         checkTag(options.tag, *cloud, report);
@@ -75,7 +77,7 @@ default is. A tag is a new attribute of the points, true for those that were add
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Point cloud to read", options->in, command);
     addFile("POINTS", "File whose points are added", options->points, command);
-    addFile("OUT", "Point cloud to write; may be IN", options->out, command);
+    addOutput("Point cloud to write", options->out, command);
     command.addOption("--tag", options->tag, "Name of the attribute that marks the new points").valueName("NAME");
     onSelected(command, invocation, [options](Report& report) { addPoints(*options, report); });
 }

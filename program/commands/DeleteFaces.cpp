@@ -21,15 +21,13 @@ namespace {
 
     struct Options {
         std::filesystem::path in;
-        std::filesystem::path out;
+        Output out;
         Selection selection;
     };
 
     void requireFacesWithCorners(Tessara::Object const& object, std::filesystem::path const& file)
     {
         MeshArrays const mesh = arraysOf(object);
-        if (mesh.faceCount() == 0)
-            throw Failure(ExitCode::Refused, fmt::format("there are no faces in {}", file.string()));
         for (unsigned int face = 0; face != mesh.faceCount(); ++face)
             if (mesh.corners(face).empty())
                 throw Failure(ExitCode::Refused,
@@ -39,14 +37,16 @@ namespace {
 
     void deleteFaces(Options const& options, Report& report)
     {
-        requireWritable(options.out);
+        requireWritable(options.out, GeometryType::Mesh);
         Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "delete-faces", options.in);
         requireFacesWithCorners(*mesh, options.in);
+        requireWritableFaces(options.out, *mesh);
         Json const before = countsOf(*mesh);
         Orvan::Array<bool> const picked = pickElements(options.selection, kFaces, *mesh, report);
-        runOperation(
-            report, [&] { requireDone("delete-faces", Tessara::GeometryAlgorithms::deleteFaces(picked, *mesh)); });
+        runOperation(report, [&] {
+            requireDone("delete-faces", picked.empty() || Tessara::GeometryAlgorithms::deleteFaces(picked, *mesh));
+        });
         saveGeometry(*mesh, options.out, report);
         reportOperation(before, countsOf(*mesh), {}, report);
     }
@@ -61,11 +61,11 @@ void addDeleteFaces(CommandLine& program, Invocation& invocation)
 face is in a box when all its corners are; corners on the border are in it. A file of indices holds
 whole numbers, separated by blanks or lines; what follows a # is a comment.)",
         "  modeling delete-faces bunny.obj half.obj --box -1 -1 -1 0 1 1\n"
-        "  modeling delete-faces part.ply part.ply --indices bad-faces.txt\n"
+        "  modeling delete-faces part.ply part.ply --indices bad-faces.txt --force\n"
         "  modeling delete-faces scan.ply kept.ply --attribute material --invert"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
-    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    addOutput("Mesh to write", options->out, command);
     addSelection(kFaces, options->selection, command);
     onSelected(command, invocation, [options](Report& report) { deleteFaces(*options, report); });
 }

@@ -19,7 +19,7 @@ namespace {
 
     struct Options {
         std::filesystem::path in;
-        std::filesystem::path out;
+        Output out;
         Selection selection;
     };
 
@@ -34,16 +34,15 @@ namespace {
 
     void deletePoints(Options const& options, Report& report)
     {
-        requireWritable(options.out);
+        requireWritable(options.out, GeometryType::PointCloud);
         Orvan::MutablePtr<Tessara::Object> const cloud = loadGeometry(options.in, report);
         requirePointCloud("delete-points", *cloud, options.in);
         Json const before = countsOf(*cloud);
-        if (before["points"] == 0)
-            throw Failure(ExitCode::Refused, fmt::format("there are no points in {}", options.in.string()));
         auto const indices = indicesOf(pickElements(options.selection, kPoints, *cloud, report));
         runOperation(report, [&] {
-            requireDone(
-                "delete-points", Tessara::GeometryAlgorithms::deletePointsInPointCloud(indices, *cloud, nullptr));
+            requireDone("delete-points",
+                before["points"] == 0
+                    || Tessara::GeometryAlgorithms::deletePointsInPointCloud(indices, *cloud, nullptr));
         });
         saveGeometry(*cloud, options.out, report);
         reportOperation(before, countsOf(*cloud), {}, report);
@@ -62,7 +61,7 @@ separated by blanks or lines; what follows a # is a comment. Points on the borde
         "  modeling delete-points scan.ply rest.ply --attribute label"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Point cloud to read", options->in, command);
-    addFile("OUT", "Point cloud to write; may be IN", options->out, command);
+    addOutput("Point cloud to write", options->out, command);
     addSelection(kPoints, options->selection, command);
     onSelected(command, invocation, [options](Report& report) { deletePoints(*options, report); });
 }

@@ -2,6 +2,7 @@
 #include "Geometry.h"
 #include "MeshTopology.h"
 #include "Operation.h"
+#include "files/GeometryBuilder.h"
 
 #include <fmt/format.h>
 
@@ -53,7 +54,8 @@ namespace {
     {
         Json list = Json::array();
         for (Property const& property : properties)
-            list.push_back({{"name", property.name}, {"type", property.type}, {"component", property.component},
+            list.push_back({{"name", property.name}, {"type", property.type},
+                {"component", elementNames(property.component.c_str())},
                 {"range", property.range.empty() ? Json() : Json(property.range)}, {"length", property.length},
                 {"standard", property.isStandard}});
         return list;
@@ -64,9 +66,9 @@ namespace {
         std::vector<std::vector<std::string>> rows;
         for (Property const& property : properties)
             rows.push_back({property.name, property.type,
-                property.component + (property.range.empty() ? "" : " through " + property.range),
+                elementNames(property.component.c_str()) + (property.range.empty() ? "" : " through " + property.range),
                 groupDigits(property.length)});
-        return formatTable({{"property"}, {"type"}, {"component"}, {"length", true}}, rows);
+        return formatTable({{"property"}, {"type"}, {"of"}, {"length", true}}, rows);
     }
 
     void describeFile(std::filesystem::path const& file, Report& report)
@@ -95,10 +97,10 @@ namespace {
 void addInfo(CommandLine& program, Invocation& invocation)
 {
     auto const file = std::make_shared<std::filesystem::path>();
-    constexpr CommandHelp kHelp = {"info", "Tell what a file holds, and how the faces of a mesh hang together",
+    constexpr CommandHelp kHelp = {"info", "Show what a file holds, and how the faces of a mesh are connected",
         R"(Open edges have one face, non-manifold ones more than two. A winding conflict is an edge that faces
-pass in the same direction. At a pinched point there are faces that share the point, but do not hang
-together by edges there. The genus is given for closed manifolds, summed over the parts. A sliver
+pass in the same direction. At a pinched point there are faces that share the point, but are not
+connected by edges there. The genus is given for closed manifolds, summed over the parts. A sliver
 below 0.1 is a face whose shortest edge is shorter than 0.1 times its longest one.)",
         "  modeling info bunny.obj\n"
         "  modeling info bunny.obj --json | jq .topology.openEdges"};

@@ -22,7 +22,7 @@ namespace {
 
     struct Options {
         std::filesystem::path in;
-        std::filesystem::path out;
+        Output out;
         std::string attribute;
         std::vector<double> distanceTo; // three coordinates
         std::optional<float> from;
@@ -34,23 +34,21 @@ namespace {
         std::string grid = "scale";
     };
 
-    void requireVdb(std::filesystem::path const& file)
+    void requireVdb(Output const& out)
     {
-        if (file.extension() != ".vdb")
-            throw Failure(ExitCode::File, fmt::format("cannot write {}: the name has to end in .vdb", file.string()));
-        requirePlace(file);
+        if (out.file.extension() != ".vdb")
+            throw Failure(
+                ExitCode::File, fmt::format("{} cannot be written: the name has to end in .vdb", out.file.string()));
+        requirePlace(out);
     }
 
     void requireFiniteSurface(MeshArrays const& mesh, std::filesystem::path const& file)
     {
-        if (mesh.faceCount() == 0)
-            throw Failure(ExitCode::Refused, fmt::format("there are no faces in {}", file.string()));
         auto const isFinite = [](float3 const& p) {
             return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
         };
         if (!std::all_of(mesh.positions->begin(), mesh.positions->end(), isFinite))
-            throw Failure(ExitCode::Refused,
-                fmt::format("a point of {} lies nowhere: a coordinate is not finite", file.string()));
+            throw Failure(ExitCode::Refused, fmt::format("a coordinate of {} is not finite", file.string()));
     }
 
     SurfaceValue surfaceValueOf(Options const& options, Object const& mesh)
@@ -71,9 +69,11 @@ namespace {
     {
         if (options.voxelSize)
             return *options.voxelSize;
-        BoundingBox const box = boundingBoxOf(mesh).value_or(BoundingBox{});
-        double const longest =
-            std::max({double{box.max.x} - box.min.x, double{box.max.y} - box.min.y, double{box.max.z} - box.min.z});
+        auto const box = boundingBoxOf(mesh);
+        if (!box)
+            return 1; // any size will do, as there are no voxels
+        double const longest = std::max(
+            {double{box->max.x} - box->min.x, double{box->max.y} - box->min.y, double{box->max.z} - box->min.z});
         if (!(longest > 0))
             throw Failure(ExitCode::Refused,
                 fmt::format("all points of {} lie in one place: --voxel-size has to say how large voxels are",
@@ -101,6 +101,13 @@ namespace {
         }
     }
 
+    void requireFiniteValues(SparseVolume const& volume)
+    {
+        if (!std::all_of(volume.voxels.begin(), volume.voxels.end(),
+                [](TSR::TileTree3D::Voxel const& voxel) { return std::isfinite(voxel.value); }))
+            throw Failure(ExitCode::Refused, "the values of the volume are too large for single precision");
+    }
+
     void describe(SparseVolume const& volume, Report& report)
     {
         auto const [least, most] = rangeOf(volume.voxels);
@@ -108,8 +115,9 @@ namespace {
         report.document["volume"] = {{"grid", volume.name}, {"activeVoxels", volume.activeCount()},
             {"voxelSize", numberOf(voxelSize)}, {"smallestValue", numberOf(least)}, {"largestValue", numberOf(most)},
             {"background", numberOf(volume.background)}};
-        report.text += fmt::format("grid \"{}\": {} of size {}, values from {} to {}, background {}\n", volume.name,
-            countOf(volume.activeCount(), "active voxel"), voxelSize, least, most, volume.background);
+        report.text += fmt::format("grid \"{}\": {} of size {}, {}background {}\n", volume.name,
+            countOf(volume.activeCount(), "active voxel"), voxelSize,
+            volume.voxels.empty() ? "" : fmt::format("values from {} to {}, ", least, most), volume.background);
     }
 
     void makeVolume(Options const& options, Report& report)
@@ -126,13 +134,15 @@ namespace {
         volume.voxelSize = voxelSizeOf(options, *mesh);
         volume.background = options.background;
         runOperation(report, [&] {
-            volume.voxels = voxelsAround(arrays, value, volume.voxelSize, options.halfWidth);
+            if (arrays.faceCount() != 0)
+                volume.voxels = voxelsAround(arrays, value, volume.voxelSize, options.halfWidth);
             if (options.from)
                 mapValues(*options.from, *options.to, volume.voxels);
+            requireFiniteValues(volume);
         });
         describe(volume, report);
-        writeVdbFile(volume, options.out);
-        report.document["output"] = options.out.string();
+        writeVdbFile(volume, options.out.file, options.out.existing());
+        report.document["output"] = options.out.file.string();
         reportRun(report);
     }
 
@@ -168,7 +178,7 @@ the face, or the distance to a place. Faces may have any number of corners.
         "  modeling make-volume scan.ply guide.vdb --attribute quality --voxels 200 --band 5"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("MESH", "Mesh to read", options->in, command);
-    addFile("OUT", "OpenVDB file to write", options->out, command);
+    addOutput("OpenVDB file to write", options->out, command);
     addValueOptions(*options, command);
     Option const voxelSize = command.addOption("--voxel-size", options->voxelSize, "Side of a voxel in model units")
                                  .valueName("S")

@@ -2,6 +2,7 @@
 #include "Failure.h"
 #include "Geometry.h"
 #include "Operation.h"
+#include "files/GeometryBuilder.h"
 
 #include <Modeling/mergeMeshes.h>
 #include <Modeling/mergePointClouds.h>
@@ -23,7 +24,8 @@ namespace {
     using Inputs = Orvan::Array<Orvan::Ptr<Object>>;
 
     struct Options {
-        std::vector<std::filesystem::path> files; // the last one is written
+        std::vector<std::filesystem::path> files; // with the one to write at the end if `out` is not given
+        Output out;
         std::string sourceAttribute;
     };
 
@@ -34,13 +36,33 @@ namespace {
         GeometryType type = GeometryType::None;
     };
 
+    /// Takes the file to write from the end of the list, unless it is given.
+    void settleOutput(Options& options)
+    {
+        Output& out = options.out;
+        if (!out.file.empty())
+            return;
+        if (options.files.size() < 2)
+            throw Failure(ExitCode::CommandLine,
+                "merge needs files to read and one to write: modeling merge IN... OUT, or modeling merge IN... -o OUT");
+        out.file = std::move(options.files.back());
+        options.files.pop_back();
+        std::error_code ignored;
+        if (!out.replaces && std::filesystem::is_regular_file(out.file, ignored))
+            throw Failure(ExitCode::File,
+                fmt::format(
+                    "the last file, {}, exists. If it is one to read, name the file to write with -o OUT; if it "
+                    "is the one to write, --force replaces it",
+                    out.file.string()));
+    }
+
     Sources readSources(Options const& options, Report& report)
     {
         Sources sources;
         report.document["skipped"] = Json::array();
-        for (std::size_t i = 0; i + 1 != options.files.size(); ++i) {
-            std::string const file = options.files[i].string();
-            Orvan::Ptr<Object> object = readGeometry(options.files[i], report);
+        for (std::filesystem::path const& path : options.files) {
+            std::string const file = path.string();
+            Orvan::Ptr<Object> object = readGeometry(path, report);
             if (auto const status = validate(*object); !status) {
                 report.warn(fmt::format("{} is skipped: {}", file, status.message().view()));
                 report.document["skipped"].push_back({{"file", file}, {"reason", status.message().c_str()}});
@@ -56,10 +78,19 @@ namespace {
 
     void requireOneKind(Sources& sources)
     {
-        sources.type = typeOf(*sources.objects[0]);
+        auto const isEmpty = [](auto const& object) {
+            return Tessara::Geometry::getElementCount(*object, Tessara::Geometry::sPointComp) == 0;
+        };
+        auto const typical = std::find_if_not(sources.objects.begin(), sources.objects.end(), isEmpty);
+        sources.type = typeOf(typical == sources.objects.end() ? *sources.objects[0] : **typical);
         std::vector<std::string> kinds;
         bool areAlike = true;
         for (std::size_t i = 0; i != sources.files.size(); ++i) {
+            if (isEmpty(sources.objects[i])) {
+                Orvan::MutablePtr<Object> empty = makeMutable(std::move(sources.objects[i]));
+                makeEmpty(sources.type, *empty);
+                sources.objects[i] = std::move(empty);
+            }
             GeometryType const type = typeOf(*sources.objects[i]);
             areAlike = areAlike && type == sources.type;
             kinds.push_back(fmt::format("{} holds a {}", sources.files[i], nameOf(type)));
@@ -173,11 +204,11 @@ namespace {
         };
         for (Outcome const& outcome : outcomes) {
             Property const& property = outcome.property;
-            report.document["properties"].push_back(
-                {{"name", property.name}, {"type", property.type}, {"component", property.component},
-                    {"missingIn", outcome.missingIn}, {"otherTypeIn", outcome.otherTypeIn}});
-            rows.push_back({property.name, property.type, property.component, filesIn(outcome.missingIn),
-                filesIn(outcome.otherTypeIn)});
+            report.document["properties"].push_back({{"name", property.name}, {"type", property.type},
+                {"component", elementNames(property.component.c_str())}, {"missingIn", outcome.missingIn},
+                {"otherTypeIn", outcome.otherTypeIn}});
+            rows.push_back({property.name, property.type, elementNames(property.component.c_str()),
+                filesIn(outcome.missingIn), filesIn(outcome.otherTypeIn)});
         }
         if (!rows.empty())
             report.text += formatTable({{"property"}, {"type"}, {"of"}, {"default, as it is missing in"},
@@ -186,14 +217,18 @@ namespace {
                 + "\n";
     }
 
-    void mergeFiles(Options const& options, Report& report)
+    void mergeFiles(Options options, Report& report)
     {
-        std::filesystem::path const& out = options.files.back();
-        if (options.files.size() < 2)
-            throw Failure(ExitCode::CommandLine, "merge takes one file or more to read, and then the one to write");
-        requireWritable(out);
+        settleOutput(options);
+        requireWritable(options.out, GeometryType::None);
+        if (!options.sourceAttribute.empty())
+            requireAttribute(options.out, "--source-attribute", options.sourceAttribute);
         Sources sources = readSources(options, report);
         requireOneKind(sources);
+        requireWritable(options.out, sources.type);
+        if (sources.type == GeometryType::Mesh)
+            for (auto const& object : sources.objects)
+                requireWritableFaces(options.out, *object);
         if (!options.sourceAttribute.empty())
             numberSources(options.sourceAttribute, sources);
 
@@ -203,7 +238,7 @@ namespace {
         if (!isDone)
             throw Failure(ExitCode::Refused, "there would be more than 4,294,967,295 elements of one kind");
 
-        saveGeometry(*merged, out, report);
+        saveGeometry(*merged, options.out, report);
         reportOutcomes(outcomesOf(sources, *merged), report);
         reportOperation(totalsOf(sources), countsOf(*merged), droppedIn(sources, *merged), report);
     }
@@ -216,13 +251,18 @@ void addMerge(CommandLine& program, Invocation& invocation)
     constexpr CommandHelp kHelp = {"merge", "Join meshes, point clouds or strand sets into one, with all attributes",
         R"(The files may have different formats, but have to hold the same kind of geometry. A file whose geometry
 is not valid is skipped, and named. Of each attribute the first file that has it decides the type;
-elements of files that do not have it, or have it with another type, get the default.)",
+elements of files that do not have it, or have it with another type, get the default.
+
+Without -o the last name is that of the file to write, which must not exist yet (unless --force).)",
         "  modeling merge a.obj b.ply c.off all.ply\n"
-        "  modeling merge scan-*.ply all.ply --source-attribute scan"};
+        "  modeling merge scan-*.ply -o all.ply --source-attribute scan"};
     Command command = addCommand(kHelp, program, invocation);
-    command.addOption("FILES", options->files, "Files to read, and at the end the one to write (may be one of them)")
+    command.addOption("FILES", options->files, "Files to read, and without -o at the end the one to write")
         .required()
-        .synopsis("IN... OUT");
+        .synopsis("IN... [OUT]");
+    command.addOption("-o,--output", options->out.file, "The file to write; all other names are files to read")
+        .valueName("OUT");
+    addForce(options->out, command);
     command
         .addOption("--source-attribute", options->sourceAttribute,
             "Store the number of the file, from 0, under that name: for each face, strand, or point of a cloud")

@@ -18,7 +18,7 @@ namespace {
 
     struct Options {
         std::filesystem::path in;
-        std::filesystem::path out;
+        Output out;
         float ratio = 0.05f;
     };
 
@@ -33,7 +33,7 @@ namespace {
 
     void removeSlivers(Options const& options, Report& report)
     {
-        requireWritable(options.out);
+        requireWritable(options.out, GeometryType::Mesh);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "remove-slivers", options.in);
         MeshTopology const topology = analyseTopology(arraysOf(*mesh));
@@ -67,10 +67,10 @@ collapse takes one point and two faces; it is left out where it would change the
 face over, so that some needles may stay. Points and faces are renumbered, and properties other than
 the positions are dropped, unless nothing collapses.)",
         "  modeling remove-slivers part.stl clean.stl\n"
-        "  modeling remove-slivers scan.ply scan.ply --ratio 0.1 --json"};
+        "  modeling remove-slivers scan.ply scan.ply --force --ratio 0.1 --json"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
-    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    addOutput("Mesh to write", options->out, command);
     command.addOption("--ratio", options->ratio, "Shortest edge over longest edge below which a face is a needle")
         .between(0, 1, "0..1")
         .showDefault();

@@ -29,7 +29,7 @@ namespace {
 
     struct Options {
         std::filesystem::path in;
-        std::filesystem::path out;
+        Output out;
         float amount = 1;
         std::string weights;
         std::string pins;
@@ -169,9 +169,10 @@ namespace {
 
     void smooth(Options const& options, Report& report)
     {
-        requireWritable(options.out);
+        requireWritable(options.out, GeometryType::Mesh);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "smooth", options.in);
+        requireWritableFaces(options.out, *mesh);
         MeshTopology const topology = analyseTopology(arraysOf(*mesh));
         settleIsolatedPoints(options, topology, *mesh, report);
         auto const weights = weightsOf(options, *mesh, report);
@@ -215,11 +216,11 @@ surface: they are dropped, and named.
 Points at a boundary move too, unless they are pinned. Attributes with a number for each point can
 scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",
         "  modeling smooth scan.ply smooth.ply --amount 3\n"
-        "  modeling smooth cloth.obj cloth.obj --amount 1 --pin-boundary\n"
-        "  modeling smooth face.ply face.ply --weights quality --pin-attribute locked"};
+        "  modeling smooth cloth.obj smooth.obj --amount 1 --pin-boundary\n"
+        "  modeling smooth face.ply face.ply --force --weights quality --pin-attribute locked"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
-    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    addOutput("Mesh to write", options->out, command);
     command.addOption("--amount", options->amount, "How much smoothing").between(0, 1000, "0..1000").showDefault();
     command.addOption("--weights", options->weights, "Scale the moves of points by this attribute")
         .valueName("ATTRIBUTE");

@@ -33,12 +33,12 @@ namespace {
     struct Options {
         std::vector<std::filesystem::path> drawing; // the polygon and the strands
         std::filesystem::path on;
-        std::filesystem::path out;
+        Output out;
         std::string normals = "points";
         unsigned int rotate = 0;
         bool isOpen = false;
         bool flip = false;
-        bool force = false;
+        bool allowsFaults = false;
         bool checkOnly = false;
     };
 
@@ -166,7 +166,7 @@ namespace {
         std::vector<std::string> reasons;
         for (Fault const& fault : faults)
             reasons.push_back(describe(fault));
-        if (!faults.empty() && (!options.force || made.getStrands().empty()))
+        if (!faults.empty() && (!options.allowsFaults || made.getStrands().empty()))
             throw Failure(ExitCode::Refused, "the template is not usable", std::move(reasons));
         for (std::string const& reason : reasons)
             report.warn(reason);
@@ -303,12 +303,12 @@ namespace {
 
     void requireFits(StitchTemplate const& made, Target const& target, std::filesystem::path const& file)
     {
-        if (target.faces.empty())
+        if (target.faces.empty() && target.mesh.faceCount() != 0)
             throw Failure(ExitCode::Refused,
                 fmt::format(
                     "the template has {} corners, and no face of {} has as many", made.getPolySize(), file.string()));
         std::uint64_t const mostOfFace = std::max(controlPointCountOf(made), made.getStrands().size);
-        if (mostOfFace > (std::numeric_limits<unsigned int>::max() - 1) / target.faces.size)
+        if (mostOfFace * target.faces.size >= std::numeric_limits<unsigned int>::max())
             throw Failure(ExitCode::Refused, "there would be more than 4,294,967,295 control points");
     }
 
@@ -339,9 +339,9 @@ namespace {
                 countOf(controlPointCountOf(made), "control point"));
             return;
         }
-        if (options.on.empty() || options.out.empty())
-            throw Failure(ExitCode::CommandLine, "stitch takes --on MESH and the file to write, or --check");
-        requireWritable(options.out);
+        if (options.on.empty() || options.out.file.empty())
+            throw Failure(ExitCode::CommandLine, "stitch needs --on MESH and OUT, or --check");
+        requireWritable(options.out, GeometryType::Strands);
         StitchTemplate const made = readTemplate(options, report);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.on, report);
         requireMesh(*mesh, "stitch", options.on);
@@ -377,7 +377,7 @@ edge to hold one or two ends, unless --open. Ends meet where they are placed ali
         .values(2)
         .synopsis("POLYGON STRANDS");
     command.addOption("--on", options->on, "Mesh to lay it on").synopsis("MESH");
-    command.addOption("OUT", options->out, "File of strands to write").synopsis(" ");
+    addOutput("File of strands to write", options->out, command, Needed::Sometimes);
     command.addOption("--normals", options->normals, "Raise along normals blended from the points, or of each face")
         .oneOf({"points", "faces"})
         .showDefault();
@@ -386,7 +386,7 @@ edge to hold one or two ends, unless --open. Ends meet where they are placed ali
         .between(0, std::numeric_limits<unsigned int>::max());
     command.addFlag("--flip", options->flip, "Lower where the template raises");
     command.addFlag("--open", options->isOpen, "Allow strand ends off the edges, and any number on an edge");
-    command.addFlag("--force", options->force, "Take a template in spite of its faults");
+    command.addFlag("--allow-faults", options->allowsFaults, "Take a template in spite of its faults");
     command.addFlag("--check", options->checkOnly, "Only tell whether the template is usable");
     onSelected(command, invocation, [options](Report& report) { stitch(*options, report); });
 }

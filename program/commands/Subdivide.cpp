@@ -35,7 +35,7 @@ namespace {
 
     struct Options {
         std::filesystem::path in;
-        std::filesystem::path out;
+        Output out;
         std::optional<float> tolerance;
         std::optional<float> relative;
         std::uint64_t maxMemory = 0;
@@ -148,27 +148,36 @@ namespace {
 
     float toleranceOf(Options const& options, Object const& mesh, std::optional<GuideVolume> const& guide)
     {
-        BoundingBox const box = boundingBoxOf(mesh).value_or(BoundingBox{});
+        if (!boundingBoxOf(mesh))
+            return options.tolerance.value_or(0); // any will do for an empty mesh
+        BoundingBox const box = *boundingBoxOf(mesh);
         float3 const size{box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z};
         float const tolerance =
             options.tolerance ? *options.tolerance : *options.relative * std::hypot(size.x, size.y, size.z);
 
-        float farthest = 0.25f;
+        constexpr float kNear = 0.25f; // closer to the origin, the library's own limit is the coarser one
+        float farthest = kNear;
         for (float const coordinate : {box.min.x, box.min.y, box.min.z, box.max.x, box.max.y, box.max.z})
             farthest = std::max(farthest, std::abs(coordinate));
+        if (isTooFine(tolerance, farthest) && farthest == kNear)
+            throw Failure(ExitCode::Refused,
+                fmt::format(
+                    "a tolerance of {} is too fine: below {} nothing is refined. Take a larger one, or scale the "
+                    "mesh up.",
+                    tolerance, kNear * 4 * std::numeric_limits<float>::epsilon()));
         if (isTooFine(tolerance, farthest))
             throw Failure(ExitCode::Refused,
                 fmt::format(
-                    "a tolerance of {} is finer than single precision can tell apart at coordinates of up to {}. "
-                    "Take a larger one, scale a tiny mesh up, or move a far one to the origin.",
+                    "a tolerance of {} is finer than single precision can distinguish at coordinates of up to {}. "
+                    "Take a larger one, or move the mesh to the origin.",
                     tolerance, farthest));
         float const scale = guide ? guide->smallestPositiveValue().value_or(1) : 1;
         if (isTooFine(tolerance * scale, farthest))
             throw Failure(ExitCode::Refused,
                 fmt::format(
                     "a tolerance of {} times the smallest positive value of grid \"{}\", {}, is finer than single "
-                    "precision can tell apart at coordinates of up to {}. Take a larger tolerance or --min-value.",
-                    tolerance, guide->grid(), scale, farthest));
+                    "precision can distinguish there. Take a larger tolerance or --min-value.",
+                    tolerance, guide->grid(), scale));
         return tolerance;
     }
 
@@ -203,7 +212,7 @@ namespace {
 
     void subdivide(Options const& options, Report& report)
     {
-        requireWritable(options.out);
+        requireWritable(options.out, GeometryType::Mesh);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "subdivide", options.in);
         if (options.triangulates)
@@ -254,7 +263,7 @@ happens where the values of a volume fall to 0 at a single place.)",
         "  modeling subdivide head.obj fine.obj --relative 0.01 --volume guide.vdb --grid scale"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
-    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    addOutput("Mesh to write", options->out, command);
     Command size = command.addChoice("Size of faces", "one of these is required");
     size.addOption("--tolerance", options->tolerance, "Half the size of the largest face that stays, in model units")
         .positive();

@@ -9,6 +9,7 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <memory>
 
 namespace ModelingProgram {
@@ -19,7 +20,7 @@ namespace {
 
     struct Options {
         std::filesystem::path in;
-        std::filesystem::path out;
+        Output out;
         std::string channels = "*";
         bool keepsUnits = false;
         bool isToBeChecked = false;
@@ -30,6 +31,35 @@ namespace {
         TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels.c_str());
         if (!status)
             throw Failure(ExitCode::CommandLine, fmt::format("--channels: {}", status.message().view()));
+    }
+
+    /// Refuses an entry that no property of faces or corners matches: it asks for what is not there. What an excluding
+    /// pattern or * stands for need not be there.
+    void requireMatches(std::string const& channels, Object const& mesh)
+    {
+        std::vector<std::string> names;
+        for (Property const& property : propertiesOf(mesh))
+            if (!property.isStandard && !property.component.empty()
+                && property.component != Tessara::Geometry::sPointComp)
+                names.push_back(property.name);
+        constexpr char kSeparators[] = " \t\n\v\f\r,";
+        std::size_t start = channels.find_first_not_of(kSeparators);
+        while (start != std::string::npos) {
+            std::size_t const end = std::min(channels.find_first_of(kSeparators, start), channels.size());
+            bool const excludes = channels[start] == '^' || channels[start] == '-';
+            std::string const pattern = channels.substr(start + (excludes ? 1 : 0), end - start - (excludes ? 1 : 0));
+            start = channels.find_first_not_of(kSeparators, end);
+            bool const isPattern = pattern.find_first_of("*?") != std::string::npos;
+            if (isPattern && (excludes || pattern.find_first_not_of('*') == std::string::npos))
+                continue;
+            TSR::Utils::ChannelParser parser;
+            static_cast<void>(parser.parses(pattern.c_str()));
+            if (std::none_of(
+                    names.begin(), names.end(), [&](std::string const& name) { return parser.accepts(name.c_str()); }))
+                throw Failure(ExitCode::Refused,
+                    fmt::format("--channels: no property of faces or corners matches \"{}\". There are: {}", pattern,
+                        names.empty() ? "none" : fmt::format("{}", fmt::join(names, ", "))));
+        }
     }
 
     Json describeMesh(Object const& mesh)
@@ -76,9 +106,10 @@ namespace {
     void triangulate(Options const& options, Report& report)
     {
         requireChannels(options.channels);
-        requireWritable(options.out);
+        requireWritable(options.out, GeometryType::Mesh);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "triangulate", options.in);
+        requireMatches(options.channels, *mesh);
 
         Object const measured = options.keepsUnits ? *mesh : inFineUnits(*mesh);
         Object result;
@@ -111,13 +142,13 @@ where the mesh is about a million units long; with --keep-units they are those o
 --channels chooses the properties of faces and corners that triangles get from their face; the others
 are dropped, with the data of ranges. It is a list of names and patterns, separated by blanks or
 commas: * stands for any characters, ? for one, and a leading ^ or - excludes. The last entry that
-matches a name decides. "*" keeps all, "" none, "* -tmp*" all but those that begin with tmp, "uv N"
-these two. Properties of points stay.)",
+matches a name decides. "*" keeps all, "^*" none, "* ^tmp*" all but those that begin with tmp, "uv N"
+these two. Names and patterns of what to keep have to match something. Properties of points stay.)",
         "  modeling triangulate quads.obj triangles.ply\n"
-        "  modeling triangulate cad.obj cad.stl --channels \"\" --check"};
+        "  modeling triangulate cad.obj cad.stl --channels \"^*\" --check"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
-    addFile("OUT", "Mesh to write; may be IN", options->out, command);
+    addOutput("Mesh to write", options->out, command);
     command.addOption("--channels", options->channels, "Which properties of faces and corners to keep")
         .valueName("LIST")
         .showDefault();

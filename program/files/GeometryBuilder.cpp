@@ -17,6 +17,12 @@ std::string_view namePrefix(Orvan::String const& component)
     return component == sStrandComp ? "strand:" : "";
 }
 
+std::string elementNames(Orvan::String const& component)
+{
+    std::string_view const prefix = namePrefix(component);
+    return prefix.empty() ? std::string(component.view()) : std::string(prefix.substr(0, prefix.size() - 1)) + "s";
+}
+
 bool isReservedName(std::string_view name)
 {
     constexpr std::string_view kReserved[] = {sPointComp, sFaceComp, sFaceVertexComp, sStrandComp, sPointPosition,
@@ -49,9 +55,6 @@ void GeometryBuilder::refuseIndex(char const* element, std::string const& index)
 
 GeometryFile GeometryBuilder::finish(std::string format) &&
 {
-    if (positions_.empty())
-        scanner_.refuse("the file holds no points");
-
     GeometryFile file{nullptr, std::move(format), std::move(notes_)};
     bool const isMesh = faceCount() != 0;
     if (isMesh)

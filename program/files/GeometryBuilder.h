@@ -15,6 +15,9 @@ namespace ModelingProgram {
 /// is the color of the faces, where points have a color too. Empty for components that no file tells apart.
 std::string_view namePrefix(Orvan::String const& component);
 
+/// "points", "faces", "corners" or "strands"; of any other component its name.
+std::string elementNames(Orvan::String const& component);
+
 /// Whether geometry itself is stored under the name, so that no other property can be.
 bool isReservedName(std::string_view name);
 

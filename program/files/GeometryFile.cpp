@@ -43,15 +43,20 @@ GeometryFile readGeometryFile(std::filesystem::path const& file)
     Format const format = formatOf(file);
     if (!format.read)
         throw FileError(file.string() + " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz");
-    return format.read(InputFile(file));
+    InputFile const input(file);
+    if (input.size == 0 && format.read != readObj && format.read != readXyz) // the others have headers
+        throw FileError(file.string() + " cannot be read: it is empty");
+    return format.read(input);
 }
 
-std::vector<std::string> writeGeometryFile(Tessara::Object const& object, std::filesystem::path const& file)
+std::vector<std::string> writeGeometryFile(
+    Tessara::Object const& object, std::filesystem::path const& file, Existing existing)
 {
     Format const format = formatOf(file);
     if (!format.write)
         throw FileError(file.string() + " cannot be written: its name ends in none of .obj, .ply, .stl and .vtp");
     WritableGeometry geometry = takeApart(object, file);
+    geometry.existing = existing;
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }

@@ -28,13 +28,17 @@ struct GeometryFile {
 /// \throws FileError  for a file that is not there, is cut off, or holds what cannot be right
 GeometryFile readGeometryFile(std::filesystem::path const& file);
 
+/// What is done about a file that exists already. Links, devices and pipes are not files in this sense.
+enum class Existing { Replace, Keep };
+
 /// Writes OBJ, PLY (binary, little endian), STL (binary) and VTP files. The file appears under its name only when it is
-/// complete: it is written beside it first. An existing file is replaced.
+/// complete: it is written beside it first.
 /// \return what the format cannot hold and was therefore dropped or written in another form, a sentence each
 /// \throws FileError  where the file cannot be written, the format cannot hold the kind of geometry at all, or the
 ///                    geometry is not valid, has positions that are not finite or faces of fewer than three corners; a
 ///                    file of that name is then as it was
-std::vector<std::string> writeGeometryFile(Tessara::Object const& object, std::filesystem::path const& file);
+std::vector<std::string> writeGeometryFile(
+    Tessara::Object const& object, std::filesystem::path const& file, Existing existing = Existing::Replace);
 
 /// Whether `writeGeometryFile` knows the extension: asked before work is done that could not be kept.
 bool isWritableFormat(std::filesystem::path const& file);

@@ -35,6 +35,8 @@ namespace {
         GeometryFile read()
         {
             countStatements();
+            if (total_.points == 0)
+                requireObjStatements();
             for (; !in_.atEnd(); in_.nextLine())
                 readStatement();
             addCornerValues("uv", textureOf_, textures_);
@@ -69,6 +71,16 @@ namespace {
             builder_.expectFaces(total_.faces);
             textures_.reserve(total_.textures);
             normals_.reserve(total_.normals);
+        }
+
+        /// A file without points is an empty geometry, unless it is a file of another kind.
+        void requireObjStatements() const
+        {
+            TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
+            scanner.skipEmptyLines();
+            std::string_view const keyword = scanner.atEnd() ? std::string_view() : scanner.peekWord();
+            if (!keyword.empty() && !isGeometry(keyword) && !isIgnored(keyword) && keyword != "p")
+                scanner.refuse(TextScanner::quoted(keyword) + " begins no line of an OBJ file");
         }
 
         void readStatement()

@@ -40,7 +40,7 @@ namespace {
         void write(std::filesystem::path const& file)
         {
             chooseAttributes();
-            OutputFile out(file);
+            OutputFile out(file, geometry_.existing);
             writePoints(out);
             writeVectors<float2, double2>("vt", textures_, out);
             writeVectors<float3, double3>("vn", normals_, out);

@@ -36,7 +36,7 @@ namespace {
                 uncolored += std::isnan(rgba_[red]);
             if (uncolored != 0)
                 builder.note(
-                    std::to_string(uncolored) + " elements of " + component + " have no colour and become white");
+                    std::to_string(uncolored) + " " + elementNames(component) + " have no color and become white");
             while (rgba_.size < 4 * count)
                 rgba_.append(kMissing);
             if (hasFractions_)

@@ -2,7 +2,9 @@
 
 #include <atomic>
 #include <cerrno>
+#include <cstdio>
 #include <fcntl.h>
+#include <linux/limits.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -26,24 +28,61 @@ namespace {
         return file;
     }
 
+    /// The owner, and above all root, could replace such a file all the same, but somebody has asked to keep it.
+    bool isWriteProtected(std::filesystem::path const& file, std::filesystem::perms permissions)
+    {
+        using std::filesystem::perms;
+        constexpr perms kWrite = perms::owner_write | perms::group_write | perms::others_write;
+        return (permissions & kWrite) == perms::none || ::faccessat(AT_FDCWD, file.c_str(), W_OK, AT_EACCESS) != 0;
+    }
+
+    /// The name of the temporary file of one `OutputFile` at a time, as the program writes one file at a time. It is in
+    /// static memory, as a signal handler may read it at any moment.
+    struct Unfinished {
+        std::atomic<bool> isTaken = false;
+        std::atomic<bool> hasName = false;
+        char name[PATH_MAX] = {};
+
+        bool take(std::filesystem::path const& file)
+        {
+            if (file.native().size() >= sizeof(name) || isTaken.exchange(true))
+                return false;
+            std::strcpy(name, file.c_str());
+            hasName = true;
+            return true;
+        }
+
+        void release()
+        {
+            hasName = false;
+            isTaken = false;
+        }
+    };
+
+    constinit Unfinished unfinished;
+
 }
 
-OutputFile::OutputFile(std::filesystem::path const& file)
+OutputFile::OutputFile(std::filesystem::path const& file, Existing existing)
     : file_(file)
     , target_(followLinks(file))
+    , existing_(existing)
     , buffer_(std::make_unique_for_overwrite<char[]>(kBufferBytes))
 {
     std::error_code error;
     std::filesystem::file_status const status = std::filesystem::status(target_, error);
     if (std::filesystem::is_directory(status))
         fail(EISDIR);
-    if (!std::filesystem::exists(status) || std::filesystem::is_regular_file(status))
+    bool const isRegular = std::filesystem::is_regular_file(status);
+    if (isRegular && existing == Existing::Keep)
+        fail(EEXIST);
+    if (isRegular && isWriteProtected(target_, status.permissions()))
+        fail("it is write-protected");
+    if (isRegular || !std::filesystem::exists(status))
         openBeside();
-    else
-        descriptor_ = ::open(target_.c_str(), O_WRONLY | O_CLOEXEC);
-    if (descriptor_ < 0)
+    else if ((descriptor_ = ::open(target_.c_str(), O_WRONLY | O_CLOEXEC)) < 0)
         fail(errno);
-    if (std::filesystem::is_regular_file(status)) // the new file is open to whom the old one was
+    if (isRegular) // the new file is open to whom the old one was
         static_cast<void>(::fchmod(descriptor_, static_cast<mode_t>(status.permissions())));
 }
 
@@ -53,18 +92,31 @@ OutputFile::~OutputFile()
         ::close(descriptor_);
     if (!temporary_.empty())
         ::unlink(temporary_.c_str());
+    releaseTemporary();
 }
 
 void OutputFile::openBeside()
 {
     static std::atomic<unsigned int> counter = 0;
     do {
+        releaseTemporary();
         temporary_ = target_.parent_path()
             / (".modeling-" + std::to_string(::getpid()) + "-" + std::to_string(counter.fetch_add(1)) + ".tmp");
+        isRegistered_ = unfinished.take(temporary_); // before the file exists, as a signal may arrive in between
         descriptor_ = ::open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kReadAndWriteForAll);
     } while (descriptor_ < 0 && errno == EEXIST);
-    if (descriptor_ < 0)
-        temporary_.clear(); // leaves errno alone
+    if (descriptor_ < 0) {
+        int const error = errno;
+        releaseTemporary();
+        fail(error);
+    }
+}
+
+void OutputFile::releaseTemporary()
+{
+    temporary_.clear();
+    if (std::exchange(isRegistered_, false))
+        unfinished.release();
 }
 
 void OutputFile::flush()
@@ -93,14 +145,42 @@ void OutputFile::commit()
         fail(errno);
     if (temporary_.empty())
         return;
-    if (::rename(temporary_.c_str(), target_.c_str()) != 0)
-        fail(errno);
-    temporary_.clear();
+    moveIntoPlace();
+    releaseTemporary();
 }
 
-void OutputFile::fail(int error) const
+void OutputFile::moveIntoPlace() const
 {
-    throw FileError(file_.string() + " cannot be written: " + std::strerror(error));
+    if (existing_ == Existing::Keep) {
+        if (::renameat2(AT_FDCWD, temporary_.c_str(), AT_FDCWD, target_.c_str(), RENAME_NOREPLACE) == 0)
+            return;
+        bool const isUnknown = errno == EINVAL || errno == ENOSYS; // to some file systems
+        if (!isUnknown || ::access(target_.c_str(), F_OK) == 0)
+            fail(isUnknown ? EEXIST : errno);
+    }
+    if (::rename(temporary_.c_str(), target_.c_str()) != 0)
+        fail(errno);
+}
+
+void OutputFile::tryOut(std::filesystem::path const& file, Existing existing)
+{
+    std::error_code error;
+    std::filesystem::file_status const status = std::filesystem::status(file, error);
+    bool const isSpecial = std::filesystem::exists(status) && !std::filesystem::is_regular_file(status)
+        && !std::filesystem::is_directory(status);
+    if (!isSpecial) // whoever reads a pipe would take its opening and closing for the whole
+        OutputFile(file, existing);
+}
+
+void OutputFile::removeUnfinished() noexcept
+{
+    if (unfinished.hasName)
+        ::unlink(unfinished.name);
+}
+
+void OutputFile::fail(char const* why) const
+{
+    throw FileError(file_.string() + " cannot be written: " + why);
 }
 
 }

@@ -9,12 +9,13 @@
 
 namespace ModelingProgram {
 
-/// Writes a file beside its final place and moves it there when it is complete; until then, and where anything fails,
-/// what was there before stays. What is no regular file (a device, a pipe) is written directly.
+/// Writes a file beside its final place and moves it there when it is complete; until then, and if anything fails, an
+/// existing file stays as it was. What is not a regular file (a device, a pipe) is written directly.
 class OutputFile {
 public:
-    /// \throws FileError, as from all operations
-    explicit OutputFile(std::filesystem::path const& file);
+    /// \throws FileError, as all operations do: here if the folder cannot be written, or the file exists and is to be kept
+    ///         or is write-protected
+    explicit OutputFile(std::filesystem::path const& file, Existing existing = Existing::Replace);
     OutputFile(OutputFile const&) = delete;
     OutputFile& operator=(OutputFile const&) = delete;
     ~OutputFile();
@@ -55,19 +56,31 @@ public:
     template <class T> void writeBinary(T number) { write(&number, sizeof(T)); }
 
     /// Completes the file and puts it in its place.
+    /// \throws FileError  also if a file that is to be kept has appeared there in the meantime
     void commit();
+
+    /// Throws what writing the file would throw at its start, and leaves nothing behind.
+    static void tryOut(std::filesystem::path const& file, Existing existing);
+
+    /// Removes what is written of a file that is not complete: for handlers of signals that end the process.
+    static void removeUnfinished() noexcept;
 
 private:
     static constexpr std::size_t kBufferBytes = 1 << 18;
 
     void openBeside();
+    void releaseTemporary();
     void flush();
     void writeThrough(char const* data, std::size_t bytes);
-    [[noreturn]] void fail(int error) const;
+    void moveIntoPlace() const;
+    [[noreturn]] void fail(char const* why) const;
+    [[noreturn]] void fail(int error) const { fail(std::strerror(error)); }
 
     std::filesystem::path file_; // as the caller named it
     std::filesystem::path target_; // where links lead
     std::filesystem::path temporary_; // empty while there is none
+    bool isRegistered_ = false; // `removeUnfinished` knows its name
+    Existing existing_;
     int descriptor_ = -1;
     std::unique_ptr<char[]> buffer_;
     std::size_t used_ = 0;

@@ -89,7 +89,7 @@ namespace {
                 leaveOutOthers(attribute);
             header << "end_header\n";
 
-            OutputFile out(file_);
+            OutputFile out(file_, geometry_.existing);
             out << header.str();
             for (std::uint64_t point = 0; point < geometry_.pointCount(); ++point) {
                 out.writeBinary((*geometry_.positions)[point]);

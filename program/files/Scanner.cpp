@@ -32,8 +32,6 @@ InputFile::InputFile(std::filesystem::path const& file)
     std::uintmax_t const fileSize = std::filesystem::file_size(file, error);
     if (error)
         refuseFile(file, error.message());
-    if (fileSize == 0)
-        refuseFile(file, "it is empty");
     bytes = std::make_unique_for_overwrite<char[]>(fileSize);
     size = std::fread(bytes.get(), 1, fileSize, stream.get());
     if (size != fileSize)

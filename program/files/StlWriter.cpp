@@ -65,7 +65,7 @@ void writeStl(WritableGeometry& geometry, std::filesystem::path const& file)
     }
     noteUnusedPoints(geometry);
 
-    OutputFile out(file);
+    OutputFile out(file, geometry.existing);
     char header[80] = "binary STL"; // must not begin with "solid", which is how text does
     out.write(header, sizeof(header));
     out.writeBinary(static_cast<std::uint32_t>(geometry.cellCount()));

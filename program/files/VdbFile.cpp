@@ -64,9 +64,9 @@ SparseVolume readVdbGrid(std::filesystem::path const& file, std::size_t grid)
     return volume;
 }
 
-void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file)
+void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file, Existing existing)
 {
-    OutputFile out(file);
+    OutputFile out(file, existing);
     std::string bytes;
     try {
         codec<decltype(modelingWriteVdb)>("modelingWriteVdb")(volume, bytes);

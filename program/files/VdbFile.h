@@ -62,6 +62,6 @@ SparseVolume readVdbGrid(std::filesystem::path const& file, std::size_t grid);
 /// Writes a volume as an OpenVDB file with one grid; the same bytes for the same volume. The file appears under its name
 /// only when it is complete.
 /// \throws FileError  where the file cannot be written; a file of that name is then as it was
-void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file);
+void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file, Existing existing = Existing::Replace);
 
 }

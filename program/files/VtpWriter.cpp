@@ -46,7 +46,7 @@ namespace {
         void write(std::filesystem::path const& file)
         {
             declare();
-            OutputFile out(file);
+            OutputFile out(file, geometry_.existing);
             out << xml_.str() << "  <AppendedData encoding=\"raw\">\n_";
             for (Block const& block : blocks_) {
                 out.writeBinary<std::uint64_t>(block.bytes);

@@ -97,7 +97,7 @@ void leaveOut(Attribute const& attribute, std::string const& why, std::vector<st
     std::string type;
     visitArray(attribute.values, [&](auto const&, auto elementType) { type = elementType.name; });
     sentences.push_back("\"" + attribute.name + "\" (" + (type.empty() ? "" : type + ", ")
-        + std::string(attribute.component.view()) + ") is left out: " + why);
+        + elementNames(attribute.component) + ") is left out: " + why);
 }
 
 WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file)

@@ -23,6 +23,7 @@ struct WritableGeometry {
     Orvan::Ptr<Orvan::Array<unsigned int>> offsets; // of faces or strands
     std::vector<Attribute> attributes;
     std::vector<std::string> leftOut; // what the file does not hold, a sentence each
+    Existing existing = Existing::Replace;
 
     std::uint64_t pointCount() const { return positions->size; }
     /// Faces or strands.

@@ -44,9 +44,13 @@ protected:
         std::string messages;
     };
 
-    Result run(std::string const& arguments, std::string const& output = "stdout")
+    /// Replaces files, unless `replaces` is false.
+    Result run(std::string const& arguments, std::string const& output = "stdout", bool replaces = true)
     {
-        int const status = runShell("'" MODELING_PROGRAM "' " + arguments + " >" + output + " 2>stderr");
+        bool const writes = arguments.find(' ') != std::string::npos && !arguments.starts_with("info ")
+            && !arguments.starts_with("validate ");
+        int const status = runShell(
+            "'" MODELING_PROGRAM "' " + arguments + (writes && replaces ? " -f >" : " >") + output + " 2>stderr");
         return {
             WIFEXITED(status) ? WEXITSTATUS(status) : -1, contentOf(folder / "stdout"), contentOf(folder / "stderr")};
     }
@@ -166,15 +170,15 @@ TEST_F(Commands, StitchLaysTemplatesOnFacesWithAsManyCorners)
     EXPECT_THAT(run(wrong).messages,
         AllOf(HasSubstr("vertex: strand 1, control point 1\n"), HasSubstr("strand 2, control point 1\n  - polygon"),
             HasSubstr("points: edge 3\n")));
-    EXPECT_EQ(run(wrong + " --force").exitCode, 0);
+    EXPECT_EQ(run(wrong + " --allow-faults").exitCode, 0);
     EXPECT_EQ(run("stitch --template stitch-quad.obj stitch-quad-rings.obj").exitCode, 2);
-    EXPECT_EQ(run("stitch --check --template mesh.obj stitch-wrong.obj --force").exitCode, 5);
+    EXPECT_EQ(run("stitch --check --template mesh.obj stitch-wrong.obj --allow-faults").exitCode, 5);
 }
 
 TEST_F(Commands, MergeTellsWhatBecameOfAttributes)
 {
     copySamples({"cube.ply", "spider.obj"});
-    json const done = runForJson("merge cube.ply spider.obj cube.ply cube.ply --source-attribute file");
+    json const done = runForJson("merge cube.ply spider.obj cube.ply -o cube.ply --source-attribute file");
     EXPECT_EQ(at(done, {"exitCode", "after/faces"}), json({0, 6 + 1368 + 6}));
     EXPECT_EQ(done["after"], done["before"]);
     for (json const& property : done["properties"]) {
@@ -237,7 +241,7 @@ TEST_F(Commands, SubdivideCarriesWhatItCanAndSaysWhatItDrops)
     // Relative to a diagonal of √12; on a terminal with a count for each pass, and in place with the same result.
     run("subdivide tetrahedron.ply again.ply --relative 0.0866025404 --threads 1");
     EXPECT_TRUE(areEqual("again.ply", "out.ply"));
-    std::string const line = MODELING_PROGRAM " subdivide tetrahedron.ply tetrahedron.ply --tolerance 0.3";
+    std::string const line = MODELING_PROGRAM " subdivide tetrahedron.ply tetrahedron.ply --force --tolerance 0.3";
     ASSERT_EQ(runShell("script -qec '" + line + "' typescript >/dev/null"), 0);
     EXPECT_THAT(contentOf(folder / "typescript"), HasSubstr("modeling: pass 1: 12 faces"));
     EXPECT_TRUE(areEqual("tetrahedron.ply", "out.ply"));
@@ -294,6 +298,13 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
     store(folder / "cloud.ply", kCloud);
     store(folder / "list", "0 # the first\n 1 2 3 4 5 6 -1\n");
     store(folder / "broken.obj", "v 0 0 0\nf 1 2 3\n");
+    store(folder / "tiny.obj", "v 0 0 0\nv 1e-9 0 0\nv 0 1e-9 0\nv 0 0 1e-9\nf 1 3 2\nf 1 2 4\nf 2 3 4\nf 3 1 4\n");
+    store(folder / "far.obj", "v -3e38 0 0\nv 3e38 0 0\nv 0 3e38 0\nf 1 2 3\n");
+    store(folder / "seams.ply",
+        plyOf(3,
+            "property float u\nproperty float v\nelement face 1\nproperty list uchar int vertex_indices\n"
+            "property list uchar float texcoord\nend_header\n0 0 0 1 2\n1 0 0 1 2\n0 1 0 1 2\n3 0 1 2 6 1 2 3 4 5 "
+            "6\n"));
     std::filesystem::create_directory(folder / "folder.obj");
     store(folder / "out.obj", "as it was");
 
@@ -310,7 +321,7 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"subdivide cylinder.obj out.obj --relative 1e-9", 5, "finer than single precision"},
         {"subdivide cylinder.obj out.obj --relative 1e-3 --max-memory 1kB", 7, "which --max-memory allows"},
         {"subdivide cylinder.obj out.obj --tolerance 0", 2, "0 is not a positive number"},
-        {"merge cube.ply spider.obj out.obj --source-attribute normal", 5, "already has a property"},
+        {"merge cube.ply spider.obj out.ply --source-attribute normal", 5, "already has a property"},
         {"triangulate lines.obj out.obj", 5, "lines.obj holds a strand set"},
         {"triangulate cube.ply out.obj --channels '* ^'", 2, "--channels: "},
         {"remove-slivers broken.obj out.obj", 3, "broken.obj"},
@@ -322,14 +333,20 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"delete-faces cloud.ply out.obj --indices list", 5, "needs a mesh, and cloud.ply holds a point cloud"},
         {"delete-faces cube.ply out.obj --indices list", 3, "list, line 2: index 6 is out of range: there are 6 faces"},
         {"delete-points cloud.ply out.obj --attribute other", 5, "These have: label (uchar)"},
-        {"add-points cloud.ply cube.ply out.obj --tag sPointPosition", 5, "would take the place of the points"},
+        {"add-points cloud.ply cube.ply out.ply --tag sPointPosition", 5, "would take the place of the points"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb --grid no", 5, "There are: \"scale\" (float)"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume bunny.obj", 3, "it is no OpenVDB file"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb", 5, "times the smallest positive value"},
         {"make-volume bunny.obj out.vdb --attribute heat", 5, "\"heat\""},
         {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --voxel-size 1e-9", 5, "too small"},
-        {"", 2, "subcommand"},
-        {"remove-splinters a b", 2, "There is no command remove-splinters"},
+        {"delete-points cloud.ply out.stl --indices list", 3, "STL files hold no point clouds"},
+        {"delete-faces cube.ply out.stl --indices list", 3, "STL files hold triangles only, and face 0 has 4 corners"},
+        {"merge cube.ply spider.obj out.obj --source-attribute file", 5, "out.obj cannot hold the attribute \"file\""},
+        {"add-points cloud.ply cube.ply out.ply --tag x", 5, "PLY files cannot hold an attribute of the name \"x\""},
+        {"triangulate cube.ply out.obj --channels 'nor* normal'", 5, "matches \"nor*\". There are: none"},
+        {"triangulate seams.ply out.ply --channels '* ^uv'", 5, "matches \"uv\". There are: corner:uv"},
+        {"subdivide tiny.obj out.obj --tolerance 1e-12", 5, "is too fine: below 1.1920929e-07 nothing is refined"},
+        {"make-volume far.obj out.vdb --distance-to -3e38 0 0 --from 1 --to 2", 5, "too large for single precision"},
     };
     for (Case const& c : kCases) {
         Result const result = run(c.arguments);
@@ -344,6 +361,76 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
     EXPECT_EQ(run("info cylinder.obj", "/dev/full").exitCode, 3);
 }
 
+TEST_F(Commands, FilesAreReplacedOnlyWithForce)
+{
+    copySamples({"cube.ply", "cylinder.obj"});
+    std::filesystem::create_symlink("cylinder.obj", folder / "link.obj");
+    std::filesystem::create_symlink("/dev/null", folder / "null.obj");
+    std::string const before = contentOf(folder / "cylinder.obj");
+    constexpr bool kKeeps = false;
+    for (char const* const line : {"smooth cylinder.obj cylinder.obj", "smooth cube.ply link.obj",
+             "delete-faces cube.ply cylinder.obj --box 0 0 0 1 1 1", "triangulate cube.ply cylinder.obj",
+             "subdivide cylinder.obj cylinder.obj --tolerance 9", "remove-slivers none.obj cylinder.obj"}) {
+        Result const kept = run(line, "stdout", kKeeps);
+        EXPECT_EQ(kept.exitCode, 3) << line;
+        EXPECT_THAT(kept.messages, HasSubstr("cannot be written: the file exists; --force replaces it")) << line;
+    }
+    EXPECT_THAT(run("merge cube.ply cylinder.obj", "stdout", kKeeps).messages,
+        HasSubstr("the last file, cylinder.obj, exists. If it is one to read, name the file to write with -o OUT"));
+    EXPECT_EQ(contentOf(folder / "cylinder.obj"), before);
+    EXPECT_EQ(run("merge cube.ply cylinder.obj -o all.ply", "stdout", kKeeps).exitCode, 0);
+    EXPECT_EQ(run("merge cube.ply cylinder.obj new.ply", "stdout", kKeeps).exitCode, 0);
+    EXPECT_TRUE(areEqual("all.ply", "new.ply"));
+    EXPECT_EQ(run("smooth cylinder.obj null.obj", "stdout", kKeeps).exitCode, 0);
+    EXPECT_EQ(run("smooth cylinder.obj link.obj").exitCode, 0);
+    EXPECT_NE(contentOf(folder / "cylinder.obj"), before);
+
+    using std::filesystem::perms;
+    std::filesystem::permissions(folder / "new.ply", perms::owner_read);
+    EXPECT_THAT(run("smooth cube.ply new.ply").messages, HasSubstr("new.ply cannot be written: it is write-protected"));
+    EXPECT_THAT(
+        run("smooth none.obj /proc/a.obj").messages, HasSubstr("/proc/a.obj cannot be written")); // before reading
+    EXPECT_EQ(runShell("ulimit -f 2; '" MODELING_PROGRAM "' smooth cylinder.obj large.obj 2>stderr"), 3 << 8);
+    EXPECT_THAT(contentOf(folder / "stderr"), HasSubstr("File too large"));
+    for (auto const& entry : std::filesystem::directory_iterator(folder / ""))
+        EXPECT_FALSE(entry.path().filename().string().starts_with(".")) << entry;
+}
+
+TEST_F(Commands, NothingIsAGeometryToo)
+{
+    copySamples({"cube.ply", "stitch-quad.obj", "stitch-quad-rings.obj"});
+    store(folder / "cloud.ply", kCloud);
+    store(folder / "all", "");
+    for (std::string const extension : {"obj", "ply", "stl", "off", "xyz"}) {
+        if (extension == "off")
+            store(folder / "empty.off", "OFF\n0 0 0\n");
+        else if (extension == "xyz")
+            store(folder / "empty.xyz", "");
+        else if (extension == "stl")
+            ASSERT_EQ(run("triangulate empty.ply empty.stl").exitCode, 0);
+        else
+            ASSERT_EQ(run("delete-faces cube.ply --indices all --invert empty." + extension).exitCode, 0);
+        std::string const file = "empty." + extension;
+        for (std::string arguments : {"info @", "validate @", "triangulate @ o.ply", "smooth @ o.ply",
+                 "remove-slivers @ o.ply", "subdivide @ o.ply --relative 0.1", "subdivide @ o.ply --tolerance 1",
+                 "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2", "delete-faces @ o.ply --indices all",
+                 "delete-points @ o.ply --indices all", "add-points @ @ o.ply", "merge @ cube.ply -o o.ply",
+                 "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj", "merge @ @ -o o.ply",
+                 "stitch --template stitch-quad.obj stitch-quad-rings.obj --on @ o.vtp"}) {
+            for (auto at = arguments.find('@'); at != std::string::npos; at = arguments.find('@'))
+                arguments.replace(at, 1, file);
+            Result const result = run(arguments);
+            EXPECT_EQ(result.exitCode, 0) << arguments << "\n" << result.messages;
+            EXPECT_THAT(result.output, Not(HasSubstr("nan"))) << arguments;
+        }
+    }
+    EXPECT_EQ(run("delete-points cloud.ply none.xyz --indices all").exitCode, 3); // not a format that is written
+    EXPECT_EQ(runForJson("delete-points cloud.ply none.ply --indices all")["picked"], 0);
+    EXPECT_EQ(runForJson("delete-points cloud.ply none.ply --indices all --invert")["after"]["points"], 0);
+    EXPECT_EQ(runForJson("merge none.ply cloud.ply -o both.ply")["after"]["points"], 7);
+    EXPECT_EQ(run("subdivide empty.ply o.ply --tolerance 1 --volume guide.vdb").exitCode, 0);
+}
+
 TEST_F(Commands, InfoAndValidateTellAboutFiles)
 {
     copySamples({"mixed.obj"});
@@ -351,7 +438,8 @@ TEST_F(Commands, InfoAndValidateTellAboutFiles)
     EXPECT_EQ(at(runForJson("info mixed.obj"), {"topology/quads", "topology/genus"}), json({6, 0}));
     EXPECT_EQ(at(runForJson("info lines.obj"), {"inputs/0/kind", "boundingBox/min", "boundingBox/max", "topology"}),
         json({"strand set", {0, 0, -2}, {0.1, 0, 0}, nullptr}));
-    EXPECT_THAT(run("info lines.obj").output, HasSubstr("(0, 0, -2) to (0.1, 0, 0)"));
+    EXPECT_THAT(run("info lines.obj").output,
+        AllOf(HasSubstr("(0, 0, -2) to (0.1, 0, 0)"), HasSubstr("points"), Not(HasSubstr("Comp"))));
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj holds a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
     for (char const* const command : {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "make-volume ",

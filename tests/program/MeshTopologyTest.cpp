@@ -123,7 +123,7 @@ TEST(MeshRequirements, NamesFaultsWithTheirFirstPlace)
             HasSubstr("3 of 6 edges are open: no other face is on the far side. The first is the edge of face 0 from "
                       "point 1 at (1, 0.5, 0) to point 0 at (0, 0.5, 0). Fill the holes first.")));
     EXPECT_THAT(faultsOf(meshOf(3, {{0, 1, 2}, {0, 1, 2}})),
-        ElementsAre(HasSubstr("At 3 edges neighbouring faces look to opposite sides. The first is the edge of face 0 "
+        ElementsAre(HasSubstr("At 3 edges neighboring faces point to opposite sides. The first is the edge of face 0 "
                               "from point 0")));
     EXPECT_THAT(faultsOf(meshOf(8, {{0, 1, 2, 3}, {0, 3, 2, 1}, {0, 4, 5, 6, 7}, {0, 7, 6, 5, 4}})),
         ElementsAre(HasSubstr("4 faces have more than three corners. The first is face 0 with 4."),

@@ -4,6 +4,7 @@
 #include "Failure.h"
 #include "Geometry.h"
 #include "Program.h"
+#include "files/OutputFile.h"
 
 #include "support/Testing.h"
 
@@ -12,6 +13,9 @@
 #include <gmock/gmock.h>
 
 #include <csignal>
+#include <filesystem>
+
+#include <unistd.h>
 
 namespace ModelingProgram {
 
@@ -84,16 +88,29 @@ TEST(Operation, EndsAsCancelledWhenTheJobIs)
 TEST(CancelOnSignalDeathTest, StopsAtTheFirstSignalAndEndsAtTheSecond)
 {
     testing::FLAGS_gtest_death_test_style = "threadsafe";
-    for (int const signal : {SIGINT, SIGTERM}) {
-        auto const raise = [=](int times) {
-            CancelOnSignal const cancelOnSignal;
-            for (int i = 0; i != times; ++i)
-                std::raise(signal);
+    // The process that dies starts the test anew.
+    auto const owner = testing::internal::InDeathTestChild() ? ::getppid() : ::getpid();
+    auto const folder = std::filesystem::path(testing::TempDir()) / ("modeling-signals-" + std::to_string(owner));
+    std::filesystem::create_directories(folder);
+    for (int const signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE}) {
+        auto const raise = [&](int times) {
+            std::signal(signal, SIG_DFL); // not ignored, as it is in background jobs
+            {
+                CancelOnSignal const cancelOnSignal;
+                OutputFile const unfinished(folder / "out.obj");
+                for (int i = 0; i != times; ++i)
+                    std::raise(signal);
+            }
             std::exit(Orvan::isJobCancelled() ? 42 : 0);
         };
-        EXPECT_EXIT(raise(1), testing::ExitedWithCode(42), "stopping");
-        EXPECT_EXIT(raise(2), testing::KilledBySignal(signal), "stopping");
+        bool const isCancelling = signal == SIGINT || signal == SIGTERM;
+        if (isCancelling) {
+            EXPECT_EXIT(raise(1), testing::ExitedWithCode(42), "stopping");
+        }
+        EXPECT_EXIT(raise(2), testing::KilledBySignal(signal), isCancelling ? "stopping" : "");
+        EXPECT_TRUE(std::filesystem::is_empty(folder)) << signal;
     }
+    std::filesystem::remove_all(folder);
 }
 
 TEST(Report, AlignsTablesAndMendsBytes)

@@ -92,7 +92,7 @@ namespace {
         std::string const offPoints = "OFF\n3 1 0\n0 0 0\n1 0 0\n0 1 0\n",
                           solid = "solid\nfacet\nouter\nvertex 0 0 0\n";
         std::vector<Case> const cases{
-            {".obj", "hello\n", 2, "the file holds no points"},
+            {".obj", "\nhello\n", 2, "\"hello\" begins no line of an OBJ file"},
             {".obj", "v 0 nan 0", 1, "a coordinate is not finite"},
             {".obj", "v 0 1e39 0", 1, "\"1e39\" stands for a coordinate, but is no number that fits"},
             {".obj", "v 0 0\n", 1, "the line ends before a coordinate"},
@@ -135,7 +135,8 @@ namespace {
             EXPECT_THAT(refusalOf(test.extension, test.content),
                 AllOf(StartsWith(", line " + std::to_string(test.line) + ": "), HasSubstr(test.words)))
                 << test.content;
-        EXPECT_EQ(refusalOf(".obj", ""), " cannot be read: it is empty");
+        for (char const* const extension : {".ply", ".stl", ".off"})
+            EXPECT_EQ(refusalOf(extension, ""), " cannot be read: it is empty");
         EXPECT_EQ(refusalOf(".abc", "x"), " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz");
         EXPECT_EQ(refusalOf(".stl", std::string(90, '\0')),
             ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90");

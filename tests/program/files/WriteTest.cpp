@@ -1,4 +1,5 @@
 #include "FileSupport.h"
+#include "OutputFile.h"
 
 #include <csignal>
 #include <sstream>
@@ -119,8 +120,8 @@ namespace {
             addDataProperty<int>("x", sPointComp, someValues<int>(5), *mesh);
             Written const file = written(*mesh, ".ply");
             EXPECT_THAT(file.notes,
-                ElementsAre(HasSubstr("\"x\" (int, sPointComp) is left out"),
-                    HasSubstr("\"chosen\" is written as uchar"), HasSubstr("\"two words\"")));
+                ElementsAre(HasSubstr("\"x\" (int, points) is left out"), HasSubstr("\"chosen\" is written as uchar"),
+                    HasSubstr("\"two words\"")));
             EXPECT_EQ(valuesOf<unsigned char>(*file.object, "chosen"), std::vector<unsigned char>{1});
             EXPECT_EQ(valuesOf<unsigned int>(*file.object, sFaceVertex), valuesOf<unsigned int>(*mesh, sFaceVertex));
             EXPECT_EQ(valuesOf<float2>(*file.object, "uv"), valuesOf<float2>(*mesh, "uv"));
@@ -154,10 +155,10 @@ namespace {
         addDataProperty<int>("of range", "range", {1}, *mesh);
         Written const file = written(*mesh, ".obj");
         EXPECT_THAT(file.notes,
-            ElementsAre("\"part\" (int, sFaceComp) is left out: it has 3 values for 2 elements",
+            ElementsAre("\"part\" (int, faces) is left out: it has 3 values for 2 elements",
                 HasSubstr("\"of range\" (int, range) is left out"),
                 HasSubstr("\"color\" is written as three fractions a point"),
-                HasSubstr("\"heat\" (float, sPointComp) is left out")));
+                HasSubstr("\"heat\" (float, points) is left out")));
         EXPECT_THAT(file.content,
             AllOf(HasSubstr("v 1 0 0 1 0 0.2\n"), HasSubstr("\nvt 0 0.1\nvn "),
                 HasSubstr("f 1/1/1 2/1/2 3/1/3\nf 1/1/1 3/1/3 5/1/5 4/1/4\n")));
@@ -311,6 +312,11 @@ namespace {
         EXPECT_THAT(contentOf(folder / "real.obj"), HasSubstr("f 1 2 3"));
         EXPECT_EQ(std::filesystem::status(folder / "real.obj").permissions(), perms::owner_read | perms::owner_write);
         EXPECT_EQ(folder.entryCount(), 2);
+
+        OutputFile late(folder / "late.obj", Existing::Keep);
+        store(folder / "late.obj", "of another program");
+        EXPECT_THROW(late.commit(), FileError);
+        EXPECT_EQ(contentOf(folder / "late.obj"), "of another program");
     }
 
 }

@@ -1,0 +1,129 @@
+#include "CommandLine.h"
+
+#include "Program.h"
+
+#include "support/Random.h"
+#include "support/TemporaryFolder.h"
+
+#include <gmock/gmock.h>
+
+#include <algorithm>
+#include <array>
+#include <filesystem>
+#include <iterator>
+#include <sstream>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using testing::HasSubstr;
+
+    struct Result {
+        int exitCode;
+        std::string output;
+        std::string messages;
+    };
+
+    Result run(std::vector<std::string> const& arguments)
+    {
+        std::vector<char const*> line{"modeling"};
+        for (std::string const& argument : arguments)
+            line.push_back(argument.c_str());
+        testing::internal::CaptureStdout();
+        testing::internal::CaptureStderr();
+        int const exitCode = runProgram(static_cast<int>(line.size()), line.data());
+        return {exitCode, testing::internal::GetCapturedStdout(), testing::internal::GetCapturedStderr()};
+    }
+
+    std::vector<std::string> wordsOf(std::string const& text)
+    {
+        std::istringstream stream(text);
+        return {std::istream_iterator<std::string>(stream), {}};
+    }
+
+    std::vector<std::string> const kCommands = {"info", "validate", "add-points", "delete-points", "delete-faces",
+        "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch"};
+
+}
+
+TEST(CommandLine, TakesAnyArgumentsWithoutHarm)
+{
+    // Files are in a folder that does not exist: nothing is ever read or written.
+    std::vector<std::string> const words = {"", "", "no/a.obj", "no/b.ply", "no/c.vdb", "no/", "--json",
+        "--json=", "-f", "--threads", "2", "-1", "-.5", "1e999", "nan", "--indices", "--box", "--attribute", "--invert",
+        "--tag", "-o", "--output=", "--source-attribute", "--channels", "--channels=", "--amount", "--weights",
+        "--pin-attribute", "--ratio", "--tolerance", "--relative", "--volume", "--grid", "--max-memory", "4GB", "9QB",
+        "--distance-to", "--from", "--to", "--voxels", "--band", "--template", "--on", "--check", "--rotate", "--wrong",
+        "-", "--", "--=", "-=", "---", "[]", "{}", "[a,b]", "%%", "=", "\"", "'", " ", "\n", "\xff", "info", "--help",
+        "--version"};
+    TestSupport::Random random(1);
+    for (int i = 0; i != 2000; ++i) {
+        std::vector<std::string> line;
+        if (random.below(20) != 0)
+            line.push_back(kCommands[random.below(kCommands.size())]);
+        for (std::size_t count = random.below(12); count != 0; --count)
+            line.insert(line.end(), 1 + random.below(9) / 8, words[random.below(words.size())]);
+        Result const result = run(line);
+        std::string const shown = testing::PrintToString(line);
+        bool const hasEmpty = std::any_of(line.begin(), line.end(),
+            [](std::string const& word) { return word.empty() || (word.starts_with("--") && word.ends_with("=")); });
+        EXPECT_EQ(hasEmpty, result.messages.starts_with("modeling: an argument is empty\n"))
+            << shown << result.messages;
+        EXPECT_THAT((std::array{0, 2, 3, 5}), testing::Contains(result.exitCode)) << shown << result.messages;
+        EXPECT_EQ(result.exitCode != 0, result.messages.starts_with("modeling: ")) << shown << result.messages;
+        ASSERT_FALSE(testing::Test::HasFailure());
+    }
+    EXPECT_FALSE(std::filesystem::exists("no"));
+}
+
+TEST(CommandLine, SaysWhatIsWrongAndWhatMayBeMeant)
+{
+    struct Case {
+        char const* line;
+        char const* message;
+    };
+    constexpr Case kCases[] = {
+        {"", "modeling: no command is given\nRun \"modeling --help\""},
+        {"remove-splinters a b", "there is no command remove-splinters; did you mean remove-slivers?"},
+        {"xyzzy a b", "there is no command xyzzy\n"},
+        {"--json info a", "--json belongs after the command: info --json\n"},
+        {"smooth a", "modeling: smooth needs OUT\nRun \"modeling smooth --help\""},
+        {"smooth a b c", "\"c\" is one argument more than smooth takes"},
+        {"smooth a b --wieghts c", "smooth has no option --wieghts; did you mean --weights?"},
+        {"delete-faces a --indexes b", "delete-faces has no option --indexes; did you mean --indices?"},
+        {"delete-faces a b", "delete-faces needs one of --indices, --box, --attribute\n"},
+        {"delete-faces a b --indices c --attribute d", "takes only one of --indices, --box, --attribute\n"},
+        {"delete-faces a b --box 1 2 3", "--box takes 6 values, and there are 3"},
+        {"delete-faces a b --box -.5 2 3 -4 5 nan", "--box: nan is not a number"},
+        {"smooth a b --amount 1 --amount 2", "--amount is given more than once"},
+        {"smooth a b --threads", "--threads needs a value"},
+        {"smooth a b --threads 2.5", "--threads: 2.5 is not a whole number"},
+        {"make-volume a b --attribute c --from 1e99 --to 1", "--from: 1e99 is not a number"},
+        {"subdivide a b --tolerance 1 --max-memory 4QB", "4QB is not a number of bytes, such as 500MB or 4GB"},
+    };
+    for (Case const& c : kCases) {
+        Result const result = run(wordsOf(c.line));
+        EXPECT_EQ(result.exitCode, 2) << c.line;
+        EXPECT_THAT(result.messages, HasSubstr(c.message)) << c.line;
+    }
+}
+
+TEST(CommandLine, HelpFitsATerminalAndNamesThings)
+{
+    std::vector<std::vector<std::string>> lines = {{"--help"}};
+    for (std::string const& command : kCommands)
+        lines.push_back({command, "--help"});
+    for (std::vector<std::string> const& line : lines) {
+        Result const result = run(line);
+        EXPECT_EQ(result.exitCode, 0);
+        std::istringstream stream(result.output);
+        for (std::string row; std::getline(stream, row);)
+            EXPECT_LE(row.size(), 100) << row;
+        EXPECT_THAT(result.output, Not(HasSubstr("sPoint"))) << line[0];
+        bool const writes = line.size() == 2 && line[0] != "info" && line[0] != "validate";
+        EXPECT_EQ(result.output.find("-f,--force ") != std::string::npos, writes) << line[0];
+    }
+}
+
+}
