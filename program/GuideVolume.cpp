@@ -1,6 +1,8 @@
 #include "GuideVolume.h"
 
+#include "Cancellation.h"
 #include "Failure.h"
+#include "MemoryLimit.h"
 #include "files/VdbFile.h"
 
 #include <Modeling/subdivideByVolume.h>
@@ -90,6 +92,17 @@ namespace {
                 grid));
     }
 
+    void requireMemory(VdbGridSize const& size, std::filesystem::path const& file, MemoryLimit const& limit)
+    {
+        // The list of voxels is in memory beside OpenVDB's tree first, and then beside the library's tiles with their
+        // borders, which take more: twice as much in bands, and this much per voxel in solid regions.
+        constexpr std::uint64_t kTilesPerTree = 2, kTileBytesPerVoxel = 18, kCodecBytes = 32'000'000;
+        limit.require(kCodecBytes + size.activeVoxels * sizeof(Voxel)
+                + std::max(kTilesPerTree * size.treeBytes, size.activeVoxels * kTileBytesPerVoxel),
+            fmt::format("reading {} of {}", countOf(size.activeVoxels, "voxel"), file.string()),
+            "A volume with larger voxels takes less.");
+    }
+
     void shiftIndex(int& index, double by, SparseVolume const& volume)
     {
         double const shifted = index + by;
@@ -107,10 +120,14 @@ template <class Traits> GuideVolume::Tiles<Traits>::Tiles(VolumeSource const& so
 {
 }
 
-GuideVolume::GuideVolume(GuideOptions const& options, Report& report)
+GuideVolume::GuideVolume(GuideOptions const& options, Report& report, MemoryLimit const* limit)
 {
     std::size_t const grid = chooseGrid(options, listVdbGrids(options.file));
-    SparseVolume volume = readVdbGrid(options.file, grid);
+    SparseVolume volume = readVdbGrid(options.file, grid, [&](VdbGridSize const& size) {
+        if (limit)
+            requireMemory(size, options.file, *limit);
+    });
+    stopIfCancelled();
     report.document["inputs"].push_back({{"file", options.file.string()}, {"format", "OpenVDB"}, {"kind", "volume"}});
     if (options.leastValue) {
         auto const raise = [&](float& value) { value = std::max(value, *options.leastValue); };
@@ -120,6 +137,7 @@ GuideVolume::GuideVolume(GuideOptions const& options, Report& report)
     describe(volume, report);
     placeOnLattice(volume);
     build(volume, options.tileSide);
+    stopIfCancelled();
 }
 
 void GuideVolume::describe(SparseVolume& volume, Report& report)

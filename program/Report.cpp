@@ -103,7 +103,8 @@ std::string formatSeconds(double seconds)
 
 std::string formatBytes(std::uint64_t bytes)
 {
-    return fmt::format("{:.1f} MB", static_cast<double>(bytes) * 1e-6);
+    auto const megabytes = static_cast<double>(bytes) * 1e-6;
+    return megabytes < 1e4 ? fmt::format("{:.1f} MB", megabytes) : fmt::format("{:.1f} GB", megabytes * 1e-3);
 }
 
 std::string formatTable(std::vector<Column> const& columns, std::vector<std::vector<std::string>> const& rows)

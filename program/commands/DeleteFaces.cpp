@@ -5,6 +5,7 @@
 #include "MeshTopology.h"
 #include "Operation.h"
 #include "Selection.h"
+#include "Shape.h"
 
 #include <Modeling/deleteFaces.h>
 #include <TessaraGeometry/Names.h>
@@ -43,12 +44,12 @@ namespace {
         Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "delete-faces", options.in);
         requireFacesWithCorners(*mesh, options.in);
-        Json const before = countsOf(*mesh);
+        Json const before = countsAndArea(*mesh);
         Orvan::Array<bool> const picked = pickElements(options.selection, kFaces, *mesh, report);
         runOperation(
             report, [&] { requireDone("delete-faces", Tessara::GeometryAlgorithms::deleteFaces(picked, *mesh)); });
         saveGeometry(*mesh, options.out, report);
-        reportOperation(before, countsOf(*mesh), {}, report);
+        reportOperation(before, countsAndArea(*mesh), {}, report);
     }
 
 }
