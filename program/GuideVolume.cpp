@@ -1,7 +1,9 @@
 #include "GuideVolume.h"
 
+#include "Cancellation.h"
 #include "Failure.h"
 #include "LargeFaces.h"
+#include "MemoryLimit.h"
 #include "files/VdbFile.h"
 
 #include <Modeling/subdivideByVolume.h>
@@ -93,6 +95,16 @@ namespace {
                 grid));
     }
 
+    void requireMemory(VdbGridSize const& size, std::filesystem::path const& file, MemoryLimit const& limit)
+    {
+        // OpenVDB's tree is in memory beside the values taken from it, and these beside the library's tiles: each of the
+        // three takes at most as much as the tree, and tiles, which may be cut in other places, at most twice as much.
+        constexpr std::uint64_t kTreesInMemory = 3, kCodecBytes = 32'000'000;
+        limit.require(kCodecBytes + kTreesInMemory * size.treeBytes,
+            fmt::format("reading {} of {}", countOf(size.activeVoxels, "voxel"), file.string()),
+            "A volume with larger voxels takes less.");
+    }
+
     void shiftIndex(int& index, double by, SparseVolume const& volume)
     {
         double const shifted = index + by;
@@ -104,10 +116,14 @@ namespace {
 
 }
 
-GuideVolume::GuideVolume(GuideOptions const& options, Report& report)
+GuideVolume::GuideVolume(GuideOptions const& options, Report& report, MemoryLimit const* limit)
 {
     std::size_t const grid = chooseGrid(options, listVdbGrids(options.file));
-    SparseVolume volume = readVdbGrid(options.file, grid);
+    SparseVolume volume = readVdbGrid(options.file, grid, [&](VdbGridSize const& size) {
+        if (limit)
+            requireMemory(size, options.file, *limit);
+    });
+    stopIfCancelled();
     report.document["inputs"].push_back({{"file", options.file.string()}, {"format", "OpenVDB"}, {"kind", "volume"}});
     if (options.leastValue) {
         auto const raise = [&](float& value) { value = std::max(value, *options.leastValue); };
@@ -117,6 +133,7 @@ GuideVolume::GuideVolume(GuideOptions const& options, Report& report)
     describe(volume, report);
     placeOnLattice(volume);
     build(volume, options.tileSide);
+    stopIfCancelled();
 }
 
 void GuideVolume::describe(SparseVolume& volume, Report& report)

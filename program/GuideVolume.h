@@ -15,6 +15,7 @@
 
 namespace ModelingProgram {
 
+class MemoryLimit;
 struct SparseVolume;
 
 /// The volume that a command line asks for.
@@ -32,8 +33,9 @@ void addGuideOptions(GuideOptions& options, Command& command);
 class GuideVolume {
 public:
     /// Reads the grid, and tells what is in it. A value that is not above 0 leaves faces alone, with a warning.
+    /// \param limit  asked before values are read, unless it is null
     /// \throws Failure, FileError  where there is no such grid, or the library cannot hold it
-    GuideVolume(GuideOptions const& options, Report& report);
+    GuideVolume(GuideOptions const& options, Report& report, MemoryLimit const* limit = nullptr);
 
     std::string const& grid() const { return grid_; }
     /// Nothing where no value is above 0.

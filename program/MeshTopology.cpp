@@ -1,9 +1,9 @@
 #include "MeshTopology.h"
 
+#include "EdgeSides.h"
+
 #include <TessaraGeometry/Makers.h>
 
-#include <tbb/blocked_range.h>
-#include <tbb/parallel_for.h>
 #include <tbb/parallel_sort.h>
 
 #include <algorithm>
@@ -51,20 +51,6 @@ namespace {
         std::vector<unsigned int> parents_;
     };
 
-    /// A side of an edge, listed at the lower of its two points.
-    struct Side {
-        unsigned int higherPoint;
-        unsigned int corner; // where it starts
-        unsigned int nextCorner; // where it ends
-        friend auto operator<=>(Side const&, Side const&) = default;
-    };
-
-    /// The sides at point p begin at `offsets[p]`, those of one edge next to one another.
-    struct EdgeSides {
-        std::vector<unsigned int> offsets;
-        std::vector<Side> sides;
-    };
-
     /// The fans of faces around the points: sets of corners, each at one point.
     using Fans = DisjointSets;
 
@@ -91,47 +77,6 @@ namespace {
             if (hasRepeatedPoint(corners, scratch))
                 topology.facesWithRepeatedPoints.add(face);
         }
-    }
-
-    /// Calls `visit(corner, next corner)` for each side of each face that has sides.
-    template <class Visit> void forEachSide(MeshArrays const& mesh, Visit const& visit)
-    {
-        unsigned int const* const offset = mesh.faceOffset->data;
-        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
-            if (offset[face + 1] - offset[face] < 3)
-                continue;
-            unsigned int const last = offset[face + 1] - 1;
-            for (unsigned int corner = offset[face]; corner != last; ++corner)
-                visit(corner, corner + 1);
-            visit(last, offset[face]);
-        }
-    }
-
-    EdgeSides listEdgeSides(MeshArrays const& mesh)
-    {
-        unsigned int const* const point = mesh.faceVertex->data;
-        EdgeSides edges;
-        edges.offsets.resize(std::size_t{mesh.pointCount()} + 1);
-        forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
-            if (point[corner] != point[next])
-                ++edges.offsets[std::min(point[corner], point[next])];
-        });
-        std::inclusive_scan(edges.offsets.begin(), edges.offsets.end(), edges.offsets.begin());
-        edges.sides.resize(edges.offsets.back());
-        // Filling from the ends leaves the beginnings behind.
-        forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
-            auto const [lower, higher] = std::minmax(point[corner], point[next]);
-            if (lower != higher)
-                edges.sides[--edges.offsets[lower]] = {higher, corner, next};
-        });
-
-        // Each point sorts its own sides.
-        tbb::parallel_for(tbb::blocked_range<std::size_t>(0, mesh.pointCount(), 1000), [&](auto const& points) {
-            Side* const sides = edges.sides.data();
-            for (std::size_t p = points.begin(); p != points.end(); ++p)
-                std::sort(sides + edges.offsets[p], sides + edges.offsets[p + 1]);
-        });
-        return edges;
     }
 
     /// What is around one edge: `lower` is its lower point, `sides` are in ascending order.
@@ -172,25 +117,9 @@ namespace {
         }
     }
 
-    /// Calls `visit(lower point, sides in ascending order)` for each edge.
-    template <class Visit> void forEachEdge(MeshArrays const& mesh, Visit const& visit)
+    void examineEdges(MeshArrays const& mesh, EdgeSides const& edges, Fans& fans, MeshTopology& topology)
     {
-        EdgeSides const edges = listEdgeSides(mesh);
-        for (unsigned int point = 0; point != mesh.pointCount(); ++point) {
-            Side const* const end = edges.sides.data() + edges.offsets[point + 1];
-            for (Side const* first = edges.sides.data() + edges.offsets[point]; first != end;) {
-                unsigned int const higherPoint = first->higherPoint;
-                Side const* const last =
-                    std::find_if(first, end, [=](Side const& side) { return side.higherPoint != higherPoint; });
-                visit(point, std::span<Side const>(first, last));
-                first = last;
-            }
-        }
-    }
-
-    void examineEdges(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
-    {
-        forEachEdge(mesh, [&](unsigned int lower, std::span<Side const> sides) {
+        edges.forEachEdge(0, mesh.pointCount(), [&](unsigned int lower, std::span<Side const> sides) {
             examineEdge(mesh, lower, sides, topology);
             joinFans(mesh, lower, sides, fans);
         });
@@ -220,19 +149,13 @@ namespace {
     void countParts(MeshArrays const& mesh, MeshTopology& topology)
     {
         DisjointSets parts(mesh.pointCount());
-        std::vector<bool> isUsed(mesh.pointCount());
-        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
-            for (unsigned int const point : mesh.corners(face)) {
+        for (unsigned int face = 0; face != mesh.faceCount(); ++face)
+            for (unsigned int const point : mesh.corners(face))
                 parts.join(mesh.corners(face)[0], point);
-                isUsed[point] = true;
-            }
-        }
-        for (unsigned int point = 0; point != mesh.pointCount(); ++point) {
-            if (!isUsed[point])
-                topology.isolatedPoints.add(point);
-            else if (parts.isRoot(point))
-                ++topology.partCount;
-        }
+        for (unsigned int point = 0; point != mesh.pointCount(); ++point)
+            topology.partCount += parts.isRoot(point) ? 1u : 0u;
+        topology.isolatedPoints = findIsolatedPoints(mesh);
+        topology.partCount -= topology.isolatedPoints.count; // each is a set of its own
     }
 
     float distance(float3 const& a, float3 const& b)
@@ -288,33 +211,39 @@ bool MeshTopology::isClosedManifold() const
 
 MeshTopology analyseTopology(MeshArrays const& mesh)
 {
+    return analyseTopology(mesh, EdgeSides(mesh));
+}
+
+MeshTopology analyseTopology(MeshArrays const& mesh, EdgeSides const& edges)
+{
     MeshTopology topology;
     countFaces(mesh, topology);
     {
         Fans fans(mesh.cornerCount());
-        examineEdges(mesh, fans, topology);
+        examineEdges(mesh, edges, fans, topology);
         countPinchedPoints(mesh, fans, topology);
     }
     countParts(mesh, topology);
     if (topology.isClosedManifold()) {
         auto const points = static_cast<std::int64_t>(mesh.pointCount() - topology.isolatedPoints.count);
-        auto const edges = static_cast<std::int64_t>(topology.edgeCount);
-        std::int64_t const eulerCharacteristic = points - edges + std::int64_t{mesh.faceCount()};
+        std::int64_t const eulerCharacteristic =
+            points - static_cast<std::int64_t>(topology.edgeCount) + std::int64_t{mesh.faceCount()};
         topology.genus = static_cast<std::int64_t>(topology.partCount) - eulerCharacteristic / 2;
     }
     return topology;
 }
 
-std::vector<unsigned int> boundaryPoints(MeshArrays const& mesh)
+Finding findIsolatedPoints(MeshArrays const& mesh)
 {
-    std::vector<unsigned int> points;
-    forEachEdge(mesh, [&](unsigned int lower, std::span<Side const> sides) {
-        if (sides.size() == 1)
-            points.insert(points.end(), {lower, sides[0].higherPoint});
-    });
-    std::sort(points.begin(), points.end());
-    points.erase(std::unique(points.begin(), points.end()), points.end());
-    return points;
+    std::vector<bool> isUsed(mesh.pointCount());
+    for (unsigned int face = 0; face != mesh.faceCount(); ++face)
+        for (unsigned int const point : mesh.corners(face))
+            isUsed[point] = true;
+    Finding isolated;
+    for (unsigned int point = 0; point != mesh.pointCount(); ++point)
+        if (!isUsed[point])
+            isolated.add(point);
+    return isolated;
 }
 
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio)

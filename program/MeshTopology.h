@@ -72,11 +72,15 @@ struct MeshTopology {
     bool isClosedManifold() const;
 };
 
-/// Takes any valid mesh. Linear, but for sorting the edges at each point; takes up to 16 bytes a corner and 9 a point.
-MeshTopology analyseTopology(MeshArrays const& mesh);
+class EdgeSides;
 
-/// The points of open edges, ascending.
-std::vector<unsigned int> boundaryPoints(MeshArrays const& mesh);
+/// Takes any valid mesh. Linear, but for sorting the edges at each point; takes up to 16 bytes per corner and 9 per point.
+MeshTopology analyseTopology(MeshArrays const& mesh);
+/// The same with the edges of the mesh, for those who need them further.
+MeshTopology analyseTopology(MeshArrays const& mesh, EdgeSides const& edges);
+
+/// The points of no face.
+Finding findIsolatedPoints(MeshArrays const& mesh);
 
 /// The faces whose shortest edge is shorter than `ratio` times their longest one, as the library measures them.
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio);

@@ -2,6 +2,7 @@
 
 #include "Cancellation.h"
 #include "Failure.h"
+#include "NearestPlace.h"
 
 #include <algorithm>
 #include <array>
@@ -12,66 +13,10 @@
 
 namespace ModelingProgram {
 
-using Tessara::Math::double3;
-using Tessara::Math::float3;
 using TSR::TileTree3D::IJK;
 using TSR::TileTree3D::Voxel;
 
 namespace {
-
-    /// A corner of a piece of surface, in voxels.
-    struct Corner {
-        double3 place;
-        double number;
-    };
-    using Triangle = std::array<Corner, 3>;
-
-    double3 operator-(double3 const& a, double3 const& b)
-    {
-        return {a.x - b.x, a.y - b.y, a.z - b.z};
-    }
-
-    double dot(double3 const& a, double3 const& b)
-    {
-        return a.x * b.x + a.y * b.y + a.z * b.z;
-    }
-
-    Corner blend(Corner const& a, Corner const& b, double t)
-    {
-        auto const between = [t](double from, double to) { return from + t * (to - from); };
-        return {{between(a.place.x, b.place.x), between(a.place.y, b.place.y), between(a.place.z, b.place.z)},
-            between(a.number, b.number)};
-    }
-
-    /// The nearest place of a triangle. Ericson, "Real-Time Collision Detection", 2005, 5.1.5.
-    Corner nearestOf(Triangle const& triangle, double3 const& p)
-    {
-        auto const& [a, b, c] = triangle;
-        double3 const ab = b.place - a.place, ac = c.place - a.place;
-        double3 const ap = p - a.place, bp = p - b.place, cp = p - c.place;
-        double const abA = dot(ab, ap), acA = dot(ac, ap);
-        if (abA <= 0 && acA <= 0)
-            return a;
-        double const abB = dot(ab, bp), acB = dot(ac, bp);
-        if (abB >= 0 && acB <= abB)
-            return b;
-        double const areaC = abA * acB - abB * acA;
-        if (areaC <= 0 && abA >= 0 && abB <= 0)
-            return blend(a, b, abA / (abA - abB));
-        double const abC = dot(ab, cp), acC = dot(ac, cp);
-        if (acC >= 0 && abC <= acC)
-            return c;
-        double const areaB = abC * acA - abA * acC;
-        if (areaB <= 0 && acA >= 0 && acC <= 0)
-            return blend(a, c, acA / (acA - acC));
-        double const areaA = abB * acC - abC * acB;
-        double const beyondB = acB - abB, beyondC = abC - acC;
-        if (areaA <= 0 && beyondB >= 0 && beyondC >= 0)
-            return blend(b, c, beyondB / (beyondB + beyondC));
-        double const area = areaA + areaB + areaC, v = areaB / area, w = areaC / area;
-        return {{a.place.x + ab.x * v + ac.x * w, a.place.y + ab.y * v + ac.y * w, a.place.z + ab.z * v + ac.z * w},
-            a.number + (b.number - a.number) * v + (c.number - a.number) * w};
-    }
 
     class Band {
     public:
@@ -114,7 +59,9 @@ namespace {
                 keys.push_back(key);
             std::sort(keys.begin(), keys.end());
             std::vector<Voxel> result;
+            result.reserve(voxelCount_);
             for (std::uint64_t const key : keys) {
+                stopIfCancelled();
                 Block const& block = *blocks_.at(key);
                 auto const firstOf = [key](
                                          int shift) { return static_cast<int>(key >> shift & kAxisMask) * kBlockSide; };
@@ -127,8 +74,11 @@ namespace {
             return result;
         }
 
+        static constexpr int kBlockSide = 8;
+        static constexpr double kBytesPerBlock = 12.0 * kBlockSide * kBlockSide * kBlockSide + 100; // with its place
+
     private:
-        static constexpr int kBlockSide = 8, kBlockVoxels = kBlockSide * kBlockSide * kBlockSide;
+        static constexpr int kBlockVoxels = kBlockSide * kBlockSide * kBlockSide;
         static constexpr int kAxisBits = 21;
         static constexpr std::uint64_t kAxisMask = (1 << kAxisBits) - 1;
         static constexpr double kFar = std::numeric_limits<double>::infinity();
@@ -150,9 +100,11 @@ namespace {
             auto const [j0, j1] = range(&double3::y);
             auto const [k0, k1] = range(&double3::z);
             for (int k = k0; k <= k1; ++k)
-                for (int j = j0; j <= j1; ++j)
+                for (int j = j0; j <= j1; ++j) {
+                    stopIfCancelled(); // a wide band has many voxels around a single piece
                     for (int i = i0; i <= i1; ++i)
                         offer(t, i, j, k);
+                }
         }
 
         void offer(Triangle const& triangle, int i, int j, int k)
@@ -169,6 +121,7 @@ namespace {
             std::size_t const voxel =
                 x % kBlockSide + (y % kBlockSide + std::size_t{z % kBlockSide} * kBlockSide) * kBlockSide;
             if (distance < block.distance[voxel]) {
+                voxelCount_ += block.distance[voxel] == kFar ? 1u : 0u;
                 block.distance[voxel] = distance;
                 block.value[voxel] = valueAt(nearest);
             }
@@ -203,14 +156,21 @@ namespace {
         std::unordered_map<std::uint64_t, std::unique_ptr<Block>> blocks_;
         Block* last_ = nullptr;
         std::uint64_t lastKey_ = 0;
+        std::uint64_t voxelCount_ = 0;
     };
 
-    /// The lower corner of what the band can reach.
-    IJK lowestVoxel(MeshArrays const& mesh, double voxelSize, double halfWidth)
+    /// What the band can reach: all its voxels are at least at `lowest`.
+    struct Reach {
+        IJK lowest;
+        std::array<double, 3> sides; // in voxels
+    };
+
+    Reach reachOf(MeshArrays const& mesh, double voxelSize, double halfWidth)
     {
         constexpr double kMostAlong = 1 << 24, kFarthest = 2e9;
         int lowest[3];
-        for (int axis = 0; axis != 3; ++axis) {
+        Reach reach;
+        for (std::size_t axis = 0; axis != 3; ++axis) {
             double low = std::numeric_limits<double>::infinity(), high = -low;
             for (float3 const& p : *mesh.positions) {
                 double const coordinate = (axis == 0 ? p.x : axis == 1 ? p.y : p.z) / voxelSize;
@@ -222,19 +182,54 @@ namespace {
                     "voxels of that size are too small: there would be more than 16 million of them along the mesh, or "
                     "more than 2 billion from the origin to the mesh");
             lowest[axis] = static_cast<int>(std::floor(low));
+            reach.sides[axis] = high - low;
         }
-        return {lowest[0], lowest[1], lowest[2]};
+        reach.lowest = {lowest[0], lowest[1], lowest[2]};
+        return reach;
     }
 
+    double3 placeOf(float3 const& p, double voxelSize)
+    {
+        return {p.x / voxelSize, p.y / voxelSize, p.z / voxelSize};
+    }
+
+}
+
+BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth)
+{
+    // A band around a piece of plane holds its area times its width. It touches the cubic blocks of side s whose centers
+    // are within half the width and half the block's extent along the normal n, which is s (|nx| + |ny| + |nz|).
+    constexpr double kBlockVoxels = Band::kBlockSide * Band::kBlockSide * Band::kBlockSide;
+    double voxels = 0, touched = 0;
+    for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
+        auto const corners = mesh.corners(face);
+        for (std::size_t i = 2; i < corners.size(); ++i) {
+            double3 const origin = placeOf((*mesh.positions)[corners[0]], voxelSize);
+            double3 const a = placeOf((*mesh.positions)[corners[i - 1]], voxelSize) - origin;
+            double3 const b = placeOf((*mesh.positions)[corners[i]], voxelSize) - origin;
+            double3 const n = cross(a, b);
+            voxels += halfWidth * length(n);
+            touched += halfWidth * length(n) + 0.5 * Band::kBlockSide * (std::abs(n.x) + std::abs(n.y) + std::abs(n.z));
+        }
+    }
+    auto const sides = reachOf(mesh, voxelSize, halfWidth).sides;
+    double const box = sides[0] * sides[1] * sides[2];
+    BandSize size;
+    size.voxels = std::min(voxels, box);
+    double const blocks = std::min(touched, box) / kBlockVoxels;
+    // A leaf of OpenVDB, and the bytes of the file, whose buffer doubles as it grows; and OpenVDB itself.
+    constexpr double kWrittenPerBlock = 2300, kWrittenPerVoxel = 12, kCodecBytes = 32e6;
+    size.bytes = kCodecBytes + size.voxels * sizeof(Voxel)
+        + std::max(blocks * Band::kBytesPerBlock, blocks * kWrittenPerBlock + size.voxels * kWrittenPerVoxel);
+    return size;
 }
 
 std::vector<Voxel> voxelsAround(MeshArrays const& mesh, SurfaceValue const& value, double voxelSize, double halfWidth)
 {
     constexpr unsigned int kFacesBetweenLooks = 1024;
-    Band band(lowestVoxel(mesh, voxelSize, halfWidth), value, voxelSize, halfWidth);
+    Band band(reachOf(mesh, voxelSize, halfWidth).lowest, value, voxelSize, halfWidth);
     auto const cornerAt = [&](unsigned int point) {
-        float3 const& p = (*mesh.positions)[point];
-        return Corner{{p.x / voxelSize, p.y / voxelSize, p.z / voxelSize},
+        return Corner{placeOf((*mesh.positions)[point], voxelSize),
             value.pointNumbers.empty() ? 0 : double{value.pointNumbers[point]}};
     };
     for (unsigned int face = 0; face != mesh.faceCount(); ++face) {

@@ -7,8 +7,14 @@
 
 namespace Geometry::Mesh {
 
-/// Relaxes the points of a polygon mesh within its surface: noise along the surface and uneven edges go, the shape
-/// stays.
+/// Evens out the edges of a polygon mesh by tangential Laplacian smoothing: each point moves towards the middle of the
+/// faces around it, within the plane that touches the surface at the point.
+///
+/// It is for rounded surfaces whose faces are small compared to their curvature, such as scans, where noise along the
+/// surface and uneven edges vanish and the shape changes little. It is not for parts with sharp edges: a point at an edge
+/// or a corner slides along the mean of its faces' planes, which is off all of them, so that edges fray, corners retreat,
+/// and thin walls may fold over. Where the surface curves, a point leaves it by about the square of its move over twice the
+/// radius. Weights of 0 hold the points that have to stay; a flat region between them stays flat.
 ///
 /// `amount` is cut into steps of at most 0.9. In a step of the increment i every point moves by i times the way to a
 /// target, without the part of it along the point's normal. The target is the mean of the centroids of the triangles

@@ -8,6 +8,10 @@ namespace Geometry::Mesh {
 /// Refines a closed triangle mesh by adaptive √3-subdivision, until every face fits into twice `tolerance` along every
 /// axis.
 ///
+/// It is for smooth shapes that a coarse mesh stands for: characters, organic forms, reduced scans. It is not for parts with
+/// sharp edges or flat sides: every edge and corner is rounded, by an amount that depends on the size of the coarse faces
+/// around it, not on `tolerance`, and a box becomes an egg. There is no notion of creases.
+///
 /// Faces that are too large split around a new point in their middle, the edge between two split faces turns over, and
 /// faces next to them split as far as it takes to keep sizes graded: levels across an edge differ by less than two. Two
 /// steps divide edges by 3, one by √3. Points move: the surface is smoothed, and each point lies where its own number

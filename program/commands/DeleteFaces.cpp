@@ -5,6 +5,7 @@
 #include "MeshTopology.h"
 #include "Operation.h"
 #include "Selection.h"
+#include "Shape.h"
 
 #include <Modeling/deleteFaces.h>
 #include <TessaraGeometry/Names.h>
@@ -42,13 +43,13 @@ namespace {
         requireMesh(*mesh, "delete-faces", options.in);
         requireFacesWithCorners(*mesh, options.in);
         requireWritableFaces(options.out, *mesh);
-        Json const before = countsOf(*mesh);
+        Json const before = countsAndArea(*mesh);
         Orvan::Array<bool> const picked = pickElements(options.selection, kFaces, *mesh, report);
         runOperation(report, [&] {
             requireDone("delete-faces", picked.empty() || Tessara::GeometryAlgorithms::deleteFaces(picked, *mesh));
         });
         saveGeometry(*mesh, options.out, report);
-        reportOperation(before, countsOf(*mesh), {}, report);
+        reportOperation(before, countsAndArea(*mesh), {}, report);
     }
 
 }

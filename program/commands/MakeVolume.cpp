@@ -1,6 +1,8 @@
+#include "Cancellation.h"
 #include "Commands.h"
 #include "Failure.h"
 #include "Geometry.h"
+#include "MemoryLimit.h"
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
 #include "Operation.h"
@@ -32,7 +34,10 @@ namespace {
         double halfWidth = 3; // voxels
         float background = 1;
         std::string grid = "scale";
+        std::uint64_t maxMemory = 0;
     };
+
+    constexpr char kAdvice[] = "Voxels twice as large make a quarter as many; a narrower --band takes less too.";
 
     void requireVdb(Output const& out)
     {
@@ -120,7 +125,17 @@ namespace {
             volume.voxels.empty() ? "" : fmt::format("values from {} to {}, ", least, most), volume.background);
     }
 
-    void makeVolume(Options const& options, Report& report)
+    void requireMemory(BandSize const& size, double voxelSize, MemoryLimit const& limit)
+    {
+        // Beyond what 64 bits hold it is too much in any case.
+        constexpr double kMost = 1e18;
+        limit.require(static_cast<std::uint64_t>(std::min(size.bytes, kMost)),
+            fmt::format("a band of about {} of size {:.4g}",
+                countOf(static_cast<std::uint64_t>(std::min(size.voxels, kMost)), "voxel"), voxelSize),
+            kAdvice);
+    }
+
+    void makeVolume(Options const& options, MemoryLimit const& limit, Report& report)
     {
         requireVdb(options.out);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
@@ -133,6 +148,7 @@ namespace {
         volume.name = options.grid;
         volume.voxelSize = voxelSizeOf(options, *mesh);
         volume.background = options.background;
+        requireMemory(estimateBand(arrays, volume.voxelSize, options.halfWidth), volume.voxelSize, limit);
         runOperation(report, [&] {
             if (arrays.faceCount() != 0)
                 volume.voxels = voxelsAround(arrays, value, volume.voxelSize, options.halfWidth);
@@ -141,6 +157,7 @@ namespace {
             requireFiniteValues(volume);
         });
         describe(volume, report);
+        stopIfCancelled();
         writeVdbFile(volume, options.out.file, options.out.existing());
         report.document["output"] = options.out.file.string();
         reportRun(report);
@@ -194,7 +211,11 @@ the face, or the distance to a place. Faces may have any number of corners.
         .between(1, 1000, "1..1000")
         .showDefault();
     command.addOption("--grid", options->grid, "Name of the grid").valueName("NAME").showDefault();
-    onSelected(command, invocation, [options](Report& report) { makeVolume(*options, report); });
+    addMemoryLimit(options->maxMemory, command);
+    onSelected(command, invocation, [options](Report& report) {
+        MemoryLimit const limit(options->maxMemory);
+        limit.run([&] { makeVolume(*options, limit, report); }, kAdvice);
+    });
 }
 
 }

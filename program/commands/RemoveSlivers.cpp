@@ -3,6 +3,7 @@
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
 #include "Operation.h"
+#include "Shape.h"
 
 #include <Modeling/removeSlivers.h>
 #include <TessaraGeometry/Elements.h>
@@ -36,9 +37,9 @@ namespace {
         requireWritable(options.out, GeometryType::Mesh);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "remove-slivers", options.in);
-        MeshTopology const topology = analyseTopology(arraysOf(*mesh));
+        auto const [topology, shape] = examine(arraysOf(*mesh));
         requireClosedTriangleMesh(arraysOf(*mesh), topology, {}, "remove-slivers", options.in);
-        Json const before = describeMesh(*mesh, topology, options.ratio);
+        Json before = describeMesh(*mesh, topology, options.ratio);
 
         // The operation takes only the standard properties along; the others go where elements were renumbered.
         Object result = *mesh;
@@ -49,8 +50,15 @@ namespace {
             dropped.clear();
         }
 
-        Json const after = describeMesh(result, analyseTopology(arraysOf(result)), options.ratio);
+        auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
+        ShapeChange const change{shape, shapeAfter, largestDistance(arraysOf(*mesh), arraysOf(result))};
+        Json after = describeMesh(result, topologyAfter, options.ratio);
+        addShape(change, before, after);
         saveGeometry(result, options.out, report);
+        warnOfShape(change,
+            "It is not for plates and walls about as thin as the short edges of needles. A smaller --ratio "
+            "collapses less.",
+            report);
         report.document["ratio"] = numberOf(options.ratio);
         reportOperation(before, after, dropped, report);
     }
@@ -65,7 +73,11 @@ void addRemoveSlivers(CommandLine& program, Invocation& invocation)
         R"(A face is a needle when its shortest edge is shorter than the ratio times its longest one. A
 collapse takes one point and two faces; it is left out where it would change the topology or turn a
 face over, so that some needles may stay. Points and faces are renumbered, and properties other than
-the positions are dropped, unless nothing collapses.)",
+the positions are dropped, unless nothing collapses.
+
+It is for needles in surfaces of larger faces. It is not for plates and walls thinner than the ratio times
+the length of their faces: their rims consist of needles, and collapse. The table tells volume, area, folds
+and how far points are from the new surface, and a warning says when the shape changed much.)",
         "  modeling remove-slivers part.stl clean.stl\n"
         "  modeling remove-slivers scan.ply scan.ply --force --ratio 0.1 --json"};
     Command command = addCommand(kHelp, program, invocation);

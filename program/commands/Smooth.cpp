@@ -4,6 +4,7 @@
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
 #include "Operation.h"
+#include "Shape.h"
 
 #include <Modeling/deleteFaces.h>
 #include <Modeling/smooth.h>
@@ -16,6 +17,7 @@
 #include <algorithm>
 #include <cmath>
 #include <memory>
+#include <optional>
 
 #include <unistd.h>
 
@@ -34,14 +36,16 @@ namespace {
         std::string weights;
         std::string pins;
         bool pinsBoundary = false;
+        std::optional<float> sharpDegrees; // points at edges that are sharper are pinned
         bool dropsIsolated = false;
         bool* asJson = nullptr; // then standard output belongs to the document
     };
 
     /// Null where nothing is weighted or pinned.
-    std::unique_ptr<Orvan::Array<float>> weightsOf(Options const& options, Object const& mesh, Report& report)
+    std::unique_ptr<Orvan::Array<float>> weightsOf(
+        Options const& options, Object const& mesh, EdgeSides const& edges, Report& report)
     {
-        if (options.weights.empty() && options.pins.empty() && !options.pinsBoundary)
+        if (options.weights.empty() && options.pins.empty() && !options.pinsBoundary && !options.sharpDegrees)
             return nullptr;
         MeshArrays const arrays = arraysOf(mesh);
         auto weights = std::make_unique<Orvan::Array<float>>(arrays.pointCount(), 1.0f);
@@ -58,7 +62,10 @@ namespace {
                     (*weights)[point] = 0;
         }
         if (options.pinsBoundary)
-            for (unsigned int const point : boundaryPoints(arrays))
+            for (unsigned int const point : edges.boundaryPoints())
+                (*weights)[point] = 0;
+        if (options.sharpDegrees)
+            for (unsigned int const point : sharpPoints(arrays, edges, *options.sharpDegrees))
                 (*weights)[point] = 0;
         report.document["pinnedPoints"] =
             std::count_if(weights->begin(), weights->end(), [](float weight) { return weight <= 0; });
@@ -66,9 +73,9 @@ namespace {
     }
 
     /// Points without a face have nowhere to move to.
-    void settleIsolatedPoints(Options const& options, MeshTopology const& topology, Object& mesh, Report& report)
+    void settleIsolatedPoints(Options const& options, Object& mesh, Report& report)
     {
-        Finding const& isolated = topology.isolatedPoints;
+        Finding const isolated = findIsolatedPoints(arraysOf(mesh));
         report.document["droppedPoints"] = isolated.count;
         if (!isolated)
             return;
@@ -82,22 +89,6 @@ namespace {
         if (!Tessara::GeometryAlgorithms::deleteFaces(noFace, mesh))
             throw Failure(
                 ExitCode::Refused, "the isolated points cannot be left out: a range of the points has several data");
-    }
-
-    /// Six times the volume that a closed mesh encloses, in double precision.
-    double volumeOf(MeshArrays const& mesh)
-    {
-        double volume = 0;
-        float3 const* const p = mesh.positions->data;
-        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
-            auto const corners = mesh.corners(face);
-            for (std::size_t i = 2; i < corners.size(); ++i) {
-                float3 const &a = p[corners[0]], &b = p[corners[i - 1]], &c = p[corners[i]];
-                volume += a.x * (double{b.y} * c.z - double{b.z} * c.y) + a.y * (double{b.z} * c.x - double{b.x} * c.z)
-                    + a.z * (double{b.x} * c.y - double{b.y} * c.x);
-            }
-        }
-        return volume / 6;
     }
 
     double distance(float3 const& a, float3 const& b)
@@ -128,12 +119,11 @@ namespace {
         return {mean, mean > 0 ? std::sqrt(variance) / mean : 0};
     }
 
-    Json describeMesh(Object const& mesh, bool isClosed)
+    Json describeMesh(Object const& mesh)
     {
         MeshArrays const arrays = arraysOf(mesh);
         EdgeLengths const edges = edgeLengthsOf(arrays);
         Json values = countsOf(mesh);
-        values["volume"] = isClosed ? numberOf(static_cast<float>(volumeOf(arrays))) : Json();
         values["meanEdgeLength"] = numberOf(static_cast<float>(edges.mean));
         values["spreadOfEdgeLengths"] = numberOf(static_cast<float>(edges.spread));
         return values;
@@ -173,13 +163,11 @@ namespace {
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "smooth", options.in);
         requireWritableFaces(options.out, *mesh);
-        MeshTopology const topology = analyseTopology(arraysOf(*mesh));
-        settleIsolatedPoints(options, topology, *mesh, report);
-        auto const weights = weightsOf(options, *mesh, report);
-        bool const isClosed = topology.isClosedManifold();
-        Json const before = describeMesh(*mesh, isClosed);
-
+        settleIsolatedPoints(options, *mesh, report);
         MeshArrays const arrays = arraysOf(*mesh);
+        EdgeSides const edges(arrays);
+        auto const weights = weightsOf(options, *mesh, edges, report);
+        Json before = describeMesh(*mesh);
         Positions positions = *arrays.positions;
         auto const run = [&](auto const& logger) {
             Geometry::Mesh::smooth(options.amount, arrays.pointCount(), arrays.faceCount(), *arrays.faceVertex,
@@ -194,9 +182,18 @@ namespace {
         bool const isMoved = !std::equal(positions.begin(), positions.end(), arrays.positions->begin());
         std::vector<std::string> const dropped = isMoved ? dropNormals(*mesh) : std::vector<std::string>();
         addDataProperty(sPointPosition, sPointComp, positions, *mesh);
+        bool const isClosed = analyseTopology(arrays, edges).isClosedManifold();
+        ShapeChange const change{shapeOf(arrays, edges, isClosed), shapeOf(arraysOf(*mesh), edges, isClosed),
+            largestMove(arrays, arraysOf(*mesh))};
         saveGeometry(*mesh, options.out, report);
+        warnOfShape(change,
+            "Smoothing is for noise on rounded surfaces. --pin-sharp 30 keeps sharp edges, and a smaller --amount "
+            "moves less.",
+            report);
         report.document["amount"] = numberOf(options.amount);
-        reportOperation(before, describeMesh(*mesh, isClosed), dropped, report);
+        Json after = describeMesh(*mesh);
+        addShape(change, before, after);
+        reportOperation(before, after, dropped, report);
         reportDisplacement(*arrays.positions, positions, report);
     }
 
@@ -206,17 +203,21 @@ void addSmooth(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     options->asJson = &invocation.asJson;
-    constexpr CommandHelp kHelp = {"smooth", "Relax the points of a mesh within its surface",
-        R"(Points slide along the surface, so that edges become more even and the shape stays. The amount is cut
-into steps of at most 0.9, in each of which every point goes so much of its way to the middle of the
-faces around it: an amount of 1 takes two steps and evens out most of what noise has made of the
-edges of a sphere, one of 9 takes ten or eleven and settles it. Normals would no longer fit the
-surface: they are dropped, and named.
+    constexpr CommandHelp kHelp = {"smooth", "Even out the edges of a mesh on a rounded surface",
+        R"(Each point slides in the plane that touches the surface there, towards the middle of the faces around it.
+The amount is cut into steps of at most 0.9: an amount of 1 takes two steps and evens out most of what
+noise has made of the edges of a sphere, one of 9 takes ten or eleven and settles it. Normals would no
+longer fit the surface: they are dropped, and named.
+
+It is for scans and other rounded surfaces with small faces. On parts with sharp edges it moves corners,
+frays edges and bends thin walls, unless --pin-sharp holds the points there. The table tells volume, area,
+folds and the largest move, and a warning says when the shape changed much.
 
 Points at a boundary move too, unless they are pinned. Attributes with a number for each point can
 scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",
         "  modeling smooth scan.ply smooth.ply --amount 3\n"
         "  modeling smooth cloth.obj smooth.obj --amount 1 --pin-boundary\n"
+        "  modeling smooth part.stl held.stl --pin-sharp 30\n"
         "  modeling smooth face.ply face.ply --force --weights quality --pin-attribute locked"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
@@ -227,6 +228,11 @@ scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",
     command.addOption("--pin-attribute", options->pins, "Pin the points where this attribute is not 0")
         .valueName("ATTRIBUTE");
     command.addFlag("--pin-boundary", options->pinsBoundary, "Pin the points of open edges");
+    command
+        .addOption("--pin-sharp", options->sharpDegrees,
+            "Pin the points at edges whose faces' normals differ by more than so many degrees")
+        .valueName("DEG")
+        .between(0, 180, "0..180");
     command.addFlag("--drop-isolated", options->dropsIsolated, "Leave out points that belong to no face");
     onSelected(command, invocation, [options](Report& report) { smooth(*options, report); });
 }

@@ -7,6 +7,7 @@
 #include "MeshRequirements.h"
 #include "MeshTopology.h"
 #include "Operation.h"
+#include "Shape.h"
 #include "Triangulation.h"
 
 #include <Modeling/subdivide.h>
@@ -123,20 +124,7 @@ namespace {
                     isGuided ? " --min-value keeps the tolerance away from 0." : ""));
     }
 
-    void runWithin(std::uint64_t maxMemory, Report& report, std::function<void()> const& operation)
-    {
-        MemoryLimit const limit(maxMemory);
-        try {
-            runOperation(report, operation);
-        } catch (Failure const&) {
-            if (!limit.wasExceeded())
-                throw;
-            throw Failure(ExitCode::OutOfMemory,
-                fmt::format("stopped, since this takes more than {}, which --max-memory allows; nothing was written. "
-                            "Dividing the tolerance by 3 makes about nine times as many faces.",
-                    formatBytes(maxMemory)));
-        }
-    }
+    constexpr char kAdvice[] = "Dividing the tolerance by 3 makes about nine times as many faces.";
 
     /// Below, the library refines nothing; and where points are as far from one another as numbers are, all faces stay
     /// large for ever.
@@ -210,31 +198,36 @@ namespace {
         return values;
     }
 
-    void subdivide(Options const& options, Report& report)
+    void subdivide(Options const& options, MemoryLimit const& limit, Report& report)
     {
         requireWritable(options.out, GeometryType::Mesh);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "subdivide", options.in);
         if (options.triangulates)
             *mesh = triangulatedAs(inFineUnits(*mesh), "*", *mesh);
-        MeshTopology const topology = analyseTopology(arraysOf(*mesh));
+        auto const [topology, shape] = examine(arraysOf(*mesh));
         requireClosedTriangleMesh(
             arraysOf(*mesh), topology, faultsOfIsolatedPoints(arraysOf(*mesh), topology), "subdivide", options.in);
 
         std::optional<GuideVolume> guide;
         if (!options.guide.file.empty())
-            guide.emplace(options.guide, report).tellCoverage(arraysOf(*mesh), report);
+            guide.emplace(options.guide, report, &limit).tellCoverage(arraysOf(*mesh), report);
         float const tolerance = toleranceOf(options, *mesh, guide);
         Object result = *mesh;
         std::uint64_t largeFaces = 0;
-        runWithin(options.maxMemory, report, [&] { largeFaces = refine(guide, tolerance, result); });
+        runOperation(report, [&] { largeFaces = refine(guide, tolerance, result); });
 
         reportLargeFaces(largeFaces, guide.has_value(), report);
         std::vector<std::string> const dropped = explainDropped(*mesh, result, report);
-        Json const after = describeMesh(result, analyseTopology(arraysOf(result)));
+        auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
+        ShapeChange const change{shape, shapeAfter, largestMove(arraysOf(*mesh), arraysOf(result))};
+        Json before = describeMesh(*mesh, topology), after = describeMesh(result, topologyAfter);
+        addShape(change, before, after);
         saveGeometry(result, options.out, report);
+        warnOfShape(
+            change, "Subdivision rounds every edge and corner: it is for smooth shapes in coarse meshes.", report);
         report.document["tolerance"] = numberOf(tolerance);
-        reportOperation(describeMesh(*mesh, topology), after, dropped, report);
+        reportOperation(before, after, dropped, report);
     }
 
 }
@@ -247,6 +240,10 @@ void addSubdivide(CommandLine& program, Invocation& invocation)
         R"(Faces split until each fits into twice the tolerance along every axis. Small faces stay as they are,
 but for those next to large ones. Floating point values on points (normals too) are carried along as means;
 all other properties are dropped, with a warning that says why.
+
+It is for smooth shapes in coarse meshes. It rounds every edge and corner, so that it is not for parts with
+sharp edges. The table tells volume, area, folds and the largest move of the old points, and a warning
+says when the shape changed much.
 
 Levels: one level divides edges by 1.73 and makes 3 times as many faces, two levels divide edges by 3.
 Where all faces are of the size s (the longest side of their box), a tolerance of s/2 leaves them, s/3.46
@@ -271,10 +268,11 @@ happens where the values of a volume fall to 0 at a single place.)",
         .positive();
     command.addFlag("--triangulate", options->triangulates, "Cut faces with more corners into triangles first");
     addGuideOptions(options->guide, command);
-    command.addOption("--max-memory", options->maxMemory, "Stop when the program takes more: 500MB, 4GB")
-        .valueName("")
-        .bytes();
-    onSelected(command, invocation, [options](Report& report) { subdivide(*options, report); });
+    addMemoryLimit(options->maxMemory, command);
+    onSelected(command, invocation, [options](Report& report) {
+        MemoryLimit const limit(options->maxMemory);
+        limit.run([&] { subdivide(*options, limit, report); }, kAdvice);
+    });
 }
 
 }

@@ -3,6 +3,7 @@
 #include "Geometry.h"
 #include "MeshRequirements.h"
 #include "Operation.h"
+#include "Shape.h"
 #include "Triangulation.h"
 
 #include <TessaraGeometryVolume/ChannelParser.h>
@@ -62,10 +63,9 @@ namespace {
         }
     }
 
-    Json describeMesh(Object const& mesh)
+    Json describeMesh(Object const& mesh, MeshTopology const& topology)
     {
         Json values = countsOf(mesh);
-        MeshTopology const topology = analyseTopology(arraysOf(mesh));
         values["triangles"] = topology.triangleCount;
         values["quads"] = topology.quads.count;
         values["polygons"] = topology.polygons.count;
@@ -122,8 +122,15 @@ namespace {
         }
         report.document["keptProperties"] = namesOfOtherProperties(result);
         report.document["channels"] = options.channels;
+        MeshArrays const arrays = arraysOf(*mesh), triangles = arraysOf(result);
+        auto const [topology, shape] = examine(arrays);
+        auto const [topologyAfter, shapeAfter] = examine(triangles);
+        ShapeChange const change{shape, shapeAfter, largestMove(arrays, triangles)};
+        Json before = describeMesh(*mesh, topology), after = describeMesh(result, topologyAfter);
+        addShape(change, before, after);
         saveGeometry(result, options.out, report);
-        reportOperation(describeMesh(*mesh), describeMesh(result), dropped, report);
+        warnOfShape(change, "--check tells which faces their triangles do not cover.", report);
+        reportOperation(before, after, dropped, report);
         if (options.isToBeChecked)
             reportCheck(checkTriangulation(arraysOf(measured), arraysOf(result)), report);
     }

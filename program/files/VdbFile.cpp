@@ -52,13 +52,14 @@ std::vector<VdbGrid> listVdbGrids(std::filesystem::path const& file)
     return grids;
 }
 
-SparseVolume readVdbGrid(std::filesystem::path const& file, std::size_t grid)
+SparseVolume readVdbGrid(
+    std::filesystem::path const& file, std::size_t grid, std::function<void(VdbGridSize const&)> const& onSize)
 {
     InputFile const input(file);
     std::vector<VdbGridEntry> const entries = readVdbOutline(input);
     if (grid >= entries.size() || entries[grid].type != "float")
         throw FileError(file.string() + " cannot be read: there is no such float grid");
-    checkVdbFloatGrid(input, entries[grid], entries);
+    onSize(checkVdbFloatGrid(input, entries[grid], entries));
     SparseVolume volume;
     codec<decltype(modelingReadVdb)>("modelingReadVdb")(input, entries[grid], entries, volume);
     return volume;

@@ -7,6 +7,7 @@
 #include <array>
 #include <bit>
 #include <cstdint>
+#include <functional>
 #include <vector>
 
 namespace ModelingProgram {
@@ -48,6 +49,12 @@ struct VdbGrid {
     std::string type; // "float", "vec3s", ...
 };
 
+/// What a grid takes once it is read.
+struct VdbGridSize {
+    std::uint64_t activeVoxels = 0; // without those of constant regions, which are boxes
+    std::uint64_t treeBytes = 0; // of the tree that OpenVDB reads it into, before it becomes a list of voxels
+};
+
 /// The grids of an OpenVDB file, in its order.
 /// \throws FileError  for what is no such file
 std::vector<VdbGrid> listVdbGrids(std::filesystem::path const& file);
@@ -56,8 +63,10 @@ std::vector<VdbGrid> listVdbGrids(std::filesystem::path const& file);
 /// \param grid        which of the list
 /// \throws FileError  for a grid that is cut off or broken, has a value that is not finite, or voxels that are no cubes
 ///                    along the axes
-/// \throws std::bad_alloc
-SparseVolume readVdbGrid(std::filesystem::path const& file, std::size_t grid);
+/// \throws std::bad_alloc, and what `onSize` throws, which is called before any value is read
+SparseVolume readVdbGrid(
+    std::filesystem::path const& file, std::size_t grid,
+    std::function<void(VdbGridSize const&)> const& onSize = [](VdbGridSize const&) {});
 
 /// Writes a volume as an OpenVDB file with one grid; the same bytes for the same volume. The file appears under its name
 /// only when it is complete.

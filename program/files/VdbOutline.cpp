@@ -125,7 +125,7 @@ namespace {
         {
         }
 
-        void walk(bool ownsTree)
+        VdbGridSize walk(bool ownsTree)
         {
             compression_ = in_.number<std::uint32_t>("how values are compressed");
             if (compression_ > (kZipped | kActiveOnly | kBlosc))
@@ -133,15 +133,22 @@ namespace {
             isHalf_ = skipMetadata(in_).isHalf;
             skipTransform();
             if (!ownsTree)
-                return;
+                return size_;
             skipRoot();
-            for (; leafCount_ != 0; --leafCount_)
-                skipValues(skipMask(kLeafVoxels, "the mask of a leaf"), kLeafVoxels, "the values of a leaf");
+            size_.treeBytes += leafCount_ * kLeafBytes;
+            for (; leafCount_ != 0; --leafCount_) {
+                std::uint32_t const active = skipMask(kLeafVoxels, "the mask of a leaf");
+                skipValues(active, kLeafVoxels, "the values of a leaf");
+                size_.activeVoxels += active;
+            }
+            return size_;
         }
 
     private:
         static constexpr std::uint32_t kLeafVoxels = 8 * 8 * 8;
         static constexpr std::uint32_t kUpperChildren = 32 * 32 * 32, kLowerChildren = 16 * 16 * 16;
+        // What OpenVDB allocates: a leaf with its values, and a node with 8 bytes per child and three masks.
+        static constexpr std::uint32_t kLeafBytes = kLeafVoxels * sizeof(float) + 160, kBytesPerChild = 9;
 
         void skipTransform()
         {
@@ -197,6 +204,7 @@ namespace {
         /// \return the count of its children
         std::uint32_t skipNode(std::uint32_t places)
         {
+            size_.treeBytes += std::uint64_t{places} * kBytesPerChild;
             std::uint32_t const children = skipMask(places, "the nodes in a node");
             skipValues(skipMask(places, "the active tiles of a node"), places, "the tiles of a node");
             return children;
@@ -262,6 +270,7 @@ namespace {
         std::uint32_t compression_ = 0;
         bool isHalf_ = false;
         std::uint64_t leafCount_ = 0;
+        VdbGridSize size_;
     };
 
 }
@@ -289,17 +298,17 @@ std::vector<VdbGridEntry> readVdbOutline(InputFile const& file)
     return entries;
 }
 
-void checkVdbFloatGrid(InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all)
+VdbGridSize checkVdbFloatGrid(InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all)
 {
-    FloatGridWalk(file, entry).walk(entry.treeOwner.empty());
+    VdbGridSize const size = FloatGridWalk(file, entry).walk(entry.treeOwner.empty());
     if (entry.treeOwner.empty())
-        return;
+        return size;
     auto const owner = std::find_if(
         all.begin(), all.end(), [&](VdbGridEntry const& other) { return other.uniqueName == entry.treeOwner; });
     if (owner == all.end() || owner->type != entry.type || !owner->treeOwner.empty())
         throw FileError(file.path.string() + " cannot be read: grid \"" + entry.name
             + "\" shares the values of a grid that is not there");
-    FloatGridWalk(file, *owner).walk(true);
+    return FloatGridWalk(file, *owner).walk(true);
 }
 
 }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "Scanner.h"
+#include "VdbFile.h"
 
 #include <string>
 #include <vector>
@@ -25,6 +26,6 @@ std::vector<VdbGridEntry> readVdbOutline(InputFile const& file);
 
 /// Follows the data of a float grid to its end. What passes can be read with OpenVDB.
 /// \throws FileError  for what is cut off or contradicts itself, and for transforms that are not linear
-void checkVdbFloatGrid(InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all);
+VdbGridSize checkVdbFloatGrid(InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all);
 
 }

@@ -88,7 +88,7 @@ TEST_F(Commands, RemoveSliversKeepsClosedManifolds)
     EXPECT_EQ(info["topology"]["closedManifold"], true);
     EXPECT_EQ(info["properties"].size(), 3);
     Result const table = run("remove-slivers cylinder.obj again.ply --ratio 0.1 --threads 1");
-    EXPECT_THAT(table.output, HasSubstr("slivers       64       0\n"));
+    EXPECT_THAT(table.output, testing::ContainsRegex("slivers +64 +0\n"));
     EXPECT_TRUE(areEqual("again.ply", "out.ply"));
 
     json const none = runForJson("remove-slivers cylinder.obj out.obj --ratio 0.01"); // nothing collapses
@@ -125,6 +125,61 @@ TEST_F(Commands, SmoothMovesPointsAndPinsThem)
         EXPECT_EQ(runForJson("info out.ply")["boundingBox"], json({{"min", {0, 0, 0}}, {"max", {4, 4, 0}}})) << pins;
     }
     EXPECT_THAT(run("smooth square.ply out.ply --weights heat --drop-isolated").messages, HasSubstr("\"heat\""));
+}
+
+/// A cube whose sides are cut into n² squares of two triangles each.
+std::string cubeOf(int n)
+{
+    std::string stl = "solid\n";
+    for (int side = 0; side != 6; ++side)
+        for (int square = 0; square != n * n; ++square)
+            for (int triangle = 0; triangle != 2; ++triangle) {
+                stl += "facet normal 0 0 0\nouter loop\n";
+                for (int corner = 0; corner != 3; ++corner) {
+                    int const axis = side / 2, quadCorner = corner == 0 ? 0 : corner + triangle;
+                    int place[3];
+                    place[axis] = side % 2 * n;
+                    int const across = square % n + (quadCorner == 1 || quadCorner == 2 ? 1 : 0);
+                    int const along = square / n + (quadCorner >= 2 ? 1 : 0);
+                    place[(axis + 1) % 3] = side % 2 ? across : along;
+                    place[(axis + 2) % 3] = side % 2 ? along : across;
+                    stl += "vertex " + std::to_string(place[0]) + " " + std::to_string(place[1]) + " "
+                        + std::to_string(place[2]) + "\n";
+                }
+                stl += "endloop\nendfacet\n";
+            }
+    return stl + "endsolid\n";
+}
+
+TEST_F(Commands, ShapesThatChangeMuchAreAWarning)
+{
+    copySamples({"cylinder.obj", "bunny.obj"});
+    store(folder / "cube.stl", cubeOf(4));
+    struct Case {
+        char const* arguments;
+        char const* warning; // null for none
+    };
+    constexpr Case kCases[] = {
+        {"smooth bunny.obj out.obj --amount 3", nullptr},
+        {"smooth cube.stl out.stl", "a point by 3.9 % of the diagonal"},
+        {"smooth cube.stl out.stl --pin-sharp 30", nullptr},
+        {"remove-slivers cylinder.obj out.obj --ratio 0.1", "the volume by -14 %, a point by 4.3 %"},
+        {"subdivide cube.stl out.stl --relative 0.02", "the volume by -5.5 %, the area by -13 %"},
+        {"triangulate cube.stl out.stl", nullptr},
+    };
+    for (Case const& c : kCases) {
+        json const done = runForJson(c.arguments);
+        ASSERT_EQ(done["exitCode"], 0) << c.arguments;
+        EXPECT_THAT(done["warnings"].dump(), HasSubstr(c.warning ? c.warning : "[]")) << c.arguments;
+        for (char const* const value :
+            {"after/volume", "after/area", "after/foldOvers", "after/largestMoveOverDiagonal"})
+            EXPECT_TRUE(at(done, {value})[0].is_number()) << c.arguments << " " << value;
+    }
+    json const pinned = runForJson("smooth cube.stl out.stl --pin-sharp 30");
+    EXPECT_EQ(at(pinned, {"pinnedPoints", "before/volume", "after/volume", "after/area", "after/foldOvers"}),
+        json({12 * 3 + 8, 64, 64, 96, 0}));
+    EXPECT_EQ(at(runForJson("delete-faces cube.stl out.stl --box 0 0 0 4 4 0"), {"before/area", "after/area"}),
+        json({96, 80}));
 }
 
 TEST_F(Commands, TriangulateKeepsWhatTheChannelsChoose)
@@ -206,7 +261,9 @@ TEST_F(Commands, PointsAndFacesArePickedAndKeepTheirAttributes)
         EXPECT_EQ(done["picked"], picked) << arguments;
         std::string const element(arguments, std::strchr(arguments, ' '));
         EXPECT_EQ(done["before"][element].get<int>() - done["after"][element].get<int>(), picked) << arguments;
-        EXPECT_EQ(runForJson("info out.ply")["counts"], done["after"]) << arguments;
+        json counts = done["after"];
+        counts.erase("area");
+        EXPECT_EQ(runForJson("info out.ply")["counts"], counts) << arguments;
     }
     EXPECT_EQ(runForJson("info out.ply")["properties"].size(), runForJson("info cube.ply")["properties"].size());
     EXPECT_THAT(run("delete-points cloud.ply out.ply --attribute label").output, HasSubstr("picked 3 of 7 points\n"));
@@ -347,6 +404,8 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"triangulate seams.ply out.ply --channels '* ^uv'", 5, "matches \"uv\". There are: corner:uv"},
         {"subdivide tiny.obj out.obj --tolerance 1e-12", 5, "is too fine: below 1.1920929e-07 nothing is refined"},
         {"make-volume far.obj out.vdb --distance-to -3e38 0 0 --from 1 --to 2", 5, "too large for single precision"},
+        {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --voxels 100000", 7, "would take about"},
+        {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --max-memory 1kB", 7, "which --max-memory allows"},
     };
     for (Case const& c : kCases) {
         Result const result = run(c.arguments);

@@ -1,0 +1,139 @@
+#include "Shape.h"
+
+#include "SurfaceTree.h"
+
+#include "support/MeshBuilder.h"
+#include "support/Threads.h"
+
+#include <TessaraGeometry/Makers.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <limits>
+
+namespace ModelingProgram {
+
+namespace {
+
+    using testing::ElementsAre;
+    using testing::HasSubstr;
+    using TestSupport::MeshBuilder;
+    using Mesh = Orvan::MutablePtr<Tessara::Object>;
+
+    /// A cube of side 1, cut in half along the diagonals of two sides.
+    Mesh wedge(float at, std::initializer_list<unsigned int> corners)
+    {
+        return Tessara::Geometry::makeMesh(
+            {{at, 0, 0}, {at + 1, 0, 0}, {at + 1, 1, 0}, {at, 1, 0}, {at, 0, 1}, {at, 1, 1}}, corners,
+            {0, 4, 8, 12, 15, 18});
+    }
+    constexpr std::initializer_list<unsigned int> kWedge = {0, 3, 2, 1, 0, 4, 5, 3, 1, 2, 5, 4, 0, 1, 4, 3, 5, 2};
+    constexpr std::initializer_list<unsigned int> kTurnedWedge = {1, 2, 3, 0, 3, 5, 4, 0, 4, 5, 2, 1, 4, 1, 0, 2, 5, 3};
+
+    ExaminedMesh examined(Mesh const& mesh)
+    {
+        return examine(arraysOf(*mesh));
+    }
+
+    std::vector<unsigned int> sharpPointsOf(Mesh const& mesh, double degrees)
+    {
+        MeshArrays const arrays = arraysOf(*mesh);
+        return sharpPoints(arrays, EdgeSides(arrays), degrees);
+    }
+
+    /// Two triangles with a common edge and so many degrees between their normals; the second one turned over, or not.
+    Mesh hinge(double degrees, bool isTurned)
+    {
+        auto const angle = static_cast<float>(degrees * std::acos(-1) / 180);
+        Tessara::Math::float3 const end{-std::cos(angle), 0.5f, std::sin(angle)};
+        if (isTurned)
+            return Tessara::Geometry::makeMesh(
+                {{0, 0, 0}, {0, 1, 0}, {1, 0.5f, 0}, end}, {0, 2, 1, 0, 3, 1}, {0, 3, 6});
+        return Tessara::Geometry::makeMesh({{0, 0, 0}, {0, 1, 0}, {1, 0.5f, 0}, end}, {0, 2, 1, 0, 1, 3}, {0, 3, 6});
+    }
+
+}
+
+TEST(Shape, MeasuresVolumeAreaAndFolds)
+{
+    for (float const at : {0.0f, 4096.0f}) {
+        Shape const shape = examined(wedge(at, kWedge)).shape;
+        EXPECT_NEAR(shape.volume.value_or(0), 0.5, 1e-12);
+        EXPECT_NEAR(shape.area, 3 + std::sqrt(2), 1e-12);
+        EXPECT_NEAR(shape.diagonal, std::sqrt(3), 1e-12);
+        EXPECT_EQ(shape.foldOvers, 0);
+        EXPECT_NEAR(examined(wedge(at, kTurnedWedge)).shape.volume.value_or(0), -0.5, 1e-12);
+    }
+    EXPECT_FALSE(examined(hinge(0, false)).shape.volume.has_value());
+    for (bool const isTurned : {false, true})
+        for (double const degrees : {0.0, 90.0, 149.0, 151.0, 180.0}) {
+            EXPECT_EQ(examined(hinge(degrees, isTurned)).shape.foldOvers, degrees > kFoldOverDegrees ? 1 : 0);
+            EXPECT_EQ(sharpPointsOf(hinge(degrees, isTurned), 89).size(), degrees > 89 ? 2 : 0) << degrees;
+        }
+    EXPECT_THAT(sharpPointsOf(wedge(0, kWedge), 134), ElementsAre(1, 2, 4, 5)); // where the slope begins and ends
+    EXPECT_THAT(sharpPointsOf(wedge(0, kWedge), 136), ElementsAre());
+    auto const fin = Tessara::Geometry::makeMesh(
+        {{0, 0, 0}, {0, 1, 0}, {1, 0, 0}, {-1, 0, 0}, {0, 0, 1}}, {0, 1, 2, 1, 0, 3, 0, 1, 4}, {0, 3, 6, 9});
+    EXPECT_THAT(sharpPointsOf(fin, 180), ElementsAre(0, 1)); // three faces
+    auto const nothing = Tessara::Geometry::makeMesh({}, {}, {0});
+    EXPECT_EQ(examined(nothing).shape.area, 0);
+}
+
+TEST(Shape, FindsTheLargestDistanceAsBruteForceDoes)
+{
+    auto const before = MeshBuilder::sphere(12).withNoise(0.05f, 1).build();
+    auto after = MeshBuilder::sphere(10).withNoise(0.1f, 2).shuffled(3).build();
+    MeshArrays const points = arraysOf(*before), surface = arraysOf(*after);
+    double expected = 0;
+    for (auto const& p : *points.positions) {
+        double nearest = std::numeric_limits<double>::infinity();
+        for (unsigned int face = 0; face != surface.faceCount(); ++face) {
+            auto const corners = surface.corners(face);
+            auto const at = [&](std::size_t i) { return Corner{inDoubles((*surface.positions)[corners[i]]), 0}; };
+            nearest = std::min(nearest, length(nearestOf({at(0), at(1), at(2)}, inDoubles(p)).place - inDoubles(p)));
+        }
+        expected = std::max(expected, nearest);
+    }
+    auto const measures = [&] {
+        Shape const shape = examined(before).shape;
+        return std::vector<double>{largestDistance(points, surface), largestMove(points, surface), *shape.volume,
+            shape.area, shape.diagonal, static_cast<double>(shape.foldOvers)};
+    };
+    EXPECT_GT(expected, 0.01);
+    EXPECT_NEAR(measures()[0], expected, 1e-15);
+    EXPECT_EQ(largestDistance(points, points), 0);
+    for (int const threads : {1, 2, 8})
+        EXPECT_EQ(TestSupport::withThreads(threads, measures), measures()) << threads;
+}
+
+TEST(Shape, WarnsOfLargeChangesOnly)
+{
+    Shape const cube{1, 6, 3, 2};
+    struct Case {
+        ShapeChange change;
+        char const* warning; // null for none
+    };
+    constexpr auto kOpen = std::nullopt;
+    Case const cases[] = {
+        {{cube, cube, 0.039}, nullptr},
+        {{cube, cube, 0.041}, "a point by 2.1 % of the diagonal"},
+        {{cube, {0.991, 6, 2, 2}, 0}, nullptr},
+        {{cube, {0.98, 6, 3, 2}, 0}, "the volume by -2 %"},
+        {{cube, {-1, 6, 3, 2}, 0}, "turned inside out"},
+        {{{-1, 6, 3, 2}, {-1.005, 6, 3, 2}, 0}, nullptr},
+        {{cube, {1, 6.2, 3, 2}, 0}, nullptr},
+        {{{kOpen, 6, 3, 2}, {kOpen, 3, 3, 2}, 0}, "the area by -50 %"},
+        {{cube, {1, 6, 5, 2}, 0}, "2 edges folded over"},
+        {{{0, 0, 0, 0}, {0, 0, 0, 0}, 0}, nullptr},
+    };
+    for (Case const& c : cases) {
+        Report report("test");
+        warnOfShape(c.change, "Advice.", report);
+        ASSERT_EQ(report.document["warnings"].size(), c.warning ? 1 : 0) << report.document;
+        EXPECT_THAT(report.document["warnings"].dump(), HasSubstr(c.warning ? c.warning : "[]"));
+    }
+}
+
+}
