@@ -42,7 +42,7 @@ namespace Internal {
         {
             constexpr unsigned int kWrapped = 1u << 31;
             if (steps == 0)
-                return 1; // whatever λ is, also where it is no number
+                return 1; // as the power is for any λ, even NaN, but without computing λ
             if (steps >= kWrapped && valence != 0)
                 return 0;
             float const lambda = 0.6666667f - smoothingWeight(cosineOfSector(static_cast<float>(valence)));

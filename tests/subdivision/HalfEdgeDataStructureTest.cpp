@@ -46,6 +46,8 @@ TEST(HalfEdgeDataStructure, agreesWithAMapForEachPoint)
     std::map<std::string, PolygonMesh> const meshes{
         {"nothing", PolygonMesh::soup(5, 0, 0, 0, random)},
         {"no points", {}},
+        {"a face twice", {std::vector<float3>(3), {0, 1, 2, 0, 1, 2}, {0, 3, 6}}},
+        {"a triangle and a quad", {std::vector<float3>(4), {0, 1, 2, 3, 2, 1, 0}, {0, 3, 7}}},
         {"sphere", MeshBuilder::sphere(40).shuffled(1).polygons()},
         {"hub", MeshBuilder::bipyramid(3000).polygons()},
         {"triangles at random", PolygonMesh::soup(40, 30'000, 3, 3, random)},

@@ -204,9 +204,28 @@ TEST(Subdivide, stepsKeepToTheirRules)
     Passes unbalanced(MeshBuilder::tetrahedron());
     unbalanced.faceStates = {2 << 2 | 2, 2, 2, 2};
     EXPECT_FALSE(unbalanced.isBalanced());
-    unbalanced.subdivide(Orvan::Array<bool>(4));
-    EXPECT_EQ(unbalanced.numFaces, 12);
-    EXPECT_EQ(unbalanced.numPoints, 8);
+    PlainSubdivision plain(MeshBuilder::tetrahedron());
+    plain.states = {2 << 2 | 2, 2, 2, 2};
+    for (bool const mark : {false, true}) { // the second pass brings limits into positions
+        Orvan::Array<bool> const marks(unbalanced.numFaces, mark);
+        unbalanced.pass(marks);
+        plain.pass(marks);
+        EXPECT_TRUE(sameContents(*unbalanced.mesh(), *MeshBuilder::of(plain.positions, plain.faces).build()));
+    }
+
+    Passes thirds(MeshBuilder::tetrahedron());
+    thirds.faceStates = {1 << 2, 2 << 2 | 2, 1 << 2, 1 << 2};
+    thirds.subdivide(Orvan::Array<bool>(4));
+    EXPECT_EQ(thirds.numFaces, 6) << "thirds do not follow a finer face";
+
+    Passes fan(MeshBuilder::of(std::vector<float3>(5), {{0, 1, 2}, {0, 1, 3}, {1, 0, 4}}));
+    fan.faceStates[1] = 2 << 2; // its neighbor has another one in turn
+    EXPECT_FALSE(fan.isBalanced());
+
+    Passes aged(MeshBuilder::tetrahedron());
+    aged.vertexLevels[aged.faceVertex[2]] = 5;
+    aged.subdivide(Orvan::Array<bool>(4, true));
+    EXPECT_EQ(aged.vertexLevels[4], 6) << "one more than the newest corner has";
 
     Passes full(MeshBuilder::tetrahedron());
     full.numPoints = 0xFFFFFFFC;
@@ -255,6 +274,11 @@ TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
     EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceVertexComp).size, 1);
     EXPECT_FALSE(mesh->hasProperty("of range") || mesh->hasProperty("of int"));
     EXPECT_TRUE(mesh->hasProperty("of what targets int")) << "dropping goes one level deep";
+
+    addDataProperty<float>("sPointCompShort", sPointComp, {1}, *mesh);
+    ASSERT_TRUE(subdivide(9, *mesh));
+    EXPECT_EQ(valuesOf<float>(*mesh, "sPointCompShort"), (std::vector<float>{1, 0, 0, 0, 0, 0, 0, 0}))
+        << "also if nothing splits";
 }
 
 TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
@@ -263,7 +287,9 @@ TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
     auto const open = MeshBuilder::sphere(3).withoutFace(5).build();
     auto const incomplete = MeshBuilder::sphere(3).build();
     incomplete->eraseProperty(sFaceOffset);
-    for (auto const* const mesh : {&quad, &open, &incomplete}) {
+    auto const withOtherPositions = MeshBuilder::sphere(3).build();
+    addDataProperty<int>(sPointPosition, sPointComp, {1, 2, 3}, *withOtherPositions);
+    for (auto const* const mesh : {&quad, &open, &incomplete, &withOtherPositions}) {
         auto const before = deepCopy(**mesh);
         addDataProperty<int>("number", sPointComp, {1, 2}, **mesh);
         EXPECT_FALSE(subdivide(0.1f, **mesh));
