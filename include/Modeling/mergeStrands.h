@@ -11,6 +11,10 @@ namespace Tessara::GeometryAlgorithms {
 /// Joins strand sets into one: points and strands of all inputs in their order, with all properties. What becomes of
 /// properties, of invalid inputs and of an output that is an input is as in `mergeMeshes`.
 ///
+/// A strand ends where the next one begins. So points of no strand become the end of the last strand of the inputs in
+/// front of them: those in front of the first strand of a later input, and those of a later input without strands. Points
+/// in front of the first strand of all stay points of no strand: the first offset is then above 0.
+///
 /// \param output  Receives the merged strands. Its other keys stay. Where the result is false it is as it was, but
 ///                with the merged strands, and without what is no geometry, if the first input has strand offsets
 ///                whose default is no `unsigned int`.

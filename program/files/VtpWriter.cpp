@@ -116,15 +116,34 @@ namespace {
                      Section{"Polys", WritableGeometry::Kind::Mesh}}) {
                 if (section.kind != geometry_.kind)
                     continue;
-                bool const isMesh = section.kind == WritableGeometry::Kind::Mesh;
-                bool const isCloud = section.kind == WritableGeometry::Kind::PointCloud;
                 xml_ << "      <" << section.name << ">\n";
-                declareNumbers("connectivity", isMesh ? geometry_.faceVertex->size : geometry_.pointCount(),
-                    [this, isMesh](std::uint64_t i) { return isMesh ? (*geometry_.faceVertex)[i] : i; });
-                declareNumbers("offsets", isCloud ? geometry_.pointCount() : geometry_.cellCount(),
-                    [this, isCloud](std::uint64_t i) { return isCloud ? i + 1 : (*geometry_.offsets)[i + 1]; });
+                if (section.kind == WritableGeometry::Kind::PointCloud)
+                    declareCellArrays(
+                        geometry_.pointCount(), geometry_.pointCount(), [](auto i) { return i; },
+                        [](auto i) { return i + 1; });
+                else
+                    declareCellsOf(*geometry_.offsets);
                 xml_ << "      </" << section.name << ">\n";
             }
+        }
+
+        /// The file's offsets have no entry in front of the first cell, which therefore begins at the first point or
+        /// corner listed. Points in front of the first strand are not listed.
+        void declareCellsOf(Orvan::Array<unsigned int> const& offsets)
+        {
+            std::uint64_t const first = offsets[0], last = offsets[offsets.size - 1];
+            declareCellArrays(
+                last - first, geometry_.cellCount(),
+                [this, first](
+                    std::uint64_t i) { return geometry_.faceVertex ? (*geometry_.faceVertex)[first + i] : first + i; },
+                [&offsets, first](std::uint64_t cell) { return offsets[cell + 1] - first; });
+        }
+
+        template <class Point, class End> void declareCellArrays(
+            std::uint64_t pointCount, std::uint64_t cellCount, Point const& pointAt, End const& endOf)
+        {
+            declareNumbers("connectivity", pointCount, pointAt);
+            declareNumbers("offsets", cellCount, endOf);
         }
 
         template <class T>

@@ -155,47 +155,35 @@ std::optional<std::size_t> PropertyLayout::find(Orvan::String const& name) const
     return *place;
 }
 
-MergePlan planMerge(MergeInputs inputs, std::initializer_list<char const*> components,
+MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*> components,
     std::function<bool(Object const&)> const& accepts)
 {
     Vocabulary const words(components);
-    MergePlan plan{std::move(inputs), {}};
-    std::vector<Object const*> const& objects = plan.held.objects;
-    plan.inputs.resize(objects.size());
+    MergePlan plan{std::vector<MergeInput>(inputs.size())};
     // Each input has its own entry.
-    parallelFor(tbb::blocked_range<std::size_t>(0, objects.size(), kFaceGrain), [&](auto const& range) {
+    parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), kFaceGrain), [&](auto const& range) {
         InputReader reader(words);
         for (std::size_t input = range.begin(); input != range.end(); ++input)
-            if (accepts(*objects[input]))
-                plan.inputs[input] = reader.read(*objects[input]);
+            if (accepts(*inputs[input]))
+                plan.inputs[input] = reader.read(*inputs[input]);
     });
     std::erase_if(plan.inputs, [](MergeInput const& input) { return !input.object; });
     return plan;
 }
 
-MergePlan planMerge(MergeInputs validInputs, std::initializer_list<char const*> components)
+MergePlan planMerge(MergeInputs const& validInputs, std::initializer_list<char const*> components)
 {
-    return planMerge(std::move(validInputs), components, [](Object const&) { return true; });
+    return planMerge(validInputs, components, [](Object const&) { return true; });
 }
 
-MergeInputs holdInputs(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object const& output)
+MergeInputs withoutNulls(Orvan::Array<Orvan::Ptr<Object>> const& inputs)
 {
-    MergeInputs held;
-    held.objects.reserve(inputs.size);
-    for (Orvan::Ptr<Object> const& input : inputs) {
-        if (!input)
-            continue;
-        if (input.get() != &output) {
-            held.objects.push_back(input.get());
-            continue;
-        }
-        if (!held.outputBefore) {
-            Orvan::Ptr<Object> reference = input; // a second one: makes a copy
-            held.outputBefore = makeMutable(std::move(reference));
-        }
-        held.objects.push_back(held.outputBefore.get());
-    }
-    return held;
+    MergeInputs objects;
+    objects.reserve(inputs.size);
+    for (Orvan::Ptr<Object> const& input : inputs)
+        if (input)
+            objects.push_back(input.get());
+    return objects;
 }
 
 }

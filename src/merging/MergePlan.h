@@ -24,11 +24,8 @@ namespace Modeling::Internal {
 /// Nothing here counts as a reference to what the inputs hold: with thousands of small inputs, counting would cost more
 /// than copying. The caller's references keep the inputs, and who holds a reference changes nothing.
 
-/// The inputs of a merge, without null ones.
-struct MergeInputs {
-    std::vector<Tessara::Object const*> objects;
-    Orvan::Ptr<Tessara::Object> outputBefore; // stands for the output where that is an input itself
-};
+/// The inputs of a merge. The output may be one of them: nothing is written to it before the merge has been made.
+using MergeInputs = std::vector<Tessara::Object const*>;
 
 /// The elements of an array of a listed type, which somebody else holds.
 struct HeldArray {
@@ -83,26 +80,23 @@ struct MergeInput {
 
 /// The inputs that passed validation, whose order is the order of the merged elements.
 struct MergePlan {
-    MergeInputs held;
     std::vector<MergeInput> inputs;
 };
 
 /// Looks those inputs up that are accepted, in parallel.
 /// \param components  those that are merged: up to three
 /// \param accepts     `bool (Tessara::Object const&)`, called from several threads
-MergePlan planMerge(MergeInputs inputs, std::initializer_list<char const*> components,
+MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*> components,
     std::function<bool(Tessara::Object const&)> const& accepts);
 /// The same for inputs that all are accepted.
-MergePlan planMerge(MergeInputs validInputs, std::initializer_list<char const*> components);
+MergePlan planMerge(MergeInputs const& validInputs, std::initializer_list<char const*> components);
 
-/// The inputs that stay what they are, whatever is written to the output: where that is an input itself, a shallow copy
-/// stands for it.
-MergeInputs holdInputs(Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs, Tessara::Object const& output);
+MergeInputs withoutNulls(Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs);
 
 /// The inputs that a validator of the host accepts, each asked on its own.
 template <class Validator> MergeInputs filterValid(MergeInputs inputs)
 {
-    std::erase_if(inputs.objects, [](Tessara::Object const* input) { return !Validator().validate(*input); });
+    std::erase_if(inputs, [](Tessara::Object const* input) { return !Validator().validate(*input); });
     return inputs;
 }
 

@@ -61,12 +61,8 @@ void publish(Object const& staged, Object& output)
 {
     PreparedWrites writes(output);
     Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = staged.keys();
-    for (Orvan::String const& key : *keys) {
-        Orvan::Ptr<Object> const geoProperty = objectAt(staged, key);
-        bool const isChanged = geoProperty ? geoProperty != objectAt(output, key) : !output.hasProperty(key);
-        if (isChanged)
-            writes.setProperty(key, staged.getProperty(key));
-    }
+    for (Orvan::String const& key : *keys)
+        writes.setProperty(key, staged.getProperty(key));
     writes.commit();
 }
 

@@ -39,8 +39,7 @@ std::vector<DataPropertyMergeEntry> collectDependentDataProperties(
 /// the object has the key. (`copyNonGeoProperties`, for inputs whose properties have been looked up.)
 void copyOtherProperties(MergePlan const& plan, Tessara::Object& object);
 
-/// A shallow copy to build a result in, and the way back: the output gets all that has changed, or, where memory runs
-/// out, nothing.
+/// A shallow copy to build a result in, and the way back: the output gets all of it or, if memory runs out, nothing.
 Orvan::MutablePtr<Tessara::Object> stagedCopy(Tessara::Object const& output);
 void publish(Tessara::Object const& staged, Tessara::Object& output);
 

@@ -22,9 +22,7 @@ void transferComponentProperties(Orvan::String const& component, Tessara::Object
 
 void rebaseRegions(Offsets const& regionOffsets, Orvan::Array<unsigned int>& values, Offsets const& baseOffsets)
 {
-    if (baseOffsets.size <= 2)
-        return; // one input
-    // Each region is one iteration's own.
+    // Each region is one iteration's own. The base of the first one is 0.
     parallelFor(tbb::blocked_range<std::size_t>(1, baseOffsets.size - 1, kFaceGrain), [&](auto const& regions) {
         for (std::size_t region = regions.begin(); region != regions.end(); ++region) {
             unsigned int const base = baseOffsets[region];

@@ -63,7 +63,7 @@ namespace {
 
 bool mergeMeshes(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
 {
-    MergePlan const plan = planMerge(holdInputs(inputs, output), {sPointComp, sFaceVertexComp, sFaceComp},
+    MergePlan const plan = planMerge(withoutNulls(inputs), {sPointComp, sFaceVertexComp, sFaceComp},
         [](Object const& input) { return bool(validateMesh(input)); });
     MeshOffsets const offsets(plan);
     if (plan.inputs.empty() || !offsets.fit())

@@ -13,7 +13,7 @@ using namespace Tessara::Geometry;
 
 bool mergePointClouds(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
 {
-    MergePlan const plan = planMerge(filterValid<PointCloudValidator>(holdInputs(inputs, output)), {sPointComp});
+    MergePlan const plan = planMerge(filterValid<PointCloudValidator>(withoutNulls(inputs)), {sPointComp});
     std::optional<Offsets> const pointOffsets = computeElementOffsets(plan, 0);
     if (plan.inputs.empty() || !pointOffsets)
         return false;

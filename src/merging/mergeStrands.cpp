@@ -16,8 +16,7 @@ using namespace Tessara::Geometry;
 
 bool mergeStrands(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output, Orvan::RuntimeServices const*)
 {
-    MergePlan const plan =
-        planMerge(filterValid<StrandValidator>(holdInputs(inputs, output)), {sPointComp, sStrandComp});
+    MergePlan const plan = planMerge(filterValid<StrandValidator>(withoutNulls(inputs)), {sPointComp, sStrandComp});
     std::optional<Offsets> const pointOffsets = computeElementOffsets(plan, 0);
     std::optional<Offsets> const strandOffsets = computeElementOffsets(plan, 1);
     if (plan.inputs.empty() || !pointOffsets || !strandOffsets)

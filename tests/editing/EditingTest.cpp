@@ -5,6 +5,7 @@
 #include <Modeling/deleteComponents.h>
 #include <Modeling/deleteFaces.h>
 #include <Modeling/deletePointsInPointCloud.h>
+#include <TessaraGeometry/Validators.h>
 
 using namespace Tessara::GeometryAlgorithms;
 using namespace TestSupport;
@@ -126,9 +127,15 @@ TEST(Editing, leavesTheObjectAsItWasWhenMemoryRunsOut)
 TEST(Editing, editsInPlaceAndReadsArgumentsThatLieInTheObject)
 {
     auto const own = makePointCloud({{0, 0, 0}, {1, 0, 0}});
-    float3 const* const data = dataOf<float3>(*own, sPointPosition)->data;
+    addRangeProperty("range", sPointComp, {0, 1}, *own);
+    addDataProperty<int>("of range", "range", {5, 6}, *own);
+    auto const places = [&] {
+        return std::array<void const*, 3>{dataOf<float3>(*own, sPointPosition)->data,
+            getRangeGeoPropIndices(*own, "range")->data, dataOf<int>(*own, "of range")->data};
+    };
+    auto const before = places();
     ASSERT_TRUE(deletePointsInPointCloud(Indices{0}, *own, nullptr));
-    EXPECT_EQ(dataOf<float3>(*own, sPointPosition)->data, data);
+    EXPECT_EQ(places(), before);
 
     auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
     addDataProperty<unsigned int>("chosen", sPointComp, {1, 1, 0, 1}, *cloud);
@@ -166,9 +173,17 @@ TEST(Editing, refusesBeforeTheFirstChange)
     auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}}), emptyCloud = makePointCloud({});
     auto const withTwo = makePointCloud({{0, 0, 0}}), withoutPositions = makePointCloud({{0, 0, 0}});
     addComponent("sOtherComp", 1, *withTwo);
+    auto const withText = makePointCloud({{0, 0, 0}}), withFaces = makePointCloud({{0, 0, 0}});
+    withText->setProperty(sFaceComp, Orvan::String("text")); // is no component
+    EXPECT_TRUE(PointCloudValidator().validate(*withText));
+    EXPECT_TRUE(addPointsToPointCloud({{1, 0, 0}}, "", *withText, nullptr));
+    addComponent(sFaceComp, 0, *withFaces);
     addDataProperty<int>(sPointPosition, sPointComp, {1}, *withoutPositions);
     auto const mesh = MeshBuilder::tetrahedron().build(), shortOffsets = MeshBuilder::tetrahedron().build();
     addDataProperty<unsigned int>(sFaceOffset, sFaceComp, {0, 3, 6, 9}, *shortOffsets);
+    auto const shortCorners = deepCopy(*mesh), otherOffsets = deepCopy(*mesh);
+    addDataProperty<unsigned int>(sFaceVertex, sFaceVertexComp, Indices(11), *shortCorners);
+    addDataProperty<unsigned int>(sFaceOffset, sPointComp, {0, 3, 6, 9, 12}, *otherOffsets);
     auto const noPoints = makeMesh({}, {}, {});
     Positions one(1), tooMany(1);
     tooMany.size = 0xFFFFFFFFu; // more than a component can hold, and never read
@@ -181,6 +196,8 @@ TEST(Editing, refusesBeforeTheFirstChange)
     std::map<std::string, std::pair<Object*, std::function<bool(Object&)>>> const cases{
         {"add to a mesh", {mesh.get(), add(one)}},
         {"add to a cloud with a second component", {withTwo.get(), add(one)}},
+        {"add to a cloud with faces", {withFaces.get(), add(one)}},
+        {"delete points of a cloud with faces", {withFaces.get(), deletePoint}},
         {"add to a cloud without positions", {withoutPositions.get(), add(one)}},
         {"add more than 32 bits", {cloud.get(), add(tooMany)}},
         {"delete points of a mesh", {mesh.get(), deletePoint}},
@@ -190,6 +207,8 @@ TEST(Editing, refusesBeforeTheFirstChange)
         {"delete faces of a cloud", {cloud.get(), deleteNone}},
         {"flags of another length", {mesh.get(), [](Object& o) { return deleteFaces(Flags(3), o); }}},
         {"short offsets", {shortOffsets.get(), deleteNone}},
+        {"one corner too few", {shortCorners.get(), deleteNone}},
+        {"offsets of the points", {otherOffsets.get(), deleteNone}},
         {"mesh without points", {noPoints.get(), deleteNone}},
     };
     for (auto const& [name, c] : cases) {
@@ -215,7 +234,13 @@ TEST(Editing, worksByHand)
     auto const mesh = makeMesh(points, {0, 1, 3, 4, 3, 1}, {0, 3, 3, 6});
     ASSERT_TRUE(deleteFaces({false, false, true}, *mesh));
     EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceVertex), (Indices{0, 1, 2})) << "without the unused points";
-    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, kDeletedElement, 3})) << "on purpose";
+    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, kDeletedElement, 3}));
+    EXPECT_EQ(computeDeletedComponentMapping({false, true, false}), (Indices{0, kDeletedElement, 1}));
+
+    auto const lacking = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
+    addDataProperty<float3>(sPointPosition, sPointComp, {{5, 5, 5}}, *lacking, float3{7, 7, 7});
+    ASSERT_TRUE(addPointsToPointCloud({{9, 9, 9}}, "", *lacking, nullptr));
+    EXPECT_EQ(*dataOf<float3>(*lacking, sPointPosition), (Positions{{5, 5, 5}, {7, 7, 7}, {7, 7, 7}, {9, 9, 9}}));
 }
 
 TEST(DeleteFaces, staysInsideTheArraysWhateverTheyHold)

@@ -70,6 +70,7 @@ TEST(GeoProperties, surviveEveryFailingAllocation)
         writes.writeGeoPropData(sPointPosition, Orvan::makePtr<Orvan::Array<float3>>(1u));
         writes.writeGeoPropData("values", Orvan::makePtr<Indices>(1u));
         writes.writeGeoPropData("absent", Orvan::makePtr<Indices>(1u));
+        writes.setProperty("", 0);
         writes.setProperty("new", 1);
         writes.setProperty("new and too long for the text itself", 2);
         writes.commit();
@@ -83,6 +84,6 @@ TEST(GeoProperties, surviveEveryFailingAllocation)
     EXPECT_EQ(getElementCount(*cloud, sPointComp), 1u);
     EXPECT_EQ(readGeoPropData<float3>(*cloud, sPointPosition)->size, 1u);
     EXPECT_EQ(readGeoPropData<unsigned int>(*cloud, "values")->size, 1u);
-    EXPECT_FALSE(cloud->hasProperty("absent"));
+    EXPECT_FALSE(cloud->hasProperty("absent") || cloud->hasProperty(""));
     EXPECT_EQ(*cloud->getProperty("new").get<int>(), 1);
 }

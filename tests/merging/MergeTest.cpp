@@ -1,6 +1,7 @@
 #include "PlainMerge.h"
 
 #include "merging/MergedComponents.h"
+#include "merging/mergeGeoComponent.h"
 #include "support/Testing.h"
 
 #include <Modeling/copyNonGeoProperties.h>
@@ -48,7 +49,7 @@ Orvan::Ptr<Object> randomInput(Kind kind, std::size_t size, Random& random)
     for (char const* const component : components)
         addRandomProperties(component, random, *input);
     if (random.below(3) == 0)
-        input->setProperty("note", static_cast<int>(random.below(100)));
+        input->setProperty(random.below(4) == 0 ? "" : "note", static_cast<int>(random.below(100)));
     if (random.below(8) == 0)
         setElementCount(sPointComp, 12345, *input); // no longer valid
     if (random.below(8) == 0)
@@ -154,6 +155,7 @@ TEST(Merge, joinsByHand)
         Kind::Meshes, inputsOf(triangle, makeMesh({{5, 5, 5}}, {}, {0}), cloudOf(2), nullptr, deepCopy(*triangle)));
     EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceVertex), (Indices{0, 1, 2, 4, 5, 6}));
     EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, 3, 6}));
+    EXPECT_EQ(dataOf<unsigned int>(*mesh, sFaceOffset)->capacity, 3u) << "with its closing entry from the start";
     EXPECT_EQ(countsOf(*mesh), (Counts{7, 6, 2}));
 
     // One name on two components: each has what belongs to it, and the last one stays.
@@ -168,19 +170,27 @@ TEST(Merge, joinsByHand)
         inputsOf(makeStrands(Orvan::Array<float3>(10), {0, 4, 10}), makeStrands({{}, {}}, {0}),
             makeStrands(Orvan::Array<float3>(6), {0, 6})));
     EXPECT_EQ(valuesOf<unsigned int>(*strands, sStrandOffset), (Indices{0, 4, 12, 18}));
+
+    // Points in front of all strands stay loose, and what is merged may be merged again.
+    auto const withoutStrands = merged(Kind::Strands,
+        inputsOf(makeStrands({{}, {}}, {0}), makeStrands(Orvan::Array<float3>(6), {0, 6}), deepCopy(*strands)));
+    EXPECT_EQ(valuesOf<unsigned int>(*withoutStrands, sStrandOffset), (Indices{2, 8, 12, 20, 26}));
+    auto const twice = merged(Kind::Strands, inputsOf(deepCopy(*withoutStrands), deepCopy(*withoutStrands)));
+    EXPECT_EQ(valuesOf<unsigned int>(*twice, sStrandOffset), (Indices{2, 8, 12, 20, 28, 34, 38, 46, 52}));
 }
 
 TEST(Merge, refusesWhatItCannotMergeAndTouchesNothing)
 {
     // That many elements do not fit here, so only their counts are asked.
-    auto const huge = cloudOf(0);
+    auto const huge = cloudOf(0), rest = cloudOf(0);
     addComponent(sPointComp, 3'000'000'000u, *huge);
-    auto const fits = [](std::vector<Object const*> objects) {
+    addComponent(sPointComp, 1'294'967'295u, *rest);
+    auto const fits = [](std::vector<Object const*> const& objects) {
         using namespace Modeling::Internal;
-        return computeElementOffsets(planMerge({std::move(objects), nullptr}, {sPointComp}), 0).has_value();
+        return computeElementOffsets(planMerge(objects, {sPointComp}), 0).has_value();
     };
-    EXPECT_TRUE(fits({huge.get()}));
-    EXPECT_FALSE(fits({huge.get(), huge.get()}));
+    EXPECT_TRUE(fits({huge.get(), rest.get()}));
+    EXPECT_FALSE(fits({huge.get(), rest.get(), cloudOf(1).get()}));
 
     for (Kind const kind : {Kind::Meshes, Kind::PointClouds, Kind::Strands})
         for (Inputs const& inputs : {Inputs{}, Inputs{nullptr}}) {
@@ -215,6 +225,7 @@ TEST(Merge, copiesWhatIsNoGeometryFromTheFirstInputThatHasIt)
     first->setProperty("object", Orvan::Ptr<Object>(object));
     first->setProperty("null", Orvan::Ptr<Object>());
     second->setProperty("a", 2.5);
+    second->setProperty("", 5);
     second->setProperty("kept", 4);
     addDataProperty<int>("data", sPointComp, {1}, *second);
     addRangeProperty("range", sPointComp, {0}, *second);
@@ -231,7 +242,7 @@ TEST(Merge, copiesWhatIsNoGeometryFromTheFirstInputThatHasIt)
 TEST(Merge, raisesAnArrayThatHasTakenThePlaceOfTheConnectivity)
 {
     using namespace Modeling::Internal;
-    Offsets const regions{0, 2, 3, 5}, bases{0, 10, 100, 1000};
+    Offsets const regions{0, 2, 3, 50}, bases{0, 10, 100, 1000};
     auto const output = cloudOf(0);
     addDataProperty<unsigned int>("other", sPointComp, {1, 2, 3, 4}, *output); // shorter than the regions
     Connectivity connectivity{"other", bases, 1000u, nullptr};
@@ -241,6 +252,13 @@ TEST(Merge, raisesAnArrayThatHasTakenThePlaceOfTheConnectivity)
     EXPECT_EQ(valuesOf<unsigned int>(*output, "other"), (Indices{1, 2, 13, 104, 1100}));
     addDataProperty<int>("other", sPointComp, {1, 2, 3, 4}, *output);
     EXPECT_FALSE(finishConnectivity(connectivity, regions, *output));
+
+    // Inputs without values of their own get the default, which is raised too.
+    auto const with = cloudOf(2), without = cloudOf(2), target = cloudOf(0);
+    addDataProperty<unsigned int>("other", sPointComp, {1, 2}, *with, 7u);
+    Offsets const points{0, 2, 4};
+    mergeGeoComponent(planMerge({with.get(), without.get()}, {sPointComp}), sPointComp, points, &connectivity, *target);
+    EXPECT_EQ(valuesOf<unsigned int>(*target, "other"), (Indices{1, 2, 17, 17, 1000}));
 }
 
 TEST(Merge, isWholeOrRefusedIfAnEnclosingGroupIsCancelled)
@@ -305,9 +323,10 @@ TEST(Merge, joinsManySmallInputsThatAreAlikeOrNot)
             auto const input = deepCopy(*randomInput(kind, 1 + random.below(5), random));
             for (unsigned int alike = random.below(9); alike != 0 && inputs.size != 400; --alike) {
                 auto copy = deepCopy(*input);
-                // Data in some, another type of data in others; not even a geo property, but with values.
+                // Data in some, of another component or type in others; not even a geo property, but with values.
                 if (random.below(3) == 0)
-                    addDataProperty<int>("weight", sPointComp, {1, 2}, *copy, 5);
+                    addDataProperty<int>("weight",
+                        random.below(2) == 0 ? sPointComp : PlainMerge::componentsOf(kind).back(), {1, 2}, *copy, 5);
                 else if (random.below(3) == 0)
                     addDataProperty<float>("weight", sPointComp, {1.5f}, *copy, 0.5f);
                 else if (random.below(3) == 0)

@@ -155,7 +155,7 @@ namespace {
                 bool const isGeometry = object && *object
                     && (getDataGeoProperty(*input, key) || getRangeGeoProperty(*input, key)
                         || Object::isA(**object, *getComponentGeoPropPrototype()));
-                if (!output.hasProperty(key) && !isGeometry)
+                if (!key.empty() && !output.hasProperty(key) && !isGeometry)
                     output.setProperty(key, PropertyValue(value));
             }
     }

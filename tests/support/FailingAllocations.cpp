@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cstdlib>
 #include <cstring>
@@ -50,6 +51,7 @@ namespace {
         void* const block = mustFail() ? nullptr : systemBlock(bytes, alignment);
         if (!block)
             throw std::bad_alloc();
+        std::memset(block, 0xA5, std::min<std::size_t>(bytes, 4096)); // so that it shows if nobody writes it
         liveBlocks.fetch_add(1, std::memory_order_relaxed);
         return block;
     }

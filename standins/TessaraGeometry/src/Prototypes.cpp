@@ -59,15 +59,18 @@ namespace {
     }
 
     Orvan::Ptr<Object> makeGeometryPrototype(std::initializer_list<char const*> components,
-        std::initializer_list<char const*> data, std::initializer_list<Orvan::String> excluded)
+        std::initializer_list<char const*> data, std::initializer_list<char const*> excludedComponents)
     {
         Orvan::MutablePtr<Object> prototype = createObject();
         for (char const* const name : components)
             prototype->setProperty(name, getComponentGeoPropPrototype());
         for (char const* const name : data)
             prototype->setProperty(name, getDataGeoPropPrototype(sGenericDataGeoProp));
-        if (excluded.size() != 0)
-            exclude(excluded, *prototype);
+        Orvan::MutablePtr<Object> excluded = createObject();
+        for (char const* const name : excludedComponents)
+            excluded->setProperty(name, getComponentGeoPropPrototype());
+        if (excludedComponents.size() != 0)
+            prototype->setProperty(Object::kExcludedKeys, Orvan::Ptr<Object>(std::move(excluded)));
         return prototype;
     }
 

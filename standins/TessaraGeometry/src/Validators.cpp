@@ -101,12 +101,16 @@ namespace {
         return false;
     }
 
-    /// Offsets start at 0, never fall, and end at `last`.
+    Status checkFirstOffset(char const* name, Orvan::Array<unsigned int> const& offsets)
+    {
+        return offsets[0] == 0 ? Status()
+                               : failure(std::string(name) + "[0] is " + to_string(offsets[0]) + " instead of 0");
+    }
+
+    /// Offsets are non-decreasing and end at `last`.
     Status checkOffsets(
         char const* name, Orvan::Array<unsigned int> const& offsets, std::uint64_t last, Wording const& words)
     {
-        if (offsets[0] != 0)
-            return failure(std::string(name) + "[0] is " + to_string(offsets[0]) + " instead of 0");
         if (anyWrong(offsets.size - 1, [o = offsets.data](std::uint64_t i) { return o[i] > o[i + 1]; })) {
             unsigned int const* const fall = std::adjacent_find(offsets.begin(), offsets.end(), std::greater<>());
             auto const entry = static_cast<std::uint64_t>(fall - offsets.begin()) + 1;
@@ -161,6 +165,7 @@ Status validateMesh(Object const& mesh)
         [&] {
             return checkStandardData<unsigned int>(mesh, {sFaceOffset, faces, faceCount + 1}, &faceOffset);
         },
+        [&] { return checkFirstOffset(sFaceOffset, *faceOffset); },
         [&] {
             return checkOffsets(sFaceOffset, *faceOffset, corners.count, {"mesh", "face corners"});
         },
@@ -197,11 +202,11 @@ Status StrandValidator::validate(Object const& strands)
             return checkStandardData<unsigned int>(strands, {sStrandOffset, lines, strandCount + 1}, &offsets);
         },
         [&] {
-            // Without strands the points belong to none of them: the one offset may be 0, or their number.
-            std::uint64_t const last = strandCount == 0 ? 0 : points.count;
-            if (strandCount == 0 && (*offsets)[0] == points.count)
+            // Points in front of the first strand belong to none. Without strands these are all points, and the one
+            // offset may also be 0.
+            if (strandCount == 0 && (*offsets)[0] == 0)
                 return Status();
-            return checkOffsets(sStrandOffset, *offsets, last, {"strand set", "points"});
+            return checkOffsets(sStrandOffset, *offsets, points.count, {"strand set", "points"});
         });
 }
 

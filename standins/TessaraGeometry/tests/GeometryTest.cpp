@@ -221,6 +221,8 @@ TEST(Validators, acceptWhatIsUnusualButWhole)
         {makeStrands({{0, 0, 0}}, {0}), true},
         {makeStrands({{0, 0, 0}}, {1}), true},
         {makeStrands({{0, 0, 0}, {1, 0, 0}}, {1}), false},
+        {makeStrands({{0, 0, 0}, {1, 0, 0}}, {1, 2}), true}, // the first point is of no strand
+        {makeStrands({{0, 0, 0}, {1, 0, 0}}, {0, 1}), false},
         {makePointCloud({{nan, 0, 0}}), true},
     };
     for (auto const& [geometry, isWhole] : cases)

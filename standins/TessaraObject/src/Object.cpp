@@ -125,6 +125,11 @@ bool Object::isA(Object const& object, Object const& prototype)
     // Values are looked at in place: a copy of a `Ptr` would have all threads write the count of one shared prototype.
     constexpr std::string_view kExcluded = kExcludedKeys;
     auto const lacksAll = [&](PropertyValue const& excluded) {
+        if (auto const* const values = excluded.get<Orvan::Ptr<Object>>(); values && *values)
+            return std::none_of((*values)->entries_.begin(), (*values)->entries_.end(), [&](Entry const& unwanted) {
+                Entry const* const entry = object.find(unwanted.key.view());
+                return entry && valueConforms(entry->value, unwanted.value);
+            });
         auto const* const names = excluded.get<Orvan::Ptr<Orvan::Array<Orvan::String>>>();
         return !names || !*names || std::none_of((*names)->begin(), (*names)->end(), [&](Orvan::String const& name) {
             return object.find(name.view());

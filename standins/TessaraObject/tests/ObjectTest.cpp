@@ -122,6 +122,8 @@ TEST(Object, conformsToAPrototypeByContent)
              {"inner object where there is a number", objectOf({{"int", Ptr<Object>()}}), false},
              {"excluded key is absent", objectOf({{Object::kExcludedKeys, excluding({"a", "b"})}}), true},
              {"excluded key is there", objectOf({{Object::kExcludedKeys, excluding({"a", "int"})}}), false},
+             {"excluded value is there", objectOf({{Object::kExcludedKeys, objectOf({{"int", 0}})}}), false},
+             {"excluded key has another value", objectOf({{Object::kExcludedKeys, objectOf({{"int", 0.5f}})}}), true},
          })
         EXPECT_EQ(Object::isA(*object, *prototype), conforms) << name;
 }

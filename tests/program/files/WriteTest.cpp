@@ -232,12 +232,13 @@ namespace {
                 {"<Polys> connectivity Int64x1", longs(0, 1, 2, 0, 2, 4, 3)},
                 {"<Polys> offsets Int64x1", longs(3, 7)}}));
 
-        Object const strands = makeStrands({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}}, {0, 2, 3});
+        Object const strands = makeStrands({{9, 9, 9}, {0, 0, 0}, {1, 0, 0}, {2, 0, 0}}, {1, 3, 4}); // one is loose
         addDataProperty<int>("part", sStrandComp, {4, 5}, *strands);
+        EXPECT_THAT(written(*strands, ".obj").content, HasSubstr("\nl 2 3\nl 4\n"));
         EXPECT_EQ(arraysIn(strands),
             (Arrays{{"<CellData> part Int32x1", bytesOfArray<int>(*strands, "part")},
                 {"<Points> Points Float32x3", bytesOfArray<float3>(*strands, sPointPosition)},
-                {"<Lines> connectivity Int64x1", longs(0, 1, 2)}, {"<Lines> offsets Int64x1", longs(2, 3)}}));
+                {"<Lines> connectivity Int64x1", longs(1, 2, 3)}, {"<Lines> offsets Int64x1", longs(2, 3)}}));
 
         Object const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
         EXPECT_EQ(arraysIn(cloud),

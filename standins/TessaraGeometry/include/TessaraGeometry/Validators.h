@@ -11,7 +11,8 @@ namespace Tessara::Geometry {
 // - all components of the kind are there (a point cloud has no other component), all standard properties are there with
 //   the right element type, target and type of `sDefault`;
 // - position and index arrays are as long as their component, offset arrays one entry longer;
-// - offsets start at 0, never fall and end at the number of corners (strands: of points); point indices are in range.
+// - offsets start at 0, are non-decreasing and end at the number of corners; point indices are in range. Offsets of
+//   strands end at the number of points, and may start above 0: the points in front of that belong to no strand.
 // A mesh without faces has no corners but may hold points; so may a strand set without strands, whose one offset is
 // then 0 or the number of points. Positions need not be finite. Empty geometry is valid. Other properties make no
 // object invalid, not by their length either: operations pad, trim or drop them; `reportProperties` tells about them.

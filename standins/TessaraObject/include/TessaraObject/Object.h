@@ -45,7 +45,8 @@ public:
     virtual void setProperty(Orvan::String const& key, PropertyValue&& value);
 
     /// Whether `object` conforms to `prototype`, which is decided by content. For every key of the prototype:
-    /// - the reserved key `kExcludedKeys` lists the keys that `object` must not have;
+    /// - the reserved key `kExcludedKeys` lists keys that `object` must not have, or holds an object of keys and values:
+    ///   `object` must have none of the keys with a value that conforms to the one here;
     /// - an empty value asks for the key with any value, empty ones included;
     /// - an object asks for an object that conforms to it in turn, a null one for any object but null;
     /// - any other value asks for a value of the same type.
