@@ -32,7 +32,8 @@ namespace Geometry::Mesh {
 /// of threads. Linear in the number of faces, plus for each collapse the valences of both ends: many collapses at one
 /// point of many faces take quadratic time. A collapse that is refused mostly costs the smaller of the two valences,
 /// because the points around a hub, and the faces that refused there, are remembered. Allocates about 30 bytes per face
-/// beside the arrays that are written, and up to 40 more per face of a hub; if nothing collapses, nothing is written.
+/// beside the arrays that are written, and 40 to some hundred more per face around a hub; if nothing collapses, nothing
+/// is written.
 ///
 /// Link condition: Dey, Edelsbrunner, Guha, Nekhayev, "Topology preserving edge contraction", 1999.
 MODELING_EXPORT bool removeSlivers(float ratio, Tessara::Object& mesh);
