@@ -34,10 +34,11 @@ namespace Geometry::Mesh {
 /// \throws       std::bad_alloc, with the mesh as it was. Job cancellation is not looked at.
 ///
 /// Measuring and adjacency run in parallel, the collapses on the calling thread; the result is the same for any number
-/// of threads. Linear in the number of faces, plus the valences of both ends per collapse. A collapse that is refused
-/// mostly costs no more than the valence of the end with fewer faces, because what refuses it at a point of many faces
-/// is remembered; it costs both valences if each time another face refuses. Allocates about 30 bytes per face beside the
-/// arrays that are written; if nothing collapses, nothing is written.
+/// of threads. Linear in the number of faces, plus for each collapse the valences of both ends: many collapses at one
+/// point of many faces take quadratic time. A collapse that is refused mostly costs the smaller of the two valences,
+/// because the points around a hub, and the faces that refused there, are remembered. Allocates about 30 bytes per face
+/// beside the arrays that are written, and 40 to some hundred more per face around a hub; if nothing collapses, nothing
+/// is written.
 ///
 /// Link condition: Dey, Edelsbrunner, Guha, Nekhayev, "Topology preserving edge contraction", 1999.
 MODELING_EXPORT bool removeSlivers(float ratio, Tessara::Object& mesh);

@@ -63,7 +63,7 @@ namespace {
         };
         Fan fan = Fan::Tangled;
         std::unordered_set<unsigned int> ring; // the points around it if the fan is closed
-        std::array<unsigned int, 8> refusing{}; // the faces that refused collapses, the latest one first
+        std::unordered_map<std::uint64_t, unsigned int> refusing; // by directions, the faces that refused to move there
     };
 
     /// The mesh while its faces collapse. A removed face has `kInvalidIndex` at its first corner.
@@ -302,6 +302,16 @@ namespace {
         return isMutual ? std::optional<FanFace>({face, entry}) : std::nullopt;
     }
 
+    /// The face around the same point before `current`.
+    std::optional<FanFace> previousAround(CollapsingMesh const& mesh, FanFace const& current)
+    {
+        unsigned int const face = mesh.adjacency[current.face][current.entry];
+        if (face == kInvalidIndex || mesh.isRemoved(face))
+            return std::nullopt;
+        FanFace const before{face, next(neighborIndex(mesh, face, current.face))};
+        return nextAround(mesh, before) == current ? std::optional<FanFace>(before) : std::nullopt;
+    }
+
     /// Lists the faces around an end of the edge. False unless the fan closes and holds all faces of the point, which it
     /// does not around boundaries and non-manifold points, and unless `accept` takes each of the listed faces. The walk
     /// ends with the first face that it does not take.
@@ -394,7 +404,6 @@ namespace {
     Hub walkAround(CollapsingMesh const& mesh, FanFace const& first)
     {
         Hub hub;
-        hub.refusing.fill(kInvalidIndex);
         std::size_t const valence = mesh.valence[mesh.corners(first.face)[first.entry]];
         hub.ring.reserve(valence);
         std::optional<FanFace> current = first;
@@ -437,27 +446,65 @@ namespace {
         return hub.fan == Hub::Fan::Closed && std::count_if(other.ring.begin(), other.ring.end(), isShared) == 2;
     }
 
-    /// Lists the faces around a hub as `collectFan` does, but first asks those that refused other edges.
-    template <class Accept>
-    bool collectFanOfHub(CollapsingMesh const& mesh, Accept const& accept, Hub& hub, EdgeEnd& end)
+    /// The cell of a direction among 8, 128, ... up to 2^35 of them.
+    std::uint64_t directionCell(float3 const& direction, unsigned int level)
     {
-        for (unsigned int const face : hub.refusing) {
-            if (face == kInvalidIndex || mesh.isRemoved(face) || face == end.first.face || face == end.last.face)
-                continue;
-            unsigned int const* const corners = mesh.corners(face);
-            auto const entry = static_cast<unsigned int>(std::find(corners, corners + 3, end.point) - corners);
-            if (entry != 3 && !accept({face, entry}))
-                return false;
+        std::uint64_t cell = level;
+        for (float const coordinate : {direction.x, direction.y, direction.z}) {
+            float const atMost1 = coordinate >= -1 && coordinate < 1 ? coordinate : 1; // also if it is NaN
+            cell = cell << 18 | static_cast<std::uint64_t>((atMost1 + 1) * static_cast<float>(1U << level));
         }
-        auto const acceptOrRemember = [&](FanFace const& around) {
-            bool const isAccepted = accept(around);
-            if (!isAccepted) {
-                std::copy_backward(hub.refusing.begin(), hub.refusing.end() - 1, hub.refusing.end());
-                hub.refusing.front() = around.face;
+        return cell;
+    }
+
+    constexpr unsigned int kFinestLevel = 16;
+    constexpr unsigned int kLevelStep = 2;
+
+    /// The face that refused the move of the hub into the most similar direction; `otherwise` if there is none.
+    FanFace findRefusing(
+        CollapsingMesh const& mesh, Hub const& hub, unsigned int point, float3 const& direction, FanFace otherwise)
+    {
+        for (unsigned int level = kFinestLevel + kLevelStep; level != 0 && !hub.refusing.empty();) {
+            level -= kLevelStep;
+            auto const found = hub.refusing.find(directionCell(direction, level));
+            if (found == hub.refusing.end() || mesh.isRemoved(found->second))
+                continue;
+            unsigned int const* const corners = mesh.corners(found->second);
+            auto const entry = static_cast<unsigned int>(std::find(corners, corners + 3, point) - corners);
+            if (entry != 3)
+                return {found->second, entry};
+        }
+        return otherwise;
+    }
+
+    /// Lists the faces around a hub whose fan closes as `collectFan` does, in another order: from the face that will
+    /// probably refuse on both sides, because collapses into similar directions are refused by faces that are close.
+    template <class Accept> bool collectFanOfHub(
+        CollapsingMesh const& mesh, Accept const& accept, float3 const& midpoint, Hub& hub, EdgeEnd& end)
+    {
+        constexpr unsigned int kNear = 8;
+        float3 const direction = safeNormalize(midpoint - mesh.positions[end.point]);
+        std::optional<FanFace> ahead = findRefusing(mesh, hub, end.point, direction, end.first);
+        std::optional<FanFace> behind = previousAround(mesh, *ahead);
+        end.fan.clear();
+        unsigned int const valence = mesh.valence[end.point];
+        for (unsigned int visited = 0; visited != valence; ++visited) {
+            bool const isAhead = visited % 2 == 0;
+            std::optional<FanFace>& side = isAhead ? ahead : behind;
+            if (!side)
+                return collectFan(mesh, accept, end); // two faces that have two edges in common
+            FanFace const current = *side;
+            if (current.face != end.first.face && current.face != end.last.face) {
+                if (!accept(current)) {
+                    for (unsigned int level = 0; visited > kNear && level <= kFinestLevel; level += kLevelStep)
+                        hub.refusing[directionCell(direction, level)] = current.face;
+                    return false;
+                }
+                end.fan.push_back(current);
             }
-            return isAccepted;
-        };
-        return collectFan(mesh, acceptOrRemember, end);
+            side = isAhead ? nextAround(mesh, current) : previousAround(mesh, current);
+        }
+        return true;
     }
 
     /// Whether the edge has a face on both sides, both ends have closed fans, no face around them turns over, and the
@@ -488,7 +535,7 @@ namespace {
             return false;
         collectRing(mesh, smaller);
         if (Hub* const hub = findHub(larger, smaller, mesh))
-            return hubKeepsLink(*hub, smaller) && collectFanOfHub(mesh, keepsOrientation, *hub, larger);
+            return hubKeepsLink(*hub, smaller) && collectFanOfHub(mesh, keepsOrientation, midpoint, *hub, larger);
         return collectFan(mesh, keepsOrientation, larger) && collapseKeepsLink(mesh, smaller, larger, sharedRing);
     }
 

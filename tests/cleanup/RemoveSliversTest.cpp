@@ -157,6 +157,7 @@ TEST(RemoveSlivers, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
         {"thin torus", MeshBuilder::torus(100, 3).withNoise(0.01f, 8)},
         {"bipyramid", MeshBuilder::bipyramid(300).withNoise(0.001f, 7)},
         {"wheel", MeshBuilder::wheel(120)},
+        {"wheel with three radii", MeshBuilder::wheel(300, {0.02f, 1, 0.5f}).shuffled(3)},
         {"hubs with needles", MeshBuilder::wheel(90).withNeedles(150).withNoise(0.0002f, 3).shuffled(5)},
         {"equal points", MeshBuilder::sphere(6).withNeedles(30, 0.0f)},
         {"two parts",
@@ -241,13 +242,10 @@ TEST(RemoveSlivers, survivesSoupsAndPositionsThatAreNoNumbers)
 TEST(RemoveSlivers, staysLinearAroundAHub)
 {
     EXPECT_LT(countsOf(*withoutSlivers(MeshBuilder::bipyramid(100'000), 0.1f)).faces, 200'000);
-    // Now the short edges lead to the hubs. A walk around a hub for each of them would take hours.
-    auto const wheel = MeshBuilder::wheel(400'000);
-    EXPECT_EQ(countsOf(*withoutSlivers(wheel, 0.5f)).faces, 800'000 - 2);
-    auto star = wheel; // and here the collapses would turn faces over
-    star.points[400'000].z = 1;
-    star.points[400'001].z = -1;
-    EXPECT_TRUE(isValid(*withoutSlivers(star, 0.5f)));
+    // Now the short edges lead to the hubs. A walk around a hub for each of them would take hours: one collapse joins
+    // the hubs, so that their other spokes have too many neighbors in common, or faces far away would turn over.
+    EXPECT_EQ(countsOf(*withoutSlivers(MeshBuilder::wheel(400'000), 0.5f)).faces, 800'000 - 2);
+    EXPECT_TRUE(isValid(*withoutSlivers(MeshBuilder::wheel(300'000, {0.02f, 1, 0.5f}), 0.5f)));
 }
 
 TEST(RemoveSlivers, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)

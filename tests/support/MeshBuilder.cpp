@@ -129,12 +129,12 @@ MeshBuilder MeshBuilder::bipyramid(unsigned int rim)
     return mesh;
 }
 
-MeshBuilder MeshBuilder::wheel(unsigned int rim)
+MeshBuilder MeshBuilder::wheel(unsigned int rim, std::vector<float> const& radii)
 {
     MeshBuilder mesh = bipyramid(rim);
-    for (unsigned int point = 0; point < rim; point += 2) {
-        mesh.points[point].x *= 0.02f;
-        mesh.points[point].y *= 0.02f;
+    for (unsigned int point = 0; point != rim; ++point) {
+        mesh.points[point].x *= radii[point % radii.size()];
+        mesh.points[point].y *= radii[point % radii.size()];
     }
     mesh.points[rim].z = 0.001f;
     mesh.points[rim + 1].z = -0.001f;

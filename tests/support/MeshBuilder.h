@@ -21,8 +21,8 @@ public:
     static MeshBuilder torus(unsigned int rings, unsigned int sides);
     /// Two points of valence `rim` over and under a rim of as many points.
     static MeshBuilder bipyramid(unsigned int rim);
-    /// The same, almost flat, with every second point of the rim close to the middle: half of the spokes are short.
-    static MeshBuilder wheel(unsigned int rim);
+    /// The same, almost flat, with radii that repeat along the rim: by default half of the spokes are short.
+    static MeshBuilder wheel(unsigned int rim, std::vector<float> const& radii = {0.02f, 1});
     /// An open square in the plane z = 0 with 2 n² faces.
     static MeshBuilder square(unsigned int segments);
     static MeshBuilder of(std::vector<float3> points, std::vector<Triangle> faces);
