@@ -28,6 +28,10 @@ namespace {
     // One can see it on a screen that shows the whole mesh: 20 of 1,000 pixels.
     constexpr double kMoveShare = 0.02;
 
+    // A plate whose volume is a smaller share of area times diagonal is thinner than single precision can express: what is
+    // measured is rounding, and its sign means nothing.
+    constexpr double kFlatShare = 1e-7;
+
     /// Calls `sumOf(begin, end)` for blocks of a fixed size in parallel, and adds the results up in the order of blocks.
     template <class Sum, std::size_t kBlock = 4096, class SumOf>
     Sum sumOverBlocks(std::size_t count, SumOf const& sumOf)
@@ -192,7 +196,7 @@ namespace {
     {
         std::vector<std::string> changes;
         auto const& [before, after, largest] = change;
-        if (before.volume && after.volume) {
+        if (before.volume && after.volume && std::abs(*before.volume) > kFlatShare * before.area * before.diagonal) {
             double const share = shareOfChange(std::abs(*before.volume), std::abs(*after.volume));
             if (*before.volume * *after.volume < 0)
                 changes.push_back("the closed surface turned inside out");

@@ -126,6 +126,7 @@ TEST(Shape, WarnsOfLargeChangesOnly)
         {{cube, {1, 6.2, 3, 2}, 0}, nullptr},
         {{{kOpen, 6, 3, 2}, {kOpen, 3, 3, 2}, 0}, "the area by -50 %"},
         {{cube, {1, 6, 5, 2}, 0}, "2 edges folded over"},
+        {{{1e-9, 6, 3, 2}, {-1e-9, 6, 3, 2}, 0}, nullptr}, // a sheet with two sides
         {{{0, 0, 0, 0}, {0, 0, 0, 0}, 0}, nullptr},
     };
     for (Case const& c : cases) {
