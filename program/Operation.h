@@ -27,8 +27,12 @@ void requireWritable(std::filesystem::path const& file);
 /// The latter alone.
 void requirePlace(std::filesystem::path const& file);
 
-/// Reads a file.
+/// Reads a file as the report's options say. If it is centered, files that are read later get the same center.
 Orvan::MutablePtr<Tessara::Object> readGeometry(std::filesystem::path const& file, Report& report);
+
+/// The sentence that tells what has been subtracted from all positions.
+/// \pre  there is an origin
+std::string centerOf(ReadOptions const& reading);
 
 /// Reads a file, and has the host's validator look at it.
 Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);

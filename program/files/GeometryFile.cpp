@@ -10,7 +10,7 @@ namespace ModelingProgram {
 namespace {
 
     struct Format {
-        GeometryFile (*read)(InputFile const&);
+        GeometryFile (*read)(InputFile const&, ReadOptions const&);
         void (*write)(WritableGeometry&, std::filesystem::path const&);
     };
 
@@ -38,20 +38,22 @@ namespace {
 
 }
 
-GeometryFile readGeometryFile(std::filesystem::path const& file)
+GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options)
 {
     Format const format = formatOf(file);
     if (!format.read)
         throw FileError(file.string() + " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz");
-    return format.read(InputFile(file));
+    return format.read(InputFile(file), options);
 }
 
-std::vector<std::string> writeGeometryFile(Tessara::Object const& object, std::filesystem::path const& file)
+std::vector<std::string> writeGeometryFile(
+    Tessara::Object const& object, std::filesystem::path const& file, std::string const& remark)
 {
     Format const format = formatOf(file);
     if (!format.write)
         throw FileError(file.string() + " cannot be written: its name ends in none of .obj, .ply, .stl and .vtp");
     WritableGeometry geometry = takeApart(object, file);
+    geometry.remark = remark;
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }
