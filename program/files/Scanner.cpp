@@ -32,7 +32,10 @@ namespace {
         }
         if (digitCount <= std::numeric_limits<float>::digits10)
             return HUGE_VAL;
-        return 0.500001 * std::pow(10.0, exponent - decimalCount);
+        constexpr double kUnits[] = {1e0, 1e-1, 1e-2, 1e-3, 1e-4, 1e-5, 1e-6, 1e-7, 1e-8, 1e-9, 1e-10};
+        int const place = decimalCount - exponent;
+        bool const isCommon = place >= 0 && place < static_cast<int>(std::size(kUnits)); // std::pow takes long
+        return 0.500001 * (isCommon ? kUnits[place] : std::pow(10.0, -place));
     }
 
 }
