@@ -16,6 +16,8 @@ struct Invocation {
     std::string command;
     bool asJson = false;
     unsigned int threads = 0; // at most so many; 0 for as many as there are
+    ReadOptions reading;
+    std::vector<double> center; // three numbers if it is given
     std::function<void(Report&)> run;
 };
 

@@ -114,13 +114,23 @@ void requireAttribute(Output const& out, char const* option, std::string const& 
 
 Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& report)
 {
-    GeometryFile geometry = readGeometryFile(file);
+    GeometryFile geometry = readGeometryFile(file, report.reading);
     stopIfCancelled();
+    if (geometry.origin) {
+        report.reading.origin = geometry.origin;
+        report.document["center"] = {geometry.origin->x, geometry.origin->y, geometry.origin->z};
+    }
     for (std::string const& note : geometry.notes)
         report.warn(note);
     report.document["inputs"].push_back(
         {{"file", file.string()}, {"format", geometry.format}, {"kind", nameOf(typeOf(*geometry.object))}});
     return std::move(geometry.object);
+}
+
+std::string centerOf(ReadOptions const& reading)
+{
+    return fmt::format(
+        "center {} {} {} subtracted from all positions", reading.origin->x, reading.origin->y, reading.origin->z);
 }
 
 Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& report)
@@ -180,7 +190,8 @@ void saveGeometry(Tessara::Object const& object, Output const& out, Report& repo
         throw Failure(ExitCode::Unexpected,
             fmt::format("the result is not valid, so nothing was written: {}", status.message().view()));
     stopIfCancelled();
-    for (std::string const& note : writeGeometryFile(object, out.file, out.existing()))
+    std::string const remark = report.reading.origin ? centerOf(report.reading) : std::string();
+    for (std::string const& note : writeGeometryFile(object, out.file, {out.existing(), remark}))
         report.warn(note);
     report.document["output"] = out.file.string();
 }

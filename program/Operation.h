@@ -42,8 +42,12 @@ void requireWritableFaces(Output const& out, Tessara::Object const& mesh);
 /// Refuses a file whose format cannot hold a new attribute, which `option` asks for.
 void requireAttribute(Output const& out, char const* option, std::string const& name);
 
-/// Reads a file.
+/// Reads a file as the report's options say. If it is centered, files that are read later get the same center.
 Orvan::MutablePtr<Tessara::Object> readGeometry(std::filesystem::path const& file, Report& report);
+
+/// The sentence that tells what has been subtracted from all positions.
+/// \pre  there is an origin
+std::string centerOf(ReadOptions const& reading);
 
 /// Reads a file, and has the host's validator look at it.
 Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);

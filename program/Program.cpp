@@ -82,9 +82,14 @@ Exit codes:
         if (invocation.threads != 0)
             threadLimit.emplace(tbb::global_control::max_allowed_parallelism, invocation.threads);
         Report report(invocation.command);
+        report.reading = invocation.reading;
+        if (std::vector<double> const& center = invocation.center; !center.empty())
+            report.reading.origin = {center[0], center[1], center[2]};
         try {
             invocation.run(report);
             report.document["exitCode"] = 0;
+            if (report.document.contains("center"))
+                report.text += centerOf(report.reading) + "\n";
             if (!writeToStandardOutput(invocation.asJson ? toText(report.document) + "\n" : report.text))
                 throw Failure(ExitCode::File, "cannot write to standard output");
             return 0;
@@ -112,6 +117,15 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
     Command command = program.addCommand(help);
     command.addFlag("--json", invocation.asJson, "Print one JSON document in place of text, also on failure");
     command.addOption("--threads", invocation.threads, "Use at most N threads").valueName("N").between(1, 1024);
+    command.addFlag("--lenient", invocation.reading.isLenient,
+        "Leave out what is broken in files, with a warning: points that are NaN, the faces at them, faces with fewer "
+        "than three corners, bytes at the end");
+    command.addFlag("--center", invocation.reading.isCentered,
+        "Subtract a rounded center from all positions, in double precision, and tell it");
+    command.addOption("--center-at", invocation.center, "Subtract this place instead")
+        .synopsis("X Y Z")
+        .values(3)
+        .between(-1e18, 1e18);
     return command;
 }
 

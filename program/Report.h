@@ -1,5 +1,7 @@
 #pragma once
 
+#include "files/GeometryFile.h"
+
 #include <nlohmann/json.hpp>
 
 #include <cstdint>
@@ -21,6 +23,7 @@ public:
 
     Json document; // what --json prints
     std::string text; // what is printed otherwise
+    ReadOptions reading; // of all files of the command; the first one read decides which center is subtracted
 };
 
 /// The document as it is printed. Bytes that are no UTF-8 (names in files may hold any) become replacement characters.

@@ -197,6 +197,8 @@ namespace {
 
 BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth)
 {
+    if (mesh.faceCount() == 0)
+        return {};
     // A band around a piece of plane holds its area times its width. It touches the cubic blocks of side s whose centers
     // are within half the width and half the block's extent along the normal n, which is s (|nx| + |ny| + |nz|).
     constexpr double kBlockVoxels = Band::kBlockSide * Band::kBlockSide * Band::kBlockSide;
@@ -227,6 +229,8 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
 std::vector<Voxel> voxelsAround(MeshArrays const& mesh, SurfaceValue const& value, double voxelSize, double halfWidth)
 {
     constexpr unsigned int kFacesBetweenLooks = 1024;
+    if (mesh.faceCount() == 0)
+        return {};
     Band band(reachOf(mesh, voxelSize, halfWidth).lowest, value, voxelSize, halfWidth);
     auto const cornerAt = [&](unsigned int point) {
         return Corner{placeOf((*mesh.positions)[point], voxelSize),

@@ -150,8 +150,7 @@ namespace {
         volume.background = options.background;
         requireMemory(estimateBand(arrays, volume.voxelSize, options.halfWidth), volume.voxelSize, limit);
         runOperation(report, [&] {
-            if (arrays.faceCount() != 0)
-                volume.voxels = voxelsAround(arrays, value, volume.voxelSize, options.halfWidth);
+            volume.voxels = voxelsAround(arrays, value, volume.voxelSize, options.halfWidth);
             if (options.from)
                 mapValues(*options.from, *options.to, volume.voxels);
             requireFiniteValues(volume);

@@ -19,6 +19,7 @@
 #include <limits>
 #include <memory>
 #include <optional>
+#include <utility>
 
 namespace ModelingProgram {
 
@@ -151,9 +152,12 @@ namespace {
     StitchTemplate readTemplate(Options const& options, Report& report)
     {
         std::filesystem::path const &polygonFile = options.drawing[0], &strandFile = options.drawing[1];
+        // A template is drawn where its author wanted it: --center moves the mesh alone.
+        ReadOptions const reading = std::exchange(report.reading, {.isLenient = report.reading.isLenient});
         Orvan::MutablePtr<Object> const polygon = loadGeometry(polygonFile, report);
         requireMesh(*polygon, "stitch", polygonFile);
         Orvan::MutablePtr<Object> const strands = loadGeometry(strandFile, report);
+        report.reading = reading;
         if (typeOf(*strands) != GeometryType::Strands)
             throw Failure(ExitCode::Refused,
                 fmt::format("stitch needs strands, such as the lines of an OBJ file, and {} holds a {}",

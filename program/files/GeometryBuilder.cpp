@@ -2,9 +2,85 @@
 
 #include <TessaraGeometry/Names.h>
 
+#include <cstdio>
+
 namespace ModelingProgram {
 
 using namespace Tessara::Geometry;
+using Tessara::Math::double3;
+using Tessara::Math::float3;
+
+namespace {
+
+    template <class T>
+    Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
+    {
+        Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
+        std::transform(
+            indices.begin(), indices.end(), result.begin(), [&](unsigned int index) { return values[index]; });
+        return result;
+    }
+
+    double lossOf(double value)
+    {
+        return std::abs(value - static_cast<double>(static_cast<float>(value)));
+    }
+
+    struct Box {
+        double3 min{HUGE_VAL, HUGE_VAL, HUGE_VAL};
+        double3 max{-HUGE_VAL, -HUGE_VAL, -HUGE_VAL};
+
+        double longestSide() const { return std::max({max.x - min.x, max.y - min.y, max.z - min.z}); }
+    };
+
+    /// The box of `positions` as far as they are finite in single precision, as `floats` has them.
+    template <class T> Box boxOf(Orvan::Array<float3> const& floats, Orvan::Array<T> const& positions)
+    {
+        Box box;
+        for (std::uint64_t point = 0; point < positions.size; ++point) {
+            T const& p = positions[point];
+            if (!isFinite(floats[point]))
+                continue;
+            box.min = {
+                std::min<double>(box.min.x, p.x), std::min<double>(box.min.y, p.y), std::min<double>(box.min.z, p.z)};
+            box.max = {
+                std::max<double>(box.max.x, p.x), std::max<double>(box.max.y, p.y), std::max<double>(box.max.z, p.z)};
+        }
+        return box;
+    }
+
+    /// A place near the middle of the box with few digits, so that it can be read, typed and added again: its coordinates
+    /// are multiples of a power of ten that is about as large as the box.
+    double3 roundedCenterOf(Orvan::Array<float3> const& floats, Orvan::Array<double3> const& positions)
+    {
+        Box const box = boxOf(floats, positions);
+        double const side = box.longestSide();
+        if (!(side >= 0))
+            return {0, 0, 0}; // no point is finite
+        int const digits = side > 0 ? static_cast<int>(std::ceil(std::log10(side))) : 0;
+        double const power = std::pow(10.0, std::abs(digits));
+        auto const rounded = [&](double least, double most) {
+            double const middle = least + (most - least) / 2;
+            double const multiple =
+                digits < 0 ? std::round(middle * power) / power : std::round(middle / power) * power;
+            return multiple + 0.0; // -0 becomes 0
+        };
+        return {rounded(box.min.x, box.max.x), rounded(box.min.y, box.max.y), rounded(box.min.z, box.max.z)};
+    }
+
+    /// "4,100,235", "0.25", "3e-08".
+    std::string shortNumber(double number)
+    {
+        char text[32];
+        std::snprintf(text, sizeof(text), number >= 1000 && number < 1e15 ? "%.0f" : "%.2g", number);
+        std::string result = text;
+        if (number >= 1000 && number < 1e15)
+            for (std::size_t end = result.size(); end > 3; end -= 3)
+                result.insert(end - 3, 1, ',');
+        return result;
+    }
+
+}
 
 std::string_view namePrefix(Orvan::String const& component)
 {
@@ -35,16 +111,37 @@ void GeometryBuilder::expectPoints(std::uint64_t count)
     if (count >= kMostElements)
         scanner_.refuse("there are more points than a mesh can hold");
     pointCount_ = count;
-    positions_.reserve(count);
+    raw_.positions.reserve(count);
+    if (movesPositions())
+        widePositions_.reserve(count);
 }
 
 void GeometryBuilder::makeStrands(Orvan::Array<unsigned int> offsets, Orvan::Array<unsigned int> const& points)
 {
-    Orvan::Array<Tessara::Math::float3> positions(points.size, Orvan::kUninitialized);
-    std::transform(
-        points.begin(), points.end(), positions.begin(), [&](unsigned int point) { return positions_[point]; });
-    positions_ = std::move(positions);
-    strandOffset_ = std::move(offsets);
+    raw_.positions = gathered(raw_.positions, points);
+    if (movesPositions())
+        widePositions_ = gathered(widePositions_, points);
+    raw_.strandOffset = std::move(offsets);
+}
+
+void GeometryBuilder::addNotFinitePoint()
+{
+    if (!options_.isLenient)
+        scanner_.refuse("a coordinate is not finite; --lenient leaves such points out");
+    hasUnusableElements_ = true;
+}
+
+void GeometryBuilder::addShortFace()
+{
+    if (!options_.isLenient)
+        scanner_.refuse("a face has fewer than three corners; --lenient leaves such faces out");
+    hasUnusableElements_ = true;
+}
+
+void GeometryBuilder::addLoss(double x, double y, double z)
+{
+    for (double const value : {x, y, z})
+        largestLoss_ = std::max(largestLoss_, lossOf(value));
 }
 
 void GeometryBuilder::refuseIndex(char const* element, std::string const& index) const
@@ -53,25 +150,90 @@ void GeometryBuilder::refuseIndex(char const* element, std::string const& index)
         + std::to_string(pointCount_) + " points, counted from 0");
 }
 
-GeometryFile GeometryBuilder::finish(std::string format) &&
+void GeometryBuilder::noteBytesLeft()
 {
-    GeometryFile file{nullptr, std::move(format), std::move(notes_)};
-    bool const isMesh = faceCount() != 0;
-    if (isMesh)
-        file.object = makeMesh(std::move(positions_), std::move(faceVertex_), std::move(faceOffset_));
-    else if (!strandOffset_.empty())
-        file.object = Tessara::Geometry::makeStrands(std::move(positions_), std::move(strandOffset_));
-    else
-        file.object = makePointCloud(std::move(positions_));
+    if (!scanner_.atEnd())
+        note("bytes after the last element are left out: " + std::to_string(scanner_.remaining()));
+}
 
+/// Subtracts the origin, if there is to be one, which is returned.
+std::optional<double3> GeometryBuilder::movePositions()
+{
+    if (!movesPositions() || widePositions_.empty())
+        return std::nullopt;
+    double3 const origin = options_.origin ? *options_.origin : roundedCenterOf(raw_.positions, widePositions_);
+    double loss = 0;
+    for (std::uint64_t point = 0; point < widePositions_.size; ++point) {
+        double3 const& wide = widePositions_[point];
+        double3 const moved{wide.x - origin.x, wide.y - origin.y, wide.z - origin.z};
+        if (isFinite(raw_.positions[point]))
+            loss = std::max({loss, lossOf(moved.x), lossOf(moved.y), lossOf(moved.z)});
+        raw_.positions[point] = {static_cast<float>(moved.x), static_cast<float>(moved.y), static_cast<float>(moved.z)};
+    }
+    largestLoss_ = largestLoss_ == 0 ? 0 : loss;
+    return origin;
+}
+
+void GeometryBuilder::noteLostDigits()
+{
+    if (largestLoss_ == 0)
+        return;
+    Box const box = boxOf(raw_.positions, raw_.positions);
+    double largest = 0;
+    for (double const bound : {box.min.x, box.min.y, box.min.z, box.max.x, box.max.y, box.max.z})
+        largest = std::max(largest, std::abs(bound));
+    std::string sentence = "positions lose up to " + shortNumber(largestLoss_)
+        + " (single precision at coordinates up to " + shortNumber(largest) + ")";
+    if (!movesPositions() && largest > 2 * box.longestSide())
+        sentence += "; --center keeps more digits";
+    note(std::move(sentence));
+}
+
+Orvan::MutablePtr<Tessara::Object> GeometryBuilder::makeObject()
+{
+    std::optional<UnusableElements> unusable;
+    RawGeometry whole;
+    if (hasUnusableElements_) {
+        unusable.emplace(raw_);
+        for (std::string& sentence : unusable->describe())
+            note(std::move(sentence));
+        if (!unusable->remainsAnyPoint())
+            scanner_.refuse("no point is left");
+        whole = raw_;
+    }
+    bool const isMesh = unusable ? unusable->remainsAnyFace() : faceCount() != 0;
+    Orvan::MutablePtr<Tessara::Object> object = isMesh
+        ? makeMesh(std::move(raw_.positions), std::move(raw_.faceVertex), std::move(raw_.faceOffset))
+        : raw_.strandOffset.empty()
+        ? makePointCloud(std::move(raw_.positions))
+        : Tessara::Geometry::makeStrands(std::move(raw_.positions), std::move(raw_.strandOffset));
+    addProperties(*object);
+    if (unusable)
+        unusable->deleteFrom(whole, *object);
+    return object;
+}
+
+void GeometryBuilder::addProperties(Tessara::Object& object)
+{
     for (Property& property : properties_) {
-        if (!isMesh && property.component != std::string_view(sPointComp))
+        if (property.component != std::string_view(sPointComp) && !object.hasProperty(sFaceComp))
             continue;
         std::string name = property.name;
-        while (isReservedName(name) || file.object->hasProperty(Orvan::String(name)))
+        std::replace(name.begin(), name.end(), '\0', '_'); // names of properties end there
+        while (isReservedName(name) || object.hasProperty(Orvan::String(name)))
             name.insert(0, namePrefix(property.component));
-        file.object->setProperty(Orvan::String(name), Orvan::Ptr<Tessara::Object>(std::move(property.object)));
+        object.setProperty(Orvan::String(name), Orvan::Ptr<Tessara::Object>(std::move(property.object)));
     }
+}
+
+GeometryFile GeometryBuilder::finish(std::string format) &&
+{
+    GeometryFile file;
+    file.format = std::move(format);
+    file.origin = movePositions();
+    noteLostDigits();
+    file.object = makeObject();
+    file.notes = std::move(notes_);
     return file;
 }
 

@@ -2,6 +2,7 @@
 
 #include "ElementLayout.h"
 #include "Scanner.h"
+#include "UnusableElements.h"
 
 #include <TessaraGeometry/Makers.h>
 
@@ -33,49 +34,62 @@ struct PropertyValues {
 
 /// Takes in what a reader finds, and checks it on the way: the one place that decides which geometry is accepted.
 class GeometryBuilder {
+    using float3 = Tessara::Math::float3;
+
 public:
     /// Refusals are said through the scanner, which therefore stands at what is handed in.
-    explicit GeometryBuilder(Scanner const& scanner)
+    GeometryBuilder(Scanner const& scanner, ReadOptions const& options)
         : scanner_(scanner)
+        , options_(options)
     {
     }
+
+    ReadOptions const& options() const { return options_; }
+    /// Positions are moved before they become single precision.
+    bool movesPositions() const { return options_.isCentered || options_.origin; }
 
     /// For counts that are known, and that the file can hold: corners may then name points that come later.
     void expectPoints(std::uint64_t count);
-    void expectFaces(std::uint64_t count) { faceOffset_.reserve(count + 1); }
+    void expectFaces(std::uint64_t count) { raw_.faceOffset.reserve(count + 1); }
 
-    void addPoint(Tessara::Math::float3 const& position)
+    void addPoint(Coordinate const& x, Coordinate const& y, Coordinate const& z)
     {
-        if (!std::isfinite(position.x) || !std::isfinite(position.y) || !std::isfinite(position.z))
-            scanner_.refuse("a coordinate is not finite");
-        positions_.append(position);
-        pointCount_ = std::max(pointCount_, positions_.size);
+        float3 const position{static_cast<float>(x.value), static_cast<float>(y.value), static_cast<float>(z.value)};
+        raw_.positions.append(position);
+        if (!isFinite(position))
+            addNotFinitePoint();
+        else if (x.losesDigits || y.losesDigits || z.losesDigits)
+            addLoss(x.value, y.value, z.value);
+        if (movesPositions())
+            widePositions_.append({x.value, y.value, z.value});
+        pointCount_ = std::max(pointCount_, raw_.positions.size);
     }
+    void addPoint(float3 const& position) { addPoint({position.x}, {position.y}, {position.z}); }
 
     template <class Index> void addCorner(Index point)
     {
         if (std::cmp_less(point, 0) || std::cmp_greater_equal(point, pointCount_))
             refuseIndex("face", std::to_string(point));
-        faceVertex_.append(static_cast<unsigned int>(point));
+        raw_.faceVertex.append(static_cast<unsigned int>(point));
     }
 
     void endFace()
     {
-        if (faceVertex_.size - faceOffset_[faceOffset_.size - 1] < 3)
-            scanner_.refuse("a face has fewer than three corners");
-        if (faceVertex_.size >= kMostElements)
+        if (raw_.faceVertex.size - raw_.faceOffset[raw_.faceOffset.size - 1] < 3)
+            addShortFace();
+        if (raw_.faceVertex.size >= kMostElements)
             scanner_.refuse("there are more face corners than a mesh can hold");
-        faceOffset_.append(static_cast<unsigned int>(faceVertex_.size));
+        raw_.faceOffset.append(static_cast<unsigned int>(raw_.faceVertex.size));
     }
 
     /// Makes these points, in this order, a strand set; the offsets say where its strands begin and the last one ends.
     /// Properties of the points are handed in for the points as they are then.
     void makeStrands(Orvan::Array<unsigned int> offsets, Orvan::Array<unsigned int> const& points);
 
-    std::uint64_t pointCount() const { return positions_.size; }
-    std::uint64_t cornerCount() const { return faceVertex_.size; }
-    std::uint64_t faceCount() const { return faceOffset_.size - 1; }
-    Orvan::Array<unsigned int> const& faceOffset() const { return faceOffset_; }
+    std::uint64_t pointCount() const { return raw_.positions.size; }
+    std::uint64_t cornerCount() const { return raw_.faceVertex.size; }
+    std::uint64_t faceCount() const { return raw_.faceOffset.size - 1; }
+    Orvan::Array<unsigned int> const& faceOffset() const { return raw_.faceOffset; }
 
     /// Adds a property under this name, or under a name of its component where the name is taken.
     template <class T> void addProperty(
@@ -99,6 +113,8 @@ public:
     }
 
     void note(std::string sentence) { notes_.push_back(std::move(sentence)); }
+    /// Notes what the scanner has not reached, if there is anything.
+    void noteBytesLeft();
 
     /// The geometry of what came in. Properties of faces go where there are none.
     GeometryFile finish(std::string format) &&;
@@ -121,14 +137,22 @@ private:
         properties_.push_back({name, component, std::move(property)});
     }
 
+    void addNotFinitePoint();
+    void addLoss(double x, double y, double z);
+    void addShortFace();
     [[noreturn]] void refuseIndex(char const* element, std::string const& index) const;
+    std::optional<Tessara::Math::double3> movePositions();
+    void noteLostDigits();
+    Orvan::MutablePtr<Tessara::Object> makeObject();
+    void addProperties(Tessara::Object& object);
 
     Scanner const& scanner_;
+    ReadOptions options_;
     std::uint64_t pointCount_ = 0; // expected or there
-    Orvan::Array<Tessara::Math::float3> positions_;
-    Orvan::Array<unsigned int> faceVertex_;
-    Orvan::Array<unsigned int> faceOffset_{0u};
-    Orvan::Array<unsigned int> strandOffset_;
+    RawGeometry raw_;
+    Orvan::Array<Tessara::Math::double3> widePositions_; // if positions are moved: as in the file
+    double largestLoss_ = 0; // of coordinates that lose digits
+    bool hasUnusableElements_ = false;
     std::vector<Property> properties_;
     std::vector<std::string> notes_;
 };

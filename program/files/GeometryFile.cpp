@@ -10,7 +10,7 @@ namespace ModelingProgram {
 namespace {
 
     struct Format {
-        GeometryFile (*read)(InputFile const&);
+        GeometryFile (*read)(InputFile const&, ReadOptions const&);
         void (*write)(WritableGeometry&, std::filesystem::path const&);
     };
 
@@ -38,7 +38,7 @@ namespace {
 
 }
 
-GeometryFile readGeometryFile(std::filesystem::path const& file)
+GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options)
 {
     Format const format = formatOf(file);
     if (!format.read)
@@ -46,17 +46,18 @@ GeometryFile readGeometryFile(std::filesystem::path const& file)
     InputFile const input(file);
     if (input.size == 0 && format.read != readObj && format.read != readXyz) // the others have headers
         throw FileError(file.string() + " cannot be read: it is empty");
-    return format.read(input);
+    return format.read(input, options);
 }
 
 std::vector<std::string> writeGeometryFile(
-    Tessara::Object const& object, std::filesystem::path const& file, Existing existing)
+    Tessara::Object const& object, std::filesystem::path const& file, WriteOptions const& options)
 {
     Format const format = formatOf(file);
     if (!format.write)
         throw FileError(file.string() + " cannot be written: its name ends in none of .obj, .ply, .stl and .vtp");
     WritableGeometry geometry = takeApart(object, file);
-    geometry.existing = existing;
+    geometry.existing = options.existing;
+    geometry.remark = options.remark;
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }

@@ -23,12 +23,34 @@ namespace {
         return result;
     }
 
+    /// Different texts, in the order in which they come.
+    class Texts {
+    public:
+        void add(std::string_view text)
+        {
+            if (known_.insert(std::string(text)).second && known_.size() <= kShown)
+                shown_ += (shown_.empty() ? "" : ", ") + TextScanner::quoted(text);
+        }
+        bool empty() const { return known_.empty(); }
+        std::string list() const
+        {
+            return shown_ + (known_.size() > kShown ? " and " + std::to_string(known_.size() - kShown) + " more" : "");
+        }
+        std::string countedList() const { return std::to_string(known_.size()) + " (" + list() + ")"; }
+
+    private:
+        static constexpr std::size_t kShown = 5;
+
+        std::set<std::string> known_;
+        std::string shown_;
+    };
+
     class ObjReader {
     public:
-        explicit ObjReader(InputFile const& file)
+        ObjReader(InputFile const& file, ReadOptions const& options)
             : file_(file)
             , in_(file, 0, TextScanner::Syntax::CommentsAndJoinedLines)
-            , builder_(in_)
+            , builder_(in_, options)
         {
         }
 
@@ -41,6 +63,7 @@ namespace {
                 readStatement();
             addCornerValues("uv", textureOf_, textures_);
             addCornerValues("normal", normalOf_, normals_);
+            noteUnused("texture coordinates (vt)", textureOf_, textures_.size);
             addPointValues();
             noteLeftOut();
             return std::move(builder_).finish("OBJ");
@@ -74,12 +97,12 @@ namespace {
         }
 
         /// A file without points is an empty geometry, unless it is a file of another kind.
-        void requireObjStatements() const
+        void requireObjStatements()
         {
             TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
             scanner.skipEmptyLines();
             std::string_view const keyword = scanner.atEnd() ? std::string_view() : scanner.peekWord();
-            if (!keyword.empty() && !isGeometry(keyword) && !isIgnored(keyword) && keyword != "p")
+            if (!keyword.empty() && !isGeometry(keyword) && !namesOf(keyword) && keyword != "p")
                 scanner.refuse(TextScanner::quoted(keyword) + " begins no line of an OBJ file");
         }
 
@@ -98,8 +121,8 @@ namespace {
                 readPolyline();
             else if (keyword == "p")
                 ++pointElements_;
-            else if (!keyword.empty() && !isIgnored(keyword) && unknownKeywords_.size() < 5)
-                unknownKeywords_.insert(TextScanner::quoted(keyword));
+            else if (!keyword.empty() && !readName(keyword))
+                unknownKeywords_.add(keyword);
             if (isGeometry(keyword) && !in_.atLineEnd())
                 in_.refuse(TextScanner::quoted(in_.peekWord()) + " is more than belongs into this line");
         }
@@ -109,11 +132,33 @@ namespace {
             return keyword == "v" || keyword == "f" || keyword == "vt" || keyword == "vn" || keyword == "l";
         }
 
-        /// Names of groups and materials, which no geometry depends on.
-        static bool isIgnored(std::string_view keyword)
+        struct Names {
+            std::string_view keyword;
+            char const* plural;
+            Texts names;
+        };
+
+        /// Null if the keyword does not name parts of the geometry.
+        Names* namesOf(std::string_view keyword)
         {
-            constexpr std::string_view kIgnored[] = {"o", "g", "s", "usemtl", "mtllib"};
-            return std::find(std::begin(kIgnored), std::end(kIgnored), keyword) != std::end(kIgnored);
+            auto const known = std::find_if(
+                std::begin(names_), std::end(names_), [=](Names const& names) { return names.keyword == keyword; });
+            return known == std::end(names_) ? nullptr : known;
+        }
+
+        /// Names of parts of the geometry; those of `s` are numbers, where 0 and off mean none.
+        bool readName(std::string_view keyword)
+        {
+            Names* const known = namesOf(keyword);
+            if (!known)
+                return false;
+            if (keyword == "g")
+                for (std::string_view name = in_.word(); !name.empty(); name = in_.word())
+                    known->names.add(name);
+            else if (std::string_view const name = in_.restOfLine();
+                     !name.empty() && (keyword != "s" || (name != "0" && name != "off")))
+                known->names.add(name);
+            return true;
         }
 
         float3 readFloat3(char const* what)
@@ -126,7 +171,8 @@ namespace {
         /// v x y z, then perhaps a weight or a colour.
         void readPoint()
         {
-            builder_.addPoint(readFloat3("a coordinate"));
+            Coordinate const x = in_.coordinate(), y = in_.coordinate();
+            builder_.addPoint(x, y, in_.coordinate());
             if (in_.atLineEnd())
                 return;
             float const first = in_.number<float>("a weight or a colour");
@@ -223,6 +269,17 @@ namespace {
             builder_.addProperty<T>(name, sFaceVertexComp, gathered(values, indices));
         }
 
+        void noteUnused(char const* what, Orvan::Array<unsigned int> const& indices, std::uint64_t count)
+        {
+            std::vector<bool> isUsed(count);
+            for (unsigned int const index : indices)
+                if (index != kInvalidIndex)
+                    isUsed[index] = true;
+            auto const unused = std::count(isUsed.begin(), isUsed.end(), false);
+            if (unused != 0)
+                builder_.note(std::string(what) + " that no face refers to are left out: " + std::to_string(unused));
+        }
+
         void addPointValues()
         {
             if (!colors_.empty())
@@ -230,8 +287,10 @@ namespace {
             if (uncoloredPoints_ != 0)
                 builder_.note(std::to_string(uncoloredPoints_) + " points have no colour and become white");
             // Without faces nothing tells whose a normal is, but writers of point clouds give one a point.
-            if (builder_.faceCount() != 0 || normals_.size != total_.points)
+            if (builder_.faceCount() != 0 || normals_.size != total_.points) {
+                noteUnused("normals (vn)", normalOf_, normals_.size);
                 normals_.clear();
+            }
             if (lineOffset_.size != 1)
                 addPolylines();
             if (!colors_.empty())
@@ -275,11 +334,11 @@ namespace {
             noteCount(pointElements_, " lines of point elements (p) are left out: every point is kept anyway");
             noteCount(weightedPoints_, " weights of points are left out");
             noteCount(deepTextures_, " third texture coordinates are left out");
-            std::string keywords;
-            for (std::string const& keyword : unknownKeywords_)
-                keywords += (keywords.empty() ? "" : ", ") + keyword;
-            if (!keywords.empty())
-                builder_.note("lines that begin with " + keywords + " are left out");
+            for (Names const& names : names_)
+                if (!names.names.empty())
+                    builder_.note(std::string(names.plural) + " are left out: " + names.names.countedList());
+            if (!unknownKeywords_.empty())
+                builder_.note("lines that begin with " + unknownKeywords_.list() + " are left out");
         }
 
         InputFile const& file_;
@@ -297,14 +356,16 @@ namespace {
         std::uint64_t pointElements_ = 0;
         std::uint64_t weightedPoints_ = 0;
         std::uint64_t deepTextures_ = 0;
-        std::set<std::string> unknownKeywords_;
+        Names names_[5] = {{"o", "objects", {}}, {"g", "groups", {}}, {"s", "smoothing groups", {}},
+            {"usemtl", "materials", {}}, {"mtllib", "files of materials", {}}};
+        Texts unknownKeywords_;
     };
 
 }
 
-GeometryFile readObj(InputFile const& file)
+GeometryFile readObj(InputFile const& file, ReadOptions const& options)
 {
-    return ObjReader(file).read();
+    return ObjReader(file, options).read();
 }
 
 }

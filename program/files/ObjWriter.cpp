@@ -41,6 +41,8 @@ namespace {
         {
             chooseAttributes();
             OutputFile out(file, geometry_.existing);
+            if (!geometry_.remark.empty())
+                out << "# " << geometry_.remark << "\n";
             writePoints(out);
             writeVectors<float2, double2>("vt", textures_, out);
             writeVectors<float3, double3>("vn", normals_, out);

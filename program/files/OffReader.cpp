@@ -69,9 +69,9 @@ namespace {
 
     class OffReader {
     public:
-        explicit OffReader(InputFile const& file)
+        OffReader(InputFile const& file, ReadOptions const& options)
             : in_(file, 0, TextScanner::Syntax::Comments)
-            , builder_(in_)
+            , builder_(in_, options)
         {
         }
 
@@ -89,8 +89,9 @@ namespace {
                 in_.endElement();
             }
             in_.skipEmptyLines();
-            if (!in_.atEnd())
+            if (!in_.atEnd() && !builder_.options().isLenient)
                 in_.refuse(TextScanner::quoted(in_.peekWord()) + " follows, though all faces have been read");
+            builder_.noteBytesLeft();
             if (hasNormals_)
                 builder_.addProperty<float3>("normal", sPointComp, std::move(normals_));
             if (hasTextures_)
@@ -138,7 +139,8 @@ namespace {
         /// Position, normal, colour, texture coordinates: colours also where the header does not announce them.
         void readPoint(std::uint64_t point)
         {
-            builder_.addPoint(readFloat3("a coordinate"));
+            Coordinate const x = in_.coordinate(), y = in_.coordinate();
+            builder_.addPoint(x, y, in_.coordinate());
             if (hasNormals_)
                 normals_.append(readFloat3("a component of the normal"));
             std::size_t const textureValues = hasTextures_ ? 2 : 0;
@@ -202,9 +204,9 @@ namespace {
 
 }
 
-GeometryFile readOff(InputFile const& file)
+GeometryFile readOff(InputFile const& file, ReadOptions const& options)
 {
-    return OffReader(file).read();
+    return OffReader(file, options).read();
 }
 
 }

@@ -72,6 +72,7 @@ namespace {
     struct Header {
         Encoding encoding = Encoding::Text;
         std::vector<Element> elements;
+        std::vector<std::string> textureFiles; // that comments name
     };
 
     class HeaderReader {
@@ -101,6 +102,8 @@ namespace {
                 in_.refuse("the header has more than " + std::to_string(kMostLines) + " lines");
             std::string_view const keyword = in_.word();
             if (keyword == "comment" || keyword == "obj_info") {
+                if (in_.word() == "TextureFile")
+                    header_.textureFiles.emplace_back(in_.restOfLine());
                 in_.nextLine();
                 return true;
             }
@@ -192,15 +195,17 @@ namespace {
     /// Reads the elements behind a header, with a scanner for their encoding.
     template <class In> class PlyReader {
     public:
-        PlyReader(Header& header, In& in)
+        PlyReader(Header& header, In& in, ReadOptions const& options)
             : header_(header)
             , in_(in)
-            , builder_(in)
+            , builder_(in, options)
         {
         }
 
         GeometryFile read(char const* format)
         {
+            for (std::string const& file : header_.textureFiles)
+                builder_.note("the name of the texture file " + TextScanner::quoted(file) + " is left out");
             for (Element& element : header_.elements)
                 prepare(element);
             for (Element& element : header_.elements) {
@@ -209,8 +214,7 @@ namespace {
             }
             if constexpr (kIsText)
                 in_.skipEmptyLines();
-            if (!in_.atEnd())
-                builder_.note("what follows the last declared element is left out");
+            builder_.noteBytesLeft();
             for (Element& element : header_.elements)
                 addLists(element);
             return std::move(builder_).finish(format);
@@ -252,8 +256,6 @@ namespace {
                 property.use = Use::Position;
                 property.axis = property.name[0] - 'x';
                 ++axisCount;
-                if (property.type == Scalar::Double && axisCount == 1)
-                    builder_.note("positions are rounded: they have double precision in the file");
             }
             if (axisCount != 3 && element.count != 0)
                 in_.refuse("points lack x, y or z");
@@ -329,7 +331,7 @@ namespace {
                 });
             }
             if (element.name == "vertex")
-                builder_.addPoint({position_[0], position_[1], position_[2]});
+                builder_.addPoint(position_[0], position_[1], position_[2]);
             else if (element.name == "face")
                 builder_.endFace();
             in_.endElement();
@@ -337,9 +339,15 @@ namespace {
 
         template <class T> void readValue(Property& property)
         {
+            if constexpr (kIsText && std::is_floating_point_v<T>) {
+                if (property.use == Use::Position) {
+                    position_[property.axis] = in_.coordinate(property.name.c_str());
+                    return;
+                }
+            }
             T const value = in_.template number<T>(property.name.c_str());
             if (property.use == Use::Position) {
-                position_[property.axis] = static_cast<float>(value); // beyond float it is infinite, and refused
+                position_[property.axis] = coordinateOf(value); // beyond float it is infinite, and refused
             } else if (property.use == Use::Value) {
                 std::memcpy(property.target, &value, sizeof(T));
                 property.target += property.stride;
@@ -421,20 +429,21 @@ namespace {
         Header& header_;
         In& in_;
         GeometryBuilder builder_;
-        float position_[3] = {};
+        Coordinate position_[3] = {};
     };
 
 }
 
-GeometryFile readPly(InputFile const& file)
+GeometryFile readPly(InputFile const& file, ReadOptions const& options)
 {
     TextScanner text(file, 0, TextScanner::Syntax::Plain);
     Header header = HeaderReader(text).read();
     if (header.encoding == Encoding::Text)
-        return PlyReader(header, text).read("PLY (ascii)");
+        return PlyReader(header, text, options).read("PLY (ascii)");
     bool const isLittle = header.encoding == Encoding::LittleEndian;
     BinaryScanner binary(file, text.position(), isLittle != (std::endian::native == std::endian::little));
-    return PlyReader(header, binary).read(isLittle ? "PLY (binary, little endian)" : "PLY (binary, big endian)");
+    return PlyReader(header, binary, options)
+        .read(isLittle ? "PLY (binary, little endian)" : "PLY (binary, big endian)");
 }
 
 }

@@ -79,7 +79,10 @@ namespace {
             if (geometry_.kind == WritableGeometry::Kind::Strands)
                 throw FileError(file_.string() + " cannot be written: PLY files hold no strands; OBJ and VTP files do");
             std::ostringstream header;
-            header << "ply\nformat binary_little_endian 1.0\nelement vertex " << geometry_.pointCount()
+            header << "ply\nformat binary_little_endian 1.0\n";
+            if (!geometry_.remark.empty())
+                header << "comment " << geometry_.remark << "\n";
+            header << "element vertex " << geometry_.pointCount()
                    << "\nproperty float x\nproperty float y\nproperty float z\n";
             std::vector<Column> const pointColumns = chooseColumns(sPointComp, {"x", "y", "z"}, header);
             std::vector<Column> faceColumns;

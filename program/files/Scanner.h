@@ -10,6 +10,7 @@
 #include <limits>
 #include <memory>
 #include <string_view>
+#include <vector>
 
 namespace ModelingProgram {
 
@@ -21,6 +22,19 @@ struct InputFile {
     std::size_t size = 0;
     std::unique_ptr<char[]> bytes;
 };
+
+/// A coordinate as the file has it: rounded to single precision it is the float nearest to what the file says.
+struct Coordinate {
+    double value = 0;
+    bool losesDigits = false; // that the file has, when rounded
+};
+
+/// A number that is in memory as the file has it.
+template <class T> Coordinate coordinateOf(T value)
+{
+    auto const wide = static_cast<double>(value);
+    return {wide, static_cast<double>(static_cast<float>(wide)) != wide};
+}
 
 /// The place that a reader has reached in a file. Whatever is wrong with the file is said through `refuse`, so that no
 /// refusal comes without its place.
@@ -110,12 +124,14 @@ public:
     enum class Syntax {
         Plain,
         Comments, // from # to the end of the line
-        CommentsAndJoinedLines, // and a line that ends with \ goes on in the next one
+        CommentsAndMarks, // and words end at commas and semicolons too
+        CommentsAndJoinedLines, // from # to the end of the line, and a line that ends with \ goes on in the next one
     };
 
     TextScanner(InputFile const& file, std::size_t start, Syntax syntax)
         : Scanner(file, start)
         , comments_(syntax != Syntax::Plain)
+        , hasMarks_(syntax == Syntax::CommentsAndMarks)
         , joinsLines_(syntax == Syntax::CommentsAndJoinedLines)
     {
         if (start == 0)
@@ -193,6 +209,20 @@ public:
         return value;
     }
 
+    Coordinate coordinate(char const* what = "a coordinate")
+    {
+        skipBlanks();
+        double value = 0;
+        char const* const first = at_ + (hasPlusSign() ? 1 : 0);
+        auto const [rest, error] = std::from_chars(first, end_, value);
+        if (error != std::errc{} || !isTokenEnd(rest))
+            return {unusualNumber<float>(what)};
+        if (std::isfinite(value) && !std::isfinite(static_cast<float>(value)))
+            refuseNumber(what);
+        at_ = rest;
+        return decimalCoordinate({first, static_cast<std::size_t>(rest - first)}, value);
+    }
+
     /// A whole number that other characters may follow.
     long long leadingInteger(char const* what)
     {
@@ -212,6 +242,21 @@ public:
         refuse(quoted(peekWord()) + " stands for " + what + ", but is no number that fits");
     }
 
+    /// The rest of the line, comments and blanks at both ends aside, without moving on.
+    std::string_view restOfLine();
+    /// The same, separated at commas, semicolons and tabs if there are any, and at blanks otherwise.
+    std::vector<std::string_view> fieldsOfLine();
+
+    /// What is between two values of a line.
+    enum class Separator {
+        Blanks,
+        TightComma, // with no blank beside it, as in 1,5
+        Mark, // any other comma or semicolon
+        None // the line has ended
+    };
+    /// Moves on behind the separator.
+    Separator separator();
+
     bool atTokenEnd() const { return isTokenEnd(at_); }
 
     static std::string quoted(std::string_view text);
@@ -223,6 +268,8 @@ protected:
     }
 
 private:
+    static Coordinate decimalCoordinate(std::string_view digits, double value);
+
     /// Editors and spreadsheets put a byte order mark in front of text. That of UTF-8 says nothing; that of UTF-16
     /// says that the text has two bytes per character.
     void skipByteOrderMark()
@@ -235,6 +282,8 @@ private:
     }
 
     static bool isBlank(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\v' || c == '\f'; }
+
+    static bool isMark(char c) { return c == ',' || c == ';'; }
 
     /// The end of the line that the \ at `backslash` joins with the next one; null where it is just a character.
     char const* joinedLine(char const* backslash) const
@@ -259,7 +308,7 @@ private:
 
     bool isTokenEnd(char const* c) const
     {
-        return c == end_ || *c == '\n' || isBlank(*c) || (comments_ && *c == '#')
+        return c == end_ || *c == '\n' || isBlank(*c) || (comments_ && *c == '#') || (hasMarks_ && isMark(*c))
             || (joinsLines_ && *c == '\\' && joinedLine(c));
     }
 
@@ -287,6 +336,7 @@ private:
     }
 
     bool comments_;
+    bool hasMarks_;
     bool joinsLines_;
 };
 

@@ -5,6 +5,7 @@
 
 namespace ModelingProgram {
 
+using Tessara::Math::double3;
 using Tessara::Math::float3;
 
 namespace {
@@ -20,12 +21,24 @@ namespace {
         return BinaryScanner(file, kHeaderBytes, kSwapsBytes).number<std::uint32_t>("the number of triangles");
     }
 
-    /// Text files too may be as long as a binary one, and binary ones too may begin with "solid"; but no text has a
-    /// count there that fits its own length.
-    bool isBinary(InputFile const& file)
+    bool hasZeroByte(InputFile const& file)
     {
-        return file.size >= kBytesBeforeTriangles
-            && file.size == kBytesBeforeTriangles + kTriangleBytes * declaredTriangles(file);
+        return std::memchr(file.bytes.get(), 0, file.size) != nullptr;
+    }
+
+    /// Text files too may be as long as a binary one, and binary ones too may begin with "solid"; but no text has a
+    /// count there that fits its own length, nor a byte 0.
+    bool isBinary(InputFile const& file, bool mayBeLonger)
+    {
+        if (file.size < kBytesBeforeTriangles)
+            return false;
+        std::uint64_t const declaredSize = kBytesBeforeTriangles + kTriangleBytes * declaredTriangles(file);
+        return file.size == declaredSize || (mayBeLonger && file.size > declaredSize && hasZeroByte(file));
+    }
+
+    bool beginsAsText(InputFile const& file)
+    {
+        return std::string_view(file.bytes.get(), file.size).starts_with("solid");
     }
 
     [[noreturn]] void refuseDamagedBinary(InputFile const& file)
@@ -42,9 +55,9 @@ namespace {
 
     class StlReader {
     public:
-        StlReader(InputFile const& file, Scanner& in)
+        StlReader(InputFile const& file, Scanner& in, ReadOptions const& options)
             : file_(file)
-            , builder_(in)
+            , builder_(in, options)
         {
         }
 
@@ -63,6 +76,7 @@ namespace {
                 attributes[triangle] = in.number<unsigned short>("the attribute of a triangle");
                 hasAttributes = hasAttributes || attributes[triangle] != 0;
             }
+            builder_.noteBytesLeft();
             if (hasAttributes)
                 builder_.addProperty<unsigned short>("attribute", Tessara::Geometry::sFaceComp, std::move(attributes));
             return std::move(builder_).finish("STL (binary)");
@@ -71,7 +85,10 @@ namespace {
         GeometryFile readText(TextScanner& in)
         {
             for (in.skipEmptyLines(); !in.atEnd(); in.skipEmptyLines()) {
+                if (builder_.options().isLenient && builder_.faceCount() != 0 && !isNext(in, "solid"))
+                    break;
                 expectWord(in, "solid");
+                noteSolid(in.restOfLine());
                 in.nextLine();
                 while (!isNext(in, "endsolid")) {
                     expectWord(in, "facet");
@@ -81,10 +98,24 @@ namespace {
                 }
                 in.nextLine();
             }
+            builder_.noteBytesLeft();
+            if (solidCount_ > 1 || !solidNames_.empty())
+                builder_.note("the division into solids and their names are left out: " + std::to_string(solidCount_)
+                    + (solidNames_.empty() ? "" : " (" + solidNames_ + ")"));
             return std::move(builder_).finish("STL (text)");
         }
 
     private:
+        void noteSolid(std::string_view name)
+        {
+            constexpr std::uint64_t kNamed = 5;
+            ++solidCount_;
+            if (!name.empty() && solidCount_ <= kNamed)
+                solidNames_ += (solidNames_.empty() ? "" : ", ") + TextScanner::quoted(name);
+            else if (solidCount_ == kNamed + 1 && !solidNames_.empty())
+                solidNames_ += ", ...";
+        }
+
         void readLoop(TextScanner& in)
         {
             expectWord(in, "outer");
@@ -100,14 +131,19 @@ namespace {
 
         template <class In> void addCorner(In& in)
         {
-            float const x = in.template number<float>("a coordinate");
-            float const y = in.template number<float>("a coordinate");
-            float3 const position{x, y, in.template number<float>("a coordinate")};
-            unsigned int const point = points_.numberOf(position);
+            Coordinate const x = coordinateFrom(in), y = coordinateFrom(in), z = coordinateFrom(in);
+            // If positions are moved, those that differ only as doubles become different points.
+            unsigned int const point = builder_.movesPositions()
+                ? widePoints_.numberOf({x.value, y.value, z.value})
+                : points_.numberOf(
+                    {static_cast<float>(x.value), static_cast<float>(y.value), static_cast<float>(z.value)});
             if (point == builder_.pointCount())
-                builder_.addPoint(position);
+                builder_.addPoint(x, y, z);
             builder_.addCorner(point);
         }
+
+        static Coordinate coordinateFrom(TextScanner& in) { return in.coordinate(); }
+        static Coordinate coordinateFrom(BinaryScanner& in) { return {in.number<float>("a coordinate")}; }
 
         /// The next word in this line or a later one, in any case.
         static bool isNext(TextScanner& in, std::string_view word)
@@ -129,21 +165,24 @@ namespace {
 
         InputFile const& file_;
         GeometryBuilder builder_;
+        std::uint64_t solidCount_ = 0;
+        std::string solidNames_;
         Welder<float3> points_;
+        Welder<double3> widePoints_;
     };
 
 }
 
-GeometryFile readStl(InputFile const& file)
+GeometryFile readStl(InputFile const& file, ReadOptions const& options)
 {
-    if (isBinary(file)) {
+    if (isBinary(file, options.isLenient)) {
         BinaryScanner in(file, kBytesBeforeTriangles, kSwapsBytes);
-        return StlReader(file, in).readBinary(in);
+        return StlReader(file, in, options).readBinary(in);
     }
-    if (std::memchr(file.bytes.get(), 0, file.size))
-        refuseDamagedBinary(file); // for there is no such byte in a text
+    if (hasZeroByte(file) && !(options.isLenient && beginsAsText(file)))
+        refuseDamagedBinary(file);
     TextScanner in(file, 0, TextScanner::Syntax::Plain);
-    return StlReader(file, in).readText(in);
+    return StlReader(file, in, options).readText(in);
 }
 
 }

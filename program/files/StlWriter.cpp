@@ -66,8 +66,10 @@ void writeStl(WritableGeometry& geometry, std::filesystem::path const& file)
     noteUnusedPoints(geometry);
 
     OutputFile out(file, geometry.existing);
-    char header[80] = "binary STL"; // must not begin with "solid", which is how text does
-    out.write(header, sizeof(header));
+    // The header must not begin with "solid", which is how text does.
+    std::string header = "binary STL" + (geometry.remark.empty() ? "" : ", " + geometry.remark);
+    header.resize(80);
+    out.write(header.data(), header.size());
     out.writeBinary(static_cast<std::uint32_t>(geometry.cellCount()));
     for (std::uint64_t face = 0; face < geometry.cellCount(); ++face) {
         unsigned int const* const points = geometry.faceVertex->data + 3 * face;

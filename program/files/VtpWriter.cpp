@@ -68,7 +68,10 @@ namespace {
             std::uint64_t const pointCount = geometry_.pointCount();
             std::uint64_t const cellCount = geometry_.cellCount();
             bool const isCloud = kind == WritableGeometry::Kind::PointCloud;
-            xml_ << "<?xml version=\"1.0\"?>\n<VTKFile type=\"PolyData\" version=\"1.0\" byte_order=\"LittleEndian\""
+            xml_ << "<?xml version=\"1.0\"?>\n";
+            if (!geometry_.remark.empty())
+                xml_ << "<!-- " << geometry_.remark << " -->\n";
+            xml_ << "<VTKFile type=\"PolyData\" version=\"1.0\" byte_order=\"LittleEndian\""
                     " header_type=\"UInt64\">\n  <PolyData>\n    <Piece NumberOfPoints=\""
                  << pointCount << "\" NumberOfVerts=\"" << (isCloud ? pointCount : 0) << "\" NumberOfLines=\""
                  << (kind == WritableGeometry::Kind::Strands ? cellCount : 0)

@@ -22,6 +22,7 @@ struct WritableGeometry {
     Orvan::Ptr<Orvan::Array<unsigned int>> faceVertex;
     Orvan::Ptr<Orvan::Array<unsigned int>> offsets; // of faces or strands
     std::vector<Attribute> attributes;
+    std::string remark; // becomes a comment
     std::vector<std::string> leftOut; // what the file does not hold, a sentence each
     Existing existing = Existing::Replace;
 

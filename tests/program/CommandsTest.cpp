@@ -247,6 +247,29 @@ TEST_F(Commands, MergeTellsWhatBecameOfAttributes)
         json({"normal", "a.xyz", 3}));
 }
 
+TEST_F(Commands, ReadLenientlyAndCenteredIfAsked)
+{
+    store(folder / "far.obj",
+        "v 500000.125 4100000.5 1\nv 500080 4100000 1\nv nan nan nan\nv 500080 4100060 0\nf 1 2 4\nf 1 2\n");
+    store(folder / "near.obj", "v 500700.125 4100000 1\nv 500080 4100000 1\nv 500080 4100060 0\nf 1 2 3\n");
+    EXPECT_EQ(run("merge near.obj far.obj out.obj").exitCode, 3);
+    json const done = runForJson("merge --lenient --center far.obj near.obj out.obj");
+    EXPECT_EQ(at(done, {"center", "after/points", "after/faces"}), json({{500000, 4100000, 0}, 6, 2}));
+    EXPECT_EQ(done["warnings"].size(), 2); // a point and a face
+    EXPECT_THAT(contentOf(folder / "out.obj"),
+        AllOf(HasSubstr("# center 500000 4100000 0 subtracted"), HasSubstr("\nv 0.125 0.5 1\n"),
+            HasSubstr("\nv 700.125 0 1\n")));
+    for (char const* const extension : {".ply", ".stl", ".vtp"}) {
+        std::string const out = std::string("out") + extension;
+        EXPECT_THAT(run("merge near.obj --center-at 500000 4100000 -0.5 " + out).output,
+            HasSubstr("center 500000 4100000 -0.5 subtracted"));
+        EXPECT_THAT(contentOf(folder / out), HasSubstr("center 500000 4100000 -0.5 subtracted"));
+    }
+    copySamples({"stitch-quad.obj", "stitch-quad-rings.obj"});
+    std::string const check = "stitch --check --template stitch-quad.obj stitch-quad-rings.obj";
+    EXPECT_EQ(run(check + " --center-at 5 5 5").output, run(check).output); // only the mesh would be moved
+}
+
 TEST_F(Commands, PointsAndFacesArePickedAndKeepTheirAttributes)
 {
     copySamples({"cube.ply"});

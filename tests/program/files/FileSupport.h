@@ -17,11 +17,11 @@ namespace ModelingProgram {
 using namespace Tessara::Math;
 using namespace TestSupport;
 
-inline GeometryFile readContent(std::string const& extension, std::string_view content)
+inline GeometryFile readContent(std::string const& extension, std::string_view content, ReadOptions const& options = {})
 {
     TemporaryFolder const folder;
     store(folder / ("file" + extension), content);
-    return readGeometryFile(folder / ("file" + extension));
+    return readGeometryFile(folder / ("file" + extension), options);
 }
 
 /// What is said about a file behind its name; empty where it is read.

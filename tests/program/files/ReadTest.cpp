@@ -32,8 +32,30 @@ namespace {
                 {".obj", square + "vt 0 0\nvn 0 0 1\nf 1/1/1 2//1 3/1 4/ 1// 2/1/", 4, {0, 1, 2, 3, 0, 1}, {0, 6},
                     "3 face corners have no \"uv\""}},
             {"numbers too small for a float", {".obj", "v 1e-60 -1e-4000 1e-42", 1, {}, {}}},
-            {"groups and unknown statements",
-                {".obj", "o a\ng b c\ns 1\nusemtl \nmtllib x\nvp 1\n" + square, 4, {}, {}, "\"vp\""}},
+            {"objects", {".obj", "o a b\ns off\nusemtl \n" + square, 4, {}, {}, "objects are left out: 1 (\"a b\")"}},
+            {"groups", {".obj", "g b c\ns 0\ng\ng c\n" + square, 4, {}, {}, "groups are left out: 2 (\"b\", \"c\")"}},
+            {"smoothing groups", {".obj", "s 1\ns 2\n" + square, 4, {}, {}, "smoothing groups are left out: 2 ("}},
+            {"materials",
+                {".obj", "usemtl a\nusemtl b\nusemtl c\nusemtl d\nusemtl e\nusemtl f\nusemtl a\n" + square, 4, {}, {},
+                    "\"e\" and 1 more)"}},
+            {"a file of materials", {".obj", "mtllib x y\n" + square, 4, {}, {}, "1 (\"x y\")"}},
+            {"unknown statements", {".obj", "vp 1\n" + square, 4, {}, {}, "\"vp\""}},
+            {"unused texture coordinates",
+                {".obj", square + "vt 0 0\nvt 1 1\nf 1/2 2/2 3/2\n", 4, {0, 1, 2}, {0, 3},
+                    "texture coordinates (vt) that no face refers to are left out: 1"}},
+            {"unused normals",
+                {".obj", square + "vn 0 0 1\nf 1 2 3\n", 4, {0, 1, 2}, {0, 3},
+                    "normals (vn) that no face refers to are left out: 1"}},
+            {"digits of a text",
+                {".obj", "v 500000.123 1 0\nv 500001 0.1 0\n", 2, {}, {},
+                    "positions lose up to 0.002 (single precision at coordinates up to 500,001); --center"}},
+            {"as many digits as fit", {".obj", "v 0.1 3.14159274 0.15625000\nv 123456 -1.5e-7 1e10\n", 2, {}, {}}},
+            {"digits of a binary file",
+                {".ply",
+                    "ply\nformat binary_little_endian 1.0\nelement vertex 1\nproperty double x\nproperty double y\n"
+                    "property float z\nend_header\n"
+                        + bytesOf(std::endian::little, 0.1, 0.5, 0.1f),
+                    1, {}, {}, "positions lose up to 1.5e-09 (single precision at coordinates up to 0.5); --center"}},
             {"weights", {".obj", "v 0 0 0 1\nv 1 0 0 0.5", 2, {}, {}, "1 weights"}},
             {"polylines in order", {".obj", square + "l 1 2\nl 3 4\n", 4, {}, {0, 2, 4}}},
             {"polylines that share points",
@@ -43,13 +65,17 @@ namespace {
             {"a list of faces in front",
                 {".ply", plyHead + plyFace + plyPoints + "end_header\r\n3 0 1 2\n\n0 0 0\n1 0 0\n0 1 0", 3, {0, 1, 2},
                     {0, 3}}},
+            {"the name of a texture file",
+                {".ply", plyHead + "comment TextureFile a b.png\n" + plyPoints + "end_header\n0 0 0\n1 0 0\n0 1 0\n", 3,
+                    {}, {}, "the texture file \"a b.png\""}},
             {"elements of other kinds",
                 {".ply",
                     plyHead + "element edge 2\nproperty list int double q\nproperty char w\n" + plyPoints
                         + "end_header\n0 1\n2 0.5 1e9 -1\n0 0 0\n1 0 0\n0 1 0\n",
                     3, {}, {}, "\"edge\" are left out"}},
             {"more than was declared",
-                {".ply", plyHead + plyPoints + "end_header\n0 0 0\n1 0 0\n0 1 0\n9", 3, {}, {}, "follows the last"}},
+                {".ply", plyHead + plyPoints + "end_header\n0 0 0\n1 0 0\n0 1 0\n9", 3, {}, {},
+                    "bytes after the last element are left out: 1"}},
             {"comments in OFF",
                 {".off", "# a\nOFF # b\n\n3 1 # c\n0 0 0\n# d\n1 0 0\n0 1 0\n3 2 1 0\n#", 3, {2, 1, 0}, {0, 3}}},
             {"colours of a table",
@@ -60,7 +86,7 @@ namespace {
                     "solid a b\nFacet normal 0 0 1\n outer loop\nVERTEX 0 0 0\n"
                     "vertex 1 0 0\nvertex 0 1 0\nendloop\nendfacet\nfacet normal nan 0 0\nouter loop\nvertex 1 0 -0\n"
                     "vertex 0 1 0\nvertex 1 1 0\nendloop\nendfacet\nendsolid a b\n",
-                    4, {0, 1, 2, 1, 2, 3}, {0, 3, 6}}},
+                    4, {0, 1, 2, 1, 2, 3}, {0, 3, 6}, "and their names are left out: 1 (\"a b\")"}},
         };
         for (auto const& [name, test] : cases) {
             SCOPED_TRACE(name);
@@ -126,8 +152,16 @@ namespace {
             {".off", offPoints + "3 0 1 3\n", 6, "a face names point 3, but the file has 3 points, counted from 0"},
             {".off", "OFF\n1 0 0\n0 0 0 1 1\n", 3, "a colour has 2 values instead of 3 or 4"},
             {".off", "OFF\n2 0 0\n0 0 0 # 0 0 0\n", 4, "the file is cut off before point 2"},
-            {".xyz", "0 0 0\n1 2\n", 2, "there are 2 values; 3 make a point, 6 a point and its normal"},
-            {".xyz", "0 0 0\n1 2 3 0 0 1\n", 2, "some points have normals and some have none"},
+            {".xyz", "0 0\n1 2\n", 1,
+                "there are 2 values; without a heading line that names the columns, 3, 4, 6, 7 or 9"},
+            {".xyz", "0 0 0\n1 2 3 0 0 1\n", 2, "there are 6 values, and 3 in the lines above"},
+            {".xyz", "x y z a\n1 2 3\n", 2, "there are 3 values, but the heading line names 4 columns"},
+            {".xyz", "x y 3\n1 2 3\n", 1, "\"x\" stands for a coordinate"},
+            {".xyz", "3\n0 0 0\n", 3, "it declares 3 points and holds 1"},
+            {".xyz", "1,5;2,5;3,5\n", 1, "decimal commas are not read"},
+            {".xyz", "1,25 3 4\n", 1, "decimal commas are not read"},
+            {".xyz", "1,,3\n", 1, "\"\" stands for a coordinate"},
+            {".xyz", "0 0 0 9 9 9 0.1 0.2 900\n1 1 1 0.5 9 9 9 9 9\n", 3, "are not a color and a normal"},
             {".stl", solid, 5, "the file is cut off inside of a solid"},
             {".stl", solid + "endloop\n", 5, "\"endloop\" stands where \"vertex\" belongs"},
         };
@@ -145,6 +179,146 @@ namespace {
         EXPECT_THROW(readGeometryFile(folder / "none.obj"), FileError);
         std::filesystem::create_directory(folder / "folder.obj");
         EXPECT_THROW(readGeometryFile(folder / "folder.obj"), FileError);
+    }
+
+    TEST(ReadXyz, tellsColumnsByHeadingsOrValues)
+    {
+        struct Case {
+            std::string content;
+            std::vector<uchar3> colors;
+            std::vector<float3> normals;
+            std::vector<float> numbers; // the property named n, or else intensity
+        };
+        std::vector<Case> const cases{
+            {"1 2 3 255 0 7\n1 2 3 1 2 3\n", {{255, 0, 7}, {1, 2, 3}}, {}, {}},
+            {"1 2 3 1 2 3\n1 2 3 -1 0 0\n", {}, {{1, 2, 3}, {-1, 0, 0}}, {}},
+            {"1 2 3 0 0 1\n1 2 3 0 1 0\n", {}, {{0, 0, 1}, {0, 1, 0}}, {}},
+            {"1 2 3 0.5\n", {}, {}, {0.5f}},
+            {"2\n1 2 3 -20 1 2 3\n1 2 3 300 4 5 6\n", {{1, 2, 3}, {4, 5, 6}}, {}, {-20, 300}},
+            {"1 2 3 4 5 6 0.25\n", {{4, 5, 6}}, {}, {0.25f}},
+            {"1 2 3 0.6 0 -0.8 9\n", {}, {{0.6f, 0, -0.8f}}, {9}},
+            {"1 2 3 4 5 6 0.6 0 -0.8\n", {{4, 5, 6}}, {{0.6f, 0, -0.8f}}, {}},
+            {"1 2 3 0.6 0 -0.8 4 5 6\n", {{4, 5, 6}}, {{0.6f, 0, -0.8f}}, {}},
+            {"1\n// X Y Z Nx Ny Nz R G B n\n1 2 3 0 0 1 0 1 0 9", {{0, 1, 0}}, {{0, 0, 1}}, {9}},
+            {"\"z\"; \"n\"; \"x\"; 'y';\r\n3;9; 1 ;2;\r\n", {}, {}, {9}},
+            {"x,y,z,,n\n1,2,3,4,5\n", {}, {}, {5}},
+            {"x,y,z,r,g,b,\n1, 2, 3, 4, 5, 6\n", {{4, 5, 6}}, {}, {}},
+            {"Points of the yard\n1\t2\t3\t4\t5\t6\n", {{4, 5, 6}}, {}, {}},
+            {"1, 2, 3 4 5 6\n", {{4, 5, 6}}, {}, {}},
+            {"x,y,z,r,g,b\n1,2,3,4,5,6\nnan,nan,nan,-1,nan,0.5\n", {{4, 5, 6}}, {}, {}},
+        };
+        for (Case const& test : cases) {
+            SCOPED_TRACE(test.content);
+            auto const object = readContent(".xyz", test.content, {.isLenient = true}).object;
+            EXPECT_EQ(valuesOf<float3>(*object, sPointPosition).at(0), (float3{1, 2, 3}));
+            EXPECT_EQ(valuesOf<uchar3>(*object, "color"), test.colors);
+            EXPECT_EQ(valuesOf<float3>(*object, "normal"), test.normals);
+            bool const isNamed = object->hasProperty("n");
+            EXPECT_EQ(valuesOf<float>(*object, isNamed ? "n" : "intensity"), test.numbers);
+        }
+        EXPECT_THAT(
+            readContent(".xyz", "1 2 3 4 5 6 7\n").notes, ElementsAre(HasSubstr("a heading line would decide")));
+        EXPECT_THAT(readContent(".xyz", "a b c\n1 2 3\n").notes, ElementsAre(HasSubstr("does not name columns x")));
+        EXPECT_EQ(valuesOf<double>(*readContent(".xyz", "x y z t\n0 0 0 123456789.125\n").object, "t"),
+            std::vector<double>{123456789.125});
+    }
+
+    TEST(ReadGeometryFile, leavesOutWhatIsBrokenIfItMay)
+    {
+        struct Case {
+            char const* extension;
+            std::string content;
+            std::uint64_t points;
+            Indices corners;
+            Indices offsets; // of faces, or of strands where there are no corners
+            std::vector<char const*> notes;
+        };
+        std::string const ply =
+            "ply\nformat ascii 1.0\nelement vertex 5\nproperty float x\nproperty float y\nproperty float z\n"
+            "property int id\nelement face 4\nproperty list uchar int vertex_indices\n"
+            "property list uchar float texcoord\nproperty int part\nend_header\n"
+            "0 0 0 10\nnan nan NaN 11\n1 0 0 12\n1 1 0 13\n0 -inf 0 14\n"
+            "3 0 1 2 6 0 0 0 0 0 0 6\n3 0 2 3 6 0 1 2 3 4 5 7\n2 0 4 4 0 0 0 0 8\n4 3 2 0 3 8 6 7 8 9 0 1 2 3 9\n";
+        std::string const facet = "facet\nouter loop\nvertex 0 0 0\nvertex 1 0 0\nvertex 0 1 0\nendloop\nendfacet\n";
+        std::string const broken = "facet\nouter loop\nvertex 5 5 5\nvertex nan 0 0\nvertex 0 1 0\nendloop\nendfacet\n";
+        std::string const binary = std::string(80, ' ')
+            + bytesOf(
+                std::endian::little, 1u, 0.f, 0.f, 0.f, 0.f, 0.f, 0.f, 1.f, 0.f, 0.f, 0.f, 1.f, 0.f, std::uint16_t{});
+        std::vector<Case> const cases{
+            {".ply", ply, 3, {0, 1, 2, 2, 1, 0, 2}, {0, 3, 7},
+                {"points that are NaN or infinite are left out: 2", "faces at such points are left out: 1",
+                    "faces with fewer than three corners are left out: 1"}},
+            {".obj", "v 0 0 0\nv nan 0 0\nv 1 0 0\nv 2 0 0\nl 1 2\nl 3 4\n", 2, {}, {0, 2},
+                {"infinite are left out: 1", "polylines at such points"}},
+            {".obj", "v 0 0 0\nv 1 0 0\nf 1 2\n", 2, {}, {}, {"fewer than three corners are left out: 1"}},
+            {".off", "OFF\n3 1 0\n0 0 0\n1 0 0\n0 1 0\n3 0 1 2\nrest", 3, {0, 1, 2}, {0, 3},
+                {"element are left out: 4"}},
+            {".stl", binary + "rest", 3, {0, 1, 2}, {0, 3}, {"element are left out: 4"}},
+            {".stl", "solid\n" + facet + "endsolid\n" + std::string(2, '\0'), 3, {0, 1, 2}, {0, 3},
+                {"element are left out: 2"}},
+            {".stl", "solid\n" + broken + facet + "endsolid\n", 4, {2, 3, 1}, {0, 3}, {"left out: 1", "faces at such"}},
+        };
+        for (Case const& test : cases) {
+            SCOPED_TRACE(test.extension + test.content);
+            EXPECT_NE(refusalOf(test.extension, test.content), "");
+            GeometryFile const file = readContent(test.extension, test.content, {.isLenient = true});
+            EXPECT_EQ(getElementCount(*file.object, sPointComp), test.points);
+            EXPECT_EQ(valuesOf<unsigned int>(*file.object, sFaceVertex), test.corners);
+            char const* const offsets = test.corners.empty() ? sStrandOffset : sFaceOffset;
+            EXPECT_EQ(valuesOf<unsigned int>(*file.object, offsets), test.offsets);
+            EXPECT_TRUE(isValid(*file.object) && reportProperties(*file.object).empty());
+            EXPECT_EQ(file.notes.size(), test.notes.size());
+            for (char const* const note : test.notes)
+                EXPECT_THAT(file.notes, testing::Contains(HasSubstr(note)));
+        }
+        auto const mesh = readContent(".ply", ply, {.isLenient = true}).object;
+        EXPECT_EQ(valuesOf<int>(*mesh, "id"), (std::vector<int>{10, 12, 13}));
+        EXPECT_EQ(valuesOf<int>(*mesh, "part"), (std::vector<int>{7, 9}));
+        EXPECT_EQ(valuesOf<float2>(*mesh, "uv"),
+            (std::vector<float2>{{0, 1}, {2, 3}, {4, 5}, {6, 7}, {8, 9}, {0, 1}, {2, 3}}));
+        EXPECT_THROW(readContent(".obj", "v nan 0 0\n", {.isLenient = true}), FileError);
+    }
+
+    TEST(ReadGeometryFile, subtractsACenterInDoublePrecision)
+    {
+        using Tessara::Math::double3;
+        double3 const center{500000, -4100000, 0};
+        std::string const a = "500000.125 -4100000.5 10.0625\n", b = "500100.1875 -4100080.75 12\n";
+        std::string const corner = "vertex 500100.1885 -4100080.75 12\n"; // as a float it is equal to b
+        for (auto const& [extension, content] :
+            {std::pair{".obj", "v " + a + "v " + b}, {".xyz", a + b}, {".off", "OFF 2 0 0\n" + a + b},
+                {".ply",
+                    "ply\nformat ascii 1.0\nelement vertex 2\nproperty float x\nproperty double y\n"
+                    "property double z\nend_header\n"
+                        + a + b},
+                {".stl",
+                    "solid\nfacet\nouter loop\nvertex " + a + "vertex " + b + corner
+                        + "endloop\nendfacet\nendsolid\n"}}) {
+            SCOPED_TRACE(extension);
+            GeometryFile const file = readContent(extension, content, {.isCentered = true});
+            EXPECT_EQ(file.origin, center);
+            auto const positions = valuesOf<float3>(*file.object, sPointPosition);
+            EXPECT_EQ(positions.at(0), (float3{0.125f, -0.5f, 10.0625f}));
+            EXPECT_EQ(positions.at(1), (float3{100.1875f, -80.75f, 12}));
+            EXPECT_EQ(positions.size(), extension == std::string(".stl") ? 3 : 2);
+            GeometryFile const moved = readContent(extension, content, {.origin = double3{500100, -4100000, 10}});
+            EXPECT_EQ(valuesOf<float3>(*moved.object, sPointPosition).at(1), (float3{0.1875f, -80.75f, 2}));
+        }
+        EXPECT_EQ(readContent(".obj", "v 0.31 0.29 0\nv 0.32 0.30 0\nv 0.33 0.31 0\n", {.isCentered = true}).origin,
+            (double3{0.3, 0.3, 0}));
+        EXPECT_EQ(readContent(".obj", "v -7.5 2 0\n", {.isCentered = true}).origin, (double3{-8, 2, 0}));
+    }
+
+    /// The float nearest to a decimal number, also if rounding to a double first ends halfway between two floats.
+    TEST(ReadGeometryFile, roundsDecimalsOnce)
+    {
+        EXPECT_EQ(valuesOf<float3>(*readContent(".obj",
+                                       "v 1.000000059604644775390625000001 1.00000005960464477539062499999 "
+                                       "1.000000059604644775390625")
+                                        .object,
+                      sPointPosition)
+                      .at(0),
+            (float3{std::nextafter(1.0f, 2.0f), 1, 1}));
     }
 
     TEST(ReadObj, keepsPointsSharedAcrossSeamsAndTakesValuesAlongIntoStrands)
@@ -205,7 +379,7 @@ namespace {
         GeometryFile const file = readContent(".ply", text);
         Tessara::Object const& mesh = *file.object;
         EXPECT_EQ(file.format, "PLY (ascii)");
-        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("rounded"), HasSubstr("\"rest\"")));
+        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("\"rest\"")));
         EXPECT_EQ(valuesOf<float3>(mesh, sPointPosition),
             (std::vector<float3>{{0.5f, 0, -0.25f}, {1.5f, 1.5f, -0.25f}, {2.5f, 3, -0.25f}}));
         EXPECT_EQ(valuesOf<short>(mesh, "flag"), (std::vector<short>{0, -1, -2}));
