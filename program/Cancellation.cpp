@@ -15,7 +15,7 @@ namespace ModelingProgram {
 namespace {
 
     constexpr int kCancelling[] = {SIGINT, SIGTERM};
-    constexpr int kEnding[] = {SIGHUP, SIGPIPE, SIGQUIT};
+    constexpr int kEnding[] = {SIGHUP, SIGPIPE, SIGQUIT, SIGALRM, SIGUSR1, SIGUSR2, SIGXCPU};
 
     std::atomic<bool> isStopping = false;
 

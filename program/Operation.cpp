@@ -121,7 +121,7 @@ Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& re
         report.document["center"] = {geometry.origin->x, geometry.origin->y, geometry.origin->z};
     }
     for (std::string const& note : geometry.notes)
-        report.warn(note);
+        report.warn(fmt::format("{}: {}", file.string(), note));
     report.document["inputs"].push_back(
         {{"file", file.string()}, {"format", geometry.format}, {"kind", nameOf(typeOf(*geometry.object))}});
     return std::move(geometry.object);

@@ -201,7 +201,7 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
         return {};
     // A band around a piece of plane holds its area times its width. It touches the cubic blocks of side s whose centers
     // are within half the width and half the block's extent along the normal n, which is s (|nx| + |ny| + |nz|).
-    constexpr double kBlockVoxels = Band::kBlockSide * Band::kBlockSide * Band::kBlockSide;
+    constexpr double kBlockVoxels = Band::kBlockSide * Band::kBlockSide * Band::kBlockSide, kPi = 3.14159265358979;
     double voxels = 0, touched = 0;
     for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
         auto const corners = mesh.corners(face);
@@ -216,9 +216,14 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
     }
     auto const sides = reachOf(mesh, voxelSize, halfWidth).sides;
     double const box = sides[0] * sides[1] * sides[2];
+    // A band wider than the surface holds about what is within its half width of a convex body (Steiner's formula).
+    double const meanWidth = std::max(0.0, (sides[0] + sides[1] + sides[2]) / 2 - 3 * (halfWidth + 1));
+    auto const around = [&](double width) {
+        return width * (voxels / (2 * halfWidth) + 2 * kPi * width * (meanWidth + width * 2 / 3));
+    };
     BandSize size;
-    size.voxels = std::min(voxels, box);
-    double const blocks = std::min(touched, box) / kBlockVoxels;
+    size.voxels = std::min(std::max(voxels, around(halfWidth)), box);
+    double const blocks = std::min(std::max(touched, around(halfWidth + Band::kBlockSide / 2.0)), box) / kBlockVoxels;
     // A leaf of OpenVDB, and the bytes of the file, whose buffer doubles as it grows; and OpenVDB itself.
     constexpr double kWrittenPerBlock = 2300, kWrittenPerVoxel = 12, kCodecBytes = 32e6;
     size.bytes = kCodecBytes + size.voxels * sizeof(Voxel)

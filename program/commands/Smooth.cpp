@@ -187,8 +187,11 @@ namespace {
             largestMove(arrays, arraysOf(*mesh))};
         saveGeometry(*mesh, options.out, report);
         warnOfShape(change,
-            "Smoothing is for noise on rounded surfaces. --pin-sharp 30 keeps sharp edges, and a smaller --amount "
-            "moves less.",
+            options.sharpDegrees
+                ? "Smoothing is for noise on rounded surfaces. A smaller --pin-sharp holds more edges, and a smaller "
+                  "--amount moves less."
+                : "Smoothing is for noise on rounded surfaces. --pin-sharp 30 keeps sharp edges, and a smaller "
+                  "--amount moves less.",
             report);
         report.document["amount"] = numberOf(options.amount);
         Json after = describeMesh(*mesh);

@@ -170,7 +170,10 @@ std::optional<double3> GeometryBuilder::movePositions()
             loss = std::max({loss, lossOf(moved.x), lossOf(moved.y), lossOf(moved.z)});
         raw_.positions[point] = {static_cast<float>(moved.x), static_cast<float>(moved.y), static_cast<float>(moved.z)};
     }
-    largestLoss_ = largestLoss_ == 0 ? 0 : loss;
+    // Centered, nothing but the last bits of a float are left to lose.
+    constexpr double kToldShare = 1e-6; // of the longest side
+    bool const isTold = largestLoss_ != 0 && loss > kToldShare * boxOf(raw_.positions, raw_.positions).longestSide();
+    largestLoss_ = isTold ? loss : 0;
     return origin;
 }
 

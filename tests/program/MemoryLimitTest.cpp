@@ -58,6 +58,10 @@ TEST(MemoryLimit, RefusesBandsAndVolumesBeforeTheyAreMade)
         EXPECT_LT(estimateBand(arraysOf(*mesh), kVoxelSize, 1000).voxels, 1e10); // the box, not 1,000 spheres
     }
 
+    auto const single = TestSupport::MeshBuilder::icosahedron().build(); // in a band much wider than it is
+    double const wide = static_cast<double>(voxelsAround(arraysOf(*single), {}, 0.5, 40).size());
+    EXPECT_NEAR(estimateBand(arraysOf(*single), 0.5, 40).voxels / wide, 1, 0.1);
+
     SparseVolume volume;
     for (int i = 0; i != 100'000; ++i)
         volume.voxels.push_back({i % 100, i / 100 % 100, i / 10'000, 1});
