@@ -15,7 +15,7 @@ namespace Tessara::GeometryAlgorithms {
 /// front of them: those in front of the first strand of a later input, and those of a later input without strands. Points
 /// in front of the first strand of all stay points of no strand: the first offset is then above 0.
 ///
-/// \param output  Receives the merged strands. Its other keys stay. Where the result is false it is as it was, but
+/// \param output  Receives the merged strands. Its other keys are kept. If the result is false, it is as it was, but
 ///                with the merged strands, and without what is no geometry, if the first input has strand offsets
 ///                whose default is no `unsigned int`.
 /// \param runtimeServices  Not looked at; may be null.

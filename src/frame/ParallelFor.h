@@ -83,7 +83,8 @@ template <class... Task> [[nodiscard]] bool runTasks(Task const&... tasks)
 /// Runs a scan or reduction of oneTBB out of reach of a cancellation of an enclosing task group, which would make
 /// oneTBB skip it silently.
 /// \param work  Its loop bodies do not throw.
-/// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work is done then
+/// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work is done then. If oneTBB
+///         runs out of memory between two tasks of one scan, it may end the process.
 template <class Work> [[nodiscard]] bool runIsolated(Work const& work)
 {
     tbb::task_group_context context(tbb::task_group_context::isolated);

@@ -106,6 +106,7 @@ std::size_t findRuns(std::size_t count, PointRow& row)
 {
     constexpr std::size_t kFirst = PointRow::kFirstTile;
     row.tileX[kFirst - 1] = std::numeric_limits<float>::quiet_NaN(); // differs from all
+    row.tileY[kFirst - 1] = row.tileZ[kFirst - 1] = 0;
     std::uint32_t run = ~std::uint32_t{0};
     for (std::size_t n = 0; n < count; n += 4) {
         auto const differs = [n](float const* tile) {

@@ -115,9 +115,15 @@ bool runDuringAllocation(
 {
     atNumber = &meanwhile;
     allocationsLeft = number - 1;
+    struct Disarm {
+        ~Disarm()
+        {
+            atNumber = nullptr;
+            allocationsLeft = kNever;
+        }
+    } const disarm;
     action();
-    atNumber = nullptr;
-    return allocationsLeft.exchange(kNever) < 0;
+    return allocationsLeft < 0;
 }
 
 void expectAllOrNothing(Tessara::Object const& source, std::function<void(Tessara::Object&)> const& edit)

@@ -85,8 +85,8 @@ struct VolumeSource {
 /// \throws std::bad_alloc         also for 2^31 tiles of one depth
 template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source);
 
-/// A channel with a layer more on the upper sides: what `setHaloTile` gives for every tile that has data. Twice the
-/// memory, and samples need no halo tiles of their own.
+/// A channel with a layer more on the upper sides: what `setHaloTile` gives for every tile that has data. Samples
+/// then need no halo tiles of their own. Twice the memory of stored tiles; tiles of one value no longer share theirs.
 template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume);
 
 extern template TESSARAGEOMETRYVOLUME_EXPORT Volume<Traits2> buildVolume(VolumeSource const& source);
