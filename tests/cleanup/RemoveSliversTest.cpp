@@ -125,6 +125,29 @@ Orvan::MutablePtr<Object> withoutSlivers(MeshBuilder const& builder, float ratio
     return mesh;
 }
 
+/// Needles whose collapses at ratio 0.03 depend on what those before have changed around two hubs.
+MeshBuilder dependentNeedlesAtHubs()
+{
+    constexpr unsigned int kUpper = 60, kLower = 61;
+    MeshBuilder mesh = MeshBuilder::bipyramid(60);
+    auto const cut = [&](unsigned int from, unsigned int to, float fraction) {
+        auto const middle = static_cast<unsigned int>(mesh.points.size());
+        mesh.points.push_back(mesh.points[from] + (mesh.points[to] - mesh.points[from]) * fraction);
+        for (std::size_t face = 0, count = mesh.faces.size(); face != count; ++face)
+            if (auto rest = mesh.faces[face]; std::ranges::count(rest, from) && std::ranges::count(rest, to)) {
+                std::ranges::replace(mesh.faces[face], to, middle);
+                std::ranges::replace(rest, from, middle);
+                mesh.faces.push_back(rest);
+            }
+    };
+    cut(kUpper, 0, 0.0004f);
+    cut(5, kUpper, 0.001f); // collapses into point 5, which becomes a neighbor of the hub
+    cut(kUpper, 6, 0.02f); // then has points 5 and 7 in common with the hub
+    cut(kLower, 0, 0.0004f); // collapses into the hub, which gets points 0 and 1 as neighbors
+    cut(kLower, 1, 0.02f); // then has points 1 and 2 in common with the hub
+    return mesh;
+}
+
 /// The places of the directed edges that are no inner manifold edges.
 std::multiset<std::array<float, 6>> oddEdges(Object const& mesh)
 {
@@ -159,6 +182,7 @@ TEST(RemoveSlivers, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
         {"wheel", MeshBuilder::wheel(120)},
         {"wheel with three radii", MeshBuilder::wheel(300, {0.02f, 1, 0.5f}).shuffled(3)},
         {"hubs with needles", MeshBuilder::wheel(90).withNeedles(150).withNoise(0.0002f, 3).shuffled(5)},
+        {"dependent needles at hubs", dependentNeedlesAtHubs()},
         {"equal points", MeshBuilder::sphere(6).withNeedles(30, 0.0f)},
         {"two parts",
             MeshBuilder::sphere(5).withNeedles(9).joinedWith(MeshBuilder::torus(9, 9).withNeedles(5), {9, 0, 0})},

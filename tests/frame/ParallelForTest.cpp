@@ -63,6 +63,8 @@ TEST(ParallelFor, isOutOfReachOfACancelledGroupWhenIsolated)
     tbb::task_group group;
     group.run_and_wait([&] {
         group.cancel();
+        parallelFor(
+            Range(0, 5000, 1), [](Range const&) { ADD_FAILURE() << "not isolated"; }, false);
         parallelFor(Range(0, 5000, 1), [&](Range const& range) { visited += range.size(); });
         EXPECT_TRUE(runIsolated([&] { hasRun = true; }));
     });

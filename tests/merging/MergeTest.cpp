@@ -158,13 +158,19 @@ TEST(Merge, joinsByHand)
     EXPECT_EQ(dataOf<unsigned int>(*mesh, sFaceOffset)->capacity, 3u) << "with its closing entry from the start";
     EXPECT_EQ(countsOf(*mesh), (Counts{7, 6, 2}));
 
-    // One name on two components: each has what belongs to it, and the last one stays.
+    // One name on two components: the last component wins, even if only the last of many inputs has the name there.
     auto onPoints = deepCopy(*triangle), onFaces = deepCopy(*triangle);
     addDataProperty<int>("tag", sPointComp, {1, 2, 3}, *onPoints);
     addDataProperty<int>("tag", sFaceComp, {7}, *onFaces);
-    auto const tagged = merged(Kind::Meshes, inputsOf(std::move(onPoints), std::move(onFaces)));
+    Inputs many = inputsOf(std::move(onPoints));
+    while (many.size != 255)
+        many.append(many[0]);
+    many.append(std::move(onFaces));
+    auto const tagged = merged(Kind::Meshes, many);
+    std::vector<int> tags(256, 1);
+    tags.back() = 7;
     EXPECT_EQ(getGeoPropTargetName(*tagged, "tag"), sFaceComp);
-    EXPECT_EQ(valuesOf<int>(*tagged, "tag"), (std::vector<int>{1, 7}));
+    EXPECT_EQ(valuesOf<int>(*tagged, "tag"), tags);
 
     auto const strands = merged(Kind::Strands,
         inputsOf(makeStrands(Orvan::Array<float3>(10), {0, 4, 10}), makeStrands({{}, {}}, {0}),
