@@ -40,8 +40,10 @@ namespace {
         if constexpr (std::is_integral_v<T>) {
             T value{};
             auto const [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+            if (error == std::errc::result_out_of_range)
+                return text + " is too large";
             if (error != std::errc{} || end != text.data() + text.size())
-                return text + " is not a whole number";
+                return text + (std::is_signed_v<T> ? " is not a whole number" : " is not a whole number of 0 or more");
         } else if constexpr (std::is_floating_point_v<T>) {
             if (!std::isfinite(static_cast<T>(numberIn(text))))
                 return text + " is not a number";
@@ -174,9 +176,13 @@ namespace {
                 return fmt::format("{} takes {} values, and there {} {}", option->get_name(false, false),
                     option->get_items_expected_min(), count == 1 ? "is" : "are", count);
         }
-        for (CLI::Option const* option : optionsOf(command))
-            if (fallback.starts_with(option->get_name(false, false) + ":"))
-                return fmt::format("{} needs a value", option->get_name(false, false));
+        for (CLI::Option const* option : optionsOf(command)) {
+            std::string const name = option->get_name(false, false);
+            if (option->get_items_expected_max() == 0 && fallback.find(name + " = ") != std::string::npos)
+                return name + " takes no value";
+            if (fallback.starts_with(name + ":"))
+                return name + " needs a value";
+        }
         return fallback;
     }
 

@@ -101,7 +101,7 @@ namespace {
         // three takes at most as much as the tree, and tiles, which may be cut in other places, at most twice as much.
         constexpr std::uint64_t kTreesInMemory = 3, kCodecBytes = 32'000'000;
         limit.require(kCodecBytes + kTreesInMemory * size.treeBytes,
-            fmt::format("reading {} of {}", countOf(size.activeVoxels, "voxel"), file.string()),
+            fmt::format("reading {} with {}", file.string(), countOf(size.activeVoxels, "single voxel")),
             "A volume with larger voxels takes less.");
     }
 

@@ -165,7 +165,7 @@ void MemoryLimit::run(std::function<void()> const& work, std::string const& advi
 void addMemoryLimit(std::uint64_t& bytes, Command& command)
 {
     command.addOption("--max-memory", bytes, "Stop before the program takes more (500MB, 4GB); without, what is free")
-        .valueName("")
+        .valueName("SIZE")
         .bytes();
 }
 

@@ -212,6 +212,13 @@ namespace {
         return changes;
     }
 
+    void addMeasures(Shape const& shape, Json& values)
+    {
+        values["volume"] = shape.volume ? numberOf(static_cast<float>(*shape.volume)) : Json();
+        values["area"] = numberOf(static_cast<float>(shape.area));
+        values["foldOvers"] = shape.foldOvers;
+    }
+
 }
 
 Shape shapeOf(MeshArrays const& mesh, EdgeSides const& edges, bool isClosed)
@@ -235,16 +242,6 @@ ExaminedMesh examine(MeshArrays const& mesh)
     EdgeSides const edges(mesh);
     MeshTopology const topology = analyseTopology(mesh, edges);
     return {topology, shapeOf(mesh, edges, topology.isClosedManifold())};
-}
-
-Json countsAndArea(Tessara::Object const& object)
-{
-    Json values = countsOf(object);
-    if (typeOf(object) == GeometryType::Mesh) {
-        MeshArrays const mesh = arraysOf(object);
-        values["area"] = numberOf(static_cast<float>(measure(mesh, areaVectors(mesh), {0, 0, 0}).area));
-    }
-    return values;
 }
 
 std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& edges, double degrees)
@@ -289,15 +286,18 @@ double largestDistance(MeshArrays const& before, MeshArrays const& after)
     }).value);
 }
 
+Json countsAndShape(Tessara::Object const& object)
+{
+    Json values = countsOf(object);
+    if (typeOf(object) == GeometryType::Mesh)
+        addMeasures(examine(arraysOf(object)).shape, values);
+    return values;
+}
+
 void addShape(ShapeChange const& change, Json& before, Json& after)
 {
-    auto const add = [](Shape const& shape, Json& values) {
-        values["volume"] = shape.volume ? numberOf(static_cast<float>(*shape.volume)) : Json();
-        values["area"] = numberOf(static_cast<float>(shape.area));
-        values["foldOvers"] = shape.foldOvers;
-    };
-    add(change.before, before);
-    add(change.after, after);
+    addMeasures(change.before, before);
+    addMeasures(change.after, after);
     before["largestMoveOverDiagonal"] = nullptr;
     double const diagonal = change.before.diagonal;
     after["largestMoveOverDiagonal"] = numberOf(static_cast<float>(diagonal > 0 ? change.largestMove / diagonal : 0));

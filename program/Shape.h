@@ -36,8 +36,8 @@ struct ExaminedMesh {
 /// Both at once, since listing the edges takes longer than either.
 ExaminedMesh examine(MeshArrays const& mesh);
 
-/// The numbers of elements, and the area if the object is a mesh: for operations that leave points where they are.
-Json countsAndArea(Tessara::Object const& object);
+/// The numbers of elements, and the shape if the object is a mesh: for operations that leave points where they are.
+Json countsAndShape(Tessara::Object const& object);
 
 /// The points at edges whose two faces have normals that differ by more than so many degrees, or that have more than two
 /// faces, ascending. Faces without area have no normal, and count for nothing.

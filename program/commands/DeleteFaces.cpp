@@ -43,13 +43,13 @@ namespace {
         requireMesh(*mesh, "delete-faces", options.in);
         requireFacesWithCorners(*mesh, options.in);
         requireWritableFaces(options.out, *mesh);
-        Json const before = countsAndArea(*mesh);
+        Json const before = countsAndShape(*mesh);
         Orvan::Array<bool> const picked = pickElements(options.selection, kFaces, *mesh, report);
         runOperation(report, [&] {
             requireDone("delete-faces", picked.empty() || Tessara::GeometryAlgorithms::deleteFaces(picked, *mesh));
         });
         saveGeometry(*mesh, options.out, report);
-        reportOperation(before, countsAndArea(*mesh), {}, report);
+        reportOperation(before, countsAndShape(*mesh), {}, report);
     }
 
 }

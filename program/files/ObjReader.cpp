@@ -304,7 +304,7 @@ namespace {
         void addPolylines()
         {
             if (builder_.faceCount() != 0) {
-                builder_.note(std::to_string(lineOffset_.size - 1) + " polylines are left out: a mesh has none");
+                builder_.note("polylines are left out, as a mesh has none: " + std::to_string(lineOffset_.size - 1));
                 return;
             }
             std::vector<bool> isUsed(total_.points);

@@ -98,6 +98,8 @@ TEST(CommandLine, SaysWhatIsWrongAndWhatMayBeMeant)
         {"delete-faces a b --box -.5 2 3 -4 5 nan", "--box: nan is not a number"},
         {"smooth a b --amount 1 --amount 2", "--amount is given more than once"},
         {"smooth a b --threads", "--threads needs a value"},
+        {"smooth a b --json=maybe", "--json takes no value"},
+        {"smooth a b --threads 99999999999", "--threads: 99999999999 is too large"},
         {"smooth a b --threads 2.5", "--threads: 2.5 is not a whole number"},
         {"make-volume a b --attribute c --from 1e99 --to 1", "--from: 1e99 is not a number"},
         {"subdivide a b --tolerance 1 --max-memory 4QB", "4QB is not a number of bytes, such as 500MB or 4GB"},
