@@ -178,11 +178,18 @@ namespace {
         }
         for (CLI::Option const* option : optionsOf(command)) {
             std::string const name = option->get_name(false, false);
-            if (option->get_items_expected_max() == 0 && fallback.find(name + " = ") != std::string::npos)
-                return name + " takes no value";
             if (fallback.starts_with(name + ":"))
                 return name + " needs a value";
         }
+        return fallback;
+    }
+
+    std::string describeConversion(CLI::App const& command, std::string const& fallback)
+    {
+        for (CLI::Option const* option : optionsOf(command))
+            if (fallback.find(option->get_name(false, false) + " = ") != std::string::npos)
+                return option->get_name(false, false)
+                    + " takes no value"; // only flags are left to the parser to convert
         return fallback;
     }
 
@@ -201,6 +208,8 @@ namespace {
             return describeMissing(command, error.what());
         if (dynamic_cast<CLI::ArgumentMismatch const*>(&error))
             return describeMismatch(command, error.what());
+        if (dynamic_cast<CLI::ConversionError const*>(&error))
+            return describeConversion(command, error.what());
         if (!rest.empty())
             return fmt::format("\"{}\" is one argument more than {} takes", rest[0], command.get_name());
         return error.what();
