@@ -60,7 +60,7 @@ namespace {
             {"polylines in order", {".obj", square + "l 1 2\nl 3 4\n", 4, {}, {0, 2, 4}}},
             {"polylines that share points",
                 {".obj", square + "l 4 2 1 3\nl 1/ 4\n", 6, {}, {0, 4, 6}, "2 points are added"}},
-            {"faces and polylines", {".obj", square + "l 1 2\nf 1 2 3\n", 4, {0, 1, 2}, {0, 3}, "1 polylines"}},
+            {"faces and polylines", {".obj", square + "l 1 2\nf 1 2 3\n", 4, {0, 1, 2}, {0, 3}, "a mesh has none: 1"}},
             {"points only", {".obj", square + "p 1 2\n", 4, {}, {}, "point elements"}},
             {"a list of faces in front",
                 {".ply", plyHead + plyFace + plyPoints + "end_header\r\n3 0 1 2\n\n0 0 0\n1 0 0\n0 1 0", 3, {0, 1, 2},
