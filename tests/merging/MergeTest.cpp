@@ -272,9 +272,11 @@ TEST(Merge, isWholeOrRefusedIfAnEnclosingGroupIsCancelled)
     std::map<Kind, Orvan::Ptr<Object>> const inputs{{Kind::Meshes, PolygonMesh::quads(3).build()},
         {Kind::PointClouds, cloudOf(3)}, {Kind::Strands, makeStrands(Orvan::Array<float3>(4), {0, 4})}};
     Object const before = *cloudOf(1);
-    for (auto const& [kind, input] : inputs) {
+    for (auto const& entry : inputs) {
+        Kind const kind = entry.first;
+        Inputs const twice = inputsOf(entry.second, entry.second);
         Object expected = before;
-        EXPECT_TRUE(merge(kind, inputsOf(input, input), expected));
+        EXPECT_TRUE(merge(kind, twice, expected));
         Object const refused = kind == Kind::Meshes ? Object() : before;
         bool isReached = true;
         for (int number = 1; isReached; ++number) {
@@ -285,8 +287,7 @@ TEST(Merge, isWholeOrRefusedIfAnEnclosingGroupIsCancelled)
                 tbb::task_group group;
                 group.run_and_wait([&] {
                     isReached = runDuringAllocation(
-                        number, [&] { group.cancel(); },
-                        [&] { isMerged = merge(kind, inputsOf(input, input), output); });
+                        number, [&] { group.cancel(); }, [&] { isMerged = merge(kind, twice, output); });
                 });
             });
             EXPECT_TRUE(sameContents(output, isMerged ? expected : refused));
