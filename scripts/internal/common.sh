@@ -49,4 +49,5 @@ build_preset() {
 
 build_packages=(g++ cmake ninja-build git ca-certificates libtbb-dev)
 program_packages=(libcli11-dev libfmt-dev nlohmann-json3-dev libopenvdb-dev libboost-dev)
-test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev clang-format)
+test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev)
+check_packages=(clang clang-format clang-tidy)
