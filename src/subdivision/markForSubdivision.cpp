@@ -25,7 +25,7 @@ void markForSubdivision(float tolerance, unsigned int numFaces, Orvan::Array<flo
     parallelFor(tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [=](auto const& faces) {
         for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
             unsigned int const* const c = corner + offset[face];
-            if (isBoxLonger(position[c[0]], position[c[1]], position[c[2]], everyLane(tolerance + tolerance)))
+            if (isBoxLonger(position[c[0]], position[c[1]], position[c[2]], broadcast(tolerance + tolerance)))
                 mark[face] = true;
         }
     });

@@ -69,7 +69,7 @@ namespace {
         parallelFor(tbb::blocked_range<unsigned int>(0, faceCount, kFaceGrain), [=](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
                 unsigned int const* const c = corner + offset[face];
-                if (Internal::isBoxLonger(position[c[0]], position[c[1]], position[c[2]], everyLane(limit[c[1]])))
+                if (Internal::isBoxLonger(position[c[0]], position[c[1]], position[c[2]], broadcast(limit[c[1]])))
                     mark[face] = true;
             }
         });
