@@ -2,6 +2,7 @@
 
 #include "faceSize.h"
 
+#include "frame/Assert.h"
 #include "frame/ParallelFor.h"
 
 #include <limits>
@@ -15,6 +16,7 @@ void markForSubdivision(float tolerance, unsigned int numFaces, Orvan::Array<flo
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<bool>& marks)
 {
+    MODELING_ASSERT(marks.size >= numFaces);
     if (!(tolerance > std::numeric_limits<float>::epsilon()))
         return;
     float3 const* const position = positions.data;

@@ -1,5 +1,7 @@
 #include "haloCache.h"
 
+#include "frame/Assert.h"
+
 namespace TSR::TileTree3D::Internal {
 
 namespace {
@@ -46,6 +48,7 @@ namespace {
 template <class Traits> void fillHalo(
     LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, PositiveHalo<Traits>& halo)
 {
+    MODELING_ASSERT(tile.valid && tile.depth < Traits::kDepthCount);
     if (!drawsOnParent(state, tile)) {
         setHaloTile<Traits>(tile, nullptr, *state.channel, PositiveHalo<Traits>(), 2, state.neighbors, halo);
         return;
@@ -58,6 +61,7 @@ template <class Traits> void fillHalo(
 template <class Traits> void fillHalo(
     LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, FullHalo<Traits>& halo)
 {
+    MODELING_ASSERT(tile.valid && tile.depth < Traits::kDepthCount);
     auto const own = state.channel->tileData(tile.treeIndex());
     if (!own) {
         halo.clear();

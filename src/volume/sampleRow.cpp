@@ -4,6 +4,8 @@
 #include "haloCache.h"
 #include "interpolate.h"
 
+#include "frame/Assert.h"
+
 #include <algorithm>
 #include <cmath>
 #include <memory>
@@ -150,6 +152,7 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
     float3 const* points, std::size_t count, float* values)
 {
     constexpr int kSide = Traits::kSide;
+    MODELING_ASSERT(count <= PointRow::kCapacity && count % 4 == 0 && fitsRows<Traits>(settings));
     PointRow row;
     bool const areNear = placePoints(points, count,
         {settings.scale, static_cast<float>(Traits::tileWidth(settings.depth)), Traits::voxelsPerUnit(settings.depth),
@@ -162,6 +165,8 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
     if (!isPadded)
         findLayers(count, isPositive ? -kLargestOffset : 1, kSide - 1, row);
     std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
+    MODELING_ASSERT(std::none_of(row.values, row.values + runCount, [](float const* v) { return v == nullptr; }));
+    MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);
     int const padded = kSide + (isPositive ? 1 : 2);
     TileArrays const arrays{{isPadded ? padded : kSide, padded}, isPositive ? 0 : -1, kSide - 1};
     if (isPadded && largestCoordinate(settings.voxelOffset) <= 0)
