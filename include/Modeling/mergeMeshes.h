@@ -18,9 +18,9 @@ namespace Tessara::GeometryAlgorithms {
 ///
 /// A range property is merged together with the data that targets it in the first input that has both; data that only
 /// later inputs have is dropped. The data of each input is trimmed to its shortest array, and its indices are rebased
-/// to where its data begins. So is `kInvalidIndex`, which then is an ordinary index. Index arrays that are longer than
-/// their component overrun into the elements of the next input unless that has indices of its own; those that are
-/// shorter leave zeros. Elements of inputs without the range get the index of a default after all data; data of
+/// to where its data begins. So is `kInvalidIndex`, which then is an ordinary index. An index array that is longer than
+/// its component overruns into the elements of later inputs whose own index array is too short; elements that get no
+/// index at all get 0. Elements of inputs without the range get the index of a default after all data; data of
 /// `GeometryType`, `GeoLocation`, `FaceEdge` and `GraphTransforms` has no such default, so that these indices lead past
 /// its end.
 ///

@@ -88,8 +88,8 @@ namespace {
         });
     }
 
-    /// Whether the array may not be edited in place: a reference to it, or to the property that holds it, is held
-    /// outside of the object.
+    /// Whether the array, or the property that holds it, has references outside the object, which would see an edit in
+    /// place.
     /// \param localReferences  References to the array in the caller's variables.
     template <class T> bool isShared(Object const& object, Orvan::String const& key,
         Orvan::Ptr<Orvan::Array<T>> const& array, std::uint64_t localReferences)

@@ -23,10 +23,11 @@ namespace {
         Index const* const index = indices.data;
         // Several threads may mark the same point, and all of them store the same value.
         parallelFor(tbb::blocked_range<std::size_t>(0, indices.size, kScatterGrain), [=](auto const& range) {
-            for (std::size_t i = range.begin(); i != range.end(); ++i)
-                if (auto const point = static_cast<std::uint64_t>(index[i]);
-                    point < pointCount) // negative indices become large
+            for (std::size_t i = range.begin(); i != range.end(); ++i) {
+                auto const point = static_cast<std::uint64_t>(index[i]); // negative indices become large
+                if (point < pointCount)
                     std::atomic_ref<bool>(mark[point]).store(true, std::memory_order_relaxed);
+            }
         });
         return marks;
     }

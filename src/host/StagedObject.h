@@ -13,8 +13,8 @@ public:
 
     Tessara::Object& operator*() const { return *copy_; }
 
-    /// Gives the target all keys of the copy. Keys that were erased from the copy stay in the target.
-    /// \throws std::bad_alloc  with the target as it was
+    /// Gives the target all keys of the copy. Keys that were erased from the copy are kept.
+    /// \throws std::bad_alloc  with the target unchanged
     void publish() const;
 
 private:

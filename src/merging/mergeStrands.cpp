@@ -27,7 +27,7 @@ namespace {
         Orvan::MutablePtr<Object> strands = createObject();
     };
 
-    /// Merges the components concurrently.
+    /// Merges the components concurrently, with strands rebased to the merged points.
     /// \return  False if an enclosing task group was cancelled.
     bool mergeComponents(MergePlan const& plan, Offsets const& pointOffsets, Offsets const& strandOffsets,
         MergedStrands& merged, Object& output)
