@@ -1,6 +1,7 @@
 #include "CommandLine.h"
 
 #include "Failure.h"
+#include "Report.h"
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
@@ -11,6 +12,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
+#include <sstream>
 #include <type_traits>
 
 namespace ModelingProgram {
@@ -24,6 +26,26 @@ namespace {
         char* end = nullptr;
         double const number = std::strtod(text.c_str(), &end);
         return !text.empty() && end == text.c_str() + text.size() ? number : std::nan("");
+    }
+
+    /// The bytes in "1.5GB" or "2 MiB", or nullopt if the text is no such amount or less than one byte.
+    std::optional<std::uint64_t> bytesIn(std::string const& text)
+    {
+        constexpr std::string_view kPrefixes = "kmgtpe";
+        std::size_t const unitStart = std::min(text.find_first_not_of("0123456789."), text.size());
+        double bytes = numberIn(text.substr(0, unitStart));
+        std::string unit = CLI::detail::to_lower(CLI::detail::trim_copy(text.substr(unitStart)));
+        if (unit.ends_with('b'))
+            unit.pop_back();
+        double const base = unit.size() == 2 && unit[1] == 'i' ? 1024 : 1000;
+        if (!unit.empty()) {
+            std::size_t const power = kPrefixes.find(unit[0]);
+            if (power == std::string_view::npos || unit.substr(1) != (base == 1000 ? "" : "i"))
+                return std::nullopt;
+            bytes *= std::pow(base, static_cast<double>(power + 1));
+        }
+        constexpr double kMost = 1e19;
+        return bytes >= 1 && bytes <= kMost ? std::optional(static_cast<std::uint64_t>(bytes)) : std::nullopt;
     }
 
     template <class T> struct ValueOf {
@@ -215,20 +237,44 @@ namespace {
         return error.what();
     }
 
-    /// The arguments in their order without the name of the program, or nothing if one is empty. No name and no number is
-    /// empty: scripts pass such an argument when a variable is not set, and the program must not take it for a default.
-    std::optional<std::vector<std::string>> argumentsOf(int count, char const* const* arguments)
+    /// Replaces an empty argument, which the parser would drop or take for a missing value.
+    constexpr char kEmpty[] = "\x01";
+
+    struct Arguments {
+        std::vector<std::string> texts;
+        int firstEmpty = 0; // its position, counted from 1; 0 if none is empty
+    };
+
+    /// The arguments in their order, without the name of the program.
+    Arguments argumentsOf(int count, char const* const* arguments)
     {
-        std::vector<std::string> result;
+        Arguments result;
         for (int i = 1; i < count; ++i) {
             std::string argument = arguments[i];
-            if (argument.empty() || (argument.starts_with("--") && argument.ends_with('=')))
-                return std::nullopt;
+            if (argument.empty() || (argument.starts_with("--") && argument.ends_with('='))) {
+                argument += kEmpty;
+                result.firstEmpty = result.firstEmpty == 0 ? i : result.firstEmpty;
+            }
             if (argument.starts_with("-.") && !std::isnan(numberIn(argument)))
                 argument.insert(1, "0"); // the parser takes -.5 for an option, but not -0.5
-            result.push_back(std::move(argument));
+            result.texts.push_back(std::move(argument));
         }
         return result;
+    }
+
+    /// Scripts pass an empty argument when a variable is not set. It is never a valid name or number, so it is refused
+    /// rather than taken for a default.
+    /// \param program  after parsing, whether or not that succeeded
+    std::string describeEmpty(int position, CLI::App const& program)
+    {
+        for (CLI::App const* command : program.get_subcommands())
+            for (CLI::Option const* option : optionsOf(*command))
+                for (std::string const& value : option->results())
+                    if (value == kEmpty)
+                        return fmt::format("the {} is empty",
+                            option->nonpositional() ? "value of " + option->get_name(false, false)
+                                                    : "argument " + option->get_name(true, false));
+        return fmt::format("argument {} is empty", position);
     }
 
     /// A text in lines of at most that width, behind one another and each but the first one indented.
@@ -261,6 +307,17 @@ namespace {
             text.remove_prefix(std::min(end + 2, text.size()));
         }
         return result;
+    }
+
+    /// Prints the help or the version, which the parser reports as an error. \return the exit code
+    int printHelp(CLI::App const& program, CLI::ParseError const& error)
+    {
+        std::ostringstream text;
+        program.exit(error, text, text);
+        if (writeToStandardOutput(text.str()))
+            return static_cast<int>(ExitCode::Done);
+        std::fprintf(stderr, "%s: %s\n", program.get_name().c_str(), kCannotWriteOutput);
+        return static_cast<int>(ExitCode::File);
     }
 
     /// Keeps the help within the width of a terminal.
@@ -368,13 +425,13 @@ Option& Option::bytes()
 {
     option_->transform(CLI::Validator(
         [](std::string& text) {
-            std::string const given = text;
-            try {
-                if (CLI::AsSizeValue(true)(text).empty() && faultIn<std::uint64_t>(text).empty())
-                    return std::string();
-            } catch (CLI::ValidationError const&) { // an unknown unit
-            }
-            return given + " is not a number of bytes, such as 500MB or 4GB";
+            std::optional<std::uint64_t> const bytes = bytesIn(text);
+            if (!bytes)
+                return text
+                    + " is not an amount of memory: a number above 0, in bytes or with a unit, such as 500MB, 1.5GB or "
+                      "2GiB";
+            text = std::to_string(*bytes);
+            return std::string();
         },
         ""));
     return *this;
@@ -405,9 +462,9 @@ template Option Command::addOption(char const*, std::vector<double>&, std::strin
 template Option Command::addOption(char const*, std::vector<float>&, std::string const&);
 template Option Command::addOption(char const*, std::vector<std::filesystem::path>&, std::string const&);
 
-void Command::addFlag(char const* names, bool& isSet, char const* description)
+Option Command::addFlag(char const* names, bool& isSet, char const* description)
 {
-    app_->add_flag(names, isSet, description);
+    return Option(*app_->add_flag(names, isSet, description));
 }
 
 Command Command::addChoice(char const* title, std::string const& description)
@@ -444,18 +501,20 @@ Command CommandLine::addCommand(CommandHelp const& help)
 
 std::optional<int> CommandLine::parse(int argumentCount, char const* const* arguments)
 {
-    std::string mistake = "an argument is empty";
-    if (auto given = argumentsOf(argumentCount, arguments)) {
-        std::reverse(given->begin(), given->end()); // as the parser takes them
-        try {
-            app_->parse(std::move(*given));
+    std::string mistake;
+    Arguments given = argumentsOf(argumentCount, arguments);
+    std::reverse(given.texts.begin(), given.texts.end()); // as the parser takes them
+    try {
+        app_->parse(std::move(given.texts));
+        if (given.firstEmpty == 0)
             return std::nullopt;
-        } catch (CLI::ParseError const& error) {
-            if (error.get_exit_code() == 0)
-                return app_->exit(error);
-            mistake = describeMistake(error, *app_);
-        }
+    } catch (CLI::ParseError const& error) {
+        if (given.firstEmpty == 0 && error.get_exit_code() == 0)
+            return printHelp(*app_, error);
+        mistake = describeMistake(error, *app_);
     }
+    if (given.firstEmpty != 0)
+        mistake = describeEmpty(given.firstEmpty, *app_);
     std::vector<CLI::App*> const commands = app_->get_subcommands();
     std::string const help = app_->get_name() + (commands.empty() ? "" : " " + commands[0]->get_name()) + " --help";
     std::fprintf(

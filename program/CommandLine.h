@@ -42,7 +42,7 @@ public:
     /// A number above 0 that single precision can hold.
     Option& positive();
     Option& oneOf(std::vector<std::string> const& texts);
-    /// A count of bytes that may have a unit: 500MB, 4GB.
+    /// A positive number of bytes, optionally decimal and with a unit: 500MB, 1.5GB.
     Option& bytes();
 
 private:
@@ -61,7 +61,7 @@ public:
 
     /// \tparam T  a type that is instantiated in CommandLine.cpp
     template <class T> Option addOption(char const* name, T& value, std::string const& description);
-    void addFlag(char const* names, bool& isSet, char const* description);
+    Option addFlag(char const* names, bool& isSet, char const* description);
     /// Options of which exactly one has to be given.
     Command addChoice(char const* title, std::string const& description);
 

@@ -29,12 +29,12 @@ namespace {
         throw Failure(ExitCode::Refused, sentence);
     }
 
-    std::string listOf(std::vector<VdbGrid> const& grids)
+    std::string namesOf(std::vector<VdbGrid> const& grids)
     {
         std::vector<std::string> texts;
         for (VdbGrid const& grid : grids)
             texts.push_back(fmt::format("\"{}\" ({})", grid.name, grid.type));
-        return texts.empty() ? "none" : fmt::format("{}", fmt::join(texts, ", "));
+        return listOf(texts);
     }
 
     std::size_t chooseGrid(GuideOptions const& options, std::vector<VdbGrid> const& grids)
@@ -44,17 +44,17 @@ namespace {
             auto const only = std::find_if(grids.begin(), grids.end(), isFloat);
             if (std::count_if(grids.begin(), grids.end(), isFloat) != 1)
                 refuse(fmt::format("--grid has to say which float grid of {} to take. There are: {}",
-                    options.file.string(), listOf(grids)));
+                    options.file.string(), namesOf(grids)));
             return static_cast<std::size_t>(only - grids.begin());
         }
         auto const named =
             std::find_if(grids.begin(), grids.end(), [&](VdbGrid const& grid) { return grid.name == options.grid; });
         if (named == grids.end())
             refuse(fmt::format(
-                "there is no grid \"{}\" in {}. There are: {}", options.grid, options.file.string(), listOf(grids)));
+                "there is no grid \"{}\" in {}. There are: {}", options.grid, options.file.string(), namesOf(grids)));
         if (!isFloat(*named))
             refuse(fmt::format("grid \"{}\" in {} is a {} grid, and a float grid is needed. There are: {}",
-                options.grid, options.file.string(), named->type, listOf(grids)));
+                options.grid, options.file.string(), named->type, namesOf(grids)));
         return static_cast<std::size_t>(named - grids.begin());
     }
 

@@ -10,6 +10,7 @@
 
 #include <fmt/format.h>
 
+#include <optional>
 #include <type_traits>
 
 namespace ModelingProgram {
@@ -121,22 +122,34 @@ void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topol
             std::move(reasons));
 }
 
-std::vector<float> pointNumbers(Tessara::Object const& mesh, std::string const& name, std::filesystem::path const& file)
+std::vector<float> pointNumbers(
+    char const* option, std::string const& name, Tessara::Object const& mesh, std::filesystem::path const& file)
 {
     using namespace Tessara::Geometry;
-    std::vector<float> numbers;
-    Orvan::Ptr<Tessara::Object> const property = getDataGeoProperty(mesh, name.c_str());
-    if (property && getGeoPropTargetName(mesh, name.c_str()) == sPointComp)
-        visitArray(property->getProperty(sData), [&]<class T>(Orvan::Array<T> const& values, auto) {
-            if constexpr (std::is_arithmetic_v<T>)
-                for (T const value : values)
-                    numbers.push_back(static_cast<float>(value));
-        });
-    if (numbers.size() != arraysOf(mesh).pointCount())
-        throw Failure(ExitCode::Refused,
-            fmt::format("\"{}\" is to be an attribute with one number for each point, which {} does not hold", name,
-                file.string()));
-    return numbers;
+    unsigned int const pointCount = arraysOf(mesh).pointCount();
+    auto const visitNumbers = [&](std::string const& property, auto const& visit) {
+        auto const data = getDataGeoProperty(mesh, property.c_str());
+        if (data && getGeoPropTargetName(mesh, property.c_str()) == sPointComp)
+            visitArray(data->getProperty(sData), [&]<class T>(Orvan::Array<T> const& values, auto) {
+                if constexpr (std::is_arithmetic_v<T>)
+                    if (values.size == pointCount)
+                        visit(values);
+            });
+    };
+    std::optional<std::vector<float>> numbers;
+    visitNumbers(name, [&](auto const& values) {
+        numbers.emplace();
+        for (auto const value : values)
+            numbers->push_back(static_cast<float>(value));
+    });
+    if (numbers || pointCount == 0)
+        return std::move(numbers).value_or(std::vector<float>());
+    std::vector<std::string> present;
+    for (Property const& property : propertiesOf(mesh))
+        visitNumbers(property.name, [&](auto const&) { present.push_back(property.name); });
+    throw Failure(ExitCode::Refused,
+        fmt::format("{}: {} has no attribute \"{}\" with one number per point. There are: {}", option, file.string(),
+            name, listOf(present)));
 }
 
 }

@@ -25,8 +25,10 @@ void requireMesh(Tessara::Object& object, char const* command, std::filesystem::
 void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
     std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file);
 
-/// A number for each point, from a property of any scalar type. Refuses a mesh that does not have it.
+/// One number per point, from a property of any scalar type. Refuses a mesh without this property, and names those that
+/// it has.
+/// \param option  which asks for the property; begins the message
 std::vector<float> pointNumbers(
-    Tessara::Object const& mesh, std::string const& name, std::filesystem::path const& file);
+    char const* option, std::string const& name, Tessara::Object const& mesh, std::filesystem::path const& file);
 
 }

@@ -216,9 +216,6 @@ void reportOperation(
     document["droppedProperties"] = droppedProperties;
 
     report.text += formatValues({{"before", before}, {"after", after}});
-    auto const listOf = [](std::vector<std::string> const& names) {
-        return names.empty() ? "none" : fmt::format("{}", fmt::join(names, ", "));
-    };
     std::vector<std::vector<std::string>> rows;
     if (document.contains("keptProperties"))
         rows.push_back({"kept properties", listOf(document["keptProperties"])});

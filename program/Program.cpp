@@ -40,11 +40,6 @@ Exit codes:
 
     constexpr char kOutOfMemory[] = "there is not enough memory for this";
 
-    bool writeToStandardOutput(std::string const& text)
-    {
-        return std::fwrite(text.data(), 1, text.size(), stdout) == text.size() && std::fflush(stdout) == 0;
-    }
-
     /// For use where an exception is being handled.
     Failure currentFailure()
     {
@@ -70,7 +65,8 @@ Exit codes:
         if (asJson) {
             report.document["exitCode"] = static_cast<int>(failure.code);
             report.document["error"] = {{"message", failure.what()}, {"reasons", failure.reasons}};
-            writeToStandardOutput(toText(report.document) + "\n"); // where that fails there is a failure already
+            // If this fails too, the exit code already reports a failure.
+            [[maybe_unused]] bool const isWritten = writeToStandardOutput(toText(report.document) + "\n");
         }
         return static_cast<int>(failure.code);
     }
@@ -91,7 +87,7 @@ Exit codes:
             if (report.document.contains("center"))
                 report.text += centerOf(report.reading) + "\n";
             if (!writeToStandardOutput(invocation.asJson ? toText(report.document) + "\n" : report.text))
-                throw Failure(ExitCode::File, "cannot write to standard output");
+                throw Failure(ExitCode::File, kCannotWriteOutput);
             return 0;
         } catch (...) {
             return reportFailure(currentFailure(), invocation.asJson, report);
@@ -120,12 +116,13 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
     command.addFlag("--lenient", invocation.reading.isLenient,
         "Leave out what is broken in files, with a warning: points that are NaN, the faces at them, faces with fewer "
         "than three corners, bytes at the end");
-    command.addFlag("--center", invocation.reading.isCentered,
-        "Subtract a rounded center from all positions, in double precision, and tell it");
-    command.addOption("--center-at", invocation.center, "Subtract this place instead")
+    Option const center = command.addFlag("--center", invocation.reading.isCentered,
+        "Subtract a rounded center from all positions, in double precision, and print it");
+    command.addOption("--center-at", invocation.center, "Subtract this point instead")
         .synopsis("X Y Z")
         .values(3)
-        .between(-1e18, 1e18);
+        .between(-1e18, 1e18)
+        .excludes(center);
     return command;
 }
 

@@ -75,9 +75,18 @@ std::string toText(Json const& document)
     return document.dump(2, ' ', false, Json::error_handler_t::replace);
 }
 
+bool writeToStandardOutput(std::string const& text)
+{
+    return std::fwrite(text.data(), 1, text.size(), stdout) == text.size() && std::fflush(stdout) == 0;
+}
+
 Json numberOf(float value)
 {
-    return std::isfinite(value) ? Json::parse(fmt::format("{}", value)) : Json();
+    if (!std::isfinite(value))
+        return {};
+    std::string const text = fmt::format("{}", value == 0 ? 0 : value); // without the sign of a negative zero
+    bool const isWhole = text.find_first_of(".e") == std::string::npos;
+    return Json::parse(isWhole ? text + ".0" : text);
 }
 
 std::string groupDigits(std::uint64_t number)
@@ -94,6 +103,11 @@ std::string countOf(std::uint64_t number, std::string_view singular, std::string
         return fmt::format("1 {}", singular);
     return plural.empty() ? fmt::format("{} {}s", groupDigits(number), singular)
                           : fmt::format("{} {}", groupDigits(number), plural);
+}
+
+std::string listOf(std::vector<std::string> const& texts)
+{
+    return texts.empty() ? "none" : fmt::format("{}", fmt::join(texts, ", "));
 }
 
 std::string formatSeconds(double seconds)

@@ -29,12 +29,19 @@ public:
 /// The document as it is printed. Bytes that are no UTF-8 (names in files may hold any) become replacement characters.
 std::string toText(Json const& document);
 
-/// With the fewest digits from which the same number is read; null where it is not finite.
+/// Returns false if the text could not be written completely.
+[[nodiscard]] bool writeToStandardOutput(std::string const& text);
+inline constexpr char kCannotWriteOutput[] = "cannot write to standard output";
+
+/// A decimal number with the fewest digits from which the same float is read, "64.0" included: a table shows whole JSON
+/// numbers as counts. Null if the value is not finite.
 Json numberOf(float value);
 /// 1234567 as "1,234,567".
 std::string groupDigits(std::uint64_t number);
 /// "1 edge", "1,234 edges".
 std::string countOf(std::uint64_t number, std::string_view singular, std::string_view plural = {});
+/// "a, b, c", or "none".
+std::string listOf(std::vector<std::string> const& texts);
 /// "80 µs", "1.25 ms", "3.10 s", "2.5 min".
 std::string formatSeconds(double seconds);
 /// "512 bytes", "8.1 MB", "2.0 GB".

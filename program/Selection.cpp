@@ -92,7 +92,7 @@ namespace {
         throw Failure(ExitCode::Refused,
             fmt::format(
                 "--attribute {} picks nothing: that is no boolean or integer attribute of the {}. These have: {}", name,
-                elements.plural, there.empty() ? "none" : fmt::format("{}", fmt::join(there, ", "))));
+                elements.plural, listOf(there)));
     }
 
 }

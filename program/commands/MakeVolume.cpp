@@ -63,7 +63,7 @@ namespace {
             value.distanceTo = {options.distanceTo[0], options.distanceTo[1], options.distanceTo[2]};
             return value;
         }
-        value.pointNumbers = pointNumbers(mesh, options.attribute, options.in);
+        value.pointNumbers = pointNumbers("--attribute", options.attribute, mesh, options.in);
         if (!std::all_of(
                 value.pointNumbers.begin(), value.pointNumbers.end(), [](float n) { return std::isfinite(n); }))
             throw Failure(ExitCode::Refused, fmt::format("the values of \"{}\" are not all finite", options.attribute));

@@ -50,13 +50,13 @@ namespace {
         MeshArrays const arrays = arraysOf(mesh);
         auto weights = std::make_unique<Orvan::Array<float>>(arrays.pointCount(), 1.0f);
         if (!options.weights.empty()) {
-            std::vector<float> const numbers = pointNumbers(mesh, options.weights, options.in);
+            std::vector<float> const numbers = pointNumbers("--weights", options.weights, mesh, options.in);
             if (!std::all_of(numbers.begin(), numbers.end(), [](float number) { return std::isfinite(number); }))
                 throw Failure(ExitCode::Refused, fmt::format("the weights \"{}\" are not all finite", options.weights));
             std::copy(numbers.begin(), numbers.end(), weights->begin());
         }
         if (!options.pins.empty()) {
-            std::vector<float> const numbers = pointNumbers(mesh, options.pins, options.in);
+            std::vector<float> const numbers = pointNumbers("--pin-attribute", options.pins, mesh, options.in);
             for (std::size_t point = 0; point != numbers.size(); ++point)
                 if (numbers[point] != 0)
                     (*weights)[point] = 0;

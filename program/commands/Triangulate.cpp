@@ -27,8 +27,12 @@ namespace {
         bool isToBeChecked = false;
     };
 
+    constexpr char kSeparators[] = " \t\n\v\f\r,";
+
     void requireChannels(std::string const& channels)
     {
+        if (channels.find_first_not_of(kSeparators) == std::string::npos)
+            throw Failure(ExitCode::CommandLine, "--channels: the list has no entry; \"^*\" keeps no properties");
         TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels.c_str());
         if (!status)
             throw Failure(ExitCode::CommandLine, fmt::format("--channels: {}", status.message().view()));
@@ -43,7 +47,6 @@ namespace {
             if (!property.isStandard && !property.component.empty()
                 && property.component != Tessara::Geometry::sPointComp)
                 names.push_back(property.name);
-        constexpr char kSeparators[] = " \t\n\v\f\r,";
         std::size_t start = channels.find_first_not_of(kSeparators);
         while (start != std::string::npos) {
             std::size_t const end = std::min(channels.find_first_of(kSeparators, start), channels.size());
@@ -59,7 +62,7 @@ namespace {
                     names.begin(), names.end(), [&](std::string const& name) { return parser.accepts(name.c_str()); }))
                 throw Failure(ExitCode::Refused,
                     fmt::format("--channels: no property of faces or corners matches \"{}\". There are: {}", pattern,
-                        names.empty() ? "none" : fmt::format("{}", fmt::join(names, ", "))));
+                        listOf(names)));
         }
     }
 

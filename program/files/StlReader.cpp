@@ -36,9 +36,12 @@ namespace {
         return file.size == declaredSize || (mayBeLonger && file.size > declaredSize && hasZeroByte(file));
     }
 
+    /// Whether the file is text at least up to the first facet. The header of a binary file may begin with "solid" too,
+    /// but the header and the count that follows it hold a zero byte.
     bool beginsAsText(InputFile const& file)
     {
-        return std::string_view(file.bytes.get(), file.size).starts_with("solid");
+        std::string_view const beginning(file.bytes.get(), std::min(file.size, kBytesBeforeTriangles));
+        return beginning.starts_with("solid") && beginning.find('\0') == std::string_view::npos;
     }
 
     [[noreturn]] void refuseDamagedBinary(InputFile const& file)

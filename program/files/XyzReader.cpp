@@ -54,6 +54,8 @@ namespace {
                     + " points and holds " + std::to_string(rowCount_));
             if (headings_.empty() && rowCount_ != 0)
                 columns_ = guessColumns();
+            if (headings_.empty() && columns_.normal != kNone && !traits_[columns_.normal].areUnit)
+                noteDoubtfulNormals();
             addProperties();
             return std::move(builder_).finish("XYZ");
         }
@@ -253,6 +255,16 @@ namespace {
                 columns.normal = beginsWithColor ? 6 : 3;
             }
             return columns;
+        }
+
+        /// Colors of another range than bytes look like normals that are not unit vectors.
+        void noteDoubtfulNormals()
+        {
+            builder_.note("columns " + std::to_string(columns_.normal + 1) + " to "
+                + std::to_string(columns_.normal + 3)
+                + " are read as normals, although some do not have length 1; if they are colors, a heading line (x y z "
+                  "r "
+                  "g b) has to say so");
         }
 
         void addProperties()

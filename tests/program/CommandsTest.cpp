@@ -124,7 +124,9 @@ TEST_F(Commands, SmoothMovesPointsAndPinsThem)
         EXPECT_EQ(at(pinned, {"droppedPoints", "pinnedPoints"}), json({1, 4})) << pins;
         EXPECT_EQ(runForJson("info out.ply")["boundingBox"], json({{"min", {0, 0, 0}}, {"max", {4, 4, 0}}})) << pins;
     }
-    EXPECT_THAT(run("smooth square.ply out.ply --weights heat --drop-isolated").messages, HasSubstr("\"heat\""));
+    EXPECT_THAT(run("smooth square.ply out.ply --weights heat --drop-isolated").messages,
+        HasSubstr(
+            "--weights: square.ply has no attribute \"heat\" with one number per point. There are: locked, soft"));
 }
 
 /// A cube whose sides are cut into n² squares of two triangles each.
@@ -178,8 +180,9 @@ TEST_F(Commands, ShapesThatChangeMuchAreAWarning)
     json const pinned = runForJson("smooth cube.stl out.stl --pin-sharp 30");
     EXPECT_EQ(at(pinned, {"pinnedPoints", "before/volume", "after/volume", "after/area", "after/foldOvers"}),
         json({12 * 3 + 8, 64, 64, 96, 0}));
-    EXPECT_EQ(at(runForJson("delete-faces cube.stl out.stl --box 0 0 0 4 4 0"), {"before/area", "after/area"}),
-        json({96, 80}));
+    std::string const deleteFaces = "delete-faces cube.stl out.stl --box 0 0 0 4 4 0";
+    EXPECT_EQ(at(runForJson(deleteFaces), {"before/area", "after/area"}), json({96, 80}));
+    EXPECT_THAT(run(deleteFaces).output, testing::ContainsRegex("area +96\\.0 +80\\.0\n"));
 }
 
 TEST_F(Commands, TriangulateKeepsWhatTheChannelsChoose)
@@ -405,6 +408,7 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"merge cube.ply spider.obj out.ply --source-attribute normal", 5, "already has a property"},
         {"triangulate lines.obj out.obj", 5, "lines.obj holds a strand set"},
         {"triangulate cube.ply out.obj --channels '* ^'", 2, "--channels: "},
+        {"triangulate cube.ply out.obj --channels ' , '", 2, "--channels: the list has no entry"},
         {"remove-slivers broken.obj out.obj", 3, "broken.obj"},
         {"remove-slivers cylinder.obj out.off", 3, "has to end in .obj, .ply, .stl or .vtp"},
         {"remove-slivers cylinder.obj nowhere/out.obj", 3, "there is no folder nowhere"},
@@ -418,7 +422,9 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
         {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb --grid no", 5, "There are: \"scale\" (float)"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume bunny.obj", 3, "it is no OpenVDB file"},
         {"subdivide bunny.obj out.obj --relative 0.1 --volume tiny.vdb", 5, "times the smallest positive value"},
-        {"make-volume bunny.obj out.vdb --attribute heat", 5, "\"heat\""},
+        {"make-volume bunny.obj out.vdb --attribute heat", 5, "--attribute: bunny.obj has no attribute \"heat\""},
+        {"make-volume seams.ply out.vdb --attribute uv", 5, "with one number per point. There are: none"},
+        {"smooth seams.ply out.ply --pin-attribute nope", 5, "--pin-attribute: seams.ply has no attribute \"nope\""},
         {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --voxel-size 1e-9", 5, "too small"},
         {"delete-points cloud.ply out.stl --indices list", 3, "STL files hold no point clouds"},
         {"delete-faces cube.ply out.stl --indices list", 3, "STL files hold triangles only, and face 0 has 4 corners"},
@@ -441,7 +447,12 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesAlone)
     json const refused = runForJson("remove-slivers cube.ply out.obj");
     EXPECT_EQ(refused["exitCode"], 5);
     EXPECT_EQ(refused["error"]["reasons"].size(), 2);
-    EXPECT_EQ(run("info cylinder.obj", "/dev/full").exitCode, 3);
+    for (char const* const line : {"info cylinder.obj", "info cylinder.obj --json", "smooth cylinder.obj new.obj",
+             "--help", "smooth --help", "--version"}) {
+        Result const result = run(line, "/dev/full");
+        EXPECT_EQ(result.exitCode, 3) << line;
+        EXPECT_THAT(result.messages, HasSubstr("modeling: cannot write to standard output\n")) << line;
+    }
 }
 
 TEST_F(Commands, FilesAreReplacedOnlyWithForce)

@@ -25,10 +25,10 @@ inline GeometryFile readContent(std::string const& extension, std::string_view c
 }
 
 /// What is said about a file behind its name; empty where it is read.
-inline std::string refusalOf(std::string const& extension, std::string_view content)
+inline std::string refusalOf(std::string const& extension, std::string_view content, ReadOptions const& options = {})
 {
     try {
-        readContent(extension, content);
+        readContent(extension, content, options);
     } catch (FileError const& error) {
         std::string const name = "file" + extension;
         std::string const text = error.what();

@@ -4,7 +4,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    using testing::AllOf, testing::ElementsAre, testing::HasSubstr, testing::StartsWith;
+    using testing::AllOf, testing::ElementsAre, testing::HasSubstr, testing::IsEmpty, testing::StartsWith;
     using Indices = std::vector<unsigned int>;
 
     TEST(ReadGeometryFile, takesWhatFormatsAllow)
@@ -218,6 +218,13 @@ namespace {
         }
         EXPECT_THAT(
             readContent(".xyz", "1 2 3 4 5 6 7\n").notes, ElementsAre(HasSubstr("a heading line would decide")));
+        for (auto const& [row, isDoubtful] : {std::pair{"1 2 3 256 0 7", true}, {"1 2 3 60000 40000 100", true},
+                 {"1 2 3 0.5 0.5 0", true}, {"1 2 3 0.6 0 -0.8", false}, {"1 2 3 255 0 7", false}})
+            EXPECT_THAT(readContent(".xyz", row).notes,
+                testing::Conditional(
+                    isDoubtful, ElementsAre(HasSubstr("columns 4 to 6 are read as normals")), IsEmpty()))
+                << row;
+        EXPECT_THAT(readContent(".xyz", "x y z nx ny nz\n1 2 3 9 9 9\n").notes, IsEmpty());
         EXPECT_THAT(readContent(".xyz", "a b c\n1 2 3\n").notes, ElementsAre(HasSubstr("does not name columns x")));
         EXPECT_EQ(valuesOf<double>(*readContent(".xyz", "x y z t\n0 0 0 123456789.125\n").object, "t"),
             std::vector<double>{123456789.125});
@@ -438,6 +445,9 @@ namespace {
             valuesOf<unsigned int>(*file.object, sFaceVertex), (std::vector<unsigned int>{0u, 1u, 2u, 0u, 1u, 3u}));
         EXPECT_EQ(valuesOf<unsigned short>(*file.object, "attribute"), (std::vector<unsigned short>{0, 1}));
         EXPECT_THAT(refusalOf(".stl", content.substr(1)), HasSubstr("damaged"));
+        for (bool const isLenient : {false, true})
+            EXPECT_THAT(refusalOf(".stl", content.substr(0, content.size() - 1), {.isLenient = isLenient}),
+                HasSubstr("the file is cut off or damaged: 2 triangles take 184 bytes, but it has 183"));
     }
 
 }
