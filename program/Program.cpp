@@ -1,10 +1,10 @@
 #include "Program.h"
 
-#include "Cancellation.h"
-#include "Commands.h"
-#include "Failure.h"
-#include "Operation.h"
+#include "commands/Commands.h"
+#include "commands/Operation.h"
 #include "files/GeometryFile.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
 
 #include <fmt/format.h>
 #include <tbb/global_control.h>

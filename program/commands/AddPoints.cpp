@@ -1,7 +1,7 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Operation.h"
+#include "geometry/Geometry.h"
+#include "shell/Failure.h"
 
 #include <Modeling/addPointsToPointCloud.h>
 #include <TessaraGeometry/Makers.h>

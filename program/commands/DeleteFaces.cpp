@@ -1,11 +1,11 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
 #include "Selection.h"
-#include "Shape.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshArrays.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/Shape.h"
+#include "shell/Failure.h"
 
 #include <Modeling/deleteFaces.h>
 #include <TessaraGeometry/Names.h>

@@ -1,8 +1,8 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Operation.h"
 #include "Selection.h"
+#include "geometry/Geometry.h"
+#include "shell/Failure.h"
 
 #include <Modeling/deletePointsInPointCloud.h>
 #include <TessaraGeometry/Names.h>

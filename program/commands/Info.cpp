@@ -1,8 +1,8 @@
 #include "Commands.h"
-#include "Geometry.h"
-#include "MeshTopology.h"
 #include "Operation.h"
 #include "files/GeometryBuilder.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshTopology.h"
 
 #include <fmt/format.h>
 

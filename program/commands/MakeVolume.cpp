@@ -1,13 +1,14 @@
-#include "Cancellation.h"
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MemoryLimit.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "SurfaceBand.h"
+#include "VolumeReport.h"
 #include "files/VdbFile.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/SurfaceBand.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
+#include "shell/MemoryLimit.h"
 
 #include <fmt/format.h>
 
@@ -49,10 +50,7 @@ namespace {
 
     void requireFiniteSurface(MeshArrays const& mesh, std::filesystem::path const& file)
     {
-        auto const isFinite = [](float3 const& p) {
-            return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
-        };
-        if (!std::all_of(mesh.positions->begin(), mesh.positions->end(), isFinite))
+        if (!std::all_of(mesh.positions->begin(), mesh.positions->end(), [](float3 const& p) { return isFinite(p); }))
             throw Failure(ExitCode::Refused, fmt::format("a coordinate of {} is not finite", file.string()));
     }
 
@@ -113,18 +111,6 @@ namespace {
             throw Failure(ExitCode::Refused, "the values of the volume are too large for single precision");
     }
 
-    void describe(SparseVolume const& volume, Report& report)
-    {
-        auto const [least, most] = rangeOf(volume.voxels);
-        auto const voxelSize = static_cast<float>(volume.voxelSize);
-        report.document["volume"] = {{"grid", volume.name}, {"activeVoxels", volume.activeCount()},
-            {"voxelSize", numberOf(voxelSize)}, {"smallestValue", numberOf(least)}, {"largestValue", numberOf(most)},
-            {"background", numberOf(volume.background)}};
-        report.text += fmt::format("grid \"{}\": {} of size {}, {}background {}\n", volume.name,
-            countOf(volume.activeCount(), "active voxel"), voxelSize,
-            volume.voxels.empty() ? "" : fmt::format("values from {} to {}, ", least, most), volume.background);
-    }
-
     void requireMemory(BandSize const& size, double voxelSize, MemoryLimit const& limit)
     {
         // Beyond what 64 bits hold it is too much in any case.
@@ -155,7 +141,8 @@ namespace {
                 mapValues(*options.from, *options.to, volume.voxels);
             requireFiniteValues(volume);
         });
-        describe(volume, report);
+        auto const [least, most] = rangeOf(volume.voxels);
+        reportVolume(volume, least, most, report);
         stopIfCancelled();
         writeVdbFile(volume, options.out.file, options.out.existing());
         report.document["output"] = options.out.file.string();

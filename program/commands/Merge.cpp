@@ -1,8 +1,8 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Operation.h"
 #include "files/GeometryBuilder.h"
+#include "geometry/Geometry.h"
+#include "shell/Failure.h"
 
 #include <Modeling/mergeMeshes.h>
 #include <Modeling/mergePointClouds.h>

@@ -1,9 +1,9 @@
 #include "Commands.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "Shape.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/Shape.h"
 
 #include <Modeling/removeSlivers.h>
 #include <TessaraGeometry/Elements.h>
@@ -26,8 +26,7 @@ namespace {
     Json describeMesh(Object const& object, MeshTopology const& topology, float ratio)
     {
         Json values = countsOf(object);
-        values["parts"] = topology.partCount;
-        values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
+        addPartsAndGenus(topology, values);
         values["slivers"] = countSlivers(arraysOf(object), ratio);
         return values;
     }

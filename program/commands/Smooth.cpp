@@ -1,10 +1,10 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "Shape.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/Shape.h"
+#include "shell/Failure.h"
 
 #include <Modeling/deleteFaces.h>
 #include <Modeling/smooth.h>
@@ -91,11 +91,6 @@ namespace {
                 ExitCode::Refused, "the isolated points cannot be left out: a range of the points has several data");
     }
 
-    double distance(float3 const& a, float3 const& b)
-    {
-        return std::hypot(double{a.x} - b.x, double{a.y} - b.y, double{a.z} - b.z);
-    }
-
     struct EdgeLengths {
         double mean = 0;
         double spread = 0; // standard deviation as a fraction of the mean
@@ -176,8 +171,7 @@ namespace {
         bool const showsSteps = !*options.asJson && ::isatty(STDOUT_FILENO) == 1;
         runOperation(report, [&] { showsSteps ? run(CoreGL::ConsoleLogger()) : run(CoreGL::NOPLogger()); });
 
-        if (!std::all_of(positions.begin(), positions.end(),
-                [](float3 const& p) { return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z); }))
+        if (!std::all_of(positions.begin(), positions.end(), [](float3 const& p) { return isFinite(p); }))
             throw Failure(ExitCode::Refused, "the coordinates are too large to be smoothed in single precision");
         bool const isMoved = !std::equal(positions.begin(), positions.end(), arrays.positions->begin());
         std::vector<std::string> const dropped = isMoved ? dropNormals(*mesh) : std::vector<std::string>();

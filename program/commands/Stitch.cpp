@@ -1,9 +1,9 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "shell/Failure.h"
 
 #include <Modeling/StitchTemplate.h>
 #include <TessaraGeometry/Makers.h>
@@ -184,11 +184,6 @@ namespace {
         float scale = 0; // the mean length of these faces' edges: one for all, so that raised strand ends meet too
     };
 
-    float distance(float3 const& a, float3 const& b)
-    {
-        return std::hypot(b.x - a.x, b.y - a.y, b.z - a.z);
-    }
-
     /// The normals of the faces around each point, weighted by area; of no particular length.
     Points sumPointNormals(MeshArrays const& mesh)
     {
@@ -207,7 +202,7 @@ namespace {
                 normals[point] = {normals[point].x + sum.x, normals[point].y + sum.y, normals[point].z + sum.z};
         }
         for (float3& normal : normals) {
-            float const length = distance({}, normal);
+            float const length = distanceInFloats({}, normal);
             if (length > 0)
                 normal = {normal.x / length, normal.y / length, normal.z / length};
         }
@@ -224,18 +219,13 @@ namespace {
                 continue;
             target.faces.append(face);
             for (std::size_t i = 0; i != corners.size(); ++i)
-                length += static_cast<double>(distance(
+                length += static_cast<double>(distanceInFloats(
                     (*target.mesh.positions)[corners[i]], (*target.mesh.positions)[corners[(i + 1) % corners.size()]]));
         }
         target.scale = static_cast<float>(length / (static_cast<double>(target.faces.size) * polySize));
         if (withPointNormals)
             target.pointNormals = sumPointNormals(target.mesh);
         return target;
-    }
-
-    bool isFinite(float3 const& v)
-    {
-        return std::isfinite(v.x) && std::isfinite(v.y) && std::isfinite(v.z);
     }
 
     /// Lays all control points on one polygon. \return how many stay in it, as it has no normal there

@@ -1,14 +1,14 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "GuideVolume.h"
-#include "LargeFaces.h"
-#include "MemoryLimit.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "Shape.h"
-#include "Triangulation.h"
+#include "geometry/Geometry.h"
+#include "geometry/LargeFaces.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/Shape.h"
+#include "geometry/Triangulation.h"
+#include "shell/Failure.h"
+#include "shell/MemoryLimit.h"
 
 #include <Modeling/subdivide.h>
 #include <Modeling/subdivisionSteps.h>
@@ -190,14 +190,6 @@ namespace {
         return dropped;
     }
 
-    Json describeMesh(Object const& object, MeshTopology const& topology)
-    {
-        Json values = countsOf(object);
-        values["parts"] = topology.partCount;
-        values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
-        return values;
-    }
-
     void subdivide(Options const& options, MemoryLimit const& limit, Report& report)
     {
         requireWritable(options.out, GeometryType::Mesh);
@@ -221,7 +213,9 @@ namespace {
         std::vector<std::string> const dropped = explainDropped(*mesh, result, report);
         auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
         ShapeChange const change{shape, shapeAfter, largestMove(arraysOf(*mesh), arraysOf(result))};
-        Json before = describeMesh(*mesh, topology), after = describeMesh(result, topologyAfter);
+        Json before = countsOf(*mesh), after = countsOf(result);
+        addPartsAndGenus(topology, before);
+        addPartsAndGenus(topologyAfter, after);
         addShape(change, before, after);
         saveGeometry(result, options.out, report);
         warnOfShape(

@@ -1,10 +1,10 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
 #include "Operation.h"
-#include "Shape.h"
-#include "Triangulation.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/Shape.h"
+#include "geometry/Triangulation.h"
+#include "shell/Failure.h"
 
 #include <TessaraGeometryVolume/ChannelParser.h>
 

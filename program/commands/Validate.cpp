@@ -1,6 +1,6 @@
 #include "Commands.h"
-#include "Geometry.h"
 #include "Operation.h"
+#include "geometry/Geometry.h"
 
 #include <fmt/format.h>
 

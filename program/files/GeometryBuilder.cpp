@@ -12,15 +12,6 @@ using Tessara::Math::float3;
 
 namespace {
 
-    template <class T>
-    Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
-    {
-        Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
-        std::transform(
-            indices.begin(), indices.end(), result.begin(), [&](unsigned int index) { return values[index]; });
-        return result;
-    }
-
     double lossOf(double value)
     {
         return std::abs(value - static_cast<double>(static_cast<float>(value)));

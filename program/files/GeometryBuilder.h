@@ -5,6 +5,7 @@
 #include "UnusableElements.h"
 
 #include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
 
 #include <cmath>
 #include <optional>
@@ -25,6 +26,15 @@ bool isReservedName(std::string_view name);
 /// A data property may hold, beside what the conventions ask for, the names that its components had as columns of a
 /// file, separated by blanks: so it goes back under the same names.
 inline constexpr char const* sColumnNames = "columnNames";
+
+/// The values at these indices; zero for `kInvalidIndex`.
+template <class T> Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
+{
+    Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
+    std::transform(indices.begin(), indices.end(), result.begin(),
+        [&](unsigned int index) { return index == Tessara::Geometry::kInvalidIndex ? T{} : values[index]; });
+    return result;
+}
 
 /// Where the values of a new property lie, to be filled in.
 struct PropertyValues {

@@ -29,10 +29,7 @@ namespace {
 
     Format formatOf(std::filesystem::path const& file)
     {
-        std::string extension = file.extension().string();
-        for (char& c : extension)
-            c = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-        auto const format = formats().find(extension);
+        auto const format = formats().find(lowerCase(file.extension().string()));
         return format == formats().end() ? Format{} : format->second;
     }
 

@@ -14,15 +14,6 @@ namespace {
 
     constexpr float3 kWhite{1, 1, 1};
 
-    template <class T>
-    Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
-    {
-        Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
-        std::transform(indices.begin(), indices.end(), result.begin(),
-            [&](unsigned int index) { return index == kInvalidIndex ? T{} : values[index]; });
-        return result;
-    }
-
     /// Different texts, in the order in which they come.
     class Texts {
     public:

@@ -40,6 +40,14 @@ namespace {
 
 }
 
+std::string lowerCase(std::string_view text)
+{
+    std::string result(text);
+    for (char& c : result)
+        c = lowerCase(c);
+    return result;
+}
+
 InputFile::InputFile(std::filesystem::path const& file)
     : path(file)
 {

@@ -14,6 +14,13 @@
 
 namespace ModelingProgram {
 
+/// Changes the letters A to Z only, whatever the locale.
+inline char lowerCase(char c)
+{
+    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+}
+std::string lowerCase(std::string_view text);
+
 /// The bytes of a file, read at once.
 struct InputFile {
     explicit InputFile(std::filesystem::path const& file);

@@ -155,8 +155,8 @@ namespace {
             if (in.atEnd())
                 in.refuse("the file is cut off inside of a solid");
             std::string_view const next = in.peekWord();
-            return std::equal(next.begin(), next.end(), word.begin(), word.end(),
-                [](char a, char b) { return (a >= 'A' && a <= 'Z' ? a - 'A' + 'a' : a) == b; });
+            return std::equal(
+                next.begin(), next.end(), word.begin(), word.end(), [](char a, char b) { return lowerCase(a) == b; });
         }
 
         static void expectWord(TextScanner& in, std::string_view word)

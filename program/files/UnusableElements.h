@@ -1,19 +1,14 @@
 #pragma once
 
+#include "Vectors.h"
+
 #include <OrvanCore/Array.h>
-#include <TessaraMathSupport/Types.h>
 #include <TessaraObject/Object.h>
 
-#include <cmath>
 #include <string>
 #include <vector>
 
 namespace ModelingProgram {
-
-inline bool isFinite(Tessara::Math::float3 const& p)
-{
-    return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
-}
 
 /// The arrays of geometry as a file holds them. A mesh has faces, a strand set strands, a point cloud neither.
 struct RawGeometry {

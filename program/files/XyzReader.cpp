@@ -28,14 +28,6 @@ namespace {
         return std::find(words.begin(), words.end(), word) != words.end();
     }
 
-    std::string lowerCase(std::string_view text)
-    {
-        std::string result(text);
-        for (char& c : result)
-            c = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-        return result;
-    }
-
     class XyzReader {
     public:
         XyzReader(InputFile const& file, ReadOptions const& options)

@@ -1,7 +1,7 @@
-#include "GuideVolume.h"
+#include "commands/GuideVolume.h"
 
-#include "Failure.h"
 #include "files/VdbFile.h"
+#include "shell/Failure.h"
 
 #include "support/MeshBuilder.h"
 

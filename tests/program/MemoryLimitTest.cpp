@@ -1,9 +1,9 @@
-#include "MemoryLimit.h"
+#include "shell/MemoryLimit.h"
 
-#include "Failure.h"
-#include "GuideVolume.h"
-#include "SurfaceBand.h"
+#include "commands/GuideVolume.h"
 #include "files/VdbFile.h"
+#include "geometry/SurfaceBand.h"
+#include "shell/Failure.h"
 
 #include "support/MeshBuilder.h"
 #include "support/TemporaryFolder.h"

@@ -1,5 +1,5 @@
-#include "MeshTopology.h"
-#include "MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/MeshRequirements.h"
 
 #include "support/MeshBuilder.h"
 

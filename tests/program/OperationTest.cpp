@@ -1,10 +1,10 @@
-#include "Operation.h"
+#include "commands/Operation.h"
 
-#include "Cancellation.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Program.h"
 #include "files/OutputFile.h"
+#include "geometry/Geometry.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
 
 #include "support/Testing.h"
 

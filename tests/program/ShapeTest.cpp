@@ -1,6 +1,6 @@
-#include "Shape.h"
+#include "geometry/Shape.h"
 
-#include "SurfaceTree.h"
+#include "geometry/SurfaceTree.h"
 
 #include "support/MeshBuilder.h"
 #include "support/Threads.h"

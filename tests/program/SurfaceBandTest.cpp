@@ -1,4 +1,4 @@
-#include "SurfaceBand.h"
+#include "geometry/SurfaceBand.h"
 
 #include "support/MeshBuilder.h"
 

@@ -1,8 +1,8 @@
 #pragma once
 
-#include "CommandLine.h"
-#include "MeshTopology.h"
-#include "Report.h"
+#include "geometry/MeshArrays.h"
+#include "shell/CommandLine.h"
+#include "shell/Report.h"
 
 #include <Modeling/VoxelSampler.h>
 #include <TessaraGeometryVolume/VolumeBuilder.h>

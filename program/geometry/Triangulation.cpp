@@ -15,47 +15,22 @@ namespace ModelingProgram {
 
 using namespace Tessara::Geometry;
 using Tessara::Object;
-using Tessara::Math::double3;
-using Tessara::Math::float3;
 using Corners = std::span<unsigned int const>;
 
 namespace {
 
     constexpr double kLossy = 1e-5; // positions in single precision leave differences of about 1e-7
 
-    double3 minus(float3 const& a, float3 const& b)
-    {
-        return {double{a.x} - b.x, double{a.y} - b.y, double{a.z} - b.z};
-    }
-
-    double dot(double3 const& a, double3 const& b)
-    {
-        return a.x * b.x + a.y * b.y + a.z * b.z;
-    }
-
-    /// A vector along the normal, twice as long as the polygon covers.
-    double3 areaOf(Corners corners, float3 const* position)
-    {
-        double3 area{0, 0, 0};
-        for (std::size_t i = 2; i < corners.size(); ++i) {
-            double3 const a = minus(position[corners[i - 1]], position[corners[0]]);
-            double3 const b = minus(position[corners[i]], position[corners[0]]);
-            area = {
-                area.x + (a.y * b.z - a.z * b.y), area.y + (a.z * b.x - a.x * b.z), area.z + (a.x * b.y - a.y * b.x)};
-        }
-        return area;
-    }
-
     /// By how much of the polygon's area that of its triangles differs; 0 for a polygon without area.
     double differenceOf(Corners polygon, Corners triangles, float3 const* position)
     {
-        double3 const whole = areaOf(polygon, position);
+        double3 const whole = areaVector(polygon, position);
         double const squared = dot(whole, whole);
         if (!(squared > 0))
             return 0;
         double covered = 0;
         for (std::size_t corner = 0; corner != triangles.size(); corner += 3)
-            covered += std::abs(dot(areaOf(triangles.subspan(corner, 3), position), whole)) / squared;
+            covered += std::abs(dot(areaVector(triangles.subspan(corner, 3), position), whole)) / squared;
         return std::abs(covered - 1);
     }
 

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "MeshTopology.h"
+#include "MeshArrays.h"
 
 #include <algorithm>
 #include <span>

@@ -1,10 +1,11 @@
 #include "Operation.h"
 
-#include "Cancellation.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshTopology.h"
 #include "files/OutputFile.h"
+#include "files/Scanner.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshArrays.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
 
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Names.h>
@@ -12,7 +13,6 @@
 #include <fmt/format.h>
 
 #include <algorithm>
-#include <cctype>
 #include <chrono>
 #include <cstdlib>
 #include <fstream>
@@ -55,9 +55,7 @@ namespace {
 
     bool hasExtension(Output const& out, std::string_view extension)
     {
-        std::string const own = out.file.extension().string();
-        return std::equal(own.begin(), own.end(), extension.begin(), extension.end(),
-            [](char a, char b) { return std::tolower(static_cast<unsigned char>(a)) == b; });
+        return lowerCase(out.file.extension().string()) == extension;
     }
 
 }
@@ -194,17 +192,6 @@ void saveGeometry(Tessara::Object const& object, Output const& out, Report& repo
     for (std::string const& note : writeGeometryFile(object, out.file, {out.existing(), remark}))
         report.warn(note);
     report.document["output"] = out.file.string();
-}
-
-Json countsOf(Tessara::Object const& object)
-{
-    using namespace Tessara::Geometry;
-    Json counts;
-    for (auto const& [key, component] :
-        {std::pair{"points", sPointComp}, {"corners", sFaceVertexComp}, {"faces", sFaceComp}, {"strands", sStrandComp}})
-        if (object.hasProperty(component))
-            counts[key] = getElementCount(object, component);
-    return counts;
 }
 
 void reportOperation(

@@ -103,10 +103,20 @@ std::optional<BoundingBox> boundingBoxOf(Object const& object)
         return std::nullopt;
     BoundingBox box{(*positions)[0], (*positions)[0]};
     for (float3 const& p : *positions) {
-        box.min = {std::min(box.min.x, p.x), std::min(box.min.y, p.y), std::min(box.min.z, p.z)};
-        box.max = {std::max(box.max.x, p.x), std::max(box.max.y, p.y), std::max(box.max.z, p.z)};
+        box.min = lowerCorner(box.min, p);
+        box.max = upperCorner(box.max, p);
     }
     return box;
+}
+
+Json countsOf(Object const& object)
+{
+    Json counts;
+    for (auto const& [key, component] :
+        {std::pair{"points", sPointComp}, {"corners", sFaceVertexComp}, {"faces", sFaceComp}, {"strands", sStrandComp}})
+        if (object.hasProperty(component))
+            counts[key] = getElementCount(object, component);
+    return counts;
 }
 
 std::vector<Property> propertiesOf(Object const& object)

@@ -1,8 +1,10 @@
 #pragma once
 
+#include "Vectors.h"
+#include "shell/Report.h"
+
 #include <TessaraGeometry/Records.h>
 #include <TessaraGeometry/Validators.h>
-#include <TessaraMathSupport/Types.h>
 #include <TessaraObject/Object.h>
 
 #include <cstdint>
@@ -13,7 +15,6 @@
 namespace ModelingProgram {
 
 using Tessara::Geometry::Common::GeometryType;
-using Tessara::Math::float3;
 
 GeometryType typeOf(Tessara::Object const& object);
 /// "mesh", "strand set", "point cloud", or "object of no known kind".
@@ -33,6 +34,9 @@ struct BoundingBox {
 
 /// Nothing where there are no points.
 std::optional<BoundingBox> boundingBoxOf(Tessara::Object const& object);
+
+/// The numbers of points, corners, faces and strands, as far as the object has such components.
+Json countsOf(Tessara::Object const& object);
 
 struct Property {
     std::string name;

@@ -1,8 +1,8 @@
 #pragma once
 
-#include "Geometry.h"
-#include "Report.h"
 #include "files/GeometryFile.h"
+#include "geometry/Geometry.h"
+#include "shell/Report.h"
 
 #include <TessaraObject/Object.h>
 
@@ -66,9 +66,6 @@ void runOperation(Report& report, std::function<void()> const& operation);
 
 /// Validates the result and writes it.
 void saveGeometry(Tessara::Object const& object, Output const& out, Report& report);
-
-/// The numbers of elements: points, corners, faces, strands.
-Json countsOf(Tessara::Object const& object);
 
 /// Ends the report with a table of the numbers before and after, kept ("keptProperties" of the document, where it is
 /// there) and dropped properties, time and peak memory.

@@ -1,8 +1,8 @@
 #include "SurfaceBand.h"
 
-#include "Cancellation.h"
-#include "Failure.h"
 #include "NearestPlace.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
 
 #include <algorithm>
 #include <array>

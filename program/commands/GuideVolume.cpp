@@ -1,10 +1,12 @@
 #include "GuideVolume.h"
 
-#include "Cancellation.h"
-#include "Failure.h"
-#include "LargeFaces.h"
-#include "MemoryLimit.h"
+#include "VolumeReport.h"
+
 #include "files/VdbFile.h"
+#include "geometry/LargeFaces.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
+#include "shell/MemoryLimit.h"
 
 #include <Modeling/subdivideByVolume.h>
 #include <TessaraGeometry/Elements.h>
@@ -149,15 +151,7 @@ void GuideVolume::describe(SparseVolume& volume, Report& report)
     grid_ = volume.name;
     background_ = volume.background;
     smallestPositive_ = all.leastPositive;
-    auto const voxelSize = static_cast<float>(volume.voxelSize);
-    report.document["volume"] = {{"grid", volume.name}, {"activeVoxels", volume.activeCount()},
-        {"voxelSize", numberOf(voxelSize)}, {"smallestValue", numberOf(active.least)},
-        {"largestValue", numberOf(active.most)}, {"background", numberOf(volume.background)}};
-    report.text += fmt::format(
-        "grid \"{}\": {} of size {}", volume.name, countOf(volume.activeCount(), "active voxel"), voxelSize);
-    if (volume.activeCount() != 0)
-        report.text += fmt::format(", values from {} to {}", active.least, active.most);
-    report.text += fmt::format(", background {}\n", volume.background);
+    reportVolume(volume, active.least, active.most, report);
     warnOfSigns(all, volume.name, report);
 }
 

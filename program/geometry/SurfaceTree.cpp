@@ -27,16 +27,6 @@ namespace {
         });
     }
 
-    float3 lower(float3 const& a, float3 const& b)
-    {
-        return {std::min(a.x, b.x), std::min(a.y, b.y), std::min(a.z, b.z)};
-    }
-
-    float3 upper(float3 const& a, float3 const& b)
-    {
-        return {std::max(a.x, b.x), std::max(a.y, b.y), std::max(a.z, b.z)};
-    }
-
     /// Puts two zeros between the bits of a number of 21 bits.
     std::uint64_t spread(std::uint64_t bits)
     {
@@ -84,7 +74,7 @@ void SurfaceTree::listTriangles()
     }
     Box all{{kInfinity, kInfinity, kInfinity}, {-kInfinity, -kInfinity, -kInfinity}};
     for (float3 const& p : *surface_.positions)
-        all = {lower(all.min, p), upper(all.max, p)};
+        all = {lowerCorner(all.min, p), upperCorner(all.max, p)};
 
     std::vector<std::pair<std::uint64_t, unsigned int>> order(unordered.size());
     parallelFor(0, order.size(), [&](std::size_t i) {
@@ -107,7 +97,8 @@ SurfaceTree::Box SurfaceTree::boxOfLeaf(std::size_t leaf) const
     std::size_t const end = std::min((leaf + 1) * kTrianglesPerLeaf, triangles_.size());
     for (std::size_t i = leaf * kTrianglesPerLeaf; i < end; ++i)
         for (unsigned int const point : triangles_[i])
-            box = {lower(box.min, (*surface_.positions)[point]), upper(box.max, (*surface_.positions)[point])};
+            box = {
+                lowerCorner(box.min, (*surface_.positions)[point]), upperCorner(box.max, (*surface_.positions)[point])};
     return box;
 }
 
@@ -120,7 +111,7 @@ void SurfaceTree::buildBoxes()
     for (std::size_t level = leafCount_ / 2; level != 0; level /= 2)
         parallelFor(level, 2 * level, [&](std::size_t node) {
             Box const &a = boxes_[2 * node], &b = boxes_[2 * node + 1];
-            boxes_[node] = {lower(a.min, b.min), upper(a.max, b.max)};
+            boxes_[node] = {lowerCorner(a.min, b.min), upperCorner(a.max, b.max)};
         });
 }
 

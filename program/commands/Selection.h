@@ -1,7 +1,7 @@
 #pragma once
 
-#include "CommandLine.h"
-#include "Report.h"
+#include "shell/CommandLine.h"
+#include "shell/Report.h"
 
 #include <OrvanCore/Array.h>
 #include <TessaraObject/Object.h>

@@ -1,9 +1,7 @@
 #include "Shape.h"
 
 #include "Geometry.h"
-#include "Operation.h"
 #include "SurfaceTree.h"
-#include "Vectors.h"
 
 #include <fmt/format.h>
 #include <tbb/blocked_range.h>
@@ -63,8 +61,8 @@ namespace {
 
         void add(double3 const& p)
         {
-            min = {std::min(min.x, p.x), std::min(min.y, p.y), std::min(min.z, p.z)};
-            max = {std::max(max.x, p.x), std::max(max.y, p.y), std::max(max.z, p.z)};
+            min = lowerCorner(min, p);
+            max = upperCorner(max, p);
         }
         Extent& operator+=(Extent const& other)
         {
@@ -84,25 +82,12 @@ namespace {
         });
     }
 
-    /// A vector along the normal of a face, twice as long as the face covers.
-    double3 areaVector(MeshArrays const& mesh, unsigned int face)
-    {
-        float3 const* const p = mesh.positions->data;
-        auto const corners = mesh.corners(face);
-        double3 area{0, 0, 0};
-        for (std::size_t i = 2; i < corners.size(); ++i)
-            area = area
-                + cross(inDoubles(p[corners[i - 1]]) - inDoubles(p[corners[0]]),
-                    inDoubles(p[corners[i]]) - inDoubles(p[corners[0]]));
-        return area;
-    }
-
     std::vector<double3> areaVectors(MeshArrays const& mesh)
     {
         std::vector<double3> vectors(mesh.faceCount());
         tbb::parallel_for(tbb::blocked_range<unsigned int>(0, mesh.faceCount(), 1000), [&](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                vectors[face] = areaVector(mesh, face);
+                vectors[face] = areaVector(mesh.corners(face), mesh.positions->data);
         });
         return vectors;
     }

@@ -1,35 +1,15 @@
 #pragma once
 
-#include <OrvanCore/Array.h>
-#include <OrvanCore/Ptr.h>
-#include <TessaraGeometry/Names.h>
-#include <TessaraMathSupport/Types.h>
-#include <TessaraObject/Object.h>
+#include "MeshArrays.h"
+#include "shell/Report.h"
 
+#include <TessaraGeometry/Names.h>
+
+#include <algorithm>
 #include <cstdint>
 #include <optional>
-#include <span>
-#include <vector>
 
 namespace ModelingProgram {
-
-/// The standard arrays of a mesh. They stay as they are while this lives: whoever edits the mesh then edits copies.
-struct MeshArrays {
-    Orvan::Ptr<Orvan::Array<Tessara::Math::float3>> positions;
-    Orvan::Ptr<Orvan::Array<unsigned int>> faceVertex;
-    Orvan::Ptr<Orvan::Array<unsigned int>> faceOffset;
-
-    unsigned int pointCount() const { return static_cast<unsigned int>(positions->size); }
-    unsigned int cornerCount() const { return static_cast<unsigned int>(faceVertex->size); }
-    unsigned int faceCount() const { return static_cast<unsigned int>(faceOffset->size - 1); }
-    std::span<unsigned int const> corners(unsigned int face) const;
-    unsigned int faceOf(unsigned int corner) const;
-    /// The corner after this one in its face.
-    unsigned int nextCorner(unsigned int corner) const;
-};
-
-/// \pre  the mesh is valid
-MeshArrays arraysOf(Tessara::Object const& mesh);
 
 /// How many there are of something, and the lowest one.
 struct Finding {
@@ -78,6 +58,9 @@ class EdgeSides;
 MeshTopology analyseTopology(MeshArrays const& mesh);
 /// The same with the edges of the mesh, for those who need them further.
 MeshTopology analyseTopology(MeshArrays const& mesh, EdgeSides const& edges);
+
+/// Adds the rows "parts" and "genus" to the table of a command.
+void addPartsAndGenus(MeshTopology const& topology, Json& values);
 
 /// The points of no face.
 Finding findIsolatedPoints(MeshArrays const& mesh);

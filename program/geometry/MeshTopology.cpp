@@ -2,14 +2,11 @@
 
 #include "EdgeSides.h"
 
-#include <TessaraGeometry/Makers.h>
-
 #include <tbb/parallel_sort.h>
 
 #include <algorithm>
 #include <array>
 #include <bit>
-#include <cmath>
 #include <limits>
 #include <numeric>
 #include <vector>
@@ -17,7 +14,6 @@
 namespace ModelingProgram {
 
 using Tessara::Geometry::kInvalidIndex;
-using Tessara::Math::float3;
 
 namespace {
 
@@ -158,50 +154,19 @@ namespace {
         topology.partCount -= topology.isolatedPoints.count; // each is a set of its own
     }
 
-    float distance(float3 const& a, float3 const& b)
-    {
-        float3 const d{b.x - a.x, b.y - a.y, b.z - a.z};
-        return std::sqrt((d.x * d.x + d.y * d.y) + d.z * d.z);
-    }
-
     bool isSliver(std::span<unsigned int const> corners, float3 const* position, float ratio)
     {
         float shortest = std::numeric_limits<float>::max();
         float longest = 0;
         for (std::size_t k = 0; k != corners.size(); ++k) {
-            float const edge = distance(position[corners[k]], position[corners[k + 1 == corners.size() ? 0 : k + 1]]);
+            float const edge =
+                edgeLengthInFloats(position[corners[k]], position[corners[k + 1 == corners.size() ? 0 : k + 1]]);
             shortest = std::min(shortest, edge);
             longest = std::max(longest, edge);
         }
         return longest * ratio > shortest;
     }
 
-}
-
-std::span<unsigned int const> MeshArrays::corners(unsigned int face) const
-{
-    unsigned int const first = (*faceOffset)[face];
-    return {faceVertex->data + first, (*faceOffset)[face + 1] - first};
-}
-
-unsigned int MeshArrays::faceOf(unsigned int corner) const
-{
-    // Faces without corners end where they begin; the last face that begins at or before the corner holds it.
-    unsigned int const* const after = std::upper_bound(faceOffset->begin(), faceOffset->end(), corner);
-    return static_cast<unsigned int>(after - faceOffset->begin() - 1);
-}
-
-unsigned int MeshArrays::nextCorner(unsigned int corner) const
-{
-    unsigned int const face = faceOf(corner);
-    return corner + 1 == (*faceOffset)[face + 1] ? (*faceOffset)[face] : corner + 1;
-}
-
-MeshArrays arraysOf(Tessara::Object const& mesh)
-{
-    using namespace Tessara::Geometry;
-    return {dataOf<float3>(mesh, sPointPosition), dataOf<unsigned int>(mesh, sFaceVertex),
-        dataOf<unsigned int>(mesh, sFaceOffset)};
 }
 
 bool MeshTopology::isClosedManifold() const
@@ -231,6 +196,12 @@ MeshTopology analyseTopology(MeshArrays const& mesh, EdgeSides const& edges)
         topology.genus = static_cast<std::int64_t>(topology.partCount) - eulerCharacteristic / 2;
     }
     return topology;
+}
+
+void addPartsAndGenus(MeshTopology const& topology, Json& values)
+{
+    values["parts"] = topology.partCount;
+    values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
 }
 
 Finding findIsolatedPoints(MeshArrays const& mesh)

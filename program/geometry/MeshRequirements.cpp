@@ -1,8 +1,8 @@
 #include "MeshRequirements.h"
 
-#include "Failure.h"
 #include "Geometry.h"
-#include "Report.h"
+#include "shell/Failure.h"
+#include "shell/Report.h"
 
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Elements.h>

@@ -1,9 +1,9 @@
 #include "Selection.h"
 
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshTopology.h"
 #include "files/Scanner.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshArrays.h"
+#include "shell/Failure.h"
 
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Elements.h>

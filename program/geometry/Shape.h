@@ -2,7 +2,7 @@
 
 #include "EdgeSides.h"
 #include "MeshTopology.h"
-#include "Report.h"
+#include "shell/Report.h"
 
 #include <cstdint>
 #include <optional>
