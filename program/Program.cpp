@@ -21,26 +21,26 @@ namespace {
         addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth, addRemoveSlivers, addStitch};
 
     constexpr char kFooter[] =
-        R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply
-.stl .vtp. An existing file is replaced only with --force, also if OUT is IN, and only by a complete
-one; if anything fails it stays as it was. Results go to standard output, messages to standard
-error.
+        R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz; written: .obj .ply
+.stl .vtp. An existing file is replaced only with --force, even if OUT is IN, and only by a complete
+file; if anything fails it stays unchanged. Results are printed to standard output, messages to
+standard error.
 
 Exit codes:
   0  done
-  1  unexpected failure: a fault of the program
+  1  unexpected failure: a bug in the program
   2  the command line is wrong
-  3  a file cannot be read or written
-  4  a file holds geometry that is not valid
+  3  a file or standard output cannot be read or written
+  4  a file contains invalid geometry
   5  the operation refuses its input; the message says why
   6  cancelled by Ctrl-C or SIGTERM; nothing was written
-  7  out of memory, or of what --max-memory allows
+  7  out of memory, or beyond --max-memory
 
-"modeling COMMAND --help" tells about a command.)";
+"modeling COMMAND --help" explains a command.)";
 
-    constexpr char kOutOfMemory[] = "there is not enough memory for this";
+    constexpr char kOutOfMemory[] = "out of memory";
 
-    /// For use where an exception is being handled.
+    /// \pre  an exception is being handled
     Failure currentFailure()
     {
         try {
@@ -111,10 +111,10 @@ Exit codes:
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation)
 {
     Command command = program.addCommand(help);
-    command.addFlag("--json", invocation.asJson, "Print one JSON document in place of text, also on failure");
+    command.addFlag("--json", invocation.asJson, "Print one JSON document instead of text, also on failure");
     command.addOption("--threads", invocation.threads, "Use at most N threads").valueName("N").between(1, 1024);
     command.addFlag("--lenient", invocation.reading.isLenient,
-        "Leave out what is broken in files, with a warning: points that are NaN, the faces at them, faces with fewer "
+        "Leave out broken elements of files, with a warning: points that are NaN, the faces at them, faces with fewer "
         "than three corners, bytes at the end");
     Option const center = command.addFlag("--center", invocation.reading.isCentered,
         "Subtract a rounded center from all positions, in double precision, and print it");
@@ -157,7 +157,7 @@ int runProgram(int argumentCount, char const* const* arguments)
     try {
         return parseAndRun(argumentCount, arguments);
     } catch (std::bad_alloc const&) {
-        // Not even the message could be made.
+        // The message could not be allocated.
         std::fprintf(stderr, "modeling: %s\n", kOutOfMemory);
         return static_cast<int>(ExitCode::OutOfMemory);
     }

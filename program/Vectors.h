@@ -7,7 +7,7 @@
 
 namespace ModelingProgram {
 
-// Vector arithmetic of the program, in double precision unless stated otherwise.
+// Vector arithmetic for all wings of the program, in double precision unless stated otherwise.
 
 using Tessara::Math::double3;
 using Tessara::Math::float3;
@@ -64,7 +64,7 @@ inline double distance(float3 const& a, float3 const& b)
     return std::hypot(double{a.x} - b.x, double{a.y} - b.y, double{a.z} - b.z);
 }
 
-/// In single precision, without overflow in between: patterns of strands are scaled by such lengths.
+/// In single precision, without intermediate overflow.
 inline float distanceInFloats(float3 const& a, float3 const& b)
 {
     return std::hypot(b.x - a.x, b.y - a.y, b.z - a.z);

@@ -11,34 +11,34 @@ namespace ModelingProgram {
 
 struct Output;
 
-/// What the command line asked for.
+/// The command to run, as parsed from the command line.
 struct Invocation {
     std::string command;
     bool asJson = false;
-    unsigned int threads = 0; // at most so many; 0 for as many as there are
+    unsigned int threads = 0; // upper limit; 0 for all
     ReadOptions reading;
-    std::vector<double> center; // three numbers if it is given
+    std::vector<double> center; // three numbers, or empty
     std::function<void(Report&)> run;
 };
 
-/// Adds a command with the options that all have in common.
+/// Adds a command with the options that all commands have.
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation);
 
 enum class Needed { Always, Sometimes };
 
-/// Adds a file that has to be on the command line.
+/// Adds a positional argument that is a file name.
 void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command,
     Needed needed = Needed::Always);
 
-/// Adds OUT, and --force, which allows to replace an existing file.
+/// Adds OUT and --force, which allows replacing an existing file.
 void addOutput(char const* description, Output& out, Command& command, Needed needed = Needed::Always);
-/// The latter alone.
+/// Adds --force only.
 void addForce(Output& out, Command& command);
 
-/// The invocation becomes that of `command` where it is the one on the command line.
+/// Sets the invocation if `command` is the one on the command line.
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);
 
-// Each command is a source in commands/, and is listed in Program.cpp.
+// Each command has its own source here and is listed in Program.cpp.
 void addInfo(CommandLine& program, Invocation& invocation);
 void addValidate(CommandLine& program, Invocation& invocation);
 void addAddPoints(CommandLine& program, Invocation& invocation);

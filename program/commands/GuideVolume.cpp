@@ -45,7 +45,7 @@ namespace {
         if (options.grid.empty()) {
             auto const only = std::find_if(grids.begin(), grids.end(), isFloat);
             if (std::count_if(grids.begin(), grids.end(), isFloat) != 1)
-                refuse(fmt::format("--grid has to say which float grid of {} to take. There are: {}",
+                refuse(fmt::format("--grid has to name one of the float grids of {}. There are: {}",
                     options.file.string(), namesOf(grids)));
             return static_cast<std::size_t>(only - grids.begin());
         }
@@ -55,7 +55,7 @@ namespace {
             refuse(fmt::format(
                 "there is no grid \"{}\" in {}. There are: {}", options.grid, options.file.string(), namesOf(grids)));
         if (!isFloat(*named))
-            refuse(fmt::format("grid \"{}\" in {} is a {} grid, and a float grid is needed. There are: {}",
+            refuse(fmt::format("grid \"{}\" in {} is a {} grid, but a float grid is needed. There are: {}",
                 options.grid, options.file.string(), named->type, namesOf(grids)));
         return static_cast<std::size_t>(named - grids.begin());
     }
@@ -89,30 +89,31 @@ namespace {
         if (all.least > 0)
             return;
         if (!all.leastPositive)
-            report.warn(fmt::format("no value of grid \"{}\" is above 0, so that no face is refined", grid));
+            report.warn(fmt::format("no value of grid \"{}\" is above 0, so no face is refined", grid));
         else
-            report.warn(fmt::format("grid \"{}\" has values above 0 and others, its background included. Faces are "
-                                    "left alone where the value "
-                                    "is not above 0, and get finer and finer towards there. --min-value ends that.",
+            report.warn(fmt::format("grid \"{}\" (or its background) has both values above 0 and others. Faces are not "
+                                    "refined where the value is not above 0, and become ever finer close to there. "
+                                    "--min-value avoids that.",
                 grid));
     }
 
     void requireMemory(VdbGridSize const& size, std::filesystem::path const& file, MemoryLimit const& limit)
     {
-        // OpenVDB's tree is in memory beside the values taken from it, and these beside the library's tiles: each of the
-        // three takes at most as much as the tree, and tiles, which may be cut in other places, at most twice as much.
+        // OpenVDB's tree is in memory together with the values copied from it, and these later together with the
+        // library's tiles. The values need at most as much as the tree, the tiles, which may be aligned differently, at
+        // most twice as much.
         constexpr std::uint64_t kTreesInMemory = 3, kCodecBytes = 32'000'000;
         limit.require(kCodecBytes + kTreesInMemory * size.treeBytes,
             fmt::format("reading {} with {}", file.string(), countOf(size.activeVoxels, "single voxel")),
-            "A volume with larger voxels takes less.");
+            "A volume with larger voxels needs less.");
     }
 
     void shiftIndex(int& index, double by, SparseVolume const& volume)
     {
         double const shifted = index + by;
         if (!(shifted > std::numeric_limits<int>::min() && shifted < std::numeric_limits<int>::max()))
-            refuse(fmt::format(
-                "grid \"{}\" lies {} voxels from the origin, which is more than 32 bits can count", volume.name, by));
+            refuse(fmt::format("grid \"{}\" is {} voxels away from the origin, which is more than 32 bits can count",
+                volume.name, by));
         index = static_cast<int>(shifted);
     }
 
@@ -143,7 +144,7 @@ void GuideVolume::describe(SparseVolume& volume, Report& report)
     bool hasNumbers = !std::isnan(volume.background);
     forEachActiveValue(volume, [&](float value) { hasNumbers = hasNumbers && !std::isnan(value); });
     if (!hasNumbers)
-        refuse(fmt::format("grid \"{}\" has values that are not numbers", volume.name));
+        refuse(fmt::format("grid \"{}\" has values that are NaN", volume.name));
     Range active;
     forEachActiveValue(volume, [&](float value) { active.add(value); });
     Range all = active;
@@ -226,11 +227,11 @@ template <class Visit> void GuideVolume::visitVolume(Visit const& visit) const
         visit(std::get<Volume<Traits5>>(volume_));
 }
 
-void GuideVolume::tellCoverage(MeshArrays const& mesh, Report& report) const
+void GuideVolume::reportCoverage(MeshArrays const& mesh, Report& report) const
 {
     std::uint64_t covered = 0;
     visitVolume([&]<class Traits>(Volume<Traits> const& volume) {
-        // No number stands for places outside all tiles.
+        // NaN marks points outside all tiles.
         LinearSampler<Traits> sampler = samplerOf(volume, std::numeric_limits<float>::quiet_NaN());
         for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
             float3 const& decisive = (*mesh.positions)[mesh.corners(face)[1]];
@@ -238,17 +239,17 @@ void GuideVolume::tellCoverage(MeshArrays const& mesh, Report& report) const
         }
     });
     report.document["volume"]["coveredFaces"] = covered;
-    report.text += fmt::format("{} of {} lie in it\n\n", groupDigits(covered), countOf(mesh.faceCount(), "face"));
+    report.text += fmt::format("{} of {} are inside it\n\n", groupDigits(covered), countOf(mesh.faceCount(), "face"));
     if (covered == 0)
         report.warn(fmt::format(
-            "no face lies in the volume, so that all take the background of grid \"{}\", {}", grid_, background_));
+            "no face is inside the volume, so all faces use the background of grid \"{}\", {}", grid_, background_));
 }
 
 std::uint64_t GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
 {
     using namespace Tessara::Geometry;
-    // The sampler's offset of voxels would read beyond the neighbours of a tile: the mesh moves instead, by at most half a
-    // voxel, and back.
+    // An offset in the sampler would make it read beyond the neighbors of a tile. So the mesh is translated instead, by
+    // at most half a voxel, and back.
     auto const movePoints = [&](float sign) {
         if (shift_.x == 0 && shift_.y == 0 && shift_.z == 0)
             return;
@@ -262,7 +263,7 @@ std::uint64_t GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
     visitVolume([&](auto const& volume) {
         auto const sampler = samplerOf(volume, background_);
         Geometry::Mesh::subdivide(sampler, mesh, tolerance);
-        // Before the points move back, which rounds away the smallest faces.
+        // Before the points are moved back, because rounding may then collapse the smallest faces.
         largeFaces = countLargeFaces(mesh, [&](MeshArrays const& refined, Orvan::Array<bool>& marks) {
             Geometry::Mesh::Internal::markForSubdivision(sampler, refined.faceCount(), *refined.positions,
                 *refined.faceVertex, *refined.faceOffset, marks, tolerance);
@@ -277,13 +278,13 @@ void addGuideOptions(GuideOptions& options, Command& command)
     Option const file =
         command.addOption("--volume", options.file, "Scale the tolerance by a float grid of this OpenVDB file")
             .valueName("FILE");
-    command.addOption("--grid", options.grid, "Which grid; can be left out where there is one float grid only")
+    command.addOption("--grid", options.grid, "Name of the grid; optional if there is only one float grid")
         .valueName("NAME")
         .needs(file);
-    command.addOption("--min-value", options.leastValue, "Take this value for smaller ones of the grid")
+    command.addOption("--min-value", options.leastValue, "Replace smaller values of the grid by this one")
         .valueName("V")
         .needs(file);
-    command.addOption("--tile-side", options.tileSide, "Voxels along a tile of the library's volume")
+    command.addOption("--tile-side", options.tileSide, "Voxels per side of a tile of the volume in memory")
         .valueName("N")
         .oneOf({"4", "5"})
         .showDefault()

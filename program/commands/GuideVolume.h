@@ -18,12 +18,12 @@ namespace ModelingProgram {
 class MemoryLimit;
 struct SparseVolume;
 
-/// The volume that a command line asks for.
+/// The volume given on the command line.
 struct GuideOptions {
     std::filesystem::path file; // empty for none
-    std::string grid; // empty for the only float grid there is
+    std::string grid; // empty for the only float grid
     int tileSide = 4; // voxels along a tile
-    std::optional<float> leastValue; // stands for those below it
+    std::optional<float> leastValue; // replaces smaller values
 };
 
 /// Adds the options to a command.
@@ -32,19 +32,20 @@ void addGuideOptions(GuideOptions& options, Command& command);
 /// A grid of an OpenVDB file that scales the tolerance of a refinement.
 class GuideVolume {
 public:
-    /// Reads the grid, and tells what is in it. A value that is not above 0 leaves faces alone, with a warning.
-    /// \param limit  asked before values are read, unless it is null
-    /// \throws Failure, FileError  where there is no such grid, or the library cannot hold it
+    /// Reads the grid and reports its contents. Warns about values that are not above 0, where faces are not refined.
+    /// \param limit  checked before values are read, unless null
+    /// \throws Failure, FileError  if there is no such grid, or the library cannot represent it
     GuideVolume(GuideOptions const& options, Report& report, MemoryLimit const* limit = nullptr);
 
     std::string const& grid() const { return grid_; }
-    /// Nothing where no value is above 0.
+    /// Nullopt if no value is above 0.
     std::optional<float> smallestPositiveValue() const { return smallestPositive_; }
 
-    /// Tells how much of the mesh the volume covers.
-    void tellCoverage(MeshArrays const& mesh, Report& report) const;
+    /// Reports how many faces of the mesh the volume covers.
+    void reportCoverage(MeshArrays const& mesh, Report& report) const;
 
-    /// Refines by a tolerance that the volume scales. \return how many faces are still too large, by `countLargeFaces`
+    /// Refines with the tolerance scaled by the volume. \return how many faces are still too large, as
+    /// `countLargeFaces` counts
     std::uint64_t refine(float tolerance, Tessara::Object& mesh) const;
 
 private:
@@ -59,11 +60,11 @@ private:
     std::string grid_;
     float background_ = 0;
     std::optional<float> smallestPositive_;
-    float scale_ = 1; // voxels a unit of length
-    Tessara::Math::float3 shift_{0, 0, 0}; // of the voxels from whole multiples of their size
+    float scale_ = 1; // voxels per unit of length
+    Tessara::Math::float3 shift_{0, 0, 0}; // offset of the voxels from multiples of their size
     std::variant<std::monostate, TSR::TileTree3D::Volume<TSR::TileTree3D::Traits2>,
         TSR::TileTree3D::Volume<TSR::TileTree3D::Traits5>>
-        volume_; // not padded: that would double the memory for hardly any time
+        volume_; // not padded: that would double the memory and save hardly any time
 };
 
 }

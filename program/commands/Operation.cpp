@@ -27,7 +27,7 @@ namespace {
 
     std::uint64_t peakMemory()
     {
-        // The kernel's own line: the other number starts with what the process took before it became this program.
+        // Not from getrusage if possible: its peak includes what the process used before it executed this program.
         std::ifstream status("/proc/self/status");
         for (std::string line; std::getline(status, line);)
             if (line.starts_with("VmHWM:"))
@@ -37,7 +37,7 @@ namespace {
         return static_cast<std::uint64_t>(usage.ru_maxrss) * 1024;
     }
 
-    /// Ends the report with a table of these rows and those that all commands have.
+    /// Ends the report with a table of these rows and those of every command.
     void addRun(std::vector<std::vector<std::string>> rows, Report& report)
     {
         Json& document = report.document;
@@ -63,11 +63,11 @@ namespace {
 void requireWritable(Output const& out, GeometryType type)
 {
     if (!isWritableFormat(out.file))
-        refuseOutput(out, "the name has to end in .obj, .ply, .stl or .vtp");
+        refuseOutput(out, "its name has to end in .obj, .ply, .stl or .vtp");
     if (type == GeometryType::Strands && (hasExtension(out, ".ply") || hasExtension(out, ".stl")))
-        refuseOutput(out, "such files hold no strands; OBJ and VTP files do");
+        refuseOutput(out, "this format cannot hold strands; OBJ and VTP can");
     if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
-        refuseOutput(out, "STL files hold no point clouds; OBJ, PLY and VTP files do");
+        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY and VTP files can");
     requirePlace(out);
 }
 
@@ -81,7 +81,7 @@ void requirePlace(Output const& out)
         refuseOutput(out, fmt::format("there is no folder {}", folder.string()));
     if (!out.replaces && fs::is_regular_file(out.file, ignored))
         refuseOutput(out, "the file exists; --force replaces it");
-    OutputFile::tryOut(out.file, out.existing());
+    OutputFile::checkWritable(out.file, out.existing());
 }
 
 void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
@@ -92,8 +92,8 @@ void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
     for (unsigned int face = 0; face != arrays.faceCount(); ++face)
         if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
             refuseOutput(out,
-                fmt::format("STL files hold triangles only, and face {} has {}; OBJ, PLY and VTP files hold it", face,
-                    countOf(corners, "corner")));
+                fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY and VTP files can hold it",
+                    face, countOf(corners, "corner")));
 }
 
 void requireAttribute(Output const& out, char const* option, std::string const& name)
@@ -107,7 +107,7 @@ void requireAttribute(Output const& out, char const* option, std::string const& 
         && (name.find_first_of(" \t\n\r\v\f") != std::string::npos
             || std::find(std::begin(kTaken), std::end(kTaken), name) != std::end(kTaken)))
         throw Failure(
-            ExitCode::Refused, fmt::format("{}: PLY files cannot hold an attribute of the name \"{}\"", option, name));
+            ExitCode::Refused, fmt::format("{}: PLY files cannot hold an attribute named \"{}\"", option, name));
 }
 
 Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& report)
@@ -143,7 +143,8 @@ void requireValid(Tessara::Object const& object, fs::path const& file)
     auto const status = validate(object);
     if (!status)
         throw Failure(ExitCode::Invalid,
-            fmt::format("{} holds no valid {}: {}", file.string(), nameOf(typeOf(object)), status.message().view()));
+            fmt::format(
+                "{} does not contain a valid {}: {}", file.string(), nameOf(typeOf(object)), status.message().view()));
 }
 
 void requirePointCloud(char const* command, Tessara::Object& object, fs::path const& file)
@@ -152,7 +153,8 @@ void requirePointCloud(char const* command, Tessara::Object& object, fs::path co
         makeEmpty(GeometryType::PointCloud, object);
     if (typeOf(object) != GeometryType::PointCloud)
         throw Failure(ExitCode::Refused,
-            fmt::format("{} needs a point cloud, and {} holds a {}", command, file.string(), nameOf(typeOf(object))));
+            fmt::format(
+                "{} needs a point cloud, but {} contains a {}", command, file.string(), nameOf(typeOf(object))));
 }
 
 void requireDone(char const* command, bool isDone)
@@ -160,7 +162,8 @@ void requireDone(char const* command, bool isDone)
     if (!isDone)
         throw Failure(ExitCode::Refused,
             fmt::format(
-                "{} cannot be done: the geometry or one of its attributes is not as the operation needs it", command));
+                "{} failed: the geometry or one of its attributes does not meet the requirements of the operation",
+                command));
 }
 
 void runOperation(Report& report, std::function<void()> const& operation)
@@ -173,7 +176,7 @@ void runOperation(Report& report, std::function<void()> const& operation)
     } catch (Failure const&) {
         throw;
     } catch (std::exception const&) {
-        stopIfCancelled(); // that is how a cancelled operation ends
+        stopIfCancelled(); // a cancelled operation throws the exception of the host
         throw;
     }
     stopIfCancelled();
@@ -186,7 +189,7 @@ void saveGeometry(Tessara::Object const& object, Output const& out, Report& repo
     auto const status = validate(object);
     if (!status)
         throw Failure(ExitCode::Unexpected,
-            fmt::format("the result is not valid, so nothing was written: {}", status.message().view()));
+            fmt::format("the result is invalid, so nothing was written: {}", status.message().view()));
     stopIfCancelled();
     std::string const remark = report.reading.origin ? centerOf(report.reading) : std::string();
     for (std::string const& note : writeGeometryFile(object, out.file, {out.existing(), remark}))

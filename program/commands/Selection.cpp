@@ -22,7 +22,7 @@ using Flags = Orvan::Array<bool>;
 
 namespace {
 
-    /// What the numbers of a file name; they are separated by blanks, ends of lines and comments.
+    /// Picks the elements whose indices a file lists, separated by blanks, line ends and comments.
     Flags pickByIndices(std::filesystem::path const& file, Pickable const& elements, unsigned int count)
     {
         InputFile const input(file);
@@ -90,8 +90,7 @@ namespace {
             if (other.component == elements.component && !other.isStandard)
                 there.push_back(fmt::format("{} ({})", other.name, other.type));
         throw Failure(ExitCode::Refused,
-            fmt::format(
-                "--attribute {} picks nothing: that is no boolean or integer attribute of the {}. These have: {}", name,
+            fmt::format("--attribute: the {1} have no boolean or integer attribute \"{0}\". There are: {2}", name,
                 elements.plural, listOf(there)));
     }
 
@@ -100,8 +99,9 @@ namespace {
 void addSelection(Pickable const& elements, Selection& selection, Command& command)
 {
     Command choice = command.addChoice("Selection", fmt::format("Which {} to pick:", elements.plural));
-    choice.addOption("--indices", selection.indices, "Those that a text file names, counted from 0").valueName("FILE");
-    choice.addOption("--box", selection.box, "Those inside a box between two corners, X0 Y0 Z0 X1 Y1 Z1")
+    choice.addOption("--indices", selection.indices, "Those whose indices, counted from 0, are listed in a text file")
+        .valueName("FILE");
+    choice.addOption("--box", selection.box, "Those inside the box between two corners X0 Y0 Z0 X1 Y1 Z1")
         .valueName("NUMBER")
         .values(6);
     choice.addOption("--attribute", selection.attribute, "Those whose boolean or integer attribute is not zero")

@@ -12,15 +12,15 @@
 
 namespace ModelingProgram {
 
-/// How a command line picks elements: by exactly one of these, or else by what that leaves.
+/// How the command line picks elements: by exactly one of these, or all others if inverted.
 struct Selection {
-    std::filesystem::path indices; // a file of numbers
+    std::filesystem::path indices; // a text file of indices
     std::vector<float> box; // two opposite corners
-    std::string attribute; // picks where its value is not zero
+    std::string attribute; // picks elements whose value is not zero
     bool isInverted = false;
 };
 
-/// Elements to pick from, as they are called in sentences.
+/// The kind of elements to pick, and its name in messages.
 struct Pickable {
     char const* component;
     char const* singular;
@@ -30,8 +30,8 @@ struct Pickable {
 /// Adds the options to a command.
 void addSelection(Pickable const& elements, Selection& selection, Command& command);
 
-/// True for the elements that are picked. Adds to the report how many these are. A face is in the box when all its
-/// corners are, and points on the border are in it.
+/// True for each picked element. Adds their number to the report. A face is in the box if all of its corners are;
+/// points on the border are in it.
 /// \pre  the object is valid
 Orvan::Array<bool> pickElements(
     Selection const& selection, Pickable const& elements, Tessara::Object const& object, Report& report);

@@ -10,7 +10,7 @@ namespace ModelingProgram {
 EdgeSides::EdgeSides(MeshArrays const& mesh)
     : offsets_(std::size_t{mesh.pointCount()} + 1)
 {
-    // On one thread: the points of a face are anywhere in memory, and atomic operations wait for each of them in turn.
+    // On one thread: the points of a face are scattered in memory, and atomic increments would stall on each of them.
     unsigned int const* const point = mesh.faceVertex->data;
     forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
         if (point[corner] != point[next])
@@ -18,7 +18,7 @@ EdgeSides::EdgeSides(MeshArrays const& mesh)
     });
     std::inclusive_scan(offsets_.begin(), offsets_.end(), offsets_.begin());
     sides_.resize(offsets_.back());
-    // Filling from the ends leaves the beginnings behind.
+    // Filling each range from its end turns the end offsets into start offsets.
     forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
         auto const [lower, higher] = std::minmax(point[corner], point[next]);
         if (lower != higher)

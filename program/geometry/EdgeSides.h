@@ -8,7 +8,7 @@
 
 namespace ModelingProgram {
 
-/// A side of an edge, listed at the lower of its two points.
+/// One side of an edge (a half-edge in either direction), listed at the lower of its two points.
 struct Side {
     unsigned int higherPoint;
     unsigned int corner; // where it starts
@@ -16,12 +16,12 @@ struct Side {
     friend auto operator<=>(Side const&, Side const&) = default;
 };
 
-/// The edges of a mesh, by their lower points. Takes 12 bytes per corner and 4 per point.
+/// The edges of a mesh, by their lower points. Needs 12 bytes per corner and 4 per point.
 class EdgeSides {
 public:
     explicit EdgeSides(MeshArrays const& mesh);
 
-    /// The points of those edges that are picked by `isPicked(sides in ascending order)`, ascending.
+    /// The points of the edges for which `isPicked(sides in ascending order)` is true, in ascending order.
     template <class IsPicked> std::vector<unsigned int> pointsOfEdges(IsPicked const& isPicked) const
     {
         std::vector<unsigned int> points;
@@ -34,7 +34,7 @@ public:
         return points;
     }
 
-    /// The points of open edges.
+    /// The points of boundary edges.
     std::vector<unsigned int> boundaryPoints() const
     {
         return pointsOfEdges([](std::span<Side const> sides) { return sides.size() == 1; });
@@ -56,12 +56,12 @@ public:
     }
 
 private:
-    // The sides at point p begin at `offsets_[p]`, those of one edge next to one another.
+    // The sides at point p begin at `offsets_[p]`; those of one edge are adjacent.
     std::vector<unsigned int> offsets_;
     std::vector<Side> sides_;
 };
 
-/// Calls `visit(corner, next corner)` for each side of each face that has sides.
+/// Calls `visit(corner, next corner)` for each side of each face with at least three corners.
 template <class Visit> void forEachSide(MeshArrays const& mesh, Visit const& visit)
 {
     unsigned int const* const offset = mesh.faceOffset->data;

@@ -67,7 +67,7 @@ std::string nameOf(GeometryType type)
     case GeometryType::None:
         break;
     }
-    return "object of no known kind";
+    return "object of unknown kind";
 }
 
 void makeEmpty(GeometryType type, Object& object)
@@ -93,7 +93,7 @@ GeoValidator::Status validate(Object const& object)
     case GeometryType::None:
         break;
     }
-    return GeoValidator::Status("it has the components and standard properties of no kind of geometry");
+    return GeoValidator::Status("it lacks the components and standard properties of any kind of geometry");
 }
 
 std::optional<BoundingBox> boundingBoxOf(Object const& object)
@@ -156,7 +156,7 @@ std::vector<std::string> dropOutdatedProperties(Object& object)
         return property.range.empty() && !property.component.empty()
             && property.length != getElementCount(object, property.component.c_str());
     });
-    // The data of a range has nothing to belong to without it.
+    // The data of a removed range belongs to nothing.
     dropIf([&](Property const& property) {
         return property.component.empty()
             && std::find(dropped.begin(), dropped.end(), getGeoPropTargetName(object, property.name.c_str()).view())

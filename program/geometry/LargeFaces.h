@@ -6,8 +6,8 @@
 
 namespace ModelingProgram {
 
-/// How many faces of a refined mesh `mark(mesh, marks)`, the marking of a pass, would ask to split once more. On closed
-/// manifolds these are the faces that refinement has left at its limit of 31 steps.
+/// The number of faces of a refined mesh that `mark(mesh, marks)`, the marking step of a pass, would still mark for
+/// splitting. On closed manifolds these are the faces at the limit of 31 steps.
 template <class Mark> std::uint64_t countLargeFaces(Tessara::Object const& refined, Mark const& mark)
 {
     MeshArrays const mesh = arraysOf(refined);

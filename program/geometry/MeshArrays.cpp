@@ -15,7 +15,7 @@ std::span<unsigned int const> MeshArrays::corners(unsigned int face) const
 
 unsigned int MeshArrays::faceOf(unsigned int corner) const
 {
-    // Faces without corners end where they begin; the last face that begins at or before the corner holds it.
+    // The last face that begins at or before the corner contains it, since faces without corners end where they begin.
     unsigned int const* const after = std::upper_bound(faceOffset->begin(), faceOffset->end(), corner);
     return static_cast<unsigned int>(after - faceOffset->begin() - 1);
 }

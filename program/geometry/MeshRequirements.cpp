@@ -31,18 +31,18 @@ namespace {
             describePoint(mesh, (*mesh.faceVertex)[mesh.nextCorner(corner)]));
     }
 
-    std::string describeOpenEdges(MeshArrays const& mesh, MeshTopology const& topology)
+    std::string describeBoundaryEdges(MeshArrays const& mesh, MeshTopology const& topology)
     {
-        std::uint64_t const count = topology.openEdges.count;
-        std::string sentence = fmt::format("{} of {} {} open: no other face is on the far side. The first is the {}.",
-            groupDigits(count), countOf(topology.edgeCount, "edge"), count == 1 ? "is" : "are",
-            describeEdge(mesh, topology.openEdges.first));
+        std::uint64_t const count = topology.boundaryEdges.count;
+        std::string sentence = fmt::format("{} of {} {}: {} to one face only. The first is the {}.", groupDigits(count),
+            countOf(topology.edgeCount, "edge"), count == 1 ? "is a boundary edge" : "are boundary edges",
+            count == 1 ? "it belongs" : "they belong", describeEdge(mesh, topology.boundaryEdges.first));
         std::uint64_t const coincident = countCoincidentPoints(mesh);
         return sentence
             + (coincident == 0 ? std::string(" Fill the holes first.")
-                               : fmt::format(" {} in the same place as another point: merge equal points first, and "
-                                             "fill the holes that are left.",
-                                   coincident == 1 ? "1 point lies" : groupDigits(coincident) + " points lie"));
+                               : fmt::format(" {} at the same position as another point: merge equal points first, and "
+                                             "fill the remaining holes.",
+                                   coincident == 1 ? "1 point is" : groupDigits(coincident) + " points are"));
     }
 
 }
@@ -50,21 +50,23 @@ namespace {
 std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopology const& topology)
 {
     std::vector<std::string> faults;
-    if (topology.openEdges)
-        faults.push_back(describeOpenEdges(mesh, topology));
+    if (topology.boundaryEdges)
+        faults.push_back(describeBoundaryEdges(mesh, topology));
     if (Finding const& edges = topology.nonManifoldEdges)
         faults.push_back(
             fmt::format("More than two faces meet at {}. The first is the {}. Separate the sheets or solids "
                         "that meet there.",
                 countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
     if (Finding const& edges = topology.flippedEdges)
-        faults.push_back(fmt::format("At {} neighboring faces point to opposite sides. The first is the {}. Turn faces "
-                                     "over until all look outwards.",
-            countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
-    if (Finding const& points = topology.pinchedPoints)
-        faults.push_back(fmt::format("The surface is pinched at {}: the faces there touch only in the point. The first "
-                                     "is {}. Give each sheet a point of its own.",
-            countOf(points.count, "point"), describePoint(mesh, points.first)));
+        faults.push_back(
+            fmt::format("At {} neighboring faces have opposite orientations. The first is the {}. Flip faces "
+                        "until all normals point outward.",
+                countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
+    if (Finding const& points = topology.nonManifoldPoints)
+        faults.push_back(
+            fmt::format("The surface is non-manifold at {}: some faces there share only the point. The first "
+                        "is {}. Give each sheet its own point.",
+                countOf(points.count, "point"), describePoint(mesh, points.first)));
     return faults;
 }
 
@@ -81,7 +83,7 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
     if (Finding const& faces = topology.facesBelowThreeCorners)
         faults.push_back(fmt::format("{} fewer than three corners. The first is face {}. Remove such faces first.",
             countOf(faces.count, "face has", "faces have"), faces.first));
-    // Polygons may do that, and need not once they are triangulated.
+    // Not reported for meshes with polygons: triangulation may resolve it.
     if (Finding const& faces = topology.facesWithRepeatedPoints; faces && !topology.quads && !topology.polygons)
         faults.push_back(fmt::format("{} a point more than once. The first is face {}. Remove such faces first.",
             countOf(faces.count, "face visits", "faces visit"), faces.first));
@@ -103,7 +105,7 @@ void requireMesh(Tessara::Object& object, char const* command, std::filesystem::
         makeEmpty(GeometryType::Mesh, object);
     if (typeOf(object) != GeometryType::Mesh)
         throw Failure(ExitCode::Refused,
-            fmt::format("{} needs a mesh, and {} holds a {}", command, file.string(), nameOf(typeOf(object))));
+            fmt::format("{} needs a mesh, but {} contains a {}", command, file.string(), nameOf(typeOf(object))));
 }
 
 void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
@@ -116,7 +118,7 @@ void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topol
         reasons.push_back(std::move(reason));
     if (!reasons.empty())
         throw Failure(ExitCode::Refused,
-            fmt::format("{} needs a closed manifold mesh of triangles, which {} does not hold "
+            fmt::format("{} needs a closed manifold mesh of triangles, which {} does not contain "
                         "(points and faces are counted from 0):",
                 command, file.string()),
             std::move(reasons));

@@ -17,7 +17,7 @@ using Tessara::Geometry::kInvalidIndex;
 
 namespace {
 
-    /// Disjoint sets of indices; each starts as a set of its own.
+    /// Disjoint sets of indices (union-find); initially each index is its own set.
     class DisjointSets {
     public:
         explicit DisjointSets(unsigned int count)
@@ -40,14 +40,14 @@ namespace {
             parents_[std::max(a, b)] = std::min(a, b);
         }
 
-        /// Whether the index stands for its set: one of each set does.
+        /// Whether the index represents its set; exactly one index per set does.
         bool isRoot(unsigned int index) const { return parents_[index] == index; }
 
     private:
         std::vector<unsigned int> parents_;
     };
 
-    /// The fans of faces around the points: sets of corners, each at one point.
+    /// The fans of faces around the points, as sets of corners at the same point.
     using Fans = DisjointSets;
 
     bool hasRepeatedPoint(std::span<unsigned int const> corners, std::vector<unsigned int>& scratch)
@@ -75,12 +75,13 @@ namespace {
         }
     }
 
-    /// What is around one edge: `lower` is its lower point, `sides` are in ascending order.
+    /// \param lower  the lower point of the edge
+    /// \param sides  in ascending order
     void examineEdge(MeshArrays const& mesh, unsigned int lower, std::span<Side const> sides, MeshTopology& topology)
     {
         ++topology.edgeCount;
         if (sides.size() == 1)
-            topology.openEdges.add(sides[0].corner);
+            topology.boundaryEdges.add(sides[0].corner);
         if (sides.size() > 2)
             topology.nonManifoldEdges.add(sides[0].corner);
 
@@ -121,25 +122,25 @@ namespace {
         });
     }
 
-    void countPinchedPoints(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
+    void countNonManifoldPoints(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
     {
         unsigned int const* const point = mesh.faceVertex->data;
         std::vector<bool> hasFan(mesh.pointCount());
-        std::vector<bool> isPinched(mesh.pointCount());
+        std::vector<bool> isNonManifold(mesh.pointCount());
         forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
-            if (point[corner] == point[next]) // a point that follows itself is one place on the face
+            if (point[corner] == point[next]) // equal consecutive points are one vertex of the face
                 fans.join(corner, next);
         });
         forEachSide(mesh, [&](unsigned int corner, unsigned int) {
             if (!fans.isRoot(corner))
                 return;
             if (hasFan[point[corner]])
-                isPinched[point[corner]] = true;
+                isNonManifold[point[corner]] = true;
             hasFan[point[corner]] = true;
         });
         for (unsigned int p = 0; p != mesh.pointCount(); ++p)
-            if (isPinched[p])
-                topology.pinchedPoints.add(p);
+            if (isNonManifold[p])
+                topology.nonManifoldPoints.add(p);
     }
 
     void countParts(MeshArrays const& mesh, MeshTopology& topology)
@@ -151,7 +152,7 @@ namespace {
         for (unsigned int point = 0; point != mesh.pointCount(); ++point)
             topology.partCount += parts.isRoot(point) ? 1u : 0u;
         topology.isolatedPoints = findIsolatedPoints(mesh);
-        topology.partCount -= topology.isolatedPoints.count; // each is a set of its own
+        topology.partCount -= topology.isolatedPoints.count; // each of them is a set of its own
     }
 
     bool isSliver(std::span<unsigned int const> corners, float3 const* position, float ratio)
@@ -171,22 +172,22 @@ namespace {
 
 bool MeshTopology::isClosedManifold() const
 {
-    return !facesBelowThreeCorners && !openEdges && !nonManifoldEdges && !windingConflicts && !pinchedPoints;
+    return !facesBelowThreeCorners && !boundaryEdges && !nonManifoldEdges && !windingConflicts && !nonManifoldPoints;
 }
 
-MeshTopology analyseTopology(MeshArrays const& mesh)
+MeshTopology analyzeTopology(MeshArrays const& mesh)
 {
-    return analyseTopology(mesh, EdgeSides(mesh));
+    return analyzeTopology(mesh, EdgeSides(mesh));
 }
 
-MeshTopology analyseTopology(MeshArrays const& mesh, EdgeSides const& edges)
+MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges)
 {
     MeshTopology topology;
     countFaces(mesh, topology);
     {
         Fans fans(mesh.cornerCount());
         examineEdges(mesh, edges, fans, topology);
-        countPinchedPoints(mesh, fans, topology);
+        countNonManifoldPoints(mesh, fans, topology);
     }
     countParts(mesh, topology);
     if (topology.isClosedManifold()) {
@@ -228,7 +229,7 @@ std::uint64_t countSlivers(MeshArrays const& mesh, float ratio)
 
 std::uint64_t countCoincidentPoints(MeshArrays const& mesh)
 {
-    // Compared by bits: any positions have an order then. Adding 0 makes both zeros the same.
+    // Compared by bits, which is a total order even with NaN. Adding 0 makes both zeros equal.
     std::vector<std::array<std::uint32_t, 3>> keys;
     keys.reserve(mesh.pointCount());
     for (float3 const& p : *mesh.positions)

@@ -11,7 +11,7 @@
 
 namespace ModelingProgram {
 
-/// How many there are of something, and the lowest one.
+/// The number of elements with some quality, and the lowest of them.
 struct Finding {
     std::uint64_t count = 0;
     unsigned int first = Tessara::Geometry::kInvalidIndex;
@@ -24,40 +24,41 @@ struct Finding {
     }
 };
 
-/// How the faces of a mesh hang together. An edge joins two different points that follow one another in a face of at
-/// least three corners, and belongs to as many sides of faces as pass it, in either direction.
+/// How the faces of a mesh are connected. An edge joins two different points that are consecutive in a face of at least
+/// three corners. It has one side for each time that a face traverses it, in either direction.
 struct MeshTopology {
-    // Faces by their number of corners. The first is the lowest face.
+    // Faces by their number of corners. `first` is the lowest face.
     std::uint64_t triangleCount = 0;
     Finding facesBelowThreeCorners;
     Finding quads;
     Finding polygons; // more than four corners
-    Finding facesWithRepeatedPoints; // these visit a point more than once
+    Finding facesWithRepeatedPoints; // faces with the same point at several corners
 
     std::uint64_t edgeCount = 0;
-    // The first is the lowest corner at which a side of such an edge starts.
-    Finding openEdges; // one side
+    // `first` is the lowest corner at which a side of such an edge starts.
+    Finding boundaryEdges; // one side: boundary edges
     Finding nonManifoldEdges; // more than two sides
-    Finding windingConflicts; // edges with two or more sides in one direction; counted for each direction
-    Finding flippedEdges; // edges with two sides, both in one direction
+    Finding windingConflicts; // edges with two or more sides in the same direction; counted per direction
+    Finding flippedEdges; // edges with two sides, both in the same direction
 
-    // The first is the lowest point.
-    Finding pinchedPoints; // points whose faces do not all hang together by edges at the point
+    // `first` is the lowest point.
+    Finding nonManifoldPoints; // non-manifold vertices: their faces are not all connected by edges at the point
     Finding isolatedPoints; // points of no face
 
-    std::uint64_t partCount = 0; // faces that share a point are in one part
+    std::uint64_t partCount = 0; // connected components: faces that share a point are in the same one
     std::optional<std::int64_t> genus; // summed over the parts; for closed manifolds
 
-    /// Two sides with opposite directions to each edge, and one closed fan of faces around each point.
+    /// True if each edge has two sides in opposite directions and each point one closed fan of faces.
     bool isClosedManifold() const;
 };
 
 class EdgeSides;
 
-/// Takes any valid mesh. Linear, but for sorting the edges at each point; takes up to 16 bytes per corner and 9 per point.
-MeshTopology analyseTopology(MeshArrays const& mesh);
-/// The same with the edges of the mesh, for those who need them further.
-MeshTopology analyseTopology(MeshArrays const& mesh, EdgeSides const& edges);
+/// Accepts any valid mesh. Linear, except for sorting the edges at each point; needs up to 16 bytes per corner and 9
+/// per point.
+MeshTopology analyzeTopology(MeshArrays const& mesh);
+/// The same for callers that already have the edges of the mesh.
+MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges);
 
 /// Adds the rows "parts" and "genus" to the table of a command.
 void addPartsAndGenus(MeshTopology const& topology, Json& values);
@@ -65,10 +66,12 @@ void addPartsAndGenus(MeshTopology const& topology, Json& values);
 /// The points of no face.
 Finding findIsolatedPoints(MeshArrays const& mesh);
 
-/// The faces whose shortest edge is shorter than `ratio` times their longest one, as the library measures them.
+/// The number of faces whose shortest edge is shorter than `ratio` times their longest one, measured as the library
+/// does.
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio);
 
-/// The points that lie exactly where a point before them lies: a mesh with many of them may be cut along its seams.
+/// The number of points at exactly the same position as an earlier point: many of them suggest that the mesh is split
+/// along seams.
 std::uint64_t countCoincidentPoints(MeshArrays const& mesh);
 
 }

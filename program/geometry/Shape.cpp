@@ -17,20 +17,21 @@ namespace ModelingProgram {
 
 namespace {
 
-    // Beyond these shares a change of shape is a warning.
+    // Relative changes of the shape above these values are a warning.
 
-    // A mass or a buoyancy that is computed from the mesh is off by as much; scans and prints are about as accurate.
-    constexpr double kVolumeShare = 0.01;
-    // Noise of a scan holds a few percent of its area, which evening it out removes rightly.
-    constexpr double kAreaShare = 0.05;
-    // One can see it on a screen that shows the whole mesh: 20 of 1,000 pixels.
-    constexpr double kMoveShare = 0.02;
+    // A mass computed from the mesh is off by as much; scans and prints are about as accurate.
+    constexpr double kVolumeFraction = 0.01;
+    // Noise accounts for a few percent of the area of a scan, which smoothing is meant to remove.
+    constexpr double kAreaFraction = 0.05;
+    // Visible on a screen that shows the whole mesh: 20 of 1,000 pixels.
+    constexpr double kMoveFraction = 0.02;
 
-    // A plate whose volume is a smaller share of area times diagonal is thinner than single precision can express: what is
-    // measured is rounding, and its sign means nothing.
-    constexpr double kFlatShare = 1e-7;
+    // A plate whose volume is a smaller fraction of area times diagonal is thinner than the resolution of single
+    // precision: the measured volume is rounding error, and its sign is meaningless.
+    constexpr double kFlatFraction = 1e-7;
 
-    /// Calls `sumOf(begin, end)` for blocks of a fixed size in parallel, and adds the results up in the order of blocks.
+    /// Calls `sumOf(begin, end)` for blocks of a fixed size in parallel, and adds the results in the order of the
+    /// blocks.
     template <class Sum, std::size_t kBlock = 4096, class SumOf>
     Sum sumOverBlocks(std::size_t count, SumOf const& sumOf)
     {
@@ -103,7 +104,7 @@ namespace {
         }
     };
 
-    /// \param origin  inside the mesh or near it: far from there volumes of single faces cancel out badly
+    /// \param origin  inside or near the mesh: far away, the volumes of single faces would cancel badly
     Measures measure(MeshArrays const& mesh, std::vector<double3> const& vectors, double3 const& origin)
     {
         return sumOverBlocks<Measures>(vectors.size(), [&](std::size_t begin, std::size_t end) {
@@ -119,7 +120,7 @@ namespace {
         });
     }
 
-    /// Tells edges apart by the angle between the normals of their faces.
+    /// Classifies edges by the angle between the normals of their faces.
     class Creases {
     public:
         Creases(MeshArrays const& mesh, std::vector<double3> const& vectors, double degrees)
@@ -129,12 +130,12 @@ namespace {
         {
         }
 
-        /// Of an edge with two sides: whether the normals differ by more than the angle.
+        /// Whether the normals at an edge with two sides differ by more than the angle.
         bool isSharp(std::span<Side const> sides) const
         {
             double3 const &a = vectors_[faceAt(sides[0])], &b = vectors_[faceAt(sides[1])];
             bool const areAlike = (*mesh_.faceVertex)[sides[0].corner] == (*mesh_.faceVertex)[sides[1].corner];
-            double const product = areAlike ? -dot(a, b) : dot(a, b); // one of the faces looks to the other side
+            double const product = areAlike ? -dot(a, b) : dot(a, b); // the faces have opposite orientations
             double const lengths = std::sqrt(dot(a, a) * dot(b, b));
             return lengths > 0 && product < cosine_ * lengths;
         }
@@ -142,7 +143,7 @@ namespace {
     private:
         unsigned int faceAt(Side const& side) const
         {
-            // Most meshes have faces of one size, where this finds the face without a search.
+            // If all faces have equally many corners, as in most meshes, this finds the face without a search.
             unsigned int const* const offset = mesh_.faceOffset->data;
             auto const face =
                 static_cast<unsigned int>(std::uint64_t{side.corner} * mesh_.faceCount() / mesh_.cornerCount());
@@ -166,8 +167,8 @@ namespace {
         });
     }
 
-    /// The change of a positive quantity as a share of it; 0 if there is nothing to compare with.
-    double shareOfChange(double before, double after)
+    /// The relative change of a positive quantity; 0 if it was not positive.
+    double relativeChange(double before, double after)
     {
         return before > 0 ? (after - before) / before : 0;
     }
@@ -181,16 +182,16 @@ namespace {
     {
         std::vector<std::string> changes;
         auto const& [before, after, largest] = change;
-        if (before.volume && after.volume && std::abs(*before.volume) > kFlatShare * before.area * before.diagonal) {
-            double const share = shareOfChange(std::abs(*before.volume), std::abs(*after.volume));
+        if (before.volume && after.volume && std::abs(*before.volume) > kFlatFraction * before.area * before.diagonal) {
+            double const share = relativeChange(std::abs(*before.volume), std::abs(*after.volume));
             if (*before.volume * *after.volume < 0)
                 changes.push_back("the closed surface turned inside out");
-            else if (std::abs(share) > kVolumeShare)
+            else if (std::abs(share) > kVolumeFraction)
                 changes.push_back(fmt::format("the volume by {}", percentOf(share)));
         }
-        if (double const share = shareOfChange(before.area, after.area); std::abs(share) > kAreaShare)
+        if (double const share = relativeChange(before.area, after.area); std::abs(share) > kAreaFraction)
             changes.push_back(fmt::format("the area by {}", percentOf(share)));
-        if (double const share = before.diagonal > 0 ? largest / before.diagonal : 0; share > kMoveShare)
+        if (double const share = before.diagonal > 0 ? largest / before.diagonal : 0; share > kMoveFraction)
             changes.push_back(fmt::format("a point by {:.2g} % of the diagonal of the bounding box", share * 100));
         if (after.foldOvers > before.foldOvers)
             changes.push_back(countOf(after.foldOvers - before.foldOvers, "edge folded over", "edges folded over"));
@@ -225,7 +226,7 @@ Shape shapeOf(MeshArrays const& mesh, EdgeSides const& edges, bool isClosed)
 ExaminedMesh examine(MeshArrays const& mesh)
 {
     EdgeSides const edges(mesh);
-    MeshTopology const topology = analyseTopology(mesh, edges);
+    MeshTopology const topology = analyzeTopology(mesh, edges);
     return {topology, shapeOf(mesh, edges, topology.isClosedManifold())};
 }
 
@@ -250,9 +251,9 @@ double largestMove(MeshArrays const& before, MeshArrays const& after)
 
 double largestDistance(MeshArrays const& before, MeshArrays const& after)
 {
-    // Most points keep their places and numbers; the others are looked up in the surface.
+    // Most points keep their positions and numbers; the others are looked up in the surface.
     auto const isSame = [](float3 const& a, float3 const& b) { return a.x == b.x && a.y == b.y && a.z == b.z; };
-    std::vector<bool> isSettled(before.pointCount(), true); // points that no face uses are no part of the surface
+    std::vector<bool> isSettled(before.pointCount(), true); // isolated points are not part of the surface
     for (unsigned int const point : *before.faceVertex)
         isSettled[point] = false;
     std::vector<unsigned int> moved;

@@ -1,6 +1,6 @@
 #include "SurfaceBand.h"
 
-#include "NearestPlace.h"
+#include "NearestPoint.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
@@ -30,12 +30,12 @@ namespace {
 
         void add(Triangle const& triangle)
         {
-            // Small pieces have small boxes, of which the band fills a large part.
+            // The band fills a large part of the boxes of small pieces.
             constexpr double kLongest = 16;
             std::size_t longest = 0;
             double lengths[3];
             for (std::size_t side = 0; side != 3; ++side) {
-                double3 const along = triangle[(side + 1) % 3].place - triangle[side].place;
+                double3 const along = triangle[(side + 1) % 3].position - triangle[side].position;
                 lengths[side] = dot(along, along);
                 if (lengths[side] > lengths[longest])
                     longest = side;
@@ -75,7 +75,8 @@ namespace {
         }
 
         static constexpr int kBlockSide = 8;
-        static constexpr double kBytesPerBlock = 12.0 * kBlockSide * kBlockSide * kBlockSide + 100; // with its place
+        static constexpr double kBytesPerBlock =
+            12.0 * kBlockSide * kBlockSide * kBlockSide + 100; // including its entry in the map
 
     private:
         static constexpr int kBlockVoxels = kBlockSide * kBlockSide * kBlockSide;
@@ -92,7 +93,7 @@ namespace {
         void addPiece(Triangle const& t)
         {
             auto const range = [&](double double3::*axis) {
-                auto const [low, high] = std::minmax({t[0].place.*axis, t[1].place.*axis, t[2].place.*axis});
+                auto const [low, high] = std::minmax({t[0].position.*axis, t[1].position.*axis, t[2].position.*axis});
                 return std::pair(
                     static_cast<int>(std::ceil(low - halfWidth_)), static_cast<int>(std::floor(high + halfWidth_)));
             };
@@ -101,7 +102,7 @@ namespace {
             auto const [k0, k1] = range(&double3::z);
             for (int k = k0; k <= k1; ++k)
                 for (int j = j0; j <= j1; ++j) {
-                    stopIfCancelled(); // a wide band has many voxels around a single piece
+                    stopIfCancelled(); // a wide band has many voxels around one piece
                     for (int i = i0; i <= i1; ++i)
                         offer(t, i, j, k);
                 }
@@ -111,7 +112,7 @@ namespace {
         {
             double3 const p{static_cast<double>(i), static_cast<double>(j), static_cast<double>(k)};
             Corner const nearest = nearestOf(triangle, p);
-            double3 const away = nearest.place - p;
+            double3 const away = nearest.position - p;
             double const distance = dot(away, away);
             if (!(distance <= halfWidth_ * halfWidth_))
                 return;
@@ -131,7 +132,8 @@ namespace {
         {
             if (!value_.distanceTo)
                 return static_cast<float>(corner.number);
-            double3 const p{corner.place.x * voxelSize_, corner.place.y * voxelSize_, corner.place.z * voxelSize_};
+            double3 const p{
+                corner.position.x * voxelSize_, corner.position.y * voxelSize_, corner.position.z * voxelSize_};
             double3 const away = p - *value_.distanceTo;
             return static_cast<float>(std::sqrt(dot(away, away)));
         }
@@ -149,7 +151,7 @@ namespace {
             return *last_;
         }
 
-        IJK lowest_; // no voxel lies below
+        IJK lowest_; // lower bound of all voxels
         SurfaceValue const& value_;
         double voxelSize_;
         double halfWidth_;
@@ -159,7 +161,7 @@ namespace {
         std::uint64_t voxelCount_ = 0;
     };
 
-    /// What the band can reach: all its voxels are at least at `lowest`.
+    /// The extent of the band: all of its voxels are at or above `lowest`.
     struct Reach {
         IJK lowest;
         std::array<double, 3> sides; // in voxels
@@ -179,8 +181,9 @@ namespace {
             }
             if (!(high - low < kMostAlong && std::abs(low) < kFarthest && std::abs(high) < kFarthest))
                 throw Failure(ExitCode::Refused,
-                    "voxels of that size are too small: there would be more than 16 million of them along the mesh, or "
-                    "more than 2 billion from the origin to the mesh");
+                    "the voxels are too small: there would be more than 16 million of them along the mesh, or more "
+                    "than "
+                    "2 billion between the origin and the mesh");
             lowest[axis] = static_cast<int>(std::floor(low));
             reach.sides[axis] = high - low;
         }
@@ -188,7 +191,7 @@ namespace {
         return reach;
     }
 
-    double3 placeOf(float3 const& p, double voxelSize)
+    double3 inVoxels(float3 const& p, double voxelSize)
     {
         return {p.x / voxelSize, p.y / voxelSize, p.z / voxelSize};
     }
@@ -199,16 +202,17 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
 {
     if (mesh.faceCount() == 0)
         return {};
-    // A band around a piece of plane holds its area times its width. It touches the cubic blocks of side s whose centers
-    // are within half the width and half the block's extent along the normal n, which is s (|nx| + |ny| + |nz|).
+    // A band around a planar piece contains its area times the width. It intersects the cubic blocks of side s whose
+    // centers are within half the width plus half the block's extent along the normal n, which is s (|nx| + |ny| +
+    // |nz|).
     constexpr double kBlockVoxels = Band::kBlockSide * Band::kBlockSide * Band::kBlockSide, kPi = 3.14159265358979;
     double voxels = 0, touched = 0;
     for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
         auto const corners = mesh.corners(face);
         for (std::size_t i = 2; i < corners.size(); ++i) {
-            double3 const origin = placeOf((*mesh.positions)[corners[0]], voxelSize);
-            double3 const a = placeOf((*mesh.positions)[corners[i - 1]], voxelSize) - origin;
-            double3 const b = placeOf((*mesh.positions)[corners[i]], voxelSize) - origin;
+            double3 const origin = inVoxels((*mesh.positions)[corners[0]], voxelSize);
+            double3 const a = inVoxels((*mesh.positions)[corners[i - 1]], voxelSize) - origin;
+            double3 const b = inVoxels((*mesh.positions)[corners[i]], voxelSize) - origin;
             double3 const n = cross(a, b);
             voxels += halfWidth * length(n);
             touched += halfWidth * length(n) + 0.5 * Band::kBlockSide * (std::abs(n.x) + std::abs(n.y) + std::abs(n.z));
@@ -216,7 +220,7 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
     }
     auto const sides = reachOf(mesh, voxelSize, halfWidth).sides;
     double const box = sides[0] * sides[1] * sides[2];
-    // A band wider than the surface holds about what is within its half width of a convex body (Steiner's formula).
+    // A band wider than the surface contains about the parallel body of a convex body (Steiner's formula).
     double const meanWidth = std::max(0.0, (sides[0] + sides[1] + sides[2]) / 2 - 3 * (halfWidth + 1));
     auto const around = [&](double width) {
         return width * (voxels / (2 * halfWidth) + 2 * kPi * width * (meanWidth + width * 2 / 3));
@@ -224,7 +228,7 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
     BandSize size;
     size.voxels = std::min(std::max(voxels, around(halfWidth)), box);
     double const blocks = std::min(std::max(touched, around(halfWidth + Band::kBlockSide / 2.0)), box) / kBlockVoxels;
-    // A leaf of OpenVDB, and the bytes of the file, whose buffer doubles as it grows; and OpenVDB itself.
+    // A leaf of OpenVDB, the bytes of the file, whose buffer doubles as it grows, and OpenVDB itself.
     constexpr double kWrittenPerBlock = 2300, kWrittenPerVoxel = 12, kCodecBytes = 32e6;
     size.bytes = kCodecBytes + size.voxels * sizeof(Voxel)
         + std::max(blocks * Band::kBytesPerBlock, blocks * kWrittenPerBlock + size.voxels * kWrittenPerVoxel);
@@ -233,16 +237,16 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
 
 std::vector<Voxel> voxelsAround(MeshArrays const& mesh, SurfaceValue const& value, double voxelSize, double halfWidth)
 {
-    constexpr unsigned int kFacesBetweenLooks = 1024;
+    constexpr unsigned int kFacesBetweenChecks = 1024;
     if (mesh.faceCount() == 0)
         return {};
     Band band(reachOf(mesh, voxelSize, halfWidth).lowest, value, voxelSize, halfWidth);
     auto const cornerAt = [&](unsigned int point) {
-        return Corner{placeOf((*mesh.positions)[point], voxelSize),
+        return Corner{inVoxels((*mesh.positions)[point], voxelSize),
             value.pointNumbers.empty() ? 0 : double{value.pointNumbers[point]}};
     };
     for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
-        if (face % kFacesBetweenLooks == 0)
+        if (face % kFacesBetweenChecks == 0)
             stopIfCancelled();
         auto const corners = mesh.corners(face);
         for (std::size_t i = 2; i < corners.size(); ++i)

@@ -27,7 +27,7 @@ namespace {
         });
     }
 
-    /// Puts two zeros between the bits of a number of 21 bits.
+    /// Inserts two zero bits after each bit of a 21-bit number.
     std::uint64_t spread(std::uint64_t bits)
     {
         bits = (bits | bits << 32) & 0x001f00000000ffffu;
@@ -37,7 +37,7 @@ namespace {
         return (bits | bits << 2) & 0x1249249249249249u;
     }
 
-    /// How far a coordinate is along a range; 0 for what is not a number.
+    /// The cell of a coordinate along a range; 0 if the coordinate is NaN.
     std::uint64_t cellOf(double coordinate, double low, double high)
     {
         constexpr double kCells = (1 << kBitsPerAxis) - 1;
@@ -45,11 +45,11 @@ namespace {
         return share > 0 ? static_cast<std::uint64_t>(std::min(share, 1.0) * kCells) : 0;
     }
 
-    template <class Box> double squaredDistanceTo(Box const& box, double3 const& place)
+    template <class Box> double squaredDistanceTo(Box const& box, double3 const& point)
     {
         auto const outside = [](double low, double high, double at) { return std::max({low - at, at - high, 0.0}); };
-        double const x = outside(box.min.x, box.max.x, place.x), y = outside(box.min.y, box.max.y, place.y),
-                     z = outside(box.min.z, box.max.z, place.z);
+        double const x = outside(box.min.x, box.max.x, point.x), y = outside(box.min.y, box.max.y, point.y),
+                     z = outside(box.min.z, box.max.z, point.z);
         return x * x + y * y + z * z;
     }
 
@@ -107,7 +107,7 @@ void SurfaceTree::buildBoxes()
     leafCount_ = std::bit_ceil((triangles_.size() + kTrianglesPerLeaf - 1) / kTrianglesPerLeaf);
     boxes_.resize(2 * leafCount_);
     parallelFor(0, leafCount_, [&](std::size_t leaf) { boxes_[leafCount_ + leaf] = boxOfLeaf(leaf); });
-    // Level by level: nodes of one level are written by themselves only.
+    // Level by level. Each node writes only itself and reads the level below.
     for (std::size_t level = leafCount_ / 2; level != 0; level /= 2)
         parallelFor(level, 2 * level, [&](std::size_t node) {
             Box const &a = boxes_[2 * node], &b = boxes_[2 * node + 1];
@@ -115,7 +115,7 @@ void SurfaceTree::buildBoxes()
         });
 }
 
-double SurfaceTree::squaredDistanceInLeaf(std::size_t leaf, double3 const& place) const
+double SurfaceTree::squaredDistanceInLeaf(std::size_t leaf, double3 const& point) const
 {
     double nearest = std::numeric_limits<double>::infinity();
     std::size_t const end = std::min((leaf + 1) * kTrianglesPerLeaf, triangles_.size());
@@ -123,14 +123,14 @@ double SurfaceTree::squaredDistanceInLeaf(std::size_t leaf, double3 const& place
         auto const cornerAt = [&](std::size_t corner) {
             return Corner{inDoubles((*surface_.positions)[triangles_[i][corner]]), 0};
         };
-        double3 const away = nearestOf({cornerAt(0), cornerAt(1), cornerAt(2)}, place).place - place;
+        double3 const away = nearestOf({cornerAt(0), cornerAt(1), cornerAt(2)}, point).position - point;
         nearest = std::min(
-            nearest, dot(away, away)); // not a number for some triangles without area: their edges are others' too
+            nearest, dot(away, away)); // NaN for some triangles without area, whose edges other triangles share
     }
     return nearest;
 }
 
-double SurfaceTree::squaredDistance(double3 const& place) const
+double SurfaceTree::squaredDistance(double3 const& point) const
 {
     double nearest = std::numeric_limits<double>::infinity();
     if (boxes_.empty())
@@ -139,20 +139,20 @@ double SurfaceTree::squaredDistance(double3 const& place) const
         std::size_t index;
         double distance;
     };
-    // A node is replaced by its two children, so one more is open per level.
+    // Each level replaces a node by its two children, so it adds one open node.
     std::array<Node, std::numeric_limits<std::size_t>::digits> open;
     std::size_t openCount = 0;
-    open[openCount++] = {1, squaredDistanceTo(boxes_[1], place)};
+    open[openCount++] = {1, squaredDistanceTo(boxes_[1], point)};
     while (openCount != 0) {
         Node const node = open[--openCount];
         if (!(node.distance < nearest))
             continue;
         if (node.index >= leafCount_) {
-            nearest = std::min(nearest, squaredDistanceInLeaf(node.index - leafCount_, place));
+            nearest = std::min(nearest, squaredDistanceInLeaf(node.index - leafCount_, point));
             continue;
         }
-        Node near{2 * node.index, squaredDistanceTo(boxes_[2 * node.index], place)};
-        Node far{2 * node.index + 1, squaredDistanceTo(boxes_[2 * node.index + 1], place)};
+        Node near{2 * node.index, squaredDistanceTo(boxes_[2 * node.index], point)};
+        Node far{2 * node.index + 1, squaredDistanceTo(boxes_[2 * node.index + 1], point)};
         if (far.distance < near.distance)
             std::swap(near, far);
         open[openCount++] = far;

@@ -1,22 +1,22 @@
 #pragma once
 
 #include "MeshArrays.h"
-#include "NearestPlace.h"
+#include "NearestPoint.h"
 
 #include <vector>
 
 namespace ModelingProgram {
 
-/// Finds how far places are from a surface, whose faces are taken for the fans of triangles from their first corners: a
-/// binary tree of boxes over the triangles in the order of a space-filling curve (Lauterbach et al., "Fast BVH
-/// construction on GPUs", 2009). Building sorts the triangles; a query near the surface takes about the logarithm of
-/// their count.
+/// Finds distances of points to a surface, whose faces count as the fans of triangles from their first corners: a
+/// linear bounding volume hierarchy, which is a binary tree of boxes over the triangles in Morton order (Lauterbach et
+/// al., "Fast BVH construction on GPUs", 2009). Building sorts the triangles; a query near the surface takes about
+/// logarithmic time.
 class SurfaceTree {
 public:
     explicit SurfaceTree(MeshArrays const& surface);
 
-    /// The square of the distance to the nearest place of the surface; infinite if there are no triangles.
-    double squaredDistance(double3 const& place) const;
+    /// The squared distance to the nearest point of the surface; infinite if there are no triangles.
+    double squaredDistance(double3 const& point) const;
 
 private:
     using Corners = std::array<unsigned int, 3>;
@@ -27,7 +27,7 @@ private:
     void listTriangles();
     void buildBoxes();
     Box boxOfLeaf(std::size_t leaf) const;
-    double squaredDistanceInLeaf(std::size_t leaf, double3 const& place) const;
+    double squaredDistanceInLeaf(std::size_t leaf, double3 const& point) const;
 
     MeshArrays surface_;
     std::vector<Corners> triangles_;

@@ -21,7 +21,8 @@ namespace {
 
     constexpr double kLossy = 1e-5; // positions in single precision leave differences of about 1e-7
 
-    /// By how much of the polygon's area that of its triangles differs; 0 for a polygon without area.
+    /// The difference between the areas of the triangles and of the polygon, as a fraction; 0 for a polygon without
+    /// area.
     double differenceOf(Corners polygon, Corners triangles, float3 const* position)
     {
         double3 const whole = areaVector(polygon, position);
@@ -52,8 +53,8 @@ namespace {
         return Corners(triangles.faceVertex->data + corner - count, count);
     }
 
-    /// Clipping ears may happen to give a fan too, but not from whichever corner the face starts.
-    /// \return for each of the faces whether it is a fan again from its second corner
+    /// Ear clipping may happen to give a fan too, but not for every first corner.
+    /// \return for each face whether it becomes a fan again if it starts at its second corner
     std::vector<bool> areFansFromSecondCorner(MeshArrays const& polygons, std::vector<unsigned int> const& faces)
     {
         Orvan::Array<unsigned int> faceVertex;

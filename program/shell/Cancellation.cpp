@@ -19,7 +19,7 @@ namespace {
 
     std::atomic<bool> isStopping = false;
 
-    // The handlers run in the middle of anything: no memory, no locks, no buffered output.
+    // The handlers must be async-signal-safe: no allocation, no locks, no buffered output.
 
     void endProgram(int signal)
     {
@@ -27,19 +27,19 @@ namespace {
         struct sigaction action = {};
         action.sa_handler = SIG_DFL;
         ::sigaction(signal, &action, nullptr);
-        ::raise(signal); // arrives when the handler returns, and ends the program as if there were no handler
+        ::raise(signal); // delivered when the handler returns; terminates the program as if there were no handler
     }
 
     void cancelJob(int signal)
     {
-        constexpr char kText[] = "\nmodeling: stopping; once more ends the program at once\n";
+        constexpr char kText[] = "\nmodeling: stopping; interrupt again to quit immediately\n";
         if (isStopping.exchange(true)) {
             endProgram(signal);
             return;
         }
         int const oldError = errno;
         Orvan::setJobCancelled(true);
-        // Nobody is left to tell if this fails.
+        // A failure to write cannot be reported anywhere.
         [[maybe_unused]] auto const written = ::write(STDERR_FILENO, kText, sizeof kText - 1);
         errno = oldError;
     }
@@ -53,7 +53,7 @@ CancelOnSignal::CancelOnSignal()
         handle(signal, cancelJob);
     for (int const signal : kEnding)
         handle(signal, endProgram);
-    handle(SIGXFSZ, SIG_IGN); // then writing fails like on a full disk
+    handle(SIGXFSZ, SIG_IGN); // writing then fails as on a full disk
 }
 
 CancelOnSignal::~CancelOnSignal()
@@ -66,12 +66,12 @@ void CancelOnSignal::handle(int signal, void (*handler)(int))
 {
     struct sigaction action = {};
     if (::sigaction(signal, nullptr, &action) != 0 || action.sa_handler == SIG_IGN)
-        return; // who starts a program with nohup or in the background has signals ignored
+        return; // nohup and background jobs start with signals ignored
     oldActions_.emplace_back(signal, action);
     action = {};
     action.sa_handler = handler;
     sigemptyset(&action.sa_mask);
-    action.sa_flags = SA_RESTART; // no read or write of a file fails because of a signal
+    action.sa_flags = SA_RESTART; // reads and writes of files are not interrupted
     ::sigaction(signal, &action, nullptr);
 }
 

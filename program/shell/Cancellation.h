@@ -6,8 +6,8 @@
 
 namespace ModelingProgram {
 
-/// While it lives, the first Ctrl-C (or SIGTERM) asks the running operation to stop. A second one ends the program at once,
-/// and so do SIGHUP, SIGPIPE and SIGQUIT; the file that is being written is removed first.
+/// During its lifetime, the first Ctrl-C (or SIGTERM) asks the running operation to stop. A second one terminates the
+/// program immediately, as do SIGHUP, SIGPIPE, SIGQUIT and other signals; an unfinished output file is removed first.
 class CancelOnSignal {
 public:
     CancelOnSignal();
@@ -21,7 +21,7 @@ private:
     std::vector<std::pair<int, struct sigaction>> oldActions_;
 };
 
-/// \throws Failure  once the job is cancelled
+/// \throws Failure  if the job is cancelled
 void stopIfCancelled();
 
 }

@@ -56,7 +56,7 @@ namespace {
     template <class T> struct ValueOf<std::vector<T>> : ValueOf<T> {
     };
 
-    /// Why a text is not a value of the type; empty if it is one.
+    /// Says why a text is not a value of the type; empty if it is one.
     template <class T> std::string faultIn(std::string const& text)
     {
         if constexpr (std::is_integral_v<T>) {
@@ -78,7 +78,8 @@ namespace {
         return argument.size() > 1 && argument[0] == '-' && std::isnan(numberIn(argument));
     }
 
-    /// Insertions, deletions, replacements and swaps of neighbors that make one text of the other.
+    /// The number of insertions, deletions, substitutions and swaps of adjacent characters that turn one text into the
+    /// other (optimal string alignment distance).
     std::size_t editDistance(std::string const& a, std::string const& b)
     {
         std::vector<std::vector<std::size_t>> distance(a.size() + 1, std::vector<std::size_t>(b.size() + 1));
@@ -98,7 +99,7 @@ namespace {
         return distance[a.size()][b.size()];
     }
 
-    /// "; did you mean ...?" with the name that is most like the text, or nothing if none is.
+    /// "; did you mean ...?" with the most similar name; empty if no name is similar.
     std::string suggestionFor(std::string const& text, std::vector<std::string> const& names)
     {
         constexpr std::size_t kLongestName = 40; // also bounds the time that a long argument takes
@@ -116,7 +117,7 @@ namespace {
         return best ? fmt::format("; did you mean {}?", *best) : std::string();
     }
 
-    /// Those of an application and of the groups in it.
+    /// The options of a command and of its groups.
     std::vector<CLI::Option const*> optionsOf(CLI::App const& app)
     {
         std::vector<CLI::Option const*> options = app.get_options([](CLI::Option const*) { return true; });
@@ -135,7 +136,7 @@ namespace {
         return names;
     }
 
-    /// The options of a group, which has a --help of its own too.
+    /// The options of a group, except its own --help.
     std::vector<CLI::Option const*> choicesOf(CLI::App const& group)
     {
         return group.get_options([&](CLI::Option const* option) { return option != group.get_help_ptr(); });
@@ -150,7 +151,7 @@ namespace {
         return fmt::format("{} has no option {}{}", app.get_name(), name, suggestionFor(name, names));
     }
 
-    /// A command line without one of the commands.
+    /// Describes the mistake in a command line without a known command.
     std::string describeWithoutCommand(CLI::App const& program)
     {
         std::vector<std::string> const arguments = program.remaining();
@@ -166,7 +167,7 @@ namespace {
         return "no command is given";
     }
 
-    /// What a command line lacks, or has too much of a group.
+    /// Names the missing options, or the group of which none or several were given.
     std::string describeMissing(CLI::App const& command, std::string const& fallback)
     {
         std::vector<std::string> missing;
@@ -195,8 +196,8 @@ namespace {
                 return fmt::format(
                     "{} is given more than once, or with too many values", option->get_name(false, false));
             if (count != 0 && count < option->get_items_expected_min())
-                return fmt::format("{} takes {} values, and there {} {}", option->get_name(false, false),
-                    option->get_items_expected_min(), count == 1 ? "is" : "are", count);
+                return fmt::format("{} takes {} values, but {} {} given", option->get_name(false, false),
+                    option->get_items_expected_min(), count, count == 1 ? "was" : "were");
         }
         for (CLI::Option const* option : optionsOf(command)) {
             std::string const name = option->get_name(false, false);
@@ -210,12 +211,12 @@ namespace {
     {
         for (CLI::Option const* option : optionsOf(command))
             if (fallback.find(option->get_name(false, false) + " = ") != std::string::npos)
-                return option->get_name(false, false)
-                    + " takes no value"; // only flags are left to the parser to convert
+                return option->get_name(false, false) + " takes no value"; // the parser only converts values of flags
         return fallback;
     }
 
-    /// The mistake in a command line, in a sentence. Unknown names come first: they explain what is missing.
+    /// Describes the mistake in a command line. Unknown names come first: a misspelled option also appears as a missing
+    /// one.
     std::string describeMistake(CLI::ParseError const& error, CLI::App const& program)
     {
         std::vector<CLI::App*> const commands = program.get_subcommands();
@@ -233,7 +234,7 @@ namespace {
         if (dynamic_cast<CLI::ConversionError const*>(&error))
             return describeConversion(command, error.what());
         if (!rest.empty())
-            return fmt::format("\"{}\" is one argument more than {} takes", rest[0], command.get_name());
+            return fmt::format("\"{}\" is one argument too many for {}", rest[0], command.get_name());
         return error.what();
     }
 
@@ -277,7 +278,7 @@ namespace {
         return fmt::format("argument {} is empty", position);
     }
 
-    /// A text in lines of at most that width, behind one another and each but the first one indented.
+    /// Wraps a text into lines of at most `width` characters; all lines but the first are indented.
     std::string wrapped(std::string const& text, std::size_t width, std::size_t indent)
     {
         std::string result;
@@ -295,7 +296,7 @@ namespace {
         return result;
     }
 
-    /// Paragraphs, which empty lines separate, in lines of the width of the help.
+    /// Rewraps paragraphs, separated by empty lines, to the width of the help.
     std::string reflowed(std::string_view text)
     {
         std::string result;
@@ -338,7 +339,7 @@ namespace {
     private:
         std::string row(std::string const& name, std::string const& description) const
         {
-            constexpr std::size_t kGroupIndent = 2; // that options of a choice get on top
+            constexpr std::size_t kGroupIndent = 2; // additional indentation of options in a group
             std::size_t const left = get_column_width();
             std::string const start = "  " + name;
             std::string const gap =

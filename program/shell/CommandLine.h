@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
-// Commands and their options. CLI11 stands behind them, in one source: whatever includes it takes ten seconds more to
-// compile.
+// Commands and their options. Only one source includes CLI11, which adds ten seconds to the compilation of each source
+// that includes it.
 namespace CLI {
 class App;
 class Option;
@@ -15,7 +15,7 @@ class Option;
 
 namespace ModelingProgram {
 
-/// An option of a command. Each function says one thing more about it.
+/// An option of a command. Each function adds one property and can be chained.
 class Option {
 public:
     explicit Option(CLI::Option& option)
@@ -24,22 +24,22 @@ public:
     }
 
     Option& required();
-    /// Takes that many values; positional arguments may follow.
+    /// Takes exactly this many values, so that positional arguments may follow.
     Option& values(int count);
-    /// What the help calls the value.
+    /// Sets the name of the value in the help.
     Option& valueName(char const* name);
-    /// What the help shows behind the name of the option, in place of the value's name and all else.
+    /// Sets the text after the name of the option in the help, which replaces the value's name, range and default.
     Option& synopsis(char const* text);
-    /// The value that the variable has by now is shown in the help.
+    /// Shows the current value of the variable as the default in the help.
     Option& showDefault();
 
     Option& needs(Option const& other);
     Option& excludes(Option const& other);
 
-    // What a value has to be, besides a finite number if the variable is one; the help shows `shown`.
+    // Checks of the value. Values of numeric variables must also be finite numbers. The help shows `shown`.
 
     Option& between(double least, double most, char const* shown = "");
-    /// A number above 0 that single precision can hold.
+    /// A positive number that fits in single precision.
     Option& positive();
     Option& oneOf(std::vector<std::string> const& texts);
     /// A positive number of bytes, optionally decimal and with a unit: 500MB, 1.5GB.
@@ -49,7 +49,7 @@ private:
     CLI::Option* option_;
 };
 
-/// A command, or a choice in it.
+/// A command, or a group of alternative options in it.
 class Command {
 public:
     explicit Command(CLI::App& app)
@@ -62,7 +62,7 @@ public:
     /// \tparam T  a type that is instantiated in CommandLine.cpp
     template <class T> Option addOption(char const* name, T& value, std::string const& description);
     Option addFlag(char const* names, bool& isSet, char const* description);
-    /// Options of which exactly one has to be given.
+    /// Adds a group of options of which exactly one is required.
     Command addChoice(char const* title, std::string const& description);
 
     void onSelected(std::function<void()> run);
@@ -73,7 +73,7 @@ private:
 
 struct CommandHelp {
     char const* name;
-    char const* summary; // a line in the list of commands
+    char const* summary; // one line in the list of commands
     char const* details;
     char const* examples; // command lines
 };
@@ -85,8 +85,8 @@ public:
 
     Command addCommand(CommandHelp const& help);
 
-    /// Sets the variables of options, and runs what is to be run for the command selected.
-    /// \return the exit code where there is nothing to be done any more: help was asked for, or there is a mistake
+    /// Sets the variables of the options and calls the function registered for the selected command.
+    /// \return the exit code if nothing else is to be done: help was printed, or the command line is wrong
     std::optional<int> parse(int argumentCount, char const* const* arguments);
 
 private:

@@ -6,7 +6,7 @@
 
 namespace ModelingProgram {
 
-/// What the program returns to the shell. The meanings are printed by --help and listed in docs/program.md.
+/// Exit codes of the program. --help and docs/program.md list their meanings.
 enum class ExitCode {
     Done = 0,
     Unexpected = 1,
@@ -18,7 +18,7 @@ enum class ExitCode {
     OutOfMemory = 7
 };
 
-/// Ends a command. The sentence is for the user; the reasons, if there are any, stand below it, a line each.
+/// Ends a command with a sentence for the user. The reasons, if any, are printed below it, one per line.
 class Failure : public std::runtime_error {
 public:
     Failure(ExitCode exitCode, std::string const& sentence, std::vector<std::string> reasonList = {})

@@ -22,8 +22,8 @@ namespace fs = std::filesystem;
 
 namespace {
 
-    // The rest is for what is allocated until the work looks at cancellation, and for other programs.
-    constexpr double kShareOfFree = 0.9;
+    // The rest is for what is allocated until the next cancellation check, and for other programs.
+    constexpr double kFractionOfFree = 0.9;
 
     /// The number after a word at the start of a line.
     std::optional<std::uint64_t> numberAfter(std::string_view word, fs::path const& file)
@@ -57,7 +57,7 @@ namespace {
         "sys/fs/cgroup/memory", "memory.limit_in_bytes", "memory.usage_in_bytes", "total_inactive_file"};
     constexpr Hierarchy kSecondVersion = {"sys/fs/cgroup", "memory.max", "memory.current", "inactive_file"};
 
-    /// What a group and those that it is in leave free.
+    /// The free memory in a control group and its ancestors.
     std::uint64_t freeInGroup(Hierarchy const& hierarchy, fs::path group, fs::path const& root)
     {
         std::uint64_t free = std::numeric_limits<std::uint64_t>::max();
@@ -106,8 +106,9 @@ std::uint64_t freeMemory(fs::path const& root)
 
 MemoryLimit::MemoryLimit(std::uint64_t bytes)
     : isUsers_(bytes != 0)
-    , bytes_(isUsers_ ? bytes
-                      : presentMemory() + static_cast<std::uint64_t>(static_cast<double>(freeMemory()) * kShareOfFree))
+    , bytes_(isUsers_
+              ? bytes
+              : presentMemory() + static_cast<std::uint64_t>(static_cast<double>(freeMemory()) * kFractionOfFree))
 {
     look();
     watcher_ = std::thread([this] {
@@ -137,7 +138,7 @@ void MemoryLimit::look()
 
 std::string MemoryLimit::limit() const
 {
-    return fmt::format("{}, which {}", formatBytes(bytes_),
+    return fmt::format("{} that {}", formatBytes(bytes_),
         isUsers_ ? "--max-memory allows" : "this machine has free (--max-memory sets another limit)");
 }
 
@@ -146,7 +147,7 @@ void MemoryLimit::require(std::uint64_t bytes, std::string const& what, std::str
     std::uint64_t const present = presentMemory();
     if (bytes > bytes_ - std::min(present, bytes_))
         throw Failure(ExitCode::OutOfMemory,
-            fmt::format("{} would take about {}, and the program takes {} already: more than {}. {}", what,
+            fmt::format("{} would need about {} in addition to the {} in use, which exceeds the {}. {}", what,
                 formatBytes(bytes), formatBytes(present), limit(), advice));
 }
 
@@ -158,13 +159,15 @@ void MemoryLimit::run(std::function<void()> const& work, std::string const& advi
         if (failure.code != ExitCode::Cancelled || !wasExceeded_)
             throw;
         throw Failure(ExitCode::OutOfMemory,
-            fmt::format("stopped, since this takes more than {}; nothing was written. {}", limit(), advice));
+            fmt::format("stopped: this needs more than the {}; nothing was written. {}", limit(), advice));
     }
 }
 
 void addMemoryLimit(std::uint64_t& bytes, Command& command)
 {
-    command.addOption("--max-memory", bytes, "Stop before the program takes more (500MB, 4GB); without, what is free")
+    command
+        .addOption("--max-memory", bytes,
+            "Stop before more memory is used, such as 500MB or 1.5GB; default: most of what is free")
         .valueName("SIZE")
         .bytes();
 }

@@ -13,24 +13,24 @@
 
 namespace ModelingProgram {
 
-/// How much memory the program may take. While it lives, a thread watches, and cancels the job once the program takes
-/// more. The work then stops at the next place where it looks at that, and may take more until then: so whatever can
-/// tell in advance what it will take asks `require` first.
+/// Limits the memory of the program. During its lifetime a thread polls the memory in use and cancels the job if that
+/// exceeds the limit. The work then stops at its next cancellation check and may allocate more until then, so work
+/// whose size is known in advance calls `require` first.
 class MemoryLimit {
 public:
-    /// \param bytes  0 if the user has set no limit: then most of what is free, so that the kernel need not kill anything
+    /// \param bytes  0 for the default: most of the free memory, so that the kernel does not have to kill a process
     explicit MemoryLimit(std::uint64_t bytes);
     MemoryLimit(MemoryLimit const&) = delete;
     MemoryLimit& operator=(MemoryLimit const&) = delete;
     ~MemoryLimit();
 
-    /// Refuses work that would take the program beyond the limit.
-    /// \param bytes   what the work takes, in addition to what the program takes now
-    /// \param what    begins the message: "a band of 3 million voxels"
-    /// \param advice  ends it: a sentence on what takes less
+    /// Refuses work that would exceed the limit.
+    /// \param bytes   what the work needs in addition to the memory in use
+    /// \param what    start of the message: "a band of 3 million voxels"
+    /// \param advice  end of the message: a sentence on how to need less
     void require(std::uint64_t bytes, std::string const& what, std::string const& advice) const;
 
-    /// Runs work, and says so if this limit has ended it.
+    /// Runs work. If this limit stops it, the failure says so.
     void run(std::function<void()> const& work, std::string const& advice) const;
 
 private:
@@ -49,12 +49,12 @@ private:
 /// Adds --max-memory to a command.
 void addMemoryLimit(std::uint64_t& bytes, Command& command);
 
-/// The memory that the program takes at present.
+/// The resident memory of the program, in bytes.
 std::uint64_t presentMemory();
 
-/// The memory that the program can still take: what the machine has available, and no more than any of the control
-/// groups (of either version) that the program is in leaves it. Caches that the kernel can drop count as free.
-/// \param root  where the system's files are; tests have files of their own
+/// The memory that the program can still allocate: what the machine has available, or less if a control group (version
+/// 1 or 2) of the program leaves less. Caches that the kernel can drop count as free.
+/// \param root  directory that holds /proc and /sys; tests use one of their own
 std::uint64_t freeMemory(std::filesystem::path const& root = "/");
 
 }

@@ -13,8 +13,8 @@ namespace ModelingProgram {
 
 using Json = nlohmann::ordered_json;
 
-/// What a command has to tell: results go to standard output at its end, as a text or as one JSON document; warnings go
-/// to standard error at once, and into the document too.
+/// The output of a command. Results are printed to standard output when it ends, as text or as one JSON document;
+/// warnings are printed to standard error immediately and also added to the document.
 class Report {
 public:
     explicit Report(std::string const& command);
@@ -22,11 +22,11 @@ public:
     void warn(std::string const& sentence);
 
     Json document; // what --json prints
-    std::string text; // what is printed otherwise
-    ReadOptions reading; // of all files of the command; the first one read decides which center is subtracted
+    std::string text; // what is printed without --json
+    ReadOptions reading; // of all files; the first file read determines the center to subtract
 };
 
-/// The document as it is printed. Bytes that are no UTF-8 (names in files may hold any) become replacement characters.
+/// The document as it is printed. Invalid UTF-8, which names in files may contain, becomes replacement characters.
 std::string toText(Json const& document);
 
 /// Returns false if the text could not be written completely.
@@ -49,13 +49,13 @@ std::string formatBytes(std::uint64_t bytes);
 
 struct Column {
     std::string title;
-    bool isNumber = false; // then it is aligned to the right
+    bool isNumber = false; // right-aligned
 };
 
-/// Cells in aligned columns; without a line of titles where all are empty.
+/// Aligns cells in columns. The title line is omitted if all titles are empty.
 std::string formatTable(std::vector<Column> const& columns, std::vector<std::vector<std::string>> const& rows);
 
-/// Objects with the same keys side by side, a row a key: "openEdges" is shown as "open edges", null as "-".
+/// Shows objects with the same keys side by side, one row per key: "openEdges" becomes "open edges", null becomes "-".
 struct Values {
     std::string title;
     Json values;

@@ -47,7 +47,7 @@ namespace {
 
 }
 
-TEST(CommandLine, TakesAnyArgumentsWithoutHarm)
+TEST(CommandLine, SurvivesArbitraryArguments)
 {
     // Files are in a folder that does not exist: nothing is ever read or written.
     std::vector<std::string> const words = {"", "", "no/a.obj", "no/b.ply", "no/c.vdb", "no/", "--json",
@@ -76,7 +76,7 @@ TEST(CommandLine, TakesAnyArgumentsWithoutHarm)
     EXPECT_FALSE(std::filesystem::exists("no"));
 }
 
-TEST(CommandLine, SaysWhatIsWrongAndWhatMayBeMeant)
+TEST(CommandLine, DescribesMistakesAndSuggestsNames)
 {
     struct Case {
         char const* line;
@@ -88,12 +88,12 @@ TEST(CommandLine, SaysWhatIsWrongAndWhatMayBeMeant)
         {"xyzzy a b", "there is no command xyzzy\n"},
         {"--json info a", "--json belongs after the command: info --json\n"},
         {"smooth a", "modeling: smooth needs OUT\nRun \"modeling smooth --help\""},
-        {"smooth a b c", "\"c\" is one argument more than smooth takes"},
+        {"smooth a b c", "\"c\" is one argument too many for smooth"},
         {"smooth a b --wieghts c", "smooth has no option --wieghts; did you mean --weights?"},
         {"delete-faces a --indexes b", "delete-faces has no option --indexes; did you mean --indices?"},
         {"delete-faces a b", "delete-faces needs one of --indices, --box, --attribute\n"},
         {"delete-faces a b --indices c --attribute d", "takes only one of --indices, --box, --attribute\n"},
-        {"delete-faces a b --box 1 2 3", "--box takes 6 values, and there are 3"},
+        {"delete-faces a b --box 1 2 3", "--box takes 6 values, but 3 were given"},
         {"delete-faces a b --box -.5 2 3 -4 5 nan", "--box: nan is not a number"},
         {"smooth a b --amount 1 --amount 2", "--amount is given more than once"},
         {"smooth a b --threads", "--threads needs a value"},
@@ -138,7 +138,7 @@ TEST(CommandLine, NamesTheEmptyArgument)
     }
 }
 
-TEST(CommandLine, TakesDecimalAmountsOfMemory)
+TEST(CommandLine, AcceptsDecimalAmountsOfMemory)
 {
     for (char const* const size : {"500MB", "1.5GB", "1.5 gb", "2GiB", ".5k", "1e3", "16EB", "0.5", "7"}) {
         Result const result = run({"subdivide", "a.obj", "--tolerance", "1", "--max-memory", size}); // without OUT
@@ -148,7 +148,7 @@ TEST(CommandLine, TakesDecimalAmountsOfMemory)
     }
 }
 
-TEST(CommandLine, HelpFitsATerminalAndNamesThings)
+TEST(CommandLine, HelpFitsATerminal)
 {
     std::vector<std::vector<std::string>> lines = {{"--help"}};
     for (std::string const& command : kCommands)

@@ -6,9 +6,9 @@
 
 namespace ModelingProgram {
 
-/// A corner of a triangle, and a number that is blended over the triangle.
+/// A corner of a triangle, and a number that is interpolated over the triangle.
 struct Corner {
-    double3 place;
+    double3 position;
     double number;
 };
 using Triangle = std::array<Corner, 3>;
@@ -16,16 +16,17 @@ using Triangle = std::array<Corner, 3>;
 inline Corner blend(Corner const& a, Corner const& b, double t)
 {
     auto const between = [t](double from, double to) { return from + t * (to - from); };
-    return {{between(a.place.x, b.place.x), between(a.place.y, b.place.y), between(a.place.z, b.place.z)},
+    return {
+        {between(a.position.x, b.position.x), between(a.position.y, b.position.y), between(a.position.z, b.position.z)},
         between(a.number, b.number)};
 }
 
-/// The nearest place of a triangle. Ericson, "Real-Time Collision Detection", 2005, 5.1.5.
+/// The point of a triangle nearest to `p`. Ericson, "Real-Time Collision Detection", 2005, 5.1.5.
 inline Corner nearestOf(Triangle const& triangle, double3 const& p)
 {
     auto const& [a, b, c] = triangle;
-    double3 const ab = b.place - a.place, ac = c.place - a.place;
-    double3 const ap = p - a.place, bp = p - b.place, cp = p - c.place;
+    double3 const ab = b.position - a.position, ac = c.position - a.position;
+    double3 const ap = p - a.position, bp = p - b.position, cp = p - c.position;
     double const abA = dot(ab, ap), acA = dot(ac, ap);
     if (abA <= 0 && acA <= 0)
         return a;
@@ -46,7 +47,8 @@ inline Corner nearestOf(Triangle const& triangle, double3 const& p)
     if (areaA <= 0 && beyondB >= 0 && beyondC >= 0)
         return blend(b, c, beyondB / (beyondB + beyondC));
     double const area = areaA + areaB + areaC, v = areaB / area, w = areaC / area;
-    return {{a.place.x + ab.x * v + ac.x * w, a.place.y + ab.y * v + ac.y * w, a.place.z + ab.z * v + ac.z * w},
+    return {
+        {a.position.x + ab.x * v + ac.x * w, a.position.y + ab.y * v + ac.y * w, a.position.z + ab.z * v + ac.z * w},
         a.number + (b.number - a.number) * v + (c.number - a.number) * w};
 }
 
