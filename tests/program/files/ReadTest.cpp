@@ -78,7 +78,7 @@ namespace {
                     "bytes after the last element are left out: 1"}},
             {"comments in OFF",
                 {".off", "# a\nOFF # b\n\n3 1 # c\n0 0 0\n# d\n1 0 0\n0 1 0\n3 2 1 0\n#", 3, {2, 1, 0}, {0, 3}}},
-            {"colours refer to a color table",
+            {"colors that refer to a color table",
                 {".off", "OFF 3 1 0\n0 0 0\n1 0 0\n0 1 0\n3 2 1 0 7\n", 3, {2, 1, 0}, {0, 3},
                     "refer to a color table"}},
             {"points without normals", {".xyz", "0 0 0\n\n 1 2.5 3 # x\r\n", 2, {}, {}}},
@@ -409,10 +409,10 @@ namespace {
         EXPECT_THAT(
             readContent(".ply",
                 "ply\nformat ascii 1.0\nelement vertex 2\nproperty float x\nproperty float y\nproperty float z\n"
-                "property list uchar int neighbours\nproperty list uchar ushort three\nend_header\n"
+                "property list uchar int neighbors\nproperty list uchar ushort three\nend_header\n"
                 "0 0 0 1 1 3 1 2 3\n1 0 0 2 0 0 3 1 2 3\n")
                 .notes,
-            ElementsAre(HasSubstr("\"neighbours\""), HasSubstr("\"three\"")));
+            ElementsAre(HasSubstr("\"neighbors\""), HasSubstr("\"three\"")));
     }
 
     TEST(ReadOff, distinguishesBytesFromFractions)
