@@ -1,10 +1,10 @@
 #include "Program.h"
 
-#include "Cancellation.h"
-#include "Commands.h"
-#include "Failure.h"
-#include "Operation.h"
+#include "commands/Commands.h"
+#include "commands/Operation.h"
 #include "files/GeometryFile.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
 
 #include <fmt/format.h>
 #include <tbb/global_control.h>
@@ -21,31 +21,26 @@ namespace {
         addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth, addRemoveSlivers, addStitch};
 
     constexpr char kFooter[] =
-        R"(Files are told apart by the ends of their names. Read: .obj .ply .stl .off .xyz; written: .obj .ply
-.stl .vtp. An existing file is replaced only with --force, also if OUT is IN, and only by a complete
-one; if anything fails it stays as it was. Results go to standard output, messages to standard
-error.
+        R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz; written: .obj .ply
+.stl .vtp. An existing file is replaced only with --force, even if OUT is IN, and only by a complete
+file; if anything fails it stays unchanged. Results are printed to standard output, messages to
+standard error.
 
 Exit codes:
   0  done
-  1  unexpected failure: a fault of the program
+  1  unexpected failure: a bug in the program
   2  the command line is wrong
-  3  a file cannot be read or written
-  4  a file holds geometry that is not valid
+  3  a file or standard output cannot be read or written
+  4  a file contains invalid geometry
   5  the operation refuses its input; the message says why
   6  cancelled by Ctrl-C or SIGTERM; nothing was written
-  7  out of memory, or of what --max-memory allows
+  7  out of memory, or beyond --max-memory
 
-"modeling COMMAND --help" tells about a command.)";
+"modeling COMMAND --help" explains a command.)";
 
-    constexpr char kOutOfMemory[] = "there is not enough memory for this";
+    constexpr char kOutOfMemory[] = "out of memory";
 
-    bool writeToStandardOutput(std::string const& text)
-    {
-        return std::fwrite(text.data(), 1, text.size(), stdout) == text.size() && std::fflush(stdout) == 0;
-    }
-
-    /// For use where an exception is being handled.
+    /// \pre  an exception is being handled
     Failure currentFailure()
     {
         try {
@@ -70,7 +65,8 @@ Exit codes:
         if (asJson) {
             report.document["exitCode"] = static_cast<int>(failure.code);
             report.document["error"] = {{"message", failure.what()}, {"reasons", failure.reasons}};
-            writeToStandardOutput(toText(report.document) + "\n"); // where that fails there is a failure already
+            // If this fails too, the exit code already reports a failure.
+            [[maybe_unused]] bool const isWritten = writeToStandardOutput(toText(report.document) + "\n");
         }
         return static_cast<int>(failure.code);
     }
@@ -91,7 +87,7 @@ Exit codes:
             if (report.document.contains("center"))
                 report.text += centerOf(report.reading) + "\n";
             if (!writeToStandardOutput(invocation.asJson ? toText(report.document) + "\n" : report.text))
-                throw Failure(ExitCode::File, "cannot write to standard output");
+                throw Failure(ExitCode::File, kCannotWriteOutput);
             return 0;
         } catch (...) {
             return reportFailure(currentFailure(), invocation.asJson, report);
@@ -115,17 +111,18 @@ Exit codes:
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation)
 {
     Command command = program.addCommand(help);
-    command.addFlag("--json", invocation.asJson, "Print one JSON document in place of text, also on failure");
+    command.addFlag("--json", invocation.asJson, "Print one JSON document instead of text, also on failure");
     command.addOption("--threads", invocation.threads, "Use at most N threads").valueName("N").between(1, 1024);
     command.addFlag("--lenient", invocation.reading.isLenient,
-        "Leave out what is broken in files, with a warning: points that are NaN, the faces at them, faces with fewer "
+        "Leave out broken elements of files, with a warning: points that are NaN, the faces at them, faces with fewer "
         "than three corners, bytes at the end");
-    command.addFlag("--center", invocation.reading.isCentered,
-        "Subtract a rounded center from all positions, in double precision, and tell it");
-    command.addOption("--center-at", invocation.center, "Subtract this place instead")
+    Option const center = command.addFlag("--center", invocation.reading.isCentered,
+        "Subtract a rounded center from all positions, in double precision, and print it");
+    command.addOption("--center-at", invocation.center, "Subtract this point instead")
         .synopsis("X Y Z")
         .values(3)
-        .between(-1e18, 1e18);
+        .between(-1e18, 1e18)
+        .excludes(center);
     return command;
 }
 
@@ -160,7 +157,7 @@ int runProgram(int argumentCount, char const* const* arguments)
     try {
         return parseAndRun(argumentCount, arguments);
     } catch (std::bad_alloc const&) {
-        // Not even the message could be made.
+        // The message could not be allocated.
         std::fprintf(stderr, "modeling: %s\n", kOutOfMemory);
         return static_cast<int>(ExitCode::OutOfMemory);
     }

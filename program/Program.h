@@ -2,7 +2,7 @@
 
 namespace ModelingProgram {
 
-/// The program: reads the command line, runs the command, prints what it tells. Returns the exit code.
+/// Parses the command line, runs the command and prints its report. \return the exit code
 int runProgram(int argumentCount, char const* const* arguments);
 
 }

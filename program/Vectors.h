@@ -2,11 +2,12 @@
 
 #include <TessaraMathSupport/Types.h>
 
+#include <algorithm>
 #include <cmath>
 
 namespace ModelingProgram {
 
-// Vectors in double precision, for what the program measures itself.
+// Vector arithmetic for all wings of the program, in double precision unless stated otherwise.
 
 using Tessara::Math::double3;
 using Tessara::Math::float3;
@@ -39,6 +40,41 @@ inline double3 cross(double3 const& a, double3 const& b)
 inline double length(double3 const& a)
 {
     return std::sqrt(dot(a, a));
+}
+
+inline bool isFinite(float3 const& p)
+{
+    return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
+}
+
+/// The lower corner of the box around two points.
+template <class Vector> Vector lowerCorner(Vector const& a, Vector const& b)
+{
+    return {std::min(a.x, b.x), std::min(a.y, b.y), std::min(a.z, b.z)};
+}
+
+/// The upper corner of the box around two points.
+template <class Vector> Vector upperCorner(Vector const& a, Vector const& b)
+{
+    return {std::max(a.x, b.x), std::max(a.y, b.y), std::max(a.z, b.z)};
+}
+
+inline double distance(float3 const& a, float3 const& b)
+{
+    return std::hypot(double{a.x} - b.x, double{a.y} - b.y, double{a.z} - b.z);
+}
+
+/// In single precision, without intermediate overflow.
+inline float distanceInFloats(float3 const& a, float3 const& b)
+{
+    return std::hypot(b.x - a.x, b.y - a.y, b.z - a.z);
+}
+
+/// In single precision, rounded as the library rounds the lengths of edges, so that both count the same slivers.
+inline float edgeLengthInFloats(float3 const& a, float3 const& b)
+{
+    float3 const d{b.x - a.x, b.y - a.y, b.z - a.z};
+    return std::sqrt((d.x * d.x + d.y * d.y) + d.z * d.z);
 }
 
 }

@@ -1,7 +1,7 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Operation.h"
+#include "geometry/Geometry.h"
+#include "shell/Failure.h"
 
 #include <Modeling/addPointsToPointCloud.h>
 #include <TessaraGeometry/Makers.h>
@@ -28,9 +28,9 @@ namespace {
     {
         Orvan::String const name = tag.c_str();
         if (name == sPointPosition || name == sPointComp)
-            throw Failure(ExitCode::Refused, fmt::format("a tag named {} would take the place of the points", tag));
+            throw Failure(ExitCode::Refused, fmt::format("a tag named {} would replace the points", tag));
         if (!tag.empty() && cloud.hasProperty(name))
-            report.warn(fmt::format("the tag takes the place of the attribute {}", tag));
+            report.warn(fmt::format("the tag replaces the attribute {}", tag));
     }
 
     void warnOfAttributes(Object const& points, std::filesystem::path const& file, Report& report)
@@ -41,7 +41,7 @@ namespace {
                 names.push_back(property.name);
         if (!names.empty())
             report.warn(
-                fmt::format("only positions are taken from {}; left out: {}", file.string(), fmt::join(names, ", ")));
+                fmt::format("only positions are read from {}; left out: {}", file.string(), fmt::join(names, ", ")));
     }
 
     void addPoints(Options const& options, Report& report)
@@ -70,9 +70,9 @@ void addAddPoints(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"add-points", "Add the points of a file to a point cloud",
-        R"(The points come behind those that are there, and from any kind of file; of a mesh all its points.
-Only their positions are taken: attributes that the point cloud has are zero for them, or what their
-default is. A tag is a new attribute of the points, true for those that were added.)",
+        R"(The points are appended, from any kind of file; of a mesh all of its points.
+Only their positions are used: in the attributes of the point cloud they get zero or the attribute's
+default. A tag is a new attribute of the points that is true for the added ones.)",
         "  modeling add-points scan.ply second-scan.xyz both.ply --tag second"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Point cloud to read", options->in, command);

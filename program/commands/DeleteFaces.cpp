@@ -1,11 +1,11 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
 #include "Selection.h"
-#include "Shape.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshArrays.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/Shape.h"
+#include "shell/Failure.h"
 
 #include <Modeling/deleteFaces.h>
 #include <TessaraGeometry/Names.h>
@@ -32,7 +32,7 @@ namespace {
         for (unsigned int face = 0; face != mesh.faceCount(); ++face)
             if (mesh.corners(face).empty())
                 throw Failure(ExitCode::Refused,
-                    fmt::format("delete-faces needs faces with corners, and face {} of {} has none (counted from 0)",
+                    fmt::format("delete-faces needs faces with corners, but face {} of {} has none (counted from 0)",
                         face, file.string()));
     }
 
@@ -57,10 +57,10 @@ namespace {
 void addDeleteFaces(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
-    constexpr CommandHelp kHelp = {"delete-faces", "Delete faces of a mesh, and the points that no other face uses",
-        R"(Everything else keeps its order and all its attributes; points that no face used before go too. A
-face is in a box when all its corners are; corners on the border are in it. A file of indices holds
-whole numbers, separated by blanks or lines; what follows a # is a comment.)",
+    constexpr CommandHelp kHelp = {"delete-faces", "Delete faces of a mesh, and the points that no remaining face uses",
+        R"(All other elements keep their order and attributes; points that were isolated before are deleted too.
+A face is in a box if all of its corners are; corners on the border are in it. A file of indices
+contains whole numbers, separated by blanks or line breaks; # begins a comment.)",
         "  modeling delete-faces bunny.obj half.obj --box -1 -1 -1 0 1 1\n"
         "  modeling delete-faces part.ply part.ply --indices bad-faces.txt --force\n"
         "  modeling delete-faces scan.ply kept.ply --attribute material --invert"};

@@ -1,8 +1,8 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Operation.h"
 #include "Selection.h"
+#include "geometry/Geometry.h"
+#include "shell/Failure.h"
 
 #include <Modeling/deletePointsInPointCloud.h>
 #include <TessaraGeometry/Names.h>
@@ -54,8 +54,8 @@ void addDeletePoints(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"delete-points", "Delete points of a point cloud",
-        R"(The other points keep their order and all their attributes. A file of indices holds whole numbers,
-separated by blanks or lines; what follows a # is a comment. Points on the border of a box are in it.)",
+        R"(The other points keep their order and attributes. A file of indices contains whole numbers,
+separated by blanks or line breaks; # begins a comment. Points on the border of a box are in it.)",
         "  modeling delete-points scan.ply clean.ply --indices outliers.txt\n"
         "  modeling delete-points scan.ply part.ply --box -1 -1 0 1 1 2.5 --invert\n"
         "  modeling delete-points scan.ply rest.ply --attribute label"};

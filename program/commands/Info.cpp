@@ -1,8 +1,8 @@
 #include "Commands.h"
-#include "Geometry.h"
-#include "MeshTopology.h"
 #include "Operation.h"
 #include "files/GeometryBuilder.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshTopology.h"
 
 #include <fmt/format.h>
 
@@ -12,7 +12,7 @@ namespace {
 
     Json describeTopology(MeshArrays const& mesh)
     {
-        MeshTopology const topology = analyseTopology(mesh);
+        MeshTopology const topology = analyzeTopology(mesh);
         Json values;
         values["triangles"] = topology.triangleCount;
         values["quads"] = topology.quads.count;
@@ -21,10 +21,10 @@ namespace {
         values["facesWithRepeatedPoints"] = topology.facesWithRepeatedPoints.count;
         values["edges"] = topology.edgeCount;
         values["parts"] = topology.partCount;
-        values["openEdges"] = topology.openEdges.count;
+        values["openEdges"] = topology.boundaryEdges.count;
         values["nonManifoldEdges"] = topology.nonManifoldEdges.count;
         values["windingConflicts"] = topology.windingConflicts.count;
-        values["pinchedPoints"] = topology.pinchedPoints.count;
+        values["pinchedPoints"] = topology.nonManifoldPoints.count;
         values["isolatedPoints"] = topology.isolatedPoints.count;
         values["closedManifold"] = topology.isClosedManifold();
         values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
@@ -97,11 +97,12 @@ namespace {
 void addInfo(CommandLine& program, Invocation& invocation)
 {
     auto const file = std::make_shared<std::filesystem::path>();
-    constexpr CommandHelp kHelp = {"info", "Show what a file holds, and how the faces of a mesh are connected",
-        R"(Open edges have one face, non-manifold ones more than two. A winding conflict is an edge that faces
-pass in the same direction. At a pinched point there are faces that share the point, but are not
-connected by edges there. The genus is given for closed manifolds, summed over the parts. A sliver
-below 0.1 is a face whose shortest edge is shorter than 0.1 times its longest one.)",
+    constexpr CommandHelp kHelp = {"info", "Show what a file contains, and how the faces of a mesh are connected",
+        R"(Open edges are boundary edges, with one face; non-manifold edges have more than two. A winding
+conflict is an edge that two faces traverse in the same direction. Pinched points are non-manifold
+vertices: their faces are not all connected by edges there. Parts are connected components. The genus
+is shown for closed manifolds, summed over the parts. A sliver below 0.1 is a face whose shortest edge
+is shorter than 0.1 times its longest edge.)",
         "  modeling info bunny.obj\n"
         "  modeling info bunny.obj --json | jq .topology.openEdges"};
     Command command = addCommand(kHelp, program, invocation);

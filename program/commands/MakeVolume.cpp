@@ -1,13 +1,14 @@
-#include "Cancellation.h"
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MemoryLimit.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "SurfaceBand.h"
+#include "VolumeReport.h"
 #include "files/VdbFile.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/SurfaceBand.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
+#include "shell/MemoryLimit.h"
 
 #include <fmt/format.h>
 
@@ -37,23 +38,20 @@ namespace {
         std::uint64_t maxMemory = 0;
     };
 
-    constexpr char kAdvice[] = "Voxels twice as large make a quarter as many; a narrower --band takes less too.";
+    constexpr char kAdvice[] = "Doubling the voxel size makes a quarter as many voxels; a narrower --band helps too.";
 
     void requireVdb(Output const& out)
     {
         if (out.file.extension() != ".vdb")
             throw Failure(
-                ExitCode::File, fmt::format("{} cannot be written: the name has to end in .vdb", out.file.string()));
+                ExitCode::File, fmt::format("{} cannot be written: its name has to end in .vdb", out.file.string()));
         requirePlace(out);
     }
 
     void requireFiniteSurface(MeshArrays const& mesh, std::filesystem::path const& file)
     {
-        auto const isFinite = [](float3 const& p) {
-            return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
-        };
-        if (!std::all_of(mesh.positions->begin(), mesh.positions->end(), isFinite))
-            throw Failure(ExitCode::Refused, fmt::format("a coordinate of {} is not finite", file.string()));
+        if (!std::all_of(mesh.positions->begin(), mesh.positions->end(), [](float3 const& p) { return isFinite(p); }))
+            throw Failure(ExitCode::Refused, fmt::format("a coordinate in {} is not finite", file.string()));
     }
 
     SurfaceValue surfaceValueOf(Options const& options, Object const& mesh)
@@ -63,7 +61,7 @@ namespace {
             value.distanceTo = {options.distanceTo[0], options.distanceTo[1], options.distanceTo[2]};
             return value;
         }
-        value.pointNumbers = pointNumbers(mesh, options.attribute, options.in);
+        value.pointNumbers = pointNumbers("--attribute", options.attribute, mesh, options.in);
         if (!std::all_of(
                 value.pointNumbers.begin(), value.pointNumbers.end(), [](float n) { return std::isfinite(n); }))
             throw Failure(ExitCode::Refused, fmt::format("the values of \"{}\" are not all finite", options.attribute));
@@ -76,13 +74,13 @@ namespace {
             return *options.voxelSize;
         auto const box = boundingBoxOf(mesh);
         if (!box)
-            return 1; // any size will do, as there are no voxels
+            return 1; // any size, since there are no voxels
         double const longest = std::max(
             {double{box->max.x} - box->min.x, double{box->max.y} - box->min.y, double{box->max.z} - box->min.z});
         if (!(longest > 0))
             throw Failure(ExitCode::Refused,
-                fmt::format("all points of {} lie in one place: --voxel-size has to say how large voxels are",
-                    options.in.string()));
+                fmt::format(
+                    "all points of {} are at the same position, so --voxel-size is required", options.in.string()));
         return longest / options.voxels;
     }
 
@@ -95,7 +93,7 @@ namespace {
         return least == voxels.end() ? Range() : Range(least->value, most->value);
     }
 
-    /// The least value becomes `from`, the largest `to`, and those between what lies between in proportion.
+    /// Maps the values linearly, so that the smallest one becomes `from` and the largest one `to`.
     void mapValues(float from, float to, std::vector<TSR::TileTree3D::Voxel>& voxels)
     {
         auto const [least, most] = rangeOf(voxels);
@@ -113,21 +111,9 @@ namespace {
             throw Failure(ExitCode::Refused, "the values of the volume are too large for single precision");
     }
 
-    void describe(SparseVolume const& volume, Report& report)
-    {
-        auto const [least, most] = rangeOf(volume.voxels);
-        auto const voxelSize = static_cast<float>(volume.voxelSize);
-        report.document["volume"] = {{"grid", volume.name}, {"activeVoxels", volume.activeCount()},
-            {"voxelSize", numberOf(voxelSize)}, {"smallestValue", numberOf(least)}, {"largestValue", numberOf(most)},
-            {"background", numberOf(volume.background)}};
-        report.text += fmt::format("grid \"{}\": {} of size {}, {}background {}\n", volume.name,
-            countOf(volume.activeCount(), "active voxel"), voxelSize,
-            volume.voxels.empty() ? "" : fmt::format("values from {} to {}, ", least, most), volume.background);
-    }
-
     void requireMemory(BandSize const& size, double voxelSize, MemoryLimit const& limit)
     {
-        // Beyond what 64 bits hold it is too much in any case.
+        // Larger sizes, which may not fit 64 bits, exceed any limit.
         constexpr double kMost = 1e18;
         limit.require(static_cast<std::uint64_t>(std::min(size.bytes, kMost)),
             fmt::format("a band of about {} of size {:.4g}",
@@ -155,7 +141,8 @@ namespace {
                 mapValues(*options.from, *options.to, volume.voxels);
             requireFiniteValues(volume);
         });
-        describe(volume, report);
+        auto const [least, most] = rangeOf(volume.voxels);
+        reportVolume(volume, least, most, report);
         stopIfCancelled();
         writeVdbFile(volume, options.out.file, options.out.existing());
         report.document["output"] = options.out.file.string();
@@ -165,14 +152,14 @@ namespace {
     void addValueOptions(Options& options, Command& command)
     {
         Command value = command.addChoice("Values", "one of these is required");
-        value.addOption("--attribute", options.attribute, "The numbers of points, blended over faces")
+        value.addOption("--attribute", options.attribute, "A number per point, interpolated over faces")
             .valueName("NAME");
-        value.addOption("--distance-to", options.distanceTo, "The distance to the place X Y Z")
+        value.addOption("--distance-to", options.distanceTo, "The distance to the point X Y Z")
             .valueName("NUMBER")
             .values(3);
         Option from =
             command.addOption("--from", options.from, "What the smallest of these values becomes").valueName("V");
-        Option to = command.addOption("--to", options.to, "What the largest becomes; others lie between in proportion")
+        Option to = command.addOption("--to", options.to, "What the largest becomes; others are mapped linearly")
                         .valueName("V");
         from.needs(to);
         to.needs(from);
@@ -184,12 +171,12 @@ namespace {
 void addMakeVolume(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
-    constexpr CommandHelp kHelp = {"make-volume", "Make a volume around a mesh that guides its refinement",
-        R"(The volume is a float grid of an OpenVDB file, with voxels in a band around the surface. Each voxel
-takes what holds at the place of the surface that is nearest to it: a number of the points, blended over
-the face, or the distance to a place. Faces may have any number of corners.
+    constexpr CommandHelp kHelp = {"make-volume", "Make a volume around a mesh that controls its refinement",
+        R"(The volume is a float grid in an OpenVDB file, with voxels in a band around the surface. Each voxel
+gets the value at the nearest point of the surface: an attribute of the points, interpolated over the
+face, or the distance to a given point. Faces may have any number of corners.
 
-"modeling subdivide --volume" multiplies its tolerance by these values: small ones make fine faces.)",
+"modeling subdivide --volume" multiplies its tolerance by these values: small values make fine faces.)",
         "  modeling make-volume head.obj guide.vdb --distance-to 0 1.7 0.1 --from 0.25 --to 2\n"
         "  modeling make-volume scan.ply guide.vdb --attribute quality --voxels 200 --band 5"};
     Command command = addCommand(kHelp, program, invocation);
@@ -200,12 +187,12 @@ the face, or the distance to a place. Faces may have any number of corners.
                                  .valueName("S")
                                  .between(1e-30, 1e30, "> 0");
     command
-        .addOption("--voxels", options->voxels, "Voxels along the longest side of the mesh's box, in place of a size")
+        .addOption("--voxels", options->voxels, "Voxels along the longest side of the bounding box, instead of a size")
         .valueName("N")
         .between(1, 1000000)
         .showDefault()
         .excludes(voxelSize);
-    command.addOption("--band", options->halfWidth, "How far from the surface there are voxels, in voxels")
+    command.addOption("--band", options->halfWidth, "Distance from the surface up to which there are voxels, in voxels")
         .valueName("N")
         .between(1, 1000, "1..1000")
         .showDefault();

@@ -1,8 +1,8 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Operation.h"
 #include "files/GeometryBuilder.h"
+#include "geometry/Geometry.h"
+#include "shell/Failure.h"
 
 #include <Modeling/mergeMeshes.h>
 #include <Modeling/mergePointClouds.h>
@@ -24,35 +24,34 @@ namespace {
     using Inputs = Orvan::Array<Orvan::Ptr<Object>>;
 
     struct Options {
-        std::vector<std::filesystem::path> files; // with the one to write at the end if `out` is not given
+        std::vector<std::filesystem::path> files; // the last one is the output if `out` is not given
         Output out;
         std::string sourceAttribute;
     };
 
-    /// The inputs that are merged, and where they come from.
+    /// The inputs to merge, and the files that they come from.
     struct Sources {
         Inputs objects;
         std::vector<std::string> files;
         GeometryType type = GeometryType::None;
     };
 
-    /// Takes the file to write from the end of the list, unless it is given.
-    void settleOutput(Options& options)
+    /// Moves the output from the end of the list to `out`, unless that is given.
+    void chooseOutput(Options& options)
     {
         Output& out = options.out;
         if (!out.file.empty())
             return;
         if (options.files.size() < 2)
             throw Failure(ExitCode::CommandLine,
-                "merge needs files to read and one to write: modeling merge IN... OUT, or modeling merge IN... -o OUT");
+                "merge needs input files and an output file: modeling merge IN... OUT, or modeling merge IN... -o OUT");
         out.file = std::move(options.files.back());
         options.files.pop_back();
         std::error_code ignored;
         if (!out.replaces && std::filesystem::is_regular_file(out.file, ignored))
             throw Failure(ExitCode::File,
-                fmt::format(
-                    "the last file, {}, exists. If it is one to read, name the file to write with -o OUT; if it "
-                    "is the one to write, --force replaces it",
+                fmt::format("the last file, {}, exists. If it is an input, name the output with -o OUT; if it is the "
+                            "output, --force replaces it",
                     out.file.string()));
     }
 
@@ -72,7 +71,7 @@ namespace {
             sources.files.push_back(file);
         }
         if (sources.objects.empty())
-            throw Failure(ExitCode::Invalid, "none of the files holds valid geometry");
+            throw Failure(ExitCode::Invalid, "none of the files contains valid geometry");
         return sources;
     }
 
@@ -93,7 +92,7 @@ namespace {
             }
             GeometryType const type = typeOf(*sources.objects[i]);
             areAlike = areAlike && type == sources.type;
-            kinds.push_back(fmt::format("{} holds a {}", sources.files[i], nameOf(type)));
+            kinds.push_back(fmt::format("{} contains a {}", sources.files[i], nameOf(type)));
         }
         if (!areAlike)
             throw Failure(ExitCode::Refused,
@@ -107,7 +106,7 @@ namespace {
         return type == GeometryType::Mesh ? sFaceComp : type == GeometryType::Strands ? sStrandComp : sPointComp;
     }
 
-    /// Each face, strand or point of a cloud gets the number of its input.
+    /// Stores the number of its input for each face, strand, or point of a cloud.
     void numberSources(std::string const& attribute, Sources& sources)
     {
         using namespace Tessara::Geometry;
@@ -150,8 +149,7 @@ namespace {
         return totals;
     }
 
-    /// What became of a property: the files in which its elements got the default, for want of it or for its type
-    /// there.
+    /// How a property was merged: the files whose elements got the default, because they lack it or have another type.
     struct Outcome {
         Property property; // as merged
         std::vector<std::string> missingIn;
@@ -211,15 +209,14 @@ namespace {
                 filesIn(outcome.missingIn), filesIn(outcome.otherTypeIn)});
         }
         if (!rows.empty())
-            report.text += formatTable({{"property"}, {"type"}, {"of"}, {"default, as it is missing in"},
-                                           {"default, as it has another type in"}},
-                               rows)
+            report.text +=
+                formatTable({{"property"}, {"type"}, {"of"}, {"default, missing in"}, {"default, other type in"}}, rows)
                 + "\n";
     }
 
     void mergeFiles(Options options, Report& report)
     {
-        settleOutput(options);
+        chooseOutput(options);
         requireWritable(options.out, GeometryType::None);
         if (!options.sourceAttribute.empty())
             requireAttribute(options.out, "--source-attribute", options.sourceAttribute);
@@ -249,23 +246,22 @@ void addMerge(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"merge", "Join meshes, point clouds or strand sets into one, with all attributes",
-        R"(The files may have different formats, but have to hold the same kind of geometry. A file whose geometry
-is not valid is skipped, and named. Of each attribute the first file that has it decides the type;
-elements of files that do not have it, or have it with another type, get the default.
+        R"(The files may have different formats, but must contain the same kind of geometry. A file with invalid
+geometry is skipped with a warning. The type of each attribute is that of the first file that has it;
+elements of files without it, or with another type, get the default.
 
-Without -o the last name is that of the file to write, which must not exist yet (unless --force).)",
+Without -o the last name is the output, which must not exist yet (unless --force).)",
         "  modeling merge a.obj b.ply c.off all.ply\n"
         "  modeling merge scan-*.ply -o all.ply --source-attribute scan"};
     Command command = addCommand(kHelp, program, invocation);
-    command.addOption("FILES", options->files, "Files to read, and without -o at the end the one to write")
+    command.addOption("FILES", options->files, "Files to read; without -o the last one is the output")
         .required()
         .synopsis("IN... [OUT]");
-    command.addOption("-o,--output", options->out.file, "The file to write; all other names are files to read")
-        .valueName("OUT");
+    command.addOption("-o,--output", options->out.file, "The output; all other names are inputs").valueName("OUT");
     addForce(options->out, command);
     command
         .addOption("--source-attribute", options->sourceAttribute,
-            "Store the number of the file, from 0, under that name: for each face, strand, or point of a cloud")
+            "Store the number of the file, counted from 0, under this name for each face, strand, or point of a cloud")
         .valueName("NAME");
     onSelected(command, invocation, [options](Report& report) { mergeFiles(*options, report); });
 }

@@ -1,9 +1,9 @@
 #include "Commands.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "Shape.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/Shape.h"
 
 #include <Modeling/removeSlivers.h>
 #include <TessaraGeometry/Elements.h>
@@ -26,8 +26,7 @@ namespace {
     Json describeMesh(Object const& object, MeshTopology const& topology, float ratio)
     {
         Json values = countsOf(object);
-        values["parts"] = topology.partCount;
-        values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
+        addPartsAndGenus(topology, values);
         values["slivers"] = countSlivers(arraysOf(object), ratio);
         return values;
     }
@@ -41,7 +40,8 @@ namespace {
         requireClosedTriangleMesh(arraysOf(*mesh), topology, {}, "remove-slivers", options.in);
         Json before = describeMesh(*mesh, topology, options.ratio);
 
-        // The operation takes only the standard properties along; the others go where elements were renumbered.
+        // The operation keeps only the standard properties up to date; the others are dropped if elements were
+        // renumbered.
         Object result = *mesh;
         std::vector<std::string> dropped = dropOtherProperties(result);
         runOperation(report, [&] { Geometry::Mesh::removeSlivers(options.ratio, result); });
@@ -56,8 +56,8 @@ namespace {
         addShape(change, before, after);
         saveGeometry(result, options.out, report);
         warnOfShape(change,
-            "It is not for plates and walls about as thin as the short edges of needles. A smaller --ratio "
-            "collapses less.",
+            "remove-slivers is not for plates and walls about as thin as the short edges of needles; a smaller "
+            "--ratio collapses fewer faces.",
             report);
         report.document["ratio"] = numberOf(options.ratio);
         reportOperation(before, after, dropped, report);
@@ -70,14 +70,15 @@ void addRemoveSlivers(CommandLine& program, Invocation& invocation)
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"remove-slivers",
         "Collapse the needle-shaped faces of a closed manifold mesh of triangles",
-        R"(A face is a needle when its shortest edge is shorter than the ratio times its longest one. A
-collapse takes one point and two faces; it is left out where it would change the topology or turn a
-face over, so that some needles may stay. Points and faces are renumbered, and properties other than
+        R"(A face is a needle if its shortest edge is shorter than the ratio times its longest edge. A
+collapse removes one point and two faces; it is skipped if it would change the topology or flip a
+face, so some needles may remain. Points and faces are renumbered, and properties other than
 the positions are dropped, unless nothing collapses.
 
-It is for needles in surfaces of larger faces. It is not for plates and walls thinner than the ratio times
-the length of their faces: their rims consist of needles, and collapse. The table tells volume, area, folds
-and how far points are from the new surface, and a warning says when the shape changed much.)",
+It is meant for needles in surfaces of larger faces. It is not meant for plates and walls thinner than
+the ratio times the length of their faces: their rims consist of needles, and collapse. The table shows
+volume, area, fold-overs and the distance of the old points from the new surface, and a warning says if the
+shape changed much.)",
         "  modeling remove-slivers part.stl clean.stl\n"
         "  modeling remove-slivers scan.ply scan.ply --force --ratio 0.1 --json"};
     Command command = addCommand(kHelp, program, invocation);

@@ -1,10 +1,10 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "Shape.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/Shape.h"
+#include "shell/Failure.h"
 
 #include <Modeling/deleteFaces.h>
 #include <Modeling/smooth.h>
@@ -36,12 +36,12 @@ namespace {
         std::string weights;
         std::string pins;
         bool pinsBoundary = false;
-        std::optional<float> sharpDegrees; // points at edges that are sharper are pinned
+        std::optional<float> sharpDegrees; // points at sharper edges are pinned
         bool dropsIsolated = false;
-        bool* asJson = nullptr; // then standard output belongs to the document
+        bool* asJson = nullptr; // standard output is then reserved for the document
     };
 
-    /// Null where nothing is weighted or pinned.
+    /// Null if no point is weighted or pinned.
     std::unique_ptr<Orvan::Array<float>> weightsOf(
         Options const& options, Object const& mesh, EdgeSides const& edges, Report& report)
     {
@@ -50,13 +50,13 @@ namespace {
         MeshArrays const arrays = arraysOf(mesh);
         auto weights = std::make_unique<Orvan::Array<float>>(arrays.pointCount(), 1.0f);
         if (!options.weights.empty()) {
-            std::vector<float> const numbers = pointNumbers(mesh, options.weights, options.in);
+            std::vector<float> const numbers = pointNumbers("--weights", options.weights, mesh, options.in);
             if (!std::all_of(numbers.begin(), numbers.end(), [](float number) { return std::isfinite(number); }))
                 throw Failure(ExitCode::Refused, fmt::format("the weights \"{}\" are not all finite", options.weights));
             std::copy(numbers.begin(), numbers.end(), weights->begin());
         }
         if (!options.pins.empty()) {
-            std::vector<float> const numbers = pointNumbers(mesh, options.pins, options.in);
+            std::vector<float> const numbers = pointNumbers("--pin-attribute", options.pins, mesh, options.in);
             for (std::size_t point = 0; point != numbers.size(); ++point)
                 if (numbers[point] != 0)
                     (*weights)[point] = 0;
@@ -72,8 +72,8 @@ namespace {
         return weights;
     }
 
-    /// Points without a face have nowhere to move to.
-    void settleIsolatedPoints(Options const& options, Object& mesh, Report& report)
+    /// Refuses points without a face, which smoothing cannot move, or removes them.
+    void handleIsolatedPoints(Options const& options, Object& mesh, Report& report)
     {
         Finding const isolated = findIsolatedPoints(arraysOf(mesh));
         report.document["droppedPoints"] = isolated.count;
@@ -81,19 +81,14 @@ namespace {
             return;
         if (!options.dropsIsolated)
             throw Failure(ExitCode::Refused,
-                fmt::format("{} of {} in {} {} to no face, so that smoothing has nowhere to move {}; the first is "
-                            "point {} (counted from 0). --drop-isolated leaves them out.",
+                fmt::format("{} of {} in {} {} to no face, so smoothing cannot move {}; the first is point {} "
+                            "(counted from 0). --drop-isolated removes such points.",
                     groupDigits(isolated.count), countOf(arraysOf(mesh).pointCount(), "point"), options.in.string(),
                     isolated.count == 1 ? "belongs" : "belong", isolated.count == 1 ? "it" : "them", isolated.first));
         Orvan::Array<bool> const noFace(arraysOf(mesh).faceCount());
         if (!Tessara::GeometryAlgorithms::deleteFaces(noFace, mesh))
             throw Failure(
-                ExitCode::Refused, "the isolated points cannot be left out: a range of the points has several data");
-    }
-
-    double distance(float3 const& a, float3 const& b)
-    {
-        return std::hypot(double{a.x} - b.x, double{a.y} - b.y, double{a.z} - b.z);
+                ExitCode::Refused, "the isolated points cannot be removed: a range of the points has several data");
     }
 
     struct EdgeLengths {
@@ -143,13 +138,13 @@ namespace {
         report.text += fmt::format("\nPoints moved by {:.4g} on average, by {:.4g} at most.\n", mean, largest);
     }
 
-    /// Removes the normals of points, corners and faces, and returns their names: they belong to the surface as it was.
+    /// Removes the normals of points, corners and faces, which no longer fit the surface. \return their names
     std::vector<std::string> dropNormals(Object& mesh)
     {
         std::vector<std::string> dropped;
         for (Property const& property : propertiesOf(mesh)) {
             std::string_view const name = property.name;
-            if (name != "normal" && !name.ends_with(":normal")) // which tells those of several components apart
+            if (name != "normal" && !name.ends_with(":normal")) // the prefix distinguishes those of several components
                 continue;
             mesh.eraseProperty(property.name.c_str());
             dropped.push_back(property.name);
@@ -163,7 +158,7 @@ namespace {
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
         requireMesh(*mesh, "smooth", options.in);
         requireWritableFaces(options.out, *mesh);
-        settleIsolatedPoints(options, *mesh, report);
+        handleIsolatedPoints(options, *mesh, report);
         MeshArrays const arrays = arraysOf(*mesh);
         EdgeSides const edges(arrays);
         auto const weights = weightsOf(options, *mesh, edges, report);
@@ -176,22 +171,21 @@ namespace {
         bool const showsSteps = !*options.asJson && ::isatty(STDOUT_FILENO) == 1;
         runOperation(report, [&] { showsSteps ? run(CoreGL::ConsoleLogger()) : run(CoreGL::NOPLogger()); });
 
-        if (!std::all_of(positions.begin(), positions.end(),
-                [](float3 const& p) { return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z); }))
+        if (!std::all_of(positions.begin(), positions.end(), [](float3 const& p) { return isFinite(p); }))
             throw Failure(ExitCode::Refused, "the coordinates are too large to be smoothed in single precision");
         bool const isMoved = !std::equal(positions.begin(), positions.end(), arrays.positions->begin());
         std::vector<std::string> const dropped = isMoved ? dropNormals(*mesh) : std::vector<std::string>();
         addDataProperty(sPointPosition, sPointComp, positions, *mesh);
-        bool const isClosed = analyseTopology(arrays, edges).isClosedManifold();
+        bool const isClosed = analyzeTopology(arrays, edges).isClosedManifold();
         ShapeChange const change{shapeOf(arrays, edges, isClosed), shapeOf(arraysOf(*mesh), edges, isClosed),
             largestMove(arrays, arraysOf(*mesh))};
         saveGeometry(*mesh, options.out, report);
         warnOfShape(change,
             options.sharpDegrees
-                ? "Smoothing is for noise on rounded surfaces. A smaller --pin-sharp holds more edges, and a smaller "
-                  "--amount moves less."
+                ? "Smoothing is for noise on rounded surfaces. A smaller --pin-sharp pins more edges, and a smaller "
+                  "--amount moves points less."
                 : "Smoothing is for noise on rounded surfaces. --pin-sharp 30 keeps sharp edges, and a smaller "
-                  "--amount moves less.",
+                  "--amount moves points less.",
             report);
         report.document["amount"] = numberOf(options.amount);
         Json after = describeMesh(*mesh);
@@ -206,18 +200,18 @@ void addSmooth(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     options->asJson = &invocation.asJson;
-    constexpr CommandHelp kHelp = {"smooth", "Even out the edges of a mesh on a rounded surface",
-        R"(Each point slides in the plane that touches the surface there, towards the middle of the faces around it.
-The amount is cut into steps of at most 0.9: an amount of 1 takes two steps and evens out most of what
-noise has made of the edges of a sphere, one of 9 takes ten or eleven and settles it. Normals would no
-longer fit the surface: they are dropped, and named.
+    constexpr CommandHelp kHelp = {"smooth", "Even out the edges of a mesh with a rounded surface",
+        R"(Tangential Laplacian smoothing: each point moves within its tangent plane towards the center of its
+one-ring. The amount is divided into steps of at most 0.9: an amount of 1 takes two steps and removes most
+of the unevenness that noise causes on a sphere; 9 takes ten or eleven and converges. Normals would no
+longer fit the surface, so they are dropped and listed.
 
-It is for scans and other rounded surfaces with small faces. On parts with sharp edges it moves corners,
-frays edges and bends thin walls, unless --pin-sharp holds the points there. The table tells volume, area,
-folds and the largest move, and a warning says when the shape changed much.
+It is meant for scans and other rounded surfaces with small faces. On parts with sharp edges it moves
+corners, frays edges and bends thin walls, unless --pin-sharp pins the points there. The table shows volume,
+area, fold-overs and the largest move, and a warning says if the shape changed much.
 
-Points at a boundary move too, unless they are pinned. Attributes with a number for each point can
-scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",
+Points at a boundary move too, unless they are pinned. Attributes with a number per point can
+scale the moves (from 0, which pins, to 1) or pin the points where they are not 0.)",
         "  modeling smooth scan.ply smooth.ply --amount 3\n"
         "  modeling smooth cloth.obj smooth.obj --amount 1 --pin-boundary\n"
         "  modeling smooth part.stl held.stl --pin-sharp 30\n"
@@ -225,18 +219,18 @@ scale the moves (from 0, which pins, to 1) or pin where they are not 0.)",
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "Mesh to read", options->in, command);
     addOutput("Mesh to write", options->out, command);
-    command.addOption("--amount", options->amount, "How much smoothing").between(0, 1000, "0..1000").showDefault();
+    command.addOption("--amount", options->amount, "Amount of smoothing").between(0, 1000, "0..1000").showDefault();
     command.addOption("--weights", options->weights, "Scale the moves of points by this attribute")
         .valueName("ATTRIBUTE");
     command.addOption("--pin-attribute", options->pins, "Pin the points where this attribute is not 0")
         .valueName("ATTRIBUTE");
-    command.addFlag("--pin-boundary", options->pinsBoundary, "Pin the points of open edges");
+    command.addFlag("--pin-boundary", options->pinsBoundary, "Pin the points of boundary edges");
     command
         .addOption("--pin-sharp", options->sharpDegrees,
-            "Pin the points at edges whose faces' normals differ by more than so many degrees")
+            "Pin the points at edges whose faces have normals that differ by more than this many degrees")
         .valueName("DEG")
         .between(0, 180, "0..180");
-    command.addFlag("--drop-isolated", options->dropsIsolated, "Leave out points that belong to no face");
+    command.addFlag("--drop-isolated", options->dropsIsolated, "Remove points that belong to no face");
     onSelected(command, invocation, [options](Report& report) { smooth(*options, report); });
 }
 

@@ -1,9 +1,9 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "shell/Failure.h"
 
 #include <Modeling/StitchTemplate.h>
 #include <TessaraGeometry/Makers.h>
@@ -43,10 +43,10 @@ namespace {
         bool checkOnly = false;
     };
 
-    /// A message of a template, and what it is about as far as that can be told.
+    /// A message of a template, and the element that it is about if that is known.
     struct Fault {
         std::string message;
-        std::optional<std::uint64_t> strand, point, edge; // the point counts within its strand
+        std::optional<std::uint64_t> strand, point, edge; // the point is counted within its strand
     };
 
     /// The texts between the dashes.
@@ -64,10 +64,10 @@ namespace {
         return messages;
     }
 
-    /// What a template says of a control point: a template of that point alone tells.
+    /// Messages about one control point, found with a template of that point alone.
     struct PointFaults {
         std::size_t messageCount = 0;
-        bool isEndFaulty = false; // where a strand begins or ends there
+        bool isEndFaulty = false; // if a strand begins or ends at the point
     };
 
     PointFaults faultsOfPoint(Orvan::Ptr<Points> const& polygon, float3 const& point, bool strict)
@@ -82,7 +82,7 @@ namespace {
         return {messages.size() - ofEnds, !isRecorded && (strict || ofEnds != 0)};
     }
 
-    /// Messages come in the order of the control points, and then of the edges, so that they can be counted off.
+    /// Assigns messages to elements by counting: they come in the order of the control points, then of the edges.
     std::vector<Fault> locateFaults(
         StitchTemplate const& made, Object const& polygonMesh, Object const& strandSet, bool strict)
     {
@@ -90,7 +90,7 @@ namespace {
         for (std::string& message : splitMessages(made.getErrors()))
             faults.push_back({std::move(message), {}, {}, {}});
         if (made.getStrands().empty())
-            return faults; // they are about the whole
+            return faults; // they are about the template as a whole
 
         MeshArrays const mesh = arraysOf(polygonMesh);
         auto polygon = Orvan::MutablePtr<Points>::make();
@@ -148,11 +148,11 @@ namespace {
         return count;
     }
 
-    /// Refuses a template with faults, unless forced to take what there is of it.
+    /// Refuses a template with faults, unless --allow-faults accepts the rest of it.
     StitchTemplate readTemplate(Options const& options, Report& report)
     {
         std::filesystem::path const &polygonFile = options.drawing[0], &strandFile = options.drawing[1];
-        // A template is drawn where its author wanted it: --center moves the mesh alone.
+        // A template has coordinates of its own: --center translates only the mesh.
         ReadOptions const reading = std::exchange(report.reading, {.isLenient = report.reading.isLenient});
         Orvan::MutablePtr<Object> const polygon = loadGeometry(polygonFile, report);
         requireMesh(*polygon, "stitch", polygonFile);
@@ -160,7 +160,7 @@ namespace {
         report.reading = reading;
         if (typeOf(*strands) != GeometryType::Strands)
             throw Failure(ExitCode::Refused,
-                fmt::format("stitch needs strands, such as the lines of an OBJ file, and {} holds a {}",
+                fmt::format("stitch needs strands, such as the lines of an OBJ file, but {} contains a {}",
                     strandFile.string(), nameOf(typeOf(*strands))));
 
         StitchTemplate made(*polygon, *strands, !options.isOpen);
@@ -180,16 +180,11 @@ namespace {
     struct Target {
         MeshArrays mesh;
         Indices faces; // those with as many corners as the template
-        Points pointNormals; // empty where those of the faces are wanted
-        float scale = 0; // the mean length of these faces' edges: one for all, so that raised strand ends meet too
+        Points pointNormals; // empty if normals of faces are used
+        float scale = 0; // the mean edge length of these faces: one for all, so that raised strand ends meet
     };
 
-    float distance(float3 const& a, float3 const& b)
-    {
-        return std::hypot(b.x - a.x, b.y - a.y, b.z - a.z);
-    }
-
-    /// The normals of the faces around each point, weighted by area; of no particular length.
+    /// The mean normal of the faces around each point, weighted by area; zero if there is none.
     Points sumPointNormals(MeshArrays const& mesh)
     {
         Points normals(mesh.pointCount());
@@ -207,7 +202,7 @@ namespace {
                 normals[point] = {normals[point].x + sum.x, normals[point].y + sum.y, normals[point].z + sum.z};
         }
         for (float3& normal : normals) {
-            float const length = distance({}, normal);
+            float const length = distanceInFloats({}, normal);
             if (length > 0)
                 normal = {normal.x / length, normal.y / length, normal.z / length};
         }
@@ -224,7 +219,7 @@ namespace {
                 continue;
             target.faces.append(face);
             for (std::size_t i = 0; i != corners.size(); ++i)
-                length += static_cast<double>(distance(
+                length += static_cast<double>(distanceInFloats(
                     (*target.mesh.positions)[corners[i]], (*target.mesh.positions)[corners[(i + 1) % corners.size()]]));
         }
         target.scale = static_cast<float>(length / (static_cast<double>(target.faces.size) * polySize));
@@ -233,12 +228,8 @@ namespace {
         return target;
     }
 
-    bool isFinite(float3 const& v)
-    {
-        return std::isfinite(v.x) && std::isfinite(v.y) && std::isfinite(v.z);
-    }
-
-    /// Lays all control points on one polygon. \return how many stay in it, as it has no normal there
+    /// Lays all control points on one polygon. \return how many were not raised, because the polygon has no normal
+    /// there
     std::size_t layOnPolygon(StitchTemplate const& made, Points const& corners, Points const& normals, float scale,
         bool flip, float3* position)
     {
@@ -271,7 +262,7 @@ namespace {
         unsigned int const polySize = made.getPolySize();
         LaidStrands laid{Points(perFace * target.faces.size, Orvan::kUninitialized), 0};
         std::atomic<std::size_t> flatCount = 0;
-        // Each face writes its own stretch.
+        // Each face writes its own range.
         tbb::parallel_for(tbb::blocked_range<std::size_t>(0, target.faces.size, 100), [&](auto const& faces) {
             Points corners(polySize), normals(target.pointNormals.empty() ? 0 : polySize);
             for (std::size_t i = faces.begin(); i != faces.end(); ++i) {
@@ -310,7 +301,7 @@ namespace {
         if (target.faces.empty() && target.mesh.faceCount() != 0)
             throw Failure(ExitCode::Refused,
                 fmt::format(
-                    "the template has {} corners, and no face of {} has as many", made.getPolySize(), file.string()));
+                    "the template has {} corners, but no face of {} has as many", made.getPolySize(), file.string()));
         std::uint64_t const mostOfFace = std::max(controlPointCountOf(made), made.getStrands().size);
         if (mostOfFace * target.faces.size >= std::numeric_limits<unsigned int>::max())
             throw Failure(ExitCode::Refused, "there would be more than 4,294,967,295 control points");
@@ -322,7 +313,7 @@ namespace {
         std::uint64_t const others = target.mesh.faceCount() - covered;
         report.document["coveredFaces"] = covered;
         report.document["otherFaces"] = others;
-        report.text += fmt::format("laid on {}; {} another number of corners\n\n", countOf(covered, "face"),
+        report.text += fmt::format("laid on {}; {} a different number of corners\n\n", countOf(covered, "face"),
             others == 1 ? "1 face has" : groupDigits(others) + " faces have");
         Json const from = countsOf(mesh), to = countsOf(result);
         std::vector<std::string> dropped;
@@ -355,7 +346,7 @@ namespace {
         LaidStrands laid;
         runOperation(report, [&] { laid = layOnFaces(made, target, options); });
         if (laid.flatCount != 0)
-            report.warn(fmt::format("{} not raised, since the faces have no normal there",
+            report.warn(fmt::format("{} not raised, because the faces have no normal there",
                 laid.flatCount == 1 ? "1 control point was" : groupDigits(laid.flatCount) + " control points were"));
         auto const result =
             Tessara::Geometry::makeStrands(std::move(laid.positions), repeatOffsets(made, target.faces.size));
@@ -370,9 +361,10 @@ void addStitch(CommandLine& program, Invocation& invocation)
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"stitch", "Lay a pattern of strands on the faces of a mesh",
         R"(A template is a polygon in the plane z = 0 (a mesh with one face) and strands drawn in it (the lines of an
-OBJ file). It is laid on every face with as many corners; heights are in units of the mean edge length, of
-the polygon and of the faces covered. Each strand has to begin and to end on edges of the polygon, and each
-edge to hold one or two ends, unless --open. Ends meet where they are placed alike from both ends of edges.)",
+OBJ file). It is laid on every face with as many corners. Heights in units of the mean edge length of the
+polygon are scaled by the mean edge length of the covered faces. Each strand must begin and end on edges of
+the polygon, and each edge must have one or two ends, unless --open. Ends meet if they are placed
+symmetrically on the edges.)",
         "  modeling stitch --check --template quad.obj loop.obj\n"
         "  modeling stitch --template quad.obj loop.obj --on body.obj knitted.vtp"};
     Command command = addCommand(kHelp, program, invocation);
@@ -380,18 +372,18 @@ edge to hold one or two ends, unless --open. Ends meet where they are placed ali
         .required()
         .values(2)
         .synopsis("POLYGON STRANDS");
-    command.addOption("--on", options->on, "Mesh to lay it on").synopsis("MESH");
+    command.addOption("--on", options->on, "Mesh to lay the template on").synopsis("MESH");
     addOutput("File of strands to write", options->out, command, Needed::Sometimes);
-    command.addOption("--normals", options->normals, "Raise along normals blended from the points, or of each face")
+    command.addOption("--normals", options->normals, "Raise along normals interpolated from points, or of faces")
         .oneOf({"points", "faces"})
         .showDefault();
-    command.addOption("--rotate", options->rotate, "Begin at the N-th corner of each face, from 0")
+    command.addOption("--rotate", options->rotate, "Begin at corner N of each face, counted from 0")
         .valueName("N")
         .between(0, std::numeric_limits<unsigned int>::max());
     command.addFlag("--flip", options->flip, "Lower where the template raises");
-    command.addFlag("--open", options->isOpen, "Allow strand ends off the edges, and any number on an edge");
-    command.addFlag("--allow-faults", options->allowsFaults, "Take a template in spite of its faults");
-    command.addFlag("--check", options->checkOnly, "Only tell whether the template is usable");
+    command.addFlag("--open", options->isOpen, "Allow strand ends anywhere, and any number per edge");
+    command.addFlag("--allow-faults", options->allowsFaults, "Accept a template despite its faults");
+    command.addFlag("--check", options->checkOnly, "Only report whether the template is usable");
     onSelected(command, invocation, [options](Report& report) { stitch(*options, report); });
 }
 

@@ -1,14 +1,14 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "GuideVolume.h"
-#include "LargeFaces.h"
-#include "MemoryLimit.h"
-#include "MeshRequirements.h"
-#include "MeshTopology.h"
 #include "Operation.h"
-#include "Shape.h"
-#include "Triangulation.h"
+#include "geometry/Geometry.h"
+#include "geometry/LargeFaces.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/Shape.h"
+#include "geometry/Triangulation.h"
+#include "shell/Failure.h"
+#include "shell/MemoryLimit.h"
 
 #include <Modeling/subdivide.h>
 #include <Modeling/subdivisionSteps.h>
@@ -44,11 +44,12 @@ namespace {
         GuideOptions guide;
     };
 
-    /// A mesh that tells on standard error how many faces it has, whenever a pass has made more. It sees that from data
-    /// of its points, which follows each pass: on a closed mesh a new point brings two faces.
-    class TellingMesh : public Object {
+    /// A mesh that prints its number of faces to standard error after each pass of a refinement. The library has no
+    /// progress callback, but it extends the data of points once per pass. So this adds such a property and observes
+    /// writes of it; on a closed mesh each new point adds two faces.
+    class ProgressMesh : public Object {
     public:
-        explicit TellingMesh(Object const& mesh)
+        explicit ProgressMesh(Object const& mesh)
             : Object(mesh)
             , pointCount_(Tessara::Geometry::getElementCount(mesh, Tessara::Geometry::sPointComp))
             , faceCount_(Tessara::Geometry::getElementCount(mesh, Tessara::Geometry::sFaceComp))
@@ -64,7 +65,7 @@ namespace {
                 tell();
         }
 
-        /// The mesh without what this has added.
+        /// The mesh without the added property.
         Object mesh() const
         {
             Object mesh = *this;
@@ -90,7 +91,7 @@ namespace {
         unsigned int pass_ = 0;
     };
 
-    /// \return  How many faces are still too large.
+    /// \return how many faces are still too large
     std::uint64_t refineBy(std::optional<GuideVolume> const& guide, float tolerance, Object& object)
     {
         if (guide)
@@ -102,12 +103,12 @@ namespace {
         });
     }
 
-    /// The same. On a terminal the count of faces is printed after each pass.
+    /// Does the same, and prints the number of faces after each pass if standard error is a terminal.
     std::uint64_t refine(std::optional<GuideVolume> const& guide, float tolerance, Object& mesh)
     {
         if (!::isatty(STDERR_FILENO))
             return refineBy(guide, tolerance, mesh);
-        TellingMesh telling(mesh);
+        ProgressMesh telling(mesh);
         std::uint64_t const largeFaces = refineBy(guide, tolerance, telling);
         mesh = telling.mesh();
         return largeFaces;
@@ -118,16 +119,16 @@ namespace {
         report.document["tooLargeFaces"] = count;
         if (count != 0)
             report.warn(
-                fmt::format("{} still larger than the tolerance: they come from 31 steps, which divide edges by "
-                            "25 million, and refinement ends there.{}",
+                fmt::format("{} still larger than the tolerance: they reached the limit of 31 steps, which divide "
+                            "edges by 25 million.{}",
                     count == 1 ? "1 face is" : groupDigits(count) + " faces are",
                     isGuided ? " --min-value keeps the tolerance away from 0." : ""));
     }
 
     constexpr char kAdvice[] = "Dividing the tolerance by 3 makes about nine times as many faces.";
 
-    /// Below, the library refines nothing; and where points are as far from one another as numbers are, all faces stay
-    /// large for ever.
+    /// The library refines nothing below its own limit; and if points are only as far apart as adjacent floats, faces
+    /// never become small enough.
     bool isTooFine(float tolerance, float farthest)
     {
         constexpr float kFinest = std::numeric_limits<float>::epsilon();
@@ -137,7 +138,7 @@ namespace {
     float toleranceOf(Options const& options, Object const& mesh, std::optional<GuideVolume> const& guide)
     {
         if (!boundingBoxOf(mesh))
-            return options.tolerance.value_or(0); // any will do for an empty mesh
+            return options.tolerance.value_or(0); // not used for an empty mesh
         BoundingBox const box = *boundingBoxOf(mesh);
         float3 const size{box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z};
         float const tolerance =
@@ -150,26 +151,26 @@ namespace {
         if (isTooFine(tolerance, farthest) && farthest == kNear)
             throw Failure(ExitCode::Refused,
                 fmt::format(
-                    "a tolerance of {} is too fine: below {} nothing is refined. Take a larger one, or scale the "
-                    "mesh up.",
+                    "a tolerance of {} is too fine: below {} nothing is refined. Use a larger one, or scale the mesh "
+                    "up.",
                     tolerance, kNear * 4 * std::numeric_limits<float>::epsilon()));
         if (isTooFine(tolerance, farthest))
             throw Failure(ExitCode::Refused,
                 fmt::format(
                     "a tolerance of {} is finer than single precision can distinguish at coordinates of up to {}. "
-                    "Take a larger one, or move the mesh to the origin.",
+                    "Use a larger one, or move the mesh to the origin.",
                     tolerance, farthest));
         float const scale = guide ? guide->smallestPositiveValue().value_or(1) : 1;
         if (isTooFine(tolerance * scale, farthest))
             throw Failure(ExitCode::Refused,
                 fmt::format(
                     "a tolerance of {} times the smallest positive value of grid \"{}\", {}, is finer than single "
-                    "precision can distinguish there. Take a larger tolerance or --min-value.",
+                    "precision can distinguish there. Use a larger tolerance or --min-value.",
                     tolerance, guide->grid(), scale));
         return tolerance;
     }
 
-    /// Warns of the properties that are no longer there, and why. \return their names
+    /// Warns of the properties that were dropped, and why. \return their names
     std::vector<std::string> explainDropped(Object const& before, Object const& after, Report& report)
     {
         std::vector<std::string> dropped;
@@ -178,24 +179,16 @@ namespace {
             if (after.hasProperty(property.name.c_str()))
                 continue;
             dropped.push_back(property.name);
-            std::string reason = "it belongs to faces or corners, and these are made anew";
+            std::string reason = "refinement replaces faces and corners";
             if (property.component == Tessara::Geometry::sPointComp)
                 reason = property.range.empty() && property.type != "range"
-                    ? fmt::format("values of type {} have no mean for a new point", property.type)
-                    : "what points refer to has no mean for a new point";
+                    ? fmt::format("values of type {} cannot be interpolated for new points", property.type)
+                    : "ranges cannot be interpolated for new points";
             namesByReason[reason].push_back(property.name);
         }
         for (auto const& [reason, names] : namesByReason)
             report.warn(fmt::format("dropped {}: {}", fmt::join(names, ", "), reason));
         return dropped;
-    }
-
-    Json describeMesh(Object const& object, MeshTopology const& topology)
-    {
-        Json values = countsOf(object);
-        values["parts"] = topology.partCount;
-        values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
-        return values;
     }
 
     void subdivide(Options const& options, MemoryLimit const& limit, Report& report)
@@ -211,7 +204,7 @@ namespace {
 
         std::optional<GuideVolume> guide;
         if (!options.guide.file.empty())
-            guide.emplace(options.guide, report, &limit).tellCoverage(arraysOf(*mesh), report);
+            guide.emplace(options.guide, report, &limit).reportCoverage(arraysOf(*mesh), report);
         float const tolerance = toleranceOf(options, *mesh, guide);
         Object result = *mesh;
         std::uint64_t largeFaces = 0;
@@ -221,11 +214,13 @@ namespace {
         std::vector<std::string> const dropped = explainDropped(*mesh, result, report);
         auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
         ShapeChange const change{shape, shapeAfter, largestMove(arraysOf(*mesh), arraysOf(result))};
-        Json before = describeMesh(*mesh, topology), after = describeMesh(result, topologyAfter);
+        Json before = countsOf(*mesh), after = countsOf(result);
+        addPartsAndGenus(topology, before);
+        addPartsAndGenus(topologyAfter, after);
         addShape(change, before, after);
         saveGeometry(result, options.out, report);
-        warnOfShape(
-            change, "Subdivision rounds every edge and corner: it is for smooth shapes in coarse meshes.", report);
+        warnOfShape(change, "Subdivision rounds every edge and corner; it is meant for coarse meshes of smooth shapes.",
+            report);
         report.document["tolerance"] = numberOf(tolerance);
         reportOperation(before, after, dropped, report);
     }
@@ -236,25 +231,25 @@ void addSubdivide(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"subdivide",
-        "Refine a closed manifold mesh of triangles where its faces are large, and smooth it",
-        R"(Faces split until each fits into twice the tolerance along every axis. Small faces stay as they are,
-but for those next to large ones. Floating point values on points (normals too) are carried along as means;
-all other properties are dropped, with a warning that says why.
+        "Refine and smooth a closed manifold mesh of triangles where its faces are large",
+        R"(Adaptive sqrt(3)-subdivision: faces are split until each fits into a box of twice the tolerance along
+every axis. Small faces are kept, except next to large ones. Floating-point values on points (normals too)
+are interpolated; all other properties are dropped, with a warning that says why.
 
-It is for smooth shapes in coarse meshes. It rounds every edge and corner, so that it is not for parts with
-sharp edges. The table tells volume, area, folds and the largest move of the old points, and a warning
-says when the shape changed much.
+It is meant for coarse meshes of smooth shapes. It rounds every edge and corner, so it is not meant for parts
+with sharp edges. The table shows volume, area, fold-overs and the largest move of the old points, and a
+warning says if the shape changed much.
 
-Levels: one level divides edges by 1.73 and makes 3 times as many faces, two levels divide edges by 3.
-Where all faces are of the size s (the longest side of their box), a tolerance of s/2 leaves them, s/3.46
+Levels: one level divides edge lengths by 1.73 and makes 3 times as many faces, two levels divide them by 3.
+If all faces have the size s (the longest side of their box), a tolerance of s/2 keeps them, s/3.46
 gives one level, s/6 two, s/10.4 three and s/18 four.
 
-A volume paints where the mesh gets fine: the tolerance of a face is multiplied by the value of the grid
-at the face's second corner. Faces are left alone where that is not above 0. "modeling make-volume" makes
+A volume controls where the mesh becomes fine: the tolerance of a face is multiplied by the value of the grid
+at the face's second corner. Faces are not refined where that is not above 0. "modeling make-volume" makes
 such files.
 
-A face splits in at most 31 steps one after the other. If it is still too large then, a warning says so: that
-happens where the values of a volume fall to 0 at a single place.)",
+A face is split in at most 31 successive steps. If it is still too large, a warning says so: that
+happens where the values of a volume fall to 0 at a single point.)",
         "  modeling subdivide coarse.obj fine.ply --relative 0.01\n"
         "  modeling subdivide part.stl fine.stl --tolerance 0.25 --max-memory 4GB\n"
         "  modeling subdivide head.obj fine.obj --relative 0.01 --volume guide.vdb --grid scale"};
@@ -262,11 +257,12 @@ happens where the values of a volume fall to 0 at a single place.)",
     addFile("IN", "Mesh to read", options->in, command);
     addOutput("Mesh to write", options->out, command);
     Command size = command.addChoice("Size of faces", "one of these is required");
-    size.addOption("--tolerance", options->tolerance, "Half the size of the largest face that stays, in model units")
+    size.addOption("--tolerance", options->tolerance, "Half the size of the largest face to keep, in model units")
         .positive();
     size.addOption("--relative", options->relative, "The same, as a fraction of the diagonal of the bounding box")
         .positive();
-    command.addFlag("--triangulate", options->triangulates, "Cut faces with more corners into triangles first");
+    command.addFlag(
+        "--triangulate", options->triangulates, "Cut faces with more than three corners into triangles first");
     addGuideOptions(options->guide, command);
     addMemoryLimit(options->maxMemory, command);
     onSelected(command, invocation, [options](Report& report) {

@@ -1,10 +1,10 @@
 #include "Commands.h"
-#include "Failure.h"
-#include "Geometry.h"
-#include "MeshRequirements.h"
 #include "Operation.h"
-#include "Shape.h"
-#include "Triangulation.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
+#include "geometry/Shape.h"
+#include "geometry/Triangulation.h"
+#include "shell/Failure.h"
 
 #include <TessaraGeometryVolume/ChannelParser.h>
 
@@ -24,18 +24,22 @@ namespace {
         Output out;
         std::string channels = "*";
         bool keepsUnits = false;
-        bool isToBeChecked = false;
+        bool checksAreas = false;
     };
+
+    constexpr char kSeparators[] = " \t\n\v\f\r,";
 
     void requireChannels(std::string const& channels)
     {
+        if (channels.find_first_not_of(kSeparators) == std::string::npos)
+            throw Failure(ExitCode::CommandLine, "--channels: the list has no entry; \"^*\" keeps no properties");
         TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels.c_str());
         if (!status)
             throw Failure(ExitCode::CommandLine, fmt::format("--channels: {}", status.message().view()));
     }
 
-    /// Refuses an entry that no property of faces or corners matches: it asks for what is not there. What an excluding
-    /// pattern or * stands for need not be there.
+    /// Refuses a name or an including pattern that matches no property of faces or corners. Excluding patterns and *
+    /// may match nothing.
     void requireMatches(std::string const& channels, Object const& mesh)
     {
         std::vector<std::string> names;
@@ -43,7 +47,6 @@ namespace {
             if (!property.isStandard && !property.component.empty()
                 && property.component != Tessara::Geometry::sPointComp)
                 names.push_back(property.name);
-        constexpr char kSeparators[] = " \t\n\v\f\r,";
         std::size_t start = channels.find_first_not_of(kSeparators);
         while (start != std::string::npos) {
             std::size_t const end = std::min(channels.find_first_of(kSeparators, start), channels.size());
@@ -59,7 +62,7 @@ namespace {
                     names.begin(), names.end(), [&](std::string const& name) { return parser.accepts(name.c_str()); }))
                 throw Failure(ExitCode::Refused,
                     fmt::format("--channels: no property of faces or corners matches \"{}\". There are: {}", pattern,
-                        names.empty() ? "none" : fmt::format("{}", fmt::join(names, ", "))));
+                        listOf(names)));
         }
     }
 
@@ -69,7 +72,7 @@ namespace {
         values["triangles"] = topology.triangleCount;
         values["quads"] = topology.quads.count;
         values["polygons"] = topology.polygons.count;
-        values["openEdges"] = topology.openEdges.count;
+        values["openEdges"] = topology.boundaryEdges.count;
         return values;
     }
 
@@ -117,7 +120,7 @@ namespace {
 
         std::vector<std::string> dropped = namesMissingIn(result, *mesh);
         for (std::string const& name : dropOutdatedProperties(result)) {
-            report.warn(fmt::format("\"{}\" is dropped: triangles cannot get values of its type", name));
+            report.warn(fmt::format("\"{}\" is dropped: values of its type cannot be copied to triangles", name));
             dropped.push_back(name);
         }
         report.document["keptProperties"] = namesOfOtherProperties(result);
@@ -129,9 +132,9 @@ namespace {
         Json before = describeMesh(*mesh, topology), after = describeMesh(result, topologyAfter);
         addShape(change, before, after);
         saveGeometry(result, options.out, report);
-        warnOfShape(change, "--check tells which faces their triangles do not cover.", report);
+        warnOfShape(change, "--check shows which faces are not covered by their triangles.", report);
         reportOperation(before, after, dropped, report);
-        if (options.isToBeChecked)
+        if (options.checksAreas)
             reportCheck(checkTriangulation(arraysOf(measured), arraysOf(result)), report);
     }
 
@@ -141,16 +144,16 @@ void addTriangulate(CommandLine& program, Invocation& invocation)
 {
     auto const options = std::make_shared<Options>();
     constexpr CommandHelp kHelp = {"triangulate", "Cut the faces of a mesh into triangles",
-        R"(Each face with n corners becomes n - 2 triangles between its own corners; concave faces are fine.
-No point is added, moved or removed. Faces that intersect themselves, have two equal corners in a row
-or cover next to nothing become a fan from their first corner. Next to nothing is 5e-5 square units,
-where the mesh is about a million units long; with --keep-units they are those of the file.
+        R"(Each face with n corners becomes n - 2 triangles between its own corners; faces may be concave.
+No point is added, moved or removed. Faces that intersect themselves, have two equal consecutive
+corners or almost no area become a fan from their first corner. The limit for the area is 5e-5 square
+units, with the mesh scaled to about a million units; --keep-units uses the units of the file.
 
---channels chooses the properties of faces and corners that triangles get from their face; the others
-are dropped, with the data of ranges. It is a list of names and patterns, separated by blanks or
+--channels selects the properties of faces and corners that triangles inherit from their face; the
+others are dropped, with the data of ranges. It is a list of names and patterns, separated by blanks or
 commas: * stands for any characters, ? for one, and a leading ^ or - excludes. The last entry that
-matches a name decides. "*" keeps all, "^*" none, "* ^tmp*" all but those that begin with tmp, "uv N"
-these two. Names and patterns of what to keep have to match something. Properties of points stay.)",
+matches a name decides. "*" keeps all, "^*" none, "* ^tmp*" all except those that begin with tmp, "uv N"
+these two. Names and including patterns must match a property. Properties of points are kept.)",
         "  modeling triangulate quads.obj triangles.ply\n"
         "  modeling triangulate cad.obj cad.stl --channels \"^*\" --check"};
     Command command = addCommand(kHelp, program, invocation);
@@ -160,8 +163,8 @@ these two. Names and patterns of what to keep have to match something. Propertie
         .valueName("LIST")
         .showDefault();
     command.addFlag("--keep-units", options->keepsUnits, "Measure faces in the units of the file");
-    command.addFlag("--check", options->isToBeChecked,
-        "Compare the area of every face with that of its triangles, and count the fans");
+    command.addFlag("--check", options->checksAreas,
+        "Compare the area of each face with that of its triangles, and count the fans");
     onSelected(command, invocation, [options](Report& report) { triangulate(*options, report); });
 }
 

@@ -1,6 +1,6 @@
 #include "Commands.h"
-#include "Geometry.h"
 #include "Operation.h"
+#include "geometry/Geometry.h"
 
 #include <fmt/format.h>
 
@@ -18,7 +18,7 @@ namespace {
 
     void validateFile(std::filesystem::path const& file, Report& report)
     {
-        // Loading validates: whatever comes back is valid.
+        // Loading throws if the object is invalid.
         Orvan::MutablePtr<Tessara::Object> const object = loadGeometry(file, report);
         for (Orvan::String const& sentence : Tessara::Geometry::reportProperties(*object))
             report.warn(std::string(sentence.view()));
@@ -26,7 +26,7 @@ namespace {
         report.document["valid"] = true;
         report.document["counts"] = counts;
         report.text =
-            fmt::format("{} holds a valid {}: {}\n", file.string(), nameOf(typeOf(*object)), describeCounts(counts));
+            fmt::format("{} contains a valid {}: {}\n", file.string(), nameOf(typeOf(*object)), describeCounts(counts));
     }
 
 }
@@ -34,10 +34,10 @@ namespace {
 void addValidate(CommandLine& program, Invocation& invocation)
 {
     auto const file = std::make_shared<std::filesystem::path>();
-    constexpr CommandHelp kHelp = {"validate", "Tell whether a file holds valid geometry",
-        R"(Valid means that arrays fit their counts, offsets ascend, and indices are in range. What is odd in
-further properties is a warning. How faces hang together does not matter here: "modeling info" tells
-that.)",
+    constexpr CommandHelp kHelp = {"validate", "Check whether a file contains valid geometry",
+        R"(Valid means that array lengths match the element counts, offsets are non-decreasing, and indices are
+in range. Anomalies of other properties are warnings. How faces are connected does not matter here:
+"modeling info" shows that.)",
         "  modeling validate part.stl"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("FILE", "File to read", *file, command);

@@ -6,9 +6,9 @@
 
 namespace ModelingProgram {
 
-// Element types as files see them: some scalars of one type, side by side.
+// Element types as files see them: a fixed number of scalars of the same type.
 
-/// Texts and records are no such type: their `components` is 0.
+/// Other types, such as texts and records, have 0 components.
 template <class T> struct ElementLayout {
     using Scalar = void;
     static constexpr unsigned int components = 0;
@@ -51,8 +51,8 @@ template <class T> char const* elementTypeName()
     return result;
 }
 
-/// Calls `visit` with the first element type of so many such scalars: float4 rather than float2x2. False where there is
-/// none.
+/// Calls `visit` with the first element type of this number of scalars: float4 rather than float2x2. Returns false if
+/// there is none.
 template <class Scalar, class Visit> bool visitElementTypeOf(std::uint64_t components, Visit&& visit)
 {
     bool found = false;

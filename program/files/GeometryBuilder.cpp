@@ -12,15 +12,6 @@ using Tessara::Math::float3;
 
 namespace {
 
-    template <class T>
-    Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
-    {
-        Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
-        std::transform(
-            indices.begin(), indices.end(), result.begin(), [&](unsigned int index) { return values[index]; });
-        return result;
-    }
-
     double lossOf(double value)
     {
         return std::abs(value - static_cast<double>(static_cast<float>(value)));
@@ -33,7 +24,7 @@ namespace {
         double longestSide() const { return std::max({max.x - min.x, max.y - min.y, max.z - min.z}); }
     };
 
-    /// The box of `positions` as far as they are finite in single precision, as `floats` has them.
+    /// The box of the positions that are finite in single precision, as in `floats`.
     template <class T> Box boxOf(Orvan::Array<float3> const& floats, Orvan::Array<T> const& positions)
     {
         Box box;
@@ -49,8 +40,8 @@ namespace {
         return box;
     }
 
-    /// A place near the middle of the box with few digits, so that it can be read, typed and added again: its coordinates
-    /// are multiples of a power of ten that is about as large as the box.
+    /// A point near the middle of the box with few digits, so that it can be read, typed and added back: its
+    /// coordinates are multiples of a power of ten about as large as the box.
     double3 roundedCenterOf(Orvan::Array<float3> const& floats, Orvan::Array<double3> const& positions)
     {
         Box const box = boxOf(floats, positions);
@@ -146,7 +137,7 @@ void GeometryBuilder::addLoss(double x, double y, double z)
 
 void GeometryBuilder::refuseIndex(char const* element, std::string const& index) const
 {
-    scanner_.refuse(std::string("a ") + element + " names point " + index + ", but the file has "
+    scanner_.refuse(std::string("a ") + element + " refers to point " + index + ", but the file has "
         + std::to_string(pointCount_) + " points, counted from 0");
 }
 
@@ -156,7 +147,7 @@ void GeometryBuilder::noteBytesLeft()
         note("bytes after the last element are left out: " + std::to_string(scanner_.remaining()));
 }
 
-/// Subtracts the origin, if there is to be one, which is returned.
+/// Subtracts the origin, if requested, and returns it.
 std::optional<double3> GeometryBuilder::movePositions()
 {
     if (!movesPositions() || widePositions_.empty())
@@ -170,10 +161,11 @@ std::optional<double3> GeometryBuilder::movePositions()
             loss = std::max({loss, lossOf(moved.x), lossOf(moved.y), lossOf(moved.z)});
         raw_.positions[point] = {static_cast<float>(moved.x), static_cast<float>(moved.y), static_cast<float>(moved.z)};
     }
-    // Centered, nothing but the last bits of a float are left to lose.
-    constexpr double kToldShare = 1e-6; // of the longest side
-    bool const isTold = largestLoss_ != 0 && loss > kToldShare * boxOf(raw_.positions, raw_.positions).longestSide();
-    largestLoss_ = isTold ? loss : 0;
+    // After centering, only the last bits of a float can be lost.
+    constexpr double kReportedFraction = 1e-6; // of the longest side
+    bool const isReported =
+        largestLoss_ != 0 && loss > kReportedFraction * boxOf(raw_.positions, raw_.positions).longestSide();
+    largestLoss_ = isReported ? loss : 0;
     return origin;
 }
 
@@ -200,11 +192,11 @@ Orvan::MutablePtr<Tessara::Object> GeometryBuilder::makeObject()
         unusable.emplace(raw_);
         for (std::string& sentence : unusable->describe())
             note(std::move(sentence));
-        if (!unusable->remainsAnyPoint())
+        if (!unusable->anyPointRemains())
             scanner_.refuse("no point is left");
         whole = raw_;
     }
-    bool const isMesh = unusable ? unusable->remainsAnyFace() : faceCount() != 0;
+    bool const isMesh = unusable ? unusable->anyFaceRemains() : faceCount() != 0;
     Orvan::MutablePtr<Tessara::Object> object = isMesh
         ? makeMesh(std::move(raw_.positions), std::move(raw_.faceVertex), std::move(raw_.faceOffset))
         : raw_.strandOffset.empty()

@@ -5,6 +5,7 @@
 #include "UnusableElements.h"
 
 #include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
 
 #include <cmath>
 #include <optional>
@@ -12,32 +13,41 @@
 
 namespace ModelingProgram {
 
-/// How files call the properties of a component's elements that share their name with another component's: "face:color"
-/// is the color of the faces, where points have a color too. Empty for components that no file tells apart.
+/// The prefix of properties whose name another component uses too: "face:color" is the color of the faces if points
+/// have a color. Empty for components that files do not distinguish.
 std::string_view namePrefix(Orvan::String const& component);
 
 /// "points", "faces", "corners" or "strands"; of any other component its name.
 std::string elementNames(Orvan::String const& component);
 
-/// Whether geometry itself is stored under the name, so that no other property can be.
+/// Whether the name is reserved for the geometry itself.
 bool isReservedName(std::string_view name);
 
-/// A data property may hold, beside what the conventions ask for, the names that its components had as columns of a
-/// file, separated by blanks: so it goes back under the same names.
+/// Optional entry of a data property: the names that its components had as columns of a file, separated by blanks, so
+/// that they are written under the same names.
 inline constexpr char const* sColumnNames = "columnNames";
 
-/// Where the values of a new property lie, to be filled in.
+/// The values at these indices; zero for `kInvalidIndex`.
+template <class T> Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
+{
+    Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
+    std::transform(indices.begin(), indices.end(), result.begin(),
+        [&](unsigned int index) { return index == Tessara::Geometry::kInvalidIndex ? T{} : values[index]; });
+    return result;
+}
+
+/// The memory for the values of a new property, to be filled in.
 struct PropertyValues {
     std::byte* data;
     std::size_t elementBytes;
 };
 
-/// Takes in what a reader finds, and checks it on the way: the one place that decides which geometry is accepted.
+/// Collects and checks what a reader finds: the only place that decides which geometry is accepted.
 class GeometryBuilder {
     using float3 = Tessara::Math::float3;
 
 public:
-    /// Refusals are said through the scanner, which therefore stands at what is handed in.
+    /// Refusals are thrown by the scanner, which must be at the position of what is added.
     GeometryBuilder(Scanner const& scanner, ReadOptions const& options)
         : scanner_(scanner)
         , options_(options)
@@ -45,10 +55,11 @@ public:
     }
 
     ReadOptions const& options() const { return options_; }
-    /// Positions are moved before they become single precision.
+    /// Whether positions are translated before they are rounded to single precision.
     bool movesPositions() const { return options_.isCentered || options_.origin; }
 
-    /// For counts that are known, and that the file can hold: corners may then name points that come later.
+    /// For counts that are known and checked against the size of the file. Corners may then refer to points that come
+    /// later.
     void expectPoints(std::uint64_t count);
     void expectFaces(std::uint64_t count) { raw_.faceOffset.reserve(count + 1); }
 
@@ -82,8 +93,8 @@ public:
         raw_.faceOffset.append(static_cast<unsigned int>(raw_.faceVertex.size));
     }
 
-    /// Makes these points, in this order, a strand set; the offsets say where its strands begin and the last one ends.
-    /// Properties of the points are handed in for the points as they are then.
+    /// Makes a strand set of these points, in this order. The offsets are the starts of the strands and the end of the
+    /// last. Properties of points that are added later refer to the new points.
     void makeStrands(Orvan::Array<unsigned int> offsets, Orvan::Array<unsigned int> const& points);
 
     std::uint64_t pointCount() const { return raw_.positions.size; }
@@ -91,15 +102,15 @@ public:
     std::uint64_t faceCount() const { return raw_.faceOffset.size - 1; }
     Orvan::Array<unsigned int> const& faceOffset() const { return raw_.faceOffset; }
 
-    /// Adds a property under this name, or under a name of its component where the name is taken.
+    /// Adds a property under this name, with the prefix of its component if the name is taken.
     template <class T> void addProperty(
         std::string const& name, char const* component, Orvan::Array<T> values, std::string const& columnNames = {})
     {
         addShared<T>(name, component, Orvan::makePtr<Orvan::Array<T>>(std::move(values)), columnNames);
     }
 
-    /// The same for a type that only the file knows: values of so many scalars, to be filled in before `finish`.
-    /// Nothing where no element type is like that.
+    /// The same for a type known only from the file: values of `components` scalars, to be filled in before `finish`.
+    /// Returns nullopt if there is no such element type.
     template <class Scalar> std::optional<PropertyValues> addProperty(std::string const& name, char const* component,
         std::uint64_t components, std::uint64_t count, std::string const& columnNames = {})
     {
@@ -113,10 +124,10 @@ public:
     }
 
     void note(std::string sentence) { notes_.push_back(std::move(sentence)); }
-    /// Notes what the scanner has not reached, if there is anything.
+    /// Adds a note if the scanner has not reached the end of the file.
     void noteBytesLeft();
 
-    /// The geometry of what came in. Properties of faces go where there are none.
+    /// The geometry. Properties of faces are dropped if there are no faces.
     GeometryFile finish(std::string format) &&;
 
     static constexpr std::uint64_t kMostElements = Tessara::Geometry::kDeletedElement;
@@ -148,9 +159,9 @@ private:
 
     Scanner const& scanner_;
     ReadOptions options_;
-    std::uint64_t pointCount_ = 0; // expected or there
+    std::uint64_t pointCount_ = 0; // expected, or the actual one
     RawGeometry raw_;
-    Orvan::Array<Tessara::Math::double3> widePositions_; // if positions are moved: as in the file
+    Orvan::Array<Tessara::Math::double3> widePositions_; // as in the file; only if positions are translated
     double largestLoss_ = 0; // of coordinates that lose digits
     bool hasUnusableElements_ = false;
     std::vector<Property> properties_;

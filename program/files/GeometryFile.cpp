@@ -29,10 +29,7 @@ namespace {
 
     Format formatOf(std::filesystem::path const& file)
     {
-        std::string extension = file.extension().string();
-        for (char& c : extension)
-            c = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-        auto const format = formats().find(extension);
+        auto const format = formats().find(lowerCase(file.extension().string()));
         return format == formats().end() ? Format{} : format->second;
     }
 
@@ -42,7 +39,7 @@ GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions con
 {
     Format const format = formatOf(file);
     if (!format.read)
-        throw FileError(file.string() + " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz");
+        throw FileError(file.string() + " cannot be read: its extension is none of .obj, .ply, .stl, .off and .xyz");
     InputFile const input(file);
     if (input.size == 0 && format.read != readObj && format.read != readXyz) // the others have headers
         throw FileError(file.string() + " cannot be read: it is empty");
@@ -54,7 +51,7 @@ std::vector<std::string> writeGeometryFile(
 {
     Format const format = formatOf(file);
     if (!format.write)
-        throw FileError(file.string() + " cannot be written: its name ends in none of .obj, .ply, .stl and .vtp");
+        throw FileError(file.string() + " cannot be written: its extension is none of .obj, .ply, .stl and .vtp");
     WritableGeometry geometry = takeApart(object, file);
     geometry.existing = options.existing;
     geometry.remark = options.remark;

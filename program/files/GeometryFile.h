@@ -11,8 +11,8 @@
 
 namespace ModelingProgram {
 
-/// A file that cannot be read or written: the text names the file, and the line (counted from 1) or element (counted
-/// from 0) where there is one.
+/// A file that cannot be read or written. The text names the file, and the line (counted from 1) or element (counted
+/// from 0) if there is one.
 class FileError : public std::runtime_error {
 public:
     using std::runtime_error::runtime_error;
@@ -20,30 +20,31 @@ public:
 
 /// How a file is read.
 struct ReadOptions {
-    /// Leaves out points that are NaN or infinite, the faces and polylines at them, faces with fewer than three corners,
-    /// and bytes after the last element. Otherwise they are refused.
+    /// Leaves out points that are NaN or infinite, the faces and polylines at them, faces with fewer than three
+    /// corners, and bytes after the last element. By default such files are refused.
     bool isLenient = false;
-    /// Subtracts a place near the middle of the geometry from all positions, in double precision: far from the origin
-    /// single precision holds only few digits behind the decimal point.
+    /// Subtracts a point near the middle of the geometry from all positions, in double precision: far from the origin,
+    /// single precision has only few decimal places.
     bool isCentered = false;
-    /// Subtracts this place instead: the one of a file read before, for instance.
+    /// Subtracts this point instead, such as the center of a file read before.
     std::optional<Tessara::Math::double3> origin = {};
 };
 
-/// What a file held, as the library takes it: a mesh where there are faces, otherwise a strand set where there are
-/// polylines, otherwise a point cloud.
+/// The contents of a file: a mesh if there are faces, otherwise a strand set if there are polylines, otherwise a point
+/// cloud.
 struct GeometryFile {
     Orvan::MutablePtr<Tessara::Object> object;
     std::string format; // "OBJ", "PLY (binary, little endian)", ...
-    std::vector<std::string> notes; // what was in the file and is not in the object, a sentence each
+    std::vector<std::string>
+        notes; // what the file contains and the object does not, and what was guessed; one sentence each
     std::optional<Tessara::Math::double3> origin = {}; // what was subtracted from all positions
 };
 
-/// Reads OBJ, PLY, STL, OFF and XYZ files, told apart by the extension of the name, in any case.
-/// \throws FileError  for a file that is not there, is cut off, or holds what cannot be right
+/// Reads OBJ, PLY, STL, OFF and XYZ files, determined by the extension in upper or lower case.
+/// \throws FileError  if the file does not exist, is cut off, or is malformed
 GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options = {});
 
-/// What is done about a file that exists already. Links, devices and pipes are not files in this sense.
+/// What to do if the output file exists. Links, devices and pipes do not count as files here.
 enum class Existing { Replace, Keep };
 
 struct WriteOptions {
@@ -51,16 +52,16 @@ struct WriteOptions {
     std::string remark = {}; // a line of text without a line end, stored as a comment; empty for none
 };
 
-/// Writes OBJ, PLY (binary, little endian), STL (binary) and VTP files. The file appears under its name only when it is
-/// complete: it is written beside it first.
-/// \return what the format cannot hold and was therefore dropped or written in another form, a sentence each
-/// \throws FileError  where the file cannot be written, the format cannot hold the kind of geometry at all, or the
-///                    geometry is not valid, has positions that are not finite or faces of fewer than three corners; a
-///                    file of that name is then as it was
+/// Writes OBJ, PLY (binary, little-endian), STL (binary) and VTP files. The file appears under its name only when it is
+/// complete: it is written to a temporary file in the same folder first.
+/// \return what the format cannot hold and was therefore dropped or converted, one sentence each
+/// \throws FileError  if the file cannot be written, the format cannot hold this type of geometry, or the geometry is
+///                    invalid, has positions that are not finite or faces with fewer than three corners; an existing
+///                    file is then unchanged
 std::vector<std::string> writeGeometryFile(
     Tessara::Object const& object, std::filesystem::path const& file, WriteOptions const& options = {});
 
-/// Whether `writeGeometryFile` knows the extension: asked before work is done that could not be kept.
+/// Whether `writeGeometryFile` supports the extension.
 bool isWritableFormat(std::filesystem::path const& file);
 
 }

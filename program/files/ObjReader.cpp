@@ -14,16 +14,7 @@ namespace {
 
     constexpr float3 kWhite{1, 1, 1};
 
-    template <class T>
-    Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
-    {
-        Orvan::Array<T> result(indices.size, Orvan::kUninitialized);
-        std::transform(indices.begin(), indices.end(), result.begin(),
-            [&](unsigned int index) { return index == kInvalidIndex ? T{} : values[index]; });
-        return result;
-    }
-
-    /// Different texts, in the order in which they come.
+    /// Distinct texts in order of appearance.
     class Texts {
     public:
         void add(std::string_view text)
@@ -77,7 +68,7 @@ namespace {
             std::uint64_t faces = 0;
         };
 
-        /// The counts come first, so that an index can be checked where it stands: it may point forwards.
+        /// Counts first, so that each index, which may refer forwards, can be checked when it is read.
         void countStatements()
         {
             TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
@@ -96,14 +87,14 @@ namespace {
             normals_.reserve(total_.normals);
         }
 
-        /// A file without points is an empty geometry, unless it is a file of another kind.
+        /// A file without points is empty geometry, unless it is not an OBJ file at all.
         void requireObjStatements()
         {
             TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
             scanner.skipEmptyLines();
             std::string_view const keyword = scanner.atEnd() ? std::string_view() : scanner.peekWord();
             if (!keyword.empty() && !isGeometry(keyword) && !namesOf(keyword) && keyword != "p")
-                scanner.refuse(TextScanner::quoted(keyword) + " begins no line of an OBJ file");
+                scanner.refuse(TextScanner::quoted(keyword) + " is not a keyword of OBJ files");
         }
 
         void readStatement()
@@ -124,7 +115,7 @@ namespace {
             else if (!keyword.empty() && !readName(keyword))
                 unknownKeywords_.add(keyword);
             if (isGeometry(keyword) && !in_.atLineEnd())
-                in_.refuse(TextScanner::quoted(in_.peekWord()) + " is more than belongs into this line");
+                in_.refuse(TextScanner::quoted(in_.peekWord()) + " is unexpected at the end of the line");
         }
 
         static bool isGeometry(std::string_view keyword)
@@ -146,7 +137,7 @@ namespace {
             return known == std::end(names_) ? nullptr : known;
         }
 
-        /// Names of parts of the geometry; those of `s` are numbers, where 0 and off mean none.
+        /// Reads names of parts of the geometry. Those of `s` are numbers; 0 and off mean none.
         bool readName(std::string_view keyword)
         {
             Names* const known = namesOf(keyword);
@@ -168,20 +159,20 @@ namespace {
             return {x, y, in_.number<float>(what)};
         }
 
-        /// v x y z, then perhaps a weight or a colour.
+        /// v x y z, optionally followed by a weight or a color.
         void readPoint()
         {
             Coordinate const x = in_.coordinate(), y = in_.coordinate();
             builder_.addPoint(x, y, in_.coordinate());
             if (in_.atLineEnd())
                 return;
-            float const first = in_.number<float>("a weight or a colour");
+            float const first = in_.number<float>("a weight or a color");
             if (in_.atLineEnd()) {
                 weightedPoints_ += first != 1;
                 return;
             }
-            float const green = in_.number<float>("a colour");
-            float3 const color{first, green, in_.number<float>("a colour")};
+            float const green = in_.number<float>("a color");
+            float3 const color{first, green, in_.number<float>("a color")};
             fillColors(builder_.pointCount() - 1);
             colors_.append(color);
         }
@@ -209,7 +200,7 @@ namespace {
                 builder_.addCorner(readIndex("point", builder_.pointCount(), total_.points));
                 unsigned int texture = kInvalidIndex;
                 unsigned int normal = kInvalidIndex;
-                if (in_.accept('/')) { // v/vt, v/vt/vn, v//vn, and any of them with an empty end
+                if (in_.accept('/')) { // v/vt, v/vt/vn, v//vn, each optionally with an empty end
                     if (!in_.atTokenEnd() && !in_.isAt('/'))
                         texture = readIndex("texture coordinate", textures_.size, total_.textures);
                     if (in_.accept('/') && !in_.atTokenEnd())
@@ -235,11 +226,11 @@ namespace {
             if (linePoints_.size == lineOffset_[lineOffset_.size - 1])
                 in_.refuse("a polyline has no points");
             if (linePoints_.size >= GeometryBuilder::kMostElements)
-                in_.refuse("there are more points in polylines than a strand set can hold");
+                in_.refuse("the polylines have more points than a strand set can hold");
             lineOffset_.append(static_cast<unsigned int>(linePoints_.size));
         }
 
-        /// Indices count from 1, negative ones backwards from what has been read so far.
+        /// Indices count from 1; negative ones count backwards from the last element read.
         unsigned int readIndex(char const* kind, std::uint64_t read, std::uint64_t total)
         {
             long long const index = in_.leadingInteger("an index");
@@ -247,7 +238,7 @@ namespace {
             if (element < 0 || element >= static_cast<long long>(total))
                 in_.refuse(std::string("the ") + kind + " " + std::to_string(index) + " does not exist: "
                     + (index == 0       ? "the first one is 1"
-                            : index < 0 ? std::to_string(read) + " stand above"
+                            : index < 0 ? "only " + std::to_string(read) + " before this line"
                                         : "the file has " + std::to_string(total)));
             return static_cast<unsigned int>(element);
         }
@@ -255,7 +246,7 @@ namespace {
         void expectTokenEnd()
         {
             if (!in_.atTokenEnd())
-                in_.refuse(TextScanner::quoted(in_.peekWord()) + " follows an index, but is none");
+                in_.refuse(TextScanner::quoted(in_.peekWord()) + " follows an index, but is not one");
         }
 
         template <class T>
@@ -285,8 +276,8 @@ namespace {
             if (!colors_.empty())
                 fillColors(total_.points);
             if (uncoloredPoints_ != 0)
-                builder_.note(std::to_string(uncoloredPoints_) + " points have no colour and become white");
-            // Without faces nothing tells whose a normal is, but writers of point clouds give one a point.
+                builder_.note(std::to_string(uncoloredPoints_) + " points have no color and become white");
+            // Without faces nothing refers to normals, but writers of point clouds write one per point.
             if (builder_.faceCount() != 0 || normals_.size != total_.points) {
                 noteUnused("normals (vn)", normalOf_, normals_.size);
                 normals_.clear();
@@ -299,12 +290,13 @@ namespace {
                 builder_.addProperty<float3>("normal", sPointComp, std::move(normals_));
         }
 
-        /// A strand's points are consecutive and its own: points that polylines share become several, and points of no
-        /// polyline go.
+        /// Each strand has consecutive points of its own: points that polylines share are duplicated, and points of no
+        /// polyline are removed.
         void addPolylines()
         {
             if (builder_.faceCount() != 0) {
-                builder_.note("polylines are left out, as a mesh has none: " + std::to_string(lineOffset_.size - 1));
+                builder_.note(
+                    "polylines are left out, because a mesh has none: " + std::to_string(lineOffset_.size - 1));
                 return;
             }
             std::vector<bool> isUsed(total_.points);
@@ -317,7 +309,7 @@ namespace {
                 builder_.note(std::to_string(total_.points - usedCount) + " points of no polyline are left out");
             if (usedCount != linePoints_.size)
                 builder_.note(std::to_string(linePoints_.size - usedCount)
-                    + " points are added where polylines share points: each strand has its own");
+                    + " points are duplicated, because each strand has its own points");
             if (!colors_.empty())
                 colors_ = gathered(colors_, linePoints_);
             if (!normals_.empty())
@@ -348,7 +340,7 @@ namespace {
         Orvan::Array<float2> textures_;
         Orvan::Array<float3> normals_;
         Orvan::Array<float3> colors_;
-        Orvan::Array<unsigned int> textureOf_; // an entry a corner, where the file has texture coordinates at all
+        Orvan::Array<unsigned int> textureOf_; // one entry per corner, if the file has texture coordinates
         Orvan::Array<unsigned int> normalOf_;
         Orvan::Array<unsigned int> linePoints_;
         Orvan::Array<unsigned int> lineOffset_{0u};
@@ -357,7 +349,7 @@ namespace {
         std::uint64_t weightedPoints_ = 0;
         std::uint64_t deepTextures_ = 0;
         Names names_[5] = {{"o", "objects", {}}, {"g", "groups", {}}, {"s", "smoothing groups", {}},
-            {"usemtl", "materials", {}}, {"mtllib", "files of materials", {}}};
+            {"usemtl", "materials", {}}, {"mtllib", "material libraries", {}}};
         Texts unknownKeywords_;
     };
 

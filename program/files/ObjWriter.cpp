@@ -54,18 +54,18 @@ namespace {
         }
 
     private:
-        /// Values of corners win over those of points: they are what the format is made for.
+        /// Values of corners take precedence over those of points, because the format is designed for them.
         void chooseAttributes()
         {
             for (char const* const component : {sFaceVertexComp, sPointComp}) {
                 for (Attribute const& attribute : geometry_.attributes) {
                     if (attribute.component == component && !isTaken(attribute))
-                        leaveOut(attribute, "OBJ files have no place for it", geometry_.leftOut);
+                        leaveOut(attribute, "OBJ files cannot hold it", geometry_.leftOut);
                 }
             }
             for (Attribute const& attribute : geometry_.attributes) {
                 if (attribute.component != sFaceVertexComp && attribute.component != sPointComp)
-                    leaveOut(attribute, "OBJ files have no place for it", geometry_.leftOut);
+                    leaveOut(attribute, "OBJ files cannot hold it", geometry_.leftOut);
             }
         }
 
@@ -90,8 +90,9 @@ namespace {
             if (isOf(std::type_identity<float3>()))
                 return true;
             if (isOf(std::type_identity<uchar3>(), std::type_identity<uchar4>(), std::type_identity<float4>())) {
-                geometry_.leftOut.push_back("\"color\" is written as three fractions a point: OBJ files have no bytes "
-                                            "there and no alpha");
+                geometry_.leftOut.push_back(
+                    "\"color\" is written as three fractions per point: OBJ files have no bytes "
+                    "there and no alpha");
                 return true;
             }
             colors_ = {};
@@ -180,7 +181,7 @@ namespace {
             }
             if (emptyCount != 0)
                 geometry_.leftOut.push_back(
-                    std::to_string(emptyCount) + " strands without points are left out: OBJ files hold none");
+                    std::to_string(emptyCount) + " strands without points are left out: OBJ files cannot hold them");
         }
 
         static std::uint64_t oneBased(unsigned int index) { return std::uint64_t{index} + 1; }

@@ -12,8 +12,8 @@ using Tessara::Math::float3;
 
 namespace {
 
-    /// The colours of a component's elements, as they come: bytes or fractions, with alpha or without, and perhaps
-    /// not for all elements. What they are is known at the end.
+    /// The colors of the elements of a component as read: bytes or fractions, with or without alpha, possibly not for
+    /// all elements. Their type is determined at the end.
     class Colors {
     public:
         void add(std::uint64_t element, std::span<float const> values, bool isFraction)
@@ -90,7 +90,7 @@ namespace {
             }
             in_.skipEmptyLines();
             if (!in_.atEnd() && !builder_.options().isLenient)
-                in_.refuse(TextScanner::quoted(in_.peekWord()) + " follows, though all faces have been read");
+                in_.refuse(TextScanner::quoted(in_.peekWord()) + " follows after the last face");
             builder_.noteBytesLeft();
             if (hasNormals_)
                 builder_.addProperty<float3>("normal", sPointComp, std::move(normals_));
@@ -99,12 +99,12 @@ namespace {
             pointColors_.addTo(builder_, sPointComp, pointCount_);
             faceColors_.addTo(builder_, sFaceComp, faceCount_);
             if (colorIndices_ != 0)
-                builder_.note(std::to_string(colorIndices_) + " faces name a colour of a table; that is left out");
+                builder_.note(std::to_string(colorIndices_) + " faces refer to a color table, which is ignored");
             return std::move(builder_).finish("OFF");
         }
 
     private:
-        /// [ST][C][N]OFF, where C and N come in either order, then the counts of points, faces and perhaps edges.
+        /// [ST][C][N]OFF, with C and N in either order, then the numbers of points, faces and optionally edges.
         void readHeader()
         {
             in_.skipEmptyLines();
@@ -116,15 +116,16 @@ namespace {
             prefix.remove_prefix(hasTextures_ ? 2 : 0);
             hasNormals_ = prefix.find('N') != std::string_view::npos;
             if (prefix.find_first_not_of("CN") != std::string_view::npos)
-                in_.refuse(TextScanner::quoted(word) + " files are not known: points have three coordinates here");
+                in_.refuse(
+                    TextScanner::quoted(word) + " files are not supported: only points with three coordinates are");
             in_.skipEmptyLines();
             pointCount_ = in_.number<std::uint64_t>("the number of points");
             faceCount_ = in_.number<std::uint64_t>("the number of faces");
             if (!in_.atLineEnd())
                 static_cast<void>(in_.number<std::uint64_t>("the number of edges"));
             in_.expectLineEnd();
-            in_.believe(pointCount_, "points", 6);
-            in_.believe(faceCount_, "faces", 8);
+            in_.requirePossible(pointCount_, "points", 6);
+            in_.requirePossible(faceCount_, "faces", 8);
             builder_.expectPoints(pointCount_);
             builder_.expectFaces(faceCount_);
         }
@@ -136,7 +137,7 @@ namespace {
             return {x, y, in_.number<float>(what)};
         }
 
-        /// Position, normal, colour, texture coordinates: colours also where the header does not announce them.
+        /// Position, normal, color, texture coordinates. Colors are read even if the header does not announce them.
         void readPoint(std::uint64_t point)
         {
             Coordinate const x = in_.coordinate(), y = in_.coordinate();
@@ -159,7 +160,7 @@ namespace {
         void readFace(std::uint64_t face)
         {
             auto const corners = in_.number<std::uint64_t>("the number of corners");
-            in_.believe(corners, "corners", 2);
+            in_.requirePossible(corners, "corners", 2);
             for (std::uint64_t corner = 0; corner < corners; ++corner)
                 builder_.addCorner(in_.number<long long>("a point"));
             builder_.endFace();
@@ -174,17 +175,18 @@ namespace {
         void addColor(std::uint64_t element, std::span<float const> values, unsigned int fractions, Colors& colors)
         {
             if (values.size() < 3)
-                in_.refuse("a colour has " + std::to_string(values.size()) + " values instead of 3 or 4");
+                in_.refuse("a color has " + std::to_string(values.size()) + " values instead of 3 or 4");
             colors.add(element, values, fractions != 0);
         }
 
-        /// Up to `most` values, as many as the line has; a bit of `fractions` for each that has a decimal point.
+        /// Up to `most` values, as many as the line has, and one bit of `fractions` for each value with a decimal
+        /// point.
         std::size_t readValues(float* values, std::size_t most, unsigned int& fractions)
         {
             std::size_t count = 0;
             for (; count < most && !in_.atLineEnd(); ++count) {
                 fractions |= (in_.peekWord().find('.') != std::string_view::npos ? 1u : 0u) << count;
-                values[count] = in_.number<float>("a colour");
+                values[count] = in_.number<float>("a color");
             }
             return count;
         }

@@ -12,9 +12,9 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr mode_t kReadAndWriteForAll = 0666; // less what the process masks
+    constexpr mode_t kReadAndWriteForAll = 0666; // minus the umask
 
-    /// Where the file will lie: the end of a chain of links, so that a link stays one.
+    /// The end of a chain of links, so that the link itself is not replaced.
     std::filesystem::path followLinks(std::filesystem::path file)
     {
         constexpr int kMostLinks = 40;
@@ -28,7 +28,7 @@ namespace {
         return file;
     }
 
-    /// The owner, and above all root, could replace such a file all the same, but somebody has asked to keep it.
+    /// The owner and root could replace such a file anyway, but its permissions ask to keep it.
     bool isWriteProtected(std::filesystem::path const& file, std::filesystem::perms permissions)
     {
         using std::filesystem::perms;
@@ -36,8 +36,8 @@ namespace {
         return (permissions & kWrite) == perms::none || ::faccessat(AT_FDCWD, file.c_str(), W_OK, AT_EACCESS) != 0;
     }
 
-    /// The name of the temporary file of one `OutputFile` at a time, as the program writes one file at a time. It is in
-    /// static memory, as a signal handler may read it at any moment.
+    /// The name of the temporary file of one `OutputFile`, since the program writes one file at a time. Static, because
+    /// a signal handler may read it at any moment.
     struct Unfinished {
         std::atomic<bool> isTaken = false;
         std::atomic<bool> hasName = false;
@@ -82,7 +82,7 @@ OutputFile::OutputFile(std::filesystem::path const& file, Existing existing)
         openBeside();
     else if ((descriptor_ = ::open(target_.c_str(), O_WRONLY | O_CLOEXEC)) < 0)
         fail(errno);
-    if (isRegular) // the new file is open to whom the old one was
+    if (isRegular) // the new file gets the permissions of the old one
         static_cast<void>(::fchmod(descriptor_, static_cast<mode_t>(status.permissions())));
 }
 
@@ -102,7 +102,7 @@ void OutputFile::openBeside()
         releaseTemporary();
         temporary_ = target_.parent_path()
             / (".modeling-" + std::to_string(::getpid()) + "-" + std::to_string(counter.fetch_add(1)) + ".tmp");
-        isRegistered_ = unfinished.take(temporary_); // before the file exists, as a signal may arrive in between
+        isRegistered_ = unfinished.take(temporary_); // before the file exists, because a signal may arrive in between
         descriptor_ = ::open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kReadAndWriteForAll);
     } while (descriptor_ < 0 && errno == EEXIST);
     if (descriptor_ < 0) {
@@ -154,7 +154,7 @@ void OutputFile::moveIntoPlace() const
     if (existing_ == Existing::Keep) {
         if (::renameat2(AT_FDCWD, temporary_.c_str(), AT_FDCWD, target_.c_str(), RENAME_NOREPLACE) == 0)
             return;
-        bool const isUnknown = errno == EINVAL || errno == ENOSYS; // to some file systems
+        bool const isUnknown = errno == EINVAL || errno == ENOSYS; // not supported by some file systems
         if (!isUnknown || ::access(target_.c_str(), F_OK) == 0)
             fail(isUnknown ? EEXIST : errno);
     }
@@ -162,13 +162,13 @@ void OutputFile::moveIntoPlace() const
         fail(errno);
 }
 
-void OutputFile::tryOut(std::filesystem::path const& file, Existing existing)
+void OutputFile::checkWritable(std::filesystem::path const& file, Existing existing)
 {
     std::error_code error;
     std::filesystem::file_status const status = std::filesystem::status(file, error);
     bool const isSpecial = std::filesystem::exists(status) && !std::filesystem::is_regular_file(status)
         && !std::filesystem::is_directory(status);
-    if (!isSpecial) // whoever reads a pipe would take its opening and closing for the whole
+    if (!isSpecial) // opening and closing a pipe would be the end of file for its reader
         OutputFile(file, existing);
 }
 

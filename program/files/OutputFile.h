@@ -9,12 +9,12 @@
 
 namespace ModelingProgram {
 
-/// Writes a file beside its final place and moves it there when it is complete; until then, and if anything fails, an
-/// existing file stays as it was. What is not a regular file (a device, a pipe) is written directly.
+/// Writes to a temporary file in the same folder and renames it when it is complete. Until then, and if anything fails,
+/// an existing file is unchanged. Anything but a regular file (a device, a pipe) is written directly.
 class OutputFile {
 public:
-    /// \throws FileError, as all operations do: here if the folder cannot be written, or the file exists and is to be kept
-    ///         or is write-protected
+    /// \throws FileError, as all functions do: here if the folder is not writable, or if the file exists and is to be
+    ///                    kept or is write-protected
     explicit OutputFile(std::filesystem::path const& file, Existing existing = Existing::Replace);
     OutputFile(OutputFile const&) = delete;
     OutputFile& operator=(OutputFile const&) = delete;
@@ -40,7 +40,7 @@ public:
         return *this;
     }
 
-    /// Numbers come with the fewest digits from which the same number is read.
+    /// Writes a number with the fewest digits from which the same number is read.
     template <class T>
     requires std::is_arithmetic_v<T> OutputFile& operator<<(T number)
     {
@@ -52,17 +52,17 @@ public:
         return *this;
     }
 
-    /// The bytes of a number as they lie in memory.
+    /// Writes the bytes of a number as in memory.
     template <class T> void writeBinary(T number) { write(&number, sizeof(T)); }
 
-    /// Completes the file and puts it in its place.
-    /// \throws FileError  also if a file that is to be kept has appeared there in the meantime
+    /// Completes the file and renames it.
+    /// \throws FileError  also if a file that is to be kept has been created in the meantime
     void commit();
 
-    /// Throws what writing the file would throw at its start, and leaves nothing behind.
-    static void tryOut(std::filesystem::path const& file, Existing existing);
+    /// Throws what the constructor would throw, and leaves no file behind.
+    static void checkWritable(std::filesystem::path const& file, Existing existing);
 
-    /// Removes what is written of a file that is not complete: for handlers of signals that end the process.
+    /// Removes an incomplete temporary file. Async-signal-safe, for handlers of signals that end the process.
     static void removeUnfinished() noexcept;
 
 private:
@@ -76,9 +76,9 @@ private:
     [[noreturn]] void fail(char const* why) const;
     [[noreturn]] void fail(int error) const { fail(std::strerror(error)); }
 
-    std::filesystem::path file_; // as the caller named it
-    std::filesystem::path target_; // where links lead
-    std::filesystem::path temporary_; // empty while there is none
+    std::filesystem::path file_; // as given by the caller
+    std::filesystem::path target_; // with links resolved
+    std::filesystem::path temporary_; // empty if there is none
     bool isRegistered_ = false; // `removeUnfinished` knows its name
     Existing existing_;
     int descriptor_ = -1;

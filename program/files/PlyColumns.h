@@ -4,14 +4,14 @@
 
 namespace ModelingProgram {
 
-/// Columns of a PLY file that make up one property. Of several groups for one property, writers take the first.
+/// Columns of a PLY file that form one property. Writers use the first of several groups for a property.
 struct PlyColumns {
     std::string_view property;
     unsigned int components;
     std::string_view names; // separated by blanks
 };
 
-// Where one group begins like another, the longer one stands first.
+// If a group is a prefix of another, the longer one comes first.
 inline constexpr PlyColumns kPlyColumns[] = {
     {"normal", 3, "nx ny nz"},
     {"color", 4, "red green blue alpha"},
@@ -21,7 +21,7 @@ inline constexpr PlyColumns kPlyColumns[] = {
     {"uv", 2, "texture_u texture_v"},
 };
 
-/// The name of the lists of the faces that hold texture coordinates of their corners, two numbers each.
+/// The name of the face lists with the texture coordinates of their corners, two numbers per corner.
 inline constexpr std::string_view kPlyCornerTextures = "texcoord";
 
 }

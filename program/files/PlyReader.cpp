@@ -52,12 +52,12 @@ namespace {
         Scalar type = Scalar::Int;
         std::optional<Scalar> lengthType; // of a list
 
-        // Where the values go.
+        // Where the values are stored.
         enum class Use { Nothing, Position, Value, Indices, List } use = Use::Nothing;
         int axis = 0; // of a position
         std::byte* target = nullptr; // of the next value
         std::size_t stride = 0;
-        Orvan::Array<unsigned int> lengths; // of lists, an entry an element
+        Orvan::Array<unsigned int> lengths; // of lists; one entry per element
         std::vector<std::byte> values; // of all lists
     };
 
@@ -89,7 +89,7 @@ namespace {
             in_.nextLine();
             while (readLine()) { }
             for (Element const& element : header_.elements)
-                in_.believe(element.count, ("elements \"" + element.name + "\"").c_str(), leastBytes(element));
+                in_.requirePossible(element.count, ("elements \"" + element.name + "\"").c_str(), leastBytes(element));
             return std::move(header_);
         }
 
@@ -143,13 +143,13 @@ namespace {
         void readProperty()
         {
             if (header_.elements.empty())
-                in_.refuse("a property stands before the first element");
+                in_.refuse("a property comes before the first element");
             Property property;
             if (in_.peekWord() == "list") {
                 in_.word();
                 property.lengthType = readType();
                 if (!isWhole(*property.lengthType))
-                    in_.refuse("the length of a list is no whole number");
+                    in_.refuse("the length of a list is not a whole number");
             }
             property.type = readType();
             property.name = in_.word();
@@ -176,7 +176,7 @@ namespace {
             return type->second;
         }
 
-        /// That an element takes in the file: a digit and a blank for a number, a length for an empty list.
+        /// The minimum size of an element in the file: a digit and a blank per number, or the length of an empty list.
         std::size_t leastBytes(Element const& element) const
         {
             std::size_t bytes = 0;
@@ -192,7 +192,7 @@ namespace {
         int lineCount_ = 0;
     };
 
-    /// Reads the elements behind a header, with a scanner for their encoding.
+    /// Reads the elements after a header, with a scanner for their encoding.
     template <class In> class PlyReader {
     public:
         PlyReader(Header& header, In& in, ReadOptions const& options)
@@ -276,7 +276,7 @@ namespace {
                 in_.refuse("faces have no list \"vertex_indices\"");
         }
 
-        /// Finds a place for the values of one column or of several that belong together; returns their number.
+        /// Prepares one column, or several columns that form one property. \return their number
         std::size_t prepareColumns(Element& element, std::size_t first)
         {
             Property* const property = &element.properties[first];
@@ -347,7 +347,8 @@ namespace {
             }
             T const value = in_.template number<T>(property.name.c_str());
             if (property.use == Use::Position) {
-                position_[property.axis] = coordinateOf(value); // beyond float it is infinite, and refused
+                position_[property.axis] =
+                    coordinateOf(value); // out of range of float it becomes infinite, and is refused
             } else if (property.use == Use::Value) {
                 std::memcpy(property.target, &value, sizeof(T));
                 property.target += property.stride;
@@ -357,7 +358,7 @@ namespace {
         template <class T> void readList(Property& property)
         {
             std::uint64_t const length = readLength(property);
-            in_.believe(length, "values of a list", kIsText ? 2 : sizeof(T));
+            in_.requirePossible(length, "values of a list", kIsText ? 2 : sizeof(T));
             if (property.use == Use::List)
                 property.lengths.append(static_cast<unsigned int>(length));
             for (std::uint64_t i = 0; i < length; ++i) {

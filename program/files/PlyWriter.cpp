@@ -15,7 +15,7 @@ using namespace Tessara::Geometry;
 
 namespace {
 
-    static_assert(std::endian::native == std::endian::little, "numbers are written as they lie in memory");
+    static_assert(std::endian::native == std::endian::little, "numbers are written with the byte order of memory");
 
     std::string typeName(auto elementType)
     {
@@ -30,13 +30,13 @@ namespace {
             return elementTypeName<typename Layout::Scalar>();
     }
 
-    /// The values of an attribute as they go into the file: so many bytes an element.
+    /// The values of an attribute as written to the file, with a fixed number of bytes per element.
     struct Values {
         std::byte const* data;
         std::size_t bytes;
-        std::string type; // of a scalar; empty where PLY has none like it
+        std::string type; // of a scalar; empty if PLY has no such type
         unsigned int components;
-        bool isAmbiguous; // a reader would take it for another type of as many scalars
+        bool isAmbiguous; // a reader would choose another type with as many scalars
     };
 
     Values valuesOf(Attribute const& attribute)
@@ -60,7 +60,7 @@ namespace {
         return {std::istream_iterator<std::string>(stream), {}};
     }
 
-    /// The columns or the list of one element: the header's lines, and where the values come from.
+    /// The columns or the list of one element: its lines in the header, and the source of its values.
     struct Column {
         Values values;
         bool isList;
@@ -77,7 +77,8 @@ namespace {
         void write()
         {
             if (geometry_.kind == WritableGeometry::Kind::Strands)
-                throw FileError(file_.string() + " cannot be written: PLY files hold no strands; OBJ and VTP files do");
+                throw FileError(
+                    file_.string() + " cannot be written: PLY files cannot hold strands; OBJ and VTP files can");
             std::ostringstream header;
             header << "ply\nformat binary_little_endian 1.0\n";
             if (!geometry_.remark.empty())
@@ -111,7 +112,7 @@ namespace {
             Orvan::Array<unsigned int> const& offset = *geometry_.offsets;
             for (std::uint64_t face = 0; face + 1 < offset.size; ++face)
                 mostCorners_ = std::max(mostCorners_, offset[face + 1] - offset[face]);
-            // Most programs know no other index type than int.
+            // Most programs support no other index type than int.
             char const* const indexType =
                 geometry_.pointCount() > std::numeric_limits<std::int32_t>::max() ? "uint" : "int";
             header << "element face " << geometry_.cellCount() << "\nproperty list " << lengthType(mostCorners_) << " "
@@ -153,7 +154,7 @@ namespace {
                 if (values.type.empty() || (values.isAmbiguous && names.size() == 1)) {
                     leaveOut(attribute, "PLY files have no such type", geometry_.leftOut);
                 } else if (!isFree || wordsOf(attribute.name) != std::vector{attribute.name}) {
-                    leaveOut(attribute, "PLY files cannot have a property of that name here", geometry_.leftOut);
+                    leaveOut(attribute, "PLY files cannot have a property with this name here", geometry_.leftOut);
                 } else {
                     taken.insert(names.begin(), names.end());
                     bool const isList = names.size() != values.components;
@@ -191,7 +192,8 @@ namespace {
             bool const isWritten = attribute.component == sPointComp || attribute.component == sFaceComp
                 || (cornerTextures_ && attribute.component == sFaceVertexComp && attribute.name == "uv");
             if (!isWritten)
-                leaveOut(attribute, "of face corners PLY files hold only texture coordinates (uv)", geometry_.leftOut);
+                leaveOut(
+                    attribute, "PLY files can hold only texture coordinates (uv) of face corners", geometry_.leftOut);
         }
 
         void writeCorners(std::uint64_t face, OutputFile& out) const

@@ -4,27 +4,27 @@
 
 namespace ModelingProgram {
 
-// One reader a format; all throw `FileError`.
+// One reader per format; all throw `FileError`.
 
-/// Polygons, or polylines if there are none, or points. Texture coordinates and normals become properties of the
-/// face corners ("uv", "normal"), colours behind positions one of the points ("color").
+/// Polygons, or polylines if there are none, or points. Texture coordinates and normals become properties of the face
+/// corners ("uv", "normal"), colors after positions a property of the points ("color").
 GeometryFile readObj(InputFile const& file, ReadOptions const& options);
 
-/// All three encodings. Columns that belong together become one property: nx ny nz "normal", red green blue alpha
-/// "color", u v or s t or texture_u texture_v "uv"; the other columns keep their names and types, and lists of one
-/// length become vectors or matrices. Lists "texcoord" of the faces become "uv" of their corners.
+/// All three encodings. Groups of columns become one property: nx ny nz "normal", red green blue alpha "color", u v or
+/// s t or texture_u texture_v "uv"; other columns keep their names and types, and lists of equal length become vectors
+/// or matrices. Lists "texcoord" of the faces become "uv" of their corners.
 GeometryFile readPly(InputFile const& file, ReadOptions const& options);
 
-/// Binary if and only if the file is as long as its count says, or longer if read leniently. Corners at equal positions
-/// become one point; 0 and -0 are equal. Normals are left out, for they follow from the corners; the two bytes behind
-/// each triangle become "attribute" of the faces, unless all are 0.
+/// Binary if and only if the file is exactly as long as its count requires, or longer if read leniently. Corners at
+/// equal positions become one point; 0 and -0 are equal. Normals are ignored, because the corners determine them; the
+/// two bytes after each triangle become "attribute" of the faces, unless all are 0.
 GeometryFile readStl(InputFile const& file, ReadOptions const& options);
 
-/// With colours and normals of points and colours of faces ("color", "normal"): bytes where all are whole numbers up to
-/// 255, otherwise floats.
+/// With colors and normals of points and colors of faces ("color", "normal"): colors are bytes if all are whole numbers
+/// up to 255, otherwise floats.
 GeometryFile readOff(InputFile const& file, ReadOptions const& options);
 
-/// Tables of points, as docs/program.md describes: the heading line or the values tell what the columns are.
+/// Tables of points, as docs/program.md describes: the heading line or the values determine the columns.
 GeometryFile readXyz(InputFile const& file, ReadOptions const& options);
 
 }

@@ -13,8 +13,9 @@ namespace {
         throw FileError(file.string() + " cannot be read: " + why);
     }
 
-    /// Half a unit of the last digit: a number that is no farther off still gives the same digits. Six digits always fit.
-    double leastToldLoss(std::string_view number)
+    /// Half a unit of the last digit: a number within this distance is still written with the same digits. Six digits
+    /// always fit.
+    double leastReportedLoss(std::string_view number)
     {
         int digitCount = 0, decimalCount = 0, exponent = 0;
         bool isBehindPoint = false;
@@ -34,10 +35,18 @@ namespace {
             return HUGE_VAL;
         constexpr double kUnits[] = {1e0, 1e-1, 1e-2, 1e-3, 1e-4, 1e-5, 1e-6, 1e-7, 1e-8, 1e-9, 1e-10};
         int const place = decimalCount - exponent;
-        bool const isCommon = place >= 0 && place < static_cast<int>(std::size(kUnits)); // std::pow takes long
+        bool const isCommon = place >= 0 && place < static_cast<int>(std::size(kUnits)); // std::pow is slow
         return 0.500001 * (isCommon ? kUnits[place] : std::pow(10.0, -place));
     }
 
+}
+
+std::string lowerCase(std::string_view text)
+{
+    std::string result(text);
+    for (char& c : result)
+        c = lowerCase(c);
+    return result;
 }
 
 InputFile::InputFile(std::filesystem::path const& file)
@@ -50,7 +59,7 @@ InputFile::InputFile(std::filesystem::path const& file)
     if (error)
         refuseFile(file, error.message());
     if (!std::filesystem::is_regular_file(status))
-        refuseFile(file, "it is no regular file");
+        refuseFile(file, "it is not a regular file");
 
     std::unique_ptr<std::FILE, int (*)(std::FILE*)> const stream(std::fopen(file.c_str(), "rb"), &std::fclose);
     if (!stream)
@@ -64,8 +73,8 @@ InputFile::InputFile(std::filesystem::path const& file)
         refuseFile(file, std::ferror(stream.get()) ? std::strerror(errno) : "it changed while it was read");
 }
 
-/// Rounding twice, first to double and then to single precision, can miss the nearest float if the double is halfway
-/// between two: then it is moved to the side on which the decimal number is.
+/// Double rounding, first to double and then to single precision, can miss the nearest float if the double is halfway
+/// between two floats. It is then moved towards the decimal number.
 Coordinate TextScanner::decimalCoordinate(std::string_view digits, double value)
 {
     auto rounded = static_cast<float>(value);
@@ -76,7 +85,7 @@ Coordinate TextScanner::decimalCoordinate(std::string_view digits, double value)
         std::from_chars(digits.data(), digits.data() + digits.size(), rounded);
         value = static_cast<float>(value) == rounded ? value : std::nextafter(value, static_cast<double>(rounded));
     }
-    return {value, std::abs(value - static_cast<double>(rounded)) > leastToldLoss(digits)};
+    return {value, std::abs(value - static_cast<double>(rounded)) > leastReportedLoss(digits)};
 }
 
 std::string_view TextScanner::restOfLine()

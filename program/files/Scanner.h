@@ -14,6 +14,13 @@
 
 namespace ModelingProgram {
 
+/// Changes the letters A to Z only, whatever the locale.
+inline char lowerCase(char c)
+{
+    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+}
+std::string lowerCase(std::string_view text);
+
 /// The bytes of a file, read at once.
 struct InputFile {
     explicit InputFile(std::filesystem::path const& file);
@@ -23,21 +30,21 @@ struct InputFile {
     std::unique_ptr<char[]> bytes;
 };
 
-/// A coordinate as the file has it: rounded to single precision it is the float nearest to what the file says.
+/// A coordinate in double precision. Rounded to single precision, it is the float nearest to the number in the file.
 struct Coordinate {
     double value = 0;
-    bool losesDigits = false; // that the file has, when rounded
+    bool losesDigits = false; // if rounded to single precision
 };
 
-/// A number that is in memory as the file has it.
+/// The coordinate of a binary number.
 template <class T> Coordinate coordinateOf(T value)
 {
     auto const wide = static_cast<double>(value);
     return {wide, static_cast<double>(static_cast<float>(wide)) != wide};
 }
 
-/// The place that a reader has reached in a file. Whatever is wrong with the file is said through `refuse`, so that no
-/// refusal comes without its place.
+/// The current position of a reader in a file. All errors in the file are reported through `refuse`, which adds the
+/// position.
 class Scanner {
 public:
     Scanner(InputFile const& file, std::size_t start)
@@ -52,13 +59,13 @@ public:
 
     [[noreturn]] void refuse(std::string const& why) const
     {
-        throw FileError(file_.path.string() + ", " + place() + ": " + why);
+        throw FileError(file_.path.string() + ", " + location() + ": " + why);
     }
 
-    /// Refuses a declared count of elements that the rest of the file cannot hold.
-    void believe(std::uint64_t count, char const* elements, std::uint64_t leastBytesEach) const
+    /// Refuses a declared number of elements that cannot fit in the rest of the file.
+    void requirePossible(std::uint64_t count, char const* elements, std::uint64_t leastBytesEach) const
     {
-        // The last line of a text may lack its end.
+        // The last line of a text may have no line end.
         if (leastBytesEach != 0 && count > (remaining() + 1) / leastBytesEach)
             refuse("the file is cut off: it declares " + std::to_string(count) + " " + elements + ", but only "
                 + std::to_string(remaining()) + " bytes follow");
@@ -69,15 +76,14 @@ public:
     bool atEnd() const { return at_ == end_; }
 
 protected:
-    virtual std::string place() const = 0;
+    virtual std::string location() const = 0;
 
     InputFile const& file_;
     char const* at_;
     char const* end_;
 };
 
-/// Reads numbers as they lie in memory, perhaps with their bytes the other way round. Its places are elements, counted
-/// from 0.
+/// Reads binary numbers, optionally with swapped bytes. Positions are reported as elements, counted from 0.
 class BinaryScanner final : public Scanner {
 public:
     BinaryScanner(InputFile const& file, std::size_t start, bool swapsBytes)
@@ -110,7 +116,7 @@ public:
     void skip(std::size_t bytes) { at_ += std::min(bytes, remaining()); }
 
 protected:
-    std::string place() const override { return std::string(kind_) + " " + std::to_string(index_); }
+    std::string location() const override { return std::string(kind_) + " " + std::to_string(index_); }
 
 private:
     bool swapsBytes_;
@@ -118,14 +124,14 @@ private:
     std::uint64_t index_ = 0;
 };
 
-/// Reads words and numbers from lines of text. Its places are lines, counted from 1.
+/// Reads words and numbers from lines of text. Positions are reported as lines, counted from 1.
 class TextScanner final : public Scanner {
 public:
     enum class Syntax {
         Plain,
         Comments, // from # to the end of the line
-        CommentsAndMarks, // and words end at commas and semicolons too
-        CommentsAndJoinedLines, // from # to the end of the line, and a line that ends with \ goes on in the next one
+        CommentsAndMarks, // in addition, words end at commas and semicolons
+        CommentsAndJoinedLines, // in addition, a line that ends with \ continues in the next one
     };
 
     TextScanner(InputFile const& file, std::size_t start, Syntax syntax)
@@ -138,7 +144,7 @@ public:
             skipByteOrderMark();
     }
 
-    /// What is left of the line, comments aside, is blank.
+    /// True if the rest of the line is blank or a comment.
     bool atLineEnd()
     {
         skipBlanks();
@@ -160,11 +166,11 @@ public:
     void expectLineEnd()
     {
         if (!atLineEnd())
-            refuse(quoted(peekWord()) + " is more than belongs into this line");
+            refuse(quoted(peekWord()) + " is unexpected at the end of the line");
         nextLine();
     }
 
-    /// An element is a line of its own; empty lines do not count.
+    /// Each element is one line; empty lines do not count.
     void beginElement(char const* kind, std::uint64_t index)
     {
         skipEmptyLines();
@@ -173,7 +179,7 @@ public:
     }
     void endElement() { expectLineEnd(); }
 
-    /// The next word of the line, without moving on; empty at the line's end.
+    /// The next word of the line, without advancing; empty at the end of the line.
     std::string_view peekWord()
     {
         if (atLineEnd())
@@ -201,7 +207,7 @@ public:
     {
         skipBlanks();
         T value{};
-        char const* const first = at_ + (hasPlusSign() ? 1 : 0); // which from_chars does not know
+        char const* const first = at_ + (hasPlusSign() ? 1 : 0); // from_chars does not accept it
         auto const [rest, error] = std::from_chars(first, end_, value);
         if (error != std::errc{} || !isTokenEnd(rest))
             return unusualNumber<T>(what);
@@ -223,7 +229,7 @@ public:
         return decimalCoordinate({first, static_cast<std::size_t>(rest - first)}, value);
     }
 
-    /// A whole number that other characters may follow.
+    /// A whole number, which may be followed by other characters.
     long long leadingInteger(char const* what)
     {
         skipBlanks();
@@ -239,22 +245,22 @@ public:
     {
         if (atLineEnd())
             refuse(std::string("the line ends before ") + what);
-        refuse(quoted(peekWord()) + " stands for " + what + ", but is no number that fits");
+        refuse(quoted(peekWord()) + " is not a valid number for " + what);
     }
 
-    /// The rest of the line, comments and blanks at both ends aside, without moving on.
+    /// The rest of the line without comments and without blanks at both ends; does not advance.
     std::string_view restOfLine();
-    /// The same, separated at commas, semicolons and tabs if there are any, and at blanks otherwise.
+    /// The same, split at commas, semicolons and tabs if there are any, otherwise at blanks.
     std::vector<std::string_view> fieldsOfLine();
 
-    /// What is between two values of a line.
+    /// The separator of two values in a line.
     enum class Separator {
         Blanks,
         TightComma, // with no blank beside it, as in 1,5
         Mark, // any other comma or semicolon
         None // the line has ended
     };
-    /// Moves on behind the separator.
+    /// Advances past the separator.
     Separator separator();
 
     bool atTokenEnd() const { return isTokenEnd(at_); }
@@ -262,7 +268,7 @@ public:
     static std::string quoted(std::string_view text);
 
 protected:
-    std::string place() const override
+    std::string location() const override
     {
         return "line " + std::to_string(1 + std::count(static_cast<char const*>(file_.bytes.get()), at_, '\n'));
     }
@@ -270,8 +276,8 @@ protected:
 private:
     static Coordinate decimalCoordinate(std::string_view digits, double value);
 
-    /// Editors and spreadsheets put a byte order mark in front of text. That of UTF-8 says nothing; that of UTF-16
-    /// says that the text has two bytes per character.
+    /// Editors and spreadsheets write a byte order mark at the start of text. The one of UTF-8 is skipped; the one of
+    /// UTF-16 means two bytes per character, which cannot be read.
     void skipByteOrderMark()
     {
         std::string_view const text(at_, remaining());
@@ -285,7 +291,7 @@ private:
 
     static bool isMark(char c) { return c == ',' || c == ';'; }
 
-    /// The end of the line that the \ at `backslash` joins with the next one; null where it is just a character.
+    /// The line end if the \ at `backslash` joins two lines; null if it is an ordinary character.
     char const* joinedLine(char const* backslash) const
     {
         char const* newline = backslash + 1;
@@ -314,7 +320,7 @@ private:
 
     bool hasPlusSign() const { return isAt('+') && at_ + 1 != end_ && at_[1] != '-'; }
 
-    /// Numbers too small for their type are 0, as everywhere else; all others that do not fit are refused.
+    /// Numbers too small for their type are rounded towards 0; all others that do not fit are refused.
     template <class T> T unusualNumber(char const* what)
     {
         if constexpr (std::is_floating_point_v<T>) {

@@ -26,8 +26,8 @@ namespace {
         return std::memchr(file.bytes.get(), 0, file.size) != nullptr;
     }
 
-    /// Text files too may be as long as a binary one, and binary ones too may begin with "solid"; but no text has a
-    /// count there that fits its own length, nor a byte 0.
+    /// A binary file may begin with "solid" too. But the bytes of a text at the position of the count never match the
+    /// length of the file, and a text has no zero byte.
     bool isBinary(InputFile const& file, bool mayBeLonger)
     {
         if (file.size < kBytesBeforeTriangles)
@@ -36,9 +36,12 @@ namespace {
         return file.size == declaredSize || (mayBeLonger && file.size > declaredSize && hasZeroByte(file));
     }
 
+    /// Whether the file is text at least up to the first facet. The header of a binary file may begin with "solid" too,
+    /// but the header and the count that follows it hold a zero byte.
     bool beginsAsText(InputFile const& file)
     {
-        return std::string_view(file.bytes.get(), file.size).starts_with("solid");
+        std::string_view const beginning(file.bytes.get(), std::min(file.size, kBytesBeforeTriangles));
+        return beginning.starts_with("solid") && beginning.find('\0') == std::string_view::npos;
     }
 
     [[noreturn]] void refuseDamagedBinary(InputFile const& file)
@@ -132,7 +135,7 @@ namespace {
         template <class In> void addCorner(In& in)
         {
             Coordinate const x = coordinateFrom(in), y = coordinateFrom(in), z = coordinateFrom(in);
-            // If positions are moved, those that differ only as doubles become different points.
+            // If positions are translated, those that differ only in double precision become different points.
             unsigned int const point = builder_.movesPositions()
                 ? widePoints_.numberOf({x.value, y.value, z.value})
                 : points_.numberOf(
@@ -145,21 +148,21 @@ namespace {
         static Coordinate coordinateFrom(TextScanner& in) { return in.coordinate(); }
         static Coordinate coordinateFrom(BinaryScanner& in) { return {in.number<float>("a coordinate")}; }
 
-        /// The next word in this line or a later one, in any case.
+        /// Whether the next word, in this line or a later one, is `word` in upper or lower case.
         static bool isNext(TextScanner& in, std::string_view word)
         {
             in.skipEmptyLines();
             if (in.atEnd())
-                in.refuse("the file is cut off inside of a solid");
+                in.refuse("the file is cut off inside a solid");
             std::string_view const next = in.peekWord();
-            return std::equal(next.begin(), next.end(), word.begin(), word.end(),
-                [](char a, char b) { return (a >= 'A' && a <= 'Z' ? a - 'A' + 'a' : a) == b; });
+            return std::equal(
+                next.begin(), next.end(), word.begin(), word.end(), [](char a, char b) { return lowerCase(a) == b; });
         }
 
         static void expectWord(TextScanner& in, std::string_view word)
         {
             if (!isNext(in, word))
-                in.refuse(TextScanner::quoted(in.peekWord()) + " stands where \"" + std::string(word) + "\" belongs");
+                in.refuse(TextScanner::quoted(in.peekWord()) + " instead of \"" + std::string(word) + "\"");
             in.word();
         }
 

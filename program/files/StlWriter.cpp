@@ -10,7 +10,7 @@ using Tessara::Math::float3;
 
 namespace {
 
-    static_assert(std::endian::native == std::endian::little, "numbers are written as they lie in memory");
+    static_assert(std::endian::native == std::endian::little, "numbers are written with the byte order of memory");
 
     void checkTriangles(WritableGeometry const& geometry, std::filesystem::path const& file)
     {
@@ -18,16 +18,16 @@ namespace {
             throw FileError(file.string() + " cannot be written: STL files hold triangles only, " + why);
         };
         if (geometry.kind != WritableGeometry::Kind::Mesh)
-            refuse("and this is no mesh");
+            refuse("and this is not a mesh");
         Orvan::Array<unsigned int> const& offset = *geometry.offsets;
         for (std::uint64_t face = 0; face + 1 < offset.size; ++face) {
             if (offset[face + 1] - offset[face] != 3)
                 refuse("but face " + std::to_string(face) + " has " + std::to_string(offset[face + 1] - offset[face])
-                    + " corners; OBJ, PLY and VTP files hold it");
+                    + " corners; OBJ, PLY and VTP files can hold it");
         }
     }
 
-    /// Of length 1, or zero where the corners lie on a line.
+    /// A unit vector, or zero if the corners are collinear.
     float3 normalOf(float3 const& a, float3 const& b, float3 const& c)
     {
         double const u[3] = {double(b.x) - a.x, double(b.y) - a.y, double(b.z) - a.z};
@@ -47,7 +47,8 @@ namespace {
             isUsed[point] = true;
         auto const unused = std::count(isUsed.begin(), isUsed.end(), false);
         if (unused != 0)
-            geometry.leftOut.push_back(std::to_string(unused) + " points of no face are left out: STL files hold none");
+            geometry.leftOut.push_back(
+                std::to_string(unused) + " points of no face are left out: STL files cannot hold them");
     }
 
 }
@@ -61,12 +62,12 @@ void writeStl(WritableGeometry& geometry, std::filesystem::path const& file)
         if (shorts && attribute.name == "attribute" && attribute.component == sFaceComp)
             attributes = *shorts;
         else
-            leaveOut(attribute, "STL files have no place for it", geometry.leftOut);
+            leaveOut(attribute, "STL files cannot hold it", geometry.leftOut);
     }
     noteUnusedPoints(geometry);
 
     OutputFile out(file, geometry.existing);
-    // The header must not begin with "solid", which is how text does.
+    // The header must not begin with "solid", like a text file.
     std::string header = "binary STL" + (geometry.remark.empty() ? "" : ", " + geometry.remark);
     header.resize(80);
     out.write(header.data(), header.size());

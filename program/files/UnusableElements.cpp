@@ -15,7 +15,7 @@ using Indices = Orvan::Array<unsigned int>;
 
 namespace {
 
-    bool remainsAny(Flags const& deleted)
+    bool anyRemains(Flags const& deleted)
     {
         return std::find(deleted.begin(), deleted.end(), false) != deleted.end();
     }
@@ -28,7 +28,7 @@ namespace {
         static_cast<void>(Tessara::GeometryAlgorithms::deleteComponents(remap, component, object));
     }
 
-    /// The offsets of the runs that remain. `begin` and `end` of each remaining run are handed to `visit`.
+    /// The offsets of the remaining runs. Calls `visit(begin, end)` for each of them.
     template <class Visit> Indices remainingOffsets(Indices const& offsets, Flags const& deleted, Visit const& visit)
     {
         Indices result{0u};
@@ -76,7 +76,7 @@ void UnusableElements::deleteFrom(RawGeometry const& geometry, Tessara::Object& 
         Indices offsets = remainingOffsets(geometry.strandOffset, strands, [](unsigned int, unsigned int) {});
         deleteElements(strands, sStrandComp, object);
         addDataProperty(sStrandOffset, sStrandComp, std::move(offsets), object);
-    } else if (remainsAnyFace()) {
+    } else if (anyFaceRemains()) {
         Indices const pointRemap = Tessara::GeometryAlgorithms::computeDeletedComponentMapping(points);
         Flags corners(geometry.faceVertex.size, true);
         Indices faceVertex;
@@ -107,14 +107,14 @@ std::vector<std::string> UnusableElements::describe() const
     return sentences;
 }
 
-bool UnusableElements::remainsAnyPoint() const
+bool UnusableElements::anyPointRemains() const
 {
-    return remainsAny(points);
+    return anyRemains(points);
 }
 
-bool UnusableElements::remainsAnyFace() const
+bool UnusableElements::anyFaceRemains() const
 {
-    return remainsAny(faces);
+    return anyRemains(faces);
 }
 
 }

@@ -1,21 +1,16 @@
 #pragma once
 
+#include "Vectors.h"
+
 #include <OrvanCore/Array.h>
-#include <TessaraMathSupport/Types.h>
 #include <TessaraObject/Object.h>
 
-#include <cmath>
 #include <string>
 #include <vector>
 
 namespace ModelingProgram {
 
-inline bool isFinite(Tessara::Math::float3 const& p)
-{
-    return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
-}
-
-/// The arrays of geometry as a file holds them. A mesh has faces, a strand set strands, a point cloud neither.
+/// The arrays of geometry as read from a file. A mesh has faces, a strand set has strands, a point cloud has neither.
 struct RawGeometry {
     Orvan::Array<Tessara::Math::float3> positions;
     Orvan::Array<unsigned int> faceVertex;
@@ -23,22 +18,22 @@ struct RawGeometry {
     Orvan::Array<unsigned int> strandOffset; // empty unless there are strands
 };
 
-/// What no operation can work on and a lenient reader leaves out: points that are NaN or infinite, faces and strands at
-/// them, and faces with fewer than three corners. Points of such a strand are its own, and are left out with it.
+/// Elements that no operation can handle and that a lenient reader leaves out: points that are NaN or infinite, faces
+/// and strands at them, and faces with fewer than three corners. The points of such a strand are left out with it.
 struct UnusableElements {
     explicit UnusableElements(RawGeometry const& geometry);
 
-    /// Deletes them from an object that holds this geometry as a mesh if faces remain, as a strand set if there are
-    /// strands, and as a point cloud otherwise, with their values in all properties.
+    /// Deletes them, with their values in all properties, from an object with this geometry: a mesh if faces remain, a
+    /// strand set if there are strands, otherwise a point cloud.
     void deleteFrom(RawGeometry const& geometry, Tessara::Object& object) const;
 
-    /// A sentence for each kind of elements left out.
+    /// One sentence per kind of elements left out.
     std::vector<std::string> describe() const;
 
-    bool remainsAnyPoint() const;
-    bool remainsAnyFace() const;
+    bool anyPointRemains() const;
+    bool anyFaceRemains() const;
 
-    Orvan::Array<bool> points; // an entry per element; true means that it is left out
+    Orvan::Array<bool> points; // one entry per element; true if it is left out
     Orvan::Array<bool> faces;
     Orvan::Array<bool> strands;
     std::uint64_t notFinitePoints = 0;

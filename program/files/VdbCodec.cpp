@@ -21,7 +21,7 @@ namespace {
         throw FileError(file.string() + " cannot be read: " + why);
     }
 
-    constexpr double kSameSize = 1e-9; // what rounding may make of equal sizes of voxels, as a fraction
+    constexpr double kSameSize = 1e-9; // relative tolerance for rounding of equal voxel sizes
 
     void initializeOpenVdb()
     {
@@ -36,7 +36,7 @@ namespace {
         static_cast<void>(isDone);
     }
 
-    /// Bytes in memory, as a stream takes them.
+    /// A stream buffer over bytes in memory.
     class ByteSource final : public std::streambuf {
     public:
         explicit ByteSource(InputFile const& file)
@@ -103,7 +103,7 @@ namespace {
         }
     };
 
-    /// Refuses what is more than cubes along the axes.
+    /// Refuses transforms whose voxels are not cubes along the axes.
     void takeTransform(
         openvdb::math::Transform const& transform, std::filesystem::path const& file, SparseVolume& volume)
     {
@@ -122,7 +122,7 @@ namespace {
             refuse(file,
                 grid + " is mirrored, or its voxels have no size. Resample it to voxels of a positive size first");
         if (std::abs(m(1, 1) - size) > kSameSize * size || std::abs(m(2, 2) - size) > kSameSize * size)
-            refuse(file, grid + " has voxels that are no cubes. Resample it to cubic voxels first");
+            refuse(file, grid + " has voxels that are not cubes. Resample it to cubic voxels first");
         volume.voxelSize = size;
         volume.translation = {m(3, 0), m(3, 1), m(3, 2)};
     }
@@ -131,7 +131,7 @@ namespace {
     {
         refuse(file,
             "voxel (" + std::to_string(at[0]) + ", " + std::to_string(at[1]) + ", " + std::to_string(at[2])
-                + ") of grid \"" + grid + "\" holds no finite number");
+                + ") of grid \"" + grid + "\" has a value that is not finite");
     }
 
     void takeLeaf(openvdb::FloatTree::LeafNodeType const& leaf, std::filesystem::path const& file, SparseVolume& volume)
@@ -195,7 +195,7 @@ namespace {
         return grid;
     }
 
-    /// Puts a number that follows from the content in the place of the random one that the file is known by.
+    /// Replaces the random UUID of the file by a hash of its content, so that equal volumes give equal files.
     void identifyByContent(std::string& file)
     {
         constexpr std::size_t kIdentityAt = 21, kIdentityBytes = 36;

@@ -5,16 +5,16 @@
 
 namespace ModelingProgram {
 
-// What OpenVDB itself does, in a library of its own: it takes ten times as long to load as the rest of the program, so
-// that is done by those who need it.
+// Functions that need OpenVDB, in a separate library: it takes ten times as long to load as the rest of the program, so
+// it is loaded only if needed.
 
 constexpr char const* kVdbCodec = "libModelingVdb.so";
 
-/// \pre  `checkVdbFloatGrid` has found nothing
+/// \pre  `checkVdbFloatGrid` has accepted the grid
 extern "C" void modelingReadVdb(
     InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all, SparseVolume& volume);
 
-/// The bytes of a file.
+/// Writes the volume to the bytes of a file.
 extern "C" void modelingWriteVdb(SparseVolume const& volume, std::string& bytes);
 
 }

@@ -10,7 +10,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    /// Stays until the program ends.
+    /// Remains loaded until the program ends.
     struct Codec {
         Codec()
             : library(::dlopen(kVdbCodec, RTLD_NOW | RTLD_LOCAL))

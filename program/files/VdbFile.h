@@ -12,20 +12,20 @@
 
 namespace ModelingProgram {
 
-/// A float grid of an OpenVDB file: values at the corners of a lattice of cubes, where they are active, and a background
-/// everywhere else. Voxel (i, j, k) is at `(i, j, k) * voxelSize + translation`.
+/// A float grid of an OpenVDB file: values at the active points of a cubic lattice, and a background everywhere else.
+/// Voxel (i, j, k) is at `(i, j, k) * voxelSize + translation`.
 struct SparseVolume {
     std::string name;
     double voxelSize = 1;
     std::array<double, 3> translation{};
     float background = 0;
     std::vector<TSR::TileTree3D::Voxel> voxels;
-    // What is read comes in cubes, which take a quarter of the memory.
+    // Volumes that are read use cubes, which need a quarter of the memory.
     std::vector<TSR::TileTree3D::VoxelCube> cubes;
     std::vector<float> cubeValues;
-    std::vector<TSR::TileTree3D::ConstantBox> boxes; // these do not overlap, nor do they hold one of the voxels
+    std::vector<TSR::TileTree3D::ConstantBox> boxes; // do not overlap each other or contain other voxels
 
-    /// Voxels and those in the boxes.
+    /// The number of voxels, including those in boxes.
     std::uint64_t activeCount() const;
 
     /// Calls `visit(i, j, k, value)` for all voxels outside the boxes.
@@ -45,32 +45,32 @@ struct SparseVolume {
 };
 
 struct VdbGrid {
-    std::string name; // "density", or "density[1]" where an earlier grid has that name
+    std::string name; // "density", or "density[1]" if an earlier grid has that name
     std::string type; // "float", "vec3s", ...
 };
 
-/// What a grid takes once it is read.
+/// The size of a grid in memory.
 struct VdbGridSize {
-    std::uint64_t activeVoxels = 0; // without those of constant regions, which are boxes
-    std::uint64_t treeBytes = 0; // of the tree that OpenVDB reads it into, before it becomes a list of voxels
+    std::uint64_t activeVoxels = 0; // without constant regions, which become boxes
+    std::uint64_t treeBytes = 0; // of the tree that OpenVDB reads, before it is converted
 };
 
 /// The grids of an OpenVDB file, in its order.
-/// \throws FileError  for what is no such file
+/// \throws FileError  if it is not such a file
 std::vector<VdbGrid> listVdbGrids(std::filesystem::path const& file);
 
 /// Reads a grid of the type "float", which may be stored in half precision.
-/// \param grid        which of the list
-/// \throws FileError  for a grid that is cut off or broken, has a value that is not finite, or voxels that are no cubes
+/// \param grid        index in the result of `listVdbGrids`
+/// \throws FileError  if the grid is cut off or broken, has a value that is not finite, or voxels that are not cubes
 ///                    along the axes
-/// \throws std::bad_alloc, and what `onSize` throws, which is called before any value is read
+/// \throws std::bad_alloc, and what `onSize` throws, which is called before values are read
 SparseVolume readVdbGrid(
     std::filesystem::path const& file, std::size_t grid,
     std::function<void(VdbGridSize const&)> const& onSize = [](VdbGridSize const&) {});
 
-/// Writes a volume as an OpenVDB file with one grid; the same bytes for the same volume. The file appears under its name
-/// only when it is complete.
-/// \throws FileError  where the file cannot be written; a file of that name is then as it was
+/// Writes a volume as an OpenVDB file with one grid; the same bytes for the same volume. The file appears under its
+/// name only when it is complete.
+/// \throws FileError  if the file cannot be written; an existing file is then unchanged
 void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file, Existing existing = Existing::Replace);
 
 }

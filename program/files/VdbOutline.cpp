@@ -13,7 +13,7 @@ namespace {
     constexpr std::size_t kUuidBytes = 36;
     constexpr std::string_view kLayout = "_5_4_3"; // of trees: nodes of 32³ and 16³ children, leaves of 8³ voxels
 
-    // Flags of how values are stored.
+    // Flags for the storage of values.
     constexpr std::uint32_t kZipped = 1, kActiveOnly = 2, kBlosc = 4;
 
     class VdbScanner final : public Scanner {
@@ -48,7 +48,7 @@ namespace {
         }
 
     protected:
-        std::string place() const override { return "byte " + std::to_string(position()); }
+        std::string location() const override { return "byte " + std::to_string(position()); }
 
     private:
         void require(std::uint64_t count, char const* what) const
@@ -66,12 +66,12 @@ namespace {
     {
         Metadata metadata;
         auto const count = in.number<std::uint32_t>("the count of metadata");
-        in.believe(count, "metadata", 3 * sizeof(std::uint32_t));
+        in.requirePossible(count, "metadata", 3 * sizeof(std::uint32_t));
         for (std::uint32_t i = 0; i != count; ++i) {
             std::string_view const name = in.text("the name of a piece of metadata");
             std::string_view const type = in.text("the type of a piece of metadata");
             std::string_view const value = in.text("a piece of metadata");
-            // The others are taken as bytes and texts.
+            // OpenVDB reads the others as bytes and texts here.
             if (type != "bool")
                 continue;
             if (value.size() != 1 || static_cast<unsigned char>(value[0]) > 1)
@@ -108,16 +108,16 @@ namespace {
         entry.name = readableName(entry.uniqueName);
         entry.type = readableType(in.text("the type of a grid"));
         entry.treeOwner = in.text("the name of the grid whose values a grid shares");
-        entry.grid = in.number<std::uint64_t>("the place of a grid");
-        in.number<std::uint64_t>("the place of a grid's values");
+        entry.grid = in.number<std::uint64_t>("the position of a grid");
+        in.number<std::uint64_t>("the position of the values of a grid");
         auto const end = in.number<std::uint64_t>("the end of a grid");
         if (entry.grid != in.position() || end < entry.grid)
-            in.refuse("the places that are stated for a grid cannot be right");
+            in.refuse("the positions stated for a grid are inconsistent");
         in.bytes(end - entry.grid, "the grid");
         return entry;
     }
 
-    /// A way through the data of a float grid.
+    /// Parses the data of a float grid.
     class FloatGridWalk {
     public:
         FloatGridWalk(InputFile const& file, VdbGridEntry const& entry)
@@ -129,7 +129,7 @@ namespace {
         {
             compression_ = in_.number<std::uint32_t>("how values are compressed");
             if (compression_ > (kZipped | kActiveOnly | kBlosc))
-                in_.refuse("the values are stored in an unknown way");
+                in_.refuse("the values are compressed in an unknown way");
             isHalf_ = skipMetadata(in_).isHalf;
             skipTransform();
             if (!ownsTree)
@@ -147,7 +147,7 @@ namespace {
     private:
         static constexpr std::uint32_t kLeafVoxels = 8 * 8 * 8;
         static constexpr std::uint32_t kUpperChildren = 32 * 32 * 32, kLowerChildren = 16 * 16 * 16;
-        // What OpenVDB allocates: a leaf with its values, and a node with 8 bytes per child and three masks.
+        // Sizes in the memory of OpenVDB: a leaf with its values, and a node with 8 bytes per child and three masks.
         static constexpr std::uint32_t kLeafBytes = kLeafVoxels * sizeof(float) + 160, kBytesPerChild = 9;
 
         void skipTransform()
@@ -160,20 +160,20 @@ namespace {
             std::string_view const type = in_.text("the type of a transform");
             auto const known = bytesOfType.find(type);
             if (type == "NonlinearFrustumMap")
-                in_.refuse("the grid lies in a frustum. Resample it to cubic voxels first");
+                in_.refuse("the grid has a frustum transform. Resample it to cubic voxels first");
             if (known == bytesOfType.end())
-                in_.refuse("there is no such transform as " + std::string(type.substr(0, 40)));
+                in_.refuse("unknown transform " + std::string(type.substr(0, 40)));
             in_.bytes(known->second, "a transform");
         }
 
         void skipRoot()
         {
             if (in_.number<std::int32_t>("the count of buffers") != 1)
-                in_.refuse("a tree with several buffers");
+                in_.refuse("the tree has several buffers");
             in_.number<float>("the background");
             auto const tiles = in_.number<std::uint32_t>("the count of tiles");
             auto const children = in_.number<std::uint32_t>("the count of nodes");
-            in_.believe(tiles, "tiles", 17);
+            in_.requirePossible(tiles, "tiles", 17);
             for (std::uint32_t tile = 0; tile != tiles; ++tile) {
                 in_.bytes(3 * sizeof(std::int32_t) + sizeof(float), "a tile");
                 in_.flag("whether a tile is active");
@@ -185,7 +185,7 @@ namespace {
                 constexpr std::int32_t kWidth = 32 * 16 * 8;
                 if (x % kWidth != 0 || y % kWidth != 0 || z % kWidth != 0
                     || (child != 0 && previous >= std::tuple(x, y, z)))
-                    in_.refuse("a node lies where none can lie");
+                    in_.refuse("a node has an invalid position");
                 previous = {x, y, z};
                 skipUpperNode();
             }
@@ -201,7 +201,7 @@ namespace {
             }
         }
 
-        /// \return the count of its children
+        /// \return the number of its children
         std::uint32_t skipNode(std::uint32_t places)
         {
             size_.treeBytes += std::uint64_t{places} * kBytesPerChild;
@@ -210,7 +210,7 @@ namespace {
             return children;
         }
 
-        /// \return how many bits are set
+        /// \return the number of bits set
         std::uint32_t skipMask(std::uint32_t bits, char const* what)
         {
             std::uint32_t count = 0;
@@ -221,7 +221,8 @@ namespace {
 
         void skipValues(std::uint32_t active, std::uint32_t all, char const* what)
         {
-            // What inactive places hold: the background or another value or two, chosen by a mask; or all are stored.
+            // The values of inactive voxels: the background, or one or two other values selected by a mask; or all are
+            // stored.
             enum : unsigned char { OneOther = 2, Mask = 3, MaskAndOne = 4, MaskAndTwo = 5, AllStored = 6 };
             auto const inactive = in_.number<unsigned char>(what);
             if (inactive > AllStored)
@@ -243,7 +244,7 @@ namespace {
                 return;
             }
             auto const stored = in_.number<std::int64_t>(what);
-            if (stored <= 0) { // as they are
+            if (stored <= 0) { // uncompressed
                 if (stored != -static_cast<std::int64_t>(bytes))
                     in_.refuse(std::string(what) + " have another size than they state");
                 in_.bytes(bytes, what);
@@ -254,7 +255,7 @@ namespace {
                 in_.refuse(std::string(what) + " have another size than they state");
         }
 
-        /// Of what a chunk of Blosc states in its header.
+        /// Whether the sizes in the header of a Blosc chunk are consistent.
         static bool agrees(std::string_view chunk, std::uint64_t bytes)
         {
             constexpr std::size_t kUnpackedAt = 4, kPackedAt = 12, kHeader = 16;
@@ -279,19 +280,19 @@ std::vector<VdbGridEntry> readVdbOutline(InputFile const& file)
 {
     VdbScanner in(file, 0);
     if (file.size < sizeof(kMagic) || in.number<std::uint64_t>("") != kMagic)
-        throw FileError(file.path.string() + " cannot be read: it is no OpenVDB file");
+        throw FileError(file.path.string() + " cannot be read: it is not an OpenVDB file");
     auto const format = in.number<std::uint32_t>("the header");
     if (format < kOldestFormat || format > kNewestFormat)
         throw FileError(file.path.string() + " cannot be read: its format is " + std::to_string(format)
-            + ", and 222 to 224 can be read, which OpenVDB writes since 2013");
+            + ", but only 222 to 224 can be read, which OpenVDB has written since 2013");
     in.bytes(2 * sizeof(std::uint32_t), "the header"); // version of the library
     bool const hasPlaces = in.flag("whether grids can be found");
     in.bytes(kUuidBytes, "the header");
     skipMetadata(in);
     if (!hasPlaces)
-        in.refuse("the file was written as a stream, so that it does not tell where its grids are. Write it as a file");
+        in.refuse("the file was written as a stream, without the positions of its grids. Write it as a file");
     auto const count = in.number<std::uint32_t>("the count of grids");
-    in.believe(count, "grids", 3 * sizeof(std::uint32_t) + 3 * sizeof(std::uint64_t));
+    in.requirePossible(count, "grids", 3 * sizeof(std::uint32_t) + 3 * sizeof(std::uint64_t));
     std::vector<VdbGridEntry> entries;
     for (std::uint32_t grid = 0; grid != count; ++grid)
         entries.push_back(readEntry(in));
@@ -307,7 +308,7 @@ VdbGridSize checkVdbFloatGrid(InputFile const& file, VdbGridEntry const& entry, 
         all.begin(), all.end(), [&](VdbGridEntry const& other) { return other.uniqueName == entry.treeOwner; });
     if (owner == all.end() || owner->type != entry.type || !owner->treeOwner.empty())
         throw FileError(file.path.string() + " cannot be read: grid \"" + entry.name
-            + "\" shares the values of a grid that is not there");
+            + "\" shares the values of a grid that does not exist");
     return FloatGridWalk(file, *owner).walk(true);
 }
 

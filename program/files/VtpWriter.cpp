@@ -11,7 +11,7 @@ using namespace Tessara::Geometry;
 
 namespace {
 
-    static_assert(std::endian::native == std::endian::little, "numbers are written as they lie in memory");
+    static_assert(std::endian::native == std::endian::little, "numbers are written with the byte order of memory");
 
     template <class T> std::string vtkType()
     {
@@ -34,7 +34,7 @@ namespace {
         return result;
     }
 
-    /// The file is XML that says where each array begins in the raw data behind it. So the arrays are declared first,
+    /// The file is XML with the offset of each array in the raw data that follows. So the arrays are declared first,
     /// then written in the same order.
     class VtpWriter {
     public:
@@ -81,7 +81,8 @@ namespace {
             declareAttributes("CellData", kind == WritableGeometry::Kind::Mesh ? sFaceComp : sStrandComp);
             for (Attribute const& attribute : geometry_.attributes) {
                 if (attribute.component == sFaceVertexComp)
-                    leaveOut(attribute, "VTP files hold values of points and faces only", geometry_.leftOut);
+                    leaveOut(
+                        attribute, "VTP files can hold only values of points, faces and strands", geometry_.leftOut);
             }
             xml_ << "      <Points>\n";
             declareArray("Float32", "Points", 3, *geometry_.positions);
@@ -107,7 +108,7 @@ namespace {
             xml_ << "      </" << section << ">\n";
         }
 
-        /// Strands are lines, points of a cloud are cells of their own, for only cells are seen.
+        /// Strands are lines. Each point of a cloud is a cell, because viewers show only cells.
         void declareCells()
         {
             struct Section {
@@ -130,8 +131,8 @@ namespace {
             }
         }
 
-        /// The file's offsets have no entry in front of the first cell, which therefore begins at the first point or
-        /// corner listed. Points in front of the first strand are not listed.
+        /// The offsets in the file have no entry before the first cell, which therefore begins at the first point or
+        /// corner listed. Points before the first strand are not listed.
         void declareCellsOf(Orvan::Array<unsigned int> const& offsets)
         {
             std::uint64_t const first = offsets[0], last = offsets[offsets.size - 1];
@@ -157,7 +158,7 @@ namespace {
                 type, name, components, bytes, [&array, bytes](OutputFile& out) { out.write(array.data, bytes); });
         }
 
-        /// As Int64, the one index type that all versions of the file's readers take.
+        /// As Int64, the only index type that all versions of VTK read.
         template <class Number> void declareNumbers(std::string const& name, std::uint64_t count, Number const& number)
         {
             declareBlock("Int64", name, 1, count * sizeof(std::int64_t), [=](OutputFile& out) {

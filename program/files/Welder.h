@@ -9,7 +9,7 @@
 
 namespace ModelingProgram {
 
-/// Numbers vectors in the order in which they first come: equal ones have one number. 0 and -0 are equal.
+/// Numbers distinct vectors in order of first appearance. 0 and -0 are equal.
 template <class T> class Welder {
 public:
     unsigned int numberOf(T const& value)
@@ -55,7 +55,8 @@ private:
     }
 
     Orvan::Array<T> values_;
-    Orvan::Array<unsigned int> slots_; // open addressing: a number plus one, or 0; a power of two, at most half full
+    Orvan::Array<unsigned int>
+        slots_; // open addressing: a number plus one, or 0; the size is a power of two, at most half full
 };
 
 }

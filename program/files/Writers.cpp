@@ -42,8 +42,7 @@ namespace {
         Orvan::Array<float3> const& positions = *geometry.positions;
         float3 const* const bad = std::find_if_not(positions.begin(), positions.end(), isFinite);
         if (bad != positions.end())
-            refuse(
-                file, "point " + std::to_string(bad - positions.begin()) + " lies nowhere: a coordinate is not finite");
+            refuse(file, "point " + std::to_string(bad - positions.begin()) + " has a coordinate that is not finite");
         if (geometry.kind != WritableGeometry::Kind::Mesh)
             return;
         Orvan::Array<unsigned int> const& offset = *geometry.offsets;
@@ -53,7 +52,7 @@ namespace {
         }
     }
 
-    /// The name without the prefix that it got because the name itself was taken.
+    /// The name without the prefix that was added because the name was taken.
     std::string nameInFile(Tessara::Object const& object, Orvan::String const& name, Orvan::String const& component)
     {
         std::string_view const prefix = namePrefix(component);
@@ -105,7 +104,7 @@ WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path 
     WritableGeometry geometry;
     geometry.kind = kindOf(object);
     if (GeoValidator::Status const status = validate(object, geometry.kind); !status)
-        refuse(file, "the geometry is not valid: " + std::string(status.message().view()));
+        refuse(file, "the geometry is invalid: " + std::string(status.message().view()));
     geometry.positions = dataOf<float3>(object, sPointPosition);
     geometry.faceVertex = dataOf<unsigned int>(object, sFaceVertex);
     if (geometry.kind != WritableGeometry::Kind::PointCloud)

@@ -7,15 +7,15 @@
 
 namespace ModelingProgram {
 
-/// A property with a value for each element of a component, as files may keep it.
+/// A property with one value per element of a component, which files may store.
 struct Attribute {
-    std::string name; // as files call it: without the prefix that told it apart in the object
+    std::string name; // in the file: without the prefix that distinguishes it in the object
     Orvan::String component;
     Tessara::PropertyValue values; // a Ptr to an Array of one of the forty types, of the right length
-    std::string columnNames; // that it came with, if any
+    std::string columnNames; // from the input file, if any
 };
 
-/// A valid object, taken apart for the writers. A mesh has faces, a strand set strands, a point cloud neither.
+/// The arrays of a valid object. A mesh has faces, a strand set has strands, a point cloud has neither.
 struct WritableGeometry {
     enum class Kind { Mesh, Strands, PointCloud } kind;
     Orvan::Ptr<Orvan::Array<Tessara::Math::float3>> positions;
@@ -23,7 +23,7 @@ struct WritableGeometry {
     Orvan::Ptr<Orvan::Array<unsigned int>> offsets; // of faces or strands
     std::vector<Attribute> attributes;
     std::string remark; // becomes a comment
-    std::vector<std::string> leftOut; // what the file does not hold, a sentence each
+    std::vector<std::string> leftOut; // what the file does not contain, one sentence each
     Existing existing = Existing::Replace;
 
     std::uint64_t pointCount() const { return positions->size; }
@@ -31,7 +31,7 @@ struct WritableGeometry {
     std::uint64_t cellCount() const { return offsets ? offsets->size - 1 : 0; }
 };
 
-/// Whether values are of the type `T`, which then are visited.
+/// Visits the values if they have the type `T`. \return whether they do
 template <class T, class Visit> bool visitAs(Tessara::PropertyValue const& values, Visit&& visit)
 {
     auto const* const array = values.get<Orvan::Ptr<Orvan::Array<T>>>();
@@ -40,14 +40,14 @@ template <class T, class Visit> bool visitAs(Tessara::PropertyValue const& value
     return array != nullptr;
 }
 
-/// Says that an attribute is left out, and why.
+/// Adds a sentence on why an attribute is left out.
 void leaveOut(Attribute const& attribute, std::string const& why, std::vector<std::string>& sentences);
 
-/// What all formats ask for: a valid object, finite positions, three corners a face and more.
+/// Checks what all formats require: a valid object, finite positions, at least three corners per face.
 /// \throws FileError, which names the file
 WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file);
 
-// One writer a format. They add to `leftOut`, and throw `FileError` for a kind of geometry that the format cannot hold.
+// One writer per format. They add to `leftOut`, and throw `FileError` if the format cannot hold the type of geometry.
 
 void writeObj(WritableGeometry& geometry, std::filesystem::path const& file);
 void writePly(WritableGeometry& geometry, std::filesystem::path const& file);

@@ -28,14 +28,6 @@ namespace {
         return std::find(words.begin(), words.end(), word) != words.end();
     }
 
-    std::string lowerCase(std::string_view text)
-    {
-        std::string result(text);
-        for (char& c : result)
-            c = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-        return result;
-    }
-
     class XyzReader {
     public:
         XyzReader(InputFile const& file, ReadOptions const& options)
@@ -54,12 +46,14 @@ namespace {
                     + " points and holds " + std::to_string(rowCount_));
             if (headings_.empty() && rowCount_ != 0)
                 columns_ = guessColumns();
+            if (headings_.empty() && columns_.normal != kNone && !traits_[columns_.normal].areUnit)
+                noteDoubtfulNormals();
             addProperties();
             return std::move(builder_).finish("XYZ");
         }
 
     private:
-        /// A heading line and a line with nothing but the number of points, in either order, if they are there.
+        /// Reads an optional heading line and an optional line with only the number of points, in either order.
         void readHead()
         {
             for (int line = 0; line < 2; ++line) {
@@ -82,7 +76,7 @@ namespace {
             return field.find_first_not_of("0123456789") == std::string_view::npos;
         }
 
-        /// No field of a heading is a number, so that a damaged first line is not taken for one.
+        /// A heading has no field that is a number, so a damaged first line is not mistaken for one.
         static bool isHeading(std::vector<std::string_view> const& fields)
         {
             return std::none_of(fields.begin(), fields.end(), [](std::string_view field) {
@@ -113,7 +107,7 @@ namespace {
                     axes[name[0] - 'x'] = column;
             }
             if (std::find(std::begin(axes), std::end(axes), kNone) != std::end(axes)) {
-                builder_.note("the heading line is left out: it does not name columns x, y and z");
+                builder_.note("the heading line is ignored: it does not name columns x, y and z");
                 headings_.clear();
                 return;
             }
@@ -123,7 +117,7 @@ namespace {
             columns_ = std::move(named);
         }
 
-        /// Returns how many columns behind this one belong to it.
+        /// \return how many of the following columns belong to this one
         std::size_t nameColumn(std::size_t const (&axes)[3], std::size_t column, Columns& named) const
         {
             auto const isTriple = [&](std::initializer_list<std::string_view> first,
@@ -180,7 +174,7 @@ namespace {
                 hasOther = hasOther || separator == Separator::Mark || separator == Separator::Blanks;
             }
             if (hasTightComma && hasOther)
-                in_.refuse("there are commas beside other separators: decimal commas are not read");
+                in_.refuse("there are commas as well as other separators: decimal commas are not supported");
         }
 
         void checkColumnCount()
@@ -198,17 +192,17 @@ namespace {
                 traits_.resize(count);
             }
             if (count != columnCount_)
-                in_.refuse("there are " + std::to_string(count) + " values, and " + std::to_string(columnCount_)
+                in_.refuse("there are " + std::to_string(count) + " values, but " + std::to_string(columnCount_)
                     + " in the lines above");
         }
 
-        /// What all values of a column have in common, in rows with a finite position.
+        /// What all values of a column have in common, over the rows with a finite position.
         struct Traits {
             bool areBytes = true;
             bool fitFloat = true;
             // Of the vectors that begin in this column:
             bool areUnit = true;
-            bool areAxes = true; // 0 0 1 and the like, which could be colors too
+            bool areAxes = true; // 0 0 1 and the like, which could also be colors
 
             void add(Coordinate const& value)
             {
@@ -255,6 +249,16 @@ namespace {
             return columns;
         }
 
+        /// Colors of another range than bytes look like normals that are not unit vectors.
+        void noteDoubtfulNormals()
+        {
+            builder_.note("columns " + std::to_string(columns_.normal + 1) + " to "
+                + std::to_string(columns_.normal + 3)
+                + " are read as normals, although some do not have length 1; if they are colors, a heading line (x y z "
+                  "r "
+                  "g b) has to say so");
+        }
+
         void addProperties()
         {
             if (std::size_t const column = columns_.color; column != kNone) {
@@ -278,7 +282,7 @@ namespace {
             auto const target = builder_.addProperty<Scalar>(name, sPointComp, count, rowCount_);
             for (std::uint64_t row = 0; row < rowCount_; ++row) {
                 for (std::size_t i = 0; i < count; ++i) {
-                    // The rows that no trait is known of, which are left out later, may hold anything.
+                    // Rows without a finite position, which are left out later, are not covered by the traits.
                     double const value = values_[row * columnCount_ + first + i];
                     bool const fits = !std::is_integral_v<Scalar> || (value >= 0 && value <= 255);
                     auto const scalar = fits ? static_cast<Scalar>(value) : Scalar{};
@@ -296,7 +300,7 @@ namespace {
         std::uint64_t rowCount_ = 0;
         std::size_t columnCount_ = 0;
         Orvan::Array<double> values_; // of all rows, if there is more than a position
-        std::vector<Traits> traits_; // an entry per column
+        std::vector<Traits> traits_; // one entry per column
     };
 
 }

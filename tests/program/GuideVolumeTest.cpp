@@ -1,7 +1,7 @@
-#include "GuideVolume.h"
+#include "commands/GuideVolume.h"
 
-#include "Failure.h"
 #include "files/VdbFile.h"
+#include "shell/Failure.h"
 
 #include "support/MeshBuilder.h"
 
@@ -18,7 +18,7 @@ namespace {
     using Tessara::Math::float3;
     using TestSupport::MeshBuilder;
 
-    /// A guide that reads what a volume was written to.
+    /// A guide read from a file to which a volume was written.
     GuideVolume throughFile(SparseVolume const& volume, Report& report, GuideOptions options = {})
     {
         options.file = std::filesystem::path(testing::TempDir()) / "modeling-guide.vdb";
@@ -26,7 +26,7 @@ namespace {
         return GuideVolume(options, report);
     }
 
-    /// Fine where x is above 0, by half boxes and half voxels: a lattice that is shifted by so many voxels.
+    /// Fine where x is above 0, half as boxes and half as voxels, on a lattice with an offset in voxels.
     SparseVolume halfSpace(double voxelSize, std::array<double, 3> const& shift)
     {
         SparseVolume volume;
@@ -48,7 +48,7 @@ namespace {
         return volume;
     }
 
-    /// Half the largest side of the boxes of faces with all corners in a slab of x.
+    /// Half the longest side of the boxes of faces with all corners in a slab along x.
     float toleranceIn(float low, float high, MeshArrays const& mesh)
     {
         float largest = 0;
@@ -67,7 +67,7 @@ namespace {
 
 }
 
-TEST(GuideVolume, ScalesTheToleranceWhereTheFileHasIt)
+TEST(GuideVolume, ScalesTheToleranceAtThePositionsInTheFile)
 {
     auto const sphere = MeshBuilder::sphereWithFaces(2000).build();
     float const before = toleranceIn(-2, 2, arraysOf(*sphere));
@@ -78,7 +78,7 @@ TEST(GuideVolume, ScalesTheToleranceWhereTheFileHasIt)
             options.tileSide = tileSide;
             Report report("test");
             GuideVolume const guide = throughFile(halfSpace(0.05, shift), report, options);
-            guide.tellCoverage(arraysOf(*sphere), report);
+            guide.reportCoverage(arraysOf(*sphere), report);
             EXPECT_EQ(report.document["warnings"].size(), 0);
             EXPECT_NEAR(
                 report.document["volume"]["coveredFaces"].get<double>() / arraysOf(*sphere).faceCount(), 0.5, 0.1);
@@ -89,7 +89,7 @@ TEST(GuideVolume, ScalesTheToleranceWhereTheFileHasIt)
         }
 }
 
-TEST(GuideVolume, SaysWhatItCannotHold)
+TEST(GuideVolume, RefusesWhatItCannotRepresent)
 {
     struct Case {
         char const* message;

@@ -1,9 +1,9 @@
-#include "MemoryLimit.h"
+#include "shell/MemoryLimit.h"
 
-#include "Failure.h"
-#include "GuideVolume.h"
-#include "SurfaceBand.h"
+#include "commands/GuideVolume.h"
 #include "files/VdbFile.h"
+#include "geometry/SurfaceBand.h"
+#include "shell/Failure.h"
 
 #include "support/MeshBuilder.h"
 #include "support/TemporaryFolder.h"
@@ -20,7 +20,7 @@ namespace ModelingProgram {
 
 using TestSupport::MeshBuilder;
 
-TEST(MemoryLimit, FindsWhatMachineAndGroupsLeaveFree)
+TEST(MemoryLimit, FindsTheFreeMemoryOfMachineAndGroups)
 {
     constexpr std::uint64_t kMegabyte = 1 << 20;
     std::map<std::string, std::string> const machine = {{"proc/meminfo", "MemTotal: 9 kB\nMemAvailable: 10240 kB\n"}};
@@ -58,7 +58,7 @@ TEST(MemoryLimit, RefusesBandsAndVolumesBeforeTheyAreMade)
         EXPECT_LT(estimateBand(arraysOf(*mesh), kVoxelSize, 1000).voxels, 1e10); // the box, not 1,000 spheres
     }
 
-    auto const single = TestSupport::MeshBuilder::icosahedron().build(); // in a band much wider than it is
+    auto const single = TestSupport::MeshBuilder::icosahedron().build(); // in a much wider band
     double const wide = static_cast<double>(voxelsAround(arraysOf(*single), {}, 0.5, 40).size());
     EXPECT_NEAR(estimateBand(arraysOf(*single), 0.5, 40).voxels / wide, 1, 0.1);
 
@@ -69,14 +69,14 @@ TEST(MemoryLimit, RefusesBandsAndVolumesBeforeTheyAreMade)
     GuideOptions options;
     options.file = folder / "guide.vdb";
     writeVdbFile(volume, options.file);
-    MemoryLimit const limit(presentMemory() + (20u << 20)); // OpenVDB alone takes more
+    MemoryLimit const limit(presentMemory() + (20u << 20)); // OpenVDB alone needs more
     Report report("test");
     try {
         GuideVolume const guide(options, report, &limit);
         ADD_FAILURE() << "read in spite of the limit";
     } catch (Failure const& failure) {
         EXPECT_EQ(failure.code, ExitCode::OutOfMemory);
-        EXPECT_THAT(failure.what(), testing::HasSubstr("with 100,000 single voxels would take about"));
+        EXPECT_THAT(failure.what(), testing::HasSubstr("with 100,000 single voxels would need about"));
     }
 }
 

@@ -1,5 +1,5 @@
-#include "MeshTopology.h"
-#include "MeshRequirements.h"
+#include "geometry/MeshTopology.h"
+#include "geometry/MeshRequirements.h"
 
 #include "support/MeshBuilder.h"
 
@@ -36,7 +36,7 @@ namespace {
         return faces;
     }
 
-    /// Triangles that have nothing but one point in common.
+    /// Triangles that share only one point.
     Faces looseFan(unsigned int triangles)
     {
         Faces faces;
@@ -45,15 +45,16 @@ namespace {
         return faces;
     }
 
-    /// Edges, open ones, those of many faces, winding conflicts, pinched points, isolated points, parts, genus.
+    /// Edges, boundary edges, non-manifold edges, winding conflicts, non-manifold points, isolated points, parts,
+    /// genus.
     using Counts = std::vector<long>;
     constexpr long kNone = -1;
 
     Counts countsOf(Mesh const& mesh)
     {
-        MeshTopology const t = analyseTopology(arraysOf(*mesh));
-        auto const counts = {t.edgeCount, t.openEdges.count, t.nonManifoldEdges.count, t.windingConflicts.count,
-            t.pinchedPoints.count, t.isolatedPoints.count, t.partCount};
+        MeshTopology const t = analyzeTopology(arraysOf(*mesh));
+        auto const counts = {t.edgeCount, t.boundaryEdges.count, t.nonManifoldEdges.count, t.windingConflicts.count,
+            t.nonManifoldPoints.count, t.isolatedPoints.count, t.partCount};
         Counts result(counts.begin(), counts.end());
         result.push_back(t.genus.value_or(kNone));
         return result;
@@ -61,7 +62,7 @@ namespace {
 
 }
 
-TEST(MeshTopology, TellsHowFacesHangTogether)
+TEST(MeshTopology, CountsEdgesPointsPartsAndGenus)
 {
     struct Case {
         char const* name;
@@ -99,17 +100,17 @@ TEST(MeshTopology, TellsHowFacesHangTogether)
 TEST(MeshTopology, CountsFacesByCorners)
 {
     Mesh const mesh = meshOf(6, {{}, {0, 1, 2}, {0, 1, 2, 3}, {0}, {0, 1, 2, 3, 4}, {5, 1, 5, 2}, {2, 2, 2}});
-    MeshTopology const t = analyseTopology(arraysOf(*mesh));
+    MeshTopology const t = analyzeTopology(arraysOf(*mesh));
     std::uint64_t const found[] = {t.triangleCount, t.quads.count, t.quads.first, t.polygons.count, t.polygons.first,
         t.facesBelowThreeCorners.count, t.facesWithRepeatedPoints.count, t.facesWithRepeatedPoints.first};
     EXPECT_THAT(found, ElementsAre(2, 2, 2, 1, 4, 2, 2, 5));
 }
 
-TEST(MeshRequirements, NamesFaultsWithTheirFirstPlace)
+TEST(MeshRequirements, NamesFaultsWithTheirFirstOccurrence)
 {
     auto const faultsOf = [](Mesh const& mesh) {
         MeshArrays const arrays = arraysOf(*mesh);
-        MeshTopology const topology = analyseTopology(arrays);
+        MeshTopology const topology = analyzeTopology(arrays);
         std::vector<std::string> faults = faultsOfTriangles(arrays, topology);
         for (std::string const& fault : faultsOfClosedManifold(arrays, topology))
             faults.push_back(fault);
@@ -120,14 +121,16 @@ TEST(MeshRequirements, NamesFaultsWithTheirFirstPlace)
     EXPECT_THAT(faultsOf(meshOf(4, kTetrahedron)), ElementsAre());
     EXPECT_THAT(faultsOf(meshOf(4, open)),
         ElementsAre(HasSubstr("1 face has fewer than three corners. The first is face 1."),
-            HasSubstr("3 of 6 edges are open: no other face is on the far side. The first is the edge of face 0 from "
-                      "point 1 at (1, 0.5, 0) to point 0 at (0, 0.5, 0). Fill the holes first.")));
+            HasSubstr(
+                "3 of 6 edges are boundary edges: they belong to one face only. The first is the edge of face 0 from "
+                "point 1 at (1, 0.5, 0) to point 0 at (0, 0.5, 0). Fill the holes first.")));
     EXPECT_THAT(faultsOf(meshOf(3, {{0, 1, 2}, {0, 1, 2}})),
-        ElementsAre(HasSubstr("At 3 edges neighboring faces point to opposite sides. The first is the edge of face 0 "
-                              "from point 0")));
+        ElementsAre(
+            HasSubstr("At 3 edges neighboring faces have opposite orientations. The first is the edge of face 0 "
+                      "from point 0")));
     EXPECT_THAT(faultsOf(meshOf(8, {{0, 1, 2, 3}, {0, 3, 2, 1}, {0, 4, 5, 6, 7}, {0, 7, 6, 5, 4}})),
         ElementsAre(HasSubstr("4 faces have more than three corners. The first is face 0 with 4."),
-            HasSubstr("pinched at 1 point: the faces there touch only in the point. The first is point 0 at (0, ")));
+            HasSubstr("non-manifold at 1 point: some faces there share only the point. The first is point 0 at (0, ")));
 }
 
 }

@@ -1,10 +1,10 @@
-#include "Operation.h"
+#include "commands/Operation.h"
 
-#include "Cancellation.h"
-#include "Failure.h"
-#include "Geometry.h"
 #include "Program.h"
 #include "files/OutputFile.h"
+#include "geometry/Geometry.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
 
 #include "support/Testing.h"
 
@@ -43,7 +43,7 @@ namespace {
 
 }
 
-TEST(Operation, DropsWhatBelongsToElements)
+TEST(Operation, DropsPropertiesOfElements)
 {
     auto const mesh = MeshBuilder::tetrahedron().build();
     addDataProperty<int>("weight", sPointComp, {1, 2, 3, 4}, *mesh);
@@ -64,7 +64,7 @@ TEST(Operation, DropsWhatBelongsToElements)
     EXPECT_TRUE(validate(*mesh));
 }
 
-TEST(Operation, EndsAsCancelledWhenTheJobIs)
+TEST(Operation, EndsAsCancelledIfTheJobIs)
 {
     Report report("test");
     auto const exitCodeOfRun = [&](std::function<void()> const& operation) {
@@ -85,10 +85,10 @@ TEST(Operation, EndsAsCancelledWhenTheJobIs)
     EXPECT_FALSE(std::filesystem::exists(out));
 }
 
-TEST(CancelOnSignalDeathTest, StopsAtTheFirstSignalAndEndsAtTheSecond)
+TEST(CancelOnSignalDeathTest, StopsAtTheFirstSignalAndTerminatesAtTheSecond)
 {
     testing::FLAGS_gtest_death_test_style = "threadsafe";
-    // The process that dies starts the test anew.
+    // The process that dies runs the test from the start.
     auto const owner = testing::internal::InDeathTestChild() ? ::getppid() : ::getpid();
     auto const folder = std::filesystem::path(testing::TempDir()) / ("modeling-signals-" + std::to_string(owner));
     std::filesystem::create_directories(folder);
@@ -113,7 +113,7 @@ TEST(CancelOnSignalDeathTest, StopsAtTheFirstSignalAndEndsAtTheSecond)
     std::filesystem::remove_all(folder);
 }
 
-TEST(Report, AlignsTablesAndMendsBytes)
+TEST(Report, AlignsTablesAndReplacesInvalidBytes)
 {
     EXPECT_EQ(groupDigits(0) + " " + groupDigits(999) + " " + groupDigits(1000) + " " + groupDigits(1234567),
         "0 999 1,000 1,234,567");

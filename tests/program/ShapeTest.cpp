@@ -1,6 +1,6 @@
-#include "Shape.h"
+#include "geometry/Shape.h"
 
-#include "SurfaceTree.h"
+#include "geometry/SurfaceTree.h"
 
 #include "support/MeshBuilder.h"
 #include "support/Threads.h"
@@ -43,7 +43,8 @@ namespace {
         return sharpPoints(arrays, EdgeSides(arrays), degrees);
     }
 
-    /// Two triangles with a common edge and so many degrees between their normals; the second one turned over, or not.
+    /// Two triangles with a common edge and an angle in degrees between their normals; the second one is optionally
+    /// flipped.
     Mesh hinge(double degrees, bool isTurned)
     {
         auto const angle = static_cast<float>(degrees * std::acos(-1) / 180);
@@ -56,7 +57,7 @@ namespace {
 
 }
 
-TEST(Shape, MeasuresVolumeAreaAndFolds)
+TEST(Shape, MeasuresVolumeAreaAndFoldOvers)
 {
     for (float const at : {0.0f, 4096.0f}) {
         Shape const shape = examined(wedge(at, kWedge)).shape;
@@ -81,7 +82,7 @@ TEST(Shape, MeasuresVolumeAreaAndFolds)
     EXPECT_EQ(examined(nothing).shape.area, 0);
 }
 
-TEST(Shape, FindsTheLargestDistanceAsBruteForceDoes)
+TEST(Shape, FindsTheSameLargestDistanceAsBruteForce)
 {
     auto const before = MeshBuilder::sphere(12).withNoise(0.05f, 1).build();
     auto after = MeshBuilder::sphere(10).withNoise(0.1f, 2).shuffled(3).build();
@@ -92,7 +93,7 @@ TEST(Shape, FindsTheLargestDistanceAsBruteForceDoes)
         for (unsigned int face = 0; face != surface.faceCount(); ++face) {
             auto const corners = surface.corners(face);
             auto const at = [&](std::size_t i) { return Corner{inDoubles((*surface.positions)[corners[i]]), 0}; };
-            nearest = std::min(nearest, length(nearestOf({at(0), at(1), at(2)}, inDoubles(p)).place - inDoubles(p)));
+            nearest = std::min(nearest, length(nearestOf({at(0), at(1), at(2)}, inDoubles(p)).position - inDoubles(p)));
         }
         expected = std::max(expected, nearest);
     }
@@ -108,7 +109,7 @@ TEST(Shape, FindsTheLargestDistanceAsBruteForceDoes)
         EXPECT_EQ(TestSupport::withThreads(threads, measures), measures()) << threads;
 }
 
-TEST(Shape, WarnsOfLargeChangesOnly)
+TEST(Shape, WarnsOnlyOfLargeChanges)
 {
     Shape const cube{1, 6, 3, 2};
     struct Case {

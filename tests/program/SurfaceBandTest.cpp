@@ -1,4 +1,4 @@
-#include "SurfaceBand.h"
+#include "geometry/SurfaceBand.h"
 
 #include "support/MeshBuilder.h"
 
@@ -25,7 +25,7 @@ namespace {
         return result;
     }
 
-    /// Calls `visit` with the voxels around a square from (-20, -4, 7) to (20, 36, 7), and the nearest place of it.
+    /// Calls `visit` with the voxels around a square from (-20, -4, 7) to (20, 36, 7), and its nearest point.
     template <class Visit> void forEachVoxelNear(double halfWidth, Visit const& visit)
     {
         int const reach = static_cast<int>(halfWidth) + 1;
@@ -40,10 +40,10 @@ namespace {
 
 }
 
-TEST(SurfaceBand, TakesValuesFromTheNearestPlace)
+TEST(SurfaceBand, HasTheValuesOfTheNearestPoint)
 {
     constexpr double kVoxelSize = 0.5;
-    // A square face, larger than what is filled at once.
+    // A square face, larger than the pieces that are filled separately.
     auto const mesh = Tessara::Geometry::makeMesh(
         {{-10, -2, 3.5f}, {10, -2, 3.5f}, {10, 18, 3.5f}, {-10, 18, 3.5f}}, {0, 1, 2, 3}, {0, 4});
     for (double const halfWidth : {1.0, 3.0, 5.5}) {

@@ -4,7 +4,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    /// Valid where it is read at all; refused with the file's name otherwise. Anything else is a fault of the reader.
+    /// A file is either read as valid geometry or refused with its name. Anything else is a bug in the reader.
     void readBroken(std::filesystem::path const& file, std::string_view content)
     {
         store(file, content);

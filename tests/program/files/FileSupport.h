@@ -24,11 +24,11 @@ inline GeometryFile readContent(std::string const& extension, std::string_view c
     return readGeometryFile(folder / ("file" + extension), options);
 }
 
-/// What is said about a file behind its name; empty where it is read.
-inline std::string refusalOf(std::string const& extension, std::string_view content)
+/// The error message after the name of the file; empty if the file is read.
+inline std::string refusalOf(std::string const& extension, std::string_view content, ReadOptions const& options = {})
 {
     try {
-        readContent(extension, content);
+        readContent(extension, content, options);
     } catch (FileError const& error) {
         std::string const name = "file" + extension;
         std::string const text = error.what();
@@ -37,7 +37,7 @@ inline std::string refusalOf(std::string const& extension, std::string_view cont
     return {};
 }
 
-/// The bytes of numbers, one after the other, the first or the last byte of each in front.
+/// The bytes of consecutive numbers in a byte order.
 template <class... T> std::string bytesOf(std::endian order, T... numbers)
 {
     std::string result;

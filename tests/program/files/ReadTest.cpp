@@ -4,17 +4,17 @@ namespace ModelingProgram {
 
 namespace {
 
-    using testing::AllOf, testing::ElementsAre, testing::HasSubstr, testing::StartsWith;
+    using testing::AllOf, testing::ElementsAre, testing::HasSubstr, testing::IsEmpty, testing::StartsWith;
     using Indices = std::vector<unsigned int>;
 
-    TEST(ReadGeometryFile, takesWhatFormatsAllow)
+    TEST(ReadGeometryFile, acceptsWhatFormatsAllow)
     {
         struct Case {
             char const* extension;
             std::string content;
             std::uint64_t points;
             Indices corners;
-            Indices offsets; // of faces, or of strands where there are no corners
+            Indices offsets; // of faces, or of strands if there are no corners
             std::string note = {};
         };
         std::string const square = "v 0 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0\n";
@@ -59,7 +59,7 @@ namespace {
             {"weights", {".obj", "v 0 0 0 1\nv 1 0 0 0.5", 2, {}, {}, "1 weights"}},
             {"polylines in order", {".obj", square + "l 1 2\nl 3 4\n", 4, {}, {0, 2, 4}}},
             {"polylines that share points",
-                {".obj", square + "l 4 2 1 3\nl 1/ 4\n", 6, {}, {0, 4, 6}, "2 points are added"}},
+                {".obj", square + "l 4 2 1 3\nl 1/ 4\n", 6, {}, {0, 4, 6}, "2 points are duplicated"}},
             {"faces and polylines", {".obj", square + "l 1 2\nf 1 2 3\n", 4, {0, 1, 2}, {0, 3}, "a mesh has none: 1"}},
             {"points only", {".obj", square + "p 1 2\n", 4, {}, {}, "point elements"}},
             {"a list of faces in front",
@@ -78,8 +78,9 @@ namespace {
                     "bytes after the last element are left out: 1"}},
             {"comments in OFF",
                 {".off", "# a\nOFF # b\n\n3 1 # c\n0 0 0\n# d\n1 0 0\n0 1 0\n3 2 1 0\n#", 3, {2, 1, 0}, {0, 3}}},
-            {"colours of a table",
-                {".off", "OFF 3 1 0\n0 0 0\n1 0 0\n0 1 0\n3 2 1 0 7\n", 3, {2, 1, 0}, {0, 3}, "of a table"}},
+            {"colors that refer to a color table",
+                {".off", "OFF 3 1 0\n0 0 0\n1 0 0\n0 1 0\n3 2 1 0 7\n", 3, {2, 1, 0}, {0, 3},
+                    "refer to a color table"}},
             {"points without normals", {".xyz", "0 0 0\n\n 1 2.5 3 # x\r\n", 2, {}, {}}},
             {"corners welded, also 0 and -0",
                 {".stl",
@@ -102,7 +103,7 @@ namespace {
         }
     }
 
-    TEST(ReadGeometryFile, refusesWhatCannotBeRight)
+    TEST(ReadGeometryFile, refusesMalformedFiles)
     {
         struct Case {
             char const* extension;
@@ -118,52 +119,53 @@ namespace {
         std::string const offPoints = "OFF\n3 1 0\n0 0 0\n1 0 0\n0 1 0\n",
                           solid = "solid\nfacet\nouter\nvertex 0 0 0\n";
         std::vector<Case> const cases{
-            {".obj", "\nhello\n", 2, "\"hello\" begins no line of an OBJ file"},
+            {".obj", "\nhello\n", 2, "\"hello\" is not a keyword of OBJ files"},
             {".obj", "v 0 nan 0", 1, "a coordinate is not finite"},
-            {".obj", "v 0 1e39 0", 1, "\"1e39\" stands for a coordinate, but is no number that fits"},
+            {".obj", "v 0 1e39 0", 1, "\"1e39\" is not a valid number for a coordinate"},
             {".obj", "v 0 0\n", 1, "the line ends before a coordinate"},
-            {".obj", "v 0 0 1.2x\n", 1, "\"1.2x\" stands for a coordinate, but is no number that fits"},
-            {".obj", "v 0 0 +-1\n", 1, "\"+-1\" stands for a coordinate, but is no number that fits"},
-            {".obj", "v 0 0 0 1 1 1 1", 1, "\"1\" is more than belongs into this line"},
-            {".obj", points + "f 1 2 3 x", 4, "\"x\" stands for an index, but is no number that fits"},
-            {".obj", points + "f 1 2 3.5", 4, "\".5\" follows an index, but is none"},
+            {".obj", "v 0 0 1.2x\n", 1, "\"1.2x\" is not a valid number for a coordinate"},
+            {".obj", "v 0 0 +-1\n", 1, "\"+-1\" is not a valid number for a coordinate"},
+            {".obj", "v 0 0 0 1 1 1 1", 1, "\"1\" is unexpected at the end of the line"},
+            {".obj", points + "f 1 2 3 x", 4, "\"x\" is not a valid number for an index"},
+            {".obj", points + "f 1 2 3.5", 4, "\".5\" follows an index, but is not one"},
             {".obj", points + "f 0 1 2", 4, "the point 0 does not exist: the first one is 1"},
             {".obj", points + "\nf 1 2 4", 5, "the point 4 does not exist: the file has 3"},
-            {".obj", "v 0 0 0\nf -1 -2 1\nv 0 0 0", 2, "the point -2 does not exist: 1 stand above"},
+            {".obj", "v 0 0 0\nf -1 -2 1\nv 0 0 0", 2, "the point -2 does not exist: only 1 before this line"},
             {".obj", points + "f 1 2", 4, "a face has fewer than three corners"},
             {".obj", points + "f 1/1 2/1 3/1", 4, "the texture coordinate 1 does not exist: the file has 0"},
-            {".obj", points + "f 1 2 99999999999999999999", 4, "stands for an index, but is no number that fits"},
+            {".obj", points + "f 1 2 99999999999999999999", 4, "is not a valid number for an index"},
             {".obj", points + "l\n", 4, "a polyline has no points"},
             {".obj", "\xFF\xFEv", 1, "the text is UTF-16; UTF-8 and ASCII are read"},
             {".ply", "plx\n", 1, "the file does not begin with \"ply\""},
             {".ply", ply, 6, "the file is cut off: its header has no \"end_header\""},
             {".ply", "ply\nformat ascii 2.0\n", 2, "the format \"ascii\" is not known, or not of version 1.0"},
             {".ply", ply + "property quux q\n" + plyTail, 6, "the type \"quux\" is not known"},
-            {".ply", ply + "property list float int q\n" + plyTail, 6, "the length of a list is no whole number"},
+            {".ply", ply + "property list float int q\n" + plyTail, 6, "the length of a list is not a whole number"},
             {".ply", ply + "property char x\n" + plyTail, 6, "the property \"x\" is declared twice"},
             {".ply", ply + "property uchar c\nproperty float z\nend_header\n0.0 0 0\n", 9, "the line ends before z"},
             {".ply", ply + "end_header\n0 0\n", 7, "points lack x, y or z"},
-            {".ply", ply + "property float z\nend_header\n0 0 zero\n", 8, "\"zero\" stands for z"},
+            {".ply", ply + "property float z\nend_header\n0 0 zero\n", 8, "\"zero\" is not a valid number for z"},
             {".ply", ply + "property list char char q\nproperty float z\nend_header\n0 0 -1 0\n", 9,
                 "a negative length"},
             {".ply", plyMany, 6, "it declares 4000000000 elements \"vertex\", but only 2 bytes follow"},
             {".off", "off\n", 1, "the file does not begin with OFF, COFF, NOFF or the like, or is binary"},
-            {".off", "4OFF\n1 0 0\n0 0 0 0\n", 1, "\"4OFF\" files are not known: points have three coordinates here"},
-            {".off", offPoints + "3 0 1 3\n", 6, "a face names point 3, but the file has 3 points, counted from 0"},
-            {".off", "OFF\n1 0 0\n0 0 0 1 1\n", 3, "a colour has 2 values instead of 3 or 4"},
+            {".off", "4OFF\n1 0 0\n0 0 0 0\n", 1,
+                "\"4OFF\" files are not supported: only points with three coordinates are"},
+            {".off", offPoints + "3 0 1 3\n", 6, "a face refers to point 3, but the file has 3 points, counted from 0"},
+            {".off", "OFF\n1 0 0\n0 0 0 1 1\n", 3, "a color has 2 values instead of 3 or 4"},
             {".off", "OFF\n2 0 0\n0 0 0 # 0 0 0\n", 4, "the file is cut off before point 2"},
             {".xyz", "0 0\n1 2\n", 1,
                 "there are 2 values; without a heading line that names the columns, 3, 4, 6, 7 or 9"},
-            {".xyz", "0 0 0\n1 2 3 0 0 1\n", 2, "there are 6 values, and 3 in the lines above"},
+            {".xyz", "0 0 0\n1 2 3 0 0 1\n", 2, "there are 6 values, but 3 in the lines above"},
             {".xyz", "x y z a\n1 2 3\n", 2, "there are 3 values, but the heading line names 4 columns"},
-            {".xyz", "x y 3\n1 2 3\n", 1, "\"x\" stands for a coordinate"},
+            {".xyz", "x y 3\n1 2 3\n", 1, "\"x\" is not a valid number for a coordinate"},
             {".xyz", "3\n0 0 0\n", 3, "it declares 3 points and holds 1"},
-            {".xyz", "1,5;2,5;3,5\n", 1, "decimal commas are not read"},
-            {".xyz", "1,25 3 4\n", 1, "decimal commas are not read"},
-            {".xyz", "1,,3\n", 1, "\"\" stands for a coordinate"},
+            {".xyz", "1,5;2,5;3,5\n", 1, "decimal commas are not supported"},
+            {".xyz", "1,25 3 4\n", 1, "decimal commas are not supported"},
+            {".xyz", "1,,3\n", 1, "\"\" is not a valid number for a coordinate"},
             {".xyz", "0 0 0 9 9 9 0.1 0.2 900\n1 1 1 0.5 9 9 9 9 9\n", 3, "are not a color and a normal"},
-            {".stl", solid, 5, "the file is cut off inside of a solid"},
-            {".stl", solid + "endloop\n", 5, "\"endloop\" stands where \"vertex\" belongs"},
+            {".stl", solid, 5, "the file is cut off inside a solid"},
+            {".stl", solid + "endloop\n", 5, "\"endloop\" instead of \"vertex\""},
         };
         for (Case const& test : cases)
             EXPECT_THAT(refusalOf(test.extension, test.content),
@@ -171,7 +173,7 @@ namespace {
                 << test.content;
         for (char const* const extension : {".ply", ".stl", ".off"})
             EXPECT_EQ(refusalOf(extension, ""), " cannot be read: it is empty");
-        EXPECT_EQ(refusalOf(".abc", "x"), " cannot be read: its name ends in none of .obj, .ply, .stl, .off and .xyz");
+        EXPECT_EQ(refusalOf(".abc", "x"), " cannot be read: its extension is none of .obj, .ply, .stl, .off and .xyz");
         EXPECT_EQ(refusalOf(".stl", std::string(90, '\0')),
             ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90");
 
@@ -181,13 +183,13 @@ namespace {
         EXPECT_THROW(readGeometryFile(folder / "folder.obj"), FileError);
     }
 
-    TEST(ReadXyz, tellsColumnsByHeadingsOrValues)
+    TEST(ReadXyz, findsColumnsByHeadingsOrValues)
     {
         struct Case {
             std::string content;
             std::vector<uchar3> colors;
             std::vector<float3> normals;
-            std::vector<float> numbers; // the property named n, or else intensity
+            std::vector<float> numbers; // of the property n, or of intensity if there is no n
         };
         std::vector<Case> const cases{
             {"1 2 3 255 0 7\n1 2 3 1 2 3\n", {{255, 0, 7}, {1, 2, 3}}, {}, {}},
@@ -218,19 +220,26 @@ namespace {
         }
         EXPECT_THAT(
             readContent(".xyz", "1 2 3 4 5 6 7\n").notes, ElementsAre(HasSubstr("a heading line would decide")));
+        for (auto const& [row, isDoubtful] : {std::pair{"1 2 3 256 0 7", true}, {"1 2 3 60000 40000 100", true},
+                 {"1 2 3 0.5 0.5 0", true}, {"1 2 3 0.6 0 -0.8", false}, {"1 2 3 255 0 7", false}})
+            EXPECT_THAT(readContent(".xyz", row).notes,
+                testing::Conditional(
+                    isDoubtful, ElementsAre(HasSubstr("columns 4 to 6 are read as normals")), IsEmpty()))
+                << row;
+        EXPECT_THAT(readContent(".xyz", "x y z nx ny nz\n1 2 3 9 9 9\n").notes, IsEmpty());
         EXPECT_THAT(readContent(".xyz", "a b c\n1 2 3\n").notes, ElementsAre(HasSubstr("does not name columns x")));
         EXPECT_EQ(valuesOf<double>(*readContent(".xyz", "x y z t\n0 0 0 123456789.125\n").object, "t"),
             std::vector<double>{123456789.125});
     }
 
-    TEST(ReadGeometryFile, leavesOutWhatIsBrokenIfItMay)
+    TEST(ReadGeometryFile, leavesOutBrokenElementsIfLenient)
     {
         struct Case {
             char const* extension;
             std::string content;
             std::uint64_t points;
             Indices corners;
-            Indices offsets; // of faces, or of strands where there are no corners
+            Indices offsets; // of faces, or of strands if there are no corners
             std::vector<char const*> notes;
         };
         std::string const ply =
@@ -284,7 +293,7 @@ namespace {
         using Tessara::Math::double3;
         double3 const center{500000, -4100000, 0};
         std::string const a = "500000.125 -4100000.5 10.0625\n", b = "500100.1875 -4100080.75 12\n";
-        std::string const corner = "vertex 500100.1885 -4100080.75 12\n"; // as a float it is equal to b
+        std::string const corner = "vertex 500100.1885 -4100080.75 12\n"; // equal to b in single precision
         for (auto const& [extension, content] :
             {std::pair{".obj", "v " + a + "v " + b}, {".xyz", a + b}, {".off", "OFF 2 0 0\n" + a + b},
                 {".ply",
@@ -309,7 +318,7 @@ namespace {
         EXPECT_EQ(readContent(".obj", "v -7.5 2 0\n", {.isCentered = true}).origin, (double3{-8, 2, 0}));
     }
 
-    /// The float nearest to a decimal number, also if rounding to a double first ends halfway between two floats.
+    /// The float nearest to a decimal number, even if the nearest double is halfway between two floats.
     TEST(ReadGeometryFile, roundsDecimalsOnce)
     {
         EXPECT_EQ(valuesOf<float3>(*readContent(".obj",
@@ -321,7 +330,7 @@ namespace {
             (float3{std::nextafter(1.0f, 2.0f), 1, 1}));
     }
 
-    TEST(ReadObj, keepsPointsSharedAcrossSeamsAndTakesValuesAlongIntoStrands)
+    TEST(ReadObj, keepsPointsSharedAcrossSeamsAndValuesOfStrandPoints)
     {
         GeometryFile const file = readContent(".obj",
             "v 0 0 0 1 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0 0 0 1\nvt 0 0\nvt 1 0.5\nvt 0.25 1 0\nvn 0 0 1\n"
@@ -332,7 +341,7 @@ namespace {
         EXPECT_EQ(valuesOf<float3>(*file.object, "normal"), std::vector<float3>(6, {0, 0, 1}));
         EXPECT_EQ(
             valuesOf<float3>(*file.object, "color"), (std::vector<float3>{{1, 0, 0}, {1, 1, 1}, {1, 1, 1}, {0, 0, 1}}));
-        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("2 points have no colour")));
+        EXPECT_THAT(file.notes, ElementsAre(HasSubstr("2 points have no color")));
 
         GeometryFile const strands =
             readContent(".obj", "v 0 0 0 1 0 0\nv 1 0 0 0 1 0\nv 2 0 0 0 0 1\nvn 1 0 0\nvn 0 1 0\nvn 0 0 1\nl 3 1\n");
@@ -368,7 +377,7 @@ namespace {
         return content;
     }
 
-    TEST(ReadPly, givesTheSameInAllEncodings)
+    TEST(ReadPly, givesTheSameResultInAllEncodings)
     {
         std::string const text = "ply\nformat ascii 1.0\n" + kPlyProperties
             + "0.5 0 0 0 0.5 1 0 1 255 0 0 -0.25 2 0 1 4000000000\n"
@@ -400,13 +409,13 @@ namespace {
         EXPECT_THAT(
             readContent(".ply",
                 "ply\nformat ascii 1.0\nelement vertex 2\nproperty float x\nproperty float y\nproperty float z\n"
-                "property list uchar int neighbours\nproperty list uchar ushort three\nend_header\n"
+                "property list uchar int neighbors\nproperty list uchar ushort three\nend_header\n"
                 "0 0 0 1 1 3 1 2 3\n1 0 0 2 0 0 3 1 2 3\n")
                 .notes,
-            ElementsAre(HasSubstr("\"neighbours\""), HasSubstr("\"three\"")));
+            ElementsAre(HasSubstr("\"neighbors\""), HasSubstr("\"three\"")));
     }
 
-    TEST(ReadOff, tellsBytesFromFractions)
+    TEST(ReadOff, distinguishesBytesFromFractions)
     {
         auto const colored = [](std::string const& colors) {
             return readContent(".off",
@@ -425,7 +434,7 @@ namespace {
             valuesOf<float4>(*fractions, "color"), (std::vector<float4>{{1, 0, 0, 0.5f}, {1, 1, 1, 1}, {0, 0, 1, 1}}));
     }
 
-    TEST(ReadStl, isBinaryWhereItsLengthSaysSo)
+    TEST(ReadStl, isBinaryIfItsLengthMatches)
     {
         std::string content =
             "solid, but not as a text is" + std::string(53, ' ') + bytesOf(std::endian::little, std::uint32_t{2});
@@ -438,6 +447,9 @@ namespace {
             valuesOf<unsigned int>(*file.object, sFaceVertex), (std::vector<unsigned int>{0u, 1u, 2u, 0u, 1u, 3u}));
         EXPECT_EQ(valuesOf<unsigned short>(*file.object, "attribute"), (std::vector<unsigned short>{0, 1}));
         EXPECT_THAT(refusalOf(".stl", content.substr(1)), HasSubstr("damaged"));
+        for (bool const isLenient : {false, true})
+            EXPECT_THAT(refusalOf(".stl", content.substr(0, content.size() - 1), {.isLenient = isLenient}),
+                HasSubstr("the file is cut off or damaged: 2 triangles take 184 bytes, but it has 183"));
     }
 
 }

@@ -7,7 +7,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    /// Compares what another reader makes of an OBJ file: every point, every face, every value of a corner.
+    /// Compares with the result of another reader of OBJ files: every point, face and corner value.
     void expectSameAsTinyObj(std::filesystem::path const& file)
     {
         tinyobj::ObjReaderConfig config;
@@ -22,7 +22,7 @@ namespace {
         auto const offsets = valuesOf<unsigned int>(*ours.object, sFaceOffset);
         auto const textures = valuesOf<float2>(*ours.object, "uv");
         auto const normals = valuesOf<float3>(*ours.object, "normal");
-        // Their decimals are off by a rounding now and then.
+        // The other reader does not always round decimals correctly.
         auto const expectNear = [](std::initializer_list<float> actual, std::vector<float> const& all, int number) {
             auto expected = all.begin() + number * static_cast<int>(actual.size());
             for (float const value : actual)
@@ -45,7 +45,7 @@ namespace {
                         index.normal_index);
             }
         }
-        EXPECT_EQ(offsets.empty() ? std::vector{0u} : offsets, theirOffsets); // polylines alone are no mesh
+        EXPECT_EQ(offsets.empty() ? std::vector{0u} : offsets, theirOffsets); // polylines alone do not make a mesh
         EXPECT_EQ(corners, theirCorners);
     }
 

@@ -10,7 +10,7 @@
 namespace ModelingProgram {
 
 #ifdef __SANITIZE_ADDRESS__
-/// OpenVDB lets go of the nodes that it has begun when a stream ends among them.
+/// OpenVDB leaks partially read nodes if a stream ends among them.
 extern "C" char const* __lsan_default_suppressions()
 {
     return "leak:libopenvdb";
@@ -25,7 +25,7 @@ namespace {
     using openvdb::math::Transform;
     using testing::HasSubstr;
 
-    /// What OpenVDB writes.
+    /// The bytes of a file written by OpenVDB.
     void write(std::filesystem::path const& file, openvdb::GridPtrVec const& grids,
         std::uint32_t compression = openvdb::io::COMPRESS_BLOSC | openvdb::io::COMPRESS_ACTIVE_MASK)
     {
@@ -45,7 +45,7 @@ namespace {
         return grid;
     }
 
-    /// Active voxels, active tiles of 8³ and 128³ voxels, and inactive values of their own.
+    /// Active voxels, active tiles of 8³ and 128³ voxels, and inactive voxels that differ from the background.
     FloatGrid::Ptr makeVariedGrid(char const* name)
     {
         FloatGrid::Ptr const grid = makeGrid(name);
@@ -139,7 +139,7 @@ namespace {
         tiny.voxelSize = 1e-9;
         EXPECT_THROW(writeVdbFile(tiny, folder / "b.vdb"), FileError);
         EXPECT_EQ(contentOf(folder / "b.vdb"), contentOf(folder / "c.vdb"));
-        EXPECT_EQ(folder.entryCount(), 3); // nothing temporary is left
+        EXPECT_EQ(folder.entryCount(), 3); // no temporary file is left
     }
 
     TEST(VdbFile, saysWhyAGridIsRefused)
@@ -158,7 +158,7 @@ namespace {
             std::vector<Case>{{"rotated or sheared", [](FloatGrid& grid) { grid.transform().preRotate(0.5); }},
                 {"rotated or sheared",
                     [&](FloatGrid& grid) { grid.setTransform(Transform::createLinearTransform(sheared)); }},
-                {"no cubes", [](FloatGrid& grid) { grid.transform().preScale(openvdb::Vec3d(1, 1, 1.001)); }},
+                {"not cubes", [](FloatGrid& grid) { grid.transform().preScale(openvdb::Vec3d(1, 1, 1.001)); }},
                 {"mirrored", [](FloatGrid& grid) { grid.transform().preScale(openvdb::Vec3d(1, -1, 1)); }},
                 {"frustum",
                     [&](FloatGrid& grid) { grid.setTransform(Transform::createFrustumTransform(box, 0.5, 10)); }},
@@ -178,11 +178,11 @@ namespace {
         store(file, stream.str());
         EXPECT_THAT(refusalOfGrid(file), HasSubstr("written as a stream"));
         store(file, "ply\nformat ascii 1.0\n");
-        EXPECT_THAT(refusalOfGrid(file), HasSubstr("no OpenVDB file"));
+        EXPECT_THAT(refusalOfGrid(file), HasSubstr("not an OpenVDB file"));
         EXPECT_THAT(refusalOfGrid(folder / "missing.vdb"), HasSubstr("no such file"));
     }
 
-    TEST(VdbFile, isRefusedWhereItIsCutOff)
+    TEST(VdbFile, isRefusedIfItIsCutOff)
     {
         TemporaryFolder const folder;
         write(folder / "a.vdb", {makeVariedGrid("a")});
@@ -204,7 +204,7 @@ namespace {
             std::string const whole = contentOf(file);
             for (int i = 0; i != kFilesEach; ++i) {
                 std::string broken = whole;
-                // Half of them in what comes before the values.
+                // Half of them before the values.
                 std::size_t const end = i % 2 == 0 ? whole.size() : std::min<std::size_t>(whole.size(), 2000);
                 broken[random.below(end)] ^= static_cast<char>(1 << random.below(8));
                 broken[random.below(end)] = static_cast<char>(random.below(256));

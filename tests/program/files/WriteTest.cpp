@@ -39,7 +39,7 @@ namespace {
     struct Written {
         std::string content;
         std::vector<std::string> notes;
-        Object object; // read again, where the format is read at all
+        Object object; // read back, if the format can be read
     };
 
     Written written(Tessara::Object const& object, std::string const& extension)
@@ -61,13 +61,13 @@ namespace {
         return result;
     }
 
-    TEST(WritePly, bringsPropertiesOfAllTypesBack)
+    TEST(WritePly, preservesPropertiesOfAllTypes)
     {
         Object const mesh = twoFaces();
         Random random(1);
         for (char const* const component : {sPointComp, sFaceComp}) {
             addAllTypes(component, random, *mesh);
-            for (std::string const type : {"bool", "string", "GeoLocation"}) // are tested below, or have no columns
+            for (std::string const type : {"bool", "string", "GeoLocation"}) // tested below, or without columns
                 mesh->eraseProperty((component + type).c_str());
         }
         addDataProperty<float>("face:both", sFaceComp, {1, 2}, *mesh);
@@ -86,7 +86,7 @@ namespace {
         EXPECT_TRUE(sameContents(*sorted(*file.object), *sorted(*mesh)));
     }
 
-    TEST(WritePly, bringsTheNamesOfColumnsBack)
+    TEST(WritePly, preservesTheNamesOfColumns)
     {
         for (std::string const columns : {"s t", "u v", "texture_u texture_v"}) {
             std::string header = "element vertex 1\nproperty float x\nproperty float y\nproperty float z\n"
@@ -128,7 +128,7 @@ namespace {
         }
     }
 
-    TEST(WriteObj, bringsGeometryBackToTheBit)
+    TEST(WriteObj, preservesGeometryBitwise)
     {
         Object const mesh = twoFaces();
         addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(7), *mesh);
@@ -143,7 +143,7 @@ namespace {
         EXPECT_TRUE(sameContents(*written(*cloud, ".obj").object, *cloud));
     }
 
-    TEST(WriteObj, sharesEqualCornerValuesAndTakesThoseOfPoints)
+    TEST(WriteObj, sharesEqualCornerValuesAndWritesThoseOfPoints)
     {
         Object const mesh = twoFaces();
         addDataProperty<double2>("uv", sFaceVertexComp, Orvan::Array<double2>(7, {0, 0.1}), *mesh);
@@ -157,14 +157,14 @@ namespace {
         EXPECT_THAT(file.notes,
             ElementsAre("\"part\" (int, faces) is left out: it has 3 values for 2 elements",
                 HasSubstr("\"of range\" (int, range) is left out"),
-                HasSubstr("\"color\" is written as three fractions a point"),
+                HasSubstr("\"color\" is written as three fractions per point"),
                 HasSubstr("\"heat\" (float, points) is left out")));
         EXPECT_THAT(file.content,
             AllOf(HasSubstr("v 1 0 0 1 0 0.2\n"), HasSubstr("\nvt 0 0.1\nvn "),
                 HasSubstr("f 1/1/1 2/1/2 3/1/3\nf 1/1/1 3/1/3 5/1/5 4/1/4\n")));
     }
 
-    TEST(WriteStl, bringsTrianglesBack)
+    TEST(WriteStl, preservesTriangles)
     {
         Object const mesh = triangle();
         addDataProperty<unsigned short>("attribute", sFaceComp, {7}, *mesh);
@@ -209,7 +209,7 @@ namespace {
         return {reinterpret_cast<char const*>(array->data), array->size * sizeof(T)};
     }
 
-    TEST(WriteVtp, holdsNamedArraysOfPointsAndCells)
+    TEST(WriteVtp, containsNamedArraysOfPointsAndCells)
     {
         using Arrays = std::map<std::string, std::string>;
         auto const longs = [](auto... numbers) { return bytesOf(std::endian::little, std::int64_t{numbers}...); };
@@ -232,7 +232,8 @@ namespace {
                 {"<Polys> connectivity Int64x1", longs(0, 1, 2, 0, 2, 4, 3)},
                 {"<Polys> offsets Int64x1", longs(3, 7)}}));
 
-        Object const strands = makeStrands({{9, 9, 9}, {0, 0, 0}, {1, 0, 0}, {2, 0, 0}}, {1, 3, 4}); // one is loose
+        Object const strands =
+            makeStrands({{9, 9, 9}, {0, 0, 0}, {1, 0, 0}, {2, 0, 0}}, {1, 3, 4}); // one point is in no strand
         addDataProperty<int>("part", sStrandComp, {4, 5}, *strands);
         EXPECT_THAT(written(*strands, ".obj").content, HasSubstr("\nl 2 3\nl 4\n"));
         EXPECT_EQ(arraysIn(strands),
@@ -254,13 +255,13 @@ namespace {
             char const* refusal;
         } const cases[] = {
             {twoFaces(), "a.stl", "triangles only, but face 1 has 4 corners"},
-            {makePointCloud({{0, 0, 0}}), "a.stl", "triangles only, and this is no mesh"},
-            {makeStrands({{0, 0, 0}}, {0, 1}), "a.ply", "PLY files hold no strands"},
+            {makePointCloud({{0, 0, 0}}), "a.stl", "triangles only, and this is not a mesh"},
+            {makeStrands({{0, 0, 0}}, {0, 1}), "a.ply", "PLY files cannot hold strands"},
             {makePointCloud({{0, 0, 0}, {0, std::numeric_limits<float>::infinity(), 0}}), "a.ply",
-                "point 1 lies nowhere"},
+                "point 1 has a coordinate that is not finite"},
             {makeMesh({{0, 0, 0}}, {0, 0}, {0, 2}), "a.obj", "face 0 has fewer than three corners"},
-            {makeMesh({{0, 0, 0}}, {0, 0, 7}, {0, 3}), "a.obj", "is not valid: sFaceVertex[2] is 7"},
-            {triangle(), "a.off", "its name ends in none of .obj, .ply, .stl and .vtp"},
+            {makeMesh({{0, 0, 0}}, {0, 0, 7}, {0, 3}), "a.obj", "is invalid: sFaceVertex[2] is 7"},
+            {triangle(), "a.off", "its extension is none of .obj, .ply, .stl and .vtp"},
         };
         for (Case const& test : cases) {
             TemporaryFolder const folder;
@@ -278,7 +279,7 @@ namespace {
         EXPECT_FALSE(isWritableFormat("x.off"));
     }
 
-    TEST(WriteGeometryFile, leavesTheOldFileWhereTheDiskFails)
+    TEST(WriteGeometryFile, leavesTheOldFileUnchangedIfTheDiskIsFull)
     {
         TemporaryFolder const folder;
         EXPECT_THROW(writeGeometryFile(*triangle(), folder / "none/a.obj"), FileError);
@@ -286,7 +287,7 @@ namespace {
         EXPECT_THROW(writeGeometryFile(*triangle(), folder / "full.obj"), FileError);
         EXPECT_EQ(folder.entryCount(), 1);
 
-        // A file may not grow beyond some bytes here: that is as a disk that becomes full in the middle.
+        // A limit on the size of files has the same effect as a disk that becomes full in the middle.
         store(folder / "a.ply", "old");
         Object const large = makePointCloud(Orvan::Array<float3>(100'000));
         rlimit limit{};
@@ -301,7 +302,7 @@ namespace {
         EXPECT_EQ(folder.entryCount(), 2);
     }
 
-    TEST(WriteGeometryFile, replacesWhatALinkLeadsToAndKeepsItsPermissions)
+    TEST(WriteGeometryFile, replacesTheTargetOfALinkAndKeepsItsPermissions)
     {
         using std::filesystem::perms;
         TemporaryFolder const folder;

@@ -1,0 +1,55 @@
+#pragma once
+
+#include "shell/CommandLine.h"
+#include "shell/Report.h"
+
+#include <filesystem>
+#include <functional>
+#include <string>
+
+namespace ModelingProgram {
+
+struct Output;
+
+/// The command to run, as parsed from the command line.
+struct Invocation {
+    std::string command;
+    bool asJson = false;
+    unsigned int threads = 0; // upper limit; 0 for all
+    ReadOptions reading;
+    std::vector<double> center; // three numbers, or empty
+    std::function<void(Report&)> run;
+};
+
+/// Adds a command with the options that all commands have.
+Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation);
+
+enum class Needed { Always, Sometimes };
+
+/// Adds a positional argument that is a file name.
+void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command,
+    Needed needed = Needed::Always);
+
+/// Adds OUT and --force, which allows replacing an existing file.
+void addOutput(char const* description, Output& out, Command& command, Needed needed = Needed::Always);
+/// Adds --force only.
+void addForce(Output& out, Command& command);
+
+/// Sets the invocation if `command` is the one on the command line.
+void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);
+
+// Each command has its own source here and is listed in Program.cpp.
+void addInfo(CommandLine& program, Invocation& invocation);
+void addValidate(CommandLine& program, Invocation& invocation);
+void addAddPoints(CommandLine& program, Invocation& invocation);
+void addDeletePoints(CommandLine& program, Invocation& invocation);
+void addDeleteFaces(CommandLine& program, Invocation& invocation);
+void addMakeVolume(CommandLine& program, Invocation& invocation);
+void addMerge(CommandLine& program, Invocation& invocation);
+void addRemoveSlivers(CommandLine& program, Invocation& invocation);
+void addSmooth(CommandLine& program, Invocation& invocation);
+void addStitch(CommandLine& program, Invocation& invocation);
+void addSubdivide(CommandLine& program, Invocation& invocation);
+void addTriangulate(CommandLine& program, Invocation& invocation);
+
+}

@@ -1,0 +1,221 @@
+#include "Operation.h"
+
+#include "files/OutputFile.h"
+#include "files/Scanner.h"
+#include "geometry/Geometry.h"
+#include "geometry/MeshArrays.h"
+#include "shell/Cancellation.h"
+#include "shell/Failure.h"
+
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Names.h>
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cstdlib>
+#include <fstream>
+
+#include <sys/resource.h>
+
+namespace ModelingProgram {
+
+namespace fs = std::filesystem;
+
+namespace {
+
+    std::uint64_t peakMemory()
+    {
+        // Not from getrusage if possible: its peak includes what the process used before it executed this program.
+        std::ifstream status("/proc/self/status");
+        for (std::string line; std::getline(status, line);)
+            if (line.starts_with("VmHWM:"))
+                return std::strtoull(line.c_str() + 6, nullptr, 10) * 1024;
+        rusage usage{};
+        ::getrusage(RUSAGE_SELF, &usage);
+        return static_cast<std::uint64_t>(usage.ru_maxrss) * 1024;
+    }
+
+    /// Ends the report with a table of these rows and those of every command.
+    void addRun(std::vector<std::vector<std::string>> rows, Report& report)
+    {
+        Json& document = report.document;
+        document["peakMemoryBytes"] = peakMemory();
+        rows.push_back({"time", formatSeconds(document["seconds"].get<double>())});
+        rows.push_back({"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())});
+        rows.push_back({"written", document["output"].get<std::string>()});
+        report.text += "\n" + formatTable({{}, {}}, rows);
+    }
+
+    [[noreturn]] void refuseOutput(Output const& out, std::string const& why)
+    {
+        throw Failure(ExitCode::File, fmt::format("{} cannot be written: {}", out.file.string(), why));
+    }
+
+    bool hasExtension(Output const& out, std::string_view extension)
+    {
+        return lowerCase(out.file.extension().string()) == extension;
+    }
+
+}
+
+void requireWritable(Output const& out, GeometryType type)
+{
+    if (!isWritableFormat(out.file))
+        refuseOutput(out, "its name has to end in .obj, .ply, .stl or .vtp");
+    if (type == GeometryType::Strands && (hasExtension(out, ".ply") || hasExtension(out, ".stl")))
+        refuseOutput(out, "this format cannot hold strands; OBJ and VTP can");
+    if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
+        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY and VTP files can");
+    requirePlace(out);
+}
+
+void requirePlace(Output const& out)
+{
+    std::error_code ignored;
+    if (fs::is_directory(out.file, ignored))
+        refuseOutput(out, "it is a folder");
+    fs::path const folder = out.file.has_parent_path() ? out.file.parent_path() : fs::path(".");
+    if (!fs::is_directory(folder, ignored))
+        refuseOutput(out, fmt::format("there is no folder {}", folder.string()));
+    if (!out.replaces && fs::is_regular_file(out.file, ignored))
+        refuseOutput(out, "the file exists; --force replaces it");
+    OutputFile::checkWritable(out.file, out.existing());
+}
+
+void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
+{
+    if (!hasExtension(out, ".stl"))
+        return;
+    MeshArrays const arrays = arraysOf(mesh);
+    for (unsigned int face = 0; face != arrays.faceCount(); ++face)
+        if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
+            refuseOutput(out,
+                fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY and VTP files can hold it",
+                    face, countOf(corners, "corner")));
+}
+
+void requireAttribute(Output const& out, char const* option, std::string const& name)
+{
+    if (!hasExtension(out, ".ply") && !hasExtension(out, ".vtp"))
+        throw Failure(ExitCode::Refused,
+            fmt::format(
+                "{}: {} cannot hold the attribute \"{}\"; PLY and VTP files can", option, out.file.string(), name));
+    constexpr std::string_view kTaken[] = {"x", "y", "z", "vertex_index", "vertex_indices"};
+    if (hasExtension(out, ".ply")
+        && (name.find_first_of(" \t\n\r\v\f") != std::string::npos
+            || std::find(std::begin(kTaken), std::end(kTaken), name) != std::end(kTaken)))
+        throw Failure(
+            ExitCode::Refused, fmt::format("{}: PLY files cannot hold an attribute named \"{}\"", option, name));
+}
+
+Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& report)
+{
+    GeometryFile geometry = readGeometryFile(file, report.reading);
+    stopIfCancelled();
+    if (geometry.origin) {
+        report.reading.origin = geometry.origin;
+        report.document["center"] = {geometry.origin->x, geometry.origin->y, geometry.origin->z};
+    }
+    for (std::string const& note : geometry.notes)
+        report.warn(fmt::format("{}: {}", file.string(), note));
+    report.document["inputs"].push_back(
+        {{"file", file.string()}, {"format", geometry.format}, {"kind", nameOf(typeOf(*geometry.object))}});
+    return std::move(geometry.object);
+}
+
+std::string centerOf(ReadOptions const& reading)
+{
+    return fmt::format(
+        "center {} {} {} subtracted from all positions", reading.origin->x, reading.origin->y, reading.origin->z);
+}
+
+Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& report)
+{
+    Orvan::MutablePtr<Tessara::Object> object = readGeometry(file, report);
+    requireValid(*object, file);
+    return object;
+}
+
+void requireValid(Tessara::Object const& object, fs::path const& file)
+{
+    auto const status = validate(object);
+    if (!status)
+        throw Failure(ExitCode::Invalid,
+            fmt::format(
+                "{} does not contain a valid {}: {}", file.string(), nameOf(typeOf(object)), status.message().view()));
+}
+
+void requirePointCloud(char const* command, Tessara::Object& object, fs::path const& file)
+{
+    if (Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
+        makeEmpty(GeometryType::PointCloud, object);
+    if (typeOf(object) != GeometryType::PointCloud)
+        throw Failure(ExitCode::Refused,
+            fmt::format(
+                "{} needs a point cloud, but {} contains a {}", command, file.string(), nameOf(typeOf(object))));
+}
+
+void requireDone(char const* command, bool isDone)
+{
+    if (!isDone)
+        throw Failure(ExitCode::Refused,
+            fmt::format(
+                "{} failed: the geometry or one of its attributes does not meet the requirements of the operation",
+                command));
+}
+
+void runOperation(Report& report, std::function<void()> const& operation)
+{
+    auto const start = std::chrono::steady_clock::now();
+    try {
+        operation();
+    } catch (std::bad_alloc const&) {
+        throw;
+    } catch (Failure const&) {
+        throw;
+    } catch (std::exception const&) {
+        stopIfCancelled(); // a cancelled operation throws the exception of the host
+        throw;
+    }
+    stopIfCancelled();
+    std::chrono::duration<double> const time = std::chrono::steady_clock::now() - start;
+    report.document["seconds"] = time.count();
+}
+
+void saveGeometry(Tessara::Object const& object, Output const& out, Report& report)
+{
+    auto const status = validate(object);
+    if (!status)
+        throw Failure(ExitCode::Unexpected,
+            fmt::format("the result is invalid, so nothing was written: {}", status.message().view()));
+    stopIfCancelled();
+    std::string const remark = report.reading.origin ? centerOf(report.reading) : std::string();
+    for (std::string const& note : writeGeometryFile(object, out.file, {out.existing(), remark}))
+        report.warn(note);
+    report.document["output"] = out.file.string();
+}
+
+void reportOperation(
+    Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report)
+{
+    Json& document = report.document;
+    document["before"] = before;
+    document["after"] = after;
+    document["droppedProperties"] = droppedProperties;
+
+    report.text += formatValues({{"before", before}, {"after", after}});
+    std::vector<std::vector<std::string>> rows;
+    if (document.contains("keptProperties"))
+        rows.push_back({"kept properties", listOf(document["keptProperties"])});
+    rows.push_back({"dropped properties", listOf(droppedProperties)});
+    addRun(rows, report);
+}
+
+void reportRun(Report& report)
+{
+    addRun({}, report);
+}
+
+}

@@ -1,0 +1,78 @@
+#pragma once
+
+#include "files/GeometryFile.h"
+#include "geometry/Geometry.h"
+#include "shell/Report.h"
+
+#include <TessaraObject/Object.h>
+
+#include <filesystem>
+#include <functional>
+#include <vector>
+
+namespace ModelingProgram {
+
+// The steps of a command that makes a file from files:
+//
+//     requireWritable(out, GeometryType::Mesh);
+//     Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(in, report);
+//     refuse what the operation cannot handle
+//     runOperation(report, [&] { Geometry::Mesh::...(*mesh); });
+//     saveGeometry(*mesh, out, report);
+//     reportOperation(before, after, report);
+//
+// Each step throws `Failure` or `FileError`, which ends the command, if it fails or the user has cancelled the job.
+// Nothing is written before `saveGeometry`, which replaces a file only by a complete one.
+
+/// A file to write.
+struct Output {
+    std::filesystem::path file;
+    bool replaces = false; // otherwise an existing file is refused
+
+    Existing existing() const { return replaces ? Existing::Replace : Existing::Keep; }
+};
+
+/// Refuses before any work what `saveGeometry` would refuse: a format that cannot hold this type of geometry, and what
+/// `requirePlace` refuses. `GeometryType::None` means that the type is not known yet.
+void requireWritable(Output const& out, GeometryType type);
+/// Refuses a folder that does not exist or is not writable, and an existing file without --force.
+void requirePlace(Output const& out);
+/// Refuses a mesh with faces that the format cannot hold.
+void requireWritableFaces(Output const& out, Tessara::Object const& mesh);
+/// Refuses a file whose format cannot hold the new attribute that `option` requests.
+void requireAttribute(Output const& out, char const* option, std::string const& name);
+
+/// Reads a file with the report's options. If it is centered, the same center is subtracted from files read later.
+Orvan::MutablePtr<Tessara::Object> readGeometry(std::filesystem::path const& file, Report& report);
+
+/// A sentence on the center that was subtracted from all positions.
+/// \pre  there is an origin
+std::string centerOf(ReadOptions const& reading);
+
+/// Reads and validates a file.
+Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);
+
+/// Refuses an invalid object, which was read from `file`.
+void requireValid(Tessara::Object const& object, std::filesystem::path const& file);
+
+/// Refuses an object that is not a point cloud. An object without points becomes an empty point cloud.
+void requirePointCloud(char const* command, Tessara::Object& object, std::filesystem::path const& file);
+
+/// Throws if the operation returned false.
+void requireDone(char const* command, bool isDone);
+
+/// Runs and times an operation of the library.
+void runOperation(Report& report, std::function<void()> const& operation);
+
+/// Validates the result and writes it.
+void saveGeometry(Tessara::Object const& object, Output const& out, Report& report);
+
+/// Ends the report with a table of the values before and after, the kept properties (if the document has
+/// "keptProperties"), the dropped properties, time and peak memory.
+void reportOperation(
+    Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report);
+
+/// Ends the report with time, peak memory and the written file, for commands without such a table.
+void reportRun(Report& report);
+
+}

@@ -1,0 +1,177 @@
+#include "Geometry.h"
+
+#include <TessaraGeometry/ElementTypes.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
+#include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
+#include <TessaraGeometry/Prototypes.h>
+
+#include <algorithm>
+
+namespace ModelingProgram {
+
+using namespace Tessara::Geometry;
+using Tessara::Object;
+
+namespace {
+
+    bool isStandard(Orvan::String const& name)
+    {
+        constexpr char const* kStandard[] = {sPointPosition, sFaceVertex, sFaceOffset, sStrandOffset};
+        return std::any_of(std::begin(kStandard), std::end(kStandard), [&](char const* n) { return name == n; });
+    }
+
+    Property describeProperty(Object const& object, Orvan::String const& name)
+    {
+        Property property;
+        property.name = name.view();
+        property.component = getTargetComponent(object, name).view();
+        property.isStandard = isStandard(name);
+        Orvan::String const target = getGeoPropTargetName(object, name);
+        if (getRangeGeoProperty(object, target))
+            property.range = target.view();
+        if (auto const indices = getRangeGeoPropIndices(object, name)) {
+            property.type = "range";
+            property.length = indices->size;
+        } else if (auto const data = getDataGeoProperty(object, name)) {
+            property.type = "unknown";
+            visitArray(data->getProperty(sData), [&](auto const& values, auto elementType) {
+                property.type = elementType.name;
+                property.length = values.size;
+            });
+        }
+        return property;
+    }
+
+}
+
+GeometryType typeOf(Object const& object)
+{
+    if (Object::isA(object, *getMeshPrototype()))
+        return GeometryType::Mesh;
+    if (Object::isA(object, *getStrandPrototype()))
+        return GeometryType::Strands;
+    return Object::isA(object, *getPointCloudPrototype()) ? GeometryType::PointCloud : GeometryType::None;
+}
+
+std::string nameOf(GeometryType type)
+{
+    switch (type) {
+    case GeometryType::Mesh:
+        return "mesh";
+    case GeometryType::PointCloud:
+        return "point cloud";
+    case GeometryType::Strands:
+        return "strand set";
+    case GeometryType::None:
+        break;
+    }
+    return "object of unknown kind";
+}
+
+void makeEmpty(GeometryType type, Object& object)
+{
+    Orvan::MutablePtr<Object> const empty = type == GeometryType::Mesh ? makeMesh({}, {}, {})
+        : type == GeometryType::Strands                                ? makeStrands({}, {})
+                                                                       : makePointCloud({});
+    for (Property const& property : propertiesOf(object))
+        if (!property.isStandard && property.component == sPointComp)
+            empty->setProperty(property.name.c_str(), object.getProperty(property.name.c_str()));
+    object = *empty;
+}
+
+GeoValidator::Status validate(Object const& object)
+{
+    switch (typeOf(object)) {
+    case GeometryType::Mesh:
+        return validateMesh(object);
+    case GeometryType::PointCloud:
+        return PointCloudValidator().validate(object);
+    case GeometryType::Strands:
+        return StrandValidator().validate(object);
+    case GeometryType::None:
+        break;
+    }
+    return GeoValidator::Status("it lacks the components and standard properties of any kind of geometry");
+}
+
+std::optional<BoundingBox> boundingBoxOf(Object const& object)
+{
+    auto const positions = dataOf<float3>(object, sPointPosition);
+    if (!positions || positions->empty())
+        return std::nullopt;
+    BoundingBox box{(*positions)[0], (*positions)[0]};
+    for (float3 const& p : *positions) {
+        box.min = lowerCorner(box.min, p);
+        box.max = upperCorner(box.max, p);
+    }
+    return box;
+}
+
+Json countsOf(Object const& object)
+{
+    Json counts;
+    for (auto const& [key, component] :
+        {std::pair{"points", sPointComp}, {"corners", sFaceVertexComp}, {"faces", sFaceComp}, {"strands", sStrandComp}})
+        if (object.hasProperty(component))
+            counts[key] = getElementCount(object, component);
+    return counts;
+}
+
+std::vector<Property> propertiesOf(Object const& object)
+{
+    std::vector<Property> properties;
+    auto const keys = object.keys();
+    for (Orvan::String const& key : *keys)
+        if (getDataGeoProperty(object, key) || getRangeGeoProperty(object, key))
+            properties.push_back(describeProperty(object, key));
+    return properties;
+}
+
+std::vector<std::string> dropOtherProperties(Object& object)
+{
+    std::vector<std::string> dropped;
+    for (Property const& property : propertiesOf(object)) {
+        if (property.isStandard || property.component.empty())
+            continue;
+        object.eraseProperty(property.name.c_str());
+        dropped.push_back(property.name);
+    }
+    return dropped;
+}
+
+std::vector<std::string> dropOutdatedProperties(Object& object)
+{
+    std::vector<std::string> dropped;
+    auto const dropIf = [&](auto const& isOutdated) {
+        for (Property const& property : propertiesOf(object)) {
+            if (property.isStandard || !isOutdated(property))
+                continue;
+            object.eraseProperty(property.name.c_str());
+            dropped.push_back(property.name);
+        }
+    };
+    dropIf([&](Property const& property) {
+        return property.range.empty() && !property.component.empty()
+            && property.length != getElementCount(object, property.component.c_str());
+    });
+    // The data of a removed range belongs to nothing.
+    dropIf([&](Property const& property) {
+        return property.component.empty()
+            && std::find(dropped.begin(), dropped.end(), getGeoPropTargetName(object, property.name.c_str()).view())
+            != dropped.end();
+    });
+    return dropped;
+}
+
+std::vector<std::string> namesMissingIn(Object const& later, Object const& earlier)
+{
+    std::vector<std::string> names;
+    for (Property const& property : propertiesOf(earlier))
+        if (!later.hasProperty(property.name.c_str()))
+            names.push_back(property.name);
+    return names;
+}
+
+}

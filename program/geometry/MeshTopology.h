@@ -1,0 +1,77 @@
+#pragma once
+
+#include "MeshArrays.h"
+#include "shell/Report.h"
+
+#include <TessaraGeometry/Names.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <optional>
+
+namespace ModelingProgram {
+
+/// The number of elements with some quality, and the lowest of them.
+struct Finding {
+    std::uint64_t count = 0;
+    unsigned int first = Tessara::Geometry::kInvalidIndex;
+
+    explicit operator bool() const { return count != 0; }
+    void add(unsigned int element)
+    {
+        ++count;
+        first = std::min(first, element);
+    }
+};
+
+/// How the faces of a mesh are connected. An edge joins two different points that are consecutive in a face of at least
+/// three corners. It has one side for each time that a face traverses it, in either direction.
+struct MeshTopology {
+    // Faces by their number of corners. `first` is the lowest face.
+    std::uint64_t triangleCount = 0;
+    Finding facesBelowThreeCorners;
+    Finding quads;
+    Finding polygons; // more than four corners
+    Finding facesWithRepeatedPoints; // faces with the same point at several corners
+
+    std::uint64_t edgeCount = 0;
+    // `first` is the lowest corner at which a side of such an edge starts.
+    Finding boundaryEdges; // one side: boundary edges
+    Finding nonManifoldEdges; // more than two sides
+    Finding windingConflicts; // edges with two or more sides in the same direction; counted per direction
+    Finding flippedEdges; // edges with two sides, both in the same direction
+
+    // `first` is the lowest point.
+    Finding nonManifoldPoints; // non-manifold vertices: their faces are not all connected by edges at the point
+    Finding isolatedPoints; // points of no face
+
+    std::uint64_t partCount = 0; // connected components: faces that share a point are in the same one
+    std::optional<std::int64_t> genus; // summed over the parts; for closed manifolds
+
+    /// True if each edge has two sides in opposite directions and each point one closed fan of faces.
+    bool isClosedManifold() const;
+};
+
+class EdgeSides;
+
+/// Accepts any valid mesh. Linear, except for sorting the edges at each point; needs up to 16 bytes per corner and 9
+/// per point.
+MeshTopology analyzeTopology(MeshArrays const& mesh);
+/// The same for callers that already have the edges of the mesh.
+MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges);
+
+/// Adds the rows "parts" and "genus" to the table of a command.
+void addPartsAndGenus(MeshTopology const& topology, Json& values);
+
+/// The points of no face.
+Finding findIsolatedPoints(MeshArrays const& mesh);
+
+/// The number of faces whose shortest edge is shorter than `ratio` times their longest one, measured as the library
+/// does.
+std::uint64_t countSlivers(MeshArrays const& mesh, float ratio);
+
+/// The number of points at exactly the same position as an earlier point: many of them suggest that the mesh is split
+/// along seams.
+std::uint64_t countCoincidentPoints(MeshArrays const& mesh);
+
+}

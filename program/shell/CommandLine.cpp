@@ -1,0 +1,526 @@
+#include "CommandLine.h"
+
+#include "Failure.h"
+#include "Report.h"
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <sstream>
+#include <type_traits>
+
+namespace ModelingProgram {
+
+namespace {
+
+    constexpr std::size_t kHelpColumns = 100;
+
+    double numberIn(std::string const& text)
+    {
+        char* end = nullptr;
+        double const number = std::strtod(text.c_str(), &end);
+        return !text.empty() && end == text.c_str() + text.size() ? number : std::nan("");
+    }
+
+    /// The bytes in "1.5GB" or "2 MiB", or nullopt if the text is no such amount or less than one byte.
+    std::optional<std::uint64_t> bytesIn(std::string const& text)
+    {
+        constexpr std::string_view kPrefixes = "kmgtpe";
+        std::size_t const unitStart = std::min(text.find_first_not_of("0123456789."), text.size());
+        double bytes = numberIn(text.substr(0, unitStart));
+        std::string unit = CLI::detail::to_lower(CLI::detail::trim_copy(text.substr(unitStart)));
+        if (unit.ends_with('b'))
+            unit.pop_back();
+        double const base = unit.size() == 2 && unit[1] == 'i' ? 1024 : 1000;
+        if (!unit.empty()) {
+            std::size_t const power = kPrefixes.find(unit[0]);
+            if (power == std::string_view::npos || unit.substr(1) != (base == 1000 ? "" : "i"))
+                return std::nullopt;
+            bytes *= std::pow(base, static_cast<double>(power + 1));
+        }
+        constexpr double kMost = 1e19;
+        return bytes >= 1 && bytes <= kMost ? std::optional(static_cast<std::uint64_t>(bytes)) : std::nullopt;
+    }
+
+    template <class T> struct ValueOf {
+        using Type = T;
+    };
+    template <class T> struct ValueOf<std::optional<T>> : ValueOf<T> {
+    };
+    template <class T> struct ValueOf<std::vector<T>> : ValueOf<T> {
+    };
+
+    /// Says why a text is not a value of the type; empty if it is one.
+    template <class T> std::string faultIn(std::string const& text)
+    {
+        if constexpr (std::is_integral_v<T>) {
+            T value{};
+            auto const [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+            if (error == std::errc::result_out_of_range)
+                return text + " is too large";
+            if (error != std::errc{} || end != text.data() + text.size())
+                return text + (std::is_signed_v<T> ? " is not a whole number" : " is not a whole number of 0 or more");
+        } else if constexpr (std::is_floating_point_v<T>) {
+            if (!std::isfinite(static_cast<T>(numberIn(text))))
+                return text + " is not a number";
+        }
+        return {};
+    }
+
+    bool isOption(std::string const& argument)
+    {
+        return argument.size() > 1 && argument[0] == '-' && std::isnan(numberIn(argument));
+    }
+
+    /// The number of insertions, deletions, substitutions and swaps of adjacent characters that turn one text into the
+    /// other (optimal string alignment distance).
+    std::size_t editDistance(std::string const& a, std::string const& b)
+    {
+        std::vector<std::vector<std::size_t>> distance(a.size() + 1, std::vector<std::size_t>(b.size() + 1));
+        for (std::size_t i = 0; i <= a.size(); ++i) {
+            for (std::size_t j = 0; j <= b.size(); ++j) {
+                std::size_t& least = distance[i][j];
+                least = std::max(i, j);
+                if (i == 0 || j == 0)
+                    continue;
+                bool const isEqual = a[i - 1] == b[j - 1];
+                least = std::min(
+                    {distance[i - 1][j] + 1, distance[i][j - 1] + 1, distance[i - 1][j - 1] + (isEqual ? 0u : 1u)});
+                if (i > 1 && j > 1 && a[i - 1] == b[j - 2] && a[i - 2] == b[j - 1])
+                    least = std::min(least, distance[i - 2][j - 2] + 1);
+            }
+        }
+        return distance[a.size()][b.size()];
+    }
+
+    /// "; did you mean ...?" with the most similar name; empty if no name is similar.
+    std::string suggestionFor(std::string const& text, std::vector<std::string> const& names)
+    {
+        constexpr std::size_t kLongestName = 40; // also bounds the time that a long argument takes
+        if (text.size() > kLongestName)
+            return {};
+        std::string const* best = nullptr;
+        std::size_t bestDistance = 1 + (text.size() + 1) / 3;
+        for (std::string const& name : names) {
+            std::size_t const distance = name.starts_with(text) && text.size() > 2 ? 0 : editDistance(text, name);
+            if (distance < bestDistance) {
+                best = &name;
+                bestDistance = distance;
+            }
+        }
+        return best ? fmt::format("; did you mean {}?", *best) : std::string();
+    }
+
+    /// The options of a command and of its groups.
+    std::vector<CLI::Option const*> optionsOf(CLI::App const& app)
+    {
+        std::vector<CLI::Option const*> options = app.get_options([](CLI::Option const*) { return true; });
+        for (CLI::App const* group : app.get_subcommands([](CLI::App const* sub) { return sub->get_name().empty(); }))
+            for (CLI::Option const* option : optionsOf(*group))
+                options.push_back(option);
+        return options;
+    }
+
+    std::vector<std::string> namesOf(std::vector<CLI::Option const*> const& options)
+    {
+        std::vector<std::string> names;
+        for (CLI::Option const* option : options)
+            if (option->nonpositional())
+                names.push_back(option->get_name(false, false));
+        return names;
+    }
+
+    /// The options of a group, except its own --help.
+    std::vector<CLI::Option const*> choicesOf(CLI::App const& group)
+    {
+        return group.get_options([&](CLI::Option const* option) { return option != group.get_help_ptr(); });
+    }
+
+    std::string describeUnknownOption(
+        std::string const& argument, std::vector<std::string> const& names, CLI::App const& app)
+    {
+        std::string const name = argument.substr(0, argument.find('='));
+        if (std::find(names.begin(), names.end(), name) != names.end())
+            return fmt::format("{} belongs after the command: {} {}", name, app.get_name(), name);
+        return fmt::format("{} has no option {}{}", app.get_name(), name, suggestionFor(name, names));
+    }
+
+    /// Describes the mistake in a command line without a known command.
+    std::string describeWithoutCommand(CLI::App const& program)
+    {
+        std::vector<std::string> const arguments = program.remaining();
+        auto const word = std::find_if_not(arguments.begin(), arguments.end(), isOption);
+        if (word != arguments.end()) {
+            std::vector<std::string> commands;
+            for (CLI::App const* command : program.get_subcommands([](CLI::App const*) { return true; }))
+                commands.push_back(command->get_name());
+            return fmt::format("there is no command {}{}", *word, suggestionFor(*word, commands));
+        }
+        if (!arguments.empty())
+            return describeUnknownOption(arguments[0], {"--help", "--version"}, program);
+        return "no command is given";
+    }
+
+    /// Names the missing options, or the group of which none or several were given.
+    std::string describeMissing(CLI::App const& command, std::string const& fallback)
+    {
+        std::vector<std::string> missing;
+        for (CLI::Option const* option : optionsOf(command))
+            if (option->get_required() && option->count() == 0)
+                missing.push_back(option->get_name(option->get_positional(), false));
+        if (!missing.empty())
+            return fmt::format("{} needs {}", command.get_name(), fmt::join(missing, " and "));
+        for (CLI::App const* group :
+            command.get_subcommands([](CLI::App const* sub) { return sub->get_name().empty(); })) {
+            std::vector<CLI::Option const*> const options = choicesOf(*group);
+            auto const given = std::count_if(
+                options.begin(), options.end(), [](CLI::Option const* option) { return option->count() != 0; });
+            if (given != 1)
+                return fmt::format("{} {} {}", command.get_name(), given == 0 ? "needs one of" : "takes only one of",
+                    fmt::join(namesOf(options), ", "));
+        }
+        return fallback;
+    }
+
+    std::string describeMismatch(CLI::App const& command, std::string const& fallback)
+    {
+        for (CLI::Option const* option : optionsOf(command)) {
+            auto const count = static_cast<int>(option->count());
+            if (count > option->get_items_expected_max())
+                return fmt::format(
+                    "{} is given more than once, or with too many values", option->get_name(false, false));
+            if (count != 0 && count < option->get_items_expected_min())
+                return fmt::format("{} takes {} values, but {} {} given", option->get_name(false, false),
+                    option->get_items_expected_min(), count, count == 1 ? "was" : "were");
+        }
+        for (CLI::Option const* option : optionsOf(command)) {
+            std::string const name = option->get_name(false, false);
+            if (fallback.starts_with(name + ":"))
+                return name + " needs a value";
+        }
+        return fallback;
+    }
+
+    std::string describeConversion(CLI::App const& command, std::string const& fallback)
+    {
+        for (CLI::Option const* option : optionsOf(command))
+            if (fallback.find(option->get_name(false, false) + " = ") != std::string::npos)
+                return option->get_name(false, false) + " takes no value"; // the parser only converts values of flags
+        return fallback;
+    }
+
+    /// Describes the mistake in a command line. Unknown names come first: a misspelled option also appears as a missing
+    /// one.
+    std::string describeMistake(CLI::ParseError const& error, CLI::App const& program)
+    {
+        std::vector<CLI::App*> const commands = program.get_subcommands();
+        if (commands.empty())
+            return describeWithoutCommand(program);
+        CLI::App const& command = *commands[0];
+        std::vector<std::string> const rest = program.remaining(true);
+        auto const unknown = std::find_if(rest.begin(), rest.end(), isOption);
+        if (unknown != rest.end())
+            return describeUnknownOption(*unknown, namesOf(optionsOf(command)), command);
+        if (dynamic_cast<CLI::RequiredError const*>(&error))
+            return describeMissing(command, error.what());
+        if (dynamic_cast<CLI::ArgumentMismatch const*>(&error))
+            return describeMismatch(command, error.what());
+        if (dynamic_cast<CLI::ConversionError const*>(&error))
+            return describeConversion(command, error.what());
+        if (!rest.empty())
+            return fmt::format("\"{}\" is one argument too many for {}", rest[0], command.get_name());
+        return error.what();
+    }
+
+    /// Replaces an empty argument, which the parser would drop or take for a missing value.
+    constexpr char kEmpty[] = "\x01";
+
+    struct Arguments {
+        std::vector<std::string> texts;
+        int firstEmpty = 0; // its position, counted from 1; 0 if none is empty
+    };
+
+    /// The arguments in their order, without the name of the program.
+    Arguments argumentsOf(int count, char const* const* arguments)
+    {
+        Arguments result;
+        for (int i = 1; i < count; ++i) {
+            std::string argument = arguments[i];
+            if (argument.empty() || (argument.starts_with("--") && argument.ends_with('='))) {
+                argument += kEmpty;
+                result.firstEmpty = result.firstEmpty == 0 ? i : result.firstEmpty;
+            }
+            if (argument.starts_with("-.") && !std::isnan(numberIn(argument)))
+                argument.insert(1, "0"); // the parser takes -.5 for an option, but not -0.5
+            result.texts.push_back(std::move(argument));
+        }
+        return result;
+    }
+
+    /// Scripts pass an empty argument when a variable is not set. It is never a valid name or number, so it is refused
+    /// rather than taken for a default.
+    /// \param program  after parsing, whether or not that succeeded
+    std::string describeEmpty(int position, CLI::App const& program)
+    {
+        for (CLI::App const* command : program.get_subcommands())
+            for (CLI::Option const* option : optionsOf(*command))
+                for (std::string const& value : option->results())
+                    if (value == kEmpty)
+                        return fmt::format("the {} is empty",
+                            option->nonpositional() ? "value of " + option->get_name(false, false)
+                                                    : "argument " + option->get_name(true, false));
+        return fmt::format("argument {} is empty", position);
+    }
+
+    /// Wraps a text into lines of at most `width` characters; all lines but the first are indented.
+    std::string wrapped(std::string const& text, std::size_t width, std::size_t indent)
+    {
+        std::string result;
+        std::size_t column = 0;
+        for (std::size_t start = 0; start < text.size();) {
+            std::size_t const end = std::min(text.find(' ', start), text.size());
+            if (column != 0 && column + 1 + end - start > width) {
+                result += "\n" + std::string(indent, ' ');
+                column = 0;
+            }
+            result += (column == 0 ? "" : " ") + text.substr(start, end - start);
+            column += (column == 0 ? 0 : 1) + end - start;
+            start = end + 1;
+        }
+        return result;
+    }
+
+    /// Rewraps paragraphs, separated by empty lines, to the width of the help.
+    std::string reflowed(std::string_view text)
+    {
+        std::string result;
+        while (!text.empty()) {
+            std::size_t const end = std::min(text.find("\n\n"), text.size());
+            std::string paragraph(text.substr(0, end));
+            std::replace(paragraph.begin(), paragraph.end(), '\n', ' ');
+            result += (result.empty() ? "" : "\n\n") + wrapped(paragraph, kHelpColumns, 0);
+            text.remove_prefix(std::min(end + 2, text.size()));
+        }
+        return result;
+    }
+
+    /// Prints the help or the version, which the parser reports as an error. \return the exit code
+    int printHelp(CLI::App const& program, CLI::ParseError const& error)
+    {
+        std::ostringstream text;
+        program.exit(error, text, text);
+        if (writeToStandardOutput(text.str()))
+            return static_cast<int>(ExitCode::Done);
+        std::fprintf(stderr, "%s: %s\n", program.get_name().c_str(), kCannotWriteOutput);
+        return static_cast<int>(ExitCode::File);
+    }
+
+    /// Keeps the help within the width of a terminal.
+    class HelpFormatter : public CLI::Formatter {
+    public:
+        std::string make_option(CLI::Option const* option, bool isPositional) const override
+        {
+            return row(make_option_name(option, isPositional) + make_option_opts(option), make_option_desc(option));
+        }
+
+        std::string make_description(CLI::App const* app) const override { return app->get_description() + "\n"; }
+
+        std::string make_subcommand(CLI::App const* sub) const override
+        {
+            return row(sub->get_name(), sub->get_description());
+        }
+
+    private:
+        std::string row(std::string const& name, std::string const& description) const
+        {
+            constexpr std::size_t kGroupIndent = 2; // additional indentation of options in a group
+            std::size_t const left = get_column_width();
+            std::string const start = "  " + name;
+            std::string const gap =
+                start.size() < left ? std::string(left - start.size(), ' ') : "\n" + std::string(left, ' ');
+            return start + gap + wrapped(description, kHelpColumns - left - kGroupIndent, left) + "\n";
+        }
+    };
+
+}
+
+Option& Option::required()
+{
+    option_->required();
+    return *this;
+}
+
+Option& Option::values(int count)
+{
+    option_->expected(count)->allow_extra_args(false);
+    return *this;
+}
+
+Option& Option::valueName(char const* name)
+{
+    option_->type_name(name);
+    return *this;
+}
+
+Option& Option::synopsis(char const* text)
+{
+    option_->option_text(text);
+    return *this;
+}
+
+Option& Option::showDefault()
+{
+    option_->capture_default_str();
+    return *this;
+}
+
+Option& Option::needs(Option const& other)
+{
+    option_->needs(other.option_);
+    return *this;
+}
+
+Option& Option::excludes(Option const& other)
+{
+    option_->excludes(other.option_);
+    return *this;
+}
+
+Option& Option::between(double least, double most, char const* shown)
+{
+    option_->check(CLI::Validator(
+        [=](std::string const& text) {
+            double const number = numberIn(text);
+            return number >= least && number <= most
+                ? std::string()
+                : fmt::format("{} is not a number from {} to {}", text, least, most);
+        },
+        shown));
+    return *this;
+}
+
+Option& Option::positive()
+{
+    option_->check(CLI::Validator(
+        [](std::string const& text) {
+            auto const number = static_cast<float>(numberIn(text));
+            return number > 0 && std::isfinite(number) ? std::string() : text + " is not a positive number";
+        },
+        "> 0"));
+    return *this;
+}
+
+Option& Option::oneOf(std::vector<std::string> const& texts)
+{
+    option_->check(CLI::IsMember(texts));
+    return *this;
+}
+
+Option& Option::bytes()
+{
+    option_->transform(CLI::Validator(
+        [](std::string& text) {
+            std::optional<std::uint64_t> const bytes = bytesIn(text);
+            if (!bytes)
+                return text
+                    + " is not an amount of memory: a number above 0, in bytes or with a unit, such as 500MB, 1.5GB or "
+                      "2GiB";
+            text = std::to_string(*bytes);
+            return std::string();
+        },
+        ""));
+    return *this;
+}
+
+std::string Command::name() const
+{
+    return app_->get_name();
+}
+
+template <class T> Option Command::addOption(char const* name, T& value, std::string const& description)
+{
+    CLI::Option& option = *app_->add_option(name, value, description);
+    option.check(CLI::Validator([](std::string const& text) { return faultIn<typename ValueOf<T>::Type>(text); }, ""));
+    return Option(option);
+}
+
+template Option Command::addOption(char const*, double&, std::string const&);
+template Option Command::addOption(char const*, float&, std::string const&);
+template Option Command::addOption(char const*, int&, std::string const&);
+template Option Command::addOption(char const*, unsigned int&, std::string const&);
+template Option Command::addOption(char const*, std::uint64_t&, std::string const&);
+template Option Command::addOption(char const*, std::string&, std::string const&);
+template Option Command::addOption(char const*, std::filesystem::path&, std::string const&);
+template Option Command::addOption(char const*, std::optional<double>&, std::string const&);
+template Option Command::addOption(char const*, std::optional<float>&, std::string const&);
+template Option Command::addOption(char const*, std::vector<double>&, std::string const&);
+template Option Command::addOption(char const*, std::vector<float>&, std::string const&);
+template Option Command::addOption(char const*, std::vector<std::filesystem::path>&, std::string const&);
+
+Option Command::addFlag(char const* names, bool& isSet, char const* description)
+{
+    return Option(*app_->add_flag(names, isSet, description));
+}
+
+Command Command::addChoice(char const* title, std::string const& description)
+{
+    CLI::App& choice = *app_->add_option_group(title, description);
+    choice.require_option(1);
+    return Command(choice);
+}
+
+void Command::onSelected(std::function<void()> run)
+{
+    app_->callback(std::move(run));
+}
+
+CommandLine::CommandLine(char const* name, char const* version, char const* description, char const* footer)
+    : app_(std::make_unique<CLI::App>(description, name))
+{
+    app_->set_version_flag("--version", version, "Print the version and exit");
+    app_->set_help_flag("-h,--help", "Print this help and exit");
+    app_->footer(footer);
+    app_->require_subcommand(1);
+    app_->formatter(std::make_shared<HelpFormatter>());
+}
+
+CommandLine::~CommandLine() = default;
+
+Command CommandLine::addCommand(CommandHelp const& help)
+{
+    CLI::App& command = *app_->add_subcommand(help.name, help.summary);
+    command.set_help_flag("-h,--help", "Print this help and exit");
+    command.footer(fmt::format("{}\n\nExamples:\n{}", reflowed(help.details), help.examples));
+    return Command(command);
+}
+
+std::optional<int> CommandLine::parse(int argumentCount, char const* const* arguments)
+{
+    std::string mistake;
+    Arguments given = argumentsOf(argumentCount, arguments);
+    std::reverse(given.texts.begin(), given.texts.end()); // as the parser takes them
+    try {
+        app_->parse(std::move(given.texts));
+        if (given.firstEmpty == 0)
+            return std::nullopt;
+    } catch (CLI::ParseError const& error) {
+        if (given.firstEmpty == 0 && error.get_exit_code() == 0)
+            return printHelp(*app_, error);
+        mistake = describeMistake(error, *app_);
+    }
+    if (given.firstEmpty != 0)
+        mistake = describeEmpty(given.firstEmpty, *app_);
+    std::vector<CLI::App*> const commands = app_->get_subcommands();
+    std::string const help = app_->get_name() + (commands.empty() ? "" : " " + commands[0]->get_name()) + " --help";
+    std::fprintf(
+        stderr, "%s: %s\nRun \"%s\" for more information.\n", app_->get_name().c_str(), mistake.c_str(), help.c_str());
+    return static_cast<int>(ExitCode::CommandLine);
+}
+
+}

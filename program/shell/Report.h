@@ -1,0 +1,65 @@
+#pragma once
+
+#include "files/GeometryFile.h"
+
+#include <nlohmann/json.hpp>
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace ModelingProgram {
+
+using Json = nlohmann::ordered_json;
+
+/// The output of a command. Results are printed to standard output when it ends, as text or as one JSON document;
+/// warnings are printed to standard error immediately and also added to the document.
+class Report {
+public:
+    explicit Report(std::string const& command);
+
+    void warn(std::string const& sentence);
+
+    Json document; // what --json prints
+    std::string text; // what is printed without --json
+    ReadOptions reading; // of all files; the first file read determines the center to subtract
+};
+
+/// The document as it is printed. Invalid UTF-8, which names in files may contain, becomes replacement characters.
+std::string toText(Json const& document);
+
+/// Returns false if the text could not be written completely.
+[[nodiscard]] bool writeToStandardOutput(std::string const& text);
+inline constexpr char kCannotWriteOutput[] = "cannot write to standard output";
+
+/// A decimal number with the fewest digits from which the same float is read, "64.0" included: a table shows whole JSON
+/// numbers as counts. Null if the value is not finite.
+Json numberOf(float value);
+/// 1234567 as "1,234,567".
+std::string groupDigits(std::uint64_t number);
+/// "1 edge", "1,234 edges".
+std::string countOf(std::uint64_t number, std::string_view singular, std::string_view plural = {});
+/// "a, b, c", or "none".
+std::string listOf(std::vector<std::string> const& texts);
+/// "80 µs", "1.25 ms", "3.10 s", "2.5 min".
+std::string formatSeconds(double seconds);
+/// "512 bytes", "8.1 MB", "2.0 GB".
+std::string formatBytes(std::uint64_t bytes);
+
+struct Column {
+    std::string title;
+    bool isNumber = false; // right-aligned
+};
+
+/// Aligns cells in columns. The title line is omitted if all titles are empty.
+std::string formatTable(std::vector<Column> const& columns, std::vector<std::vector<std::string>> const& rows);
+
+/// Shows objects with the same keys side by side, one row per key: "openEdges" becomes "open edges", null becomes "-".
+struct Values {
+    std::string title;
+    Json values;
+};
+std::string formatValues(std::vector<Values> const& columns);
+
+}
