@@ -6,52 +6,54 @@
 #include <TessaraMathSupport/Types.h>
 #include <TessaraObject/Object.h>
 
-/// What `Geometry::Mesh::subdivide` is made of, for whoever drives the passes in another way. A pass is: mark faces,
-/// `subdivide`, build the half-edges anew, `computePositions`.
+/// The steps of adaptive √3-subdivision (`subdivide.h`), for callers that run the passes themselves. A pass is: mark faces,
+/// `subdivide`, rebuild the half-edges, `computePositions`.
 ///
-/// All take triangle meshes in the flat arrays that `subdivide.h` describes. `faceStates` holds a byte a face and
-/// `vertexLevels` one a point; both are 0 in the coarse mesh. Of a state
-/// - bit 0 is set while refinement is asked for and has not come yet,
-/// - bit 1 says that the pass at hand removes the face,
-/// - bits 2 to 7 are the level, two to a step. A face of an odd level is a third of a split face whose outer edge has
-///   not turned over yet, because the face behind that edge has not split. A face of level 62 takes no mark and never
-///   splits, since the levels of its replacements would not fit.
-/// A point's level is the step at which it was made.
+/// All take triangle meshes in the flat arrays that `subdivide.h` describes. `faceStates` has one byte per face and
+/// `vertexLevels` one per point; all are 0 in the coarse mesh. Of a state
+/// - bit 0 (marked) is set while a requested refinement is pending,
+/// - bit 1 (split) means that the current pass removes the face,
+/// - bits 2 to 7 are the level, two per step. A face of odd level is a third of a split face whose outer edge has not
+///   flipped yet, because the face across that edge has not split. A face of level 62 cannot be marked and never splits,
+///   since the levels of its replacements would not fit.
+/// A point's level is the step that created it.
 ///
-/// Nothing is checked: arrays that do not fit together are undefined. Results are the same for any number of threads.
+/// Nothing is checked: arrays that do not fit together are undefined behavior. Results do not depend on the number of
+/// threads.
 namespace Geometry::Mesh::Internal {
 
-/// Sets the marks of faces that do not fit into twice `tolerance` along every axis, and clears none. Sets none where
-/// the tolerance is not above 1.1920929e-7. Coordinates that are no numbers count as no distance.
+/// Sets the marks of faces that do not fit into twice `tolerance` along every axis, and clears none. Sets none if the
+/// tolerance is NaN or not above 1.1920929e-7. A difference of coordinates that is NaN counts as 0.
+/// \pre  `marks` has at least `numFaces` entries.
 MODELING_EXPORT void markForSubdivision(float tolerance, unsigned int numFaces,
     Orvan::Array<Tessara::Math::float3> const& positions, Orvan::Array<unsigned int> const& faceVertex,
     Orvan::Array<unsigned int> const& faceOffset, Orvan::Array<bool>& marks);
 
-/// Whether the levels of faces on both sides of an edge differ by less than 2 everywhere.
+/// Whether the levels of the two faces at each edge differ by less than 2.
 MODELING_EXPORT bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<unsigned char> const& faceStates);
 
-/// One pass: settles across neighbours which faces split, replaces these, and adds their points. On return the counts,
-/// the arrays and the point data of `object` describe the refined mesh, and `halfEdges` the mesh before it. Neither the
-/// standard properties of `object` nor its counts are touched.
-/// \throws std::runtime_error  when the job is cancelled, with changed `faceStates` and nothing else changed
-/// \throws std::bad_alloc      also when a count no longer fits 32 bits. The counts, `faceVertex` and `faceOffset` then
-///                             describe the mesh before the pass; `faceStates` may have changed, those of points and
-///                             the data of `object` may be longer.
+/// One pass: balances marks across neighbors to find which faces split, replaces these faces, and adds their points. On
+/// return the counts, the arrays and the point data of `object` describe the refined mesh, and `halfEdges` still describes
+/// the mesh before. The standard properties of `object` and its counts are not modified.
+/// \throws std::runtime_error  if the job is cancelled; only `faceStates` may have changed
+/// \throws std::bad_alloc      also if a count does not fit 32 bits. The counts, `faceVertex` and `faceOffset` then
+///                             describe the mesh before the pass; `faceStates` may have changed, and the arrays of points
+///                             and the point data of `object` may be longer than before.
 MODELING_EXPORT void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& halfEdges,
     unsigned int& numPoints, unsigned int& numFaceVertices, unsigned int& numFaces,
     Orvan::Array<Tessara::Math::float3>& basePositions, Orvan::Array<Tessara::Math::float3>& limitPositions,
     Orvan::Array<unsigned char>& vertexLevels, Orvan::Array<unsigned int>& faceVertex,
     Orvan::Array<unsigned int>& faceOffset, Orvan::Array<unsigned char>& faceStates, Tessara::Object& object);
 
-/// Where the points of the coarse mesh go on the limit surface. Resizes `limitPositions`. NaN for a point without a
-/// face.
+/// Computes the positions of the coarse mesh's points on the limit surface. Resizes `limitPositions`. NaN for a point
+/// without a face.
 MODELING_EXPORT void computePositionsInfinity(HalfEdgeDataStructure const& halfEdges, unsigned int numPoints,
     Orvan::Array<Tessara::Math::float3> const& positions, Orvan::Array<Tessara::Math::float3>& limitPositions);
 
-/// Where each point is at the step of the finest face around it: between its base position, where it was made, and its
-/// limit position. Resizes `positions`.
+/// Computes where each point is at the step of the finest face around it: between its base position, where it was created,
+/// and its limit position. Resizes `positions`.
 MODELING_EXPORT void computePositions(HalfEdgeDataStructure const& halfEdges, unsigned int numPoints,
     Orvan::Array<Tessara::Math::float3> const& basePositions, Orvan::Array<Tessara::Math::float3> const& limitPositions,
     Orvan::Array<unsigned char> const& vertexLevels, Orvan::Array<unsigned char> const& faceStates,

@@ -1,15 +1,18 @@
 #include "Arrays.h"
 
+#include "Assert.h"
+
 #include <cstring>
 
 namespace Modeling {
 
 namespace {
 
-    /// Goes on by copying what it has filled, which is several times as fast as value by value for odd sizes.
+    /// Fills the start value by value and copies it from there, which is several times as fast for sizes that are not a
+    /// power of two.
     void fillBlock(std::byte* target, std::size_t bytes, void const* value, std::size_t size)
     {
-        constexpr std::size_t kCopied = 4096; // stays in the nearest cache
+        constexpr std::size_t kCopied = 4096; // remains in the first-level cache
         std::memcpy(target, value, size);
         std::size_t filled = size;
         for (; filled < bytes && filled < kCopied; filled *= 2)
@@ -18,10 +21,18 @@ namespace {
             std::memcpy(target + filled, target, std::min(copied, bytes - filled));
     }
 
+    /// Whether two ranges of memory have no byte in common.
+    [[maybe_unused]] bool areApart(void const* a, std::size_t aBytes, void const* b, std::size_t bBytes)
+    {
+        auto const first = reinterpret_cast<std::uintptr_t>(a), second = reinterpret_cast<std::uintptr_t>(b);
+        return first + aBytes <= second || second + bBytes <= first;
+    }
+
 }
 
 void copyBytes(void const* source, std::size_t bytes, void* target)
 {
+    MODELING_ASSERT(areApart(source, bytes, target, bytes));
     // Each block writes its own bytes.
     parallelFor(tbb::blocked_range<std::size_t>(0, bytes, Internal::kBlockBytes), [=](auto const& block) {
         std::memcpy(static_cast<std::byte*>(target) + block.begin(),
@@ -31,6 +42,7 @@ void copyBytes(void const* source, std::size_t bytes, void* target)
 
 void fillBytes(void* target, std::size_t count, void const* value, std::size_t size)
 {
+    MODELING_ASSERT(size != 0 && areApart(target, count * size, value, size));
     std::size_t const grain = std::max<std::size_t>(1, Internal::kBlockBytes / size);
     // Each block writes its own elements.
     parallelFor(tbb::blocked_range<std::size_t>(0, count, grain), [=](auto const& block) {

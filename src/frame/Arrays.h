@@ -15,28 +15,21 @@
 
 namespace Modeling {
 
-/// An array whose elements the caller writes before they are read; elements of non-trivial types are constructed.
+/// An array whose elements the caller must write before reading them; elements of non-trivial types are constructed.
 template <class T> Orvan::Array<T> uninitializedArray(std::uint64_t count)
 {
     return Orvan::Array<T>(count, Orvan::kUninitialized);
 }
 
-namespace Internal {
-
-    constexpr std::size_t kBlockBytes = std::size_t{1} << 18; // enough to drown the cost of a task
-
-    template <class T> constexpr std::size_t kBlockGrain = std::max<std::size_t>(1, kBlockBytes / sizeof(T));
-
-}
-
-// Elements as bytes: compiled once for all types that may be copied so. With several threads where that pays.
+// For elements of trivially copyable types: compiled once for all of them. Large arrays are cut into blocks, which run in
+// parallel.
 
 /// Copies between memory that does not overlap.
 void copyBytes(void const* source, std::size_t bytes, void* target);
-/// Gives `count` elements of `size` bytes each the value that lies at `value`, which is none of them.
+/// Sets `count` elements of `size` bytes each to the value at `value`, which must not be one of them.
 void fillBytes(void* target, std::size_t count, void const* value, std::size_t size);
 
-/// Copies elements between arrays that do not overlap, with several threads where that pays.
+/// Copies elements between arrays that do not overlap; blocks of large arrays are copied in parallel.
 template <class T> void copyElements(T const* source, std::size_t count, T* target)
 {
     if constexpr (std::is_trivially_copyable_v<T>) {
@@ -49,7 +42,7 @@ template <class T> void copyElements(T const* source, std::size_t count, T* targ
     }
 }
 
-/// Gives elements of an array one value, with several threads where that pays.
+/// Sets elements of an array to one value; blocks of large arrays are filled in parallel.
 template <class T> void fillElements(T* target, std::size_t count, T const& value)
 {
     if constexpr (std::is_trivially_copyable_v<T>) {
@@ -61,7 +54,7 @@ template <class T> void fillElements(T* target, std::size_t count, T const& valu
     }
 }
 
-/// A copy of the first `count` elements of an array, with a capacity of as many.
+/// A copy of the first `count` elements of an array, with a capacity of exactly `count`.
 template <class T> Orvan::Array<T> copyOfFirst(std::uint64_t count, Orvan::Array<T> const& source)
 {
     Orvan::Array<T> copy = uninitializedArray<T>(count);
@@ -81,11 +74,11 @@ template <class T> Orvan::Array<T> zeroedArray(std::uint64_t count)
     return filledArray(count, T{});
 }
 
-/// The sums of the counts before each element, and of all of them: entry i is where the things of element i begin, and
-/// the array is one entry longer than the elements.
-/// \param countOf  `unsigned int (std::size_t element)`, called several times per element and from several threads; does
+/// The exclusive prefix sums of the counts, followed by the total: entry i is the offset of the output of element i, and
+/// the array has one entry more than there are elements.
+/// \param countOf  `unsigned int (std::size_t element)`; called more than once per element, from several threads; must
 ///                 not throw
-/// \throws std::bad_alloc  when memory runs out or the sum does not fit 32 bits
+/// \throws std::bad_alloc  also if the total does not fit 32 bits
 template <class CountOf> Orvan::Array<unsigned int> offsetsFromCounts(std::size_t elementCount, CountOf const& countOf)
 {
     Orvan::Array<unsigned int> offsets = uninitializedArray<unsigned int>(elementCount + 1);

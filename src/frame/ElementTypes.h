@@ -14,7 +14,7 @@ namespace Modeling {
 template <class... T> struct ElementTypeList {
 };
 
-/// The element types that operations know to extend, interpolate and give defaults. Dispatch tries them in this order.
+/// The element types that operations can extend, interpolate and give defaults. Dispatch tries them in this order.
 using CoreElementTypes = ElementTypeList<signed char, short, int, long long, unsigned char, unsigned short,
     unsigned int, unsigned long long, bool, Orvan::String, float, double, Tessara::Math::int2, Tessara::Math::int2x2,
     Tessara::Math::int2x3, Tessara::Math::int3, Tessara::Math::float2, Tessara::Math::float4, Tessara::Math::float3,
@@ -49,7 +49,7 @@ namespace Internal {
 
 }
 
-/// Where an element type stands among all of them: for records that are not written over `T`.
+/// The position of an element type among all of them: for records that are not templates over `T`.
 template <class T> constexpr unsigned char kPlaceOfElementType = Internal::placeIn<T>(AllElementTypes{});
 
 // The two forms in which an element type occurs; they are different types to a property value.
@@ -66,9 +66,9 @@ struct PlainForm {
 /// Runs a rule for the element type of a value, and stores the rule's answer.
 ///
 /// The rule takes `Form::Of<T>&`, deduced: `[&]<class T>(Orvan::Ptr<Orvan::Array<T>>& shared) { ...; return true; }`.
-/// It gets a copy of what is held, so an array is shared with the value while the rule runs, and `makeMutable` copies
-/// it. It may not change `*value` itself. Where `value` is null or empty, or holds no listed type in that form, no rule
-/// runs and `result` stays: the caller sets it to false beforehand, and what no match means differs from site to site.
+/// It gets a copy of what the value holds, so an array is shared with the value while the rule runs, and `makeMutable`
+/// copies it. The rule must not modify `*value`. If `value` is null or empty, or holds no listed type in that form, no rule
+/// runs and `*result` is unchanged: the caller sets it to false beforehand and decides what a missing match means.
 template <class Form, class Rule, class... T> void forEachElementType(
     ElementTypeList<T...>, Form, Tessara::PropertyValue const* value, bool* result, Rule const& rule)
 {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "grains.h"
+
 #include <tbb/blocked_range.h>
 #include <tbb/task_group.h>
 
@@ -8,15 +10,9 @@
 
 namespace Modeling {
 
-// Grain sizes: how many elements a loop runs through before it is worth a task of its own.
-inline constexpr std::size_t kElementGrain = 1000; // a small fixed amount of work: copy, fill, transfer a value
-inline constexpr std::size_t kScatterGrain = 100; // scattering index lists into flag arrays
-inline constexpr unsigned int kFaceGrain = 1; // a whole face, point neighbourhood or property: large or uneven work
-
 namespace Internal {
 
-    /// What a loop does, without its type: so the loop itself is compiled once, and not again for each body and each
-    /// element type in it.
+    /// A type-erased loop body. The loop itself is compiled once, not for each body and each element type in it.
     struct LoopBody {
         void const* body;
         void (*run)(void const* body, std::size_t begin, std::size_t end);
@@ -38,17 +34,17 @@ namespace Internal {
 
 /// Runs `body` over sub-ranges of `range`, on the caller's thread and oneTBB's workers. All loops go through here.
 ///
-/// A range not larger than its grain is one call of `body` on the calling thread: no task, no look at cancellation; an
-/// empty one is none. `body` walks its sub-range upwards and writes only what belongs to the elements at hand. All
-/// threads share it: it is not copied.
+/// If the range is not larger than its grain, `body` is called once on the calling thread, without a task or a check for
+/// cancellation; for an empty range it is not called. `body` walks its sub-range in ascending order and writes only what
+/// belongs to these elements. All threads share it; it is not copied.
 ///
-/// \param isolated  True: a cancellation of an enclosing oneTBB group does not reach the loop. False: it does, and
-///                  after the loop the job's cancellation is looked at. Only the balance sweep of subdivision does
-///                  that; all other operations run to their end once started.
-/// \throws          std::runtime_error with the text of `TSR::exceptionMessage` when not isolated and the job is
-///                  cancelled; the first exception of `body`, which ends the other sub-ranges as soon as they return.
-///                  If oneTBB can allocate no tasks or start no worker thread, the whole range runs on the calling
-///                  thread; std::bad_alloc if by then part of the range has run.
+/// \param isolated  True: a cancellation of an enclosing oneTBB group does not reach the loop. False: it does, and the
+///                  job's cancellation is checked after the loop. Only the balance sweep of subdivision passes false;
+///                  all other operations run to completion once started.
+/// \throws          std::runtime_error with the text of `TSR::exceptionMessage` if not isolated and the job is cancelled.
+///                  The first exception of `body`, which cancels sub-ranges that have not started. std::bad_alloc if
+///                  oneTBB can allocate no tasks or start no worker thread after part of the range has run; if nothing
+///                  has run yet, the whole range runs on the calling thread instead.
 template <class Index, class Body>
 void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool isolated = true)
 {
@@ -67,24 +63,24 @@ void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool 
 template <class... Task> [[nodiscard]] bool runTasks(Task const&... tasks)
 {
     std::atomic<std::size_t> runCount = 0;
-    auto const runOne = [&](std::size_t wanted) {
-        std::size_t place = 0;
-        ((place++ == wanted ? tasks() : void()), ...);
+    auto const runOne = [&](std::size_t number) {
+        std::size_t next = 0;
+        ((next++ == number ? tasks() : void()), ...);
         runCount.fetch_add(1, std::memory_order_relaxed);
     };
-    auto const runSome = [&](tbb::blocked_range<std::size_t> const& places) {
-        for (std::size_t place = places.begin(); place != places.end(); ++place)
-            runOne(place);
+    auto const runSome = [&](tbb::blocked_range<std::size_t> const& numbers) {
+        for (std::size_t number = numbers.begin(); number != numbers.end(); ++number)
+            runOne(number);
     };
     Internal::runLoop({0, sizeof...(Task), 1}, Internal::LoopBody::of<std::size_t>(runSome), false);
     return runCount.load(std::memory_order_relaxed) == sizeof...(Task);
 }
 
-/// Runs a scan or reduction of oneTBB out of reach of a cancellation of an enclosing task group, which would make
-/// oneTBB skip it silently.
-/// \param work  Its loop bodies do not throw.
-/// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work is done then. If oneTBB
-///         runs out of memory between two tasks of one scan, it may end the process.
+/// Runs a scan or reduction of oneTBB that a cancellation of an enclosing task group does not reach: oneTBB would skip it
+/// silently.
+/// \param work  Its loop bodies must not throw.
+/// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work may be done then. If
+///         oneTBB runs out of memory between two tasks of one scan, it may terminate the process.
 template <class Work> [[nodiscard]] bool runIsolated(Work const& work)
 {
     tbb::task_group_context context(tbb::task_group_context::isolated);

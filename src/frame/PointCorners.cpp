@@ -1,6 +1,7 @@
 #include "PointCorners.h"
 
 #include "Arrays.h"
+#include "Assert.h"
 
 #include <tbb/task_arena.h>
 
@@ -12,24 +13,21 @@ namespace Modeling {
 
 namespace {
 
-    constexpr unsigned int kFewPoints = 4096; // up to here one thread is done before a second one has woken up
-    constexpr unsigned int kMostParts = 8; // every part reads all corners, so more of them gain little
-
-    /// Calls `work(first, last)` for parts of the points, each on its own. A part writes only what belongs to its
-    /// points, and walks all corners in one order: no atomics, nothing to sort, and no trace of how many parts there
-    /// were.
+    /// Calls `work(first, last)` for parts of the points in parallel. Each part writes only what belongs to its points and
+    /// walks all corners in the same order: there are no atomics and nothing to sort, and the result does not depend on
+    /// the number of parts.
     template <class Work> void forEachPartOfPoints(unsigned int pointCount, Work const& work)
     {
         auto const threads = static_cast<unsigned int>(tbb::this_task_arena::max_concurrency());
-        unsigned int const parts = pointCount <= kFewPoints ? 1 : std::min(threads, kMostParts);
-        parallelFor(tbb::blocked_range<unsigned int>(0, parts, 1), [&, parts, pointCount](auto const& range) {
+        unsigned int const parts = pointCount <= kFewPoints ? 1 : std::min(threads, kMostPointParts);
+        parallelFor(tbb::blocked_range<std::size_t>(0, parts, kCoarseGrain), [&, parts, pointCount](auto const& range) {
             for (std::uint64_t part = range.begin(); part != range.end(); ++part)
                 work(static_cast<unsigned int>(pointCount * part / parts),
                     static_cast<unsigned int>(pointCount * (part + 1) / parts));
         });
     }
 
-    /// Replaces counts by the sums up to and including each of them.
+    /// Replaces counts by their inclusive prefix sums.
     void sumUp(unsigned int pointCount, unsigned int* const count)
     {
         auto const addUp = [count](tbb::blocked_range<std::size_t> const& points, unsigned int sum, bool isFinal) {
@@ -64,12 +62,13 @@ PointCorners cornersByPoint(unsigned int pointCount, unsigned int const* faceVer
 
     lists.corners = uninitializedArray<unsigned int>(offset[pointCount]);
     unsigned int* const entry = lists.corners.data;
-    // From the last corner to the first, so that each list ascends and its offset ends up at its beginning.
+    // From the last corner to the first: each list ascends, and its offset ends at its beginning.
     forEachPartOfPoints(pointCount, [=](unsigned int first, unsigned int last) {
         for (std::size_t corner = cornerCount; corner-- != 0;)
             if (unsigned int const point = faceVertex[corner]; point - first < last - first)
                 entry[--offset[point]] = static_cast<unsigned int>(corner);
     });
+    MODELING_ASSERT(areOffsets(offset, pointCount, lists.corners.size));
     return lists;
 }
 

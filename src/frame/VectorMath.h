@@ -41,7 +41,7 @@ inline float length(float3 const& v)
     return std::sqrt(dot(v, v));
 }
 
-/// The vector with the length 1; unchanged where its length is no normal positive number.
+/// The vector scaled to length 1; unchanged if its length is NaN or not above the smallest normal float.
 inline float3 safeNormalize(float3 const& v)
 {
     float const norm = length(v);

@@ -3,6 +3,7 @@
 #include "faceStates.h"
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 
 #include <TessaraGeometryVolume/Canceller.h>
 
@@ -19,28 +20,29 @@ using Tessara::Geometry::kInvalidIndex;
 
 namespace {
 
-    constexpr unsigned int kCancelPlace = 4; // what the host knows this loop by
+    constexpr unsigned int kCancelPlace = 4; // the host's number for this loop
 
-    /// What a face and those around it make of its state. Bits are only ever set, so repeating this comes to an end.
+    /// The new state of a face, from its own state and those of its neighbors. Bits are only ever set, so repeating this
+    /// ends.
     unsigned char settledState(
         unsigned char state, std::array<unsigned int, 3> const& across, unsigned char const* states)
     {
         unsigned int const level = levelOf(state);
         unsigned int marked = isMarked(state), split = isSplit(state);
         unsigned int lowestLevel = std::numeric_limits<unsigned int>::max(); // above any level
-        for (unsigned int const neighbour : across) {
-            if (neighbour == kInvalidIndex)
+        for (unsigned int const neighbor : across) {
+            if (neighbor == kInvalidIndex)
                 continue;
-            unsigned char const other = states[neighbour];
+            unsigned char const other = states[neighbor];
             unsigned int const otherLevel = levelOf(other);
             lowestLevel = std::min(lowestLevel, otherLevel);
-            // A whole face follows finer neighbours only; a third has to go with whoever is at its gate.
+            // A whole face follows finer neighbors only; a third has to flip together with the face at its gate.
             if (isMarked(other) && (isThird(state) ? otherLevel != level : level < otherLevel))
                 marked = 1;
             if (isSplit(other) && isThird(state) && otherLevel < level)
                 split = 1;
         }
-        // A whole face waits for coarser neighbours, which have got its mark by now.
+        // A whole face waits for coarser neighbors, which have taken over its mark by now.
         if (!isThird(state) && marked && level <= lowestLevel)
             split = 1;
         return static_cast<unsigned char>(level << 2 | split << 1 | marked);
@@ -58,12 +60,12 @@ namespace {
         TSR::Canceller::cancelID(place);
     }
 
-    /// The sweeps of one pass. A sweep works only on faces at which something may change, and looks up what is across
-    /// the edges of these alone: mostly a pass has to do with few of the faces.
+    /// The sweeps of one pass. A sweep visits only faces that may change, and looks up the neighbors of these alone: most
+    /// passes affect few of the faces.
     class Balance {
     public:
-        /// \param areMutual  whether the neighbours of a face are those whose neighbour it is. Otherwise a face cannot
-        ///                   tell whom it concerns when its state changes, and all are looked at in each sweep.
+        /// \param areMutual  whether each face is a neighbor of its neighbors. If not, a face whose state changes cannot
+        ///                   tell which faces read it, so each sweep visits all faces.
         Balance(HalfEdgeDataStructure const& halfEdges, bool areMutual, unsigned int faceCount,
             unsigned int const* faceVertex, unsigned int const* faceOffset, unsigned char* states)
             : halfEdges_(halfEdges)
@@ -75,20 +77,20 @@ namespace {
             , current_(uninitializedArray<unsigned char>(faceCount))
             , isDue_(filledArray<unsigned char>(faceCount, isAlwaysDue_))
             , isDueNext_(filledArray<unsigned char>(faceCount, isAlwaysDue_))
-            , hasNeighbours_(zeroedArray<unsigned char>(faceCount))
-            , neighbours_(uninitializedArray<std::array<unsigned int, 3>>(faceCount))
+            , hasNeighbors_(zeroedArray<unsigned char>(faceCount))
+            , neighbors_(uninitializedArray<std::array<unsigned int, 3>>(faceCount))
         {
             copyElements(settled_, faceCount_, current_.data);
         }
 
-        /// Requested faces and those around them are due in the first sweep.
+        /// Requested faces and their neighbors are due in the first sweep.
         void prepare()
         {
-            // Each face looks up its own neighbours; any may set flags, which are looked at after the loop.
+            // Each face looks up its own neighbors; any of them may set flags, which are read after the loop.
             parallelFor(tbb::blocked_range<unsigned int>(0, faceCount_, kFaceGrain), [this](auto const& faces) {
                 for (unsigned int face = faces.begin(); face != faces.end(); ++face)
                     if (isRequested(current_[face]))
-                        callUp(face, isDue_.data);
+                        markDue(face, isDue_.data);
             });
         }
 
@@ -96,8 +98,8 @@ namespace {
         bool sweep()
         {
             std::atomic<bool> isChanged = false;
-            // Each face reads what the sweep before has left and writes its own state; any may set flags, which are
-            // looked at after the loop.
+            // Each face reads the states of the previous sweep and writes its own; any of them may set flags, which are
+            // read after the loop.
             parallelFor(
                 tbb::blocked_range<unsigned int>(0, faceCount_, kFaceGrain),
                 [&, this](auto const& faces) {
@@ -111,7 +113,7 @@ namespace {
             return isChanged.load(std::memory_order_relaxed);
         }
 
-        FaceNeighbours takeNeighbours() { return std::move(neighbours_); }
+        FaceNeighbors takeNeighbors() { return std::move(neighbors_); }
 
     private:
         bool settleFaces(unsigned int first, unsigned int last)
@@ -120,37 +122,37 @@ namespace {
             for (unsigned int face = first; face != last; ++face) {
                 if (!isDue_[face])
                     continue;
-                isDue_[face] = isAlwaysDue_; // for the sweep after the next one
-                lookAround(face);
-                unsigned char const state = settledState(current_[face], neighbours_[face], current_.data);
+                isDue_[face] = isAlwaysDue_; // `isDue_` becomes `isDueNext_` of the next sweep
+                findNeighbors(face);
+                unsigned char const state = settledState(current_[face], neighbors_[face], current_.data);
                 if (state == current_[face])
                     continue;
                 settled_[face] = state;
-                callUp(face, isDueNext_.data);
+                markDue(face, isDueNext_.data);
                 isChanged = true;
             }
             return isChanged;
         }
 
-        void lookAround(unsigned int face)
+        void findNeighbors(unsigned int face)
         {
-            if (hasNeighbours_[face])
+            if (hasNeighbors_[face])
                 return;
-            hasNeighbours_[face] = true;
-            neighbours_[face] = facesAcross(halfEdges_, faceVertex_ + faceOffset_[face]);
+            hasNeighbors_[face] = true;
+            neighbors_[face] = facesAcross(halfEdges_, faceVertex_ + faceOffset_[face]);
         }
 
-        /// A face and those around it are due.
-        void callUp(unsigned int face, unsigned char* isDue)
+        /// Makes a face and its neighbors due.
+        void markDue(unsigned int face, unsigned char* isDue)
         {
-            lookAround(face);
-            callUpFace(isDue[face]);
-            for (unsigned int const neighbour : neighbours_[face])
-                if (neighbour != kInvalidIndex)
-                    callUpFace(isDue[neighbour]);
+            findNeighbors(face);
+            setFlag(isDue[face]);
+            for (unsigned int const neighbor : neighbors_[face])
+                if (neighbor != kInvalidIndex)
+                    setFlag(isDue[neighbor]);
         }
 
-        static void callUpFace(unsigned char& isDue)
+        static void setFlag(unsigned char& isDue)
         {
             std::atomic_ref<unsigned char> const flag(isDue);
             if (!flag.load(std::memory_order_relaxed))
@@ -163,18 +165,32 @@ namespace {
         unsigned int faceCount_;
         unsigned char* settled_;
         bool isAlwaysDue_;
-        Orvan::Array<unsigned char> current_; // as the sweep before has left them
-        Orvan::Array<unsigned char> isDue_, isDueNext_; // faces to look at
-        Orvan::Array<unsigned char> hasNeighbours_;
-        FaceNeighbours neighbours_;
+        Orvan::Array<unsigned char> current_; // of the previous sweep
+        Orvan::Array<unsigned char> isDue_, isDueNext_; // faces to visit
+        Orvan::Array<unsigned char> hasNeighbors_;
+        FaceNeighbors neighbors_;
     };
 
-    /// On closed meshes of triangles without repeated directed edges they are.
-    bool areNeighboursMutual(
+    /// True if all faces are triangles and no directed edge is repeated, as on closed manifolds.
+    bool areNeighborsMutual(
         HalfEdgeDataStructure const& halfEdges, unsigned int faceCount, Orvan::Array<unsigned int> const& faceOffset)
     {
         std::uint64_t const corners = std::uint64_t{3} * faceCount;
         return faceOffset[faceCount] == corners && halfEdges.size() == corners;
+    }
+
+    /// What the rows of the refinement's neighbor table assume: a face that splits around a point has no coarser neighbor.
+    [[maybe_unused]] bool splitOnlyBesideFinerOrEqual(
+        unsigned int faceCount, FaceNeighbors const& neighbors, Orvan::Array<unsigned char> const& states)
+    {
+        for (unsigned int face = 0; face != faceCount; ++face) {
+            if (!isSplitAroundPoint(states[face]))
+                continue;
+            for (unsigned int const neighbor : neighbors[face])
+                if (neighbor != kInvalidIndex && levelOf(states[neighbor]) < levelOf(states[face]))
+                    return false;
+        }
+        return true;
     }
 
     bool isAnyRequested(Orvan::Array<unsigned char> const& states, unsigned int faceCount)
@@ -184,22 +200,24 @@ namespace {
 
 }
 
-FaceNeighbours balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
+FaceNeighbors balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<unsigned char>& faceStates)
 {
     if (!isAnyRequested(faceStates, numFaces)) {
-        // There is nothing to spread, but this is where a pass can be cancelled.
+        // Nothing to spread, but this loop is where a pass can be cancelled.
         parallelFor(
             tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [](auto const&) { announceCancelPlace(); },
             false);
         return {};
     }
-    Balance balance(halfEdges, areNeighboursMutual(halfEdges, numFaces, faceOffset), numFaces, faceVertex.data,
+    Balance balance(halfEdges, areNeighborsMutual(halfEdges, numFaces, faceOffset), numFaces, faceVertex.data,
         faceOffset.data, faceStates.data);
     balance.prepare();
     while (balance.sweep()) { }
-    return balance.takeNeighbours();
+    FaceNeighbors neighbors = balance.takeNeighbors();
+    MODELING_ASSERT(splitOnlyBesideFinerOrEqual(numFaces, neighbors, faceStates));
+    return neighbors;
 }
 
 bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
@@ -209,10 +227,10 @@ bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     auto const largestDifference = [&](tbb::blocked_range<unsigned int> const& faces, unsigned int largest) {
         for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
             unsigned int const level = levelOf(faceStates[face]);
-            for (unsigned int const neighbour : facesAcross(halfEdges, faceVertex.data + faceOffset[face])) {
-                if (neighbour == kInvalidIndex)
+            for (unsigned int const neighbor : facesAcross(halfEdges, faceVertex.data + faceOffset[face])) {
+                if (neighbor == kInvalidIndex)
                     continue;
-                unsigned int const other = levelOf(faceStates[neighbour]);
+                unsigned int const other = levelOf(faceStates[neighbor]);
                 largest = std::max(largest, level < other ? other - level : level - other);
             }
         }

@@ -7,7 +7,7 @@
 
 namespace Geometry::Mesh::Internal {
 
-// A face's byte of state; include/Modeling/subdivisionSteps.h tells what its bits mean.
+// A face's state byte; include/Modeling/subdivisionSteps.h describes its bits.
 
 inline constexpr unsigned int kMarkedBit = 1;
 inline constexpr unsigned int kSplitBit = 2;
@@ -16,12 +16,12 @@ constexpr unsigned int levelOf(unsigned char state)
 {
     return state >> 2;
 }
-/// How many whole steps made the face.
+/// The number of whole steps behind the face.
 constexpr unsigned int stepOf(unsigned char state)
 {
     return state >> 3;
 }
-/// Whether a pass may change anything at the face or around it.
+/// Whether a pass may change the face or its neighbors.
 constexpr bool isRequested(unsigned char state)
 {
     return state & (kMarkedBit | kSplitBit);
@@ -34,7 +34,7 @@ constexpr bool isSplit(unsigned char state)
 {
     return state & kSplitBit;
 }
-/// A third of a split face, with the edge that is still to turn over: its gate.
+/// A third of a split face. The edge that is still to flip is its gate.
 constexpr bool isThird(unsigned char state)
 {
     return levelOf(state) & 1;
@@ -45,12 +45,13 @@ constexpr bool isSplitAroundPoint(unsigned char state)
     return isSplit(state) && !isThird(state);
 }
 
-/// The finest level. A face of it takes no mark: its replacements would be of levels 63 and 64, and six bits end at 63.
+/// The finest level. A face of this level is never marked: its replacements would have levels 63 and 64, and six bits hold
+/// at most 63.
 ///
-/// No face gets beyond it, however faces meet. New faces come from marked faces of even level, at most two levels up.
-/// A face of this level is not marked by its neighbors either, because only a finer neighbor marks a face of even
-/// level. So it is like any face that nobody asks to split: a pass stays balanced and closed for all sets of marks. No
-/// other face is held up by it, since faces wait for coarser neighbors only.
+/// No face exceeds it, even on non-manifold meshes. New faces come from marked faces of even level, at most two levels up.
+/// Neighbors do not mark a face of this level either, because only a finer neighbor marks a face of even level. So it is
+/// like any face without a request: a pass stays balanced and closed for all sets of marks. No other face waits for it,
+/// since faces wait for coarser neighbors only.
 inline constexpr unsigned int kFinestLevel = 62;
 
 constexpr bool canTakeMark(unsigned char state)
@@ -63,15 +64,15 @@ constexpr unsigned char stateOfLevel(unsigned int level)
     return static_cast<unsigned char>(level << 2);
 }
 
-/// The faces across the three edges of each face, `kInvalidIndex` where there is none.
-using FaceNeighbours = Orvan::Array<std::array<unsigned int, 3>>;
+/// The faces across the three edges of each face, `kInvalidIndex` if there is none.
+using FaceNeighbors = Orvan::Array<std::array<unsigned int, 3>>;
 
-/// Spreads requests until neighbours agree on which faces split in this pass. The one place that looks at cancellation:
+/// Spreads requests until neighbors agree on which faces split in this pass. The only place that checks for cancellation:
 /// at the end of each sweep over the faces.
-/// \return the neighbours of all faces that split; entries of others may not have been written, and the array is empty
-///         where no face is requested
-/// \throws std::runtime_error  when the job is cancelled; `faceStates` may then be half done
-FaceNeighbours balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
+/// \return the neighbors of all faces that split. Entries of other faces may be uninitialized, and the array is empty if
+///         no face is requested.
+/// \throws std::runtime_error  if the job is cancelled; `faceStates` may then be partly balanced
+FaceNeighbors balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<unsigned char>& faceStates);
 

@@ -2,6 +2,7 @@
 
 #include "faceSize.h"
 
+#include "frame/Assert.h"
 #include "frame/ParallelFor.h"
 
 #include <limits>
@@ -15,6 +16,7 @@ void markForSubdivision(float tolerance, unsigned int numFaces, Orvan::Array<flo
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<bool>& marks)
 {
+    MODELING_ASSERT(marks.size >= numFaces);
     if (!(tolerance > std::numeric_limits<float>::epsilon()))
         return;
     float3 const* const position = positions.data;
@@ -25,7 +27,7 @@ void markForSubdivision(float tolerance, unsigned int numFaces, Orvan::Array<flo
     parallelFor(tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [=](auto const& faces) {
         for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
             unsigned int const* const c = corner + offset[face];
-            if (isBoxLonger(position[c[0]], position[c[1]], position[c[2]], everyLane(tolerance + tolerance)))
+            if (isBoxLonger(position[c[0]], position[c[1]], position[c[2]], broadcast(tolerance + tolerance)))
                 mark[face] = true;
         }
     });

@@ -1,6 +1,7 @@
 #include "pointProperties.h"
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "frame/ElementTypes.h"
 #include "host/GeoProperties.h"
 
@@ -19,13 +20,13 @@ using Tessara::Object;
 
 namespace {
 
-    // The types whose values have a mean. Everything else on points is dropped.
+    // The types whose values have a mean. All other data of points is removed.
     using AveragedTypes = ElementTypeList<float, double, Tessara::Math::float2, Tessara::Math::float4,
         Tessara::Math::float3, Tessara::Math::float2x2, Tessara::Math::float2x3, Tessara::Math::float3x3,
         Tessara::Math::float4x4, Tessara::Math::double2, Tessara::Math::double3, Tessara::Math::double4,
         Tessara::Math::double2x2, Tessara::Math::double2x3, Tessara::Math::double3x3, Tessara::Math::double4x4>;
 
-    /// Of the floating point types of the host, those of doubles are aligned for them.
+    /// A type made of doubles has their alignment.
     template <class T> using ScalarOf = std::conditional_t<alignof(T) == alignof(double), double, float>;
     template <class... T> constexpr std::size_t kDoubles = (std::size_t{std::is_same_v<ScalarOf<T>, double>} + ...);
     static_assert(kDoubles<Tessara::Math::double2, Tessara::Math::double3, Tessara::Math::double4, double> == 4
@@ -56,8 +57,8 @@ namespace {
         return (readGeoPropData<T>(object, name) || ...);
     }
 
-    /// One level deep: what in turn targets the properties that target this one stays.
-    void dropProperty(String const& name, Object& object)
+    /// Removes a property and those that target it, one level deep: what targets these is kept.
+    void removeProperty(String const& name, Object& object)
     {
         Orvan::Array<String> const dependents = getGeoPropNamesByTarget(object, name);
         object.eraseProperty(name);
@@ -65,20 +66,20 @@ namespace {
             object.eraseProperty(dependent);
     }
 
-    template <class Keep> void dropUnless(Keep const& keep, char const* component, Object& object)
+    template <class Keep> void removeUnless(Keep const& keep, char const* component, Object& object)
     {
         Orvan::Array<String> const names = getGeoPropNamesByTarget(object, component);
         for (String const& name : names)
             if (!keep(name))
-                dropProperty(name, object);
+                removeProperty(name, object);
     }
 
     template <class T> void extend(SettledFaces const& faces, unsigned int numPoints, Orvan::Array<T>& values)
     {
-        values.resize(faces.pointCount); // where it did not fit the points: what is missing is zero
+        values.resize(faces.pointCount); // missing values are zero
         values.resize(numPoints, Orvan::kUninitialized);
         T* const value = values.data;
-        // Each face reads old values, and writes that of its own new point.
+        // Each face reads values of old points and writes that of its own new point.
         parallelFor(tbb::blocked_range<unsigned int>(0, faces.faceCount, kFaceGrain), [&, value](auto const& range) {
             for (unsigned int face = range.begin(); face != range.end(); ++face) {
                 if (!isSplitAroundPoint(faces.states[face]))
@@ -89,7 +90,7 @@ namespace {
         });
     }
 
-    /// \return false where the property has another type
+    /// \return false if the property has another type
     template <class T>
     bool extendProperty(SettledFaces const& faces, unsigned int numPoints, String const& name, Object& object)
     {
@@ -98,7 +99,7 @@ namespace {
             if (!values)
                 return false;
             if (faces.pointCount == numPoints && values->size == numPoints)
-                return true; // which leaves a shared array shared
+                return true; // a shared array remains shared
         }
         return editGeoPropData<T>(name, object, [&](Orvan::Array<T>& values) { extend(faces, numPoints, values); });
     }
@@ -113,16 +114,17 @@ namespace {
 
 void stripSubdivisionProperties(Object& object)
 {
-    auto const staysOnPoints = [&](String const& name) {
+    auto const isKept = [&](String const& name) {
         return name == sPointPosition || canBeAveraged(AveragedTypes(), object, name);
     };
-    dropUnless(staysOnPoints, sPointComp, object);
-    dropUnless([](String const& name) { return name == sFaceOffset; }, sFaceComp, object);
-    dropUnless([](String const& name) { return name == sFaceVertex; }, sFaceVertexComp, object);
+    removeUnless(isKept, sPointComp, object);
+    removeUnless([](String const& name) { return name == sFaceOffset; }, sFaceComp, object);
+    removeUnless([](String const& name) { return name == sFaceVertex; }, sFaceVertexComp, object);
 }
 
 void transferPointProperties(SettledFaces const& faces, unsigned int numPoints, Object& object)
 {
+    MODELING_ASSERT(numPoints >= faces.pointCount);
     Orvan::Array<String> const names = getGeoPropNamesByTarget(object, sPointComp);
     for (String const& name : names)
         if (!(name == sPointPosition))

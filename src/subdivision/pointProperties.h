@@ -6,12 +6,12 @@
 
 namespace Geometry::Mesh::Internal {
 
-/// Drops what cannot follow a refinement: data and ranges of faces and of corners, and of points what is no array of
-/// floating point numbers, vectors or matrices. With each property go those that target it.
+/// Removes what cannot be refined: data and ranges of faces and of corners, and data of points other than arrays of
+/// floating-point numbers, vectors or matrices. The properties that target a removed one are removed with it.
 void stripSubdivisionProperties(Tessara::Object& object);
 
-/// Extends the data of points, other than positions, to `numPoints` values: at a new point the mean of the corners of
-/// its face.
+/// Extends the data of points, other than positions, to `numPoints` values: each new point gets the mean of the corners of
+/// its face. Data that did not have one value per point is first cut or filled with zeros.
 void transferPointProperties(SettledFaces const& faces, unsigned int numPoints, Tessara::Object& object);
 
 }

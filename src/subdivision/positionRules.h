@@ -6,14 +6,14 @@
 
 namespace Geometry::Mesh::Internal {
 
-/// The arrays of points, with room for the new ones.
+/// The arrays of points, already resized for the new ones.
 struct RefinedPoints {
     Tessara::Math::float3* basePositions;
     Tessara::Math::float3* limitPositions;
     unsigned char* levels;
 };
 
-/// Fills the entries of the points in the middle of faces.
+/// Fills the entries of the new points.
 void computeNewPoints(SettledFaces const& faces, RefinedPoints const& points);
 
 }

@@ -3,12 +3,14 @@
 #include "pointProperties.h"
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "host/GeoProperties.h"
 
 #include <Modeling/HalfEdgeDataStructure.h>
 #include <Modeling/subdivisionSteps.h>
 #include <TessaraGeometry/Elements.h>
 
+#include <cstdint>
 #include <optional>
 
 namespace Geometry::Mesh::Internal {
@@ -20,21 +22,21 @@ namespace {
 
     using IndexArray = Orvan::Array<unsigned int>;
 
-    /// What a run works on; the object keeps its own arrays until the end.
+    /// The arrays of a run. The object keeps its own ones until the end.
     struct RefinedMesh {
         unsigned int numPoints = 0;
         unsigned int numFaceVertices = 0;
         unsigned int numFaces = 0;
-        Orvan::Array<float3> positions; // at present
+        Orvan::Array<float3> positions; // smoothed
         IndexArray faceVertex;
         IndexArray faceOffset;
-        Orvan::Array<float3> basePositions; // where each point was made
+        Orvan::Array<float3> basePositions; // where each point was created
         Orvan::Array<float3> limitPositions;
         Orvan::Array<unsigned char> vertexLevels;
         Orvan::Array<unsigned char> faceStates;
     };
 
-    /// Nothing where an array is missing.
+    /// Returns nullopt if an array is missing.
     std::optional<RefinedMesh> readMesh(Tessara::Object const& object)
     {
         using namespace Tessara::Geometry;
@@ -72,26 +74,35 @@ namespace {
 
     void rebuild(HalfEdgeDataStructure& halfEdges, RefinedMesh& mesh)
     {
-        // Neither is of use any more, and together they are a third of what is taken.
+        // Release what is no longer needed first: together it is a third of the memory in use.
         halfEdges.clear();
         mesh.positions = {};
         HalfEdgeDataStructure rebuilt(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
         halfEdges.swap(rebuilt);
     }
 
-    /// Until a pass leaves the number of faces as it was.
+    /// What each pass preserves if no two faces have the same directed edge.
+    [[maybe_unused]] bool isClosedAndBalanced(HalfEdgeDataStructure const& halfEdges, RefinedMesh const& mesh)
+    {
+        return !halfEdges.hasBoundary(mesh.numFaces, mesh.faceVertex, mesh.faceOffset)
+            && isBalanced(halfEdges, mesh.numFaces, mesh.faceVertex, mesh.faceOffset, mesh.faceStates);
+    }
+
+    /// Runs passes until the number of faces no longer changes.
     void runPasses(
         MarkFaces const& markFaces, HalfEdgeDataStructure& halfEdges, RefinedMesh& mesh, Tessara::Object& object)
     {
         bool hasMore = mesh.numFaces != 0;
+        [[maybe_unused]] bool const isClosed = halfEdges.size() == std::uint64_t{3} * mesh.numFaces;
         for (bool isFirst = true; hasMore; isFirst = false) {
             unsigned int const facesBefore = mesh.numFaces, pointsBefore = mesh.numPoints;
             refineFaces(markFaces, halfEdges, mesh, object);
             hasMore = mesh.numFaces != facesBefore;
-            // As many points, and as many faces: no face has split, and all is as the pass before has left it.
+            // As many points and as many faces: no face has split, and nothing has changed since the pass before.
             bool const isUnchanged = !hasMore && mesh.numPoints == pointsBefore;
             if (!isUnchanged)
                 rebuild(halfEdges, mesh);
+            MODELING_ASSERT(!isClosed || isClosedAndBalanced(halfEdges, mesh));
             if (!isUnchanged || isFirst)
                 computePositions(halfEdges, mesh.numPoints, mesh.basePositions, mesh.limitPositions, mesh.vertexLevels,
                     mesh.faceStates, mesh.positions);
@@ -119,6 +130,9 @@ bool refineMesh(MarkFaces const& markFaces, Tessara::Object& object)
     std::optional<RefinedMesh> mesh = readMesh(object);
     if (!mesh)
         return false;
+    MODELING_ASSERT(mesh->positions.size >= mesh->numPoints && mesh->faceOffset.size > mesh->numFaces);
+    MODELING_ASSERT(areOffsets(mesh->faceOffset.data, mesh->numFaces, mesh->faceVertex.size));
+    MODELING_ASSERT(areBelow(mesh->numPoints, mesh->faceVertex.data, mesh->faceVertex.size));
     HalfEdgeDataStructure halfEdges(mesh->numPoints, mesh->numFaces, mesh->faceVertex, mesh->faceOffset);
     if (halfEdges.hasBoundary(mesh->numFaces, mesh->faceVertex, mesh->faceOffset))
         return false;

@@ -8,19 +8,18 @@
 
 namespace Geometry::Mesh::Internal {
 
-/// A mesh as it is refined. Faces are triangles, though their corners are found by offsets.
+/// A mesh between two passes. Faces are triangles, but their corners are found by offsets.
 struct MarkableMesh {
     unsigned int faceCount;
-    Orvan::Array<Tessara::Math::float3> const& positions; // at present: what is measured
+    Orvan::Array<Tessara::Math::float3> const& positions; // of the smoothed mesh, which is what is measured
     Orvan::Array<unsigned int> const& faceVertex;
     Orvan::Array<unsigned int> const& faceOffset;
 };
 
-/// Sets the marks of the faces that are to split, and clears none. Called once a pass, on the calling thread.
+/// Sets the marks of the faces that should split, and clears none. Called once per pass, on the calling thread.
 using MarkFaces = std::function<void(MarkableMesh const& mesh, Orvan::Array<bool>& marks)>;
 
-/// What all ways of subdividing have in common: passes until one changes no face, as include/Modeling/subdivide.h
-/// tells.
+/// Runs passes until one changes no face; include/Modeling/subdivide.h describes inputs, outputs and failures.
 bool refineMesh(MarkFaces const& markFaces, Tessara::Object& object);
 
 }

@@ -5,6 +5,7 @@
 #include "positionRules.h"
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 
 #include <TessaraMathSupport/Types.h>
 
@@ -34,8 +35,8 @@ namespace {
         });
     }
 
-    /// Which faces stay, and how many new ones and new points there are: entry f of each array counts what belongs to
-    /// the faces before f, and the last one is the total.
+    /// Which faces are kept, and how many new faces and points there are: entry f of each array counts those of the faces
+    /// before f, and the last entry is the total.
     struct Numbering {
         IndexArray newPointOffsets;
         IndexArray keptFaceOffsets;
@@ -48,39 +49,38 @@ namespace {
         unsigned int emittedCount() const { return emittedOffsets[emittedOffsets.size - 1]; }
     };
 
-    /// Calls `emit(a, b, c, level)` for the triangles that replace a face which splits around the point `centre`, in
-    /// their order: `point` gives the new point of a neighbour, and `pointAcross` the point behind its edge k.
+    /// Calls `emit(a, b, c, level)` for the triangles that replace a face that splits around its new point, in their order.
     template <class Emit> void replaceFace(SettledFaces const& faces, unsigned int face, Emit const& emit)
     {
         unsigned int const level = levelOf(faces.states[face]);
         unsigned int const* const c = faces.corners(face);
         for (unsigned int k = 0; k != 3; ++k) {
-            unsigned int const across = faces.neighbours[face][k];
+            unsigned int const across = faces.neighbors[face][k];
             if (across == kInvalidIndex)
                 continue;
             unsigned int const a = c[k], b = c[k == 2 ? 0 : k + 1];
             unsigned char const other = faces.states[across];
-            unsigned int const centre = faces.newPoint(face);
+            unsigned int const center = faces.newPoint(face);
             if (!isSplit(other)) {
-                emit(a, b, centre, level + 1); // a third, with the edge as its gate
+                emit(a, b, center, level + 1); // a third, whose gate is the edge
             } else if (levelOf(other) > level) {
-                // The edge is the gate of a third and turns over. The third itself writes nothing.
+                // The edge is the gate of a third and flips. The third itself emits nothing.
                 unsigned int const beyond = faces.pointAcross(face, k);
-                emit(a, beyond, centre, level + 2);
-                emit(b, centre, beyond, level + 2);
+                emit(a, beyond, center, level + 2);
+                emit(b, center, beyond, level + 2);
             } else if (levelOf(other) == level) {
-                // The edge turns over; each of the two faces writes the side of its own corner a.
-                emit(a, faces.newPoint(across), centre, level + 2);
-            } // In front of a coarser face, which a balanced mesh does not have here, nothing.
+                // The edge flips; each of the two faces emits the side of its own corner a.
+                emit(a, faces.newPoint(across), center, level + 2);
+            } // Nothing beside a coarser face: in a balanced mesh there is none here.
         }
     }
 
-    /// How many triangles `replaceFace` would write.
+    /// The number of triangles that `replaceFace` emits.
     unsigned int countReplacements(SettledFaces const& faces, unsigned int face)
     {
         unsigned int const level = levelOf(faces.states[face]);
         unsigned int count = 0;
-        for (unsigned int const across : faces.neighbours[face])
+        for (unsigned int const across : faces.neighbors[face])
             if (across != kInvalidIndex) {
                 unsigned char const other = faces.states[across];
                 count += !isSplit(other) || levelOf(other) == level ? 1 : levelOf(other) > level ? 2 : 0;
@@ -118,7 +118,7 @@ namespace {
         IndexArray faceOffset;
         Orvan::Array<unsigned char> states;
 
-        /// With no faces in it yet.
+        /// The faces are uninitialized.
         static FaceArrays ofSize(unsigned int faceCount, unsigned int cornerCount)
         {
             FaceArrays arrays{uninitializedArray<unsigned int>(cornerCount),
@@ -129,21 +129,21 @@ namespace {
         }
     };
 
-    /// Takes a face over, with its state as it is: what is marked and has not split yet stays marked.
+    /// Copies a face with its state: a face that is marked and has not split yet remains marked.
     void keepFace(SettledFaces const& faces, unsigned int face, Numbering const& numbering, FaceArrays& refined)
     {
         unsigned int const corner = numbering.keptCornerOffsets[face];
         unsigned int const cornerEnd = numbering.keptCornerOffsets[face + std::uint64_t{1}];
         unsigned int const number = numbering.keptFaceOffsets[face];
         std::copy_n(faces.corners(face), 3, refined.faceVertex.data + corner);
-        // What a face has beyond a triangle is not moved along with it.
+        // Further corners of a polygon are not copied: those that were at this place remain.
         for (unsigned int further = corner + 3; further < cornerEnd; ++further)
             refined.faceVertex[further] = faces.faceVertex[further];
         refined.faceOffset[number + std::uint64_t{1}] = cornerEnd;
         refined.states[number] = faces.states[face];
     }
 
-    /// Writes the faces that stay, and behind them those that replace the others.
+    /// Writes the faces that are kept, followed by those that replace the others.
     void writeFaces(SettledFaces const& faces, Numbering const& numbering, FaceArrays& refined)
     {
         unsigned int const keptFaces = numbering.keptFaceCount(), keptCorners = numbering.keptCornerCount();
@@ -175,11 +175,13 @@ void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& hal
     Orvan::Array<float3>& limitPositions, Orvan::Array<unsigned char>& vertexLevels, IndexArray& faceVertex,
     IndexArray& faceOffset, Orvan::Array<unsigned char>& faceStates, Tessara::Object& object)
 {
+    MODELING_ASSERT(marks.size >= numFaces && faceStates.size >= numFaces);
+    MODELING_ASSERT(areOffsets(faceOffset.data, numFaces, faceVertex.size));
     takeMarks(marks, numFaces, faceStates);
-    FaceNeighbours const neighbours = balanceFaceStates(halfEdges, numFaces, faceVertex, faceOffset, faceStates);
+    FaceNeighbors const neighbors = balanceFaceStates(halfEdges, numFaces, faceVertex, faceOffset, faceStates);
 
     SettledFaces faces{
-        halfEdges, faceVertex.data, faceOffset.data, faceStates.data, neighbours.data, numFaces, numPoints, nullptr};
+        halfEdges, faceVertex.data, faceOffset.data, faceStates.data, neighbors.data, numFaces, numPoints, nullptr};
     Numbering const numbering = numberPointsAndFaces(faces);
     unsigned int const newPoints = sumOfCounts(numPoints, numbering.newPointCount());
     unsigned int const newFaces = sumOfCounts(numbering.keptFaceCount(), numbering.emittedCount());
@@ -187,11 +189,11 @@ void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& hal
         sumOfCounts(numbering.keptCornerCount(), std::uint64_t{3} * numbering.emittedCount());
 
     if (newPoints == numPoints && newFaces == numFaces && newCorners == faceVertex.size) {
-        transferPointProperties(faces, newPoints, object); // drops what cannot be refined
-        return; // nothing splits, and the arrays are what they are
+        transferPointProperties(faces, newPoints, object); // cuts or fills data that does not have one value per point
+        return; // nothing splits, and the arrays remain as they are
     }
 
-    // All memory of the standard arrays is there before data of the object changes.
+    // Allocate the standard arrays before data of the object changes.
     FaceArrays refined = FaceArrays::ofSize(newFaces, newCorners);
     basePositions.resize(newPoints, Orvan::kUninitialized);
     limitPositions.resize(newPoints, Orvan::kUninitialized);
@@ -199,6 +201,8 @@ void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& hal
     computeNewPoints(faces, {basePositions.data, limitPositions.data, vertexLevels.data});
     transferPointProperties(faces, newPoints, object);
     writeFaces(faces, numbering, refined);
+    MODELING_ASSERT(areOffsets(refined.faceOffset.data, newFaces, newCorners));
+    MODELING_ASSERT(areBelow(newPoints, refined.faceVertex.data, newCorners));
 
     numPoints = newPoints;
     numFaceVertices = newCorners;

@@ -3,6 +3,7 @@
 #include "faceSize.h"
 #include "refineMesh.h"
 
+#include "frame/Assert.h"
 #include "frame/Lanes.h"
 #include "frame/ParallelFor.h"
 
@@ -19,7 +20,7 @@ using TSR::TileTree3D::Traits5;
 
 namespace {
 
-    /// Of each point the mean of three equal ones, as floats give it.
+    /// The mean of each point taken three times, whose rounding is part of the results.
     void writeMeans(float3 const* points, std::size_t count, float3* means)
     {
         float const* const coordinate = &points->x;
@@ -28,16 +29,14 @@ namespace {
             mean[n] = (0 + coordinate[n] + coordinate[n] + coordinate[n]) / 3.0f;
     }
 
-    /// How long the sides of a face's box may be.
+    /// The limit on the sides of a face's box; infinite if the tolerance is too small.
     float longestSide(float tolerance)
     {
-        constexpr float kAny = std::numeric_limits<float>::infinity();
-        return tolerance > std::numeric_limits<float>::epsilon() ? tolerance + tolerance : kAny;
+        constexpr float kNoLimit = std::numeric_limits<float>::infinity();
+        return tolerance > std::numeric_limits<float>::epsilon() ? tolerance + tolerance : kNoLimit;
     }
 
-    constexpr unsigned int kPointGrain = 4096; // the tables of a copy of the sampler begin empty
-
-    /// A loop body that works with its own copy of the sampler, whose cursors and caches no two tasks share.
+    /// A loop body. Each call has its own copy of the sampler, because cursors and caches must not be shared by tasks.
     template <class Traits> struct SampleAtPoints {
         LinearSampler<Traits> const& original;
         float3 const* position;
@@ -61,7 +60,7 @@ namespace {
         }
     };
 
-    /// A face has the limit of its second corner. Not of its middle, on purpose: it does not move with the others.
+    /// A face has the limit of its second corner, not of its middle: existing scenes depend on it.
     void markFaces(float const* limit, unsigned int faceCount, float3 const* position, unsigned int const* corner,
         unsigned int const* offset, bool* mark)
     {
@@ -69,7 +68,7 @@ namespace {
         parallelFor(tbb::blocked_range<unsigned int>(0, faceCount, kFaceGrain), [=](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
                 unsigned int const* const c = corner + offset[face];
-                if (Internal::isBoxLonger(position[c[0]], position[c[1]], position[c[2]], everyLane(limit[c[1]])))
+                if (Internal::isBoxLonger(position[c[0]], position[c[1]], position[c[2]], broadcast(limit[c[1]])))
                     mark[face] = true;
             }
         });
@@ -83,12 +82,13 @@ namespace Internal {
         Orvan::Array<float3> const& positions, Orvan::Array<unsigned int> const& faceVertex,
         Orvan::Array<unsigned int> const& faceOffset, Orvan::Array<bool>& marks, float tolerance)
     {
-        // Points are the second corners of two faces on average: to look each up once is half of the work, and they
-        // come in an order that stays in a tile for longer. Each point writes its own limit.
+        // A point is the second corner of two faces on average: sampling per point is half of the work, and consecutive
+        // points are more often in the same tile. Each point writes its own limit.
+        MODELING_ASSERT(marks.size >= numFaces);
         auto const pointCount = static_cast<unsigned int>(positions.size);
         Orvan::Array<float> limits(pointCount, Orvan::kUninitialized);
         SampleAtPoints<Traits> const sampleAtPoints{sampler, positions.data, tolerance, limits.data};
-        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kPointGrain), sampleAtPoints);
+        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kSampledPointGrain), sampleAtPoints);
         markFaces(limits.data, numFaces, positions.data, faceVertex.data, faceOffset.data, marks.data);
     }
 

@@ -1,6 +1,6 @@
 #include <Modeling/VoxelSampler.h>
 
-#include "subdivision/haloTiles.h"
+#include "volume/haloTiles.h"
 
 #include "support/Volumes.h"
 
@@ -228,7 +228,7 @@ TYPED_TEST(VoxelSampling, takesRowsAsItTakesPoints)
     }
 }
 
-TYPED_TEST(VoxelSampling, mirrorsTilesThatNothingIsKnownAround)
+TYPED_TEST(VoxelSampling, mirrorsTilesWithoutNeighborsOrParent)
 {
     constexpr int kSide = TypeParam::kSide;
     Field const field = Field::random(-2 * kSide, 2 * kSide);
@@ -267,7 +267,7 @@ TYPED_TEST(VoxelSampling, mirrorsTilesThatNothingIsKnownAround)
 
 TYPED_TEST(VoxelSampling, keepsConstantsToTheBitAndLinearFieldsAcrossTiles)
 {
-    // Neighbours all around are looked for at the width of a tile of this depth.
+    // Neighbors all around are looked up at the width of a tile of this depth.
     constexpr int kDepth = std::is_same_v<TypeParam, Traits2> ? TypeParam::kUnitDepth + 1 : TypeParam::kUnitDepth;
     float const perUnit = TypeParam::voxelsPerUnit(kDepth);
     Field const constant = Field::of(-13, 14, [](int, int, int) { return kBackground; });
@@ -294,9 +294,9 @@ TYPED_TEST(VoxelSampling, keepsConstantsToTheBitAndLinearFieldsAcrossTiles)
     }
 }
 
-TEST(VoxelSampler, takesWideTilesForTheirOwnUpperNeighbours)
+TEST(VoxelSampler, readsWideTilesAsTheirOwnUpperNeighbors)
 {
-    // On purpose: the step to neighbours is half of a tile's width here.
+    // The step to neighbors is half of a tile's width here: existing volumes depend on it.
     Field const field = Field::of(-8, 8, [](int i, int, int) { return static_cast<float>(i); });
     auto const volume = volumeOf<Traits2>(field, 0, 1);
     auto sampler = samplerOf(volume, {0.5f, 0.5f, 0.5f});
@@ -305,7 +305,7 @@ TEST(VoxelSampler, takesWideTilesForTheirOwnUpperNeighbours)
     EXPECT_EQ(sampled(sampler, {1.75f, 2, 2}), 1.25f);
 }
 
-TYPED_TEST(VoxelSampling, continuesTheParentWhereNeighboursAreMissing)
+TYPED_TEST(VoxelSampling, continuesTheParentIfNeighborsAreMissing)
 {
     constexpr int kSide = TypeParam::kSide;
     for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
@@ -332,7 +332,7 @@ TYPED_TEST(VoxelSampling, continuesTheParentWhereNeighboursAreMissing)
             around[13] = tile;
             around[12] = beside; // x - 1
             for (bool const hasParent : {true, false}) {
-                fillHaloFromNeighbours<TypeParam>(
+                fillHaloFromNeighbors<TypeParam>(
                     offsetType, halo, child, around, hasParent ? parent : FullHalo<TypeParam>());
                 forEachVoxel(-1, kSide + 1, [&](int i, int j, int k) {
                     bool const isBeside = i == -1 && std::min(j, k) >= 0 && std::max(j, k) < kSide;
@@ -354,7 +354,7 @@ TEST(HaloTiles, blendTheParentInQuartersAndEighths)
     TilesAround<Traits2> around{};
     around[13] = tile;
     auto const row = [&](unsigned int offsetType) { // across y, where no tile is
-        fillHaloFromNeighbours<Traits2>(offsetType, halo, {1, 0, 0}, around, parent);
+        fillHaloFromNeighbors<Traits2>(offsetType, halo, {1, 0, 0}, around, parent);
         return std::vector<float>{halo(0, 4, 1), halo(1, 4, 1), halo(2, 4, 1), halo(3, 4, 1)};
     };
     float const a = 100, b = 10, next = 1, mean = 1.5f * 1 - 0.5f * 10; // behind: what is there, in a straight line

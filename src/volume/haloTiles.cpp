@@ -4,12 +4,12 @@
 
 // How the parent's values are blended
 //
-// Along an axis, take the parent's values a tile's width apart: one for the tile before (a), the tile itself (b) and
-// the one behind (c). With a clear bit of the offset type they stand in the middle, each the mean of the parent's
-// voxels that its tile covers; with a set bit at the lower side, each the parent's voxel at that place. For tiles of 4
-// voxels:
+// Along an axis, take the parent's values a tile's width apart: one for the previous tile (a), one for the tile itself
+// (b), and one for the next tile (c). With a clear bit of the offset type they are at the middle, each the mean of the
+// parent's voxels that its tile covers; with a set bit they are at the lower side, each the parent's voxel at that place.
+// For tiles of 4 voxels:
 //
-//                 tile before          tile            tile behind
+//                previous tile         tile             next tile
 //              |               |               |               |
 //   clear bit  |       a       |       b       |       c       |
 //              | .   .   .  -1 | 0   1   2   3 | 4   .   .   . |
@@ -23,15 +23,16 @@
 //     -1: 0.25 a + 0.75 b    0: b    1: 0.25 c + 0.75 b    2: 0.5 c + 0.5 b    3: 0.75 c + 0.25 b    4: c
 //
 // Voxel 2 of the clear axis continues the line from a through b, so that values up to there depend on two of the
-// parent's only. Tiles of 5 voxels have fifths in the same way, with b alone in the middle. Axes multiply. What the
-// parent's own halo does not reach (half of a tile before its first child, or behind its last) is a straight line.
-// Blends are written as differences, so that those of equal values are that value to the bit.
+// parent's only. Tiles of 5 voxels use fifths in the same way, with b alone in the middle. In three dimensions the blend
+// is the product of those along the axes. What the parent's own halo does not cover (half of a tile before its first
+// child, or after its last) is extrapolated linearly. Blends are written as differences, so that those of equal values
+// are that value to the bit.
 
 namespace TSR::TileTree3D::Internal {
 
 namespace {
 
-    /// The second value's share, the first one has the rest of 1.
+    /// first * (1 - share) + second * share
     struct Blend {
         int first, second;
         float share;
@@ -42,7 +43,7 @@ namespace {
         return offsetType >> axis & 1;
     }
 
-    /// A voxel from -1 to `side`, of the values of the tile before, at and behind: 0, 1, 2.
+    /// Voxel -1 to `side` as a blend of the values of the previous tile, the tile and the next tile: 0, 1, 2.
     Blend blendOfVoxel(bool atLowerSide, int side, int voxel)
     {
         auto const width = static_cast<float>(side);
@@ -55,14 +56,14 @@ namespace {
         return {1, 2, distance};
     }
 
-    /// The value a tile's width apart, `tile` tiles from the tile's own, of voxels of the parent's halo.
+    /// The value for a tile, `tile` tiles away from the child, as a blend of voxels of the parent's halo.
     template <class Traits> Blend blendOfParent(bool atLowerSide, int child, int tile)
     {
         constexpr int kCovered = Traits::kParentVoxels;
         static_assert(kCovered <= 2);
         int const first = (child + tile) * kCovered;
         int const last = first + kCovered - 1;
-        if (first < -1) // a straight line through the first two
+        if (first < -1) // extrapolates through the first two
             return {-1, 0, atLowerSide ? -1 : -0.5f};
         if (atLowerSide || kCovered == 1)
             return {first, first, 0};
@@ -71,7 +72,7 @@ namespace {
         return {first, last, 0.5f};
     }
 
-    using Triple = std::array<Blend, 3>; // one an axis
+    using Triple = std::array<Blend, 3>; // one per axis
 
     template <class ValueAt> float blended(Triple const& axes, ValueAt const& valueAt)
     {
@@ -85,7 +86,7 @@ namespace {
         return mix(alongY(axes[2].first), alongY(axes[2].second), axes[2].share);
     }
 
-    /// The parent's values a tile's width apart, for the tile and those around it.
+    /// The parent's values for the tile and those around it.
     using CoarseValues = std::array<float, 27>;
 
     int indexAround(int i, int j, int k)
@@ -109,7 +110,7 @@ namespace {
         return values;
     }
 
-    /// -1, 0 or 1: whether a coordinate of a halo tile is before the tile, inside or behind it.
+    /// -1, 0 or 1: whether a coordinate of a halo tile is below the tile, inside or above it.
     template <class Traits> int sideOf(int coordinate)
     {
         return coordinate < 0 ? -1 : coordinate >= Traits::kSide ? 1 : 0;
@@ -145,8 +146,9 @@ void fillHaloFromTile(unsigned int offsetType, float background, TileValues<Trai
         // The bits of the axes along which this voxel is outside.
         unsigned int const outside = (side.i ? 1u : 0u) | (side.j ? 2u : 0u) | (side.k ? 4u : 0u);
         float const nearest = tile(nearestInside<Traits>(i), nearestInside<Traits>(j), nearestInside<Traits>(k));
-        bool const isFirstLayer = !outside
-            && ((offsetType & 1 && i == 0) || (offsetType & 2 && j == 0) || (offsetType & 4 && k == 0)); // on purpose
+        // Existing volumes depend on it, even though it discards values of the tile.
+        bool const isFirstLayer =
+            !outside && ((offsetType & 1 && i == 0) || (offsetType & 2 && j == 0) || (offsetType & 4 && k == 0));
         if (outside & offsetType || isFirstLayer)
             out(i, j, k) = background;
         else
@@ -154,7 +156,7 @@ void fillHaloFromTile(unsigned int offsetType, float background, TileValues<Trai
     });
 }
 
-template <class Traits> void fillHaloFromNeighbours(unsigned int offsetType, FullHalo<Traits>& out, IJK child,
+template <class Traits> void fillHaloFromNeighbors(unsigned int offsetType, FullHalo<Traits>& out, IJK child,
     TilesAround<Traits> const& around, FullHalo<Traits> const& parentHalo)
 {
     constexpr int kSide = Traits::kSide;
@@ -183,9 +185,9 @@ template <class Traits> void fillHaloFromNeighbours(unsigned int offsetType, Ful
 
 template void fillHaloFromTile<Traits2>(unsigned int, float, TileValues<Traits2>, FullHalo<Traits2>&);
 template void fillHaloFromTile<Traits5>(unsigned int, float, TileValues<Traits5>, FullHalo<Traits5>&);
-template void fillHaloFromNeighbours<Traits2>(
+template void fillHaloFromNeighbors<Traits2>(
     unsigned int, FullHalo<Traits2>&, IJK, TilesAround<Traits2> const&, FullHalo<Traits2> const&);
-template void fillHaloFromNeighbours<Traits5>(
+template void fillHaloFromNeighbors<Traits5>(
     unsigned int, FullHalo<Traits5>&, IJK, TilesAround<Traits5> const&, FullHalo<Traits5> const&);
 
 }

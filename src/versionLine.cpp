@@ -10,23 +10,23 @@ namespace Modeling {
 
 namespace {
 
-    bool isVersionLineWanted()
+    bool isVersionLineRequested()
     {
-        char const* const wish = std::getenv("ZEPHRAN_DUMP_VERSION_INFO");
-        bool const isOn = wish && std::strtol(wish, nullptr, 10) != 0;
-        return isOn && ::fcntl(STDERR_FILENO, F_GETFD) != -1; // standard error may be closed, or another file by now
+        char const* const setting = std::getenv("ZEPHRAN_DUMP_VERSION_INFO");
+        bool const isOn = setting && std::strtol(setting, nullptr, 10) != 0;
+        return isOn && ::fcntl(STDERR_FILENO, F_GETFD) != -1; // standard error may be closed
     }
 
     bool writeVersionLine()
     {
-        bool const isWanted = isVersionLineWanted();
-        if (isWanted)
+        bool const isRequested = isVersionLineRequested();
+        if (isRequested)
             std::fprintf(stderr, "%16s: Tessara version %s (%s, build %s, commit %.7s, branch %s)\n", "Modeling",
                 BuildInfo::kVersion, BuildInfo::kDate, BuildInfo::kBuildNumber, BuildInfo::kCommit, BuildInfo::kBranch);
-        return isWanted;
+        return isRequested;
     }
 
-    // Once, when the library is loaded: support asks for this line to tell which build a host has taken.
+    // Once, when the library is loaded: the line tells support which build a host is using.
     [[maybe_unused]] bool const hasWrittenVersionLine = writeVersionLine();
 
 }

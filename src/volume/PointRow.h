@@ -6,14 +6,14 @@
 #include <cstddef>
 #include <cstdint>
 
-/// Samples of a row of points, in phases of four points at a time: where the points are; which of them share a tile;
-/// and the values. Finding the tiles is left to the caller, before the last phase: how long points stay in a tile is
-/// unpredictable, and a phase of its own keeps those branches out of the others.
+/// Samples a row of points in phases that take four points at a time: where the points are, which of them share a tile,
+/// and their values. Finding the tiles is left to the caller, before the last phase: how many points follow one another
+/// in a tile is unpredictable, and a phase of its own keeps those branches out of the others.
 namespace TSR::TileTree3D::Internal {
 
 struct PointRow {
     static constexpr std::size_t kCapacity = 128;
-    static constexpr std::size_t kFirstTile = 4; // there is no tile before
+    static constexpr std::size_t kFirstTile = 4; // nothing precedes it, but four lanes are read from one before it
 
     // The place of each point in its tile, in voxels.
     float x[kCapacity], y[kCapacity], z[kCapacity];
@@ -36,17 +36,17 @@ struct PointRow {
     }
 };
 
-/// How points become places in tiles.
+/// How points are mapped to places in tiles.
 struct Placing {
     float scale;
-    float tileWidth; // up to `kWidestTile`
+    float tileWidth; // at most `kWidestTile`
     float voxelsPerUnit;
-    Tessara::Math::float3 offset; // in voxels, finite, up to `kLargestOffset`
+    Tessara::Math::float3 offset; // in voxels, finite, at most `kLargestOffset`
 };
 
 /// The widest tiles that points are placed in.
 constexpr float kWidestTile = 0x1p23f;
-/// Larger ones would place points below the layer around a tile.
+/// A larger one would place points below the layer around a tile.
 constexpr float kLargestOffset = 1;
 
 constexpr float kBelowTile = 1e-5f; // voxels; how far rounding can put a point below the tile that contains it
@@ -54,8 +54,8 @@ constexpr float kBelowTile = 1e-5f; // voxels; how far rounding can put a point 
 /// The arrays that runs read: index 0 for runs that need no layer, 1 for those that do.
 struct TileArrays {
     int side[2];
-    int lowestVoxel; // 0, or -1 if there is a layer on the lower sides; points below that read it instead
-    int lastVoxel; // points beyond it are blended from it and the next one, however far they are
+    int lowestVoxel; // 0, or -1 if there is a layer on the lower sides; places below it are read from it
+    int lastVoxel; // places beyond it are blended from it and the next voxel, however far they are
 };
 
 /// \pre     `count` is a multiple of 4, here and below
@@ -65,10 +65,11 @@ bool placePoints(Tessara::Math::float3 const* points, std::size_t count, Placing
 /// Starts a run at each point whose tile differs from the one before. \return the number of runs
 std::size_t findRuns(std::size_t count, PointRow& row);
 
-/// Places from `begin` up to `end` along all axes read voxels of their own tile only.
+/// Finds the runs that need the layer: those with a place outside of [begin, end) along some axis.
 void findLayers(std::size_t count, float begin, float end, PointRow& row);
 
-/// \tparam onlySide  That of all arrays if no place is below its tile; 0 to read `arrays.side`, wherever places are.
+/// Blends the values of all points.
+/// \tparam onlySide  The side of all arrays if no place is below its tile; 0 to read `arrays.side`, for all places.
 template <int onlySide>
 void interpolateRow(std::size_t count, TileArrays const& arrays, PointRow const& row, float* values);
 

@@ -11,22 +11,12 @@ using Tessara::Math::float3;
 
 namespace {
 
-    Lanes lowest(Lanes a, Lanes b)
-    {
-        return a < b ? a : b;
-    }
-
-    Lanes highest(Lanes a, Lanes b)
-    {
-        return a > b ? a : b;
-    }
-
-    /// Where the tile begins that contains a coordinate. \param perWidth  perhaps rounded
+    /// The lower side of the tile that contains a coordinate. \param perWidth  1 / width, perhaps rounded
     Lanes tileBegin(Lanes p, Lanes width, Lanes perWidth)
     {
-        Lanes const round = everyLane(0x1.8p23f); // a sum with it has no fraction
+        Lanes const round = broadcast(0x1.8p23f); // adding it rounds the fraction away
         Lanes const nearest = (p * perWidth + round - round) * width;
-        return nearest - lanesWhere(nearest > p, width);
+        return nearest - selectOrZero(nearest > p, width);
     }
 
     /// The two values at each address.
@@ -44,7 +34,7 @@ namespace {
         return (to - from) * fraction + from;
     }
 
-    /// Along x, between the two values at each of four addresses.
+    /// Blends along x, between the two values at each of four addresses.
     Lanes blendPairs(float const* const (&corners)[4], Lanes fraction)
     {
         Lanes const ab = loadPairs(corners[0], corners[1]);
@@ -57,15 +47,15 @@ namespace {
         Lanes voxel, fraction;
     };
 
-    /// Places in a tile as voxel and fraction, from -1 on.
+    /// Cuts places in a tile into voxel, at least -1, and fraction.
     template <bool canBeBelow> Coordinates coordinatesOf(Lanes place, Lanes lastVoxel)
     {
-        Lanes const inside = lowest(highest(place, Lanes{}), lastVoxel);
+        Lanes const inside = min(max(place, Lanes{}), lastVoxel);
         IntLanes const voxel = __builtin_convertvector(inside, IntLanes);
         if constexpr (canBeBelow) {
-            IntLanes const isBelow = place <= everyLane(-kBelowTile);
+            IntLanes const isBelow = place <= broadcast(-kBelowTile);
             Lanes const lower = __builtin_convertvector(voxel + isBelow, Lanes);
-            return {lower, lanesWhere(isBelow | (place >= Lanes{}), place - lower)};
+            return {lower, selectOrZero(isBelow | (place >= Lanes{}), place - lower)};
         } else {
             Lanes const lower = __builtin_convertvector(voxel, Lanes);
             return {lower, place - lower};
@@ -76,21 +66,20 @@ namespace {
 
 bool placePoints(float3 const* points, std::size_t count, Placing const& placing, PointRow& row)
 {
-    Lanes const width = everyLane(placing.tileWidth), perWidth = everyLane(1 / placing.tileWidth);
-    Lanes const farthest = everyLane(0x1p22f); // up to there all is exact
-    IntLanes const noSign = IntLanes{} + INT32_MAX;
+    Lanes const width = broadcast(placing.tileWidth), perWidth = broadcast(1 / placing.tileWidth);
+    Lanes const farthest = broadcast(0x1p22f); // up to here all steps are exact
     IntLanes areNear = ~IntLanes{};
     auto const place = [&](Lanes four, float offset, float* tile, float* places) {
-        Lanes const p = four * everyLane(placing.scale);
-        areNear &= lanesWhere(noSign, p) <= farthest;
+        Lanes const p = four * broadcast(placing.scale);
+        areNear &= Modeling::abs(p) <= farthest;
         Lanes const begin = tileBegin(p, width, perWidth);
-        Lanes const inTile = (p - begin) * everyLane(placing.voxelsPerUnit) - everyLane(offset);
-        storeLanes(begin, tile + PointRow::kFirstTile);
-        storeLanes(inTile, places);
+        Lanes const inTile = (p - begin) * broadcast(placing.voxelsPerUnit) - broadcast(offset);
+        store(begin, tile + PointRow::kFirstTile);
+        store(inTile, places);
     };
     for (std::size_t n = 0; n < count; n += 4) {
         float const* const first = &points[n].x;
-        Lanes const a = loadLanes(first), b = loadLanes(first + 4), c = loadLanes(first + 8);
+        Lanes const a = load(first), b = load(first + 4), c = load(first + 8);
         Lanes const yz01 = __builtin_shufflevector(a, b, 1, 2, 4, 5),
                     xy2zx3 = __builtin_shufflevector(b, c, 2, 3, 4, 5);
         Lanes const y23 = __builtin_shufflevector(b, c, 3, 3, 6, 6);
@@ -99,7 +88,7 @@ bool placePoints(float3 const* points, std::size_t count, Placing const& placing
         place(__builtin_shufflevector(yz01, y23, 0, 2, 4, 6), offset.y, row.tileY + n, row.y + n);
         place(__builtin_shufflevector(yz01, c, 1, 3, 4, 7), offset.z, row.tileZ + n, row.z + n);
     }
-    return areAll(areNear);
+    return all(areNear);
 }
 
 std::size_t findRuns(std::size_t count, PointRow& row)
@@ -109,11 +98,9 @@ std::size_t findRuns(std::size_t count, PointRow& row)
     row.tileY[kFirst - 1] = row.tileZ[kFirst - 1] = 0;
     std::uint32_t run = ~std::uint32_t{0};
     for (std::size_t n = 0; n < count; n += 4) {
-        auto const differs = [n](float const* tile) {
-            return loadLanes(tile + kFirst + n - 1) != loadLanes(tile + kFirst + n);
-        };
+        auto const differs = [n](float const* tile) { return load(tile + kFirst + n - 1) != load(tile + kFirst + n); };
         std::int32_t isNew[4]; // -1 if it is
-        storeLanes(differs(row.tileX) | differs(row.tileY) | differs(row.tileZ), isNew);
+        store(differs(row.tileX) | differs(row.tileY) | differs(row.tileZ), isNew);
         for (std::size_t k = 0; k < 4; ++k) {
             run -= static_cast<std::uint32_t>(isNew[k]);
             row.run[n + k] = run;
@@ -127,11 +114,10 @@ std::size_t findRuns(std::size_t count, PointRow& row)
 void findLayers(std::size_t count, float begin, float end, PointRow& row)
 {
     for (std::size_t n = 0; n < count; n += 4) {
-        Lanes const x = loadLanes(row.x + n), y = loadLanes(row.y + n), z = loadLanes(row.z + n);
-        IntLanes const isInside =
-            (lowest(lowest(x, y), z) >= everyLane(begin)) & (highest(highest(x, y), z) < everyLane(end));
+        Lanes const x = load(row.x + n), y = load(row.y + n), z = load(row.z + n);
+        IntLanes const isInside = (min(min(x, y), z) >= broadcast(begin)) & (max(max(x, y), z) < broadcast(end));
         std::int32_t isOutside[4];
-        storeLanes(isInside + 1, isOutside);
+        store(isInside + 1, isOutside);
         for (std::size_t k = 0; k < 4; ++k)
             row.needsLayer[row.run[n + k]] |= static_cast<std::uint32_t>(isOutside[k]);
     }
@@ -141,22 +127,22 @@ template <int onlySide>
 void interpolateRow(std::size_t count, TileArrays const& arrays, PointRow const& row, float* values)
 {
     constexpr bool kIsPadded = onlySide != 0;
-    Lanes const lowestVoxel = everyLane(static_cast<float>(arrays.lowestVoxel));
-    Lanes const lastVoxel = everyLane(static_cast<float>(arrays.lastVoxel));
+    Lanes const lowestVoxel = broadcast(static_cast<float>(arrays.lowestVoxel));
+    Lanes const lastVoxel = broadcast(static_cast<float>(arrays.lastVoxel));
     for (std::size_t n = 0; n < count; n += 4) {
         std::uint32_t const* const run = row.run + n;
         int side[4];
         for (std::size_t k = 0; k < 4; ++k)
             side[k] = kIsPadded ? onlySide : arrays.side[row.needsLayer[run[k]]];
-        Coordinates const x = coordinatesOf<!kIsPadded>(loadLanes(row.x + n), lastVoxel);
-        Coordinates const y = coordinatesOf<!kIsPadded>(loadLanes(row.y + n), lastVoxel);
-        Coordinates const z = coordinatesOf<!kIsPadded>(loadLanes(row.z + n), lastVoxel);
-        auto const readVoxel = [&](Lanes voxel) { return kIsPadded ? voxel : highest(voxel, lowestVoxel); };
+        Coordinates const x = coordinatesOf<!kIsPadded>(load(row.x + n), lastVoxel);
+        Coordinates const y = coordinatesOf<!kIsPadded>(load(row.y + n), lastVoxel);
+        Coordinates const z = coordinatesOf<!kIsPadded>(load(row.z + n), lastVoxel);
+        auto const readVoxel = [&](Lanes voxel) { return kIsPadded ? voxel : max(voxel, lowestVoxel); };
         Lanes const i = readVoxel(x.voxel), j = readVoxel(y.voxel), k = readVoxel(z.voxel);
-        Lanes const perRow = kIsPadded ? everyLane(onlySide)
+        Lanes const perRow = kIsPadded ? broadcast(onlySide)
                                        : __builtin_convertvector(IntLanes{side[0], side[1], side[2], side[3]}, Lanes);
         std::int32_t index[4];
-        storeLanes(__builtin_convertvector(i + (j + k * perRow) * perRow, IntLanes), index);
+        store(__builtin_convertvector(i + (j + k * perRow) * perRow, IntLanes), index);
         float const* const near[4] = {row.values[run[0]] + index[0], row.values[run[1]] + index[1],
             row.values[run[2]] + index[2], row.values[run[3]] + index[3]};
         float const* const far[4] = {near[0] + side[0] * side[0], near[1] + side[1] * side[1],
@@ -166,7 +152,7 @@ void interpolateRow(std::size_t count, TileArrays const& arrays, PointRow const&
                 corners[0] + side[0], corners[1] + side[1], corners[2] + side[2], corners[3] + side[3]};
             return blendLanes(blendPairs(corners, x.fraction), blendPairs(next, x.fraction), y.fraction);
         };
-        storeLanes(blendLanes(layer(near), layer(far), z.fraction), values + n);
+        store(blendLanes(layer(near), layer(far), z.fraction), values + n);
     }
 }
 

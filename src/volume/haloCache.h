@@ -1,0 +1,63 @@
+#pragma once
+
+#include "haloTiles.h"
+
+#include <Modeling/detail/VoxelSamplerState.h>
+
+#include <TessaraGeometryVolume/HaloTile.h>
+
+#include <algorithm>
+#include <cstdint>
+
+/// Layers around tiles: how they are filled, and the last one of each depth, which single samples read.
+namespace TSR::TileTree3D::Internal {
+
+inline int clampedIndex(std::int64_t index)
+{
+    return static_cast<int>(std::clamp<std::int64_t>(index, INT32_MIN, INT32_MAX));
+}
+
+/// Fills the layer from the volume. A tile whose parent has data needs the parent's layer, which is put into the caches.
+template <class Traits> void fillHalo(
+    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, PositiveHalo<Traits>& halo);
+template <class Traits> void fillHalo(
+    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, FullHalo<Traits>& halo);
+
+template <class Traits, class Cache>
+std::uint32_t findHalo(LinearSamplerState<Traits>& state, std::uint64_t key, int depth, Cache& cache)
+{
+    auto const slot = static_cast<std::uint32_t>(depth);
+    if (state.lastKey[slot] == key)
+        return state.lastSlot[slot];
+    if (cache.empty() || cache[slot].key != key)
+        return LinearSamplerState<Traits>::kNoSlot;
+    cache[slot].stamp = state.stamp;
+    state.lastKey[slot] = key;
+    return state.lastSlot[slot] = slot;
+}
+
+template <class Traits, class Cache> std::uint32_t buildHalo(
+    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, Cache& cache)
+{
+    if (cache.empty())
+        cache = Cache(Traits::kDepthCount);
+    auto const number = static_cast<std::uint32_t>(tile.depth);
+    auto& slot = cache[number];
+    slot.stamp = state.stamp;
+    fillHalo(state, tile, slot.values);
+    slot.key = tile.index;
+    state.lastKey[number] = slot.key;
+    return state.lastSlot[number] = number;
+}
+
+/// The tile with its layer. \param cache  one of the two of `state`
+template <class Traits, class Cache>
+auto const& haloOf(LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, Cache& cache)
+{
+    std::uint32_t slot = findHalo(state, tile.index, tile.depth, cache);
+    if (slot == LinearSamplerState<Traits>::kNoSlot)
+        slot = buildHalo(state, tile, cache);
+    return cache[slot].values;
+}
+
+}

@@ -1,0 +1,188 @@
+#include "sampleRow.h"
+
+#include "KnownTiles.h"
+#include "haloCache.h"
+#include "interpolate.h"
+
+#include "frame/Assert.h"
+
+#include <algorithm>
+#include <cmath>
+#include <memory>
+
+namespace TSR::TileTree3D::Internal {
+
+namespace {
+
+    constexpr float kNothingAround[7 * 7 * 7] = {}; // read for points without values, then overwritten
+    constexpr float const* kNothing = kNothingAround + firstInLayer(7);
+
+    /// Finds the values for each run of a row.
+    template <class Traits> class TileFinder {
+    public:
+        using TileType = typename Container<Traits>::TileType;
+
+        TileFinder(LinearSamplerState<Traits>& state, RowSettings const& settings, float3 const* points, PointRow& row)
+            : state_(state)
+            , settings_(settings)
+            , points_(points)
+            , row_(row)
+        {
+            if (!state.knownTiles)
+                state.knownTiles = std::make_unique<KnownTiles<Traits>>();
+        }
+
+        /// Gives each run its values. Known tiles come first, without an unpredictable branch.
+        /// \return  the number of runs whose tiles hold no data
+        std::size_t findTiles(std::size_t runCount)
+        {
+            KnownTiles<Traits>& knownTiles = *state_.knownTiles;
+            int const depth = settings_.depth;
+            knownTiles.makeRoomForHalos(runCount);
+            std::size_t openCount = 0;
+            for (std::size_t run = 0; run < runCount; ++run) {
+                IJK const index = row_.tileOfRun(run);
+                KnownTile<Traits> const& known = knownTiles.at(index, depth);
+                row_.values[run] = known.values[row_.needsLayer[run]];
+                row_.open[openCount] = static_cast<std::uint32_t>(run);
+                bool const isFound = known.isOf(index, depth) & (row_.values[run] != nullptr);
+                openCount += isFound ? 0 : 1;
+            }
+            std::size_t emptyCount = 0;
+            for (std::size_t n = 0; n < openCount; ++n) {
+                std::uint32_t const run = row_.open[n];
+                row_.values[run] = findValues(run);
+                row_.empty[emptyCount] = run;
+                emptyCount += row_.values[run] == kNothing ? 1 : 0;
+            }
+            return emptyCount;
+        }
+
+    private:
+        float const* findValues(std::size_t run)
+        {
+            KnownTile<Traits>* known = &knownTile(row_.tileOfRun(run), settings_.depth);
+            if (!known->hasData)
+                return kNothing;
+            TileType const tile = known->tile; // a copy, because the entry may be replaced
+            if (tile.depth != settings_.depth) {
+                placeInTile(run, tile);
+                // The outermost tiles begin below 32-bit indices.
+                known = &knownTile({clampedIndex(tile.i), clampedIndex(tile.j), clampedIndex(tile.k)}, tile.depth);
+            }
+            float const*& values = known->values[row_.needsLayer[run]];
+            if (!values)
+                values = buildLayeredValues(tile);
+            return values;
+        }
+
+        KnownTile<Traits>& knownTile(IJK index, int depth)
+        {
+            KnownTile<Traits>& known = state_.knownTiles->at(index, depth);
+            if (!known.isOf(index, depth)) {
+                TileType const& tile = state_.neighbors.tileImpl(index.i, index.j, index.k, depth);
+                float const* const values = state_.valuesOf(tile);
+                known = {index, depth, tile, values != nullptr, {tile.depth == depth ? values : nullptr, nullptr}};
+            }
+            return known;
+        }
+
+        /// Places the points of a run in a coarser tile than the one that was asked for.
+        void placeInTile(std::size_t run, TileType const& tile)
+        {
+            constexpr int kSide = Traits::kSide;
+            bool const isPositive = state_.hasPositiveHalos();
+            float const voxelsPerUnit = Traits::voxelsPerUnit(tile.depth);
+            float3 const& offset = settings_.voxelOffset;
+            bool isInside = true;
+            auto const place = [&](float coordinate, std::int64_t begin, float shift) {
+                // A float may not hold where a wide tile begins.
+                auto const distance =
+                    static_cast<float>(static_cast<double>(coordinate * settings_.scale) - static_cast<double>(begin));
+                float const inTile = distance * voxelsPerUnit - shift;
+                isInside &= inTile < kSide - 1 && (isPositive || inTile >= 1);
+                return inTile;
+            };
+            for (std::size_t n = row_.first(run); n <= row_.last[run]; ++n) {
+                row_.x[n] = place(points_[n].x, tile.i, offset.x);
+                row_.y[n] = place(points_[n].y, tile.j, offset.y);
+                row_.z[n] = place(points_[n].z, tile.k, offset.z);
+            }
+            row_.needsLayer[run] = isInside || state_.haloChannel ? 0 : 1;
+        }
+
+        float const* buildLayeredValues(TileType const& tile)
+        {
+            KnownTiles<Traits>& knownTiles = *state_.knownTiles;
+            auto const build = [&](auto& halos) {
+                if (knownTiles.haloCount == halos.size())
+                    halos.emplace_back();
+                auto& halo = halos[knownTiles.haloCount];
+                fillHalo(state_, tile, halo);
+                ++knownTiles.haloCount;
+                return halo.values();
+            };
+            if (state_.hasPositiveHalos())
+                return build(knownTiles.positiveHalos);
+            return build(knownTiles.fullHalos) + firstInLayer(Traits::kSide + 2);
+        }
+
+        LinearSamplerState<Traits>& state_;
+        RowSettings const& settings_;
+        float3 const* points_;
+        PointRow& row_;
+    };
+
+    float largestCoordinate(float3 const& v)
+    {
+        return std::max({v.x, v.y, v.z});
+    }
+
+}
+
+template <class Traits> bool fitsRows(RowSettings const& settings) noexcept
+{
+    float3 const& offset = settings.voxelOffset;
+    return settings.depth >= 0 && static_cast<float>(Traits::tileWidth(settings.depth)) <= kWidestTile
+        && std::isfinite(offset.x) && std::isfinite(offset.y) && std::isfinite(offset.z)
+        && largestCoordinate(offset) <= kLargestOffset;
+}
+
+template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSettings const& settings,
+    float3 const* points, std::size_t count, float* values)
+{
+    constexpr int kSide = Traits::kSide;
+    MODELING_ASSERT(count <= PointRow::kCapacity && count % 4 == 0 && fitsRows<Traits>(settings));
+    PointRow row;
+    bool const areNear = placePoints(points, count,
+        {settings.scale, static_cast<float>(Traits::tileWidth(settings.depth)), Traits::voxelsPerUnit(settings.depth),
+            settings.voxelOffset},
+        row);
+    if (!areNear)
+        return false;
+    std::size_t const runCount = findRuns(count, row);
+    bool const isPadded = state.haloChannel, isPositive = isPadded || state.hasPositiveHalos();
+    if (!isPadded)
+        findLayers(count, isPositive ? -kLargestOffset : 1, kSide - 1, row);
+    std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
+    MODELING_ASSERT(std::none_of(row.values, row.values + runCount, [](float const* v) { return v == nullptr; }));
+    MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);
+    int const padded = kSide + (isPositive ? 1 : 2);
+    TileArrays const arrays{{isPadded ? padded : kSide, padded}, isPositive ? 0 : -1, kSide - 1};
+    if (isPadded && largestCoordinate(settings.voxelOffset) <= 0)
+        interpolateRow<kSide + 1>(count, arrays, row, values);
+    else
+        interpolateRow<0>(count, arrays, row, values);
+    for (std::size_t n = 0; n < emptyCount; ++n) {
+        std::uint32_t const run = row.empty[n];
+        std::fill(values + row.first(run), values + row.last[run] + 1, state.background);
+    }
+    return true;
+}
+
+template bool fitsRows<Traits2>(RowSettings const&) noexcept;
+template bool fitsRows<Traits5>(RowSettings const&) noexcept;
+template bool sampleRow(LinearSamplerState<Traits2>&, RowSettings const&, float3 const*, std::size_t, float*);
+template bool sampleRow(LinearSamplerState<Traits5>&, RowSettings const&, float3 const*, std::size_t, float*);
+
+}
