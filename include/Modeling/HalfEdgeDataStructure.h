@@ -39,12 +39,12 @@ struct HalfEdge {
 /// during construction for points of high valence and for repeated edges.
 class HalfEdgeDataStructure {
 public:
-    struct Neighbour {
+    struct Neighbor {
         unsigned int point; ///< where the edge starts
         HalfEdge halfEdge;
     };
     class Iterator;
-    class Neighbours;
+    class Neighbors;
 
     /// `numPoints` points and no edges.
     /// \throws std::bad_alloc
@@ -71,7 +71,7 @@ public:
     std::uint64_t size() const { return entries_.size; }
 
     /// The directed edges that end at the point, in ascending order of the points at which they start.
-    Neighbours neighbours(unsigned int point) const;
+    Neighbors neighbors(unsigned int point) const;
 
     /// Removes all points and edges: no query about a point is valid afterwards.
     MODELING_EXPORT void clear() noexcept;
@@ -120,14 +120,14 @@ private:
 class HalfEdgeDataStructure::Iterator {
 public:
     using iterator_category = std::input_iterator_tag;
-    using value_type = Neighbour;
+    using value_type = Neighbor;
     using difference_type = std::ptrdiff_t;
     using pointer = void;
-    using reference = Neighbour;
+    using reference = Neighbor;
 
     Iterator() = default;
 
-    Neighbour operator*() const { return {startOf(*entry_), edges_->recordOf(*entry_)}; }
+    Neighbor operator*() const { return {startOf(*entry_), edges_->recordOf(*entry_)}; }
     Iterator& operator++()
     {
         ++entry_;
@@ -153,10 +153,10 @@ private:
     std::uint64_t const* entry_ = nullptr;
 };
 
-/// A range for `for (auto const& [point, halfEdge] : edges.neighbours(p))`; the structure has to outlive it.
-class HalfEdgeDataStructure::Neighbours {
+/// A range for `for (auto const& [point, halfEdge] : edges.neighbors(p))`; the structure has to outlive it.
+class HalfEdgeDataStructure::Neighbors {
 public:
-    Neighbours(Iterator first, Iterator last)
+    Neighbors(Iterator first, Iterator last)
         : first_(first)
         , last_(last)
     {
@@ -168,7 +168,7 @@ private:
     Iterator first_, last_;
 };
 
-inline HalfEdgeDataStructure::Neighbours HalfEdgeDataStructure::neighbours(unsigned int point) const
+inline HalfEdgeDataStructure::Neighbors HalfEdgeDataStructure::neighbors(unsigned int point) const
 {
     return {Iterator(*this, entries_.data + offsets_[point]),
         Iterator(*this, entries_.data + offsets_[std::uint64_t{point} + 1])};

@@ -113,7 +113,7 @@ namespace {
             return isChanged.load(std::memory_order_relaxed);
         }
 
-        FaceNeighbors takeNeighbors() { return std::move(neighbors_); }
+        FaceAdjacency takeNeighbors() { return std::move(neighbors_); }
 
     private:
         bool settleFaces(unsigned int first, unsigned int last)
@@ -168,7 +168,7 @@ namespace {
         Orvan::Array<unsigned char> current_; // of the previous sweep
         Orvan::Array<unsigned char> isDue_, isDueNext_; // faces to visit
         Orvan::Array<unsigned char> hasNeighbors_;
-        FaceNeighbors neighbors_;
+        FaceAdjacency neighbors_;
     };
 
     /// True if all faces are triangles and no directed edge is repeated, as on closed manifolds.
@@ -181,7 +181,7 @@ namespace {
 
     /// What the rows of the refinement's neighbor table assume: a face that splits around a point has no coarser neighbor.
     [[maybe_unused]] bool splitOnlyBesideFinerOrEqual(
-        unsigned int faceCount, FaceNeighbors const& neighbors, Orvan::Array<unsigned char> const& states)
+        unsigned int faceCount, FaceAdjacency const& neighbors, Orvan::Array<unsigned char> const& states)
     {
         for (unsigned int face = 0; face != faceCount; ++face) {
             if (!isSplitAroundPoint(states[face]))
@@ -200,7 +200,7 @@ namespace {
 
 }
 
-FaceNeighbors balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
+FaceAdjacency balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<unsigned char>& faceStates)
 {
@@ -215,7 +215,7 @@ FaceNeighbors balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned
         faceOffset.data, faceStates.data);
     balance.prepare();
     while (balance.sweep()) { }
-    FaceNeighbors neighbors = balance.takeNeighbors();
+    FaceAdjacency neighbors = balance.takeNeighbors();
     MODELING_ASSERT(splitOnlyBesideFinerOrEqual(numFaces, neighbors, faceStates));
     return neighbors;
 }
