@@ -1,5 +1,7 @@
 #include "MeshArrays.h"
 
+#include "frame/Assert.h"
+
 #include <TessaraGeometry/Elements.h>
 
 #include <utility>
@@ -24,14 +26,17 @@ MeshArrays readMeshArrays(Tessara::Object const& object)
 void writeMeshArrays(MeshArrays&& mesh, PreparedWrites& writes)
 {
     if (mesh.positions) {
+        MODELING_ASSERT(mesh.positions->size >= mesh.pointCount);
         writes.setElementCount(sPointComp, mesh.pointCount);
         writes.writeGeoPropData(sPointPosition, std::move(mesh.positions));
     }
     if (mesh.faceVertex) {
+        MODELING_ASSERT(mesh.faceVertex->size >= mesh.cornerCount);
         writes.setElementCount(sFaceVertexComp, mesh.cornerCount);
         writes.writeGeoPropData(sFaceVertex, std::move(mesh.faceVertex));
     }
     if (mesh.faceOffset) {
+        MODELING_ASSERT(mesh.faceOffset->size > mesh.faceCount);
         writes.setElementCount(sFaceComp, mesh.faceCount);
         writes.writeGeoPropData(sFaceOffset, std::move(mesh.faceOffset));
     }
