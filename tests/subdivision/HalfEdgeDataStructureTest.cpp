@@ -59,7 +59,7 @@ TEST(HalfEdgeDataStructure, agreesWithAMapForEachPoint)
         Edges expected(pointCount);
         for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
             unsigned int const first = mesh.faceOffset[face], size = mesh.faceOffset[face + 1] - first;
-            for (unsigned int i = 0; i != size; ++i) // of equal edges the lowest face and corner
+            for (unsigned int i = 0; i != size; ++i) // of repeated edges the one with the lowest face and corner
                 expected[mesh.faceVertex[first + i]].try_emplace(mesh.faceVertex[first + (i + size - 1) % size],
                     HalfEdge{face, static_cast<unsigned char>(i), static_cast<unsigned char>(size)});
         }
@@ -71,7 +71,7 @@ TEST(HalfEdgeDataStructure, agreesWithAMapForEachPoint)
     }
 }
 
-TEST(HalfEdgeDataStructure, findsOpenEdgesOfTriangles)
+TEST(HalfEdgeDataStructure, findsBoundaryEdgesOfTriangles)
 {
     EXPECT_FALSE(hasBoundary(MeshBuilder::tetrahedron().polygons()));
     EXPECT_FALSE(hasBoundary({}));

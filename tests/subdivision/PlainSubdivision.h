@@ -10,7 +10,7 @@ namespace TestSupport {
 
 using namespace Modeling;
 
-/// Of the box around a face, along the axes.
+/// Of the axis-aligned box around a face.
 inline float largestSide(MeshBuilder::Triangle const& face, std::vector<float3> const& points)
 {
     float side = 0;
@@ -21,8 +21,7 @@ inline float largestSide(MeshBuilder::Triangle const& face, std::vector<float3> 
     return side;
 }
 
-/// The operation once more, written plainly: maps, every sweep over all faces, and no step left out. For meshes of
-/// triangles.
+/// A plain reference for the operation: maps, every sweep over all faces, and no shortcuts. For triangle meshes.
 class PlainSubdivision {
 public:
     using Triangle = MeshBuilder::Triangle;
@@ -35,8 +34,8 @@ public:
     {
         rebuild();
         for (unsigned int v = 0; v != positions.size(); ++v) {
-            auto const n = static_cast<float>(neighbours_[v].size());
-            float3 const sum = sumOf(neighbours_[v], [this](unsigned int u) { return positions[u]; });
+            auto const n = static_cast<float>(neighbors_[v].size());
+            float3 const sum = sumOf(neighbors_[v], [this](unsigned int u) { return positions[u]; });
             points_.push_back({positions[v], limit(positions[v], sum, beta(n), n), 0});
         }
     }
@@ -72,7 +71,7 @@ public:
             positions[v] = at(v, finest_[v] >> 1);
     }
 
-    static constexpr unsigned int kFinestLevel = 62; // which takes no mark: 64 does not fit the bits
+    static constexpr unsigned int kFinestLevel = 62; // cannot be marked: 64 does not fit the bits
     unsigned int level(std::size_t f) const { return states[f] >> 2; }
 
     std::vector<Triangle> faces;
@@ -112,7 +111,7 @@ private:
 
     float3 at(unsigned int v, unsigned int h) const
     {
-        float const lambda = 0.6666667f - beta(static_cast<float>(neighbours_[v].size()));
+        float const lambda = 0.6666667f - beta(static_cast<float>(neighbors_[v].size()));
         float const w = std::pow(lambda, static_cast<float>(h - points_[v].level));
         return points_[v].limit * (1 - w) + points_[v].base * w;
     }
@@ -202,20 +201,20 @@ private:
     void rebuild()
     {
         owners_.clear();
-        neighbours_.assign(positions.size(), {});
+        neighbors_.assign(positions.size(), {});
         finest_.assign(positions.size(), 0);
         for (unsigned int f = 0; f != faces.size(); ++f)
             for (unsigned int k = 0; k != 3; ++k) {
                 unsigned int const end = faces[f][k], start = faces[f][(k + 2) % 3];
                 if (owners_.try_emplace({start, end}, Owner{f, k}).second)
                     finest_[end] = std::max(finest_[end], level(f));
-                neighbours_[end].insert(start);
+                neighbors_[end].insert(start);
             }
     }
 
     std::vector<Point> points_;
     std::map<std::pair<unsigned int, unsigned int>, Owner> owners_; // of directed edges, with the corner at their end
-    std::vector<std::set<unsigned int>> neighbours_;
+    std::vector<std::set<unsigned int>> neighbors_;
     std::vector<unsigned int> finest_; // the highest level of a face at each point
 };
 

@@ -13,7 +13,7 @@ using Geometry::Mesh::subdivide;
 
 namespace {
 
-constexpr float kScale = 10; // voxels a unit
+constexpr float kScale = 10; // voxels per unit
 
 template <class> class SubdivideByVolume : public testing::Test {
 };
@@ -23,7 +23,7 @@ TYPED_TEST_SUITE(SubdivideByVolume, Layouts);
 /// A field of constant value, or one that grows with x, around the origin.
 template <class Traits> Volume<Traits> volumeOf(float atCentre, float perUnit, float background)
 {
-    constexpr int kReach = 13; // the unit ball and a voxel more, up to where neighbours end
+    constexpr int kReach = 13; // the unit ball and a voxel more, where neighbors end
     Field const field = Field::of(
         -kReach, kReach, [=](int i, int, int) { return atCentre + perUnit * static_cast<float>(i) / kScale; });
     return buildVolume<Traits>({.background = background, .depth = Traits::kUnitDepth, .block = field.block()});
@@ -63,7 +63,7 @@ template <class Traits> std::vector<bool> marksOf(
 
 }
 
-TYPED_TEST(SubdivideByVolume, doesWithAConstantVolumeWhatALengthDoes)
+TYPED_TEST(SubdivideByVolume, equalsSubdivideIfTheVolumeIsConstant)
 {
     for (auto const& builder : {MeshBuilder::sphere(6).withNoise(0.05f, 3).shuffled(4), MeshBuilder::torus(9, 7)}) {
         auto const volume = volumeOf<TypeParam>(0.3f, 0, 0.3f);
@@ -117,10 +117,10 @@ TYPED_TEST(SubdivideByVolume, leavesFacesAloneWithoutAPositiveTolerance)
     EXPECT_EQ(marksOf(samplerOf(empty), *far.build(), 1), none) << "background";
     far.points[sphere.faces[5][1]].y = kNan;
     EXPECT_EQ(marksOf(samplerOf(positive), *far.build(), 1)[5], true)
-        << "its other corners are apart, and the background counts";
+        << "its other corners are far apart, and the background applies";
     EXPECT_EQ(marksOf(samplerOf(positive), *MeshBuilder::of({}, {}).build(), 1), std::vector<bool>());
     auto wide = sphere;
-    wide.points[sphere.faces[5][1]].x = 2e38f; // the sum of three is infinite, and so is their mean
+    wide.points[sphere.faces[5][1]].x = 2e38f; // the sum of three is infinite, so the mean is too
     LinearSampler<TypeParam> const tiny(
         empty.container, empty.channel, empty.topology, {.scale = 1e-38f, .background = 0});
     EXPECT_EQ(marksOf(tiny, *wide.build(), 1)[5], false);
@@ -143,7 +143,7 @@ TYPED_TEST(SubdivideByVolume, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompi
     EXPECT_EQ(fingerprint(*refined()), 12192136266283760578u) << "unlike other builds";
 }
 
-TYPED_TEST(SubdivideByVolume, endsAtTheFinestLevelTowardsPlacesOfNoTolerance)
+TYPED_TEST(SubdivideByVolume, endsAtTheFinestLevelWhereTheToleranceIsZero)
 {
     // Distances to the origin, where both parts have a point that stays there.
     Field const field =

@@ -40,7 +40,7 @@ MeshBuilder graded(MeshBuilder mesh)
     return mesh;
 }
 
-/// Only the tips differ from all other points: by one float, so that they stay there however fine the faces get.
+/// Only the tips differ from all other points, by one float, so they stay there however fine the faces get.
 MeshBuilder tipsOneFloatApart()
 {
     MeshBuilder mesh = MeshBuilder::bipyramid(8).shuffled(1);
@@ -115,7 +115,7 @@ template <class T, class Scalar> void expectMean(Scalar third)
         EXPECT_EQ(s[4 * n + i], (s[i] + s[n + i] + s[2 * n + i]) * third) << i;
 }
 
-/// What a run that did not come to its end has to leave: the mesh as it was, and "carried" at least as long.
+/// Checks an interrupted run: the mesh is unchanged, and "carried" is at least as long.
 void expectAsBefore(Object mesh, Object before)
 {
     auto const carried = dataOf<float3>(mesh, "carried"), carriedBefore = dataOf<float3>(before, "carried");
@@ -189,7 +189,7 @@ TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
             unsigned int const points = passes.numPoints, faces = passes.numFaces;
             passes.pass(Orvan::Array<bool>(faces, true));
             ASSERT_EQ(passes.numPoints, points + faces);
-            // Every edge has turned over.
+            // Every edge has flipped.
             EXPECT_EQ(passes.faceStates, Orvan::Array<unsigned char>(3 * faces, 8 * pass & 0xFF));
             if (pass == 1) {
                 EXPECT_LT(length(passes.positions[0] - corner * solid.once), 2e-6f);
@@ -198,15 +198,15 @@ TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
     }
 }
 
-TEST(Subdivide, stepsKeepToTheirRules)
+TEST(Subdivide, stepsHandleStatesThatDriversNeverProduce)
 {
-    // Beside a coarser face nothing is written; the balance leaves such a state alone when all have split.
+    // Beside a coarser face nothing is emitted; the balance does not change such a state if all have split.
     Passes unbalanced(MeshBuilder::tetrahedron());
     unbalanced.faceStates = {2 << 2 | 2, 2, 2, 2};
     EXPECT_FALSE(unbalanced.isBalanced());
     PlainSubdivision plain(MeshBuilder::tetrahedron());
     plain.states = {2 << 2 | 2, 2, 2, 2};
-    for (bool const mark : {false, true}) { // the second pass brings limits into positions
+    for (bool const mark : {false, true}) { // the second pass moves points towards their limits
         Orvan::Array<bool> const marks(unbalanced.numFaces, mark);
         unbalanced.pass(marks);
         plain.pass(marks);
@@ -225,7 +225,7 @@ TEST(Subdivide, stepsKeepToTheirRules)
     Passes aged(MeshBuilder::tetrahedron());
     aged.vertexLevels[aged.faceVertex[2]] = 5;
     aged.subdivide(Orvan::Array<bool>(4, true));
-    EXPECT_EQ(aged.vertexLevels[4], 6) << "one more than the newest corner has";
+    EXPECT_EQ(aged.vertexLevels[4], 6) << "one more than its newest corner";
 
     Passes full(MeshBuilder::tetrahedron());
     full.numPoints = 0xFFFFFFFC;
@@ -242,7 +242,7 @@ TEST(Subdivide, stepsKeepToTheirRules)
     }
 }
 
-TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
+TEST(Subdivide, averagesTypesWithAMeanAndRemovesAllOthers)
 {
     expectMean<float>(0.33333334f);
     expectMean<float2x3>(0.33333334f);
@@ -255,7 +255,7 @@ TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
     for (char const* const component : {sPointComp, sFaceVertexComp, sFaceComp})
         addAllTypes(component, random, *mesh);
     Orvan::Array<float> tooShort(8, 6);
-    tooShort.resize(1); // what is behind its end is not for anybody to see
+    tooShort.resize(1); // values beyond the end must not show up
     addDataProperty<float>("sPointCompShort", sPointComp, std::move(tooShort), *mesh);
     addRangeProperty("range", sPointComp, {0, 0, 0, 0}, *mesh);
     addDataProperty<float>("of range", "range", {1}, *mesh);
@@ -269,16 +269,16 @@ TEST(Subdivide, averagesTheTypesThatHaveAMeanAndDropsAllOthers)
     EXPECT_EQ(kept,
         "tion float double float2 float4 float3 float2x2 float2x3 float3x3 float4x4 double2 double3 double4 double2x2 "
         "double2x3 double3x3 double4x4 Short ");
-    EXPECT_EQ(valuesOf<float>(*mesh, "sPointCompShort")[4], 6 * 0.33333334f) << "what is missing is zero";
+    EXPECT_EQ(valuesOf<float>(*mesh, "sPointCompShort")[4], 6 * 0.33333334f) << "missing values are zero";
     EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceComp).size, 1);
     EXPECT_EQ(getGeoPropNamesByTarget(*mesh, sFaceVertexComp).size, 1);
     EXPECT_FALSE(mesh->hasProperty("of range") || mesh->hasProperty("of int"));
-    EXPECT_TRUE(mesh->hasProperty("of what targets int")) << "dropping goes one level deep";
+    EXPECT_TRUE(mesh->hasProperty("of what targets int")) << "removal goes one level deep";
 
     addDataProperty<float>("sPointCompShort", sPointComp, {1}, *mesh);
     ASSERT_TRUE(subdivide(9, *mesh));
     EXPECT_EQ(valuesOf<float>(*mesh, "sPointCompShort"), (std::vector<float>{1, 0, 0, 0, 0, 0, 0, 0}))
-        << "also if nothing splits";
+        << "even if nothing splits";
 }
 
 TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
@@ -293,7 +293,7 @@ TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
         auto const before = deepCopy(**mesh);
         addDataProperty<int>("number", sPointComp, {1, 2}, **mesh);
         EXPECT_FALSE(subdivide(0.1f, **mesh));
-        EXPECT_TRUE(sameContents(**mesh, *before)) << "only what cannot follow is gone";
+        EXPECT_TRUE(sameContents(**mesh, *before)) << "only data that cannot be refined is removed";
     }
     for (float const tolerance : {0.0f, -1.0f, 1.1920929e-7f, kNan, 1.0f}) {
         auto const mesh = refined(MeshBuilder::sphere(3), tolerance);
@@ -308,14 +308,15 @@ TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
     EXPECT_TRUE(sameContents(*refined(pointsOnly, 0.1f), *meshOf(pointsOnly)));
 }
 
-TEST(Subdivide, survivesWhatItIsNotMeantFor)
+TEST(Subdivide, survivesMeshesOutsideOfItsPreconditions)
 {
     Random random(1);
     for (unsigned int run = 0; run != 150; ++run) {
         MeshBuilder soup = MeshBuilder::sphere(2).withNoise(1, run);
         for (unsigned int change = 0; change != 3; ++change)
             soup.faces[random.below(32)][random.below(3)] = random.below(18);
-        for (std::size_t face = 0; face != 32; ++face) // closed, but not manifold: each face once more, turned
+        for (std::size_t face = 0; face != 32;
+             ++face) // closed, but not manifold: each face again, with opposite orientation
             soup.faces.push_back({soup.faces[face][2], soup.faces[face][1], soup.faces[face][0]});
         PlainSubdivision plain(soup);
         plain.run(0.4f);
@@ -360,7 +361,7 @@ TEST(Subdivide, canBeCancelledInEveryPass)
     for (; isCancelled(markAndCancel); pass = 0) // in the first sweep of each pass
         ++last;
     EXPECT_GT(last, 3);
-    EXPECT_EQ(last, pass) << "in each, also where nothing splits";
+    EXPECT_EQ(last, pass) << "in each pass, even if nothing splits";
 }
 
 TEST(Subdivide, leavesTheMeshAsItWasWhenMemoryRunsOut)
@@ -375,7 +376,7 @@ TEST(Subdivide, leavesTheMeshAsItWasWhenMemoryRunsOut)
                 EXPECT_TRUE(sameContents(*mesh, *expected));
             else
                 expectAsBefore(*mesh, *before);
-            EXPECT_TRUE(sameContents(other, *before)) << "other holders";
+            EXPECT_TRUE(sameContents(other, *before)) << "objects that share the arrays";
         });
     }
 }

@@ -50,8 +50,8 @@ template <class Traits> float sampled(LinearSampler<Traits>& sampler, float3 p, 
     return sampler.sample(p, depth, kIndexSpace);
 }
 
-/// Rows of points give what single ones do. Points follow one another at random and on a line; half of them are at
-/// multiples of a quarter, and so on borders and voxels.
+/// Rows give the same values as single points. Points are random starts of short lines; half of them are at multiples of a
+/// quarter, so at the sides of tiles and voxels.
 template <class Traits> void expectSameInRows(LinearSampler<Traits> sampler, float reach)
 {
     Random random(9);
@@ -80,7 +80,7 @@ float blend(float u, float v, float f)
     return (v - u) * f + u;
 }
 
-/// A coordinate as voxel of its tile and fraction, straight from the rules.
+/// A coordinate as voxel of its tile and fraction, computed in the plainest way.
 struct Local {
     int tileOrigin, voxel;
     float fraction;
@@ -122,19 +122,19 @@ float3 offsetsOf(unsigned int offsetType)
 
 }
 
-TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
+TYPED_TEST(VoxelSampling, agreesWithADenseFieldForAnyOffset)
 {
     Field const field = Field::random(-20, 21);
     auto const volume = volumeOf<TypeParam>(field);
     auto const padded = makeHaloChannel(volume);
-    // With offsets that fit no volume voxels stay inside, and fractions tell the distance.
+    // With offsets that fit no volume, voxels are clamped to the tile and fractions hold the distance.
     for (float const offset : {0.0f, -1000.0f, -1.5f, -0.3f, 5e-6f, 1e-5f, 0.4f, 2.5f, 77.0f}) {
         float3 const offsets{offset, offset, offset};
         auto sampler = samplerOf(volume, offsets), paddedSampler = samplerOf(volume, offsets, &padded);
         Random random(1);
         for (int n = 0; n < 4000; ++n) {
             float3 p = random.point(19);
-            if (n % 5 == 0) // on the border
+            if (n % 5 == 0) // at the side of a tile
                 p.x = std::floor(p.x / TypeParam::kSide) * TypeParam::kSide;
             std::array<Local, 3> at = localOf<TypeParam>(p, offsets);
             for (Local& axis : at)
@@ -144,20 +144,20 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldWhereverOffsetsPoint)
             });
             ASSERT_EQ(sampled(sampler, p), expected) << p.x << ' ' << p.y << ' ' << p.z << ", offset " << offset;
             ASSERT_EQ(sampled(paddedSampler, p), expected);
-            // Caches hold what they say, whichever tiles came before.
+            // Caches are correct whichever tiles came before.
             LinearSampler<TypeParam> other(sampler);
             ASSERT_EQ(sampled(other, p), expected);
         }
     }
 }
 
-TYPED_TEST(VoxelSampling, takesBoxesForTheirVoxels)
+TYPED_TEST(VoxelSampling, treatsBoxesLikeTheirVoxels)
 {
     Random random(2);
     auto const below = [&](int count) { return static_cast<int>(random.below(static_cast<std::size_t>(count))); };
     for (int round = 0; round < 16; ++round) {
         SCOPED_TRACE(round);
-        // Boxes that touch, with other voxels beside and inside, at this depth and others.
+        // Touching boxes, with other voxels next to and inside them, at this depth and others.
         int const depth = TypeParam::kUnitDepth + below(3) - 1;
         std::array<std::array<int, 3>, 3> cuts;
         std::vector<ConstantBox> boxes;
@@ -198,7 +198,7 @@ TYPED_TEST(VoxelSampling, takesBoxesForTheirVoxels)
         float const unit = 1 / TypeParam::voxelsPerUnit(depth);
         for (int n = 0; n < 3000; ++n) {
             float3 p = random.point(30);
-            if (n % 2) // the last voxels of boxes, and the first ones behind
+            if (n % 2) // the last voxels of boxes, and the first ones after them
                 p.z = float(cuts[2][static_cast<std::size_t>(below(3))]) + random.coordinate();
             p = {p.x * unit, p.y * unit, p.z * unit};
             int const asked = depth + below(3) - (source.coarsestDepth ? 2 : 0);
@@ -211,9 +211,9 @@ TYPED_TEST(VoxelSampling, takesBoxesForTheirVoxels)
     }
 }
 
-TYPED_TEST(VoxelSampling, takesRowsAsItTakesPoints)
+TYPED_TEST(VoxelSampling, givesTheSameValuesInRows)
 {
-    // More tiles than a sampler keeps, with a few values that show even where they are blended in with a share of 0.
+    // More tiles than a sampler caches, and a few values that would show even in a blend with a share of 0.
     Field field = Field::random(-5 * TypeParam::kSide, 5 * TypeParam::kSide);
     for (std::size_t n = 0; n < field.values.size(); n += 37)
         field.values[n] = std::numeric_limits<float>::infinity();
@@ -310,7 +310,7 @@ TYPED_TEST(VoxelSampling, continuesTheParentIfNeighborsAreMissing)
     constexpr int kSide = TypeParam::kSide;
     for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
         float3 const offset = offsetsOf(offsetType);
-        // In voxels of the parent; of the tile, `kChildrenPerAxis` to each.
+        // In voxels of the parent, each of which covers `kChildrenPerAxis` of the tile along an axis.
         FullHalo<TypeParam> parent(-1), halo;
         forEachVoxel(-1, kSide + 1, [&](int i, int j, int k) {
             parent(i, j, k) = linearField(float(i) + offset.x, float(j) + offset.y, float(k) + offset.z);
@@ -346,18 +346,18 @@ TYPED_TEST(VoxelSampling, continuesTheParentIfNeighborsAreMissing)
 
 TEST(HaloTiles, blendTheParentInQuartersAndEighths)
 {
-    // Along x, values a tile apart: the parent is 100 before the tile, 10 at and 1 behind, as far as it can be.
+    // Along x, the parent is 100 before the tile, 10 at the tile, and 1 after it as far as its halo reaches.
     FullHalo<Traits2> parent(-1), halo;
     forEachVoxel(-1, 5, [&](int i, int j, int k) { parent(i, j, k) = i < 2 ? 100 : i < 4 ? 10 : 1; });
     TileData<float, 4, 0> tile(0); // the second child along x: voxels 2 and 3
     forEachVoxel(0, 4, [&](int i, int j, int k) { tile(i, j, k) = 0; });
     TilesAround<Traits2> around{};
     around[13] = tile;
-    auto const row = [&](unsigned int offsetType) { // across y, where no tile is
+    auto const row = [&](unsigned int offsetType) { // across y, where there is no tile
         fillHaloFromNeighbors<Traits2>(offsetType, halo, {1, 0, 0}, around, parent);
         return std::vector<float>{halo(0, 4, 1), halo(1, 4, 1), halo(2, 4, 1), halo(3, 4, 1)};
     };
-    float const a = 100, b = 10, next = 1, mean = 1.5f * 1 - 0.5f * 10; // behind: what is there, in a straight line
+    float const a = 100, b = 10, next = 1, mean = 1.5f * 1 - 0.5f * 10; // after it: extrapolated
     EXPECT_EQ(row(0),
         (std::vector<float>{
             0.375f * a + 0.625f * b, 0.125f * a + 0.875f * b, 1.125f * b - 0.125f * a, 0.375f * mean + 0.625f * b}));
@@ -381,7 +381,7 @@ TYPED_TEST(VoxelSampling, findsBackgroundOutside)
 
 TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
 {
-    // Few fine voxels, some in coarse tiles, and borders with nothing behind.
+    // Few fine voxels, some of them in coarse tiles, and tiles without neighbors.
     std::vector<Voxel> coarse, fine;
     Random random(11);
     auto const at = [&](int reach) { return static_cast<int>(std::floor(random.coordinate() * float(reach))); };
@@ -417,7 +417,7 @@ TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
         float const reach = n % 2 ? 2147483520.0f : 30e6f;
         voxels.push_back({far(reach), n % 3 ? far(reach) : kLowest, far(reach), random.coordinate()});
     }
-    std::vector<float3> points; // the list has numbers that floats hold
+    std::vector<float3> points; // the list has numbers that floats represent
     for (Voxel const& v : voxels)
         points.push_back({float(v.i), float(v.j), float(v.k)});
     VoxelList const lists[] = {{kDepth, voxels}};
@@ -435,7 +435,7 @@ TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
         }
     }
 
-    // In tiles of one unit, where a float no longer holds twice as much to the unit.
+    // In tiles of one unit, at a distance where adjacent floats are half a unit apart.
     constexpr int kFar = 0x400001;
     std::vector<Voxel> const one{{kFar * TypeParam::kSide, 0, 0, 7}};
     VoxelList const deepest[] = {{TypeParam::kDeepest, one}};
@@ -446,7 +446,7 @@ TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
     EXPECT_EQ(values, std::vector<float>(4, 7));
 }
 
-TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
+TYPED_TEST(VoxelSampling, readsTheAllowedDepthsAndScalesWorldPoints)
 {
     constexpr int kDepth = TypeParam::kUnitDepth, kWide = TypeParam::kChildrenPerAxis;
     auto const volume = volumeOf<TypeParam>(Field::linear(-25, 25), 7, 2);
@@ -458,7 +458,7 @@ TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
         return LinearSampler<TypeParam>(volume.container, volume.channel, volume.topology, settings, channel);
     };
     auto const sampledBy = [&](LinearSampler<TypeParam> sampler) { return sampled(sampler, p); };
-    EXPECT_FLOAT_EQ(sampledBy(with({.maxDepth = kDepth - 1})), value) << "coarser values, on the same line";
+    EXPECT_FLOAT_EQ(sampledBy(with({.maxDepth = kDepth - 1})), value) << "coarser values of the same linear field";
     EXPECT_EQ(sampledBy(with({.minDepth = kDepth, .maxDepth = kDepth - 1})), none);
     EXPECT_EQ(sampledBy(with({.minDepth = kDepth})), value);
     EXPECT_EQ(sampledBy(with({.minDepth = kDepth}, &padded)), value);
@@ -474,7 +474,7 @@ TYPED_TEST(VoxelSampling, readsTheDepthsItMayAndScalesWorldPoints)
     auto sampler = samplerOf(coarseVolume);
     EXPECT_FLOAT_EQ(sampled(sampler, {0.25f * kWide, 0, 0}), 5);
     expectSameInRows(sampler, 3 * kWide);
-    // The next value in memory does not count at a tile's last voxel.
+    // At a tile's last voxel, the next value in memory must not have an effect.
     std::vector<float3> const row(4, {static_cast<float>(kWide * (TypeParam::kSide - 1)), kWide, 0});
     std::vector<float> values(4);
     sampler.sampleAll(row.data(), 4, kDepth, kIndexSpace, values.data());

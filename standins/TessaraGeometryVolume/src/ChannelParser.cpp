@@ -10,7 +10,7 @@ namespace {
     constexpr std::string_view kSeparators = " \t\n\v\f\r,";
     constexpr std::string_view kExcludingSigns = "^-";
 
-    // The position behind the character at `position`: of UTF-8, all bytes of it.
+    // The position after the UTF-8 character at `position`.
     std::size_t nextCharacter(std::string_view text, std::size_t position)
     {
         ++position;
@@ -19,8 +19,8 @@ namespace {
         return position;
     }
 
-    // On a mismatch only the last `*` takes one byte more: an earlier one could do no better. So no pattern takes more
-    // than its length times the name's.
+    // On a mismatch only the last `*` is extended, by one byte: extending an earlier one could not match more. So the time
+    // is at most the pattern's length times the name's.
     bool matches(std::string_view pattern, std::string_view name)
     {
         std::size_t at = 0;

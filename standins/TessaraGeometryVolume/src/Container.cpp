@@ -21,7 +21,7 @@ namespace {
             return floorDivide(index, width) * width;
     }
 
-    // Neighbours differ in few bits, and not in the lowest ones: all bits have to reach the upper ones.
+    // Neighbors differ in few bits, and not in the lowest ones, so all bits have to affect the upper ones.
     std::uint64_t hashOf(std::int64_t i, std::int64_t j, std::int64_t k)
     {
         auto hash = static_cast<std::uint64_t>(i) * 0x9E3779B97F4A7C15u;
@@ -62,7 +62,7 @@ template <class Traits> auto Container<Traits>::find(std::int64_t i, std::int64_
     }
 }
 
-/// Never more than half of the slots are taken, so that searches are short.
+/// Keeps at least half of the slots free, so that searches are short.
 template <class Traits> void Container<Traits>::growSlots(Level& level)
 {
     if (2 * (level.tiles.size() + 1) <= level.slots.size())

@@ -6,7 +6,7 @@ namespace TSR::TileTree3D {
 
 namespace {
 
-    /// Where a voxel of a tile stands in its parent along an axis: between a voxel and the next.
+    /// The position of a tile's voxel in the parent along an axis: between a voxel and the next.
     struct PlaceInParent {
         int voxel;
         float fraction;
@@ -31,7 +31,7 @@ namespace {
         PlaceInParent const z = placeInParent<Traits>(child.k, voxel.k);
         if (order < 2)
             return halo(x.voxel, y.voxel, z.voxel);
-        // Past the last voxel there is nothing to blend with, and no need to.
+        // At the last voxel there is no next one to read, and its share would be 0.
         int const nextX = x.voxel + (x.fraction > 0), nextY = y.voxel + (y.fraction > 0),
                   nextZ = z.voxel + (z.fraction > 0);
         auto const alongX = [&](int j, int k) { return blend(halo(x.voxel, j, k), halo(nextX, j, k), x.fraction); };
@@ -47,7 +47,7 @@ namespace {
                     out(i, j, k) = from(i, j, k);
     }
 
-    /// The voxels across a face, an edge or the corner: along each axis either one behind the end, or all inside.
+    /// The voxels across a face, an edge or the corner: along each axis either the one after the end, or all inside.
     struct Region {
         IJK first, end;
     };
@@ -79,7 +79,7 @@ namespace {
                            k = tile.k + direction.k * width;
         if (std::max({i, j, k}) > INT32_MAX)
             return kNone;
-        // A tile may begin below what 32 bits hold; what they hold of it is inside all the same.
+        // A tile may begin below the range of 32 bits. The clamped index is still in the same tile.
         auto const inRange = [](std::int64_t index) {
             return static_cast<int>(std::max<std::int64_t>(index, INT32_MIN));
         };

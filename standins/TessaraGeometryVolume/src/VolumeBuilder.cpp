@@ -29,7 +29,7 @@ namespace {
         return {a.i + b.i, a.j + b.j, a.k + b.k};
     }
 
-    /// The tile and the seven above it, as steps.
+    /// Visits the steps to a tile itself and to its seven upper neighbors.
     template <class Visit> bool anyUpwards(Visit const& visit)
     {
         for (int across = 0; across < 8; ++across)
@@ -93,7 +93,7 @@ namespace {
             Index const origin{number.i * width, number.j * width, number.k * width};
             for (std::int64_t const index : {origin.i, origin.j, origin.k})
                 if (index + width <= INT32_MIN || index > INT32_MAX)
-                    throw std::invalid_argument("a voxel lies beyond 32-bit indices");
+                    throw std::invalid_argument("a voxel is beyond 32-bit indices");
             return origin;
         }
 
@@ -109,7 +109,7 @@ namespace {
         bool hasValues(TreeIndex tile) const { return valuesAt(tile) != nullptr; }
         float const* valuesAt(TreeIndex tile) const { return volume_.channel.tileData(tile).values(); }
 
-        /// The values of a given tile, which begin as what a coarser one says.
+        /// The values of a tile with a source, initialized from a coarser one.
         float* valuesOfTile(Index const& number, int depth)
         {
             TreeIndex const tile = insertTile(number, depth);
@@ -117,7 +117,7 @@ namespace {
             float* const values = volume_.channel.values(tile);
             if (isNew) {
                 volume_.container.setTerminal(static_cast<std::uint32_t>(tile.index), depth);
-                takeFromCoarser(originOf(number, depth), depth, values);
+                copyFromCoarser(originOf(number, depth), depth, values);
                 coarsestTerminal_ = std::min(coarsestTerminal_, depth);
             }
             return values;
@@ -131,8 +131,8 @@ namespace {
                         rule(i, j, k);
         }
 
-        /// What a coarser tile says of the voxels of a new one that it contains: each takes the coarse voxel it is in.
-        void takeFromCoarser(Index const& origin, int depth, float* values) const
+        /// Gives each voxel of a new tile the value of the coarse voxel that contains it, or `background`.
+        void copyFromCoarser(Index const& origin, int depth, float* values) const
         {
             for (int coarser = depth - 1; coarser >= coarsestTerminal_; --coarser) {
                 Tile const& tile = volume_.container.find(origin.i, origin.j, origin.k, coarser);
@@ -156,7 +156,7 @@ namespace {
 
         // ---- Listed voxels
 
-        /// Neighbors in a list are mostly neighbors in space.
+        /// The tile of the previous voxel: consecutive voxels are mostly in the same one.
         struct TileOfVoxel {
             Index number{};
             float* values = nullptr;
@@ -177,11 +177,11 @@ namespace {
                 static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide))];
         }
 
-        /// From coarse to fine.
-        template <class IsTaken> void addLists(IsTaken const& isTaken)
+        /// Adds lists in the order from coarse to fine.
+        template <class IsIncluded> void addLists(IsIncluded const& isIncluded)
         {
             std::vector<VoxelList> lists(source_.lists.begin(), source_.lists.end());
-            std::erase_if(lists, [&](VoxelList const& list) { return !isTaken(list.depth); });
+            std::erase_if(lists, [&](VoxelList const& list) { return !isIncluded(list.depth); });
             std::stable_sort(
                 lists.begin(), lists.end(), [](VoxelList const& a, VoxelList const& b) { return a.depth < b.depth; });
             for (VoxelList const& list : lists) {
@@ -213,7 +213,8 @@ namespace {
             });
         }
 
-        /// All tiles with voxels of lists, cubes and the block, and those above: boxes need to know where they are.
+        /// Inserts all tiles with voxels of lists, cubes and the block, and their ancestors: boxes are stored differently
+        /// next to them.
         void insertTiles()
         {
             if (source_.boxes.empty())
@@ -271,7 +272,7 @@ namespace {
 
         // ---- Boxes
 
-        /// How many voxels of the source's depth a tile has along an axis.
+        /// The number of voxels of the source's depth in a tile along an axis.
         std::int64_t voxelsOfTile(int depth) const
         {
             return Traits::tileWidth(depth) / Traits::tileWidth(source_.depth) * kSide;
@@ -283,7 +284,7 @@ namespace {
                 {(number.i + 1) * voxels, (number.j + 1) * voxels, (number.k + 1) * voxels}};
         }
 
-        /// What samples in a tile can depend on: its voxels, and its upper neighbors at the source's depth.
+        /// The voxels that samples in a tile can depend on: its own, and those of its upper neighbors at the source's depth.
         static VoxelRange withUpperNeighbors(VoxelRange const& tile)
         {
             return {tile.first, {tile.end.i + kSide, tile.end.j + kSide, tile.end.k + kSide}};
@@ -306,7 +307,7 @@ namespace {
                 if (rangeOf(box).isEmpty())
                     continue;
                 for (Index const& corner : {first, Index{end.i - 1, end.j - 1, end.k - 1}})
-                    originOf(tileOfVoxel(corner), source_.depth); // or refuses
+                    originOf(tileOfVoxel(corner), source_.depth); // throws if it is out of range
                 boxes_.push_back(&box);
             }
         }
@@ -347,7 +348,7 @@ namespace {
                     forEachTileIn(
                         inside, voxels, [&](Index const& child) { boxesOfChild[place(child)].push_back(box); });
             }
-            Boxes().swap(boxes); // there may be many, and levels
+            Boxes().swap(boxes); // release it before the recursion, as there may be many
             forEachTileIn(children, 1, [&](Index const& child) {
                 if (!boxesOfChild[place(child)].empty())
                     visit(child, std::move(boxesOfChild[place(child)]));
@@ -361,7 +362,7 @@ namespace {
             return tile.valid && tile.division < 0;
         }
 
-        /// What boxes say of tiles with listed voxels, beneath these.
+        /// Fills tiles with listed voxels from boxes, before the lists overwrite them.
         void fillListedTiles(Index const& number, int depth, Boxes boxes)
         {
             if (!isInserted(number, depth))
@@ -404,7 +405,7 @@ namespace {
                     [&](Index const& child, Boxes inside) { addBoxes(child, depth + 1, std::move(inside)); });
         }
 
-        /// Whether samples in the tile may depend on listed voxels.
+        /// Whether samples in a tile may depend on listed voxels.
         bool isAmongListed(Index const& number, int depth) const
         {
             return anyUpwards([&](Index const& step) { return isInserted(sum(number, step), depth); });
@@ -425,7 +426,7 @@ namespace {
             shareConstant(tile, *value);
         }
 
-        /// Lets a tile of the source's depth have one value everywhere.
+        /// Gives a tile of the source's depth one value everywhere, which is stored once per value.
         void shareConstant(TreeIndex tile, float value)
         {
             auto const [known, isNew] = constants_.try_emplace(std::bit_cast<std::uint32_t>(value), tile);
@@ -435,7 +436,7 @@ namespace {
                 volume_.channel.share(tile, known->second);
         }
 
-        /// Makes repeated tiles of a tile, if that saves some.
+        /// Divides a tile into repeated tiles. \return false if that would not save memory
         bool divide(Index const& number, int depth, Boxes const& boxes)
         {
             VoxelRange const tile = rangeOfTile(number, voxelsOfTile(depth));
@@ -498,7 +499,7 @@ namespace {
             return repeated;
         }
 
-        // ---- Tiles above
+        // ---- Coarser tiles
 
         void fillCoarserTiles()
         {
@@ -508,7 +509,7 @@ namespace {
                 for (std::size_t number = 0; number < volume_.container.tileCount(depth); ++number) {
                     Tile const& tile = volume_.container.tile(number, depth);
                     if (!hasValues(tile.treeIndex()) && tile.division < 0)
-                        takeFromCoarser({tile.i, tile.j, tile.k}, depth, volume_.channel.values(tile.treeIndex()));
+                        copyFromCoarser({tile.i, tile.j, tile.k}, depth, volume_.channel.values(tile.treeIndex()));
                 }
                 if (depth < Traits::kDeepest)
                     for (std::size_t child = 0; child < volume_.container.tileCount(depth + 1); ++child)
@@ -516,11 +517,11 @@ namespace {
             }
         }
 
-        /// Along an axis with a set bit the voxel at the same place, along one with a clear bit the mean.
+        /// Takes the voxel at the same place along axes with a set bit, and the mean along axes with a clear bit.
         void restrictToParent(Tile const& tile)
         {
             if (volume_.container.tile(tile.parentTreeIndex()).isTerminal)
-                return; // its values were given
+                return; // it has a source of its own
             float const* const fine = valuesAt(tile.treeIndex());
             float* const coarse = volume_.channel.values(tile.parentTreeIndex());
             auto const fineValue = [&](int i, int j, int k) { return fine[linearIndex(kSide, i, j, k)]; };
@@ -531,7 +532,7 @@ namespace {
             for (int z = 0; z < kCovered; ++z)
                 for (int y = 0; y < kCovered; ++y)
                     for (int x = 0; x < kCovered; ++x) {
-                        // As differences: the mean of equal values is that value.
+                        // Summed as differences, so that the mean of equal values is that value to the bit.
                         float const first = fineValue(x * kChildren, y * kChildren, z * kChildren);
                         float sum = 0;
                         for (int k = 0; k < spanZ; ++k)

@@ -11,7 +11,7 @@ struct Index {
     std::int64_t i, j, k;
 };
 
-/// Counted in voxels of one depth; `end` is outside.
+/// A range of voxels of one depth; `end` is excluded.
 struct VoxelRange {
     Index first, end;
 
@@ -27,7 +27,7 @@ struct VoxelRange {
             {std::max(end.i, other.end.i), std::max(end.j, other.end.j), std::max(end.k, other.end.k)}};
     }
     bool overlaps(VoxelRange const& other) const { return !overlapWith(other).isEmpty(); }
-    bool holds(VoxelRange const& other) const
+    bool contains(VoxelRange const& other) const
     {
         return first.i <= other.first.i && first.j <= other.first.j && first.k <= other.first.k && other.end.i <= end.i
             && other.end.j <= end.j && other.end.k <= end.k;

@@ -8,13 +8,13 @@ namespace TSR::TileTree3D::Internal {
 
 namespace {
 
-    /// Along one axis.
+    /// A range along one axis; `end` is excluded.
     struct Interval {
         std::int64_t first, end;
     };
 
-    /// What a box means to a tile along an axis: which voxels of the tile are in it, and whether the next tile has some,
-    /// and whether its first voxel is one.
+    /// The part of a tile that a box covers along an axis: which voxels of the tile, whether some of the next tile, and
+    /// whether the next tile's first one.
     struct Share {
         std::int64_t first, end;
         bool reachesNext, holdsNextFirst;
@@ -35,7 +35,7 @@ namespace {
     {
         std::int64_t const tileBegin = range.first / side - (range.first % side < 0 ? 1 : 0);
         std::int64_t const tileEnd = tileBegin + (range.end - range.first) / side;
-        // Shares change around the ends of boxes only.
+        // Shares change only near the ends of boxes.
         std::vector<std::int64_t> candidates;
         for (Interval const& box : boxes)
             for (std::int64_t const end : {floorDivide(box.first, side), floorDivide(box.end - 1, side)})
@@ -53,7 +53,7 @@ namespace {
         return begins;
     }
 
-    /// To the bit: 0 is not -0.
+    /// Compares bits: 0 and -0 differ.
     bool isSame(float a, float b)
     {
         return std::bit_cast<std::uint32_t>(a) == std::bit_cast<std::uint32_t>(b);
@@ -67,7 +67,7 @@ std::optional<float> commonValue(std::span<ConstantBox const* const> boxes, Voxe
     std::int64_t covered = 0;
     std::optional<float> value;
     for (ConstantBox const* const box : boxes) {
-        if (rangeOf(*box).holds(range))
+        if (rangeOf(*box).contains(range))
             return box->value;
         VoxelRange const shared = rangeOf(*box).overlapWith(range);
         if (shared.isEmpty())

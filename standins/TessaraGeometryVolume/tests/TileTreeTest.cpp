@@ -33,7 +33,7 @@ template <class Traits> Volume<Traits> volumeOf(std::vector<Voxel> const& voxels
     return buildVolume<Traits>(source);
 }
 
-/// The value of the voxel that contains an index, wherever in the tree it stands.
+/// The value of the voxel that contains an index, at any depth of the tree.
 template <class Traits> float valueAt(Volume<Traits> const& volume, IJK index, int depth = Traits::kUnitDepth)
 {
     typename Container<Traits>::ConstTileAccessor cursor(volume.container);
@@ -66,7 +66,7 @@ TYPED_TEST(TileTree, holdsWhatItWasBuiltFromAndBackgroundElsewhere)
     std::map<std::tuple<int, int, int>, float> expected;
     for (Voxel const& voxel : voxels)
         expected[{voxel.i, voxel.j, voxel.k}] = voxel.value;
-    // A block, which stands over the voxels inside it.
+    // A block, which wins over the voxels inside it.
     IJK const first{-7, 3, -11}, size{23, 9, 14};
     std::vector<float> values;
     for (int k = first.k; k < first.k + size.k; ++k)
@@ -118,7 +118,7 @@ TYPED_TEST(TileTree, linksTilesWithTheirParents)
 
 TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
 {
-    // Two wide ones touch, and neither ends with tiles.
+    // Two wide boxes touch, and neither ends at a tile's side.
     std::vector<ConstantBox> const boxes{{{-64, -64, -64}, {64, 64, 64}, 3},
         {{64, -3001, -3001}, {4097, 3001, 3001}, 6}, {{70, 4001, 2}, {83, 4009, 4}, 4}, {{90, 0, 0}, {90, 5, 5}, 9}};
     auto const isInside = [](ConstantBox const& box, IJK at) {
@@ -143,7 +143,7 @@ TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
     };
     EXPECT_LT(bytesOf(volume), 2'000'000);
 
-    // Many boxes that are one, and values with two sides each: more than fit one division.
+    // Many boxes that could be one, each with two values: too many for one division.
     std::vector<ConstantBox> same, others;
     forEachVoxel(0, 16, [&](int i, int j, int k) {
         same.push_back({{8 * i, 8 * j, 8 * k}, {8 * i + 8, 8 * j + 8, 8 * k + 8}, 5});
@@ -209,7 +209,7 @@ TYPED_TEST(TileTree, coarserTilesTakeTheValueOrTheMean)
     }
 }
 
-TYPED_TEST(TileTree, halosContinueNeighboursThenParentsThenTheTile)
+TYPED_TEST(TileTree, halosContinueNeighborsThenParentsThenTheTile)
 {
     constexpr int kSide = TypeParam::kSide;
     auto const isExact = [&](Volume<TypeParam> const& volume, int tileBegin, auto const& expected) {
@@ -249,7 +249,7 @@ TYPED_TEST(TileTree, halosContinueNeighboursThenParentsThenTheTile)
         [&](int i, int j, int k) { return i == kSide ? 77 : around(i, j, k); });
 }
 
-TYPED_TEST(TileTree, refusesWhatTheLayoutDoesNotHave)
+TYPED_TEST(TileTree, refusesDepthsAndVoxelsThatTheLayoutDoesNotHave)
 {
     VolumeSource source = sourceOf<TypeParam>();
     source.depth = TypeParam::kUnitDepth - 1; // there are not that many voxels of this size
@@ -264,7 +264,7 @@ TYPED_TEST(TileTree, refusesWhatTheLayoutDoesNotHave)
     EXPECT_EQ(buildVolume<TypeParam>(sourceOf<TypeParam>()).channel.coarsestDepth(), TypeParam::kDepthCount);
 }
 
-TYPED_TEST(TileTree, takesMemoryForActiveTilesOnlyAndIsReadByManyThreads)
+TYPED_TEST(TileTree, usesMemoryForActiveTilesOnlyAndIsReadByManyThreads)
 {
     // The shell of a ball in 464³ voxels.
     std::vector<Voxel> shell;
@@ -276,7 +276,7 @@ TYPED_TEST(TileTree, takesMemoryForActiveTilesOnlyAndIsReadByManyThreads)
     ASSERT_GT(shell.size(), 50'000);
     auto const volume = volumeOf<TypeParam>(shell, sourceOf<TypeParam>());
     std::size_t const bytes = volume.container.memoryInBytes() + volume.channel.memoryInBytes();
-    EXPECT_LT(bytes, 60'000'000); // of 400 MB that a dense field would take
+    EXPECT_LT(bytes, 60'000'000); // a dense field would take 400 MB
 
     std::vector<std::thread> threads;
     std::vector<std::size_t> wrong(4);

@@ -40,7 +40,7 @@ Answer query(float2 const& p, float2 const& a, float2 const& b, float2 const& c)
 
 }
 
-TEST(PointEdgeOrientation, tellsTheTurn)
+TEST(PointEdgeOrientation, findsTheTurn)
 {
     struct Case {
         char const* name;
@@ -64,7 +64,7 @@ TEST(PointEdgeOrientation, tellsTheTurn)
         EXPECT_EQ(turn(a, b, c), expected) << name;
         EXPECT_EQ(turn(c, b, a), -expected) << name;
     }
-    // Between equal points there is no turn, also where areas round.
+    // Paths with equal points do not turn, even if areas round.
     std::mt19937 random(1);
     auto const coordinate = [&] {
         auto const mantissa = static_cast<float>(random() % 65536);
@@ -76,7 +76,7 @@ TEST(PointEdgeOrientation, tellsTheTurn)
     }
 }
 
-TEST(PointInTriangle, isClosedButForTheCorners)
+TEST(PointInTriangle, includesEdgesButNotCorners)
 {
     float2 const a{0, 0}, b{4, 0}, c{0, 4};
     struct Case {
@@ -91,10 +91,10 @@ TEST(PointInTriangle, isClosedButForTheCorners)
              {{0, -0.0f}, {kAtCornerA, 1, 0, 0}},
              {{4, 0}, {kAtCornerB, 0, 1, 0}},
              {{0, 4}, {kAtCornerC, 0, 0, 1}},
-             {{5, 0}, {kOutsideTriangle, -0.25f, 1.25f, 0}}, // on the line of an edge, behind its end
+             {{5, 0}, {kOutsideTriangle, -0.25f, 1.25f, 0}}, // on the line of an edge, past its end
              {{-1, 1}, {kOutsideTriangle, 1, -0.25f, 0.25f}},
              {{3, 3}, {kOutsideTriangle, -0.5f, 0.75f, 0.75f}},
-             {{std::nextafter(0.0f, 1.0f), 0}, {kOnEdgeAB, 1, 0, 0}}, // beside a corner is not at it
+             {{std::nextafter(0.0f, 1.0f), 0}, {kOnEdgeAB, 1, 0, 0}}, // next to a corner
              {{2, std::nextafter(2.0f, 3.0f)}, {kOutsideTriangle, 0, 0.5f, 0.5f}},
          }) {
         SCOPED_TRACE(testing::PrintToString(p.x) + ", " + testing::PrintToString(p.y));
@@ -108,7 +108,7 @@ TEST(PointInTriangle, isClosedButForTheCorners)
     }
 }
 
-TEST(PointInTriangle, findsNothingWithoutAnArea)
+TEST(PointInTriangle, findsNothingInTrianglesWithoutArea)
 {
     std::vector<std::array<float2, 3>> const triangles{
         {{{0, 0}, {2, 2}, {4, 4}}},
@@ -128,7 +128,7 @@ TEST(PointInTriangle, findsNothingWithoutAnArea)
         EXPECT_FALSE(query(p, {0, 0}, {4, 0}, {0, 4}).isInside());
 }
 
-// Points about the shared edge of two triangles: whatever the rounding, each is in at least one of them.
+// Points near the shared edge of two triangles: however areas round, each is in at least one of them.
 TEST(PointInTriangle, leavesNoGapAtASharedEdge)
 {
     std::mt19937 random(2);

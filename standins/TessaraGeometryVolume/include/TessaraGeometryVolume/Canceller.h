@@ -6,19 +6,19 @@
 
 namespace TSR {
 
-/// Where loops announce to the host that they may be cancelled. This host looks at the job's own flag instead, and only
-/// counts the announcements, so that tests can see whether a loop makes them.
+/// Loops announce here that they can be cancelled. This host checks the job's own flag instead and only counts the
+/// announcements, so that tests can verify them.
 class TESSARAGEOMETRYVOLUME_EXPORT Canceller {
 public:
-    /// Which kind of place in a program announces itself.
+    /// The kind of place in a program that announces itself.
     struct ID {
         unsigned int value;
     };
 
-    /// Called from loop bodies, from any number of threads at once; it changes nothing in `place`.
+    /// Called from loop bodies, from any number of threads at once; `place` is not modified.
     static void cancelID(ID& place) noexcept;
 
-    /// How often `cancelID` was called since the start or the last reset. Exact once the calling threads are joined.
+    /// The number of calls of `cancelID` since the start or the last reset. Exact once the calling threads are joined.
     static std::uint64_t callCount() noexcept;
     static void resetCallCount() noexcept;
 };

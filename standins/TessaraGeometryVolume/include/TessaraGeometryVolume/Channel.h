@@ -11,11 +11,11 @@
 
 namespace TSR::TileTree3D {
 
-/// The values of a volume: `side`³ per tile that holds data. Tiles of equal values can share them. Read by any number of
-/// threads.
+/// The values of a volume: `side`³ per tile that holds data. Tiles of equal values can share them. Any number of threads
+/// may read a channel at once.
 template <class Traits, class T> class TESSARAGEOMETRYVOLUME_EXPORT Channel {
 public:
-    /// Without data. \param side  that of a tile, or one more for tiles that are padded on their upper sides
+    /// Without data. \param side  that of a tile, or one more for tiles with an additional layer on their upper sides
     explicit Channel(int side = Traits::kSide) noexcept
         : side_(side)
     {
@@ -26,7 +26,7 @@ public:
     Channel& operator=(Channel&&) noexcept = default;
     virtual ~Channel() = default;
 
-    /// Above it no tile has data. The deepest depth plus one if there is no data at all.
+    /// The lowest depth at which a tile has data. The deepest depth plus one if there is no data at all.
     virtual int coarsestDepth() const noexcept
     {
         int depth = 0;
@@ -35,7 +35,7 @@ public:
         return depth;
     }
 
-    /// Empty if the tile holds no data, and if tiles of this channel have another side.
+    /// Empty if the tile holds no data, or if tiles of this channel have another side.
     template <int side = Traits::kSide> ConstTileData<T, side, 0> tileData(TreeIndex tile) const noexcept
     {
         if (!tile.isValid() || side != side_)
@@ -48,7 +48,7 @@ public:
 
     int side() const noexcept { return side_; }
 
-    /// For those who fill a channel: the values of a tile, which are 0 when they are asked for first. \pre  not shared
+    /// For filling a channel: the values of a tile, added with zeros at the first call. \pre  not shared
     T* values(TreeIndex tile)
     {
         Level& level = levels_[tile.depth];
@@ -60,7 +60,7 @@ public:
         }
         return level.valuesOf(room, voxelCount());
     }
-    /// Lets a tile have the values of another one of its depth, which are stored once.
+    /// Makes a tile share the values of another one of its depth.
     void share(TreeIndex tile, TreeIndex other)
     {
         Level& level = levels_[tile.depth];
@@ -79,10 +79,10 @@ public:
 
 private:
     static constexpr std::uint32_t kNoRoom = ~std::uint32_t{0};
-    static constexpr std::size_t kPageRooms = 64; // so that growing copies nothing
+    static constexpr std::size_t kPageRooms = 64; // growing adds a page and copies no values
 
     struct Level {
-        std::vector<std::uint32_t> rooms, repeatedRooms; // of stored tiles, and of those from `kFirstRepeated` on
+        std::vector<std::uint32_t> rooms, repeatedRooms; // of stored tiles, and of repeated ones (`kFirstRepeated`)
         std::vector<std::vector<T>> pages;
         std::uint32_t roomCount = 0;
 

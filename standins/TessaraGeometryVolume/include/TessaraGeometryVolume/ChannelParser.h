@@ -13,14 +13,13 @@ namespace TSR::Utils {
 ///
 /// Entries are separated by blanks (also tabs and line ends) or commas, any number of them. In an entry `*` stands for
 /// any number of characters, `?` for one character (of UTF-8), everything else for itself, and upper case is not lower
-/// case. A leading `^` or `-` makes the entry one that excludes. The last entry that matches a name decides about it; a
-/// name that no entry matches is not accepted. So the empty list accepts nothing, and neither does one that only
-/// excludes.
+/// case. A leading `^` or `-` makes the entry exclude names. The last entry that matches a name decides; a name that no
+/// entry matches is not accepted. So an empty list accepts nothing, and neither does one that only excludes.
 ///
 /// Any number of threads may call `accepts` at once.
 class TESSARAGEOMETRYVOLUME_EXPORT ChannelParser {
 public:
-    /// Whether a list was well formed, and otherwise the first fault in a sentence.
+    /// Whether a list was well formed; if not, describes the first fault in a sentence.
     class Status {
     public:
         Status() = default;
@@ -41,12 +40,14 @@ public:
     ChannelParser() = default;
     ~ChannelParser() = default;
 
-    /// Replaces the list. Malformed is an entry that is a `^` or `-` without a pattern, or that has two of these signs
-    /// in front. Such an entry is left out, and the others stand: a slip in one entry must not turn the rest around.
+    /// Replaces the list. An entry is malformed if it is a `^` or `-` without a pattern, or begins with two of these signs.
+    /// Malformed entries are left out and the others are kept, so that a typing error in one entry does not invert the
+    /// meaning of the rest.
     /// \throws std::bad_alloc  the parser then keeps its old list
     Status parses(Orvan::String const& list);
 
-    /// Whether the list selects the name. Takes no memory; at worst the name's length times that of the list.
+    /// Whether the list selects the name. Allocates nothing; at worst takes time proportional to the length of the name
+    /// times that of the list.
     bool accepts(Orvan::String const& name) const;
 
 private:

@@ -8,8 +8,8 @@
 
 namespace TSR::TileTree3D {
 
-/// How a coarse tile is made of finer ones, of which most are alike: along each axis it is cut into parts, and all finer
-/// tiles in the same three parts have the same values.
+/// Describes the finer tiles in a coarse tile, if most of them are equal: the coarse tile is cut into parts along each
+/// axis, and all finer tiles in the same three parts have the same values.
 struct Division {
     std::array<std::vector<std::uint32_t>, 3> begins; // of parts, in finer tiles from the coarse tile's lower corner
     std::vector<std::uint32_t> tiles; // by part, x fastest: index of a repeated tile, or `kNoRepeated`
@@ -17,14 +17,14 @@ struct Division {
     static constexpr std::uint32_t kNoRepeated = ~std::uint32_t{0};
 };
 
-/// A tree of tiles: which parts of space a volume has values in. Any number of threads may read it at once, each with
-/// accessors of its own.
+/// A tree of tiles: the parts of space in which a volume has values. Any number of threads may read it at once, each with
+/// its own accessors.
 template <class Traits> class TESSARAGEOMETRYVOLUME_EXPORT Container {
 public:
     using TileType = Tile<Traits, Traits::kChildCount>;
     class ConstTileAccessor;
 
-    /// For the index of repeated tiles: the first of them. \pre  the tile is there
+    /// For an index of repeated tiles, the first of them. \pre  the tile exists
     TileType const& tile(std::uint64_t index, int depth) const
     {
         if (index >= kFirstRepeated)
@@ -32,44 +32,44 @@ public:
         return levels_[static_cast<std::size_t>(depth)].tiles[static_cast<std::size_t>(index)];
     }
 
-    /// A tile that is not valid where there is none.
+    /// An invalid tile if the index is invalid.
     TileType const& tile(TreeIndex index) const
     {
         return index.isValid() ? tile(index.index, static_cast<int>(index.depth)) : noTile();
     }
 
     std::size_t tileCount(int depth) const { return levels_[static_cast<std::size_t>(depth)].tiles.size(); }
-    /// How many indices repeated tiles have, all at one depth.
+    /// The number of indices of repeated tiles, which are all of one depth.
     std::uint32_t repeatedCount() const noexcept { return static_cast<std::uint32_t>(repeated_.size()); }
     int repeatedDepth() const noexcept { return repeatedDepth_; }
-    /// Of all depths, with the tables to find them by.
+    /// Of tiles of all depths, including the hash tables.
     std::size_t memoryInBytes() const;
 
-    /// The tile of exactly this depth that contains the index; one that is not valid where there is none.
+    /// The tile of exactly this depth that contains the index; an invalid one if there is none.
     TileType const& find(std::int64_t i, std::int64_t j, std::int64_t k, int depth) const;
 
-    /// The tile of this depth that contains the index, made with its values to come when it is not there.
-    /// \pre     the index fits 32 bits, and nothing else uses the container
+    /// The tile of this depth that contains the index. Adds one without values if there is none.
+    /// \pre     the index fits 32 bits, and no other thread uses the container
     /// \return  its number among the tiles of this depth
-    /// \throws  std::bad_alloc  also for 2^31 tiles; nothing has changed then
+    /// \throws  std::bad_alloc  also for 2^31 tiles; the container is unchanged then
     std::uint32_t findOrInsert(std::int64_t i, std::int64_t j, std::int64_t k, int depth, bool& isNew);
 
-    /// Makes a tile one that has values of its own.
+    /// Marks a tile as having values of its own.
     void setTerminal(std::uint32_t index, int depth);
-    /// Makes the parents that are missing, up to depth 0.
+    /// Adds missing parents, up to depth 0.
     void completeParents();
 
     /// Adds an index of repeated tiles. \param i, j, k  the lower corner of the first of them
     std::uint32_t addRepeated(std::int64_t i, std::int64_t j, std::int64_t k, int depth);
-    /// \return  the number to divide tiles by
+    /// \return  the number for `divide`
     std::int32_t addDivision(Division division);
-    /// Lets a tile stand for the finer ones of the division. \pre  no finer tile is inside
+    /// Makes a tile answer look-ups of finer tiles from the division. \pre  no finer tile is inside
     void divide(std::uint32_t index, int depth, std::int32_t division);
 
 private:
     struct Level {
         std::vector<TileType> tiles;
-        std::vector<std::uint32_t> slots; // numbers of tiles by hash; a power of two of them
+        std::vector<std::uint32_t> slots; // numbers of tiles by hash; the size is a power of two
     };
 
     static TileType const& noTile();
@@ -85,8 +85,8 @@ private:
     int repeatedDepth_ = Traits::kDepthCount;
 };
 
-/// A cursor that remembers the tile it was at, so that the next look-up nearby costs a comparison. Cheap to copy; it is
-/// for one thread, and for the container's life.
+/// A cursor that remembers its last tile, so that a look-up in the same tile costs a few comparisons. Cheap to copy. For
+/// one thread; the container must outlive it.
 template <class Traits> class TESSARAGEOMETRYVOLUME_EXPORT Container<Traits>::ConstTileAccessor {
 public:
     explicit ConstTileAccessor(Container const& container) noexcept
@@ -106,9 +106,9 @@ public:
         return *this;
     }
 
-    /// The tile at `depth` that contains the index. If there is none, the deepest one above it with values of its
-    /// own, which are valid for all that is deeper. Otherwise, and for a depth that the layout does not have, one whose
-    /// valid flag is false. A repeated tile is valid until the next call.
+    /// The tile at `depth` that contains the index. If there is none, the deepest coarser one with values of its own, which
+    /// apply to everything inside it. If there is none either, or if the layout does not have this depth, a tile whose
+    /// valid flag is false. A reference to a repeated tile is valid until the next call.
     TileType const& tileImpl(int i, int j, int k, int depth)
     {
         if (!(isAnswerAt(depth) && contains(*tile_, i, j, k)))
@@ -125,7 +125,7 @@ private:
     }
     static bool contains(TileType const& tile, std::int64_t i, std::int64_t j, std::int64_t k) noexcept
     {
-        // A distance below 0 is a large one without a sign.
+        // A negative distance becomes a large unsigned one.
         auto const width = static_cast<std::uint64_t>(Traits::tileWidth(tile.depth));
         return static_cast<std::uint64_t>(i - tile.i) < width && static_cast<std::uint64_t>(j - tile.j) < width
             && static_cast<std::uint64_t>(k - tile.k) < width;

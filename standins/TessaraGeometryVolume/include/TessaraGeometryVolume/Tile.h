@@ -7,23 +7,22 @@ namespace TSR::TileTree3D {
 /// Stored tiles have lower indices.
 inline constexpr std::uint32_t kFirstRepeated = std::uint32_t{1} << 31;
 
-/// What a tile is in a tree with `kChildCount` children to a tile, whatever their arrangement. Empty unless it belongs
-/// to a container: a cursor without a tile can rest on such a one.
+/// A tile in a tree with `childCount` children per tile, whatever their arrangement. Invalid by default; a cursor without
+/// a tile points to such a one.
 template <int childCount> struct TileBinaryNonCompatible {
-    // The corner with the lowest indices: a multiple of the tile's width, and so perhaps below what 32 bits hold.
+    // The corner with the lowest indices: a multiple of the tile's width, so perhaps below the range of 32 bits.
     std::int64_t i = 0, j = 0, k = 0;
-    std::int64_t parent = -1; // among the tiles one depth up; negative without one
+    std::int64_t parent = -1; // among the tiles one depth up; negative if none
     std::uint32_t index = 0; // among the tiles of its depth; repeated tiles share one from `kFirstRepeated` on
     std::int32_t depth = -1;
     bool valid = false;
-    bool isTerminal = false; // has values of its own: where the tree ends here, they stand for all that is deeper
+    bool isTerminal = false; // has values of its own; if the tree ends here, they apply at all deeper depths
     bool hasChildren = false;
-    // One of many tiles with the same values. It is not stored: it lasts until the accessor that made it looks elsewhere.
+    // One of many tiles with the same values. It is not stored, but valid until the next look-up of the accessor.
     bool isRepeated = false;
-    std::int32_t division =
-        -1; // which division of the container describes the finer tiles inside; negative without one
+    std::int32_t division = -1; // the container's division that describes the finer tiles inside; negative if none
 
-    /// No tile where this is not a valid one.
+    /// Invalid if this tile is.
     TreeIndex treeIndex() const noexcept
     {
         return valid ? TreeIndex{index, static_cast<std::uint32_t>(depth)} : TreeIndex();
@@ -33,7 +32,7 @@ template <int childCount> struct TileBinaryNonCompatible {
 template <class Traits, int childCount> struct Tile : TileBinaryNonCompatible<childCount> {
     static_assert(childCount == Traits::kChildCount);
 
-    /// No tile at depth 0.
+    /// Invalid at depth 0.
     TreeIndex parentTreeIndex() const noexcept
     {
         if (!this->valid || this->parent < 0)

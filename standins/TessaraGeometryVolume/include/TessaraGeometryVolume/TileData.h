@@ -4,11 +4,11 @@
 
 namespace TSR::TileTree3D {
 
-/// The values of a cube of `side`³ voxels, x fastest, that stand somewhere else; or none.
+/// A view of the values of a cube of `side`³ voxels, x fastest; may be empty.
 template <class T, int side, int> class ConstTileData {
 public:
     ConstTileData() noexcept = default;
-    /// \param firstCoordinate  of the first voxel along all axes: -1 in a tile with a halo all around
+    /// \param firstCoordinate  of the first voxel along all axes: -1 if the tile has a layer all around
     explicit ConstTileData(T const* values, int firstCoordinate = 0) noexcept
         : values_(values)
         , first_(firstCoordinate)
@@ -28,13 +28,13 @@ private:
     int first_ = 0;
 };
 
-/// The same with room of its own. Default constructed it has no values. A copy costs a copy of the room.
+/// The same with storage of its own. Empty if default constructed.
 template <class T, int side, int> class TileData {
 public:
     static constexpr int kVoxelCount = side * side * side;
 
-    TileData() noexcept { } // leaves the room as it is
-    /// With room for all values, which are to be written yet.
+    TileData() noexcept { } // leaves the storage uninitialized
+    /// All values are uninitialized.
     explicit TileData(int firstCoordinate) noexcept
         : first_(firstCoordinate)
         , hasValues_(true)
@@ -48,13 +48,13 @@ public:
     T operator()(int i, int j, int k) const noexcept { return values_[indexOf(i, j, k)]; }
     T const* values() const noexcept { return values_; }
 
-    /// Of what is here now, and for as long as it stays where it is.
+    /// A view of the current values, valid as long as this object.
     operator ConstTileData<T, side, 0>() const noexcept
     {
         return hasValues_ ? ConstTileData<T, side, 0>(values_, first_) : ConstTileData<T, side, 0>();
     }
 
-    /// For a room that is used again: values are to be written yet, or there are none.
+    /// For reuse: `reset` leaves the values uninitialized, `clear` leaves none.
     void reset(int firstCoordinate) noexcept
     {
         first_ = firstCoordinate;

@@ -13,7 +13,7 @@ namespace Internal {
         return dividend / divisor - (dividend % divisor < 0 ? 1 : 0);
     }
 
-    /// The depth at which a tile is one index unit wide, where tiles of depth 0 are as wide as 32-bit indices can tell.
+    /// The depth at which a tile is one index unit wide, if tiles of depth 0 are as wide as 32-bit indices allow.
     constexpr int deepestDepth(int childrenPerAxis)
     {
         int depth = 0;
@@ -42,8 +42,8 @@ namespace Internal {
 
 }
 
-/// How a tree of tiles is laid out. Space is measured in index units along three axes. A tile is a cube of `kSide`³
-/// voxels; the tiles of the next depth divide it into `kChildrenPerAxis`³ children of as many voxels each.
+/// The layout of a tree of tiles. Space is measured in index units along three axes. A tile is a cube of `kSide`³ voxels;
+/// the tiles of the next depth divide it into `kChildrenPerAxis`³ children of as many voxels each.
 template <int childrenPerAxis, int voxelsPerAxis, int, int> struct Traits {
     static constexpr int kChildrenPerAxis = childrenPerAxis;
     static constexpr int kChildCount = childrenPerAxis * childrenPerAxis * childrenPerAxis;
@@ -53,11 +53,11 @@ template <int childrenPerAxis, int voxelsPerAxis, int, int> struct Traits {
     static constexpr int kParentVoxels = kSide / kChildrenPerAxis;
     static_assert(kParentVoxels * kChildrenPerAxis == kSide);
 
-    /// Where a tile is one index unit wide. Depth 0 has the widest tiles that 32-bit indices can tell apart.
+    /// The depth at which a tile is one index unit wide. Depth 0 has the widest tiles that 32-bit indices allow.
     static constexpr int kDeepest = Internal::deepestDepth(kChildrenPerAxis);
     static constexpr int kDepthCount = kDeepest + 1;
     static constexpr auto kTileWidths = Internal::tileWidths<kChildrenPerAxis>();
-    /// Where a voxel is one index unit wide.
+    /// The depth at which a voxel is one index unit wide.
     static constexpr int kUnitDepth = [] {
         int depth = kDeepest;
         while (kTileWidths[static_cast<std::size_t>(depth)] < kSide)
@@ -68,17 +68,17 @@ template <int childrenPerAxis, int voxelsPerAxis, int, int> struct Traits {
     /// The width of a tile in index units.
     static constexpr std::int64_t tileWidth(int depth) { return kTileWidths[static_cast<std::size_t>(depth)]; }
 
-    /// Voxels an index unit: a fraction above `kUnitDepth`, the float nearest to it.
+    /// Voxels per index unit, rounded to float; below 1 at depths coarser than `kUnitDepth`.
     static constexpr float voxelsPerUnit(int depth) { return kVoxelsPerUnit[static_cast<std::size_t>(depth)]; }
     static constexpr auto kVoxelsPerUnit = Internal::voxelsPerUnit<kChildrenPerAxis, kSide>();
 };
 
-/// Two halves an axis, four voxels: smooth changes of resolution.
+/// Two children per axis and four voxels: resolution changes gradually.
 using Traits2 = Traits<2, 4, 0, 1>;
-/// Fifths, with tiles of five voxels: a flat tree.
+/// Five children per axis and five voxels: a flat tree.
 using Traits5 = Traits<5, 5, 0, 1>;
 
-/// Which tile: its number among those of its depth. All bits set where there is none.
+/// Identifies a tile by its number among those of its depth. All bits are set if there is none.
 struct TreeIndex {
     std::uint64_t index = ~std::uint64_t{0};
     std::uint32_t depth = ~std::uint32_t{0};

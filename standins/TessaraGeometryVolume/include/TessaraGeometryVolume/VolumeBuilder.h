@@ -12,7 +12,7 @@
 
 namespace TSR::TileTree3D {
 
-/// A sparse field of values: what there is of tiles, what stands in them, and what their values stand for.
+/// A sparse volume: its tiles, their values, and where in its voxel each value is.
 template <class Traits> struct Volume {
     Container<Traits> container;
     Channel<Traits, float> channel;
@@ -26,20 +26,21 @@ struct Voxel {
     float value;
 };
 
-/// Voxels of one depth. Of several values for the same voxel the last stands.
+/// Voxels of one depth. The last of several values for the same voxel is kept.
 struct VoxelList {
     int depth;
     std::span<Voxel const> voxels;
 };
 
-/// Some voxels of a cube of 8³, counted in voxels of the source's `depth`.
+/// Some voxels of a cube of 8³; coordinates count voxels of the source's `depth`.
 struct VoxelCube {
     IJK first;
     std::array<std::uint64_t, 8> active; // entry z, bit x + 8 * y
     std::size_t firstValue; // of the active voxels, x fastest, among the values of all cubes
 };
 
-/// All voxels from `first` up to but without `end`, counted in voxels of the source's `depth`, of one value.
+/// Voxels from `first` up to but excluding `end` along each axis, all of one value; coordinates count voxels of the
+/// source's `depth`.
 struct ConstantBox {
     IJK first, end;
     float value;
@@ -51,9 +52,9 @@ struct DenseBlock {
     float const* values;
 };
 
-/// What a volume is built from. Boxes do not overlap one another. Otherwise the finer source wins where sources overlap,
-/// and at one depth lists over boxes, cubes over both, and the block over all; the rest of a tile that is begun inside a
-/// coarser one has the coarser one's values.
+/// What a volume is built from. Boxes must not overlap one another. If other sources overlap, the finer one wins; at the
+/// same depth, lists win over boxes, cubes over both, and the block over all. The rest of a tile that is inside a coarser
+/// one gets the coarser one's values.
 struct VolumeSource {
     float background = 0;
     unsigned int offsetType = 7; // see VoxelTopology
@@ -63,30 +64,29 @@ struct VolumeSource {
     std::span<VoxelCube const> cubes = {};
     std::span<float const> cubeValues = {};
     DenseBlock block = {{0, 0, 0}, {0, 0, 0}, nullptr};
-    /// Tiles of all depths from this one on hold data, taken from those inside them. Never below that of the coarsest
-    /// source, which is also the default.
+    /// Tiles of this depth and all deeper ones hold data, computed from the tiles inside them. Clamped to the depth of the
+    /// coarsest source, which is also the default.
     std::optional<int> coarsestDepth = {};
 };
 
-/// Builds the tree in one go. A box is the same as all its voxels: any sample gives the same value to the bit. But if
-/// all data is at `depth` or deeper, tiles inside boxes, and along the sides of boxes, are stored once for all that have
-/// the same values; boxes of one value that touch are one. Tiles are numbered in the order in which they are first
-/// needed.
+/// Builds the tree. A box is equivalent to a list of all its voxels: any sample gives the same value to the bit. But if all
+/// data is at `depth` or deeper, tiles inside boxes and along their sides are stored once for all that have the same
+/// values; touching boxes of one value count as one. Tiles are numbered in the order in which they are first needed.
 ///
-/// Tiles between and above given ones take, along an axis with a set bit of `offsetType`, the value at the place of
-/// theirs, along one with a clear bit the mean of the voxels that they cover; if there is none, what a given tile
-/// above says, or `background`.
+/// Values of coarser tiles without a source of their own are computed from finer ones: along an axis with a set bit of
+/// `offsetType` the finer value at the same place, along an axis with a clear bit the mean of the voxels covered. If there
+/// are no finer ones, they are those of the next coarser tile with a source, or `background`.
 ///
-/// Linear in voxels. Memory is proportional to tiles with active voxels, and otherwise to the number of boxes: each
-/// takes some kilobytes at most, and tiles of its own only next to listed voxels or many other boxes. With coarser data
-/// boxes take time and memory for all their tiles.
-/// \throws std::invalid_argument  for a depth that the layout does not have, a voxel beyond 32-bit indices, and an
-///                                `offsetType` above 7
+/// Linear in the number of voxels. Memory is proportional to the number of tiles with active voxels plus the number of
+/// boxes: each box takes a few kilobytes at most, and tiles of its own only next to listed voxels or many other boxes. If
+/// there is coarser data, boxes take time and memory for all their tiles.
+/// \throws std::invalid_argument  if the layout does not have a depth, a voxel is beyond 32-bit indices, or `offsetType` is
+///                                above 7
 /// \throws std::bad_alloc         also for 2^31 tiles of one depth
 template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source);
 
-/// A channel with a layer more on the upper sides: what `setHaloTile` gives for every tile that has data. Samples
-/// then need no halo tiles of their own. Twice the memory of stored tiles; tiles of one value no longer share theirs.
+/// A channel whose tiles have an additional layer on their upper sides (`setHaloTile`), so that samplers need not build it.
+/// Twice the memory of stored tiles; tiles of one value no longer share theirs.
 template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume);
 
 extern template TESSARAGEOMETRYVOLUME_EXPORT Volume<Traits2> buildVolume(VolumeSource const& source);

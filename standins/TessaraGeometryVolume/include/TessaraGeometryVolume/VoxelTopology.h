@@ -2,7 +2,7 @@
 
 namespace TSR::TileTree3D {
 
-/// Where in its voxel a value stands: bit 0, 1, 2 of the offset type for the axes x, y, z. Set: at the lower side;
+/// Where in its voxel each value is: bits 0, 1, 2 of the offset type are for the axes x, y, z. Set: at the lower side;
 /// clear: in the middle.
 class VoxelTopology {
 public:

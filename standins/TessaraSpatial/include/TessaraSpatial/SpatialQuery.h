@@ -9,17 +9,17 @@
 
 namespace Tessara::SpatialQuery {
 
-// Signed areas are computed in double precision from the single-precision coordinates. Their signs are exact as long as
-// the coordinates that meet in a call are multiples of one unit of length and span at most 2^26 of it (all whole
-// numbers up to 33 million, all floats in [1, 8), ...). Beyond that a turn that is almost none may come out as another
-// one. To be compiled without contraction to fused multiply-adds: equal points would no longer cancel exactly.
+// Signed areas are computed in double precision from single-precision coordinates. Their signs are exact if the coordinates
+// of a call are multiples of a common unit and span at most 2^26 of it (all integers up to 33 million, all floats in
+// [1, 8), ...). Otherwise nearly collinear points may be classified wrongly. Must be compiled without contraction to fused
+// multiply-adds: equal points would no longer cancel exactly.
 //
 // Any number of threads may call these. They are inline because they run in inner loops.
 
-/// Which way a path turns, seen with x to the right and y up.
+/// The direction in which a path turns, seen with x to the right and y up.
 enum class PointEdgeOrientation : int { Clockwise = -1, Collinear = 0, CounterClockwise = 1 };
 
-/// Where a point lies in relation to a triangle; an edge is named for the corner that it does not touch.
+/// Where a point is in relation to a triangle.
 enum TrianglePlace : int {
     kOutsideTriangle = -1,
     kInsideTriangle = 0,
@@ -42,9 +42,10 @@ namespace Internal {
         return left - right;
     }
 
-    /// For a point inside: strictly so, or the edge for which its area (of the part against a, b, c) is 0.
+    /// For a point inside: in the interior, or on the edge whose triangle with the point has area 0. The areas are those
+    /// opposite a, b, c.
     TESSARASPATIAL_EXPORT TrianglePlace placeInside(double areaA, double areaB, double areaC) noexcept;
-    /// For a point that is not inside: the corner that it equals, if any.
+    /// For a point that is not inside: at the corner that it equals, or outside.
     TESSARASPATIAL_EXPORT TrianglePlace placeNotInside(
         Math::float2 const& p, Math::float2 const& a, Math::float2 const& b, Math::float2 const& c) noexcept;
 
@@ -55,8 +56,8 @@ namespace Internal {
 
 }
 
-/// How the path from a over b to c turns. `Collinear` also where any two of the points are equal (a path that comes
-/// back to its start never counts as a turn) and where a coordinate is not a number.
+/// How the path from a via b to c turns. `Collinear` also if any two of the points are equal (a path that returns to its
+/// start does not turn) or a coordinate is NaN.
 inline PointEdgeOrientation pointEdgeOrientation(Math::float2 const& a, Math::float2 const& b, Math::float2 const& c)
 {
     double const area = Internal::doubledArea(a, b, c);
@@ -65,16 +66,16 @@ inline PointEdgeOrientation pointEdgeOrientation(Math::float2 const& a, Math::fl
                       : PointEdgeOrientation::Collinear;
 }
 
-/// Whether p lies in the triangle a, b, c, of either winding, edges included; but a point that equals a corner does
-/// not. Points on an edge that two triangles share are in both of them, and no point falls between the two (where the
-/// signs are exact). Nothing lies in a triangle whose corners are collinear or not all finite, and, however areas
-/// round, no point outside the corners' bounding box does: callers may look at that first.
+/// Whether p is in the triangle a, b, c, of either winding, including its edges but excluding its corners. A point on an
+/// edge that two triangles share is in both of them, and if signs are exact, no point near it is in neither. No point is in
+/// a triangle whose corners are collinear or not all finite, nor, however areas round, if it is outside the corners'
+/// bounding box: callers may test that first.
 ///
-/// \param u, v, w  Always written: the barycentric values of p, the weights of a, b and c, also for p outside. They add
-///                 up to 1 but for rounding. All 0 where nothing can lie in the triangle; without meaning where only p
-///                 is not finite. A caller that ignores them does not pay for them.
-/// \param out      May be null. Otherwise receives the `TrianglePlace` of p: inside or on an edge where the result is
-///                 true; outside or at a corner where it is false.
+/// \param u, v, w  Always written: the barycentric coordinates of p, the weights of a, b and c, even if p is outside.
+///                 Their sum is 1, up to rounding. All 0 if no point can be in the triangle; unspecified if only p is not
+///                 finite. If a caller ignores them, the compiler removes their computation.
+/// \param out      May be null. Otherwise receives the `TrianglePlace` of p: inside or on an edge if the result is true;
+///                 outside or at a corner if it is false.
 inline bool pointInTriangle(Math::float2 const& p, Math::float2 const& a, Math::float2 const& b, Math::float2 const& c,
     float& u, float& v, float& w, int* out)
 {
@@ -82,11 +83,11 @@ inline bool pointInTriangle(Math::float2 const& p, Math::float2 const& a, Math::
     double const whole = std::abs(area);
     bool const hasInside = whole > 0.0 && whole < std::numeric_limits<double>::infinity();
     double const sign = area < 0.0 ? -1.0 : 1.0;
-    // All three start from p, so that the two triangles at an edge agree about the side of it on which p lies.
+    // All three start from p, so that the two triangles at an edge agree on which side of it p is.
     double const areaA = sign * Internal::doubledArea(p, b, c);
     double const areaB = sign * Internal::doubledArea(p, c, a);
     double const areaC = sign * Internal::doubledArea(p, a, b);
-    // The signs are as good as random to a branch predictor, so that the first three tests go without a branch.
+    // The signs are unpredictable, so the first three tests use no branches.
     bool const notOutside = (areaA >= 0.0) & (areaB >= 0.0) & (areaC >= 0.0);
     bool const inside = notOutside && hasInside && p != a && p != b && p != c && Internal::isBetween(p.x, a.x, b.x, c.x)
         && Internal::isBetween(p.y, a.y, b.y, c.y);
