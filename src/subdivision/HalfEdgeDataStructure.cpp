@@ -25,20 +25,16 @@ namespace {
         bool areTriangles; // as `isTriangleMesh`
     };
 
-    /// \pre of the constructor
+    /// The preconditions of the constructor.
     [[maybe_unused]] bool fitTogether(
-        FaceView const& faces, unsigned int pointCount, std::uint64_t offsetCount, std::uint64_t cornerCount)
+        unsigned int pointCount, unsigned int faceCount, IndexArray const& faceVertex, IndexArray const& faceOffset)
     {
-        if (faces.count == 0)
+        if (faceCount == 0)
             return true;
-        if (offsetCount <= faces.count)
+        if (faceOffset.size <= faceCount || !isNonDecreasing(faceOffset.data, std::size_t{faceCount} + 1))
             return false;
-        OffsetView const& offsets = faces.offsets;
-        for (std::size_t face = 0; face != faces.count; ++face)
-            if (offsets.begin(face) > offsets.end(face))
-                return false;
-        return offsets.begin(faces.count) <= cornerCount
-            && areBelow(pointCount, faces.corners(0), offsets.begin(faces.count) - offsets.begin(0));
+        unsigned int const first = faceOffset[0], last = faceOffset[faceCount];
+        return last <= faceVertex.size && areBelow(pointCount, faceVertex.data + first, last - first);
     }
 
     /// How faces are divided into blocks, and points into buckets. Directed edges are first sorted into the bucket of
@@ -238,8 +234,8 @@ HalfEdgeDataStructure::HalfEdgeDataStructure(
     unsigned int numPoints, unsigned int numFaces, IndexArray const& faceVertex, IndexArray const& faceOffset)
     : offsets_(uninitializedArray<unsigned int>(std::uint64_t{numPoints} + 1))
 {
+    MODELING_ASSERT(fitTogether(numPoints, numFaces, faceVertex, faceOffset));
     Faces const faces{{faceVertex.data, faceOffset, numFaces}, numFaces == 0 || isTriangleMesh(numFaces, faceOffset)};
-    MODELING_ASSERT(fitTogether(faces, numPoints, faceOffset.size, faceVertex.size));
     bool const hasRepeats = listEdges(faces, numPoints, offsets_.data, entries_);
     MODELING_ASSERT(areOffsets(offsets_.data, numPoints, entries_.size));
     if (!faces.areTriangles)
