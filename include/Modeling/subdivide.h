@@ -39,7 +39,10 @@ namespace Geometry::Mesh {
 ///                   runs out, or single places reach the limit of 31 steps.
 /// \param object     Reads and rewrites `sPointPosition` (one float3 per point), `sFaceVertex` (one point index per corner)
 ///                   and `sFaceOffset` (face count + 1 entries), and the counts of `sPointComp`, `sFaceVertexComp` and
-///                   `sFaceComp`. Arrays that are shared with other objects are copied, not modified.
+///                   `sFaceComp`. Arrays that are shared with other objects are copied, not modified. To follow the
+///                   progress of a run, override `setProperty` in a derived class: each pass that adds points sets every
+///                   kept property of points once its array has a value for each of them. On a closed mesh, each new point
+///                   adds two faces.
 /// \pre              A valid mesh whose faces have three corners. If it is not a closed manifold with a consistent
 ///                   orientation, nothing breaks, but the result is of little use. Points without a face become NaN.
 /// \return           False if some face has an edge that no face has in the other direction; the mesh has then lost the

@@ -7,7 +7,7 @@
 /// Grain sizes of parallel loops: how many elements a task works on at least, and up to how many a loop runs on the calling
 /// thread alone.
 ///
-/// With oneTBB 2021 on x86-64, starting a task takes about half a microsecond and waking a thread up several. oneTBB first
+/// With oneTBB 2021 on x86-64, starting a task takes about half a microsecond and waking up a thread takes several. oneTBB first
 /// cuts a range into a few parts per thread, and divides a part further only if a thread runs out of work. So a grain of 1
 /// costs nothing in long loops and balances uneven work; larger ones keep short loops off the scheduler.
 namespace Modeling {
@@ -15,24 +15,24 @@ namespace Modeling {
 /// A small fixed amount of work per element: copy, fill or transfer a value. 1000 take 0.2 to a few microseconds, so a
 /// task of fewer would take longer to start than to run.
 inline constexpr std::size_t kElementGrain = 1000;
-/// Writing to places that an index list tells: tens of nanoseconds each if they are not in the cache, 100 of them a few
+/// Scattered writes by an index list: tens of nanoseconds each if they miss the cache, so that 100 of them take a few
 /// microseconds.
 inline constexpr std::size_t kScatterGrain = 100;
-/// A whole face, with what is around it: work is uneven, and refinement or removal can concentrate it in few faces.
+/// A whole face: work is uneven, and refinement or removal can concentrate it in few faces.
 inline constexpr unsigned int kFaceGrain = 1;
 /// A point with its one-ring: uneven in the same way, most of all at points of high valence.
 inline constexpr unsigned int kOneRingGrain = 1;
 /// An input, a property, or a part of an array: microseconds to seconds each, and often few of them.
 inline constexpr std::size_t kCoarseGrain = 1;
-/// Sampling a volume at a point takes some nanoseconds once the tiles around are known. But each task copies the sampler,
-/// whose tables begin empty: 48 kilobytes to set up and tens of tiles to look up.
+/// Sampling a volume at a point takes some nanoseconds once the tiles around it are known. But each task copies the sampler,
+/// whose tables begin empty: 48 kilobytes to set up, and tens of tiles to look up.
 inline constexpr unsigned int kSampledPointGrain = 4096;
 
 /// Up to here, listing corners by point is done on the calling thread before a second one has woken up.
 inline constexpr unsigned int kFewPoints = 4096;
-/// The same for filling arrays of this many elements together.
+/// The same for arrays with this many elements in total that are filled at once.
 inline constexpr std::uint64_t kFewElements = 1 << 16;
-/// Into how many parts the points are cut if each part has to read all corners: more of them gain little.
+/// The maximum number of parts of the points if each part has to read all corners: more of them gain little.
 inline constexpr unsigned int kMostPointParts = 8;
 
 namespace Internal {

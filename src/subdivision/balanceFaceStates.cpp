@@ -22,8 +22,8 @@ namespace {
 
     constexpr unsigned int kCancelPlace = 4; // the host's number for this loop
 
-    /// The new state of a face, from its own state and those of its neighbors. Bits are only ever set, so repeating this
-    /// ends.
+    /// The new state of a face, from its own state and those of its neighbors. Bits are only ever set, so the sweeps come
+    /// to an end.
     unsigned char settledState(
         unsigned char state, std::array<unsigned int, 3> const& across, unsigned char const* states)
     {
@@ -113,6 +113,15 @@ namespace {
             return isChanged.load(std::memory_order_relaxed);
         }
 
+        /// What `takeNeighbors` promises.
+        [[maybe_unused]] bool knowsNeighborsOfSplitFaces() const
+        {
+            for (unsigned int face = 0; face != faceCount_; ++face)
+                if (isSplit(settled_[face]) && !hasNeighbors_[face])
+                    return false;
+            return true;
+        }
+
         FaceAdjacency takeNeighbors() { return std::move(neighbors_); }
 
     private:
@@ -179,20 +188,6 @@ namespace {
         return faceOffset[faceCount] == corners && halfEdges.size() == corners;
     }
 
-    /// What the rows of the refinement's neighbor table assume: a face that splits around a point has no coarser neighbor.
-    [[maybe_unused]] bool splitOnlyBesideFinerOrEqual(
-        unsigned int faceCount, FaceAdjacency const& neighbors, Orvan::Array<unsigned char> const& states)
-    {
-        for (unsigned int face = 0; face != faceCount; ++face) {
-            if (!isSplitAroundPoint(states[face]))
-                continue;
-            for (unsigned int const neighbor : neighbors[face])
-                if (neighbor != kInvalidIndex && levelOf(states[neighbor]) < levelOf(states[face]))
-                    return false;
-        }
-        return true;
-    }
-
     bool isAnyRequested(Orvan::Array<unsigned char> const& states, unsigned int faceCount)
     {
         return std::any_of(states.data, states.data + faceCount, isRequested);
@@ -215,9 +210,8 @@ FaceAdjacency balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned
         faceOffset.data, faceStates.data);
     balance.prepare();
     while (balance.sweep()) { }
-    FaceAdjacency neighbors = balance.takeNeighbors();
-    MODELING_ASSERT(splitOnlyBesideFinerOrEqual(numFaces, neighbors, faceStates));
-    return neighbors;
+    MODELING_ASSERT(balance.knowsNeighborsOfSplitFaces());
+    return balance.takeNeighbors();
 }
 
 bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,

@@ -16,7 +16,7 @@ constexpr unsigned int levelOf(unsigned char state)
 {
     return state >> 2;
 }
-/// The number of whole steps behind the face.
+/// The number of whole steps that led to the face.
 constexpr unsigned int stepOf(unsigned char state)
 {
     return state >> 3;

@@ -63,9 +63,9 @@ template <class Traits> void enterTile(TileCursor<Traits>& cursor, float3 const&
         return;
     cursor.voxelsPerUnit = Traits::voxelsPerUnit(tile.depth);
 
-    // A coarse tile may contain finer ones, and far away floats do not tell where a tile ends: there each point is looked
-    // up anew.
-    constexpr float kAllExact = 0x1p23f; // floats up to twice this one hold where tiles begin and end
+    // A coarse tile may contain finer ones, and large floats cannot represent where a tile ends: then the next point is
+    // looked up again.
+    constexpr float kAllExact = 0x1p23f; // floats up to twice this one represent all corners of tiles
     auto const width = static_cast<float>(Traits::tileWidth(tile.depth));
     bool const isExact = std::max({std::abs(p.x), std::abs(p.y), std::abs(p.z), width}) <= kAllExact;
     if (isExact && (tile.depth == depth || !tile.hasChildren)) {
@@ -79,7 +79,7 @@ template <class Traits> inline float3 distanceFromTile(TileCursor<Traits> const&
     float3 const& begin = cursor.tileBegin;
     if (std::isfinite(begin.x)) [[likely]]
         return {p.x - begin.x, p.y - begin.y, p.z - begin.z};
-    // Far away a float may not hold where the tile begins.
+    // A float may be too coarse to represent where the tile begins.
     auto const distance = [](float from, std::int64_t to) {
         return static_cast<float>(static_cast<double>(from) - static_cast<double>(to));
     };

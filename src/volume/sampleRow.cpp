@@ -96,7 +96,7 @@ namespace {
             float3 const& offset = settings_.voxelOffset;
             bool isInside = true;
             auto const place = [&](float coordinate, std::int64_t begin, float shift) {
-                // A float may not hold where a wide tile begins.
+                // A float may be too coarse to represent where a wide tile begins.
                 auto const distance =
                     static_cast<float>(static_cast<double>(coordinate * settings_.scale) - static_cast<double>(begin));
                 float const inTile = distance * voxelsPerUnit - shift;
@@ -165,7 +165,7 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
     if (!isPadded)
         findLayers(count, isPositive ? -kLargestOffset : 1, kSide - 1, row);
     std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
-    MODELING_ASSERT(std::none_of(row.values, row.values + runCount, [](float const* v) { return v == nullptr; }));
+    MODELING_ASSERT(std::find(row.values, row.values + runCount, nullptr) == row.values + runCount);
     MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);
     int const padded = kSide + (isPositive ? 1 : 2);
     TileArrays const arrays{{isPadded ? padded : kSide, padded}, isPositive ? 0 : -1, kSide - 1};

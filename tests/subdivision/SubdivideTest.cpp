@@ -335,6 +335,37 @@ TEST(Subdivide, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
     EXPECT_EQ(fingerprint(*refined(builder, 0.02f)), 15911402519549515617u) << "unlike other builds";
 }
 
+TEST(Subdivide, showsItsProgressInDataOfPoints)
+{
+    class Observed : public Object {
+    public:
+        explicit Observed(Object const& mesh)
+            : Object(mesh)
+        {
+        }
+        void setProperty(Orvan::String const& key, Tessara::PropertyValue&& value) override
+        {
+            Object::setProperty(key, std::move(value));
+            auto const carried = key == "carried" ? dataOf<float3>(*this, "carried") : nullptr;
+            if (carried && carried->size != pointCounts.back())
+                pointCounts.push_back(carried->size);
+        }
+        std::vector<std::uint64_t> pointCounts{0};
+    };
+    auto const builder = graded(MeshBuilder::sphere(6));
+    Observed observed(*meshOf(builder));
+    std::vector<std::uint64_t> expected{0};
+    ASSERT_TRUE(Steps::refineMesh(
+        [&](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
+            expected.push_back(m.positions.size); // of the pass before
+            Steps::markForSubdivision(0.03f, m.faceCount, m.positions, m.faceVertex, m.faceOffset, marks);
+        },
+        observed));
+    EXPECT_GT(expected.size(), 4u);
+    expected.erase(expected.begin() + 1); // the coarse mesh
+    EXPECT_EQ(observed.pointCounts, expected);
+}
+
 TEST(Subdivide, canBeCancelledInEveryPass)
 {
     auto const builder = graded(MeshBuilder::sphere(6));
