@@ -5,16 +5,17 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Numbers the elements that stay when some are deleted: their order stays, and the gaps close.
+/// Computes the new indices of a component's elements after some of them are deleted: the order of the others is kept,
+/// without gaps.
 ///
-/// \param deleted  One entry an element of a component; true means that the element goes.
-/// \pre            Fewer than 4,294,967,294 entries, so that indices stay clear of the sentinels.
-/// \return         One entry an element: its new index, which counts up from 0 over those that stay, or
-///                 `kDeletedElement`. So a new index is never above the old one. Such an array is what
-///                 `deleteComponents` takes.
+/// \param deleted  One entry per element of a component; true deletes the element.
+/// \pre            Fewer than 4,294,967,294 entries, so that indices differ from the sentinels.
+/// \return         One entry per element: its new index, which counts up from 0 over the kept elements, or
+///                 `kDeletedElement`. A new index is never greater than the old one. `deleteComponents` takes such
+///                 arrays.
 /// \throws         std::bad_alloc.
 ///
-/// One pass on the calling thread, 4 bytes an element.
+/// One pass on the calling thread; 4 bytes per element.
 MODELING_EXPORT Orvan::Array<unsigned int> computeDeletedComponentMapping(Orvan::Array<bool> const& deleted);
 
 }

@@ -7,14 +7,14 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Gives an object what its inputs hold beside geometry: every key whose value is no data, component or range property.
-/// Numbers, texts and arrays come along, and objects that are something else; held values are shared, not copied.
+/// Carries over to an object what its inputs hold besides geometry: every key whose value is not a component, data or
+/// range property, such as numbers, strings, arrays, and other objects. Arrays and objects are shared, not duplicated.
 ///
-/// \param inputs  Any objects. The first one that has a key gives its value.
-/// \param output  Keys that it has stay as they are.
+/// \param inputs  Any objects; null ones are skipped. The first one that has a key provides its value.
+/// \param output  Keys that it has already are kept unchanged.
 /// \throws        std::bad_alloc, with part of the keys copied.
 ///
-/// Runs on the calling thread: linear in the keys of all inputs.
+/// Runs on the calling thread. Linear in the number of keys of all inputs.
 MODELING_EXPORT void copyNonGeoProperties(
     Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs, Tessara::Object& output);
 

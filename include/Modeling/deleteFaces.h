@@ -6,27 +6,28 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Deletes faces of a mesh, with their corners and every point that no remaining face uses: also points that no face
-/// used before. The order of what stays does not change.
+/// Deletes faces of a mesh, with their corners and every point that no remaining face uses, including points that no
+/// face used before. The order of the other elements is kept.
 ///
-/// \param deleted  One entry a face; true means that the face goes. May be an array of the mesh.
-/// \param mesh     Faces with any number of corners. The counts of `sPointComp`, `sFaceVertexComp` and `sFaceComp`
-///                 change, and everything that targets one of them, as `deleteComponents` says. `sFaceVertex` (one
-///                 point index a corner) and `sFaceOffset` (face count + 1 entries) are renumbered. Other holders of
-///                 properties and arrays see no change.
-/// \pre            Every face has corners, offsets do not fall, and indices are in range. Otherwise nothing is read or
-///                 written outside the arrays, but entries may come out as sentinels: the offset of a face without
-///                 corners follows the corner behind it, and is `kDeletedElement` where that one goes.
-/// \return         False, with the mesh unchanged: it is no mesh, the length of `deleted` is not the number of faces,
-///                 `sFaceOffset` has not one entry more than that, one of the two index arrays is missing, of another
-///                 type, not that of its component or (`sFaceVertex`) shorter than it, or there are no points.
-///                 False, without rollback: the mesh has points but no corners, and loses all points; or there is a
-///                 range property that `deleteComponents` refuses. Points come first, then corners, then faces, and
-///                 what was in front stays done: the two index arrays may then hold old numbers.
-/// \throws         std::bad_alloc, with the mesh as it was. Job cancellation is not looked at.
+/// \param deleted  One entry per face; true deletes the face. May be an array of the mesh.
+/// \param mesh     Faces with any number of corners. Changes the counts of `sPointComp`, `sFaceVertexComp` and
+///                 `sFaceComp`, and all properties that target one of them, as `deleteComponents` does. Renumbers
+///                 `sFaceVertex` (one point index per corner) and `sFaceOffset` (face count + 1 entries). Other
+///                 references to properties and arrays see no change.
+/// \pre            Every face has corners, offsets are non-decreasing, and indices are in range. Otherwise nothing is
+///                 read or written outside the arrays, but entries may become sentinels: the offset of a face without
+///                 corners becomes the new index of the corner after it, or `kDeletedElement` if that corner is
+///                 deleted.
+/// \return         False, with the mesh unchanged: it is not a mesh or has no points, the length of `deleted` is not
+///                 the number of faces, `sFaceOffset` does not have one entry more, or one of the two index arrays is
+///                 missing, has another type, targets another component or (`sFaceVertex`) is shorter than it. False,
+///                 without rollback: the mesh has points but no corners, and loses all points; or `deleteComponents`
+///                 refuses a range property. Points come first, then corners, then faces, and what precedes the refusal
+///                 has been changed: the two index arrays may then hold old indices.
+/// \throws         std::bad_alloc, with the mesh unchanged.
 ///
-/// Linear in points, corners and faces. Used points are marked on the calling thread, arrays are compacted as
-/// `deleteComponents` says. Takes 5 bytes a point, and 4 for each point, corner and face that stays.
+/// Linear in the number of points, corners and faces. Marks used points on the calling thread, and compacts arrays as
+/// `deleteComponents` does. Uses 5 bytes per point, and 4 per kept point, corner and face.
 MODELING_EXPORT bool deleteFaces(Orvan::Array<bool> const& deleted, Tessara::Object& mesh);
 
 }

@@ -7,20 +7,20 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Deletes points of a point cloud, with their values in all properties. The order of the other points does not change.
+/// Deletes points of a point cloud, with their values in all properties. The order of the other points is kept.
 ///
-/// \param indices   Points to delete, in any order. Repeated ones count once; negative ones, and those at or beyond the
-///                  number of points, are ignored. May be an array of the cloud.
-/// \param object    A point cloud. The count of `sPointComp` and everything that targets it changes, as
-///                  `deleteComponents` says; other holders of properties and arrays see no change.
-/// \param services  Without effect; may be null.
-/// \return          True, also when `indices` is empty or names every point. False, with the object unchanged: it is no
-///                  point cloud, or one without points. False for range properties that `deleteComponents` refuses,
-///                  with what that says has been done.
-/// \throws          std::bad_alloc, with the object as it was. Job cancellation is not looked at.
+/// \param indices   Points to delete, in any order. Duplicates, negative indices, and those at or beyond the number of
+///                  points have no effect. May be an array of the cloud.
+/// \param object    A point cloud. Changes the count of `sPointComp` and all properties that target it, as
+///                  `deleteComponents` does. Other references to properties and arrays see no change.
+/// \param services  Ignored; may be null.
+/// \return          True, also if `indices` is empty or names every point. False, with the object unchanged: it is not
+///                  a point cloud, or has no points. False if `deleteComponents` refuses a range property, with the
+///                  changes that it documents for that case.
+/// \throws          std::bad_alloc, with the object unchanged. Does not look at job cancellation.
 ///
-/// Linear in points and indices. Points are marked in parallel, and arrays compacted as `deleteComponents` says. Takes
-/// a byte a point beside that.
+/// Linear in the number of points and indices. Marks points in parallel, and compacts arrays as `deleteComponents`
+/// does. Uses one more byte per point.
 MODELING_EXPORT bool deletePointsInPointCloud(
     Orvan::Array<unsigned int> const& indices, Tessara::Object& object, Orvan::RuntimeServices const* services);
 MODELING_EXPORT bool deletePointsInPointCloud(

@@ -8,35 +8,37 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Joins meshes into one: points, corners and faces of all inputs in their order, with all properties.
+/// Merges meshes into one: concatenates points, corners and faces of all inputs in their order, with all properties.
 ///
-/// The names of all inputs decide which properties there are. Of each name the first input in which it targets the
-/// component decides element type, default and target. Inputs without the property, or with one of another type, get
-/// the default; arrays that are too long for their component are cut off, those that are too short are filled up with
-/// the default. Merged properties have no dependencies, and the interpolation mode 1. What is no geo property of
-/// components, ranges or data comes from the first input that has the key.
+/// The merged mesh has the union of the inputs' property names. For each name, the first input in which the property
+/// targets the component defines element type, default and target. Inputs without the property, or with another element
+/// type, get the default. Arrays that are too long for their component are trimmed, and those that are too short are
+/// padded with the default. Merged properties have no dependencies and interpolation mode 1. Everything that is not a
+/// component, data or range property is carried over from the first input that has the key.
 ///
-/// A range property comes along with the data that targets it in the first input that has both; data that only later
-/// inputs have is lost. The data of each input is cut off to its shortest array, and the indices of an input are raised
-/// to where its data begins, `kInvalidIndex` too, which then means something else. Index arrays that are longer than
-/// their component run on into the elements of the next input where that has none of its own; those that are shorter
-/// leave zeros. Elements of inputs without the range get an index to a default behind all data; data of `GeometryType`,
-/// `GeoLocation`, `FaceEdge` and `GraphTransforms` has no such default, so that their index leads out of it.
+/// A range property is merged together with the data that targets it in the first input that has both; data that only
+/// later inputs have is dropped. The data of each input is trimmed to its shortest array, and its indices are rebased
+/// to where its data begins. So is `kInvalidIndex`, which then is an ordinary index. An index array that is longer than
+/// its component overruns into the elements of later inputs whose own index array is too short; elements that get no
+/// index at all get 0. Elements of inputs without the range get the index of a default after all data; data of
+/// `GeometryType`, `GeoLocation`, `FaceEdge` and `GraphTransforms` has no such default, so that these indices lead past
+/// its end.
 ///
-/// \param inputs  Those that the host's validator does not accept are skipped, silently, and so are null ones. The same
-///                object may stand in it several times, and the output may be one of them: it counts as what it was
-///                before the call.
-/// \param output  Receives the merged mesh. Its other keys stay. Where the result is false it is as it was, but: with
-///                all keys erased where an enclosing oneTBB group was cancelled; with the merged mesh, and without what
-///                is no geometry, where the first input has a connectivity array whose default is no `unsigned int`.
-/// \param runtimeServices  Not looked at; may be null.
-/// \return        False if no input is valid, there would be more than 2^32 - 1 elements of a component, or oneTBB skipped
+/// \param inputs  Null inputs, and those that the host's validator rejects, are skipped silently. An object may occur
+///                more than once, and the output may be one of the inputs: its properties before the call are merged.
+/// \param output  Receives the merged mesh; its other keys are kept. If the result is false, it is unchanged with two
+///                exceptions. If an enclosing oneTBB group was cancelled, all its keys are erased. If the first input
+///                has a connectivity array whose default is not an `unsigned int`, it receives the merged mesh, but
+///                nothing that is not geometry.
+/// \param runtimeServices  Ignored; may be null.
+/// \return        False if no input is valid, a component would have more than 2^32 - 1 elements, or oneTBB skipped
 ///                part of the work because an enclosing task group was cancelled.
-/// \throws        std::bad_alloc, also where the data of a range does not fit 32 bits, with the output as it was. Job
-///                cancellation is not looked at.
+/// \throws        std::bad_alloc, also if the data of a range does not fit 32 bits, with the output unchanged. Does not
+///                look at job cancellation.
 ///
-/// Runs in parallel over components, properties, inputs and elements, with the same result for any number of threads.
-/// Each byte of the result is written once; beside it next to nothing is taken. Inputs may be read by others meanwhile.
+/// Runs in parallel over components, properties, inputs and elements. The result does not depend on the number of
+/// threads. Writes each byte of the result once; temporary memory is small. Other threads may read the inputs
+/// meanwhile.
 MODELING_EXPORT bool mergeMeshes(Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs, Tessara::Object& output,
     Orvan::RuntimeServices const* runtimeServices);
 

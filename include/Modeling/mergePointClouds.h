@@ -8,17 +8,18 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Joins point clouds into one: the points of all inputs in their order, with all properties. What becomes of
-/// properties, of invalid inputs and of an output that is an input is as in `mergeMeshes`.
+/// Merges point clouds into one: concatenates the points of all inputs in their order, with all properties. Properties,
+/// invalid inputs and an output that is an input are treated as by `mergeMeshes`.
 ///
-/// \param output  Receives the merged cloud. Its other keys stay. Where the result is false it is as it was.
-/// \param runtimeServices  Not looked at; may be null.
-/// \return        False where no input is a valid point cloud, or there would be more than 2^32 - 1 points.
-/// \throws        std::bad_alloc, also where the data of a range does not fit 32 bits, with the output as it was. Job
-///                cancellation is not looked at.
+/// \param inputs  As for `mergeMeshes`.
+/// \param output  Receives the merged cloud; its other keys are kept. If the result is false, it is unchanged.
+/// \param runtimeServices  Ignored; may be null.
+/// \return        False if no input is a valid point cloud, or there would be more than 2^32 - 1 points.
+/// \throws        std::bad_alloc, also if the data of a range does not fit 32 bits, with the output unchanged. Does not
+///                look at job cancellation.
 ///
-/// Runs in parallel over properties, inputs and elements, with the same result for any number of threads. Each byte of
-/// the result is written once; beside it next to nothing is taken.
+/// Runs in parallel over properties, inputs and elements. The result does not depend on the number of threads. Writes
+/// each byte of the result once; temporary memory is small.
 MODELING_EXPORT bool mergePointClouds(Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs, Tessara::Object& output,
     Orvan::RuntimeServices const* runtimeServices);
 

@@ -10,31 +10,32 @@
 #include <type_traits>
 #include <utility>
 
-namespace Tessara::GeometryAlgorithms::Internal {
+namespace Modeling::Internal {
 
 using IndexArray = Orvan::Array<unsigned int>;
 
-/// The elements that stay, of as many as there were.
+/// The elements that are kept, out of `oldCount`.
 struct KeptElements {
     std::uint64_t oldCount = 0;
-    IndexArray sources; // for each element that stays its old index; ascending
+    IndexArray sources; // per kept element its old index, ascending
 };
 
-/// One array on its way to the elements that stay: into a new array, or in place where nobody else holds the old one.
+/// The compaction of one array to the kept elements: into a new array or, if the old one is not shared, in place.
 class ArrayCompaction {
 public:
     virtual ~ArrayCompaction() = default;
     virtual std::uint64_t newSize() const = 0;
-    /// Fills the new array, where there is one and where that cannot fail: on any thread.
+    /// Fills the new array, unless the compaction is in place or copying may throw. May be called on any thread.
     virtual void fill() = 0;
-    /// The compacted array, after the object has let go of the old one. Takes no memory.
-    virtual PropertyValue finish() = 0;
+    /// Returns the compacted array, once the object has released the old one. Does not allocate.
+    virtual Tessara::PropertyValue finish() = 0;
 
-    // For index arrays, before they are filled. What is referred to has to live until `finish`.
+    // For index arrays, before they are filled. The arguments must live until `finish`.
 
-    /// Entry e becomes `remap[e]`, or `kInvalidIndex` where the remap has no such entry.
+    /// Entry e becomes `remap[e]`, or `kInvalidIndex` if the remap is too short for it.
     virtual void renumber(IndexArray const&) { }
-    /// For offsets, with their one entry more: into the elements that stay of those into which the old ones are.
+    /// For offset arrays, which have one more entry: from old into new indices of the elements that the offsets refer
+    /// to.
     virtual void renumberOffsets(KeptElements const&) { }
 };
 
@@ -49,14 +50,14 @@ public:
         if (inPlace)
             return;
         target_ = Orvan::MutablePtr<Orvan::Array<T>>::make();
-        // An array that goes beyond its component may get its last entry back.
+        // Offset arrays, which are longer than their component, get a closing entry in the end.
         target_->reserve(kept_.size + (source_->size > kept.oldCount ? 1 : 0));
         target_->resize(kept_.size, Orvan::kUninitialized);
         if constexpr (!kTrivial)
             copyKept();
     }
 
-    std::uint64_t newSize() const final { return kept_.size; }
+    std::uint64_t newSize() const override { return kept_.size; }
 
     void fill() override
     {
@@ -65,7 +66,7 @@ public:
                 copyKept();
     }
 
-    PropertyValue finish() override
+    Tessara::PropertyValue finish() override
     {
         if (!target_)
             compactInPlace();
@@ -84,10 +85,10 @@ protected:
 
     void compactInPlace()
     {
-        target_ = makeMutable(std::move(source_)); // held by nobody else by now, so that this does not copy
+        target_ = makeMutable(std::move(source_)); // does not copy: this is the last reference
         T* const values = target_->data;
         unsigned int const* const source = kept_.data;
-        // Values only move forward, over those that have moved.
+        // Values only move forward, so none is overwritten before it has moved.
         for (std::uint64_t element = 0; element != kept_.size; ++element)
             if (source[element] != element)
                 values[element] = std::move(values[source[element]]);
@@ -96,10 +97,10 @@ protected:
 
     IndexArray const& kept_;
     Orvan::Ptr<Orvan::Array<T>> source_;
-    Orvan::MutablePtr<Orvan::Array<T>> target_; // null until `finish` for compaction in place
+    Orvan::MutablePtr<Orvan::Array<T>> target_; // if in place, null until `finish`
 };
 
-/// Finds new indices of elements. Asking in ascending order is quick.
+/// Maps old indices of elements to new ones. Fast for ascending queries.
 class NewIndices {
 public:
     explicit NewIndices(KeptElements const& kept)
@@ -108,7 +109,7 @@ public:
     {
     }
 
-    /// `kDeletedElement` for an element that goes, the new number of elements for an index beyond all.
+    /// The new index; `kDeletedElement` for a deleted element, and the new number of elements for an index beyond all.
     unsigned int of(unsigned int oldIndex)
     {
         if (oldIndex >= oldCount_)
@@ -116,25 +117,27 @@ public:
         if (last_ == sources_.size || sources_[last_] > oldIndex)
             last_ = 0;
         if (sources_.empty() || sources_[last_] > oldIndex)
-            return Geometry::kDeletedElement;
-        // As many elements further on as if none in between went, or before that.
-        std::uint64_t const most = std::min(last_ + (oldIndex - sources_[last_]), sources_.size - 1);
-        last_ = sources_[most] == oldIndex
-            ? most
+            return Tessara::Geometry::kDeletedElement;
+        // At the latest here, which it is if no element in between was deleted.
+        std::uint64_t const latest = std::min(last_ + (oldIndex - sources_[last_]), sources_.size - 1);
+        last_ = sources_[latest] == oldIndex
+            ? latest
             : static_cast<std::uint64_t>(
-                std::lower_bound(sources_.data + last_, sources_.data + most, oldIndex) - sources_.data);
-        return sources_[last_] == oldIndex ? static_cast<unsigned int>(last_) : Geometry::kDeletedElement;
+                std::lower_bound(sources_.data + last_, sources_.data + latest, oldIndex) - sources_.data);
+        return sources_[last_] == oldIndex ? static_cast<unsigned int>(last_) : Tessara::Geometry::kDeletedElement;
     }
 
 private:
     std::uint64_t oldCount_;
     IndexArray const& sources_;
-    std::uint64_t last_ = 0; // a new index near the one that was asked for last
+    std::uint64_t last_ = 0; // new index near that of the last query
 };
 
 class IndexCompaction final : public TypedCompaction<unsigned int> {
 public:
     using TypedCompaction::TypedCompaction;
+
+    std::uint64_t newSize() const override { return kept_.size + (offsetKept_ ? 1 : 0); }
 
     void renumber(IndexArray const& remap) override { remap_ = &remap; }
     void renumberOffsets(KeptElements const& kept) override { offsetKept_ = &kept; }
@@ -145,20 +148,20 @@ public:
             copyKept();
     }
 
-    PropertyValue finish() override
+    Tessara::PropertyValue finish() override
     {
         if (!target_) {
             compactInPlace();
             writeRenumbered(target_->data, nullptr);
         }
-        if (offsetKept_) // there is room for the entry that was cut off
+        if (offsetKept_) // does not allocate: there was room for the closing entry
             target_->append(static_cast<unsigned int>(offsetKept_->sources.size));
         return TypedCompaction::finish();
     }
 
 private:
-    /// Writes the new entries. False where they are the old ones.
-    /// \param source  where the old ones lie; null for the same places
+    /// Writes the renumbered entries. Returns false, with nothing written, if there is no renumbering.
+    /// \param source  Indices into `entries`; null if entries keep their places.
     bool writeRenumbered(unsigned int const* entries, unsigned int const* source)
     {
         auto const writeAll = [&](auto&& newEntryOf) {
@@ -170,8 +173,9 @@ private:
             writeAll(
                 [newIndices = NewIndices(*offsetKept_)](unsigned int entry) mutable { return newIndices.of(entry); });
         else if (remap_)
-            writeAll([remap = remap_->data, size = remap_->size](
-                         unsigned int entry) { return entry < size ? remap[entry] : Geometry::kInvalidIndex; });
+            writeAll([remap = remap_->data, size = remap_->size](unsigned int entry) {
+                return entry < size ? remap[entry] : Tessara::Geometry::kInvalidIndex;
+            });
         return remap_ || offsetKept_;
     }
 

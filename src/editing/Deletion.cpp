@@ -1,20 +1,22 @@
 #include "Deletion.h"
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "frame/ElementTypes.h"
 #include "host/GeoProperties.h"
 
 #include <Modeling/computeDeletedComponentMapping.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
-#include <TessaraGeometry/Prototypes.h>
 
 #include <algorithm>
+#include <functional>
 
-namespace Tessara::GeometryAlgorithms::Internal {
+namespace Modeling::Internal {
 
-using namespace Modeling;
 using namespace Tessara::Geometry;
+using Tessara::Object;
+using Tessara::PropertyValue;
 
 namespace {
 
@@ -28,7 +30,7 @@ namespace {
         return newIndex != kDeletedElement;
     }
 
-    /// \param entries  flags or a remap
+    /// \param entries  Flags or a remap.
     template <class Entries> KeptElements keptElements(Entries const& entries)
     {
         auto const* const entry = entries.data;
@@ -38,8 +40,8 @@ namespace {
 
         KeptElements kept{entries.size, uninitializedArray<unsigned int>(keptCount)};
         unsigned int* const source = kept.sources.data;
-        // Without a branch, which would go wrong half of the time: what is written for a deleted element is
-        // overwritten.
+        // Without a branch, which would be mispredicted half of the time: the index of a deleted element is overwritten
+        // by the next one.
         std::uint64_t count = 0;
         for (unsigned int element = 0; count != keptCount; ++element) {
             source[count] = element;
@@ -48,34 +50,56 @@ namespace {
         return kept;
     }
 
-    bool isDataProperty(Object const& property)
+    [[maybe_unused]] bool areAscending(KeptElements const& kept)
     {
-        return Object::isA(property, *getDataGeoPropPrototype(sGenericDataGeoProp));
+        IndexArray const& sources = kept.sources;
+        return std::is_sorted(sources.begin(), sources.end(), std::less_equal<>())
+            && (sources.empty() || sources[sources.size - 1] < kept.oldCount);
     }
 
-    std::uint64_t lengthOfData(Object const& property)
+    /// 0 if the value holds no array of a listed type.
+    std::uint64_t lengthOfArray(PropertyValue const& value)
     {
-        PropertyValue const data = property.getProperty(sData);
         std::uint64_t length = 0;
         bool matched = false;
-        forEachElementType<AllElementTypes, ArrayForm>(&data, &matched, [&](auto const& array) {
+        forEachElementType<AllElementTypes, ArrayForm>(&value, &matched, [&](auto const& array) {
             length = array ? array->size : 0;
             return true;
         });
         return length;
     }
 
-    /// Marks the values of a range's data to which no element that stays has an entry.
+    /// Marks the values of a range's data that no entry of a kept element refers to.
     Orvan::Array<bool> findUnused(std::uint64_t length, IndexArray const& indices, KeptElements const& kept)
     {
         Orvan::Array<bool> isUnused = filledArray<bool>(length, true);
         for (unsigned int const source : kept.sources)
-            if (indices[source] < length) // `kInvalidIndex` is not
+            if (indices[source] < length) // false for `kInvalidIndex`
                 isUnused[indices[source]] = false;
         return isUnused;
     }
 
-    /// Takes the array out of a clone of a property, so that the clone does not count as somebody else who holds it.
+    /// Whether entries that refer to a value still do after it has been renumbered.
+    [[maybe_unused]] bool leadsToKeptValues(
+        IndexArray const& indices, KeptElements const& kept, IndexArray const& dataRemap, std::uint64_t keptValueCount)
+    {
+        return std::all_of(kept.sources.begin(), kept.sources.end(), [&](unsigned int source) {
+            return indices[source] >= dataRemap.size || dataRemap[indices[source]] < keptValueCount;
+        });
+    }
+
+    /// Whether the array, or the property that holds it, has references outside the object, which would see an edit in
+    /// place.
+    /// \param localReferences  References to the array in the caller's variables.
+    template <class T> bool isShared(Object const& object, Orvan::String const& key,
+        Orvan::Ptr<Orvan::Array<T>> const& array, std::uint64_t localReferences)
+    {
+        constexpr std::uint64_t kOwner = 1; // the object holds the property, and the property holds the array
+        Orvan::Ptr<Object> const property = objectAt(object, key);
+        return property.useCount() > kOwner + 1 || array.useCount() > kOwner + localReferences;
+    }
+
+    /// Takes the array out of a clone of a property, so that the clone's reference does not count as sharing.
     PropertyValue takeArray(char const* arrayKey, Object& property)
     {
         PropertyValue array = property.getProperty(arrayKey);
@@ -105,19 +129,22 @@ template <class Entries> bool Deletion::prepareEntries(Orvan::String const& comp
 
 bool Deletion::prepare(Orvan::String const& component, KeptElements const& kept)
 {
+    MODELING_ASSERT(areAscending(kept));
     unsigned int const oldCount = getElementCount(object_, component);
     if (oldCount != kept.oldCount || oldCount == 0)
         return false;
-    // Setting what is set makes the component this object's own, so that its new count takes no memory.
+    // Setting the present count makes this object the only owner of the component, so that the commit does not
+    // allocate.
     if (!setElementCount(component, oldCount, object_))
         return false;
     counts_.push_back({component, static_cast<unsigned int>(kept.sources.size)});
 
     for (auto& [name, property] : collectGeoPropsByTarget(object_, component)) {
-        // Data without a match stays as it is, and that is no failure.
-        if (isDataProperty(*property))
+        GeoPropertyKind const kind = classifier_.kindOf(*property);
+        // Data without a matching array is kept unchanged, and that is no failure.
+        if (kind == GeoPropertyKind::Data)
             prepareArray<AllElementTypes>(name, sData, std::move(property), kept);
-        else if (Object::isA(*property, *getRangeGeoPropPrototype()) && !prepareRange(name, std::move(property), kept))
+        else if (kind == GeoPropertyKind::Range && !prepareRange(name, std::move(property), kept))
             return false;
     }
     return true;
@@ -133,39 +160,38 @@ bool Deletion::prepareRange(Orvan::String const& name, Orvan::MutablePtr<Object>
 
     IndexArray const* dataRemap = nullptr;
     for (auto& [dataName, data] : collectGeoPropsByTarget(object_, name)) {
-        if (!isDataProperty(*data))
+        if (classifier_.kindOf(*data) != GeoPropertyKind::Data)
             continue;
         if (!indices || dataRemap)
-            return false; // one data property with values to a range, and only where entries tell which are used
-        Orvan::Array<bool> const isUnused = findUnused(lengthOfData(*data), *indices, kept);
+            return false; // only one data property of a range may have values, and only if entries refer to them
+        Orvan::Array<bool> const isUnused = findUnused(lengthOfArray(data->getProperty(sData)), *indices, kept);
         kept_.push_back(std::make_unique<KeptElements>(keptElements(isUnused)));
         if (!isUnused.empty()) {
-            remaps_.push_back(std::make_unique<IndexArray>(computeDeletedComponentMapping(isUnused)));
+            remaps_.push_back(
+                std::make_unique<IndexArray>(Tessara::GeometryAlgorithms::computeDeletedComponentMapping(isUnused)));
             dataRemap = remaps_.back().get();
+            MODELING_ASSERT(leadsToKeptValues(*indices, kept, *dataRemap, kept_.back()->sources.size));
         }
         if (!prepareArray<AllElementTypes>(dataName, sData, std::move(data), *kept_.back()))
             return false;
     }
-    indices = nullptr;
+    indices = nullptr; // or it would count as sharing
     if (prepareArray<ElementTypeList<unsigned int>>(name, sIndices, std::move(range), kept) && dataRemap)
         renumber(name, *dataRemap);
     return true;
 }
 
-/// False where there is no array of these types that reaches over the component.
+/// Returns false if there is no array of these types that is at least as long as the component.
 template <class Types> bool Deletion::prepareArray(
     Orvan::String const& key, char const* arrayKey, Orvan::MutablePtr<Object>&& property, KeptElements const& kept)
 {
     PropertyValue const array = takeArray(arrayKey, *property);
-    constexpr std::uint64_t kOwnReferences = 2; // the object's and the one here
-    bool const isPropertyShared = objectAt(object_, key).useCount() > kOwnReferences;
     bool matched = false;
     forEachElementType<Types, ArrayForm>(&array, &matched, [&]<class T>(Orvan::Ptr<Orvan::Array<T>>& source) {
         if (!source || source->size < kept.oldCount)
             return false;
-        constexpr std::uint64_t kOwnArrayReferences = 3; // the property's, the value's and the one here
-        bool const isShared = isPropertyShared || source.useCount() > kOwnArrayReferences;
-        auto compaction = std::make_unique<CompactionOf<T>>(std::move(source), kept, !isShared);
+        bool const inPlace = !isShared(object_, key, source, 2); // `array` and `source`
+        auto compaction = std::make_unique<CompactionOf<T>>(std::move(source), kept, inPlace);
         if (!key.empty())
             changes_.push_back({key, arrayKey, std::move(property), std::move(compaction)});
         return true;
@@ -198,9 +224,9 @@ void Deletion::fillArrays()
     std::uint64_t elementCount = 0;
     for (Change const& change : changes_)
         elementCount += change.array->newSize();
-    constexpr std::uint64_t kFewElements = 1 << 16; // up to here one thread is done before a second one has woken up
+    constexpr std::uint64_t kFewElements = 1 << 16; // one thread is done with these before a second one has woken up
     std::size_t const grain = elementCount <= kFewElements ? changes_.size() : 1;
-    // Each property has a new array of its own.
+    // Each change fills an array of its own.
     parallelFor(tbb::blocked_range<std::size_t>(0, changes_.size(), grain), [this](auto const& range) {
         for (std::size_t change = range.begin(); change != range.end(); ++change)
             changes_[change].array->fill();
@@ -213,8 +239,10 @@ void Deletion::commit()
     for (Count const& count : counts_)
         setElementCount(count.component, count.count, object_);
     for (Change& change : changes_) {
-        object_.setProperty(change.key, Orvan::Ptr<Object>()); // lets go of the array, which may be edited in place
-        change.property->setProperty(change.arrayKey, change.array->finish());
+        object_.setProperty(change.key, Orvan::Ptr<Object>()); // releases the array, which may be edited in place
+        PropertyValue array = change.array->finish();
+        MODELING_ASSERT(lengthOfArray(array) == change.array->newSize());
+        change.property->setProperty(change.arrayKey, std::move(array));
         object_.setProperty(change.key, Orvan::Ptr<Object>(std::move(change.property)));
     }
     counts_.clear();

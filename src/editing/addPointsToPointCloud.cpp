@@ -8,6 +8,7 @@
 
 namespace Tessara::GeometryAlgorithms {
 
+using namespace Modeling;
 using namespace Tessara::Geometry;
 
 namespace {
@@ -19,7 +20,7 @@ namespace {
 
     bool hasPositions(Object const& object)
     {
-        return Modeling::readGeoPropData<Math::float3>(object, sPointPosition)
+        return readGeoPropData<Math::float3>(object, sPointPosition)
             && getGeoPropTargetName(object, sPointPosition) == sPointComp;
     }
 
@@ -30,10 +31,9 @@ bool addPointsToPointCloud(Orvan::Array<Math::float3> const& positions, Orvan::S
 {
     if (!Object::isA(object, *getPointCloudPrototype()) || hasOtherComponents(object) || !hasPositions(object))
         return false;
-    bool const keepsPositions =
-        tag != Orvan::String(sPointPosition); // the tag may lie in the object, so it is read now
-    Internal::NewValues const newPositions{sPointPosition, positions};
-    return Internal::extendComponent(sPointComp, positions.size, tag, newPositions, object) && keepsPositions;
+    bool const keepsPositions = tag != Orvan::String(sPointPosition); // read now: the tag may be stored in the object
+    Modeling::Internal::NewValues const newPositions{sPointPosition, positions};
+    return Modeling::Internal::extendComponent(sPointComp, positions.size, tag, newPositions, object) && keepsPositions;
 }
 
 }

@@ -6,7 +6,7 @@ namespace Tessara::GeometryAlgorithms {
 
 bool deleteComponents(Orvan::Array<unsigned int> const& remap, Orvan::String const& component, Object& object)
 {
-    Internal::Deletion deletion(object);
+    Modeling::Internal::Deletion deletion(object);
     bool const isDone = deletion.prepare(component, remap);
     deletion.commit();
     return isDone;

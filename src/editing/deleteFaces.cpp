@@ -2,6 +2,7 @@
 
 #include "Deletion.h"
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "host/GeoProperties.h"
 
 #include <Modeling/computeDeletedComponentMapping.h>
@@ -16,13 +17,13 @@ namespace Tessara::GeometryAlgorithms {
 
 using namespace Modeling;
 using namespace Tessara::Geometry;
-using Internal::Deletion;
-using Internal::IndexArray;
-using Internal::KeptElements;
+using Modeling::Internal::Deletion;
+using Modeling::Internal::IndexArray;
+using Modeling::Internal::KeptElements;
 
 namespace {
 
-    /// What goes and stays together with the faces.
+    /// The corners that are kept with the faces, and the points that are deleted with them.
     struct FaceElements {
         KeptElements corners;
         Orvan::Array<bool> unusedPoints;
@@ -36,8 +37,8 @@ namespace {
             && getGeoPropTargetName(mesh, sFaceVertex) == sFaceVertexComp;
     }
 
-    /// Calls `visit(first, end)` for the corners of each face that stays. The calls ascend and do not overlap, whatever
-    /// the offsets are.
+    /// Calls `visit(first, end)` for the corners of each kept face. The ranges ascend and do not overlap, even if the
+    /// offsets do.
     template <class Visit> void forEachCornerRange(
         Orvan::Array<bool> const& deleted, IndexArray const& faceOffset, unsigned int cornerCount, Visit const& visit)
     {
@@ -69,7 +70,7 @@ namespace {
         return kept;
     }
 
-    /// A point goes unless a corner that stays uses it.
+    /// Marks the points that no kept corner uses.
     Orvan::Array<bool> findUnusedPoints(
         KeptElements const& corners, IndexArray const& faceVertex, unsigned int pointCount)
     {
@@ -80,7 +81,15 @@ namespace {
         return isUnused;
     }
 
-    /// Nothing where the index arrays do not fit the mesh.
+    /// Whether the points of all kept corners are kept.
+    [[maybe_unused]] bool keepsPointsOfCorners(FaceElements const& elements, IndexArray const& faceVertex)
+    {
+        Orvan::Array<bool> const& isUnused = elements.unusedPoints;
+        return std::all_of(elements.corners.sources.begin(), elements.corners.sources.end(),
+            [&](unsigned int corner) { return faceVertex[corner] >= isUnused.size || !isUnused[faceVertex[corner]]; });
+    }
+
+    /// Returns nullopt if the index arrays do not fit the mesh.
     std::optional<FaceElements> findFaceElements(Orvan::Array<bool> const& deleted, Object const& mesh)
     {
         auto const faceOffset = readGeoPropData<unsigned int>(mesh, sFaceOffset);
@@ -90,10 +99,12 @@ namespace {
         FaceElements elements;
         elements.corners = findKeptCorners(deleted, *faceOffset, getElementCount(mesh, sFaceVertexComp));
         elements.unusedPoints = findUnusedPoints(elements.corners, *faceVertex, getElementCount(mesh, sPointComp));
+        MODELING_ASSERT(keepsPointsOfCorners(elements, *faceVertex));
         return elements;
     }
 
-    /// Points, then corners, then faces. An index array is renumbered when its component is prepared as a whole.
+    /// Points, then corners, then faces. An index array is renumbered once its whole component has been prepared: if
+    /// that is refused, it keeps its old numbers.
     bool prepareDeletion(Orvan::Array<bool> const& deleted, FaceElements const& elements, IndexArray const& pointRemap,
         Deletion& deletion)
     {

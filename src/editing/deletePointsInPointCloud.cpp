@@ -21,11 +21,13 @@ namespace {
         Orvan::Array<bool> marks = zeroedArray<bool>(pointCount);
         bool* const mark = marks.data;
         Index const* const index = indices.data;
-        // Several threads may meet at a point, and all of them store the same.
+        // Several threads may mark the same point, and all of them store the same value.
         parallelFor(tbb::blocked_range<std::size_t>(0, indices.size, kScatterGrain), [=](auto const& range) {
-            for (std::size_t i = range.begin(); i != range.end(); ++i)
-                if (auto const point = static_cast<std::uint64_t>(index[i]); point < pointCount) // negative: large
+            for (std::size_t i = range.begin(); i != range.end(); ++i) {
+                auto const point = static_cast<std::uint64_t>(index[i]); // negative indices become large
+                if (point < pointCount)
                     std::atomic_ref<bool>(mark[point]).store(true, std::memory_order_relaxed);
+            }
         });
         return marks;
     }
@@ -34,7 +36,7 @@ namespace {
     {
         if (!Object::isA(object, *getPointCloudPrototype()))
             return false;
-        Internal::Deletion deletion(object);
+        Modeling::Internal::Deletion deletion(object);
         bool const isDone = deletion.prepare(sPointComp, markPoints(indices, getElementCount(object, sPointComp)));
         deletion.commit();
         return isDone;

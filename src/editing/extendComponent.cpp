@@ -1,6 +1,7 @@
 #include "extendComponent.h"
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "frame/ElementTypes.h"
 #include "host/GeoProperties.h"
 
@@ -13,9 +14,11 @@
 #include <limits>
 #include <type_traits>
 
-namespace Tessara::GeometryAlgorithms::Internal {
+namespace Modeling::Internal {
 
-using namespace Modeling;
+using Tessara::Object;
+using Tessara::PropertyValue;
+namespace Math = Tessara::Math;
 using namespace Tessara::Geometry;
 using IndexArray = Orvan::Array<unsigned int>;
 
@@ -28,8 +31,8 @@ namespace {
         NewValues const& given;
     };
 
-    /// An array of `newCount` elements that begins as `source` does, with nothing behind that yet, and with the
-    /// capacity that a copy of `source` has after growing.
+    /// A copy of `source` that is trimmed or extended to `newCount` elements, with the capacity that growing gives. The
+    /// added elements are uninitialized.
     template <class T> Orvan::Array<T> grownCopy(Orvan::Array<T> const& source, std::uint64_t newCount)
     {
         std::uint64_t const added = newCount - std::min(source.size, newCount);
@@ -37,21 +40,14 @@ namespace {
         copy.reserve(added == 0 ? newCount : source.size + std::max(source.size, added));
         copy.resize(newCount, Orvan::kUninitialized);
         std::uint64_t const copied = newCount - added;
-        if constexpr (std::is_trivially_copyable_v<T>)
-            copyElements(source.data, copied, copy.data);
-        else
-            std::copy_n(source.data, copied, copy.data); // host strings are not for worker threads
+        copyElements(source.data, copied, copy.data);
         return copy;
     }
 
     template <class T> void fillFrom(std::uint64_t first, T const& value, Orvan::Array<T>& array)
     {
-        if (first >= array.size)
-            return;
-        if constexpr (std::is_trivially_copyable_v<T>)
+        if (first < array.size)
             fillElements(array.data + first, array.size - first, value);
-        else
-            std::fill(array.data + first, array.data + array.size, value);
     }
 
     template <class T>
@@ -61,23 +57,24 @@ namespace {
         PropertyValue const defaultValue = property.getProperty(sDefault);
         T const* const fallback = defaultValue.get<T>();
         fillFrom(source.size, fallback ? *fallback : T{}, array);
+        MODELING_ASSERT(array.size == newCount);
         return array;
     }
 
-    /// The array with the given values at the end, which are written once.
+    /// Like `extended`, but the new elements get the given values.
     Orvan::Array<Math::float3> extendedByGiven(
         Orvan::Array<Math::float3> const& source, Object const& property, Extension const& extension)
     {
         std::uint64_t const oldCount = extension.oldCount;
         Orvan::Array<Math::float3> array = source.size < oldCount
-            ? extended(source, property, extension.newCount) // some old elements lack a value too
+            ? extended(source, property, extension.newCount) // some old elements have no value either
             : grownCopy(source, extension.newCount);
         copyElements(extension.given.values.data, extension.newCount - oldCount, array.data + oldCount);
         return array;
     }
 
-    /// The value of `sData` for the new count. Empty where the property has no array, or one of a type that is not
-    /// known to be extended: such arrays are lost, on purpose.
+    /// The value of `sData` for the new count. Empty if the property has no array, or one that is not of a core type:
+    /// what cannot be extended is dropped.
     PropertyValue extendedData(Orvan::String const& name, Object const& property, Extension const& extension)
     {
         PropertyValue const data = property.getProperty(sData);
@@ -99,7 +96,7 @@ namespace {
         return result;
     }
 
-    /// Calls `visit(name, property)` for the geo properties of a kind that target the component.
+    /// Visits the geo properties of a kind that target the component: `visit(name, property)`.
     template <class Visit> void forEachProperty(
         Object const& object, Object const& prototype, Orvan::String const& component, Visit const& visit)
     {
@@ -116,7 +113,7 @@ namespace {
                 PropertyValue data = extendedData(name, *property, extension);
                 Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
                 changed->setProperty(sData, std::move(data));
-                writes.setProperty(name, Orvan::Ptr<Tessara::Object>(std::move(changed)));
+                writes.setProperty(name, Orvan::Ptr<Object>(std::move(changed)));
             });
     }
 
@@ -131,17 +128,17 @@ namespace {
                 fillFrom(source->size, kInvalidIndex, indices);
                 Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
                 changed->setProperty(sIndices, Orvan::makePtr<IndexArray>(std::move(indices)));
-                writes.setProperty(name, Orvan::Ptr<Tessara::Object>(std::move(changed)));
+                writes.setProperty(name, Orvan::Ptr<Object>(std::move(changed)));
             });
     }
 
-    /// A boolean property of the points that is true for the new elements.
+    /// A boolean data property of the points that is true for the new elements.
     Orvan::MutablePtr<Object> makeTag(Extension const& extension)
     {
         Orvan::Array<bool> isNew = uninitializedArray<bool>(extension.newCount);
         fillElements(isNew.data, extension.oldCount, false);
         fillElements(isNew.data + extension.oldCount, extension.newCount - extension.oldCount, true);
-        Orvan::MutablePtr<Object> tag = createObject();
+        Orvan::MutablePtr<Object> tag = Tessara::createObject();
         populateTag(sPointComp, Orvan::makePtr<Orvan::Array<bool>>(std::move(isNew)), *tag);
         return tag;
     }
@@ -154,17 +151,17 @@ bool extendComponent(Orvan::String const& component, std::uint64_t addCount, Orv
     std::uint64_t const oldCount = getElementCount(object, component);
     if (addCount > std::numeric_limits<unsigned int>::max() - oldCount)
         return false;
+    MODELING_ASSERT(given.values.size == addCount);
     Extension const extension{component, oldCount, oldCount + addCount, given};
 
-    // The arguments may lie in the object itself: they are read before its first change.
+    // The arguments may be stored in the object itself: they are read before its first change.
     PreparedWrites writes(object);
     if (!writes.setElementCount(component, static_cast<unsigned int>(extension.newCount)))
         return false;
     prepareData(extension, object, writes);
     prepareRanges(extension, object, writes);
-    if (!tag.empty())
-        writes.setProperty(tag,
-            Orvan::Ptr<Tessara::Object>(makeTag(extension))); // comes last, so that it replaces whatever has the name
+    if (!tag.empty()) // last, so that the tag replaces any other property of that name
+        writes.setProperty(tag, Orvan::Ptr<Object>(makeTag(extension)));
     writes.commit();
     return true;
 }

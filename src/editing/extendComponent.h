@@ -7,19 +7,20 @@
 
 #include <cstdint>
 
-namespace Tessara::GeometryAlgorithms::Internal {
+namespace Modeling::Internal {
 
-/// Values for the new elements of one float3 property, in place of its default: one an element.
+/// Values for the new elements of one float3 property, which get these instead of its default: one value per element.
 struct NewValues {
     Orvan::String property;
-    Orvan::Array<Math::float3> const& values;
+    Orvan::Array<Tessara::Math::float3> const& values;
 };
 
 /// Adds elements to a component, and values for them to all data and range properties that target it, as
 /// `addPointsToPointCloud` says for points. A tag, which is stored unless its name is empty, always targets the points.
-/// \return  false, with nothing changed, where there is no such component or the new count exceeds 32 bits
-/// \throws  std::bad_alloc, with the object as it was
+/// \pre     `given` has one value per new element.
+/// \return  False, with nothing changed, if there is no such component or the new count exceeds 32 bits.
+/// \throws  std::bad_alloc, with the object as it was.
 bool extendComponent(Orvan::String const& component, std::uint64_t addCount, Orvan::String const& tag,
-    NewValues const& given, Object& object);
+    NewValues const& given, Tessara::Object& object);
 
 }

@@ -1,12 +1,13 @@
 #include "MergePlan.h"
 
+#include "frame/Assert.h"
 #include "frame/ParallelFor.h"
 
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Names.h>
-#include <TessaraGeometry/Prototypes.h>
 
+#include <limits>
 #include <numeric>
 
 namespace Modeling::Internal {
@@ -17,8 +18,8 @@ using Tessara::PropertyValue;
 
 namespace {
 
-    /// False where the value holds no array of that type.
-    template <class T> bool findArray(PropertyValue const& value, HeldArray& found)
+    /// Whether the value holds an array of type `T`, or a null reference to one: `found` then stays empty.
+    template <class T> bool findArray(PropertyValue const& value, ArrayView& found)
     {
         auto const* const array = value.get<ArrayForm::Of<T>>();
         if (array && *array)
@@ -26,7 +27,7 @@ namespace {
         return array;
     }
 
-    using FindArray = bool (*)(PropertyValue const&, HeldArray&);
+    using FindArray = bool (*)(PropertyValue const&, ArrayView&);
 
     template <class... T> constexpr auto findersOf(ElementTypeList<T...>)
     {
@@ -35,27 +36,25 @@ namespace {
 
     constexpr auto kArrayFinders = findersOf(AllElementTypes{});
 
-    /// The names and prototypes that every look-up needs, made once.
-    struct Vocabulary {
-        explicit Vocabulary(std::initializer_list<char const*> componentNames)
-            : components(componentNames.begin(), componentNames.end())
+    /// The strings and prototypes that every look-up needs, made once for all threads.
+    struct LookupKeys {
+        explicit LookupKeys(std::vector<Orvan::String> const& planned)
+            : components(planned)
         {
         }
 
-        std::vector<Orvan::String> components;
-        Orvan::String nobody; // owns what has no owner
+        std::vector<Orvan::String> const& components;
+        Orvan::String noOwner;
         Orvan::String data = sData;
         Orvan::String target = sTarget;
-        Orvan::Ptr<Object> dataPrototype = getDataGeoPropPrototype(sGenericDataGeoProp);
-        Orvan::Ptr<Object> rangePrototype = getRangeGeoPropPrototype();
-        Orvan::Ptr<Object> componentPrototype = getComponentGeoPropPrototype();
+        GeoPropertyClassifier classifier;
     };
 
-    /// Looks inputs up, one after the other: what is as in the input before costs least.
+    /// Looks up successive inputs. What equals the previous input costs the least.
     class InputReader {
     public:
-        explicit InputReader(Vocabulary const& words)
-            : words_(words)
+        explicit InputReader(LookupKeys const& keys)
+            : keys_(keys)
         {
         }
 
@@ -63,17 +62,17 @@ namespace {
         {
             MergeInput result;
             result.object = &input;
-            for (std::size_t component = 0; component != words_.components.size(); ++component)
-                result.counts[component] = getElementCount(input, words_.components[component]);
-            Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = input.keys();
-            isNewLayout_ = !layout_ || roles_.size() != keys->size;
-            roles_.resize(keys->size);
-            likelyTypes_.resize(keys->size, HeldArray::kNoType);
-            result.arrays.resize(keys->size);
-            for (std::size_t place = 0; place != keys->size; ++place) {
-                update(roles_[place].name, keys->data[place]);
-                result.arrays[place] = readProperty(input, likelyTypes_[place], roles_[place]);
-                likelyTypes_[place] = result.arrays[place].type;
+            for (std::size_t component = 0; component != keys_.components.size(); ++component)
+                result.counts[component] = getElementCount(input, keys_.components[component]);
+            Orvan::Ptr<Orvan::Array<Orvan::String>> const names = input.keys();
+            isNewLayout_ = !layout_ || roles_.size() != names->size;
+            roles_.resize(names->size);
+            likelyTypes_.resize(names->size, ArrayView::kNoType);
+            result.arrays.resize(names->size);
+            for (std::size_t property = 0; property != names->size; ++property) {
+                update(roles_[property].name, names->data[property]);
+                result.arrays[property] = readProperty(input, likelyTypes_[property], roles_[property]);
+                likelyTypes_[property] = result.arrays[property].type;
             }
             if (isNewLayout_)
                 layout_ = Orvan::makePtr<PropertyLayout>(roles_);
@@ -82,30 +81,29 @@ namespace {
         }
 
     private:
-        HeldArray readProperty(Object const& input, unsigned char likelyType, PropertyRole& role)
+        ArrayView readProperty(Object const& input, unsigned char likelyType, PropertyRole& role)
         {
             PropertyValue const value = input.getProperty(role.name);
             auto const* const object = value.get<Orvan::Ptr<Object>>();
             if (!object || !*object) {
-                updateRole(PropertyRole::Kind::Other, words_.nobody, role);
+                updateRole(GeoPropertyKind::None, keys_.noOwner, role);
                 return {};
             }
             Object const& property = **object;
-            if (Object::isA(property, *words_.dataPrototype)) {
-                PropertyValue const target = property.getProperty(words_.target);
+            GeoPropertyKind const kind = keys_.classifier.kindOf(property);
+            if (kind == GeoPropertyKind::Data) {
+                PropertyValue const target = property.getProperty(keys_.target);
                 auto const* const name = target.get<Orvan::String>();
-                updateRole(PropertyRole::Kind::Data, name ? *name : words_.nobody, role);
-            } else if (Object::isA(property, *words_.rangePrototype)) {
-                updateRole(PropertyRole::Kind::Range, getTargetComponent(input, role.name), role);
+                updateRole(kind, name ? *name : keys_.noOwner, role);
+            } else if (kind == GeoPropertyKind::Range) {
+                updateRole(kind, getTargetComponent(input, role.name), role);
             } else {
-                bool const isComponent = Object::isA(property, *words_.componentPrototype);
-                updateRole(
-                    isComponent ? PropertyRole::Kind::Component : PropertyRole::Kind::Other, words_.nobody, role);
+                updateRole(kind, keys_.noOwner, role);
             }
-            return HeldArray::in(property.getProperty(words_.data), likelyType);
+            return ArrayView::of(property.getProperty(keys_.data), likelyType);
         }
 
-        void updateRole(PropertyRole::Kind kind, Orvan::String const& owner, PropertyRole& role)
+        void updateRole(GeoPropertyKind kind, Orvan::String const& owner, PropertyRole& role)
         {
             update(role.kind, kind);
             update(role.owner, owner);
@@ -119,19 +117,19 @@ namespace {
             isNewLayout_ = true;
         }
 
-        Vocabulary const& words_;
-        Orvan::Ptr<PropertyLayout> layout_; // of the input before
-        std::vector<PropertyRole> roles_; // those of the layout, and brought up to date while an input is read
-        std::vector<unsigned char> likelyTypes_; // of the arrays of the input before
+        LookupKeys const& keys_;
+        Orvan::Ptr<PropertyLayout> layout_; // of the previous input
+        std::vector<PropertyRole> roles_; // those of `layout_`, updated while an input is read
+        std::vector<unsigned char> likelyTypes_; // element types of the previous input's arrays
         bool isNewLayout_ = true;
     };
 
 }
 
-HeldArray HeldArray::in(PropertyValue const& value, unsigned char likely)
+ArrayView ArrayView::of(PropertyValue const& value, unsigned char likelyType)
 {
-    HeldArray found;
-    if (value.empty() || (likely != kNoType && kArrayFinders[likely](value, found)))
+    ArrayView found;
+    if (value.empty() || (likelyType != kNoType && kArrayFinders[likelyType](value, found)))
         return found;
     std::any_of(kArrayFinders.begin(), kArrayFinders.end(), [&](FindArray find) { return find(value, found); });
     return found;
@@ -148,21 +146,23 @@ PropertyLayout::PropertyLayout(std::vector<PropertyRole> const& roles)
 
 std::optional<std::size_t> PropertyLayout::find(Orvan::String const& name) const
 {
-    auto const place = std::lower_bound(byName_.begin(), byName_.end(), name,
-        [&](std::uint32_t candidate, Orvan::String const& wanted) { return roles_[candidate].name < wanted; });
-    if (place == byName_.end() || roles_[*place].name != name)
+    auto const index = std::lower_bound(byName_.begin(), byName_.end(), name,
+        [&](std::uint32_t candidate, Orvan::String const& sought) { return roles_[candidate].name < sought; });
+    if (index == byName_.end() || roles_[*index].name != name)
         return std::nullopt;
-    return *place;
+    return *index;
 }
 
 MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*> components,
     std::function<bool(Object const&)> const& accepts)
 {
-    Vocabulary const words(components);
-    MergePlan plan{std::vector<MergeInput>(inputs.size())};
-    // Each input has its own entry.
+    MODELING_ASSERT(components.size() <= MergeInput::kMaxComponents);
+    MODELING_ASSERT(std::find(inputs.begin(), inputs.end(), nullptr) == inputs.end());
+    MergePlan plan{{components.begin(), components.end()}, std::vector<MergeInput>(inputs.size())};
+    LookupKeys const keys(plan.components);
+    // Each input writes its own entry.
     parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), kFaceGrain), [&](auto const& range) {
-        InputReader reader(words);
+        InputReader reader(keys);
         for (std::size_t input = range.begin(); input != range.end(); ++input)
             if (accepts(*inputs[input]))
                 plan.inputs[input] = reader.read(*inputs[input]);
@@ -174,6 +174,24 @@ MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*
 MergePlan planMerge(MergeInputs const& validInputs, std::initializer_list<char const*> components)
 {
     return planMerge(validInputs, components, [](Object const&) { return true; });
+}
+
+std::optional<Offsets> computeElementOffsets(MergePlan const& plan, Orvan::String const& component)
+{
+    auto const planned = std::find(plan.components.begin(), plan.components.end(), component);
+    MODELING_ASSERT(planned != plan.components.end());
+    auto const index = static_cast<std::size_t>(planned - plan.components.begin());
+    std::size_t const inputCount = plan.inputs.size();
+    Offsets offsets(inputCount + 1, Orvan::kUninitialized);
+    std::uint64_t total = 0;
+    for (std::size_t input = 0; input != inputCount; ++input) {
+        offsets[input] = static_cast<unsigned int>(total);
+        total += plan.inputs[input].counts[index];
+        if (total > std::numeric_limits<unsigned int>::max())
+            return std::nullopt;
+    }
+    offsets[inputCount] = static_cast<unsigned int>(total);
+    return offsets;
 }
 
 MergeInputs withoutNulls(Orvan::Array<Orvan::Ptr<Object>> const& inputs)

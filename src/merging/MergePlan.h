@@ -1,6 +1,7 @@
 #pragma once
 
 #include "frame/ElementTypes.h"
+#include "host/GeoPropertyKind.h"
 
 #include <OrvanCore/Array.h>
 #include <OrvanCore/Ptr.h>
@@ -19,89 +20,96 @@
 
 namespace Modeling::Internal {
 
-/// What a merge has to know of its inputs, looked up once. All of it lives for one merge.
+/// What a merge needs to know about its inputs, looked up once. All of it lives for one merge.
 ///
-/// Nothing here counts as a reference to what the inputs hold: with thousands of small inputs, counting would cost more
-/// than copying. The caller's references keep the inputs, and who holds a reference changes nothing.
+/// Nothing here adds references to what the inputs hold: with thousands of small inputs, counting references would cost
+/// more than copying the values. The caller's references keep the inputs alive.
 
-/// The inputs of a merge. The output may be one of them: nothing is written to it before the merge has been made.
+/// The inputs of a merge. The output may be one of them: it is not written until the result is complete.
 using MergeInputs = std::vector<Tessara::Object const*>;
 
-/// The elements of an array of a listed type, which somebody else holds.
-struct HeldArray {
+/// A non-owning view of an array of any listed element type.
+struct ArrayView {
     static constexpr unsigned char kNoType = 255;
 
     void const* data = nullptr;
     std::uint64_t size = 0;
-    unsigned char type = kNoType; // place in `AllElementTypes`
+    unsigned char type = kNoType; // index in `AllElementTypes`
 
     explicit operator bool() const { return type != kNoType; }
 
-    /// The array in a value. Types are tried in the order of the list, but first the one at the place `likely`.
-    static HeldArray in(Tessara::PropertyValue const& value, unsigned char likely);
+    /// Views the array that a value holds; empty if it holds none of a listed type.
+    /// \param likelyType  tried first, before all types in the order of the list
+    static ArrayView of(Tessara::PropertyValue const& value, unsigned char likelyType = kNoType);
 };
 
 /// What a property is to its input.
 struct PropertyRole {
-    enum class Kind : unsigned char { Data, Range, Component, Other };
-
     Orvan::String name;
-    Orvan::String owner; // of data its target; of a range the component that it belongs to in the end
-    Kind kind = Kind::Other;
+    Orvan::String owner; // for data, its target; for a range, the component that its chain of targets leads to
+    GeoPropertyKind kind = GeoPropertyKind::None;
 };
 
 inline bool isData(PropertyRole const& role)
 {
-    return role.kind == PropertyRole::Kind::Data;
+    return role.kind == GeoPropertyKind::Data;
 }
 
-/// The properties of an input in the order of its keys. Inputs of one make share theirs.
+/// The properties of an input in the order of its keys. Consecutive inputs with equal properties share one layout.
 class PropertyLayout {
 public:
     explicit PropertyLayout(std::vector<PropertyRole> const& roles);
 
     std::vector<PropertyRole> const& roles() const { return roles_; }
-    /// Where a property stands.
+    /// The index of a property among the roles.
     std::optional<std::size_t> find(Orvan::String const& name) const;
 
 private:
     std::vector<PropertyRole> roles_;
-    std::vector<std::uint32_t> byName_; // places, by ascending names
+    std::vector<std::uint32_t> byName_; // indices into `roles_`, in ascending order of names
 };
 
 struct MergeInput {
-    static constexpr std::size_t kMostComponents = 3;
+    static constexpr std::size_t kMaxComponents = 3;
 
     Tessara::Object const* object = nullptr;
     Orvan::Ptr<PropertyLayout> layout;
-    std::vector<HeldArray> arrays; // what each property of the layout holds under `sData`
-    std::array<unsigned int, kMostComponents> counts{}; // elements of each merged component
+    std::vector<ArrayView> arrays; // per property of the layout, the array under `sData`
+    std::array<unsigned int, kMaxComponents> counts{}; // elements of each component of the plan
 };
 
-/// The inputs that passed validation, whose order is the order of the merged elements.
+/// The accepted inputs, whose order is the order of the merged elements.
 struct MergePlan {
+    std::vector<Orvan::String> components;
     std::vector<MergeInput> inputs;
 };
 
-/// Looks those inputs up that are accepted, in parallel.
-/// \param components  those that are merged: up to three
-/// \param accepts     `bool (Tessara::Object const&)`, called from several threads
+/// Looks up the accepted inputs, in parallel.
+/// \param components  Those to merge, at most `MergeInput::kMaxComponents`.
+/// \param accepts     `bool (Tessara::Object const&)`, called from several threads.
+/// \pre               No input is null.
 MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*> components,
     std::function<bool(Tessara::Object const&)> const& accepts);
-/// The same for inputs that all are accepted.
+/// The same if all inputs are accepted.
 MergePlan planMerge(MergeInputs const& validInputs, std::initializer_list<char const*> components);
+
+/// Per input its first element in something merged, and as last entry the total.
+using Offsets = Orvan::Array<unsigned int>;
+
+/// The first element of each input in a merged component, and the total; nullopt if the total does not fit 32 bits.
+/// \param component  One of the plan's.
+std::optional<Offsets> computeElementOffsets(MergePlan const& plan, Orvan::String const& component);
 
 MergeInputs withoutNulls(Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs);
 
-/// The inputs that a validator of the host accepts, each asked on its own.
+/// The inputs that one of the host's validators accepts. Each input gets a validator of its own.
 template <class Validator> MergeInputs filterValid(MergeInputs inputs)
 {
     std::erase_if(inputs, [](Tessara::Object const* input) { return !Validator().validate(*input); });
     return inputs;
 }
 
-/// Calls `visit(input)` for inputs in their order, but for those that have the layout of the one before: what depends on
-/// the layout alone has been seen there.
+/// Visits the first input of each run of inputs that share a property layout.
 template <class Visit> void forEachLayout(MergePlan const& plan, Visit const& visit)
 {
     PropertyLayout const* previous = nullptr;
@@ -110,7 +118,7 @@ template <class Visit> void forEachLayout(MergePlan const& plan, Visit const& vi
             visit(input);
 }
 
-/// Finds one property in one input after the other.
+/// Finds one property in successive inputs. Searches again only if the layout changes.
 class PropertyFinder {
 public:
     explicit PropertyFinder(Orvan::String const& name)
@@ -118,25 +126,25 @@ public:
     {
     }
 
-    /// The place of the property among those of the input.
-    std::optional<std::size_t> placeIn(MergeInput const& input)
+    /// The index of the property among the roles of the input.
+    std::optional<std::size_t> indexIn(MergeInput const& input)
     {
         if (std::exchange(layout_, input.layout.get()) != input.layout.get())
-            place_ = layout_->find(name_);
-        return place_;
+            index_ = layout_->find(name_);
+        return index_;
     }
 
-    /// What the property holds under `sData`, if it is of a listed type.
-    HeldArray arrayIn(MergeInput const& input)
+    /// The array that the property holds under `sData`.
+    ArrayView arrayIn(MergeInput const& input)
     {
-        std::optional<std::size_t> const place = placeIn(input);
-        return place ? input.arrays[*place] : HeldArray();
+        std::optional<std::size_t> const index = indexIn(input);
+        return index ? input.arrays[*index] : ArrayView();
     }
 
 private:
     Orvan::String const& name_;
     PropertyLayout const* layout_ = nullptr;
-    std::optional<std::size_t> place_;
+    std::optional<std::size_t> index_;
 };
 
 }

@@ -1,6 +1,7 @@
 #include "MergedComponents.h"
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "host/GeoProperties.h"
 
 #include <TessaraGeometry/Lookup.h>
@@ -22,7 +23,7 @@ void transferComponentProperties(Orvan::String const& component, Tessara::Object
 
 void rebaseRegions(Offsets const& regionOffsets, Orvan::Array<unsigned int>& values, Offsets const& baseOffsets)
 {
-    // Each region is one iteration's own. The base of the first one is 0.
+    // Each region belongs to one iteration. The base of the first one is 0.
     parallelFor(tbb::blocked_range<std::size_t>(1, baseOffsets.size - 1, kFaceGrain), [&](auto const& regions) {
         for (std::size_t region = regions.begin(); region != regions.end(); ++region) {
             unsigned int const base = baseOffsets[region];
@@ -40,8 +41,9 @@ void rebaseRegions(Offsets const& regionOffsets, Orvan::Array<unsigned int>& val
 
 bool finishConnectivity(Connectivity const& connectivity, Offsets const& regionOffsets, Tessara::Object& output)
 {
+    MODELING_ASSERT(regionOffsets.size == connectivity.baseOffsets.size);
     if (!connectivity.merged)
-        return false; // what the output holds is not what was merged
+        return false;
     if (readGeoPropData<unsigned int>(output, connectivity.name) == connectivity.merged)
         return true;
     return editGeoPropData<unsigned int>(connectivity.name, output, [&](Orvan::Array<unsigned int>& values) {

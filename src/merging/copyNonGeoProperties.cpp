@@ -1,41 +1,47 @@
 #include <Modeling/copyNonGeoProperties.h>
 
-#include <TessaraGeometry/Names.h>
-#include <TessaraGeometry/Prototypes.h>
+#include "copyNonGeoProperties.h"
+#include "host/GeoPropertyKind.h"
 
 #include <utility>
 
-namespace Tessara::GeometryAlgorithms {
+namespace Modeling::Internal {
 
-using namespace Tessara::Geometry;
+using Tessara::Object;
+using Tessara::PropertyValue;
 
 namespace {
 
-    bool isGeoProperty(PropertyValue const& value)
+    void copyNonGeoPropertiesOf(Object const& input, GeoPropertyClassifier const& classifier, Object& output)
     {
-        auto const* const object = value.get<Orvan::Ptr<Object>>();
-        return object && *object
-            && (Object::isA(**object, *getDataGeoPropPrototype(sGenericDataGeoProp))
-                || Object::isA(**object, *getComponentGeoPropPrototype())
-                || Object::isA(**object, *getRangeGeoPropPrototype()));
+        Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = input.keys();
+        for (Orvan::String const& key : *keys) {
+            if (key.empty() || output.hasProperty(key))
+                continue;
+            PropertyValue value = input.getProperty(key);
+            if (classifier.kindOf(value) == GeoPropertyKind::None)
+                output.setProperty(key, std::move(value));
+        }
     }
 
 }
 
+void copyNonGeoProperties(MergePlan const& plan, Object& output)
+{
+    GeoPropertyClassifier const classifier;
+    forEachLayout(plan, [&](MergeInput const& input) { copyNonGeoPropertiesOf(*input.object, classifier, output); });
+}
+
+}
+
+namespace Tessara::GeometryAlgorithms {
+
 void copyNonGeoProperties(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output)
 {
-    for (Orvan::Ptr<Object> const& input : inputs) {
-        if (!input)
-            continue;
-        Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = input->keys();
-        for (Orvan::String const& key : *keys) {
-            if (key.empty() || output.hasProperty(key))
-                continue;
-            PropertyValue value = input->getProperty(key);
-            if (!isGeoProperty(value))
-                output.setProperty(key, std::move(value));
-        }
-    }
+    Modeling::GeoPropertyClassifier const classifier;
+    for (Orvan::Ptr<Object> const& input : inputs)
+        if (input)
+            Modeling::Internal::copyNonGeoPropertiesOf(*input, classifier, output);
 }
 
 }

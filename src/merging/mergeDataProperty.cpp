@@ -19,30 +19,30 @@ namespace {
         void const* values;
         std::uint64_t available;
         std::uint64_t count;
-        std::uint64_t first; // the place of its first element in the merged array
+        std::uint64_t first; // index of its first element in the merged array
     };
 
-    /// Small arrays lie here and there, and each begins with a wait for memory: this one is over when it is needed.
+    /// Small arrays are scattered in memory, and each costs a cache miss: this starts loading the next one early.
     void prefetchStart(MergeInput const& input, PropertyFinder& find)
     {
         constexpr std::size_t kCacheLine = 64;
         auto const* const bytes = static_cast<char const*>(find.arrayIn(input).data);
         for (std::size_t line = 0; bytes && line != 4; ++line)
-            __builtin_prefetch(bytes + line * kCacheLine); // has no effect behind the end
+            __builtin_prefetch(bytes + line * kCacheLine); // has no effect past the end
     }
 
     /// Calls `write(input, contribution)` for all inputs, from several threads.
-    /// \param type  the place of the element type: arrays of others contribute nothing
+    /// \param type  Index of the element type. Arrays of other types contribute nothing.
     template <class Write> void forEachContribution(MergePlan const& plan, Offsets const& offsets,
         Orvan::String const& name, unsigned char type, Write const& write)
     {
-        // Each input writes the elements from its own offset on.
+        // Each input writes its own elements, from its offset on.
         parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kFaceGrain), [&](auto const& range) {
             PropertyFinder find(name);
             for (std::size_t input = range.begin(); input != range.end(); ++input) {
                 if (input + 1 != range.end())
                     prefetchStart(plan.inputs[input + 1], find);
-                HeldArray const array = find.arrayIn(plan.inputs[input]);
+                ArrayView const array = find.arrayIn(plan.inputs[input]);
                 std::uint64_t const count = offsets[input + 1] - offsets[input];
                 std::uint64_t const available = array.type == type ? std::min(array.size, count) : 0;
                 write(input, Contribution{array.data, available, count, offsets[input]});
@@ -50,10 +50,10 @@ namespace {
         });
     }
 
-    /// Writes elements of any type that may be copied as bytes: one loop over the inputs serves them all.
+    /// Writes elements of any trivially copyable type, so that one loop over the inputs is compiled for all of them.
     struct ByteWriter {
         std::byte* target;
-        std::size_t size; // of an element
+        std::size_t size; // of one element, in bytes
         void const* defaultValue;
 
         void operator()(std::size_t, Contribution const& from) const
@@ -74,7 +74,7 @@ namespace {
         }
     };
 
-    /// One place more is reserved behind the array: a closing entry or a default is appended without another copy.
+    /// Has capacity for one more element, so that appending a closing entry or a default does not reallocate.
     template <class T> Orvan::Array<T> arrayForMerging(Offsets const& offsets)
     {
         std::uint64_t const total = offsets[offsets.size - 1];
@@ -96,15 +96,15 @@ namespace {
         return merged;
     }
 
-    /// As `concatenate`, and raised: in one pass over the memory.
-    Orvan::Array<unsigned int> concatenateRaised(
+    /// Concatenates and rebases in one pass over the memory.
+    Orvan::Array<unsigned int> concatenateRebased(
         MergePlan const& plan, Offsets const& offsets, Connectivity const& connectivity, unsigned int defaultValue)
     {
         Orvan::Array<unsigned int> merged = arrayForMerging<unsigned int>(offsets);
         forEachContribution(plan, offsets, connectivity.name, kPlaceOfElementType<unsigned int>,
             [&, target = merged.data](std::size_t input, Contribution const& from) {
                 unsigned int const base = connectivity.baseOffsets[input];
-                copyRaised(static_cast<unsigned int const*>(from.values), from.available, base, target + from.first);
+                copyRebased(static_cast<unsigned int const*>(from.values), from.available, base, target + from.first);
                 fillElements(target + from.first + from.available, from.count - from.available, defaultValue + base);
             });
         if (connectivity.closingEntry)
@@ -119,7 +119,12 @@ namespace {
 
 }
 
-void copyRaised(unsigned int const* source, std::size_t count, unsigned int base, unsigned int* target)
+DataPropertyMergeEntry dataEntry(MergeInput const& input, Orvan::String const& name)
+{
+    return {name, objectAt(*input.object, name), {}};
+}
+
+void copyRebased(unsigned int const* source, std::size_t count, unsigned int base, unsigned int* target)
 {
     // Each block writes its own elements.
     parallelFor(tbb::blocked_range<std::size_t>(0, count, kBlockGrain<unsigned int>), [=](auto const& elements) {
@@ -137,7 +142,7 @@ void mergeDataProperty(
         if constexpr (std::is_same_v<T, unsigned int>) {
             if (connectivity) {
                 connectivity->merged =
-                    Orvan::makePtr<Orvan::Array<T>>(concatenateRaised(plan, offsets, *connectivity, value));
+                    Orvan::makePtr<Orvan::Array<T>>(concatenateRebased(plan, offsets, *connectivity, value));
                 entry.mergedData = connectivity->merged;
                 return true;
             }
@@ -153,7 +158,7 @@ void appendDefaultValue(DataPropertyMergeEntry& entry)
     bool ignored = false;
     forEachElementType<CoreElementTypes, PlainForm>(&defaultValue, &ignored, [&]<class T>(T& value) {
         auto shared = *entry.mergedData.get<Orvan::Ptr<Orvan::Array<T>>>();
-        entry.mergedData = PropertyValue(); // the array is ours alone, so nothing is copied
+        entry.mergedData = PropertyValue(); // releases its reference, so that `makeMutable` does not copy
         Orvan::MutablePtr<Orvan::Array<T>> merged = makeMutable(std::move(shared));
         merged->append(value);
         entry.mergedData = Orvan::Ptr<Orvan::Array<T>>(std::move(merged));
@@ -164,13 +169,13 @@ void appendDefaultValue(DataPropertyMergeEntry& entry)
 void addMergedDataProperty(DataPropertyMergeEntry const& entry, Tessara::Object& target)
 {
     PropertyValue const defaultValue = defaultOf(entry);
-    bool ignored = false;
+    bool isListed = false;
     Orvan::MutablePtr<Tessara::Object> property;
-    forEachElementType<AllElementTypes, PlainForm>(&defaultValue, &ignored, [&](auto const& value) {
+    forEachElementType<AllElementTypes, PlainForm>(&defaultValue, &isListed, [&](auto const& value) {
         property = populateDataGeoProperty(value);
         return true;
     });
-    if (!property)
+    if (!isListed)
         return;
     property->setProperty(sTarget, entry.property->getProperty(sTarget));
     property->setProperty(sData, PropertyValue(entry.mergedData));

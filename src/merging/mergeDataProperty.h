@@ -1,36 +1,46 @@
 #pragma once
 
-#include "MergeRecords.h"
+#include "MergePlan.h"
 
 namespace Modeling::Internal {
 
-/// An array of `unsigned int` that means places in another component: what the elements of input i say is raised by
-/// entry i of `baseOffsets` while it is copied.
+/// A data property that is being merged.
+struct DataPropertyMergeEntry {
+    Orvan::String name;
+    Orvan::Ptr<Tessara::Object> property; // of the first input that qualifies: defines type, default and target
+    Tessara::PropertyValue mergedData; // Ptr<Array<T>>; stays empty if the default is of no listed type
+};
+
+/// A new entry for a data property of an input.
+DataPropertyMergeEntry dataEntry(MergeInput const& input, Orvan::String const& name);
+
+/// An array of `unsigned int` that holds indices into another merged component: while the elements of input i are
+/// copied, entry i of `baseOffsets` is added to them.
 struct Connectivity {
     Orvan::String name; // of the property
     Offsets const& baseOffsets;
-    std::optional<unsigned int> closingEntry; // comes behind the last element
-    Orvan::Ptr<Orvan::Array<unsigned int>> merged; // once that is done
+    std::optional<unsigned int> closingEntry; // appended after the last element
+    Orvan::Ptr<Orvan::Array<unsigned int>> merged; // null until the property has been merged
 };
 
-/// Copies numbers, each raised by `base`, with several threads where that pays.
-void copyRaised(unsigned int const* source, std::size_t count, unsigned int base, unsigned int* target);
+/// Copies indices and adds `base` to each. Large counts are split over several threads.
+void copyRebased(unsigned int const* source, std::size_t count, unsigned int base, unsigned int* target);
 
-/// Builds the merged array of one data property: its element type is that of the default of `entry.property`. An input
-/// gives its array of that name, whatever it targets: cut off where it is too long, filled up with the default where it
-/// is too short, missing or of another type. Leaves `entry.mergedData` empty where there is no default of a listed
-/// type.
-/// \param offsets       where each input's values begin, and as last entry how many there are
-/// \param connectivity  where the property is to be raised; or null
+/// Builds the merged array of one data property, whose element type is that of the default of `entry.property`. An
+/// input contributes its array of that name, whatever its target is: an array that is too long is trimmed; one that is
+/// too short, missing or of another type is padded with the default. Leaves `entry.mergedData` empty if the default is
+/// missing or of no listed type.
+/// \param offsets       First value of each input, and the total.
+/// \param connectivity  Null unless the values are to be rebased.
 void mergeDataProperty(
     MergePlan const& plan, Offsets const& offsets, Connectivity* connectivity, DataPropertyMergeEntry& entry);
 
-/// Appends the default to the merged array, if that is of a core type: data of the four geometry types gets none, and
-/// indices of its range that point at the default point behind its end. (Wanted.)
+/// Appends the default to the merged array if it is of a core type. Data of the four geometry types gets none, so that
+/// range indices that refer to the default lead past its end: existing scenes depend on these lengths.
 void appendDefaultValue(DataPropertyMergeEntry& entry);
 
-/// Gives the target a new data property with the merged array: no dependencies, and the interpolation mode 1, whatever
-/// the inputs said. Does nothing where there is no merged array.
+/// Gives the target a new data property with the merged array, without dependencies and with interpolation mode 1,
+/// whatever the inputs have. Does nothing if there is no merged array.
 void addMergedDataProperty(DataPropertyMergeEntry const& entry, Tessara::Object& target);
 
 }

@@ -1,5 +1,6 @@
 #include "mergeGeoComponent.h"
 
+#include "frame/Assert.h"
 #include "frame/ParallelFor.h"
 #include "mergeRangeProperty.h"
 
@@ -12,7 +13,7 @@ namespace Modeling::Internal {
 
 namespace {
 
-    using NameSet = std::unordered_set<std::string_view>; // of names that the plan holds
+    using NameSet = std::unordered_set<std::string_view>; // views of names in the plan
 
     std::vector<DataPropertyMergeEntry> collectDataProperties(MergePlan const& plan, Orvan::String const& component)
     {
@@ -32,7 +33,7 @@ namespace {
         NameSet admitted;
         forEachLayout(plan, [&](MergeInput const& input) {
             for (PropertyRole const& role : input.layout->roles()) {
-                if (role.kind != PropertyRole::Kind::Range || role.owner != component
+                if (role.kind != GeoPropertyKind::Range || role.owner != component
                     || admitted.contains(role.name.view()))
                     continue;
                 std::vector<DataPropertyMergeEntry> dependents = collectDependentDataProperties(input, role.name);
@@ -48,7 +49,7 @@ namespace {
     void mergeData(MergePlan const& plan, Offsets const& elementOffsets, Connectivity* connectivity,
         std::vector<DataPropertyMergeEntry>& entries)
     {
-        // Each property is one iteration's own.
+        // Each property belongs to one iteration.
         parallelFor(tbb::blocked_range<std::size_t>(0, entries.size(), kFaceGrain), [&](auto const& properties) {
             for (std::size_t i = properties.begin(); i != properties.end(); ++i) {
                 bool const isConnectivity = connectivity && entries[i].name == connectivity->name;
@@ -57,10 +58,41 @@ namespace {
         });
     }
 
+    /// Whether each merged array has a value per element of the component, and the closing entry if it has one.
+    [[maybe_unused]] bool haveComponentLength(std::vector<DataPropertyMergeEntry> const& entries,
+        std::uint64_t elementCount, Connectivity const* connectivity)
+    {
+        return std::all_of(entries.begin(), entries.end(), [&](DataPropertyMergeEntry const& entry) {
+            ArrayView const merged = ArrayView::of(entry.mergedData);
+            bool const isClosed = connectivity && connectivity->closingEntry && connectivity->merged
+                && merged.data == connectivity->merged->data;
+            return !merged || merged.size == elementCount + (isClosed ? 1 : 0);
+        });
+    }
+
+    /// Whether the values of each input are in the merged connectivity, offset by the input's base.
+    [[maybe_unused]] bool isRebased(
+        Connectivity const& connectivity, MergePlan const& plan, Offsets const& elementOffsets)
+    {
+        PropertyFinder find(connectivity.name);
+        for (std::size_t input = 0; input != plan.inputs.size(); ++input) {
+            ArrayView const source = find.arrayIn(plan.inputs[input]);
+            if (source.type != kPlaceOfElementType<unsigned int>)
+                continue;
+            std::uint64_t const count = elementOffsets[input + 1] - elementOffsets[input];
+            unsigned int const* const value = static_cast<unsigned int const*>(source.data);
+            unsigned int const* const merged = connectivity.merged->data + elementOffsets[input];
+            for (std::uint64_t element = 0; element != std::min(count, source.size); ++element)
+                if (merged[element] != value[element] + connectivity.baseOffsets[input])
+                    return false;
+        }
+        return true;
+    }
+
     void mergeRanges(
         MergePlan const& plan, Offsets const& elementOffsets, std::vector<RangePropertyMergeEntry>& entries)
     {
-        // Each range is one iteration's own.
+        // Each range belongs to one iteration.
         parallelFor(tbb::blocked_range<std::size_t>(0, entries.size(), kFaceGrain), [&](auto const& ranges) {
             for (std::size_t i = ranges.begin(); i != ranges.end(); ++i)
                 mergeRangeProperty(plan, elementOffsets, entries[i]);
@@ -72,10 +104,15 @@ namespace {
 void mergeGeoComponent(MergePlan const& plan, Orvan::String const& component, Offsets const& elementOffsets,
     Connectivity* connectivity, Tessara::Object& target)
 {
-    Tessara::Geometry::setElementCount(component, elementOffsets[elementOffsets.size - 1], target);
+    MODELING_ASSERT(elementOffsets.size == plan.inputs.size() + 1);
+    unsigned int const elementCount = elementOffsets[plan.inputs.size()];
+    MODELING_ASSERT(areOffsets(elementOffsets.data, plan.inputs.size(), elementCount));
+    Tessara::Geometry::setElementCount(component, elementCount, target);
 
     std::vector<DataPropertyMergeEntry> data = collectDataProperties(plan, component);
     mergeData(plan, elementOffsets, connectivity, data);
+    MODELING_ASSERT(haveComponentLength(data, elementCount, connectivity));
+    MODELING_ASSERT(!connectivity || !connectivity->merged || isRebased(*connectivity, plan, elementOffsets));
     for (DataPropertyMergeEntry const& entry : data)
         addMergedDataProperty(entry, target);
 

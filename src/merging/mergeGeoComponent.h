@@ -1,6 +1,5 @@
 #pragma once
 
-#include "MergeRecords.h"
 #include "mergeDataProperty.h"
 
 namespace Modeling::Internal {
@@ -8,14 +7,15 @@ namespace Modeling::Internal {
 /// Merges one component: gives the target the component's count, a merged data property for each data property that
 /// targets it in any input, and a merged range property for each range on it, with the data of the range.
 ///
-/// The names of all inputs decide what there is. Of each name the first input that qualifies decides type, default and
-/// target: for data that is the first one in which it targets the component, for a range the first one in which it
-/// belongs to the component and has data. Every other input contributes its array, if that has the type.
+/// The result has the union of the inputs' names. The first input that qualifies for a name defines type, default and
+/// target: for data, the first in which it targets the component; for a range, the first in which it belongs to the
+/// component and has data. Every other input contributes its array if that has the type.
 ///
-/// Keys of the target that are not written stay. Of data and dependents of one name the dependents win.
+/// Other keys of the target are kept. If data of the component and data of a range share a name, the data of the range
+/// is kept.
 ///
-/// \param elementOffsets  where the elements of each input begin
-/// \param connectivity    of one data property of the component; or null
+/// \param elementOffsets  First element of each input in the component, and the total.
+/// \param connectivity    The data property of the component to rebase; may be null.
 void mergeGeoComponent(MergePlan const& plan, Orvan::String const& component, Offsets const& elementOffsets,
     Connectivity* connectivity, Tessara::Object& target);
 

@@ -1,9 +1,13 @@
 #include <Modeling/mergeMeshes.h>
 
 #include "MergedComponents.h"
+#include "copyNonGeoProperties.h"
+#include "frame/Assert.h"
 #include "frame/ParallelFor.h"
+#include "host/StagedObject.h"
 #include "mergeGeoComponent.h"
 
+#include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Names.h>
 #include <TessaraGeometry/Populate.h>
 #include <TessaraGeometry/Validators.h>
@@ -20,16 +24,16 @@ namespace {
         std::optional<Offsets> points, corners, faces;
 
         explicit MeshOffsets(MergePlan const& plan)
-            : points(computeElementOffsets(plan, 0))
-            , corners(computeElementOffsets(plan, 1))
-            , faces(computeElementOffsets(plan, 2))
+            : points(computeElementOffsets(plan, sPointComp))
+            , corners(computeElementOffsets(plan, sFaceVertexComp))
+            , faces(computeElementOffsets(plan, sFaceComp))
         {
         }
 
         bool fit() const { return points && corners && faces; }
     };
 
-    /// Each component in an object of its own.
+    /// Each component is merged into an object of its own.
     struct MergedMesh {
         Connectivity faceVertex;
         Connectivity faceOffset;
@@ -38,9 +42,8 @@ namespace {
         Orvan::MutablePtr<Object> faces = createObject();
     };
 
-    /// Merges the components side by side. Corners and faces then mean places among the points and corners of all
-    /// inputs.
-    /// \return false if an enclosing task group was cancelled
+    /// Merges the components concurrently, with face corners and faces rebased to the merged points and corners.
+    /// \return  False if an enclosing task group was cancelled.
     bool mergeComponents(MergePlan const& plan, MeshOffsets const& offsets, MergedMesh& merged, Object& output)
     {
         return runTasks(
@@ -72,7 +75,7 @@ bool mergeMeshes(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output,
     unsigned int const cornerCount = (*offsets.corners)[plan.inputs.size()];
     MergedMesh merged{
         {sFaceVertex, *offsets.points, std::nullopt, nullptr}, {sFaceOffset, *offsets.corners, cornerCount, nullptr}};
-    Orvan::MutablePtr<Object> const staged = stagedCopy(output);
+    StagedObject const staged(output);
     if (!mergeComponents(plan, offsets, merged, *staged)) {
         output.eraseAllProperties();
         return false;
@@ -81,11 +84,12 @@ bool mergeMeshes(Orvan::Array<Orvan::Ptr<Object>> const& inputs, Object& output,
     transferComponentProperties(sPointComp, *merged.points, *staged);
     transferComponentProperties(sFaceVertexComp, *merged.corners, *staged);
     transferComponentProperties(sFaceComp, *merged.faces, *staged);
+    MODELING_ASSERT(getElementCount(*staged, sFaceVertexComp) == cornerCount);
     bool const hasCorners = finishConnectivity(merged.faceVertex, *offsets.corners, *staged);
     bool const hasFaces = finishConnectivity(merged.faceOffset, *offsets.faces, *staged);
     if (hasCorners && hasFaces)
-        copyOtherProperties(plan, *staged);
-    publish(*staged, output);
+        copyNonGeoProperties(plan, *staged);
+    staged.publish();
     return hasCorners && hasFaces;
 }
 

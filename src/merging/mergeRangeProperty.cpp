@@ -1,7 +1,7 @@
 #include "mergeRangeProperty.h"
 
 #include "frame/Arrays.h"
-#include "mergeDataProperty.h"
+#include "frame/Assert.h"
 
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Names.h>
@@ -20,7 +20,7 @@ namespace {
 
     using IndexArray = Orvan::Array<unsigned int>;
 
-    /// Its indices, where the input has the range and anything that targets it; otherwise null.
+    /// The indices of the range in one input; null unless the input has the range and data that targets it.
     Orvan::Ptr<IndexArray> sourceIndices(MergeInput const& input, Orvan::String const& rangeName)
     {
         Orvan::Ptr<IndexArray> indices = getRangeGeoPropIndices(*input.object, rangeName);
@@ -33,7 +33,7 @@ namespace {
     std::vector<Orvan::Ptr<IndexArray>> collectSourceIndices(MergePlan const& plan, Orvan::String const& rangeName)
     {
         std::vector<Orvan::Ptr<IndexArray>> sources(plan.inputs.size());
-        // Each input has its own entry.
+        // Each input writes its own entry.
         parallelFor(tbb::blocked_range<std::size_t>(0, sources.size(), kFaceGrain), [&](auto const& inputs) {
             for (std::size_t input = inputs.begin(); input != inputs.end(); ++input)
                 sources[input] = sourceIndices(plan.inputs[input], rangeName);
@@ -41,14 +41,14 @@ namespace {
         return sources;
     }
 
-    /// The length of the data in one input: that of the shortest array. Lengths count by their low 32 bits.
+    /// The length of the data in one input: that of its shortest array. Only the low 32 bits of lengths count.
     unsigned int smallestDependentSize(MergeInput const& input, std::vector<PropertyFinder>& dependents)
     {
         unsigned int smallest = kInvalidIndex;
         for (PropertyFinder& find : dependents) {
-            std::optional<std::size_t> const place = find.placeIn(input);
-            if (place && isData(input.layout->roles()[*place]) && input.arrays[*place])
-                smallest = std::min(smallest, static_cast<unsigned int>(input.arrays[*place].size));
+            std::optional<std::size_t> const index = find.indexIn(input);
+            if (index && isData(input.layout->roles()[*index]) && input.arrays[*index])
+                smallest = std::min(smallest, static_cast<unsigned int>(input.arrays[*index].size));
         }
         return smallest == kInvalidIndex ? 0 : smallest;
     }
@@ -63,16 +63,16 @@ namespace {
         for (std::size_t input = 0; input != plan.inputs.size(); ++input) {
             offsets[input] = static_cast<unsigned int>(total);
             total += smallestDependentSize(plan.inputs[input], finders);
-            if (total >= std::numeric_limits<unsigned int>::max()) // the default behind it has an index too
+            if (total >= std::numeric_limits<unsigned int>::max()) // the default after all data has an index too
                 throw std::bad_alloc();
         }
         offsets[plan.inputs.size()] = static_cast<unsigned int>(total);
         return offsets;
     }
 
-    /// Index arrays that are not as long as their component: those that are longer run on into the elements of later
-    /// inputs (up to the end), those that are shorter leave what is there. So what is not written by its own input is
-    /// written here, by ascending inputs.
+    /// Writes what index arrays hold beyond their component's count: it overruns into the elements of later inputs, up
+    /// to the end. Inputs are visited in ascending order, and afterwards each writes its own elements, so an overrun
+    /// lasts only where a later input's index array is too short.
     void writeOverruns(std::vector<Orvan::Ptr<IndexArray>> const& sources, Offsets const& elementOffsets,
         Offsets const& dependentOffsets, IndexArray& merged)
     {
@@ -81,7 +81,7 @@ namespace {
             if (!sources[input] || sources[input]->size <= count)
                 continue;
             std::uint64_t const end = std::min(sources[input]->size, merged.size - elementOffsets[input]);
-            copyRaised(sources[input]->data + count, end - count, dependentOffsets[input],
+            copyRebased(sources[input]->data + count, end - count, dependentOffsets[input],
                 merged.data + elementOffsets[input] + count);
         }
     }
@@ -106,7 +106,7 @@ namespace {
                 std::uint64_t const count = countOf(input);
                 unsigned int* const target = merged.data + elementOffsets[input];
                 if (sources[input])
-                    copyRaised(
+                    copyRebased(
                         sources[input]->data, std::min(count, sources[input]->size), dependentOffsets[input], target);
                 else
                     fillElements(target, count, dependentOffsets[inputCount]);
@@ -115,6 +115,28 @@ namespace {
         return merged;
     }
 
+    /// Whether each merged array holds the values of all inputs and, if needed, the default. Arrays of the geometry
+    /// types never get the default.
+    [[maybe_unused]] bool haveRangeLength(
+        std::vector<DataPropertyMergeEntry> const& dependents, std::uint64_t valueCount, bool needsDefaultSlot)
+    {
+        return std::all_of(dependents.begin(), dependents.end(), [&](DataPropertyMergeEntry const& dependent) {
+            ArrayView const merged = ArrayView::of(dependent.mergedData);
+            bool const hasSlot = needsDefaultSlot && merged.type < kPlaceOfElementType<Common::GeometryType>;
+            return !merged || merged.size == valueCount + (hasSlot ? 1 : 0);
+        });
+    }
+
+}
+
+std::vector<DataPropertyMergeEntry> collectDependentDataProperties(
+    MergeInput const& input, Orvan::String const& rangeName)
+{
+    std::vector<DataPropertyMergeEntry> dependents;
+    for (PropertyRole const& role : input.layout->roles())
+        if (isData(role) && role.owner == rangeName)
+            dependents.push_back(dataEntry(input, role.name));
+    return dependents;
 }
 
 void mergeRangeProperty(MergePlan const& plan, Offsets const& elementOffsets, RangePropertyMergeEntry& entry)
@@ -124,7 +146,7 @@ void mergeRangeProperty(MergePlan const& plan, Offsets const& elementOffsets, Ra
     entry.mergedIndices = Orvan::makePtr<IndexArray>(mergeIndices(sources, elementOffsets, dependentOffsets));
 
     bool const needsDefaultSlot = std::find(sources.begin(), sources.end(), nullptr) != sources.end();
-    // Each dependent is one iteration's own.
+    // Each dependent belongs to one iteration.
     parallelFor(tbb::blocked_range<std::size_t>(0, entry.dependents.size(), kFaceGrain), [&](auto const& dependents) {
         for (std::size_t dependent = dependents.begin(); dependent != dependents.end(); ++dependent) {
             mergeDataProperty(plan, dependentOffsets, nullptr, entry.dependents[dependent]);
@@ -132,6 +154,7 @@ void mergeRangeProperty(MergePlan const& plan, Offsets const& elementOffsets, Ra
                 appendDefaultValue(entry.dependents[dependent]);
         }
     });
+    MODELING_ASSERT(haveRangeLength(entry.dependents, dependentOffsets[plan.inputs.size()], needsDefaultSlot));
 }
 
 bool addMergedRangeProperty(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>> const& mergedIndices,

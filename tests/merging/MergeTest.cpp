@@ -193,7 +193,7 @@ TEST(Merge, refusesWhatItCannotMergeAndTouchesNothing)
     addComponent(sPointComp, 1'294'967'295u, *rest);
     auto const fits = [](std::vector<Object const*> const& objects) {
         using namespace Modeling::Internal;
-        return computeElementOffsets(planMerge(objects, {sPointComp}), 0).has_value();
+        return computeElementOffsets(planMerge(objects, {sPointComp}), sPointComp).has_value();
     };
     EXPECT_TRUE(fits({huge.get(), rest.get()}));
     EXPECT_FALSE(fits({huge.get(), rest.get(), cloudOf(1).get()}));

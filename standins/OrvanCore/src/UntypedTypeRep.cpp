@@ -13,23 +13,24 @@ namespace Orvan::Internal {
 namespace {
 
     constexpr std::size_t kHugePage = std::size_t{1} << 21;
-    constexpr std::size_t kHugeBlock = 2 * kHugePage; // below, rounding up to huge pages costs more than it gains
+    constexpr std::size_t kHugeBlock =
+        2 * kHugePage; // rounding smaller blocks up to huge pages costs more than it gains
 
     std::size_t byteCount(UntypedTypeRep const& rep, std::uint64_t count)
     {
-        constexpr std::uint64_t kMost = std::numeric_limits<std::ptrdiff_t>::max();
-        if (rep.elementSize != 0 && count > kMost / rep.elementSize)
+        constexpr std::uint64_t kMaxBytes = std::numeric_limits<std::ptrdiff_t>::max();
+        if (rep.elementSize != 0 && count > kMaxBytes / rep.elementSize)
             throw std::bad_alloc();
         return static_cast<std::size_t>(count * rep.elementSize);
     }
 
     std::align_val_t blockAlignment(UntypedTypeRep const& rep, std::size_t bytes)
     {
-        constexpr std::size_t kCacheLine = 64; // two arrays then never share a line that two threads write
-        std::size_t const smallest = bytes >= kHugeBlock ? kHugePage
-            : bytes >= 4096                              ? kCacheLine
-                                                         : alignof(std::max_align_t);
-        return std::align_val_t{std::max<std::size_t>(rep.elementAlignment, smallest)};
+        constexpr std::size_t kCacheLine = 64; // so that threads that write different arrays never share a line
+        std::size_t const minimum = bytes >= kHugeBlock ? kHugePage
+            : bytes >= 4096                             ? kCacheLine
+                                                        : alignof(std::max_align_t);
+        return std::align_val_t{std::max<std::size_t>(rep.elementAlignment, minimum)};
     }
 
 }
@@ -41,9 +42,9 @@ void* UntypedTypeRep::allocate(std::uint64_t count) const
         return nullptr;
     void* const block = ::operator new(bytes, blockAlignment(*this, bytes));
     if (bytes >= kHugeBlock) {
-        int const before = errno;
-        ::madvise(block, bytes, MADV_HUGEPAGE); // advice only: where it is refused, small pages do
-        errno = before;
+        int const savedErrno = errno;
+        ::madvise(block, bytes, MADV_HUGEPAGE); // advice only: if it is refused, small pages are used
+        errno = savedErrno;
     }
     return block;
 }

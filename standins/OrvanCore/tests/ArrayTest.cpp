@@ -18,9 +18,9 @@ using Texts = Array<Orvan::String>;
 static_assert(offsetof(Array<float>, data) == 0 && offsetof(Array<float>, size) == 8
     && offsetof(Array<float>, capacity) == 16 && offsetof(Array<float>, rep) == 24);
 
-constexpr char kLong[] = "a text that is too long for the object itself";
+constexpr char kLong[] = "a string that is too long to be stored without an allocation";
 
-TEST(Array, growsByItsCapacityOrByWhatIsAdded)
+TEST(Array, growsByItsCapacityOrByTheAddedCount)
 {
     Array<int> appended;
     std::vector<std::uint64_t> capacities;
@@ -39,16 +39,16 @@ TEST(Array, growsByItsCapacityOrByWhatIsAdded)
         array.resize(grown.to);
         EXPECT_EQ(array.size, grown.to);
         EXPECT_EQ(array.capacity, grown.capacity) << grown.from << " to " << grown.to;
-        EXPECT_EQ(array.data == before, grown.to <= grown.from) << "shrinking takes no new storage";
+        EXPECT_EQ(array.data == before, grown.to <= grown.from) << "shrinking does not reallocate";
     }
 }
 
-TEST(Array, initialisesWhatSizingAdds)
+TEST(Array, initializesTheElementsThatResizingAdds)
 {
     Array<int> array{1, 2, 3, 4};
     array.resize(1);
     array.resize(4);
-    EXPECT_EQ(array, (Array<int>{1, 0, 0, 0})) << "values from before the shrinking are not seen again";
+    EXPECT_EQ(array, (Array<int>{1, 0, 0, 0})) << "values from before the shrinking do not reappear";
     array[3] = 7;
     array.resize(3);
     array.resize(4, Orvan::kUninitialized);
@@ -63,7 +63,7 @@ TEST(Array, constructsAndDestroysEachElementOnce)
     {
         Array<std::shared_ptr<int>> array{watched, watched, watched};
         for (int i = 0; i < 17; ++i)
-            array.append(array[0]); // at times with growth under it
+            array.append(array[0]); // sometimes this reallocates
         EXPECT_EQ(watched.use_count(), 21);
         array.resize(5);
         array.resize(7, Orvan::kUninitialized);
@@ -71,7 +71,7 @@ TEST(Array, constructsAndDestroysEachElementOnce)
         Array<std::shared_ptr<int>> copy(array);
         EXPECT_EQ(watched.use_count(), 11);
         copy = Array<std::shared_ptr<int>>(2, watched);
-        array = copy; // fits into the storage there is
+        array = copy; // fits the present storage
         array = static_cast<Array<std::shared_ptr<int>> const&>(array);
         EXPECT_EQ(watched.use_count(), 5);
         Array<std::shared_ptr<int>> moved(std::move(array));
@@ -95,15 +95,15 @@ TEST(Array, reusesItsStorageWhenAssigned)
     EXPECT_EQ(target, source);
     EXPECT_EQ(target.data, storage);
     EXPECT_EQ(target.capacity, 4u);
-    target = Array<int>(5); // moved: takes the other's storage
+    target = Array<int>(5); // moved: takes over the other storage
     EXPECT_EQ(target, Array<int>(5));
     EXPECT_NE(target.data, storage);
 }
 
-TEST(Array, refusesWhatTheAddressSpaceCannotHold)
+TEST(Array, refusesSizesBeyondTheAddressSpace)
 {
-    constexpr std::uint64_t kMost = std::numeric_limits<std::uint64_t>::max();
-    for (std::uint64_t const count : {kMost, kMost / 4, kMost / 4 + 1, kMost / 8 + 1}) {
+    constexpr std::uint64_t kMaxCount = std::numeric_limits<std::uint64_t>::max();
+    for (std::uint64_t const count : {kMaxCount, kMaxCount / 4, kMaxCount / 4 + 1, kMaxCount / 8 + 1}) {
         EXPECT_THROW((void)Array<int>(count), std::bad_alloc);
         Array<int> array{1, 2, 3};
         EXPECT_THROW(array.resize(count), std::bad_alloc);
@@ -114,7 +114,7 @@ TEST(Array, refusesWhatTheAddressSpaceCannotHold)
     }
 }
 
-TEST(Array, isAsItWasWhenAllocationFails)
+TEST(Array, isUnchangedWhenAnAllocationFails)
 {
     Texts const source(3, kLong);
     std::vector<std::function<void(Texts&)>> const actions{
@@ -147,7 +147,7 @@ TEST(UntypedTypeRep, givesAlignedStorage)
         for (std::uint64_t const bytes : {256u, 4096u, 1u << 22, (1u << 22) + 256u}) {
             std::uint64_t const count = bytes / rep.elementSize;
             std::uint64_t const alignment = std::max<std::uint64_t>(rep.elementAlignment, bytes < 4096 ? 16 : 64);
-            void* blocks[4]; // of several next to each other not all are aligned by chance
+            void* blocks[4]; // of several adjacent blocks, not all are aligned by chance
             for (void*& block : blocks) {
                 block = rep.allocate(count);
                 EXPECT_EQ(reinterpret_cast<std::uintptr_t>(block) % alignment, 0u) << bytes << " bytes";

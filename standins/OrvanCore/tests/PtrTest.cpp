@@ -38,14 +38,14 @@ TEST(Ptr, countsItsReferences)
         EXPECT_EQ(second.useCount(), 2u);
         EXPECT_EQ(watched.use_count(), 2);
     }
-    EXPECT_EQ(watched.use_count(), 1) << "a dropped value is destroyed";
+    EXPECT_EQ(watched.use_count(), 1) << "the last release destroys the value";
     first = MutablePtr<Held>::make(watched);
     EXPECT_EQ(watched.use_count(), 2);
     makeMutable(std::move(first)) = nullptr;
     EXPECT_EQ(watched.use_count(), 1);
 }
 
-TEST(MakeMutable, movesTheOnlyReferenceAndCopiesASharedOne)
+TEST(MakeMutable, movesAnUnsharedValueAndCopiesASharedOne)
 {
     Ptr<Ints> shared = makePtr<Ints>(Ints{1, 2, 3});
     Ints const* const value = shared.get();
@@ -68,8 +68,8 @@ TEST(MakeMutable, movesTheOnlyReferenceAndCopiesASharedOne)
     });
 }
 
-// At most one thread gets the value itself, and it must see that all others are done reading before it writes.
-TEST(Ptr, isCopiedAndDroppedOnManyThreads)
+// At most one thread gets the value itself, and all other threads must have finished reading before it writes.
+TEST(Ptr, isCopiedAndReleasedOnManyThreads)
 {
     constexpr int kThreads = 3;
     for (int round = 0; round < 300; ++round) {
@@ -82,7 +82,7 @@ TEST(Ptr, isCopiedAndDroppedOnManyThreads)
             threads.emplace_back([&waiting, &owners, value, mine = shared]() mutable {
                 for (int i = 0; i < 10; ++i)
                     EXPECT_EQ((*Ptr<Ints>(mine))[1], 2);
-                // All at once from here; relaxed, so that only the count itself orders what follows.
+                // All threads continue at once; relaxed, so that only the reference count orders what follows.
                 waiting.fetch_sub(1, std::memory_order_relaxed);
                 while (waiting.load(std::memory_order_relaxed) != 0)
                     std::this_thread::yield();

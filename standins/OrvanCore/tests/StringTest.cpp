@@ -7,7 +7,7 @@
 
 using Orvan::String;
 
-TEST(String, takesNullAsTheEmptyText)
+TEST(String, treatsNullAsTheEmptyString)
 {
     char const* const null = nullptr;
     String text(null);
@@ -28,7 +28,7 @@ TEST(String, copiesAppendsAndCompares)
         String const text(plain.c_str());
         String copy = text;
         copy += "!";
-        EXPECT_STREQ(text.c_str(), plain.c_str()) << "a copy is a text of its own";
+        EXPECT_STREQ(text.c_str(), plain.c_str()) << "a copy is independent";
         EXPECT_STREQ(copy.c_str(), (plain + "!").c_str());
         EXPECT_TRUE(copy != text && text < copy && copy == (plain + "!").c_str());
 

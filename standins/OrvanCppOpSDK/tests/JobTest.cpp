@@ -5,10 +5,10 @@
 #include <csignal>
 #include <thread>
 
-TEST(Job, isCancelledByTheHostOnAnyThread)
+TEST(Job, seesACancellationFromAnotherThread)
 {
     EXPECT_FALSE(Orvan::isJobCancelled());
-    int reason = 0; // not atomic on purpose: who sees the flag must see what was written before
+    int reason = 0; // not atomic: the flag must publish it
     std::thread job([&] {
         while (!Orvan::isJobCancelled())
             std::this_thread::yield();
@@ -21,7 +21,7 @@ TEST(Job, isCancelledByTheHostOnAnyThread)
     EXPECT_FALSE(Orvan::isJobCancelled());
 }
 
-TEST(Job, isCancelledFromASignalHandler)
+TEST(Job, canBeCancelledInASignalHandler)
 {
     auto* const before = std::signal(SIGUSR1, [](int) { Orvan::setJobCancelled(true); });
     std::raise(SIGUSR1);

@@ -10,44 +10,45 @@ namespace Tessara::Geometry::Internal {
 
 inline constexpr char const* sElementCount = "sElementCount"; // unsigned int, in component geo properties
 
-// The prototypes without a reference each: of those, all threads would write the one count.
+// The prototypes by reference, because all threads would write the count of a shared `Ptr`.
 Object const& dataPrototype();
 Object const& rangePrototype();
 Object const& componentPrototype();
 
-/// The value that an object holds under a key, in its place; null unless it is of type `T`.
+/// The stored value under a key, not copied; null unless it is of type `T`.
 template <class T> T const* valueOf(Object const& object, std::string_view key)
 {
     PropertyValue const* const value = object.findProperty(key);
     return value ? value->get<T>() : nullptr;
 }
 
-/// The object that an object holds under a key, in its place; null where there is none.
+/// The stored object under a key, without another reference; null if there is none.
 inline Object const* objectIn(Object const& object, std::string_view key)
 {
     auto const* const held = valueOf<Orvan::Ptr<Object>>(object, key);
     return held ? held->get() : nullptr;
 }
 
-/// The same as a further reference.
+/// Another reference to the object under a key; null if there is none.
 inline Orvan::Ptr<Object> objectAt(Object const& object, std::string_view key)
 {
     auto const* const held = valueOf<Orvan::Ptr<Object>>(object, key);
     return held ? *held : nullptr;
 }
 
-/// The count of a component; 0 for what is none.
+/// The count of a component; 0 for other objects.
 inline unsigned int elementCountOf(Object const& component)
 {
     auto const* const count = valueOf<unsigned int>(component, sElementCount);
     return count ? *count : 0;
 }
 
-/// Sets one value inside the geo property under `key`, which must be there. Takes memory only where the geo property is
-/// shared with another object; when that fails the object is as it was.
+/// Sets one value inside the geo property under `key`, which must exist. Allocates only if the geo property is shared
+/// with another object.
+/// \throws std::bad_alloc  with the object unchanged
 inline void setInGeoProp(Orvan::String const& key, Orvan::String const& inner, PropertyValue&& value, Object& object)
 {
-    // Puts the geo property back in whatever way this ends.
+    // Puts the geo property back, also if making it mutable throws.
     struct PutBack {
         Orvan::String const& key;
         Object& object;
@@ -57,7 +58,7 @@ inline void setInGeoProp(Orvan::String const& key, Orvan::String const& inner, P
         ~PutBack() { object.setProperty(key, changed ? Orvan::Ptr<Object>(std::move(changed)) : std::move(shared)); }
     } putBack{key, object, objectAt(object, key.view()), nullptr};
 
-    // Without the object's own reference the geo property is free to be changed in place.
+    // Releases the object's own reference, so that a geo property that is not shared is changed in place.
     object.setProperty(key, Orvan::Ptr<Object>());
     putBack.changed = makeMutable(std::move(putBack.shared));
     putBack.changed->setProperty(inner, std::move(value));

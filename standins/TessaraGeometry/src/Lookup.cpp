@@ -10,7 +10,7 @@ namespace {
 
     using Internal::objectIn;
 
-    /// Calls `visit(name, geoProperty)` for the objects that `object` holds, in the order of its keys.
+    /// Visits the objects that `object` holds, in the order of its keys: `visit(name, geoProperty)`.
     template <class Visit> void forEachObjectIn(Object const& object, Visit const& visit)
     {
         Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = object.keys();
@@ -21,7 +21,7 @@ namespace {
         }
     }
 
-    /// Whether it belongs to a target: data and ranges do.
+    /// Whether it is of a kind that has a target: data and ranges.
     bool hasTarget(Object const& geoProperty)
     {
         return Object::isA(geoProperty, Internal::dataPrototype())
@@ -34,7 +34,7 @@ namespace {
         return name && *name == target;
     }
 
-    /// Whether there is an object of that kind.
+    /// Whether the object under a name is of a kind.
     bool holds(Object const& object, Orvan::String const& name, Object const& prototype)
     {
         Object const* const geoProperty = objectIn(object, name.view());
@@ -91,8 +91,8 @@ Orvan::String getTargetComponent(Object const& object, Orvan::String const& name
 {
     Orvan::String target = getGeoPropTargetName(object, name);
     if (holds(object, target, Internal::componentPrototype()))
-        return target; // mostly
-    // A chain without a loop is no longer than the object has keys.
+        return target; // the usual case
+    // An acyclic chain has at most as many steps as the object has keys.
     for (std::uint64_t steps = object.keys()->size; steps != 0; --steps) {
         if (!holds(object, target, Internal::rangePrototype()))
             break;

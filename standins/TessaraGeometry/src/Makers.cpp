@@ -10,7 +10,7 @@ namespace {
 
     unsigned int countOf(std::uint64_t elements)
     {
-        if (elements >= kDeletedElement) // that and the last value are sentinels
+        if (elements >= kDeletedElement) // this one and the next are sentinels
             throw std::length_error("a component holds fewer than 4,294,967,294 elements");
         return static_cast<unsigned int>(elements);
     }

@@ -31,7 +31,7 @@ namespace {
         return "\"" + std::string(name.view()) + "\"";
     }
 
-    /// The length of the array that a data property holds; nothing where there is none of a listed type.
+    /// The length of the array that a data property holds; nullopt if it holds none of a listed type.
     std::optional<std::uint64_t> dataLength(Object const& property)
     {
         std::optional<std::uint64_t> length;
@@ -64,7 +64,7 @@ namespace {
                 return;
             Orvan::String const target = getGeoPropTargetName(object_, name);
             if (!length)
-                say(quoted(name) + " holds no array of a known element type");
+                add(quoted(name) + " holds no array of a known element type");
             else if (getRangeGeoProperty(object_, target))
                 noteRangeData(target, name, *length);
             else
@@ -75,7 +75,7 @@ namespace {
         {
             auto const indices = getRangeGeoPropIndices(object_, name);
             if (!indices) {
-                say(quoted(name) + " holds no indices");
+                add(quoted(name) + " holds no indices");
                 return;
             }
             Orvan::String const target = getGeoPropTargetName(object_, name);
@@ -87,7 +87,7 @@ namespace {
             auto const beyond = std::find_if(indices->begin(), indices->end(),
                 [&](unsigned int index) { return index != kInvalidIndex && index >= data->second.length; });
             if (beyond != indices->end())
-                say(quoted(name) + "[" + to_string(beyond - indices->begin()) + "] is " + to_string(*beyond) + ", but "
+                add(quoted(name) + "[" + to_string(beyond - indices->begin()) + "] is " + to_string(*beyond) + ", but "
                     + quoted(data->second.name) + " has " + to_string(data->second.length) + " values");
         }
 
@@ -95,12 +95,12 @@ namespace {
         {
             Orvan::Ptr<Object> const component = Internal::objectAt(object_, target.view());
             if (!component || !Object::isA(*component, *getComponentGeoPropPrototype())) {
-                say(quoted(name) + " targets " + quoted(target) + ", which is not there");
+                add(quoted(name) + " targets " + quoted(target) + ", which does not exist");
                 return;
             }
             unsigned int const count = getElementCount(object_, target);
             if (length != count)
-                say(quoted(name) + " has " + to_string(length) + " entries for " + to_string(count) + " elements of "
+                add(quoted(name) + " has " + to_string(length) + " entries for " + to_string(count) + " elements of "
                     + std::string(target.view()));
         }
 
@@ -111,7 +111,7 @@ namespace {
                 entry->second = {name, length};
         }
 
-        void say(std::string const& sentence) { sentences_.append(Orvan::String(sentence)); }
+        void add(std::string const& sentence) { sentences_.append(Orvan::String(sentence)); }
 
         struct RangeData {
             Orvan::String name;

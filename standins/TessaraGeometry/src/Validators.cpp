@@ -26,13 +26,13 @@ namespace {
         return "\"" + std::string(text.view()) + "\"";
     }
 
-    /// What a validator calls the object, and what the entries of its offset array count.
+    /// What messages call the validated object, and the elements that its offset array refers to.
     struct Wording {
         char const* object;
         char const* indexed;
     };
 
-    /// What an object holds under the name of a component; null where there is none.
+    /// The object under the name of a component; null if there is none.
     struct Component {
         char const* name;
         Object const* geoProperty;
@@ -57,36 +57,36 @@ namespace {
     struct StandardData {
         char const* name;
         Component const& component;
-        std::uint64_t length; // that it must have
+        std::uint64_t length; // required
     };
 
-    /// \param values  receives the values of data that passes
-    template <class T>
-    Status checkStandardData(Object const& object, StandardData const& wanted, Orvan::Array<T> const** values = nullptr)
+    /// \param values  Receives the array if it passes.
+    template <class T> Status checkStandardData(
+        Object const& object, StandardData const& required, Orvan::Array<T> const** values = nullptr)
     {
         std::string const type = std::is_same_v<T, unsigned int> ? "unsigned int" : "float3";
-        Object const* const property = Internal::objectIn(object, wanted.name);
+        Object const* const property = Internal::objectIn(object, required.name);
         if (!property || !Object::isA(*property, Internal::dataPrototype()))
-            return failure("the data property " + std::string(wanted.name) + " is missing");
+            return failure("the data property " + std::string(required.name) + " is missing");
         auto const* const data = Internal::valueOf<Orvan::Ptr<Orvan::Array<T>>>(*property, sData);
         if (!data || !*data)
-            return failure(wanted.name + (" does not hold an array of " + type));
+            return failure(required.name + (" does not hold an array of " + type));
         if (!Internal::valueOf<T>(*property, sDefault))
-            return failure(wanted.name + (" has no sDefault of type " + type));
+            return failure(required.name + (" has no sDefault of type " + type));
         auto const* const target = Internal::valueOf<Orvan::String>(*property, sTarget);
-        if (!target || *target != wanted.component.name)
-            return failure(
-                wanted.name + (" targets " + quoted(target ? *target : "")) + " instead of " + wanted.component.name);
-        if ((*data)->size != wanted.length)
-            return failure(wanted.name + (" has " + to_string((*data)->size)) + " entries instead of "
-                + to_string(wanted.length) + " for " + to_string(wanted.component.count) + " elements of "
-                + wanted.component.name);
+        if (!target || *target != required.component.name)
+            return failure(required.name + (" targets " + quoted(target ? *target : "")) + " instead of "
+                + required.component.name);
+        if ((*data)->size != required.length)
+            return failure(required.name + (" has " + to_string((*data)->size)) + " entries instead of "
+                + to_string(required.length) + " for " + to_string(required.component.count) + " elements of "
+                + required.component.name);
         if (values)
             *values = data->get();
         return {};
     }
 
-    /// Whether any of `count` numbers is wrong. Looks at whole blocks, so that several are compared at once.
+    /// Whether any of `count` entries is wrong. Checks whole blocks without branching, so that the loop is vectorized.
     template <class IsWrong> bool anyWrong(std::uint64_t count, IsWrong const& isWrong)
     {
         constexpr std::uint64_t kBlock = 4096;
@@ -107,15 +107,15 @@ namespace {
                                : failure(std::string(name) + "[0] is " + to_string(offsets[0]) + " instead of 0");
     }
 
-    /// Offsets are non-decreasing and end at `last`.
+    /// Checks that offsets are non-decreasing and end at `last`.
     Status checkOffsets(
         char const* name, Orvan::Array<unsigned int> const& offsets, std::uint64_t last, Wording const& words)
     {
         if (anyWrong(offsets.size - 1, [o = offsets.data](std::uint64_t i) { return o[i] > o[i + 1]; })) {
-            unsigned int const* const fall = std::adjacent_find(offsets.begin(), offsets.end(), std::greater<>());
-            auto const entry = static_cast<std::uint64_t>(fall - offsets.begin()) + 1;
-            return failure(std::string(name) + "[" + to_string(entry) + "] is " + to_string(fall[1])
-                + ", less than the " + to_string(fall[0]) + " before it");
+            unsigned int const* const decrease = std::adjacent_find(offsets.begin(), offsets.end(), std::greater<>());
+            auto const entry = static_cast<std::uint64_t>(decrease - offsets.begin()) + 1;
+            return failure(std::string(name) + "[" + to_string(entry) + "] is " + to_string(decrease[1])
+                + ", less than the " + to_string(decrease[0]) + " before it");
         }
         if (offsets[offsets.size - 1] != last)
             return failure(std::string(name) + "[" + to_string(offsets.size - 1) + "] is "
@@ -127,9 +127,9 @@ namespace {
     Status checkPointIndices(Orvan::Array<unsigned int> const& faceVertex, unsigned int pointCount)
     {
         auto const isBeyond = [=](unsigned int point) { return point >= pointCount; };
-        auto const isLater = [last = pointCount - 1, point = faceVertex.data](
+        auto const isAbove = [last = pointCount - 1, point = faceVertex.data](
                                  std::uint64_t i) { return point[i] > last; };
-        if (pointCount != 0 && !anyWrong(faceVertex.size, isLater))
+        if (pointCount != 0 && !anyWrong(faceVertex.size, isAbove))
             return {};
         unsigned int const* const beyond = std::find_if(faceVertex.begin(), faceVertex.end(), isBeyond);
         if (beyond == faceVertex.end())
@@ -138,7 +138,7 @@ namespace {
             + ", but the mesh has " + to_string(pointCount) + " points");
     }
 
-    /// The first failure of the checks, which run one after the other up to it.
+    /// Runs checks in order, up to the first that fails, and returns its failure.
     template <class... Check> Status firstFailure(Check const&... checks)
     {
         Status status;
@@ -202,8 +202,8 @@ Status StrandValidator::validate(Object const& strands)
             return checkStandardData<unsigned int>(strands, {sStrandOffset, lines, strandCount + 1}, &offsets);
         },
         [&] {
-            // Points in front of the first strand belong to none. Without strands these are all points, and the one
-            // offset may also be 0.
+            // Points before the first strand belong to none. Without strands these are all points, and the only offset
+            // may also be 0.
             if (strandCount == 0 && (*offsets)[0] == 0)
                 return Status();
             return checkOffsets(sStrandOffset, *offsets, points.count, {"strand set", "points"});

@@ -28,7 +28,7 @@ Orvan::MutablePtr<Object> twoStrands()
     return makeStrands({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}, {3, 0, 0}, {4, 0, 0}}, {0, 2, 5});
 }
 
-/// Which of the three prototypes of geometry an object conforms to.
+/// Names the prototypes of geometry that an object conforms to.
 std::string kindsOf(Object const& object)
 {
     return std::string(Object::isA(object, *getMeshPrototype()) ? "mesh " : "")
@@ -36,23 +36,23 @@ std::string kindsOf(Object const& object)
         + (Object::isA(object, *getStrandPrototype()) ? "strands " : "");
 }
 
-std::vector<std::string> textsOf(Names const& names)
+std::vector<std::string> toStrings(Names const& names)
 {
-    std::vector<std::string> texts;
+    std::vector<std::string> strings;
     for (Orvan::String const& name : names)
-        texts.emplace_back(name.view());
-    return texts;
+        strings.emplace_back(name.view());
+    return strings;
 }
 
 }
 
-TEST(Prototypes, tellTheKindsOfGeoPropertyApart)
+TEST(Prototypes, distinguishTheKindsOfGeoProperties)
 {
     Orvan::MutablePtr<Object> component = Tessara::createObject(), range = Tessara::createObject();
     populateComponentGeoProperty(3, *component);
     ASSERT_TRUE(populateRangeGeoProperty(Orvan::makePtr<Indices>(), "target", *range));
     Orvan::MutablePtr<Object> bare = makeDataProperty<float>("target", nullptr);
-    bare->setProperty(sData, Tessara::PropertyValue()); // empty, but there
+    bare->setProperty(sData, Tessara::PropertyValue()); // empty, but present
     bare->eraseProperty(sDefault);
     Orvan::Ptr<Object> const kinds[] = {std::move(component), std::move(range), std::move(bare)};
     Orvan::Ptr<Object> const prototypes[] = {
@@ -65,16 +65,16 @@ TEST(Prototypes, tellTheKindsOfGeoPropertyApart)
     auto const cloud = makePointCloud({{0, 0, 0}});
     TestSupport::Random random(1);
     TestSupport::addAllTypes(sPointComp, random, *cloud);
-    EXPECT_EQ(getGeoPropsByPrototype(*cloud, *prototypes[2]).size, 41u) << "those and the positions";
+    EXPECT_EQ(getGeoPropsByPrototype(*cloud, *prototypes[2]).size, 41u) << "and the positions";
 }
 
-TEST(Prototypes, tellTheKindsOfGeometryApart)
+TEST(Prototypes, distinguishTheKindsOfGeometry)
 {
     auto const populated = [](void (*populate)(Object&)) {
         auto object = Tessara::createObject();
         object->setProperty("own", 1.5f);
         populate(*object);
-        EXPECT_TRUE(object->getProperty("own").get<float>()) << "other keys are left alone";
+        EXPECT_TRUE(object->getProperty("own").get<float>()) << "other keys are kept";
         return object;
     };
     auto const mesh = populated(populateMesh), cloud = populated(populatePointCloud),
@@ -88,7 +88,7 @@ TEST(Prototypes, tellTheKindsOfGeometryApart)
     EXPECT_EQ(kindsOf(*twoTriangles()) + kindsOf(*makePointCloud({})) + kindsOf(*twoStrands()), "mesh cloud strands ");
 }
 
-TEST(Elements, areCountedAndOnlyCounted)
+TEST(Elements, haveACountThatChangesNoArray)
 {
     auto const mesh = twoTriangles();
     Object const other = *mesh;
@@ -103,7 +103,7 @@ TEST(Elements, areCountedAndOnlyCounted)
     }
 }
 
-TEST(Elements, surviveEveryFailingAllocation)
+TEST(Elements, areUnchangedWhenAnAllocationFails)
 {
     auto const mesh = twoTriangles();
     addRangeProperty("range", sPointComp, {1, 2, 3}, *mesh);
@@ -122,16 +122,16 @@ TEST(Lookup, findsGeoPropertiesByKindAndTarget)
     addRangeProperty("far", "range", {0}, *mesh);
     mesh->setProperty("text", Orvan::String(sPointComp));
     mesh->setProperty("null", Orvan::Ptr<Object>());
-    Orvan::MutablePtr<Object> other = Tessara::createObject(); // neither data nor a range
+    Orvan::MutablePtr<Object> other = Tessara::createObject(); // is neither data nor a range
     other->setProperty(sTarget, Orvan::String(sPointComp));
     mesh->setProperty("other", Orvan::Ptr<Object>(std::move(other)));
 
     auto const data = getDataGeoPropPrototype(sGenericDataGeoProp);
-    EXPECT_THAT(textsOf(getGeoPropNamesByPrototype(*mesh, *data)),
+    EXPECT_THAT(toStrings(getGeoPropNamesByPrototype(*mesh, *data)),
         ElementsAre(sPointPosition, sFaceVertex, sFaceOffset, "weight", "material"));
     EXPECT_EQ(getGeoPropsByPrototype(*mesh, *getRangeGeoPropPrototype()).size, 2u);
-    EXPECT_THAT(textsOf(getGeoPropNamesByTarget(*mesh, sPointComp)), ElementsAre(sPointPosition, "weight"));
-    EXPECT_THAT(textsOf(getGeoPropNamesByTarget(*mesh, "range")), ElementsAre("material", "far"));
+    EXPECT_THAT(toStrings(getGeoPropNamesByTarget(*mesh, sPointComp)), ElementsAre(sPointPosition, "weight"));
+    EXPECT_THAT(toStrings(getGeoPropNamesByTarget(*mesh, "range")), ElementsAre("material", "far"));
 
     EXPECT_EQ(getGeoPropTargetName(*mesh, "material"), "range");
     EXPECT_EQ(getGeoPropTargetName(*mesh, "text"), "");
@@ -206,7 +206,7 @@ TEST(Validators, nameTheFirstFailure)
     EXPECT_EQ(StrandValidator().validate(*strands).message(), "sStrandOffset[2] is 4, but the strand set has 5 points");
 }
 
-TEST(Validators, acceptWhatIsUnusualButWhole)
+TEST(Validators, acceptUnusualButValidGeometry)
 {
     float const nan = std::numeric_limits<float>::quiet_NaN();
     auto const odd = twoTriangles();
@@ -216,23 +216,23 @@ TEST(Validators, acceptWhatIsUnusualButWhole)
         {makeMesh({}, {}, {}), true},
         {makeMesh({{0, 0, 0}}, {0, 0, 0}, {3}), false}, // corners without faces
         {makeMesh({{nan, 0, 0}, {1, 0, 0}}, {}, {0}), true}, // points without faces, not finite
-        {makeMesh({{0, 0, 0}}, {0, 0}, {0, 0, 2}), true}, // faces of no and of two corners
+        {makeMesh({{0, 0, 0}}, {0, 0}, {0, 0, 2}), true}, // faces without corners and with two
         {twoStrands(), true},
         {makeStrands({{0, 0, 0}}, {0}), true},
         {makeStrands({{0, 0, 0}}, {1}), true},
         {makeStrands({{0, 0, 0}, {1, 0, 0}}, {1}), false},
-        {makeStrands({{0, 0, 0}, {1, 0, 0}}, {1, 2}), true}, // the first point is of no strand
+        {makeStrands({{0, 0, 0}, {1, 0, 0}}, {1, 2}), true}, // the first point belongs to no strand
         {makeStrands({{0, 0, 0}, {1, 0, 0}}, {0, 1}), false},
         {makePointCloud({{nan, 0, 0}}), true},
     };
-    for (auto const& [geometry, isWhole] : cases)
-        EXPECT_EQ(static_cast<bool>(TestSupport::isValid(*geometry)), isWhole);
+    for (auto const& [geometry, accepted] : cases)
+        EXPECT_EQ(static_cast<bool>(TestSupport::isValid(*geometry)), accepted);
 }
 
-TEST(Validators, reportOddProperties)
+TEST(Validators, reportSuspiciousProperties)
 {
     auto const mesh = twoTriangles();
-    EXPECT_THAT(textsOf(reportProperties(*mesh)), IsEmpty());
+    EXPECT_THAT(toStrings(reportProperties(*mesh)), IsEmpty());
     addDataProperty<float>("weight", sPointComp, {1, 2}, *mesh);
     addDataProperty<float>("astray", "nowhere", {1}, *mesh);
     addRangeProperty("range", sFaceComp, {0, 2}, *mesh);
@@ -240,7 +240,7 @@ TEST(Validators, reportOddProperties)
     addDataProperty<float>("tint", "range", {1, 2}, *mesh);
     addRangeProperty("fine", sFaceComp, {kInvalidIndex, 0}, *mesh);
     addDataProperty<float>("fineData", "fine", {1}, *mesh);
-    EXPECT_THAT(textsOf(reportProperties(*mesh)),
+    EXPECT_THAT(toStrings(reportProperties(*mesh)),
         ElementsAre("\"weight\" has 2 entries for 4 elements of sPointComp",
-            "\"astray\" targets \"nowhere\", which is not there", "\"range\"[1] is 2, but \"tint\" has 2 values"));
+            "\"astray\" targets \"nowhere\", which does not exist", "\"range\"[1] is 2, but \"tint\" has 2 values"));
 }

@@ -10,7 +10,7 @@ namespace CoreGL {
 
 namespace {
 
-    // One line, ended by a zero, in a buffer of its own: logging takes no memory.
+    // One null-terminated line in a fixed buffer, so that logging does not allocate.
     class StepLine {
     public:
         StepLine(unsigned int number, float increment, float remainder)
@@ -49,7 +49,7 @@ namespace {
         OrvanLogger::Sink sink;
     };
 
-    // Made on first use and never destroyed: programs may log while static objects end.
+    // Created on first use and never destroyed: programs may log while static objects are destroyed.
     SharedSink& sharedSink()
     {
         static SharedSink& shared = *new SharedSink;
@@ -62,7 +62,7 @@ void ConsoleLogger::logStep(unsigned int number, float increment, float remainde
 {
     StepLine line(number, increment, remainder);
     line.append("\n");
-    std::fputs(line.text(), stdout); // one call a line: stdio locks the stream for it
+    std::fputs(line.text(), stdout); // one call per line: stdio locks the stream for it
 }
 
 void OrvanLogger::setSink(Sink sink)

@@ -14,7 +14,7 @@ using Tessara::Math::Stepper;
 namespace {
 
 constexpr float kInfinity = std::numeric_limits<float>::infinity();
-constexpr float kNotANumber = std::numeric_limits<float>::quiet_NaN();
+constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
 
 std::vector<float> incrementsOf(float amount, float limit)
 {
@@ -26,7 +26,7 @@ std::vector<float> incrementsOf(float amount, float limit)
 
 }
 
-TEST(Stepper, cutsTheAmountAtTheLimit)
+TEST(Stepper, splitsTheAmountAtTheLimit)
 {
     struct Case {
         float amount, limit;
@@ -40,36 +40,36 @@ TEST(Stepper, cutsTheAmountAtTheLimit)
              {1.75f, 0.5f, {0.5f, 0.5f, 0.5f, 0.25f}},
              {smallest, 0.9f, {smallest}},
              {3 * smallest, smallest, {smallest, smallest, smallest}},
-             // The remainders round: 2.7 - 0.9 is just above 1.8, and a sliver is left over in the end.
+             // The remainders are rounded: 2.7 - 0.9 is just above 1.8, and a tiny fourth step is left over.
              {2.7f, 0.9f, {0.9f, 0.9f, 0.9f, (2.7f - 0.9f) - 0.9f - 0.9f}},
              {0.0f, 0.9f, {}},
              {-0.0f, 0.9f, {}},
              {-1.0f, 0.9f, {}},
              {-kInfinity, 0.9f, {}},
-             {kNotANumber, 0.9f, {}},
+             {kNaN, 0.9f, {}},
              {2.0f, 0.0f, {2.0f}},
              {2.0f, -1.0f, {2.0f}},
-             {2.0f, kNotANumber, {2.0f}},
+             {2.0f, kNaN, {2.0f}},
              {2.0f, kInfinity, {2.0f}},
              {kInfinity, kInfinity, {kInfinity}},
-             {kInfinity, 0.9f, {0.9f}}, // the subtraction changes nothing from the start
+             {kInfinity, 0.9f, {0.9f}}, // the first subtraction changes nothing
              {1e9f, 0.9f, {0.9f}},
              {16777218.0f, 0.5f, {0.5f}},
          })
         EXPECT_EQ(incrementsOf(amount, limit), increments) << amount << " by " << limit;
 }
 
-TEST(Stepper, endsWhereverTheSubtractionBeginsToRound)
+TEST(Stepper, endsForAnyRoundingOfTheRemainder)
 {
-    unsigned int most = 0;
+    unsigned int maxCount = 0;
     for (float const ulps : {0.5f, 0.51f, 0.75f, 1.0f, 1.49f, 1.5f, 2.5f}) { // of amounts just below 2^24
         unsigned int count = 0;
         for (Stepper stepper(16777215.0f, ulps); stepper; stepper.step(CoreGL::NOPLogger()))
             ++count;
-        most = std::max(most, count);
+        maxCount = std::max(maxCount, count);
     }
-    EXPECT_GT(most, 1u << 24);
-    EXPECT_LT(most, 1u << 25);
+    EXPECT_GT(maxCount, 1u << 24);
+    EXPECT_LT(maxCount, 1u << 25);
 }
 
 namespace {
@@ -78,12 +78,12 @@ template <class Logger> void stepThrough(Stepper stepper, Logger const& logger)
 {
     while (stepper)
         stepper.step(logger);
-    stepper.step(logger); // none is due: nothing to tell
+    stepper.step(logger); // none is due: not logged
 }
 
 }
 
-TEST(Loggers, writeALineAStep)
+TEST(Loggers, writeOneLinePerStep)
 {
     std::vector<std::string> const expected{
         "step 1: 0.5, 0.75 remain", "step 2: 0.5, 0.25 remain", "step 3: 0.25, 0 remain"};
@@ -104,18 +104,18 @@ TEST(Loggers, writeALineAStep)
     EXPECT_EQ(lines.size(), 4u);
 }
 
-TEST(Loggers, letGoOfASinkThatThrows)
+TEST(Loggers, recoverFromASinkThatThrows)
 {
     CoreGL::OrvanLogger::setSink([](char const*) { throw std::runtime_error("full"); });
     Stepper stepper(1.0f, 0.75f);
     EXPECT_THROW(stepper.step(CoreGL::OrvanLogger()), std::runtime_error);
-    EXPECT_EQ(stepper.increment(), 0.25f) << "the step is ended all the same";
+    EXPECT_EQ(stepper.increment(), 0.25f) << "the step is complete nevertheless";
     CoreGL::OrvanLogger::setSink(nullptr);
 }
 
 TEST(Loggers, shareTheSinkBetweenThreads)
 {
-    int lineCount = 0; // not atomic on purpose: sinks are called one call at a time
+    int lineCount = 0; // not atomic: calls of a sink do not overlap
     std::vector<std::thread> threads;
     for (int thread = 0; thread < 3; ++thread)
         threads.emplace_back([] { stepThrough(Stepper(100.0f, 0.5f), CoreGL::OrvanLogger()); });

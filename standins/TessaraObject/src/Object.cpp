@@ -8,30 +8,30 @@ namespace Tessara {
 
 namespace {
 
-    constexpr std::size_t kFewKeys = 16; // up to here comparing all keys is faster than hashing one
+    constexpr std::size_t kFewKeys = 16; // for so few, comparing all keys is faster than hashing one
 
-    /// As `==`. Keys of one length mostly end differently, and looking is faster than calling.
+    /// As `==`. Keys of equal length mostly differ in their last character, and comparing that inline is faster.
     bool isSame(std::string_view a, std::string_view b)
     {
         return a.size() == b.size() && (a.empty() || (a.back() == b.back() && a == b));
     }
 
-    bool valueConforms(PropertyValue const& value, PropertyValue const& wanted)
+    bool valueConforms(PropertyValue const& value, PropertyValue const& prototype)
     {
-        if (wanted.empty())
+        if (prototype.empty())
             return true;
-        auto const* const wantedObject = wanted.get<Orvan::Ptr<Object>>();
-        if (!wantedObject)
-            return value.type() == wanted.type();
+        auto const* const prototypeObject = prototype.get<Orvan::Ptr<Object>>();
+        if (!prototypeObject)
+            return value.type() == prototype.type();
         auto const* const object = value.get<Orvan::Ptr<Object>>();
-        return object && *object && (!*wantedObject || Object::isA(**object, **wantedObject));
+        return object && *object && (!*prototypeObject || Object::isA(**object, **prototypeObject));
     }
 
 }
 
-// Inline, as they are what most time is spent in: calls within a shared library go through its tables.
+// Inline, because most time is spent here, and calls within a shared library go through its linkage table.
 
-// The slot that holds the key, or the free slot where it would go.
+// The slot of the key, or the free slot to insert it into.
 inline std::size_t Object::slotOf(std::string_view key) const
 {
     std::size_t const mask = slots_.size() - 1;
@@ -49,8 +49,8 @@ inline Object::Entry const* Object::find(std::string_view key) const
                 return &entry;
         return nullptr;
     }
-    std::uint32_t const number = slots_[slotOf(key)];
-    return number == 0 ? nullptr : &entries_[number - 1];
+    std::uint32_t const slot = slots_[slotOf(key)];
+    return slot == 0 ? nullptr : &entries_[slot - 1];
 }
 
 void Object::rebuildSlots(std::size_t slotCount)
@@ -83,7 +83,7 @@ void Object::eraseProperty(Orvan::String const& key)
     if (!entry)
         return;
     entries_.erase(entries_.begin() + (entry - entries_.data()));
-    rebuildSlots(slots_.size()); // the same number of slots: takes no memory
+    rebuildSlots(slots_.size()); // does not allocate: the number of slots is the same
 }
 
 void Object::eraseAllProperties()
@@ -122,24 +122,24 @@ void Object::setProperty(Orvan::String const& key, PropertyValue&& value)
 
 bool Object::isA(Object const& object, Object const& prototype)
 {
-    // Values are looked at in place: a copy of a `Ptr` would have all threads write the count of one shared prototype.
+    // Values are not copied: all threads would write the reference count of one shared prototype.
     constexpr std::string_view kExcluded = kExcludedKeys;
     auto const lacksAll = [&](PropertyValue const& excluded) {
         if (auto const* const values = excluded.get<Orvan::Ptr<Object>>(); values && *values)
-            return std::none_of((*values)->entries_.begin(), (*values)->entries_.end(), [&](Entry const& unwanted) {
-                Entry const* const entry = object.find(unwanted.key.view());
-                return entry && valueConforms(entry->value, unwanted.value);
+            return std::none_of((*values)->entries_.begin(), (*values)->entries_.end(), [&](Entry const& forbidden) {
+                Entry const* const entry = object.find(forbidden.key.view());
+                return entry && valueConforms(entry->value, forbidden.value);
             });
         auto const* const names = excluded.get<Orvan::Ptr<Orvan::Array<Orvan::String>>>();
         return !names || !*names || std::none_of((*names)->begin(), (*names)->end(), [&](Orvan::String const& name) {
             return object.find(name.view());
         });
     };
-    return std::all_of(prototype.entries_.begin(), prototype.entries_.end(), [&](Entry const& wanted) {
-        if (wanted.key.view() == kExcluded)
-            return lacksAll(wanted.value);
-        Entry const* const entry = object.find(wanted.key.view());
-        return entry && valueConforms(entry->value, wanted.value);
+    return std::all_of(prototype.entries_.begin(), prototype.entries_.end(), [&](Entry const& required) {
+        if (required.key.view() == kExcluded)
+            return lacksAll(required.value);
+        Entry const* const entry = object.find(required.key.view());
+        return entry && valueConforms(entry->value, required.value);
     });
 }
 

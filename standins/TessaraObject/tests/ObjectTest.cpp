@@ -43,15 +43,15 @@ Ptr<Object> objectOf(std::vector<std::pair<String, PropertyValue>> properties)
 
 }
 
-// Against a plain list, through the number of keys at which look-ups begin to hash, up and down.
-TEST(Object, behavesAsAListOfEntriesInTheOrderInWhichTheyWereFirstSet)
+// Against a plain list, with numbers of keys below and above the one at which look-ups start to hash.
+TEST(Object, behavesLikeAListInInsertionOrder)
 {
     std::mt19937 random(5);
     for (unsigned int const keyCount : {3u, 6u, 9u, 12u, 40u, 300u, 1500u}) {
         MutablePtr<Object> const object = createObject();
         Entries expected;
         for (int step = 0; step < 2000; ++step) {
-            std::string const key(std::to_string(random() % keyCount).substr(keyCount == 3)); // also the empty one
+            std::string const key(std::to_string(random() % keyCount).substr(keyCount == 3)); // sometimes empty
             auto const present = std::ranges::find(expected, key, &Entries::value_type::first);
             EXPECT_EQ(object->hasProperty(key.c_str()), present != expected.end());
             EXPECT_EQ(object->getProperty(key.c_str()).empty(), present == expected.end() || present->second == -1);
@@ -78,7 +78,7 @@ TEST(Object, behavesAsAListOfEntriesInTheOrderInWhichTheyWereFirstSet)
     }
 }
 
-TEST(Object, isClonedShallowly)
+TEST(Object, clonesShallowly)
 {
     Ptr<Array<int>> const array = Orvan::makePtr<Array<int>>(2u);
     Ptr<Object> original = objectOf({{"array", array}, {"number", 1}});
@@ -93,7 +93,7 @@ TEST(Object, isClonedShallowly)
     EXPECT_EQ(Orvan::Internal::getDefaultClass<Object>()->keys()->size, 0u);
 }
 
-TEST(Object, conformsToAPrototypeByContent)
+TEST(Object, conformsToPrototypesByContent)
 {
     auto const excluding = [](Array<String> keys) {
         return PropertyValue(Orvan::makePtr<Array<String>>(std::move(keys)));
@@ -107,30 +107,30 @@ TEST(Object, conformsToAPrototypeByContent)
     };
     for (auto const& [name, prototype, conforms] : std::vector<Case>{
              {"no key", objectOf({}), true},
-             {"same type, other value", objectOf({{"int", 2}}), true},
-             {"other type", objectOf({{"int", 2u}}), false},
+             {"same type, different value", objectOf({{"int", 2}}), true},
+             {"different type", objectOf({{"int", 2u}}), false},
              {"missing key", objectOf({{"int", 1}, {"absent", 1}}), false},
              {"any value", objectOf({{"text", PropertyValue()}, {"empty", PropertyValue()}}), true},
-             {"any value of a missing key", objectOf({{"absent", PropertyValue()}}), false},
-             {"a type where the value is empty", objectOf({{"empty", 1}}), false},
+             {"any value, but the key is missing", objectOf({{"absent", PropertyValue()}}), false},
+             {"a type, but the value is empty", objectOf({{"empty", 1}}), false},
              {"array of that type", objectOf({{"array", Ptr<Array<int>>()}}), true},
              {"array of another type", objectOf({{"array", Ptr<Array<unsigned int>>()}}), false},
              {"inner object", objectOf({{"inner", objectOf({{"deep", 0.0f}})}}), true},
-             {"inner object of other content", objectOf({{"inner", objectOf({{"deep", 0.0}})}}), false},
+             {"inner object with other content", objectOf({{"inner", objectOf({{"deep", 0.0}})}}), false},
              {"any inner object", objectOf({{"inner", Ptr<Object>()}}), true},
-             {"inner object where there is null", objectOf({{"null", Ptr<Object>()}}), false},
-             {"inner object where there is a number", objectOf({{"int", Ptr<Object>()}}), false},
+             {"inner object, but the value is null", objectOf({{"null", Ptr<Object>()}}), false},
+             {"inner object, but the value is a number", objectOf({{"int", Ptr<Object>()}}), false},
              {"excluded key is absent", objectOf({{Object::kExcludedKeys, excluding({"a", "b"})}}), true},
-             {"excluded key is there", objectOf({{Object::kExcludedKeys, excluding({"a", "int"})}}), false},
-             {"excluded value is there", objectOf({{Object::kExcludedKeys, objectOf({{"int", 0}})}}), false},
+             {"excluded key is present", objectOf({{Object::kExcludedKeys, excluding({"a", "int"})}}), false},
+             {"excluded value is present", objectOf({{Object::kExcludedKeys, objectOf({{"int", 0}})}}), false},
              {"excluded key has another value", objectOf({{Object::kExcludedKeys, objectOf({{"int", 0.5f}})}}), true},
          })
         EXPECT_EQ(Object::isA(*object, *prototype), conforms) << name;
 }
 
-TEST(Object, isAsItWasWhenAllocationFails)
+TEST(Object, isUnchangedWhenAnAllocationFails)
 {
-    for (std::size_t const keyCount : {1u, 8u, 15u, 16u, 32u}) // before the steps at which tables grow, and in between
+    for (std::size_t const keyCount : {1u, 8u, 15u, 16u, 32u}) // just before a table grows, and in between
         TestSupport::sweepFailingAllocations([&](TestSupport::Attempt const& attempt) {
             MutablePtr<Object> const object = createObject();
             Entries expected;
@@ -138,10 +138,11 @@ TEST(Object, isAsItWasWhenAllocationFails)
                 expected.emplace_back("key" + std::to_string(i), 0);
                 object->setProperty(expected.back().first.c_str(), 0);
             }
-            EXPECT_TRUE(attempt([&] { object->setProperty("key0", PropertyValue()); })) << "replacing takes no memory";
+            EXPECT_TRUE(attempt([&] { object->setProperty("key0", PropertyValue()); }))
+                << "replacing does not allocate";
             expected[0].second = -1;
-            if (attempt([&] { object->setProperty("a new key that is too long for the text itself", 1); }))
-                expected.emplace_back("a new key that is too long for the text itself", 1);
+            if (attempt([&] { object->setProperty("a new key that is too long to be stored inline", 1); }))
+                expected.emplace_back("a new key that is too long to be stored inline", 1);
             EXPECT_EQ(entriesOf(*object), expected);
         });
 }

@@ -18,7 +18,7 @@ namespace {
 
 enum class Mode : int { First, Second };
 
-using Wide = std::pair<std::array<double, 16>, std::shared_ptr<int>>; // too large to lie inside of a value
+using Wide = std::pair<std::array<double, 16>, std::shared_ptr<int>>; // too large to be stored inline
 
 struct alignas(64) Aligned {
     int number;
@@ -49,13 +49,13 @@ template <class... Types> void expectExactTypes(TypeList<Types...> all)
     (expectOnly(std::type_identity<Types>()), ...);
 }
 
-static_assert(!std::is_constructible_v<PropertyValue, char const*>, "a text literal is no value");
+static_assert(!std::is_constructible_v<PropertyValue, char const*>, "a string literal is not a value");
 static_assert(!std::is_constructible_v<PropertyValue, std::unique_ptr<int>>, "values are copyable");
 static_assert(std::is_nothrow_move_constructible_v<PropertyValue> && std::is_nothrow_move_assignable_v<PropertyValue>);
 
 }
 
-TEST(PropertyValue, tellsTypesApartExactly)
+TEST(PropertyValue, distinguishesTypesExactly)
 {
     expectExactTypes(StoredTypes());
     PropertyValue const empty;
@@ -94,10 +94,10 @@ TEST(PropertyValue, ownsLargeValues)
         EXPECT_EQ(copy.get<Wide>()->first[0], 1.5);
         EXPECT_EQ(watched.use_count(), 3);
         PropertyValue moved = std::move(value);
-        EXPECT_EQ(moved.get<Wide>(), address) << "moving a large value moves no bytes of it";
+        EXPECT_EQ(moved.get<Wide>(), address) << "a large value keeps its address when moved";
         copy = 3;
         EXPECT_EQ(watched.use_count(), 2);
-        moved = *moved.get<Wide>(); // from what it holds
+        moved = *moved.get<Wide>(); // assigned from its own content
         EXPECT_EQ(moved.get<Wide>()->first[0], 1.5);
     }
     EXPECT_EQ(watched.use_count(), 1);

@@ -14,7 +14,7 @@
 
 namespace Orvan {
 
-/// Asks a sizing operation of `Array` to leave new elements of trivial types as memory comes.
+/// Asks a sizing operation of `Array` to leave new elements of trivial types uninitialized.
 struct Uninitialized { };
 inline constexpr Uninitialized kUninitialized{};
 
@@ -22,8 +22,8 @@ inline constexpr Uninitialized kUninitialized{};
 ///
 /// `data` holds `capacity` elements, of which the first `size` are alive. Growing by n elements where
 /// `capacity - size < n` gives the capacity `capacity + max(capacity, n)`; shrinking only lowers `size`.
-/// New elements are value-initialised (zero for numbers) unless `kUninitialized` is passed; elements of types that
-/// need a constructor are always constructed. `bool` elements are bytes of their own.
+/// New elements are value-initialized (zero for numbers) unless `kUninitialized` is passed; elements of types that
+/// need a constructor are always constructed. Each `bool` element is a byte.
 ///
 /// Copies are deep. Several threads may read one array, or write different elements of it.
 /// \throws std::bad_alloc  from every operation that may grow; the array then holds the same elements as before.
@@ -71,8 +71,8 @@ public:
 
     Array(Array&& other) noexcept { swap(other); }
 
-    /// Reuses the storage where it is large enough and the elements are trivial; others are copied first, so that a
-    /// copy that fails changes nothing.
+    /// Reuses the storage if it is large enough and the elements are trivial. Otherwise copies into new storage first,
+    /// so that a copy that fails changes nothing.
     Array& operator=(Array const& other)
     {
         if (this == &other)
@@ -115,7 +115,7 @@ public:
     T const* end() const noexcept { return data + size; }
     bool empty() const noexcept { return size == 0; }
 
-    /// Makes room for exactly `count` elements where there is less; never shrinks.
+    /// Raises the capacity to exactly `count` if it is lower; never shrinks.
     void reserve(std::uint64_t count)
     {
         if (count > capacity)
@@ -151,7 +151,7 @@ public:
     }
 
 private:
-    /// Owns fresh storage until its elements are constructed.
+    /// Owns new storage until its elements are constructed.
     struct Storage {
         Internal::UntypedTypeRep rep;
         std::uint64_t count;

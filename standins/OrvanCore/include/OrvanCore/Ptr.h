@@ -13,10 +13,10 @@ template <class T> class MutablePtr;
 
 namespace Internal {
 
-    /// Counts the references to one shared value, and knows how to copy it and how to end it.
+    /// Counts the references to one shared value, and copies and destroys it.
     template <class T> class ControlBlock {
     public:
-        virtual Ptr<T> clone(T const& value) const = 0; ///< A deep copy of the value, held once.
+        virtual Ptr<T> clone(T const& value) const = 0; ///< A deep copy of the value, with one reference.
         virtual void dispose() noexcept = 0; ///< Destroys the value and this block.
 
         std::atomic<std::uint64_t> count{1};
@@ -25,7 +25,7 @@ namespace Internal {
         ~ControlBlock() = default;
     };
 
-    /// Holds the value itself, so that a shared value is one allocation.
+    /// Contains the value, so that a shared value takes one allocation.
     template <class T> class InlineControlBlock final : public ControlBlock<T> {
     public:
         template <class... Arguments> explicit InlineControlBlock(Arguments&&... arguments)
@@ -53,10 +53,10 @@ namespace Internal {
 
 }
 
-/// A reference to a shared value that nobody changes. Null by default; null needs no control block.
+/// A reference to a shared, immutable value. Null by default; null has no control block.
 ///
-/// The count is atomic: references to one value may be copied and dropped on any threads. One `Ptr` itself is not to be
-/// written by two threads at once.
+/// The count is atomic: references to one value may be copied and released on any threads. Two threads must not write
+/// the same `Ptr` at once.
 template <class T> class Ptr {
 public:
     Ptr() noexcept = default;
@@ -86,7 +86,7 @@ public:
     T const* operator->() const noexcept { return value_; }
     explicit operator bool() const noexcept { return value_ != nullptr; }
 
-    /// How many references there are; 0 for null. Exact only while no other thread copies or drops one.
+    /// The number of references; 0 for null. Exact only while no other thread copies or releases one.
     std::uint64_t useCount() const noexcept { return control_ ? control_->count.load(std::memory_order_acquire) : 0; }
 
     friend bool operator==(Ptr const& a, Ptr const& b) noexcept { return a.value_ == b.value_; }
@@ -99,7 +99,7 @@ private:
     Internal::ControlBlock<T>* control_ = nullptr;
 };
 
-/// The only reference to a value, which may therefore be changed. Converts to a `Ptr` by a move.
+/// The only reference to a value, which may therefore be changed. Can be moved into a `Ptr`.
 template <class T> class MutablePtr {
 public:
     MutablePtr() noexcept = default;
@@ -150,16 +150,16 @@ template <class T> Ptr<T>::Ptr(MutablePtr<T>&& other) noexcept
 {
 }
 
-/// Turns a shared value into one that may be changed, and empties `shared`: the value itself where this was the only
-/// reference, a deep copy where somebody else holds it too, null for null.
-/// \throws whatever copying throws; `shared` is then as it was.
+/// Makes a shared value mutable, and empties `shared`. Returns the value itself if this was the only reference, a deep
+/// copy if it is shared, null for null.
+/// \throws  What copying throws, with `shared` unchanged.
 template <class T> MutablePtr<T> makeMutable(Ptr<T>&& shared)
 {
     if (!shared.control_) {
         shared.value_ = nullptr;
         return {};
     }
-    // Acquire: what the last other holder did before it let go happens before our edits.
+    // Acquire: what other threads did before they released their references happens before our edits.
     if (shared.control_->count.load(std::memory_order_acquire) != 1) {
         Ptr<T> copy = shared.control_->clone(*shared.value_);
         shared = std::move(copy);

@@ -6,13 +6,14 @@
 
 namespace Orvan {
 
-/// A text value; immutable by convention. Short texts (up to 15 characters) take no memory of their own.
+/// A string value; immutable by convention. Short strings (up to 15 characters) are stored without an allocation.
 ///
-/// Concurrent reading is safe. A null `char const*` counts as the empty text.
+/// Any number of threads may read and copy one string at once, and different threads may write different strings, also
+/// if these are elements of one array. A null `char const*` counts as the empty string.
 class String {
 public:
     String() = default;
-    String(char const* text) // implicit on purpose: keys are written as plain text
+    String(char const* text) // implicit, so that keys can be written as literals
         : text_(text ? text : "")
     {
     }

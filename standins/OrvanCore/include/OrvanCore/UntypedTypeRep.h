@@ -6,19 +6,20 @@
 
 namespace Orvan::Internal {
 
-/// What an array knows of its elements at run time, and the allocator of their storage.
+/// The size and alignment of an array's elements at run time, and the allocator of their storage.
 ///
 /// All operations may be called from any number of threads at once.
 struct ORVANCORE_EXPORT UntypedTypeRep {
     std::uint32_t elementSize;
     std::uint32_t elementAlignment;
 
-    /// Storage for `count` elements (not bytes), aligned for them and not initialised; null for no elements.
-    /// Large blocks are aligned to huge pages and ask the system for them: fresh memory then costs about a third.
-    /// \throws std::bad_alloc  when memory runs out or the byte count exceeds the address space
+    /// Allocates aligned, uninitialized storage for `count` elements (not bytes); null for no elements. Large blocks
+    /// are aligned to huge pages and ask the system for them, which cuts the cost of touching new memory to about a
+    /// third.
+    /// \throws std::bad_alloc  also if the byte count exceeds the address space
     void* allocate(std::uint64_t count) const;
 
-    /// Gives back what `allocate` returned for the same count. Null is fine.
+    /// Frees what `allocate` returned for the same count. Does nothing for null.
     void deallocate(void* pointer, std::uint64_t count) const noexcept;
 
     template <class T> static constexpr UntypedTypeRep of() noexcept

@@ -4,11 +4,12 @@
 
 namespace Orvan {
 
-/// Whether the host wants the running job to stop. Any thread may ask; it costs one load.
+/// Whether the host wants the running job to stop. May be called on any thread; costs one atomic load.
 ORVANCPPOPSDK_EXPORT bool isJobCancelled() noexcept;
 
-/// For the host program: asks the running job to stop, or lets the next one run. Any thread may call it, and so may a
-/// signal handler: it takes no lock. Whoever sees the job cancelled also sees what the caller wrote before.
+/// For the host program: asks the running job to stop, or resets the flag for the next job. May be called on any thread
+/// and in signal handlers, as it takes no lock. A thread that sees the cancellation also sees what the caller wrote
+/// before it.
 ORVANCPPOPSDK_EXPORT void setJobCancelled(bool cancelled) noexcept;
 
 }

@@ -2,8 +2,8 @@
 
 namespace Orvan {
 
-/// What the host offers to a running operation. Opaque: operations hand a pointer on, which may be null, and never look
-/// behind it.
+/// What the host offers to a running operation. Opaque: operations accept a pointer, which may be null, and never
+/// dereference it.
 class RuntimeServices;
 
 }

@@ -9,7 +9,7 @@
 
 namespace Tessara::Geometry {
 
-/// An element type of data properties, with the name under which host programs show it.
+/// An element type of data properties, with the name that host programs display.
 template <class T> struct ElementType {
     using Type = T;
     char const* name;
@@ -61,8 +61,8 @@ template <class Visit> constexpr void forEachElementTypeName(Visit&& visit)
     visit(ElementType<Transform::GraphTransforms>{"GraphTransforms"});
 }
 
-/// Calls `visit(array, elementType)` with the array that a value holds (`Orvan::Array<T> const&`) and its type.
-/// False, with nothing called, for anything else and for a null array.
+/// Calls `visit(array, elementType)` with the array that a value holds (`Orvan::Array<T> const&`) and its type. Returns
+/// false, with nothing called, for a null array and all other values.
 template <class Visit> bool visitArray(PropertyValue const& value, Visit&& visit)
 {
     bool visited = false;

@@ -5,8 +5,8 @@
 
 namespace Tessara::Geometry {
 
-// Look-ups of geo properties. What is absent or of another kind gives null, an empty text or an empty array. All of
-// them may run on many threads for one object at once. Lists are in the order of the object's keys.
+// Look-ups of geo properties. If a property is missing or of another kind, the result is null, an empty string or an
+// empty array. Any number of threads may look up the same object at once. Lists are in the order of the object's keys.
 
 TESSARAGEOMETRY_EXPORT Orvan::Array<Orvan::String> getGeoPropNamesByPrototype(
     Object const& object, Object const& prototype);
@@ -19,7 +19,7 @@ TESSARAGEOMETRY_EXPORT Orvan::Array<Orvan::String> getGeoPropNamesByTarget(
 /// The `sTarget` of the geo property `name`.
 TESSARAGEOMETRY_EXPORT Orvan::String getGeoPropTargetName(Object const& object, Orvan::String const& name);
 /// The component that the geo property `name` belongs to: data leads to its range, a range to its target, until a
-/// component is reached. Empty for a chain that breaks or loops, and for a component's own name.
+/// component is reached. Empty for chains that are broken or cyclic, and for a component's own name.
 TESSARAGEOMETRY_EXPORT Orvan::String getTargetComponent(Object const& object, Orvan::String const& name);
 
 TESSARAGEOMETRY_EXPORT Orvan::Ptr<Object> getDataGeoProperty(Object const& object, Orvan::String const& name);
@@ -28,7 +28,7 @@ TESSARAGEOMETRY_EXPORT Orvan::Ptr<Object> getRangeGeoProperty(Object const& obje
 TESSARAGEOMETRY_EXPORT Orvan::Ptr<Orvan::Array<unsigned int>> getRangeGeoPropIndices(Object const& range);
 TESSARAGEOMETRY_EXPORT Orvan::Ptr<Orvan::Array<unsigned int>> getRangeGeoPropIndices(
     Object const& object, Orvan::String const& name);
-/// False, with nothing changed, where the object has no range of that name.
+/// Returns false, with nothing changed, if the object has no range of that name.
 TESSARAGEOMETRY_EXPORT bool setRangeGeoPropIndices(
     Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>> indices, Object& object);
 

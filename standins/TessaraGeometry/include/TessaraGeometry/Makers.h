@@ -8,17 +8,17 @@
 
 namespace Tessara::Geometry {
 
-// For host programs: whole objects in one call. Arrays are taken over, or made from a span or a list at the call:
+// For host programs: whole objects in one call. Arrays are moved in, or constructed in the call from a span or a list:
 //     makePointCloud({{0, 0, 0}, {1, 0, 0}})
 //     makeMesh(Orvan::Array<float3>(positionSpan), ...)
-// Nothing is checked here but that counts fit 32 bits (std::length_error otherwise): the validators tell whether the
-// arrays fit together.
+// Nothing is checked here except that counts fit 32 bits (otherwise std::length_error): the validators tell whether the
+// arrays match.
 
-/// \param faceOffset  face count + 1 entries; an empty array counts as the one entry 0
+/// \param faceOffset  Face count + 1 entries; an empty array is replaced by the single entry 0.
 TESSARAGEOMETRY_EXPORT Orvan::MutablePtr<Object> makeMesh(
     Orvan::Array<Math::float3> positions, Orvan::Array<unsigned int> faceVertex, Orvan::Array<unsigned int> faceOffset);
 TESSARAGEOMETRY_EXPORT Orvan::MutablePtr<Object> makePointCloud(Orvan::Array<Math::float3> positions);
-/// \param strandOffset  strand count + 1 entries; an empty array counts as the one entry 0
+/// \param strandOffset  Strand count + 1 entries; an empty array is replaced by the single entry 0.
 TESSARAGEOMETRY_EXPORT Orvan::MutablePtr<Object> makeStrands(
     Orvan::Array<Math::float3> positions, Orvan::Array<unsigned int> strandOffset);
 
@@ -29,7 +29,7 @@ TESSARAGEOMETRY_EXPORT void addComponent(Orvan::String const& name, unsigned int
 TESSARAGEOMETRY_EXPORT void addRangeProperty(
     Orvan::String const& name, Orvan::String const& target, Orvan::Array<unsigned int> indices, Object& object);
 
-/// A data geo property on its own. A property of type `bool` is what `populateTag` makes.
+/// A data geo property that is in no object yet. With type `bool` it equals a tag of `populateTag`.
 template <class T> Orvan::MutablePtr<Object> makeDataProperty(
     Orvan::String const& target, Orvan::Ptr<Orvan::Array<T>> values, T defaultValue = T{})
 {
@@ -51,7 +51,7 @@ template <class T> void addDataProperty(Orvan::String const& name, Orvan::String
         name, Orvan::Ptr<Object>(makeDataProperty<T>(target, std::move(shared), std::move(defaultValue))));
 }
 
-/// The array of a data property of the object; null where there is none of that type.
+/// The array of a data property of the object; null if there is none of that type.
 template <class T> Orvan::Ptr<Orvan::Array<T>> dataOf(Object const& object, Orvan::String const& name)
 {
     PropertyValue const property = object.getProperty(name);

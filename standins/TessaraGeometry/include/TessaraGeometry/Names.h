@@ -2,31 +2,32 @@
 
 namespace Tessara::Geometry {
 
-// Each constant's text is its own name, so that a message which quotes a key also names the constant. All are short
-// enough for an `Orvan::String` to hold without memory of its own, which keeps look-ups of standard properties cheap.
+// The value of each constant is its own name, so that a message that quotes a key also names the constant. All are
+// short enough for an `Orvan::String` to store without an allocation, which makes look-ups of standard properties
+// cheap.
 
-// Components: classes of elements and how many of them exist.
+// Components: classes of elements, with their number.
 inline constexpr char const* sPointComp = "sPointComp";
 inline constexpr char const* sFaceComp = "sFaceComp";
 inline constexpr char const* sFaceVertexComp = "sFaceVertexComp"; // face corners
 inline constexpr char const* sStrandComp = "sStrandComp";
 
 // Standard data properties. The offset arrays have one entry more than there are faces or strands.
-inline constexpr char const* sPointPosition = "sPointPosition"; // float3 a point
-inline constexpr char const* sFaceVertex = "sFaceVertex"; // unsigned int a face corner: its point
-inline constexpr char const* sFaceOffset = "sFaceOffset"; // unsigned int a face: its first corner
-inline constexpr char const* sStrandOffset = "sStrandOffset"; // unsigned int a strand: its first point
+inline constexpr char const* sPointPosition = "sPointPosition"; // float3 per point
+inline constexpr char const* sFaceVertex = "sFaceVertex"; // unsigned int per face corner: its point
+inline constexpr char const* sFaceOffset = "sFaceOffset"; // unsigned int per face: its first corner
+inline constexpr char const* sStrandOffset = "sStrandOffset"; // unsigned int per strand: its first point
 
 // Properties of geo properties.
 inline constexpr char const* sData = "sData"; // Ptr<Array<T>>: the values
 inline constexpr char const* sTarget = "sTarget"; // String: the component or range that the property belongs to
-inline constexpr char const* sDefault = "sDefault"; // T: the value of elements that have none
+inline constexpr char const* sDefault = "sDefault"; // T: the value of elements without one
 inline constexpr char const* sInterp = "sInterp"; // DataInterpolationMode
 inline constexpr char const* sDependsOn = "sDependsOn"; // Ptr<Array<String>>: names of properties
 inline constexpr char const* sIndices = "sIndices"; // Ptr<Array<unsigned int>>: entries of a range
 
-inline constexpr char const* sGenericDataGeoProp = "sGenericData"; // asks for the prototype of data of any type
-inline constexpr char const* sNullString = ""; // the target of data that has none yet: no component has an empty name
+inline constexpr char const* sGenericDataGeoProp = "sGenericData"; // selects the prototype of data of any type
+inline constexpr char const* sNullString = ""; // target of data that has none yet: no component has an empty name
 
 // Index sentinels; neither is a valid index.
 inline constexpr unsigned int kInvalidIndex = 0xFFFFFFFFu; // an absent element in an index array

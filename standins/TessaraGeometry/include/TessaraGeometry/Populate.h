@@ -5,10 +5,10 @@
 
 namespace Tessara::Geometry {
 
-// Give an object the components (with the count 0) and the standard data properties (with empty arrays; offset arrays
-// with their one entry 0) of its kind, each with `sDefault`. Other keys of the object are left alone. When memory runs
-// out (std::bad_alloc) the object is as it was; so are those of the functions for single geo properties, which replace
-// all properties of the object they are given.
+// The first three give an object the components of its kind, with count 0, and the standard data properties, each with
+// `sDefault` and an empty array; offset arrays have the single entry 0. Other keys of the object are kept. The
+// functions for single geo properties replace all properties of their object. All of them throw std::bad_alloc with the
+// object unchanged.
 
 TESSARAGEOMETRY_EXPORT void populateMesh(Object& object);
 TESSARAGEOMETRY_EXPORT void populatePointCloud(Object& object);
@@ -21,7 +21,7 @@ TESSARAGEOMETRY_EXPORT void populateComponentGeoProperty(unsigned int count, Obj
 TESSARAGEOMETRY_EXPORT void populateTag(
     Orvan::String const& target, Orvan::Ptr<Orvan::Array<bool>> const& values, Object& tag);
 
-/// Makes `range` a range geo property. False, with nothing changed, where `indices` is null.
+/// Makes `range` a range geo property. Returns false, with nothing changed, if `indices` is null.
 TESSARAGEOMETRY_EXPORT bool populateRangeGeoProperty(
     Orvan::Ptr<Orvan::Array<unsigned int>> indices, Orvan::String const& target, Object& range);
 

@@ -9,10 +9,10 @@ namespace Common {
 
     enum class GeometryType : int { None = 0, Mesh = 1, PointCloud = 2, Strands = 3 };
 
-    /// How values between elements are found.
+    /// How values between elements are interpolated.
     enum class DataInterpolationMode : int { None = 0, Linear = 1 };
 
-    /// A place on a geometry: an element of a component of some object, and where within the element.
+    /// A location on geometry: an element of a component of an object, and coordinates within the element.
     struct GeoLocation {
         Orvan::String object;
         Orvan::String component;

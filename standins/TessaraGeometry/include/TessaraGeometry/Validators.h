@@ -8,20 +8,20 @@
 namespace Tessara::Geometry {
 
 // The validators check the standard geometry strictly, and nothing else:
-// - all components of the kind are there (a point cloud has no other component), all standard properties are there with
-//   the right element type, target and type of `sDefault`;
+// - all components of the kind exist (and no others in a point cloud), and all standard properties exist with the right
+//   element type, target and type of `sDefault`;
 // - position and index arrays are as long as their component, offset arrays one entry longer;
 // - offsets start at 0, are non-decreasing and end at the number of corners; point indices are in range. Offsets of
-//   strands end at the number of points, and may start above 0: the points in front of that belong to no strand.
-// A mesh without faces has no corners but may hold points; so may a strand set without strands, whose one offset is
-// then 0 or the number of points. Positions need not be finite. Empty geometry is valid. Other properties make no
-// object invalid, not by their length either: operations pad, trim or drop them; `reportProperties` tells about them.
+//   strands end at the number of points, and may start above 0: the points before the first strand belong to none.
+// A mesh without faces has no corners, but may have points; so may a strand set without strands, whose only offset is
+// then 0 or the number of points. Positions need not be finite. Empty geometry is valid. Other properties never make an
+// object invalid, whatever their length is: operations pad, trim or drop them. `reportProperties` describes them.
 //
-// All of it may run on many threads for one object at once; linear in the standard arrays.
+// Any number of threads may validate the same object at once. Linear in the length of the standard arrays.
 
 namespace GeoValidator {
 
-    /// Whether an object passed, and otherwise the first failure in a sentence that names property and element.
+    /// Whether an object is valid; if not, a sentence about the first failure names the property and the element.
     class Status {
     public:
         Status() = default;
@@ -36,7 +36,7 @@ namespace GeoValidator {
         Status& operator=(Status&&) = default;
 
         explicit operator bool() const noexcept { return failure_.empty(); }
-        /// Empty for a valid object. Belongs to the status: it outlives validator and object.
+        /// Empty for a valid object. Owned by the status, so that it outlives the validator and the object.
         Orvan::String const& message() const noexcept { return failure_; }
 
     private:
@@ -65,8 +65,8 @@ public:
     virtual GeoValidator::Status validate(Object const& strands);
 };
 
-/// What is odd in properties that the validators do not look at, a sentence each: lengths that do not fit the target's,
-/// range entries beyond the data that targets the range, targets that are not there. None of it makes an object
+/// Describes suspicious properties that the validators ignore, in one sentence each: lengths that do not match the
+/// target, range entries beyond the data that targets the range, missing targets. None of these makes an object
 /// invalid.
 TESSARAGEOMETRY_EXPORT Orvan::Array<Orvan::String> reportProperties(Object const& object);
 

@@ -5,7 +5,7 @@
 
 namespace TSR {
 
-/// The text of the exception that ends a cancelled job: "job cancelled".
+/// The message of the exception that ends a cancelled job: "job cancelled".
 extern TESSARAMATHSUPPORT_EXPORT Orvan::String const exceptionMessage;
 
 }

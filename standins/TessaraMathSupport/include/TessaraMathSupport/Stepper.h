@@ -4,19 +4,19 @@
 
 namespace Tessara::Math {
 
-/// Cuts an amount into steps of at most a limit: increments of `limit` while more than that remains, then what remains.
+/// Splits an amount into increments: `limit` as long as more than that remains, then the remainder.
 ///
 ///     for (Stepper stepper(amount, 0.9f); stepper; stepper.step(logger))
 ///         move(stepper.increment());
 ///
-/// The remainder is found by subtraction in single precision, so the increments of 2.7 by 0.9 are not three but those
-/// that rounding gives. It ends after fewer than 2^25 steps in any case:
-/// - an amount that is not above 0, or not a number, gives no step;
-/// - a limit that is not above 0, or not a number, limits nothing: the amount is one step;
-/// - where the subtraction no longer changes the remainder, since the amount is infinite or millions of times the
-///   limit, the step at hand is the last one, and the rest is dropped.
+/// The remainder is computed by subtraction in single precision, so that rounding can add a step: 2.7 by 0.9 takes
+/// four. There are always fewer than 2^25 steps:
+/// - an amount that is not positive, or NaN, gives no step;
+/// - a limit that is not positive, or NaN, limits nothing: the amount is one step;
+/// - if the subtraction no longer changes the remainder, because the amount is infinite or millions of times the limit,
+///   the current step is the last one, and the rest is dropped.
 ///
-/// The const operations may be called from any number of threads at once, but not during `step`.
+/// Any number of threads may call the const operations at once, but not during `step`.
 class TESSARAMATHSUPPORT_EXPORT Stepper {
 public:
     Stepper(float amount, float limit) noexcept;
@@ -24,11 +24,11 @@ public:
     /// Whether a step is due.
     explicit operator bool() const noexcept { return remainder_ > 0.0f; }
 
-    /// The increment of the step that is due; the same until `step` is called. 0 when none is due.
+    /// The increment of the step that is due; the same until `step` is called. 0 if none is due.
     float increment() const noexcept { return remainder_ > limit_ ? limit_ : remainder_; }
 
-    /// Ends the step that is due, tells the logger (see Loggers.h), and goes to the next. Does nothing when none is
-    /// due. When the logger throws, the step is ended all the same.
+    /// Completes the step that is due, and logs it (see Loggers.h). Does nothing if none is due. If the logger throws,
+    /// the step is complete nevertheless.
     template <class Logger> void step(Logger const& logger)
     {
         if (!*this)

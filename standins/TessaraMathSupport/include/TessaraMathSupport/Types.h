@@ -2,8 +2,8 @@
 
 namespace Tessara::Math {
 
-// Plain structures of their scalars and nothing else. Vectors have named fields; a type named 2x3 has two rows of
-// three. There is no two-component `uchar` and no four-component `short` or `int`.
+// Plain structures of scalars. Vectors have named fields; a type named 2x3 has two rows of three. There is no
+// two-component `uchar` and no four-component `short` or `int`.
 
 namespace Internal {
 

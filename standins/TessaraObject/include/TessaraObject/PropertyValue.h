@@ -11,16 +11,16 @@ namespace Tessara {
 
 class PropertyValue;
 
-/// What a property value can hold. Not pointers or arrays: a text literal would become what it is not meant to be.
+/// What a property value can hold. Neither pointers nor arrays, so that a string literal is not stored as a pointer.
 template <class T>
 concept StorableValue = (!std::is_same_v<T, PropertyValue>)&&(!std::is_pointer_v<T>)&&(!std::is_null_pointer_v<T>)&&(
     !std::is_array_v<T>)&&std::is_copy_constructible_v<T>;
 
-/// What an object stores under a key: nothing, or one value of one type.
+/// What an object stores under a key: either nothing or one value of one type.
 ///
-/// Types are told apart exactly: `unsigned int` is not `int`, and `T` is not `Orvan::Ptr<Orvan::Array<T>>`. A copy of a
-/// held `Ptr` is one more reference, not a deep copy. Values of up to 32 bytes (every `Ptr`, every `Orvan::String`) lie
-/// inside, so that holding them takes no memory of its own; moving never fails.
+/// Types are distinguished exactly: `unsigned int` is not `int`, and `T` is not `Orvan::Ptr<Orvan::Array<T>>`. A copy
+/// of a held `Ptr` is one more reference, not a deep copy. Values of up to 32 bytes (every `Ptr`, every
+/// `Orvan::String`) are stored inline, without an allocation; moving never fails.
 class PropertyValue {
     static constexpr std::size_t kInlineBytes = 32;
     template <class T> static constexpr bool kInline = sizeof(T) <= kInlineBytes
@@ -30,7 +30,7 @@ public:
     PropertyValue() noexcept { }
 
     template <class T, StorableValue V = std::remove_cvref_t<T>>
-    PropertyValue(T&& value) // implicit on purpose: object.setProperty(key, value)
+    PropertyValue(T&& value) // implicit, for object.setProperty(key, value)
     {
         if constexpr (kInline<V>)
             ::new (static_cast<void*>(storage_)) V(std::forward<T>(value));
@@ -68,7 +68,7 @@ public:
         return static_cast<T const*>(operations_->address(storage_));
     }
 
-    /// The type of the held value, `typeid(void)` when empty.
+    /// The type of the held value, `typeid(void)` if empty.
     std::type_info const& type() const noexcept { return operations_ ? *operations_->type : typeid(void); }
 
 private:
