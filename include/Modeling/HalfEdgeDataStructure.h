@@ -11,82 +11,82 @@
 
 namespace Geometry::Mesh {
 
-/// One side of an edge: the directed edge from u to v of the face that passes it in this direction. By default the one
-/// that is not there.
+/// One side of an edge: the directed edge from u to v of the face that has it in this direction. The default value
+/// stands for an edge that does not exist.
 struct HalfEdge {
     unsigned int face = Tessara::Geometry::kInvalidIndex;
-    unsigned char corner = 0; ///< which corner of that face holds v; the low 8 bits
-    unsigned char faceSize = 1; ///< how many corners that face has; the low 8 bits
+    unsigned char corner = 0; ///< the corner of that face that is at v; low 8 bits only
+    unsigned char faceSize = 1; ///< the number of corners of that face; low 8 bits only
 
     friend bool operator==(HalfEdge const&, HalfEdge const&) = default;
 };
 
-/// The adjacency of a mesh: for each point the directed edges that end there, found by the point they come from.
+/// The adjacency of a mesh: for each point the directed edges that end there, indexed by the point at which they start.
 ///
-/// The mesh itself stays in its flat arrays. The face across the edge from a to b of some face is the one that passes
-/// from b to a: `halfEdge(a, b)`, whose `corner` holds a and, in a triangle, is followed by the corner opposite the
-/// edge. On a closed manifold the points from which edges come are the neighbours of a point, and the faces of these
-/// edges the faces around it, each once.
+/// The mesh itself stays in its flat arrays. The face across the edge from a to b of some face is the one with the edge
+/// from b to a: `halfEdge(a, b)`. Its `corner` is at a and, in a triangle, is followed by the corner opposite the edge.
+/// On a closed manifold, the start points of the edges that end at a point are its neighbors, and the faces of these
+/// edges are the faces around it, each once.
 ///
-/// Faces may have any number of corners, though `corner` and `faceSize` are cut to 8 bits. Where several faces pass an
-/// edge in the same direction, the one with the lowest number stays (within a face the lowest corner), and the others
-/// are left out without a report: nothing here checks that a mesh is manifold.
+/// Faces may have any number of corners, although `corner` and `faceSize` are truncated to 8 bits. If several faces
+/// have the same directed edge, the face with the lowest number is kept (within a face, the lowest corner), and the
+/// others are ignored silently: manifoldness is not checked.
 ///
-/// Any number of threads may read one structure. Building takes linear time whatever the numbering of the points, but
-/// for sorting the edges at each point, on all threads and with the same result for any number of them. Looking an edge
-/// up takes a few steps, at points of high valence a bisection. Takes 8 bytes a corner and 4 a point, and 8 more a
-/// corner where not all faces are triangles; while it is built, up to 8 more a corner at points of high valence, and
-/// where edges repeat.
+/// Any number of threads may read a structure concurrently. Building runs in parallel with the same result for any
+/// number of threads. It takes linear time however the points are numbered, plus the time to sort the edges at each
+/// point. Looking up an edge takes a few steps, or a binary search at points of high valence. Memory: 8 bytes per
+/// corner and 4 per point, and 8 more per corner if not all faces are triangles; temporarily up to 8 more per corner
+/// during construction for points of high valence and for repeated edges.
 class HalfEdgeDataStructure {
 public:
-    struct Neighbour {
-        unsigned int point; ///< where the edge comes from
+    struct Neighbor {
+        unsigned int point; ///< where the edge starts
         HalfEdge halfEdge;
     };
     class Iterator;
-    class Neighbours;
+    class Neighbors;
 
-    /// That many points, and no edges.
+    /// `numPoints` points and no edges.
     /// \throws std::bad_alloc
     MODELING_EXPORT explicit HalfEdgeDataStructure(unsigned int numPoints);
 
     /// \param faceVertex  the point of each corner; all below `numPoints`
-    /// \param faceOffset  `numFaces` + 1 entries that ascend: where the corners of each face begin. A face without
-    ///                    corners has no edges.
+    /// \param faceOffset  `numFaces` + 1 non-decreasing entries: the first corner of each face, and the end of the last
+    ///                    one. A face without corners has no edges.
     /// \throws std::bad_alloc
     MODELING_EXPORT HalfEdgeDataStructure(unsigned int numPoints, unsigned int numFaces,
         Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset);
 
-    /// The directed edge that ends at `point` and comes from `other`; by default where there is none.
+    /// The directed edge from `other` to `point`; a default `HalfEdge` if there is none.
     HalfEdge halfEdge(unsigned int point, unsigned int other) const
     {
         std::uint64_t const* const found = find(point, other);
         return found ? recordOf(*found) : HalfEdge();
     }
 
-    /// How many directed edges end at the point: its valence on a closed manifold. Constant time.
+    /// The number of directed edges that end at the point: its valence on a closed manifold. Constant time.
     std::uint64_t valence(unsigned int point) const { return offsets_[std::uint64_t{point} + 1] - offsets_[point]; }
 
-    /// How many directed edges there are: as many as corners, unless some were left out.
+    /// The number of directed edges: that of all corners of faces, less the edges that were ignored.
     std::uint64_t size() const { return entries_.size; }
 
-    /// The directed edges that end at the point, ascending by the points they come from.
-    Neighbours neighbours(unsigned int point) const;
+    /// The directed edges that end at the point, in ascending order of the points at which they start.
+    Neighbors neighbors(unsigned int point) const;
 
-    /// Leaves no points and no edges: nothing may be asked about a point then.
+    /// Removes all points and edges: no query about a point is valid afterwards.
     MODELING_EXPORT void clear() noexcept;
     MODELING_EXPORT void swap(HalfEdgeDataStructure& other) noexcept;
 
-    /// Whether some face has an edge that no face passes in the other direction. Each face is taken for a triangle of
-    /// its first three corners; one with fewer counts as an open edge.
+    /// Whether some face has an edge that no face has in the opposite direction. Of each face only the triangle of its
+    /// first three corners is considered; a face with fewer corners counts as a boundary.
     MODELING_EXPORT bool hasBoundary(unsigned int numFaces, Orvan::Array<unsigned int> const& faceVertex,
         Orvan::Array<unsigned int> const& faceOffset) const;
 
 private:
-    static constexpr std::ptrdiff_t kShortList = 24; // up to here looking at all is faster than a bisection
+    static constexpr std::ptrdiff_t kShortList = 24; // up to this length a linear search is faster than a binary search
 
-    // An entry is the point that the edge comes from above the corner at which it ends: entries in ascending order are
-    // in the order of the points, and equal ones in the order of the faces.
+    // An entry holds the start point of the edge in its high half and the corner at the end of the edge in its low
+    // half. So ascending entries are in the order of the start points, and repeated edges in the order of the faces.
     static unsigned int startOf(std::uint64_t entry) { return static_cast<unsigned int>(entry >> 32); }
     static unsigned int cornerOf(std::uint64_t entry) { return static_cast<unsigned int>(entry); }
 
@@ -112,22 +112,22 @@ private:
 
     void dropRepeatedEdges();
 
-    Orvan::Array<unsigned int> offsets_; // where the entries of each point begin; one more than points
+    Orvan::Array<unsigned int> offsets_; // point count + 1: where the entries of each point begin
     Orvan::Array<std::uint64_t> entries_;
-    Orvan::Array<HalfEdge> records_; // one a corner; empty where corner c is that of a triangle c / 3
+    Orvan::Array<HalfEdge> records_; // one per corner; empty if corner c belongs to triangle c / 3
 };
 
 class HalfEdgeDataStructure::Iterator {
 public:
     using iterator_category = std::input_iterator_tag;
-    using value_type = Neighbour;
+    using value_type = Neighbor;
     using difference_type = std::ptrdiff_t;
     using pointer = void;
-    using reference = Neighbour;
+    using reference = Neighbor;
 
     Iterator() = default;
 
-    Neighbour operator*() const { return {startOf(*entry_), edges_->recordOf(*entry_)}; }
+    Neighbor operator*() const { return {startOf(*entry_), edges_->recordOf(*entry_)}; }
     Iterator& operator++()
     {
         ++entry_;
@@ -153,10 +153,10 @@ private:
     std::uint64_t const* entry_ = nullptr;
 };
 
-/// A range for `for (auto const& [point, halfEdge] : edges.neighbours(p))`, of use while the structure lives.
-class HalfEdgeDataStructure::Neighbours {
+/// A range for `for (auto const& [point, halfEdge] : edges.neighbors(p))`; the structure has to outlive it.
+class HalfEdgeDataStructure::Neighbors {
 public:
-    Neighbours(Iterator first, Iterator last)
+    Neighbors(Iterator first, Iterator last)
         : first_(first)
         , last_(last)
     {
@@ -168,7 +168,7 @@ private:
     Iterator first_, last_;
 };
 
-inline HalfEdgeDataStructure::Neighbours HalfEdgeDataStructure::neighbours(unsigned int point) const
+inline HalfEdgeDataStructure::Neighbors HalfEdgeDataStructure::neighbors(unsigned int point) const
 {
     return {Iterator(*this, entries_.data + offsets_[point]),
         Iterator(*this, entries_.data + offsets_[std::uint64_t{point} + 1])};

@@ -5,40 +5,43 @@
 
 namespace Geometry::Mesh {
 
-/// Collapses the needle-shaped faces of a closed triangle mesh, each along its shortest edge, to that edge's midpoint.
+/// Removes the needle-shaped faces of a closed triangle mesh by edge collapse: the shortest edge of each needle
+/// collapses to its midpoint.
 ///
-/// It is for needles that sculpting and cutting leave in a surface of larger faces, where the short edge is short compared
-/// to everything else nearby. It is not for plates and walls whose thickness is below `ratio` times the length of their
-/// faces: the faces of their rims are needles too, and as these collapse the plate tapers to an edge, which takes 2 to 50
-/// percent of the volume of typical parts. The shape is not measured: compare volumes before and after if it matters.
+/// Meant for needles that sculpting and cutting leave in a surface of larger faces, where the short edge is short
+/// compared to everything else nearby. Not meant for plates and walls whose thickness is below `ratio` times the length
+/// of their faces: the faces of their rims are needles too, and as these collapse the plate tapers to an edge, which
+/// costs 2 to 50 percent of the volume of typical parts. The change of shape is not measured: compare volumes before
+/// and after if it matters.
 ///
-/// A face is a needle when its shortest edge is shorter than `ratio` times its longest one. Faces are visited once, in
-/// ascending order, each measured as the collapses before it have left it. A collapse is skipped where it would pinch
-/// the surface or close it to nothing (the ends of the edge must have exactly two neighbours in common, and may not
-/// both have valence 3), and where it would turn a face around either end over, judged against that face's normal from
-/// before the first collapse.
+/// A face is a needle if its shortest edge is shorter than `ratio` times its longest edge. Faces are visited once, in
+/// ascending order, and measured as the earlier collapses have left them. A collapse is skipped if it would make the
+/// surface non-manifold or reduce it to nothing (the ends of the edge must have exactly two common neighbors, and must
+/// not both have valence 3), or if it would turn over a face around either end, compared to the normal that this face
+/// had before the first collapse.
 ///
-/// Each collapse takes one point and two faces. The point at the start of the edge moves to the midpoint, the other one
-/// goes. The points and faces that remain are renumbered: holes are filled from the end of the arrays, so order is kept
-/// only in front of the first hole.
+/// Each collapse removes one point and two faces: the point at the start of the edge moves to the midpoint, and the
+/// point at the end is removed. Remaining points and faces are renumbered: holes are filled from the end of the arrays,
+/// so the order is kept only before the first hole.
 ///
-/// \param ratio  Fraction of the longest edge, without unit. At 0 nothing collapses.
-/// \param mesh   Reads and rewrites `sPointPosition` (one float3 a point, in scene units), `sFaceVertex` (one point
-///               index a corner) and `sFaceOffset` (face count + 1 entries), and the counts of `sPointComp`,
+/// \param ratio  Fraction of the longest edge, dimensionless. 0 collapses nothing.
+/// \param mesh   Reads and rewrites `sPointPosition` (one float3 per point, in scene units), `sFaceVertex` (one point
+///               index per corner) and `sFaceOffset` (face count + 1 entries), and the counts of `sPointComp`,
 ///               `sFaceVertexComp` and `sFaceComp`. Other properties keep their old arrays and old lengths: the
-///               operation is meant for meshes that consist of these three. Other holders of the arrays see no change.
-/// \pre          Closed and manifold, three corners to a face, arrays that fit their counts, point indices in range.
-///               A mesh with other faces than triangles is left as it was; around boundaries and non-manifold edges and
-///               points nothing collapses. Indices out of range are undefined.
-/// \return       Always true. A mesh that lacks one of the three arrays is left as it was.
-/// \throws       std::bad_alloc, with the mesh as it was. Job cancellation is not looked at.
+///               operation is meant for meshes that consist of these three. Objects that share the arrays see no
+///               change.
+/// \pre          Closed and manifold, three corners per face, arrays that fit their counts, point indices in range. A
+///               mesh with faces other than triangles is left unchanged; at boundaries and around non-manifold edges
+///               and points nothing collapses. If an index is out of range, the behavior is undefined.
+/// \return       Always true. A mesh without one of the three arrays is left unchanged.
+/// \throws       std::bad_alloc, with the mesh unchanged. Job cancellation is ignored.
 ///
 /// Measuring and adjacency run in parallel, the collapses on the calling thread; the result is the same for any number
-/// of threads. Linear in the number of faces, plus for each collapse the valences of both ends: many collapses at one
-/// point of many faces take quadratic time. A collapse that is refused mostly costs the smaller of the two valences,
-/// because the points around a hub, and the faces that refused there, are remembered. Allocates about 30 bytes per face
-/// beside the arrays that are written, and 40 to some hundred more per face around a hub; if nothing collapses, nothing
-/// is written.
+/// of threads. Linear in the number of faces, plus the valences of both ends for each collapse: many collapses at one
+/// point with many faces take quadratic time. A refused collapse mostly costs the smaller of the two valences, because
+/// the neighbors of such a point, and the faces that refused there, are remembered. Allocates about 30 bytes per face
+/// in addition to the arrays that are written, and 40 to a few hundred bytes per face around such points. If nothing
+/// collapses, nothing is written.
 ///
 /// Link condition: Dey, Edelsbrunner, Guha, Nekhayev, "Topology preserving edge contraction", 1999.
 MODELING_EXPORT bool removeSlivers(float ratio, Tessara::Object& mesh);

@@ -7,41 +7,44 @@
 
 namespace Geometry::Mesh {
 
-/// Evens out the edges of a polygon mesh by tangential Laplacian smoothing: each point moves towards the middle of the
-/// faces around it, within the plane that touches the surface at the point.
+/// Evens out the edges of a polygon mesh by tangential Laplacian smoothing: each point moves toward the mean of the
+/// centroids of the faces around it, within the tangent plane of the surface at the point.
 ///
-/// It is for rounded surfaces whose faces are small compared to their curvature, such as scans, where noise along the
-/// surface and uneven edges vanish and the shape changes little. It is not for parts with sharp edges: a point at an edge
-/// or a corner slides along the mean of its faces' planes, which is off all of them, so that edges fray, corners retreat,
-/// and thin walls may fold over. Where the surface curves, a point leaves it by about the square of its move over twice the
-/// radius. Weights of 0 hold the points that have to stay; a flat region between them stays flat.
+/// Meant for rounded surfaces whose faces are small compared to their curvature, such as scans: noise along the surface
+/// and uneven edges vanish, and the shape changes little. Not meant for parts with sharp edges: a point on an edge or
+/// at a corner slides along the mean of the planes of its faces, which is none of them, so that edges fray, corners
+/// retreat, and thin walls may fold over. Where the surface curves, a point leaves it by about the square of its move
+/// divided by twice the radius of curvature. Points with weight 0 stay in place, and a flat region between them stays
+/// flat.
 ///
-/// `amount` is cut into steps of at most 0.9. In a step of the increment i every point moves by i times the way to a
-/// target, without the part of it along the point's normal. The target is the mean of the centroids of the triangles
-/// around the point, of this step and all steps before it. The normal is the sum of their normals, weighted by area,
-/// likewise running on from step to step. Triangles count as they are, once for each of their corners at the point; of
-/// other faces it is those of the two edges at the point with the mean of the corners.
+/// `amount` is divided into steps of at most 0.9. In a step of increment i, each point moves by i times the vector to
+/// its target, without the component along the point's normal. The target is the mean of the centroids of the triangles
+/// around the point, and the normal is the area-weighted sum of their normals; both are taken over all steps so far,
+/// not only over this one. A triangle counts once for each of its corners at the point. Other faces count as a fan
+/// around the mean of their corners, of which the triangles of the two edges at the point are used.
 ///
-/// Points at a boundary move like any other, so that an open mesh shrinks from its boundary; weights pin them.
+/// Boundary points move like all others, so that an open mesh shrinks from its boundary; pin them with weights.
 ///
-/// \tparam Logger      `CoreGL::OrvanLogger`, `ConsoleLogger` or `NOPLogger`: where each finished step is told
-/// \param amount       Without unit; at 0 and below, and where it is not a number, nothing moves.
-/// \param pointCount, faceCount  Of the mesh.
-/// \param faceVertex   One point index a corner.
-/// \param faceOffset   Face count + 1 entries: where the corners of a face begin, and as last entry where all end.
-///                     Faces of two corners count as flat, those of none not at all.
-/// \param weights      One a point, by which its moves are scaled; below 0 counts as 0, above 1 as 1. Null: 1 for all.
-///                     At 0 a point stays where it is.
-/// \param positions    One a point; read and changed in place.
-/// \pre                Arrays that fit the counts, offsets that ascend within the corners, point indices in range:
-///                     undefined otherwise. Corners in front of the first face or behind the last count for nothing.
-///                     Every point is of a face: others become not-a-number in the first step, whatever their weight.
-/// \throws             std::bad_alloc, with the positions as they were; what the logger throws, after whole steps. Job
-///                     cancellation is not looked at.
+/// \tparam Logger      `CoreGL::OrvanLogger`, `ConsoleLogger` or `NOPLogger`, to which each finished step is reported
+/// \param amount       Dimensionless. Nothing moves if it is 0, negative or NaN.
+/// \param pointCount, faceCount  Number of points and faces of the mesh.
+/// \param faceVertex   The point of each face corner.
+/// \param faceOffset   Face count + 1 entries: the first corner of each face, and the end of the last one. Faces with
+///                     two corners count as degenerate; faces without corners are ignored.
+/// \param weights      One factor per point for its moves, clamped to [0, 1]; points with 0 stay in place. Null means 1
+///                     for all.
+/// \param positions    One per point; modified in place.
+/// \pre                Arrays that fit the counts, non-decreasing offsets within the corners, and point indices in
+///                     range; otherwise the behavior is undefined. Corners before the first face or after the last one
+///                     are ignored. Each point belongs to a face: other points become NaN in the first step, whatever
+///                     their weight.
+/// \throws             std::bad_alloc, with the positions unchanged; what the logger throws, after a whole step. Job
+///                     cancellation is ignored.
 ///
-/// Runs in parallel over faces and points; sums are taken by ascending faces, so the result is the same for any number
-/// of threads. Linear in the corners for each step (where a face visits a point m times: m times its corners). Takes
-/// about 32 bytes a point, 8 a corner (12 at first) and 24 a face, and nothing more with further steps.
+/// Runs in parallel over faces and points. Sums are taken over ascending faces, so the result is the same for any
+/// number of threads. Each step is linear in the number of corners; a face that visits a point m times costs m times
+/// its corners. Allocates about 32 bytes per point, 8 per corner (12 at first) and 24 per face, whatever the number of
+/// steps.
 template <class Logger> void smooth(float amount, unsigned int pointCount, unsigned int faceCount,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<float> const* weights, Orvan::Array<Tessara::Math::float3>& positions, Logger const& logger);

@@ -6,35 +6,36 @@
 
 namespace Geometry::Mesh {
 
-/// Replaces every face of a mesh by triangles, and takes the properties of its faces and corners along.
+/// Replaces every face of a mesh by triangles, and transfers the properties of its faces and corners.
 ///
-/// A face with n corners becomes n - 2 triangles between its own corners: no point is added, moved or removed. It is
-/// cut by clipping ears, the sharpest first, in the plane of its normal; concave faces, collinear corners and holes on
-/// bridges are welcome, and triangles come out as they were. The triangles are the fan from the first corner where a
-/// face covers less than 5e-5 square units (whatever its shape), and where the ears run out before the end: faces that
-/// intersect themselves, or have two equal corners in a row. The triangles keep the winding of their face and stand in
-/// the order of the faces. A face with two corners or fewer vanishes.
+/// A face with n corners becomes n - 2 triangles between its own corners: no point is added, moved or removed. Faces
+/// are cut by ear clipping, sharpest ear first, in the plane of the face normal. Faces may be concave, have collinear
+/// corners, or have holes connected by bridges; triangles are kept as they are. A face is cut into the fan from its
+/// first corner if its area is below 5e-5 square units (whatever its shape), or if no ear is left before the end, as in
+/// faces that intersect themselves or have two equal consecutive corners. The triangles have the winding of their face
+/// and come in the order of the faces. Faces with two corners or fewer are removed.
 ///
 /// \param channels  Which properties of faces and corners to keep: names and patterns, separated by blanks or commas,
-///                  `*` for any characters, `?` for one; a leading `^` or `-` excludes, and the last entry that matches
-///                  a name decides. "*" keeps all. What is not kept is removed, together with the properties that
-///                  target it (the data of a range). A malformed entry counts as not there. Properties of points stay.
-/// \param mesh      Reads `sPointPosition` (one float3 a point, in scene units); rewrites `sFaceVertex` (one point
-///                  index a corner), `sFaceOffset` (face count + 1 entries) and the counts of `sFaceVertexComp` and
-///                  `sFaceComp`. Each triangle gets a copy of its face's value, each corner that of the corner it was:
-///                  of data of the 36 core element types, and of the indices of ranges. Data of `GeometryType`,
-///                  `GeoLocation`, `FaceEdge` and `GraphTransforms` that is kept stays as it is, with its old length.
-///                  What is missing in an array that is too short counts as zero. Other holders of the arrays see no
-///                  change.
-/// \pre             Offsets that ascend within the corners; a face whose offsets do not counts as one without corners.
-///                  Point indices in range; others are undefined. A mesh that lacks one of the three arrays, or has one
-///                  that is too short for its count, is left as it was.
-/// \throws          std::bad_alloc, also where there would be more than 2^32 - 1 corners, with the mesh as it was. Job
-///                  cancellation is not looked at.
+///                  with `*` for any characters and `?` for one; a leading `^` or `-` excludes, and the last entry that
+///                  matches a name decides. "*" keeps all. Other properties are removed together with the properties
+///                  that target them (the data of a range). Malformed entries are ignored. Properties of points are
+///                  kept.
+/// \param mesh      Reads `sPointPosition` (one float3 per point, in scene units); rewrites `sFaceVertex` (one point
+///                  index per corner), `sFaceOffset` (face count + 1 entries) and the counts of `sFaceVertexComp` and
+///                  `sFaceComp`. Each triangle receives a copy of the value of its face, and each corner of a triangle
+///                  the value of the corner that it was: of data of the 36 core element types, and of the indices of
+///                  ranges. Data of `GeometryType`, `GeoLocation`, `FaceEdge` and `GraphTransforms` that is kept
+///                  remains as it is, with its old length. Values beyond the end of an array that is too short count as
+///                  zero. Objects that share the arrays see no change.
+/// \pre             Non-decreasing offsets within the corners; a face whose offsets are not counts as one without
+///                  corners. Point indices in range; otherwise the behavior is undefined. A mesh that lacks one of the
+///                  three arrays, or has one that is too short for its count, is left unchanged.
+/// \throws          std::bad_alloc, also if there would be more than 2^32 - 1 corners, with the mesh unchanged. Job
+///                  cancellation is ignored.
 ///
-/// Runs in parallel over faces, with the same result for any number of threads. Linear in the corners of faces of
-/// ordinary size; quadratic in the corners of one face at worst. Beside the new arrays it takes one index a face and
-/// one a new corner.
+/// Runs in parallel over faces, with the same result for any number of threads. Linear in the number of corners for
+/// faces of ordinary size, and quadratic in the number of corners of a single face in the worst case. In addition to
+/// the new arrays it allocates one index per face and one per new corner.
 ///
 /// Ear clipping: Meisters, "Polygons have ears", 1975.
 MODELING_EXPORT void triangulate(Orvan::String const& channels, Tessara::Object& mesh);

@@ -1,8 +1,10 @@
 #include <Modeling/smooth.h>
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "frame/PointCorners.h"
 #include "frame/VectorMath.h"
+#include "host/MeshArrays.h"
 
 #include <TessaraMathSupport/Stepper.h>
 
@@ -14,31 +16,21 @@ using namespace Modeling;
 
 namespace {
 
-    using IndexArray = Orvan::Array<unsigned int>;
-
-    struct Topology {
-        unsigned int const* faceVertex;
-        unsigned int const* faceOffset;
-        unsigned int pointCount;
-        unsigned int faceCount;
-
-        unsigned int size(unsigned int face) const { return faceOffset[face + 1] - faceOffset[face]; }
-    };
-
-    /// The faces around each point, ascending; a face that holds a point at several corners stands there as often.
+    /// The faces around each point, ascending; a face is listed once for each of its corners at the point.
     struct PointFaces {
         IndexArray offsets; // point count + 1
         IndexArray faces;
-        IndexArray corners; // by which the face holds the point, counted from its first one
+        IndexArray corners; // the corner of the face that is at the point, counted from its first one
     };
 
-    /// What a face gives to its points in a step.
+    /// What a face contributes to its points in a step.
     struct FaceTerms {
-        float3 normal; // of a triangle; not of length 1
-        float3 middle; // of a triangle its centroid, otherwise the mean of the corners
+        float3 normal; // of a triangle; not normalized
+        float3 middle; // the centroid of a triangle, the mean of the corners of another face
     };
 
-    /// Runs on from step to step and is never reset: targets and normals are those of all steps so far. (Wanted.)
+    /// Never reset between steps: targets and normals are means over all steps so far, and existing scenes depend on
+    /// it.
     struct PointSums {
         float3 normals{0, 0, 0};
         float3 centroids{0, 0, 0};
@@ -57,28 +49,36 @@ namespace {
         return {v.x / divisor, v.y / divisor, v.z / divisor};
     }
 
-    PointFaces findPointFaces(Topology const& mesh)
+    [[maybe_unused]] bool hasFaces(unsigned int faceCount, IndexArray const& faceVertex, IndexArray const& faceOffset)
     {
-        // Corners in front of the first face or behind the last one count for nothing.
-        unsigned int const firstCorner = mesh.faceCount == 0 ? 0 : mesh.faceOffset[0];
-        unsigned int const cornerCount = mesh.faceCount == 0 ? 0 : mesh.faceOffset[mesh.faceCount] - firstCorner;
+        return faceOffset.size > faceCount && isNonDecreasing(faceOffset.data, std::size_t{faceCount} + 1)
+            && faceOffset[faceCount] <= faceVertex.size;
+    }
+
+    PointFaces findPointFaces(FaceView const& mesh, unsigned int pointCount)
+    {
+        // Corners before the first face and after the last one are ignored.
+        unsigned int const firstCorner = mesh.count == 0 ? 0 : mesh.offsets.begin(0);
+        unsigned int const cornerCount = mesh.count == 0 ? 0 : mesh.offsets.begin(mesh.count) - firstCorner;
+        MODELING_ASSERT(areBelow(pointCount, mesh.faceVertex + firstCorner, cornerCount));
         IndexArray faceOfCorner = uninitializedArray<unsigned int>(cornerCount);
         unsigned int* const faceOf = faceOfCorner.data;
         // Each face writes the entries of its corners.
-        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kElementGrain), [=](auto const& faces) {
+        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.count, kElementGrain), [=](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                std::fill(faceOf + (mesh.faceOffset[face] - firstCorner),
-                    faceOf + (mesh.faceOffset[face + 1] - firstCorner), face);
+                std::fill(faceOf + (mesh.offsets.begin(face) - firstCorner),
+                    faceOf + (mesh.offsets.end(face) - firstCorner), face);
         });
 
-        PointCorners around = cornersByPoint(mesh.pointCount, mesh.faceVertex + firstCorner, cornerCount);
+        PointCorners around = cornersByPoint(pointCount, mesh.faceVertex + firstCorner, cornerCount);
+        MODELING_ASSERT(areOffsets(around.offsets.data, pointCount, cornerCount));
         IndexArray faces = uninitializedArray<unsigned int>(around.corners.size);
         // Each entry is written once.
         parallelFor(tbb::blocked_range<std::size_t>(0, faces.size, kElementGrain),
             [=, face = faces.data, corner = around.corners.data](auto const& entries) {
                 for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry) {
                     face[entry] = faceOf[corner[entry]];
-                    corner[entry] -= mesh.faceOffset[face[entry]] - firstCorner;
+                    corner[entry] -= mesh.offsets.begin(face[entry]) - firstCorner;
                 }
             });
         return {std::move(around.offsets), std::move(faces), std::move(around.corners)};
@@ -96,28 +96,29 @@ namespace {
         return {{0, 0, 0}, mean};
     }
 
-    void measureFaces(Topology const& mesh, float3 const* position, Orvan::Array<FaceTerms>& terms)
+    void measureFaces(FaceView const& mesh, float3 const* position, Orvan::Array<FaceTerms>& terms)
     {
         // Each face writes its own entry.
         parallelFor(
-            tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [=, term = terms.data](auto const& faces) {
+            tbb::blocked_range<unsigned int>(0, mesh.count, kFaceGrain), [=, term = terms.data](auto const& faces) {
                 for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                    term[face] = termsOf(mesh.faceVertex + mesh.faceOffset[face], mesh.size(face), position);
+                    term[face] = termsOf(mesh.corners(face), mesh.size(face), position);
             });
     }
 
-    /// Adds the triangles of a polygon's fan that hold a point.
+    /// A polygon as the fan of triangles between its edges and the mean of its corners; adds those that contain a
+    /// point.
     class FanOfPolygon {
     public:
-        FanOfPolygon(Topology const& mesh, unsigned int face, float3 const& mean, float3 const* position)
-            : corner_(mesh.faceVertex + mesh.faceOffset[face])
+        FanOfPolygon(FaceView const& mesh, unsigned int face, float3 const& mean, float3 const* position)
+            : corner_(mesh.corners(face))
             , size_(mesh.size(face))
             , mean_(mean)
             , position_(position)
         {
         }
 
-        /// For a point that is corner k alone: the triangles of the edges before and behind it, by ascending corners.
+        /// For a point that is corner k only: the triangles of the edges before and after it, in ascending order.
         void addAround(unsigned int k, PointSums& sums) const
         {
             unsigned int const before = k == 0 ? size_ - 1 : k - 1;
@@ -126,7 +127,7 @@ namespace {
                 addTriangle(std::max(before, k), sums);
         }
 
-        /// For a point that may be any corners.
+        /// For a point that may be several corners.
         void addAllAt(unsigned int point, PointSums& sums) const
         {
             for (unsigned int k = 0; k != size_; ++k)
@@ -149,7 +150,7 @@ namespace {
         float3 const* position_;
     };
 
-    void addFacesAround(unsigned int point, Topology const& mesh, PointFaces const& around, FaceTerms const* terms,
+    void addFacesAround(unsigned int point, FaceView const& mesh, PointFaces const& around, FaceTerms const* terms,
         float3 const* position, PointSums& sums)
     {
         unsigned int const* const face = around.faces.data;
@@ -171,11 +172,12 @@ namespace {
         }
     }
 
-    void accumulate(Topology const& mesh, PointFaces const& around, Orvan::Array<FaceTerms> const& terms,
+    void accumulate(FaceView const& mesh, PointFaces const& around, Orvan::Array<FaceTerms> const& terms,
         float3 const* position, Orvan::Array<PointSums>& sums)
     {
-        // Each point adds to its own sums; nobody moves meanwhile.
-        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.pointCount, kFaceGrain), [&](auto const& points) {
+        auto const pointCount = static_cast<unsigned int>(sums.size);
+        // Each point adds to its own sums; positions do not change meanwhile.
+        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kFaceGrain), [&](auto const& points) {
             for (unsigned int point = points.begin(); point != points.end(); ++point)
                 addFacesAround(point, mesh, around, terms.data, position, sums[point]);
         });
@@ -192,7 +194,7 @@ namespace {
     void movePoints(Orvan::Array<PointSums> const& sums, Tessara::Math::Stepper const& stepper, float const* weight,
         float3* position)
     {
-        // Each point moves itself, and looks at no other.
+        // Each point reads and writes only its own position.
         parallelFor(tbb::blocked_range<std::size_t>(0, sums.size, kElementGrain), [&](auto const& points) {
             for (std::size_t point = points.begin(); point != points.end(); ++point) {
                 float3 move = moveOf(sums[point], position[point], stepper.increment());
@@ -208,14 +210,16 @@ namespace {
 }
 
 template <class Logger> void smooth(float amount, unsigned int pointCount, unsigned int faceCount,
-    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
-    Orvan::Array<float> const* weights, Orvan::Array<float3>& positions, Logger const& logger)
+    IndexArray const& faceVertex, IndexArray const& faceOffset, Orvan::Array<float> const* weights,
+    Orvan::Array<float3>& positions, Logger const& logger)
 {
     Tessara::Math::Stepper stepper(amount, 0.9f);
     if (!stepper)
         return;
-    Topology const mesh{faceVertex.data, faceOffset.data, pointCount, faceCount};
-    PointFaces const around = findPointFaces(mesh);
+    MODELING_ASSERT(positions.size >= pointCount && (!weights || weights->size >= pointCount));
+    MODELING_ASSERT(faceCount == 0 || hasFaces(faceCount, faceVertex, faceOffset));
+    FaceView const mesh{faceVertex.data, faceOffset, faceCount};
+    PointFaces const around = findPointFaces(mesh, pointCount);
     Orvan::Array<FaceTerms> terms = uninitializedArray<FaceTerms>(faceCount);
     Orvan::Array<PointSums> sums = filledArray(pointCount, PointSums{});
     for (; stepper; stepper.step(logger)) {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "host/IndexArray.h"
+
 #include <OrvanCore/Array.h>
 #include <OrvanCore/Ptr.h>
 #include <TessaraGeometry/Names.h>
@@ -11,8 +13,6 @@
 #include <utility>
 
 namespace Modeling::Internal {
-
-using IndexArray = Orvan::Array<unsigned int>;
 
 /// The elements that are kept, out of `oldCount`.
 struct KeptElements {

@@ -3,7 +3,7 @@
 #include "Deletion.h"
 #include "frame/Arrays.h"
 #include "frame/Assert.h"
-#include "host/GeoProperties.h"
+#include "host/MeshArrays.h"
 
 #include <Modeling/computeDeletedComponentMapping.h>
 #include <TessaraGeometry/Elements.h>
@@ -18,7 +18,6 @@ namespace Tessara::GeometryAlgorithms {
 using namespace Modeling;
 using namespace Tessara::Geometry;
 using Modeling::Internal::Deletion;
-using Modeling::Internal::IndexArray;
 using Modeling::Internal::KeptElements;
 
 namespace {
@@ -29,11 +28,10 @@ namespace {
         Orvan::Array<bool> unusedPoints;
     };
 
-    bool fitsCounts(Object const& mesh, IndexArray const* faceOffset, IndexArray const* faceVertex)
+    bool fitsCounts(MeshArrays const& arrays, Object const& mesh)
     {
-        return faceOffset && faceVertex && faceOffset->size == std::uint64_t{getElementCount(mesh, sFaceComp)} + 1
-            && faceVertex->size >= getElementCount(mesh, sFaceVertexComp)
-            && getGeoPropTargetName(mesh, sFaceOffset) == sFaceComp
+        return arrays.faceOffset && arrays.faceVertex && arrays.faceOffset->size == std::uint64_t{arrays.faceCount} + 1
+            && arrays.faceVertex->size >= arrays.cornerCount && getGeoPropTargetName(mesh, sFaceOffset) == sFaceComp
             && getGeoPropTargetName(mesh, sFaceVertex) == sFaceVertexComp;
     }
 
@@ -92,14 +90,13 @@ namespace {
     /// Returns nullopt if the index arrays do not fit the mesh.
     std::optional<FaceElements> findFaceElements(Orvan::Array<bool> const& deleted, Object const& mesh)
     {
-        auto const faceOffset = readGeoPropData<unsigned int>(mesh, sFaceOffset);
-        auto const faceVertex = readGeoPropData<unsigned int>(mesh, sFaceVertex);
-        if (!fitsCounts(mesh, faceOffset.get(), faceVertex.get()))
+        MeshArrays const arrays = readMeshArrays(mesh); // released before the deletion, which may then edit in place
+        if (!fitsCounts(arrays, mesh))
             return std::nullopt;
         FaceElements elements;
-        elements.corners = findKeptCorners(deleted, *faceOffset, getElementCount(mesh, sFaceVertexComp));
-        elements.unusedPoints = findUnusedPoints(elements.corners, *faceVertex, getElementCount(mesh, sPointComp));
-        MODELING_ASSERT(keepsPointsOfCorners(elements, *faceVertex));
+        elements.corners = findKeptCorners(deleted, *arrays.faceOffset, arrays.cornerCount);
+        elements.unusedPoints = findUnusedPoints(elements.corners, *arrays.faceVertex, arrays.pointCount);
+        MODELING_ASSERT(keepsPointsOfCorners(elements, *arrays.faceVertex));
         return elements;
     }
 

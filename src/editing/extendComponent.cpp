@@ -4,6 +4,7 @@
 #include "frame/Assert.h"
 #include "frame/ElementTypes.h"
 #include "host/GeoProperties.h"
+#include "host/IndexArray.h"
 
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
@@ -20,7 +21,6 @@ using Tessara::Object;
 using Tessara::PropertyValue;
 namespace Math = Tessara::Math;
 using namespace Tessara::Geometry;
-using IndexArray = Orvan::Array<unsigned int>;
 
 namespace {
 

@@ -60,7 +60,7 @@ void PreparedWrites::writeValue(Orvan::String const& key, PropertyValue&& data)
 
 void PreparedWrites::setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices)
 {
-    // The host's own way of setting them, tried out on an object that has nothing but the range.
+    // The host sets the indices, in an object that holds only the range.
     Orvan::MutablePtr<Object> const onlyRange = Tessara::createObject();
     onlyRange->setProperty(name, object_.getProperty(name));
     if (setRangeGeoPropIndices(name, std::move(indices), *onlyRange))

@@ -12,13 +12,13 @@
 
 namespace Modeling {
 
-/// The object under a key; null where there is none.
+/// The object under a key; null if there is none.
 Orvan::Ptr<Tessara::Object> objectAt(Tessara::Object const& object, Orvan::String const& key);
 
-/// The geo property under a key: null unless the key holds one with `sData`.
+/// The data property under a key; null if the key holds no object with `sData`.
 Orvan::Ptr<Tessara::Object> dataPropertyAt(Tessara::Object const& object, Orvan::String const& key);
 
-/// The array of a data property, shared with the object and not copied. Null where there is none of that type.
+/// The array of a data property, shared with the object, not copied. Null if there is none of that type.
 template <class T> Orvan::Ptr<Orvan::Array<T>> readGeoPropData(Tessara::Object const& object, Orvan::String const& key)
 {
     Orvan::Ptr<Tessara::Object> const property = dataPropertyAt(object, key);
@@ -29,9 +29,9 @@ template <class T> Orvan::Ptr<Orvan::Array<T>> readGeoPropData(Tessara::Object c
     return values ? *values : nullptr;
 }
 
-/// Replaces the value under `sData` of a data property: the only way in which operations change one. The geo property
-/// is cloned, which copies no array, so that its other holders see no change. \return false, with nothing changed,
-/// where the key holds no data property
+/// Replaces the value under `sData` of a data property: the only way in which operations modify one. The property is
+/// cloned, which copies no array, so that other objects that share it see no change.
+/// \return false, with nothing changed, if the key holds no data property
 bool writeGeoPropValue(Orvan::String const& key, Tessara::PropertyValue&& data, Tessara::Object& object);
 
 template <class T>
@@ -40,9 +40,10 @@ bool writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& da
     return writeGeoPropValue(key, std::move(data), object);
 }
 
-/// Changes to one object that are prepared first, and then made without taking memory: all of them or, when preparing
-/// fails, none. (Clones of geo properties are made when a change is added, and a component's count is made this
-/// object's own by setting it to what it is. Only new keys take memory, before the first change.)
+/// Changes to one object that are all made or, if preparing them fails, none. They are prepared first, which allocates,
+/// and then made without allocating. (Adding a change clones its geo property; adding the count of a component sets it
+/// to its present value, so that the object no longer shares it. Only keys that are new to the object allocate later,
+/// before the first change.)
 class PreparedWrites {
 public:
     explicit PreparedWrites(Tessara::Object& object)
@@ -50,28 +51,28 @@ public:
     {
     }
 
-    /// As `setElementCount`; false, and without effect, where there is no such component.
+    /// As `setElementCount`; false, with no effect, if there is no such component.
     bool setElementCount(Orvan::String const& component, unsigned int count);
 
-    /// As `writeGeoPropData`; without effect where the key holds no data property.
+    /// As `writeGeoPropData`; no effect if the key holds no data property.
     template <class T> void writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& data)
     {
         writeValue(key, std::move(data));
     }
 
-    /// As `setProperty` of the object; without effect where the key is empty.
+    /// As `setProperty` of the object; no effect if the key is empty.
     void setProperty(Orvan::String const& key, Tessara::PropertyValue&& value);
 
-    /// As `setRangeGeoPropIndices`; without effect where there is no range of that name.
+    /// As `setRangeGeoPropIndices`; no effect if there is no range of that name.
     void setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices);
 
     /// As `eraseProperty` of the object.
     void eraseProperty(Orvan::String const& key);
 
-    /// Makes the changes in the order in which they were added. Present keys take no memory with a host that replaces
-    /// their values, and the count of a component that is not shared, and erases keys without taking any; the stand-ins
-    /// do.
-    /// \throws std::bad_alloc  for a key that is new to the object, with the object as it was
+    /// Makes the changes in the order in which they were added. Requires of the host that it allocates nothing when it
+    /// replaces the value of an existing key, sets the count of a component that is not shared, or erases a key; the
+    /// stand-ins comply.
+    /// \throws std::bad_alloc  for a key that is new to the object, with the object unchanged
     void commit();
 
 private:
@@ -79,8 +80,8 @@ private:
         enum class Kind { Count, Property, Erasure };
         Kind kind;
         Orvan::String key;
-        unsigned int count; // of a component
-        Tessara::PropertyValue value; // that replaces the present one
+        unsigned int count; // if `kind` is `Count`
+        Tessara::PropertyValue value; // if `kind` is `Property`
     };
 
     void addNewKeys();
@@ -91,12 +92,12 @@ private:
     std::vector<Write> writes_;
 };
 
-/// Edits the array of a data property in place: `edit(Orvan::Array<T>&)`. It is copied only where somebody other than
-/// this object holds it.
+/// Edits the array of a data property in place: `edit(Orvan::Array<T>&)`. The array is copied only if it is shared with
+/// something other than this object.
 ///
 /// An array that is merely read from an object is shared with it, and making it mutable would copy it. So the property
-/// first lets go of it, and gets it back afterwards, also when `edit` throws; the memory for that is taken beforehand.
-/// \return false, with nothing called, where the key is empty or holds no data property of that type
+/// releases it first and gets it back afterwards, even if `edit` throws; what this needs is allocated beforehand.
+/// \return false, with nothing called, if the key is empty or holds no data property of that type
 template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Tessara::Object& object, Edit&& edit)
 {
     using SharedArray = Orvan::Ptr<Orvan::Array<T>>;
@@ -104,11 +105,11 @@ template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Te
     if (!shared || key.empty())
         return false;
 
-    // Puts the array back in whatever way this ends.
+    // Puts the array back even if an exception is thrown.
     struct PutBack {
         Orvan::String key;
         Tessara::Object& object;
-        Orvan::MutablePtr<Tessara::Object> property; // a clone of the present one
+        Orvan::MutablePtr<Tessara::Object> property; // a clone of the one in the object
         SharedArray shared; // the array until it is mutable
         Orvan::MutablePtr<Orvan::Array<T>> array;
 
@@ -133,14 +134,14 @@ namespace Internal {
 
 }
 
-/// A data property of element type `T` that holds no values yet and targets nothing.
+/// A data property of element type `T` with no values and no target.
 template <class T> Orvan::MutablePtr<Tessara::Object> populateDataGeoProperty(T const& defaultValue)
 {
     return Internal::makeDataGeoProperty(Orvan::makePtr<Orvan::Array<T>>(), defaultValue);
 }
 
-/// The geo properties of every kind whose `sTarget` is `target`, in the order of the object's keys: names, and private
-/// shallow clones. The object is not changed.
+/// The names and shallow clones of the geo properties of any kind whose `sTarget` is `target`, in the order of the keys
+/// of the object. The object is not changed.
 std::vector<std::pair<Orvan::String, Orvan::MutablePtr<Tessara::Object>>> collectGeoPropsByTarget(
     Tessara::Object const& object, Orvan::String const& target);
 

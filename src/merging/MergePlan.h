@@ -2,6 +2,7 @@
 
 #include "frame/ElementTypes.h"
 #include "host/GeoPropertyKind.h"
+#include "host/IndexArray.h"
 
 #include <OrvanCore/Array.h>
 #include <OrvanCore/Ptr.h>
@@ -94,7 +95,7 @@ MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*
 MergePlan planMerge(MergeInputs const& validInputs, std::initializer_list<char const*> components);
 
 /// Per input its first element in something merged, and as last entry the total.
-using Offsets = Orvan::Array<unsigned int>;
+using Offsets = IndexArray;
 
 /// The first element of each input in a merged component, and the total; nullopt if the total does not fit 32 bits.
 /// \param component  One of the plan's.

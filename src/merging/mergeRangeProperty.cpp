@@ -18,8 +18,6 @@ using Tessara::Object;
 
 namespace {
 
-    using IndexArray = Orvan::Array<unsigned int>;
-
     /// The indices of the range in one input; null unless the input has the range and data that targets it.
     Orvan::Ptr<IndexArray> sourceIndices(MergeInput const& input, Orvan::String const& rangeName)
     {

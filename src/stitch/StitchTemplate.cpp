@@ -1,9 +1,9 @@
 #include <Modeling/StitchTemplate.h>
 
+#include "frame/Assert.h"
+#include "frame/CornerArray.h"
 #include "frame/VectorMath.h"
-#include "host/GeoProperties.h"
-
-#include <TessaraGeometry/Elements.h>
+#include "host/MeshArrays.h"
 
 #include <algorithm>
 #include <cmath>
@@ -19,47 +19,25 @@ using namespace ::Modeling;
 namespace {
 
     using Points = Orvan::Array<float3>;
-    using Indices = Orvan::Array<unsigned int>;
     using Weights = Orvan::Array<float>;
 
     constexpr unsigned int kNoEdge = 0xFFFFFFFF;
-    constexpr float kLowestWeight = -0.2f; // below that a point is too far outside
+    constexpr float kLowestWeight = -0.2f; // a point with a lower weight is too far outside
 
     constexpr unsigned int nextCorner(unsigned int corner, unsigned int polySize)
     {
         return corner + 1 == polySize ? 0 : corner + 1;
     }
 
-    /// A corner as seen from a point, in the plane, and the edge that begins there.
+    /// A corner and the edge that starts there, relative to a point in the plane.
     struct CornerView {
-        float x, y; // from the point to the corner
+        float x, y; // vector from the point to the corner
         float r; // its length
-        float area; // of the triangle of the point and the edge, signed
-        float dot; // of the ways to the edge's ends
+        float area; // signed area of the triangle of the point and the edge
+        float dot; // dot product of the vectors to the ends of the edge
     };
 
-    /// Takes memory only for polygons with more corners than anybody draws by hand.
-    class CornerViews {
-    public:
-        explicit CornerViews(std::size_t count)
-        {
-            if (count > kStackCorners)
-                onHeap_.resize(count, Orvan::kUninitialized);
-            first_ = count > kStackCorners ? onHeap_.data : onStack_;
-        }
-        CornerViews(CornerViews const&) = delete;
-        CornerViews& operator=(CornerViews const&) = delete;
-
-        CornerView* get() { return first_; }
-
-    private:
-        static constexpr std::size_t kStackCorners = 16;
-        CornerView onStack_[kStackCorners];
-        Orvan::Array<CornerView> onHeap_;
-        CornerView* first_;
-    };
-
-    /// Measures the ways to the corners. \return the first corner that is closer than the tolerance, or `polySize`
+    /// Computes the vectors to the corners. \return the first corner that is closer than the tolerance, or `polySize`
     unsigned int findCloseCorner(
         Points const& polygon, float3 const& point, unsigned int polySize, float tolerance, CornerView* corners)
     {
@@ -74,8 +52,8 @@ namespace {
         return polySize;
     }
 
-    /// Measures the triangles of the point and the edges. \return the first edge that the point lies on: the triangle
-    /// is flat, and the edge's ends are on opposite sides
+    /// Measures the triangles of the point and the edges. \return the first edge with the point on it: the triangle is
+    /// flat, and the ends of the edge are on opposite sides of the point
     unsigned int findEdge(unsigned int polySize, float areaTol, CornerView* corners)
     {
         for (unsigned int i = 0; i != polySize; ++i) {
@@ -89,15 +67,15 @@ namespace {
         return kNoEdge;
     }
 
-    /// Adds to the weights what they come to off the edges, and normalises them. \return how many are too far below
-    /// zero
+    /// Adds the mean value weights of a point off the edges to `weights`, and normalizes these. \return how many of
+    /// them are below `kLowestWeight`
     unsigned int weighCorners(unsigned int polySize, float areaTol, CornerView const* corners, float* weights)
     {
         float sum = 0;
         CornerView const* previous = &corners[polySize - 1];
         for (unsigned int i = 0; i != polySize; ++i) {
             CornerView const& corner = corners[i];
-            // Near-flat triangles give no term: the point lies on the line of the edge, beyond its ends.
+            // Near-flat triangles have no term: the point is on the line through the edge, beyond its ends.
             if (std::fabs(previous->area) >= areaTol)
                 weights[i] += (previous->r - previous->dot / corner.r) / previous->area;
             if (std::fabs(corner.area) >= areaTol)
@@ -129,8 +107,8 @@ namespace {
             polygon.begin(), polygon.end(), [=](float3 const& corner) { return std::fabs(corner.z) > tolerance; });
     }
 
-    /// The positions of a face's corners; null where one is not there.
-    Orvan::Ptr<Points> cornersOfFace(Indices const& faceVertex, Points const& positions)
+    /// The positions of the corners of a face; null if a point index is out of range.
+    Orvan::Ptr<Points> cornersOfFace(IndexArray const& faceVertex, Points const& positions)
     {
         auto polygon = Orvan::MutablePtr<Points>::make(faceVertex.size, Orvan::kUninitialized);
         for (std::uint64_t corner = 0; corner != faceVertex.size; ++corner) {
@@ -141,17 +119,17 @@ namespace {
         return polygon;
     }
 
-    /// A stretch of the positions; empty where the offsets fall or lead beyond them.
-    std::span<float3 const> pointsOfStrand(Indices const& offsets, std::uint64_t strand, Points const& positions)
+    /// Empty if the offsets decrease or lead beyond the positions.
+    std::span<float3 const> pointsOfStrand(IndexArray const& offsets, std::uint64_t strand, Points const& positions)
     {
-        unsigned int const first = offsets[strand];
-        unsigned int const last = offsets[strand + 1];
-        if (first >= last || last > positions.size)
+        OffsetView const strands(offsets);
+        unsigned int const size = strands.sizeWithin(positions.size, strand);
+        if (size == 0)
             return {};
-        return {positions.data + first, positions.data + last};
+        return {positions.data + strands.begin(strand), size};
     }
 
-    /// The weight of a corner at a strand end; 0 for strands that a template was given and that have no such weight.
+    /// The weight of a corner at a strand end; 0 for strands from `setStrands` that lack it.
     float weightAt(pair const& place, unsigned int corner, Orvan::Array<LocalStrand> const& strands)
     {
         if (place.strand >= strands.size || strands[place.strand].controlPoints.empty())
@@ -161,7 +139,7 @@ namespace {
         return corner < weights.size ? weights[corner] : 0;
     }
 
-    /// Ascending by the weight of a corner; of equal ones only the last stays.
+    /// Sorts the ends by ascending weight of a corner. Of ends with equal weights only the last one is kept.
     Orvan::Array<pair> sortEnds(
         Orvan::Array<pair> const& ends, unsigned int corner, Orvan::Array<LocalStrand> const& strands)
     {
@@ -169,7 +147,7 @@ namespace {
         order.reserve(ends.size);
         for (std::uint64_t i = 0; i != ends.size; ++i) {
             float const weight = weightAt(ends[i], corner, strands);
-            order.emplace_back(std::isnan(weight) ? 0.0f : weight, i); // recorded ends are never on NaN
+            order.emplace_back(std::isnan(weight) ? 0.0f : weight, i); // NaN only with weights from `setStrands`
         }
         std::sort(order.begin(), order.end());
 
@@ -190,8 +168,8 @@ namespace {
         return sum;
     }
 
-    /// From the base of a control point to it. The normal may have any length.
-    float3 raise(float3 const& base, float3 const& normal, float height, float scale, bool flip)
+    /// Moves a point along a normal of any length. Divides by that length: the result is NaN if it is 0.
+    float3 offsetAlong(float3 const& base, float3 const& normal, float height, float scale, bool flip)
     {
         float const norm = length(normal);
         float3 const direction{normal.x / norm, normal.y / norm, normal.z / norm};
@@ -207,7 +185,7 @@ StitchTemplate::StitchTemplate()
 }
 
 StitchTemplate::StitchTemplate(Orvan::Ptr<Points> const& polygon, Orvan::Ptr<Points> const& strandPositions,
-    Orvan::Ptr<Indices> const& strandOffsets, bool strict)
+    Orvan::Ptr<IndexArray> const& strandOffsets, bool strict)
 {
     construct(polygon, strandPositions, strandOffsets, strict);
 }
@@ -215,26 +193,26 @@ StitchTemplate::StitchTemplate(Orvan::Ptr<Points> const& polygon, Orvan::Ptr<Poi
 StitchTemplate::StitchTemplate(Tessara::Object const& mesh, Tessara::Object const& strandSet, bool strict)
 {
     using namespace Tessara::Geometry;
-    if (getElementCount(mesh, sFaceComp) != 1) {
+    MeshArrays const polygon = readMeshArrays(mesh);
+    if (polygon.faceCount != 1) {
         errors_ += "---input mesh not single polygon---";
         return;
     }
-    auto const positions = readGeoPropData<float3>(mesh, sPointPosition);
-    auto const faceVertex = readGeoPropData<unsigned int>(mesh, sFaceVertex);
-    if (!faceVertex) {
+    if (!polygon.faceVertex) {
         errors_ += "---input poly missing face_vertices property---";
         return;
     }
-    if (!positions) {
+    if (!polygon.positions) {
         errors_ += "---input poly missing point_positions property---";
         return;
     }
-    construct(cornersOfFace(*faceVertex, *positions), readGeoPropData<float3>(strandSet, sPointPosition),
-        readGeoPropData<unsigned int>(strandSet, sStrandOffset), strict);
+    construct(cornersOfFace(*polygon.faceVertex, *polygon.positions),
+        readGeoPropData<float3>(strandSet, sPointPosition), readGeoPropData<unsigned int>(strandSet, sStrandOffset),
+        strict);
 }
 
 void StitchTemplate::construct(Orvan::Ptr<Points> const& polygon, Orvan::Ptr<Points> const& strandPositions,
-    Orvan::Ptr<Indices> const& strandOffsets, bool strict)
+    Orvan::Ptr<IndexArray> const& strandOffsets, bool strict)
 {
     std::optional<float> const scale = measurePolygon(polygon.get(), strandPositions.get(), strandOffsets.get());
     if (!scale)
@@ -249,7 +227,7 @@ void StitchTemplate::construct(Orvan::Ptr<Points> const& polygon, Orvan::Ptr<Poi
 }
 
 std::optional<float> StitchTemplate::measurePolygon(
-    Points const* polygon, Points const* strandPositions, Indices const* strandOffsets)
+    Points const* polygon, Points const* strandPositions, IndexArray const* strandOffsets)
 {
     auto const refuse = [this](char const* error) {
         errors_ += error;
@@ -292,6 +270,7 @@ void StitchTemplate::appendStrand(
 
 void StitchTemplate::recordEnd(pair const& place, unsigned int edge, Weights const& weights, bool strict)
 {
+    MODELING_ASSERT(edge == kNoEdge || edge < edgeEndpoints_.size);
     if (edge == kNoEdge) {
         if (strict)
             errors_ += place.end ? "---strand ending point not on polygon edge---"
@@ -308,7 +287,7 @@ void StitchTemplate::orderEndsOnEdge(unsigned int edge, bool strict)
 {
     Orvan::Array<pair>& ends = edgeEndpoints_[edge];
     if (ends.size == 2) {
-        // An end nearer to the edge's first corner comes first.
+        // The end closer to the first corner of the edge comes first.
         if (weightAt(ends[1], edge, strands_) > weightAt(ends[0], edge, strands_))
             std::swap(ends[0], ends[1]);
     } else if (ends.size != 1 && strict) {
@@ -321,12 +300,13 @@ void StitchTemplate::orderEndsOnEdge(unsigned int edge, bool strict)
 unsigned int StitchTemplate::computeMeanValueCoordinates(
     Points const& polygon, float3 const& point, Weights& weights, float scale)
 {
+    MODELING_ASSERT(polygon.size >= polySize_ && weights.size > polySize_);
     weights[polySize_] = point.z / scale;
     if (polySize_ == 0)
         return kNoEdge;
 
-    CornerViews views(polySize_);
-    CornerView* const corners = views.get();
+    CornerArray<CornerView, 16> views;
+    CornerView* const corners = views.take(polySize_);
     unsigned int const close = findCloseCorner(polygon, point, polySize_, tol_, corners);
     if (close != polySize_) {
         weights[close] = 1.0f;
@@ -334,7 +314,7 @@ unsigned int StitchTemplate::computeMeanValueCoordinates(
         return kNoEdge;
     }
 
-    float const areaTol = tol_ * scale; // an area, where the corners were compared with a length
+    float const areaTol = tol_ * scale; // an area; the corners above were compared with a length
     unsigned int const edge = findEdge(polySize_, areaTol, corners);
     if (edge != kNoEdge) {
         unsigned int const next = nextCorner(edge, polySize_);
@@ -355,7 +335,8 @@ void StitchTemplate::findControlPointPos(Points const& polygon, Weights const& w
 {
     float3 const base = blend(polygon, weights, polySize_);
     bool const hasHeight = weights.size > polySize_;
-    position = hasHeight ? raise(base, blend(normals, weights, polySize_), weights[polySize_], scale, flip) : base;
+    position =
+        hasHeight ? offsetAlong(base, blend(normals, weights, polySize_), weights[polySize_], scale, flip) : base;
 }
 
 void StitchTemplate::findControlPointPos(
@@ -367,7 +348,7 @@ void StitchTemplate::findControlPointPos(
         return;
     }
     float3 const normal = cross(polygon[1] - polygon[0], polygon[2] - polygon[0]);
-    position = raise(base, normal, weights[polySize_], scale, flip);
+    position = offsetAlong(base, normal, weights[polySize_], scale, flip);
 }
 
 unsigned int StitchTemplate::getPolySize() const

@@ -1,6 +1,8 @@
 #include <Modeling/HalfEdgeDataStructure.h>
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
+#include "frame/FaceAdjacency.h"
 
 #include <tbb/parallel_reduce.h>
 
@@ -19,42 +21,35 @@ using namespace Modeling;
 
 namespace {
 
-    using IndexArray = Orvan::Array<unsigned int>;
-
-    struct Faces {
-        unsigned int count;
-        unsigned int const* point; // of each corner
-        unsigned int const* offset;
-        bool areTriangles; // and begin at the corners 0, 3, 6 and so on
+    struct Faces : FaceView {
+        bool areTriangles; // as `isTriangleMesh`
     };
 
-    bool areTriangles(unsigned int faceCount, IndexArray const& faceOffset)
+    /// The preconditions of the constructor.
+    [[maybe_unused]] bool fitTogether(
+        unsigned int pointCount, unsigned int faceCount, IndexArray const& faceVertex, IndexArray const& faceOffset)
     {
-        std::atomic<bool> found = true;
-        unsigned int const* const offset = faceOffset.data;
-        // Any thread may clear the flag; it is looked at after the loop.
-        parallelFor(
-            tbb::blocked_range<std::size_t>(0, std::size_t{faceCount} + 1, kElementGrain), [&](auto const& entries) {
-                for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry)
-                    if (offset[entry] != 3 * entry)
-                        return found.store(false, std::memory_order_relaxed);
-            });
-        return found.load(std::memory_order_relaxed);
+        if (faceCount == 0)
+            return true;
+        if (faceOffset.size <= faceCount || !isNonDecreasing(faceOffset.data, std::size_t{faceCount} + 1))
+            return false;
+        unsigned int const first = faceOffset[0], last = faceOffset[faceCount];
+        return last <= faceVertex.size && areBelow(pointCount, faceVertex.data + first, last - first);
     }
 
-    /// What the loops over all faces are cut into, and the points. Directed edges first go to the bucket of the point
-    /// at which they end, in the order of their corners, and then within the bucket to the point: so each step writes
-    /// to few places at a time, however the points are numbered.
+    /// How faces are divided into blocks, and points into buckets. Directed edges are first sorted into the bucket of
+    /// the point at which they end, in the order of their corners, and then by point within the bucket. So each step
+    /// writes to few places at a time, however the points are numbered.
     struct Layout {
-        unsigned int bucketBits; // a bucket is that many low bits of a point's number
+        unsigned int bucketBits; // points in the same bucket differ only in that many low bits of their number
         std::size_t bucketCount;
         std::size_t facesPerBlock;
         std::size_t blockCount;
 
         Layout(unsigned int pointCount, unsigned int faceCount)
         {
-            // A bucket and its copy fit the cache of a core; small meshes get some buckets too, for all threads to
-            // work.
+            // A bucket and its copy fit into the cache of a core; small meshes have several buckets too, so that all
+            // threads have work.
             bucketBits = std::clamp(static_cast<unsigned int>(std::bit_width(pointCount / 16)), 7u, 13u);
             bucketCount = (std::size_t{pointCount} + (std::size_t{1} << bucketBits) - 1) >> bucketBits;
             facesPerBlock = std::max<std::size_t>(std::size_t{1} << 14, faceCount / 64 + 1);
@@ -62,8 +57,8 @@ namespace {
         }
     };
 
-    /// Calls `visit(start, end, corner)` for the directed edges of a block of faces, each with the corner at its end,
-    /// in the order of these corners.
+    /// Calls `visit(start, end, corner)` for the directed edges of a block of faces. `corner` is the corner at the end
+    /// of the edge; the calls are in ascending order of it.
     template <class Visit>
     void forEachEdge(Faces const& faces, Layout const& layout, std::size_t block, Visit const& visit)
     {
@@ -72,7 +67,8 @@ namespace {
         if (faces.areTriangles) {
             for (std::size_t face = first; face != last; ++face) {
                 auto const corner = static_cast<unsigned int>(3 * face);
-                unsigned int const a = faces.point[corner], b = faces.point[corner + 1], c = faces.point[corner + 2];
+                unsigned int const a = faces.faceVertex[corner], b = faces.faceVertex[corner + 1],
+                                   c = faces.faceVertex[corner + 2];
                 visit(c, a, corner);
                 visit(a, b, corner + 1);
                 visit(b, c, corner + 2);
@@ -80,24 +76,24 @@ namespace {
             return;
         }
         for (std::size_t face = first; face != last; ++face) {
-            unsigned int const begin = faces.offset[face], end = faces.offset[face + 1];
+            unsigned int const begin = faces.offsets.begin(face), end = faces.offsets.end(face);
             for (unsigned int corner = begin; corner != end; ++corner)
-                visit(faces.point[corner == begin ? end - 1 : corner - 1], faces.point[corner], corner);
+                visit(faces.faceVertex[corner == begin ? end - 1 : corner - 1], faces.faceVertex[corner], corner);
         }
     }
 
-    /// Calls `work(block)` for the blocks of faces, at once.
+    /// Calls `work(block)` for the blocks of faces, in parallel.
     template <class Work> void forEachBlock(Layout const& layout, Work const& work)
     {
-        // Each block writes what belongs to it.
+        // `work` writes only what belongs to its block.
         parallelFor(tbb::blocked_range<std::size_t>(0, layout.blockCount, 1), [&](auto const& blocks) {
             for (std::size_t block = blocks.begin(); block != blocks.end(); ++block)
                 work(block);
         });
     }
 
-    /// Where each block writes its first edge of each bucket: a row a block. The row behind the last is where the
-    /// buckets begin, with the number of edges behind it.
+    /// One row per block: where it writes its first edge of each bucket. An additional last row holds where the buckets
+    /// begin, and after that the number of edges.
     std::vector<std::size_t> findBlockStarts(Faces const& faces, Layout const& layout)
     {
         std::size_t const width = layout.bucketCount + 1;
@@ -116,7 +112,7 @@ namespace {
         return starts;
     }
 
-    /// Sorts the edges at one point.
+    /// Sorts the edges that end at one point.
     void sortEdges(std::uint64_t* first, std::uint64_t* last)
     {
         constexpr std::ptrdiff_t kFew = 32;
@@ -131,13 +127,13 @@ namespace {
         }
     }
 
-    /// Brings the edges of one bucket to their points, in ascending order.
+    /// Sorts the edges of a bucket by the point at which they end, and in ascending order at each point.
     class BucketSorter {
     public:
         /// \param entries     the edges of the bucket, in the order of their corners
-        /// \param pointOf     the point in the bucket at which each of them ends
-        /// \param offset      where the edges at each point of the bucket begin; written here
-        /// \return            whether two edges go from the same point to the same point
+        /// \param pointOf     for each edge, the point at which it ends, counted from the first one of the bucket
+        /// \param offset      receives where the edges at each point of the bucket begin
+        /// \return            whether two edges have the same start and end
         bool sort(std::uint64_t* entries, std::uint16_t const* pointOf, std::size_t edgeCount, std::size_t pointCount,
             unsigned int bucketStart, unsigned int* offset)
         {
@@ -169,7 +165,8 @@ namespace {
         std::vector<std::uint64_t> copy_;
     };
 
-    /// Lists the directed edges by the points at which they end, ascending. \return whether there are equal ones
+    /// Lists the directed edges by the points at which they end, ascending. \return whether two have the same start and
+    /// end
     bool listEdges(
         Faces const& faces, unsigned int pointCount, unsigned int* offset, Orvan::Array<std::uint64_t>& entries)
     {
@@ -210,18 +207,18 @@ namespace {
         return hasRepeats.load(std::memory_order_relaxed);
     }
 
-    /// For each corner the directed edge that ends there.
+    /// For each corner the directed edge that ends at it.
     Orvan::Array<HalfEdge> describeCorners(Faces const& faces, std::size_t cornerCount)
     {
         Orvan::Array<HalfEdge> records(cornerCount); // corners that belong to no face keep the default
         HalfEdge* const record = records.data;
-        unsigned int const* const offset = faces.offset;
+        OffsetView const offset = faces.offsets;
         // Each face writes the entries of its corners.
         parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [=](auto const& range) {
             for (unsigned int face = range.begin(); face != range.end(); ++face)
-                for (unsigned int corner = offset[face]; corner != offset[face + 1]; ++corner)
-                    record[corner] = {face, static_cast<unsigned char>(corner - offset[face]),
-                        static_cast<unsigned char>(offset[face + 1] - offset[face])};
+                for (unsigned int corner = offset.begin(face); corner != offset.end(face); ++corner)
+                    record[corner] = {face, static_cast<unsigned char>(corner - offset.begin(face)),
+                        static_cast<unsigned char>(offset.size(face))};
         });
         return records;
     }
@@ -233,12 +230,14 @@ HalfEdgeDataStructure::HalfEdgeDataStructure(unsigned int numPoints)
 {
 }
 
-HalfEdgeDataStructure::HalfEdgeDataStructure(unsigned int numPoints, unsigned int numFaces,
-    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset)
+HalfEdgeDataStructure::HalfEdgeDataStructure(
+    unsigned int numPoints, unsigned int numFaces, IndexArray const& faceVertex, IndexArray const& faceOffset)
     : offsets_(uninitializedArray<unsigned int>(std::uint64_t{numPoints} + 1))
 {
-    Faces const faces{numFaces, faceVertex.data, faceOffset.data, numFaces == 0 || areTriangles(numFaces, faceOffset)};
+    MODELING_ASSERT(fitTogether(numPoints, numFaces, faceVertex, faceOffset));
+    Faces const faces{{faceVertex.data, faceOffset, numFaces}, numFaces == 0 || isTriangleMesh(numFaces, faceOffset)};
     bool const hasRepeats = listEdges(faces, numPoints, offsets_.data, entries_);
+    MODELING_ASSERT(areOffsets(offsets_.data, numPoints, entries_.size));
     if (!faces.areTriangles)
         records_ = describeCorners(faces, faceVertex.size);
     if (hasRepeats)
@@ -252,7 +251,7 @@ void HalfEdgeDataStructure::dropRepeatedEdges()
     auto const isRepeat = [=](unsigned int edge, unsigned int first) {
         return edge != first && startOf(entry[edge]) == startOf(entry[edge - 1]);
     };
-    Orvan::Array<unsigned int> newOffsets = offsetsFromCounts(offsets_.size - 1, [=](std::size_t point) {
+    IndexArray newOffsets = offsetsFromCounts(offsets_.size - 1, [=](std::size_t point) {
         unsigned int count = 0;
         for (unsigned int edge = offset[point]; edge != offset[point + 1]; ++edge)
             count += !isRepeat(edge, offset[point]);
@@ -286,14 +285,15 @@ void HalfEdgeDataStructure::swap(HalfEdgeDataStructure& other) noexcept
     records_.swap(other.records_);
 }
 
-bool HalfEdgeDataStructure::hasBoundary(unsigned int numFaces, Orvan::Array<unsigned int> const& faceVertex,
-    Orvan::Array<unsigned int> const& faceOffset) const
+bool HalfEdgeDataStructure::hasBoundary(
+    unsigned int numFaces, IndexArray const& faceVertex, IndexArray const& faceOffset) const
 {
-    auto const isOpenIn = [&](tbb::blocked_range<unsigned int> const& faces, bool found) {
+    FaceView const mesh{faceVertex.data, faceOffset, numFaces};
+    auto const isOpenIn = [&, mesh](tbb::blocked_range<unsigned int> const& faces, bool found) {
         for (unsigned int face = faces.begin(); !found && face != faces.end(); ++face) {
-            if (faceOffset[face + std::uint64_t{1}] - faceOffset[face] < 3)
+            if (mesh.size(face) < 3)
                 return true;
-            unsigned int const* const c = faceVertex.data + faceOffset[face];
+            unsigned int const* const c = mesh.corners(face);
             found = !find(c[0], c[1]) || !find(c[1], c[2]) || !find(c[2], c[0]);
         }
         return found;

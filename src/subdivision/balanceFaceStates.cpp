@@ -122,7 +122,7 @@ namespace {
             return true;
         }
 
-        FaceNeighbors takeNeighbors() { return std::move(neighbors_); }
+        FaceAdjacency takeNeighbors() { return std::move(neighbors_); }
 
     private:
         bool settleFaces(unsigned int first, unsigned int last)
@@ -177,7 +177,7 @@ namespace {
         Orvan::Array<unsigned char> current_; // of the previous sweep
         Orvan::Array<unsigned char> isDue_, isDueNext_; // faces to visit
         Orvan::Array<unsigned char> hasNeighbors_;
-        FaceNeighbors neighbors_;
+        FaceAdjacency neighbors_;
     };
 
     /// True if all faces are triangles and no directed edge is repeated, as on closed manifolds.
@@ -195,7 +195,7 @@ namespace {
 
 }
 
-FaceNeighbors balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
+FaceAdjacency balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<unsigned char>& faceStates)
 {

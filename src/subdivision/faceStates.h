@@ -1,9 +1,9 @@
 #pragma once
 
+#include "frame/FaceAdjacency.h"
+
 #include <Modeling/HalfEdgeDataStructure.h>
 #include <OrvanCore/Array.h>
-
-#include <array>
 
 namespace Geometry::Mesh::Internal {
 
@@ -64,15 +64,12 @@ constexpr unsigned char stateOfLevel(unsigned int level)
     return static_cast<unsigned char>(level << 2);
 }
 
-/// The faces across the three edges of each face, `kInvalidIndex` if there is none.
-using FaceNeighbors = Orvan::Array<std::array<unsigned int, 3>>;
-
 /// Spreads requests until neighbors agree on which faces split in this pass. The only place that checks for cancellation:
 /// at the end of each sweep over the faces.
 /// \return the neighbors of all faces that split. Entries of other faces may be uninitialized, and the array is empty if
 ///         no face is requested.
 /// \throws std::runtime_error  if the job is cancelled; `faceStates` may then be partly balanced
-FaceNeighbors balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
+Modeling::FaceAdjacency balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
     Orvan::Array<unsigned char>& faceStates);
 

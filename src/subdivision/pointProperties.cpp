@@ -80,7 +80,7 @@ namespace {
         values.resize(numPoints, Orvan::kUninitialized);
         T* const value = values.data;
         // Each face reads values of old points and writes that of its own new point.
-        parallelFor(tbb::blocked_range<unsigned int>(0, faces.faceCount, kFaceGrain), [&, value](auto const& range) {
+        parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [&, value](auto const& range) {
             for (unsigned int face = range.begin(); face != range.end(); ++face) {
                 if (!isSplitAroundPoint(faces.states[face]))
                     continue;

@@ -114,7 +114,7 @@ namespace Internal {
         template <class Work> void forEachSplitFace(SettledFaces const& faces, Work const& work)
         {
             // Each face writes the entries of its own new point.
-            parallelFor(tbb::blocked_range<unsigned int>(0, faces.faceCount, kFaceGrain), [&](auto const& range) {
+            parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [&](auto const& range) {
                 for (unsigned int face = range.begin(); face != range.end(); ++face)
                     if (isSplitAroundPoint(faces.states[face]))
                         work(face);
@@ -154,7 +154,7 @@ namespace Internal {
             tbb::blocked_range<unsigned int>(0, numPoints, kOneRingGrain), [&, position, limit](auto const& range) {
                 for (unsigned int point = range.begin(); point != range.end(); ++point) {
                     float3 sum{0, 0, 0};
-                    for (auto const& neighbor : halfEdges.neighbours(point))
+                    for (auto const& neighbor : halfEdges.neighbors(point))
                         sum = sum + position[neighbor.point];
                     auto const valence = static_cast<float>(halfEdges.valence(point));
                     float const weight = limitWeight(cosineOfSector(valence));
@@ -179,7 +179,7 @@ namespace Internal {
             tbb::blocked_range<unsigned int>(0, numPoints, kOneRingGrain), [&, state, position](auto const& range) {
                 for (unsigned int point = range.begin(); point != range.end(); ++point) {
                     unsigned int finestStep = 0;
-                    for (auto const& neighbor : halfEdges.neighbours(point))
+                    for (auto const& neighbor : halfEdges.neighbors(point))
                         finestStep = std::max(finestStep, stepOf(state[neighbor.halfEdge.face]));
                     position[point] = points.at(point, finestStep);
                 }

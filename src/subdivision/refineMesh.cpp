@@ -4,11 +4,10 @@
 
 #include "frame/Arrays.h"
 #include "frame/Assert.h"
-#include "host/GeoProperties.h"
+#include "host/MeshArrays.h"
 
 #include <Modeling/HalfEdgeDataStructure.h>
 #include <Modeling/subdivisionSteps.h>
-#include <TessaraGeometry/Elements.h>
 
 #include <cstdint>
 #include <optional>
@@ -19,8 +18,6 @@ using namespace Modeling;
 using Tessara::Math::float3;
 
 namespace {
-
-    using IndexArray = Orvan::Array<unsigned int>;
 
     /// The arrays of a run. The object keeps its own ones until the end.
     struct RefinedMesh {
@@ -39,19 +36,16 @@ namespace {
     /// Returns nullopt if an array is missing.
     std::optional<RefinedMesh> readMesh(Tessara::Object const& object)
     {
-        using namespace Tessara::Geometry;
-        auto const positions = readGeoPropData<float3>(object, sPointPosition);
-        auto const faceVertex = readGeoPropData<unsigned int>(object, sFaceVertex);
-        auto const faceOffset = readGeoPropData<unsigned int>(object, sFaceOffset);
-        if (!positions || !faceVertex || !faceOffset)
+        MeshArrays const original = readMeshArrays(object);
+        if (!original.isComplete())
             return std::nullopt;
         RefinedMesh mesh;
-        mesh.numPoints = getElementCount(object, sPointComp);
-        mesh.numFaceVertices = getElementCount(object, sFaceVertexComp);
-        mesh.numFaces = getElementCount(object, sFaceComp);
-        mesh.positions = copyOfFirst(positions->size, *positions);
-        mesh.faceVertex = copyOfFirst(faceVertex->size, *faceVertex);
-        mesh.faceOffset = copyOfFirst(faceOffset->size, *faceOffset);
+        mesh.numPoints = original.pointCount;
+        mesh.numFaceVertices = original.cornerCount;
+        mesh.numFaces = original.faceCount;
+        mesh.positions = copyOfFirst(original.positions->size, *original.positions);
+        mesh.faceVertex = copyOfFirst(original.faceVertex->size, *original.faceVertex);
+        mesh.faceOffset = copyOfFirst(original.faceOffset->size, *original.faceOffset);
         return mesh;
     }
 
@@ -111,14 +105,12 @@ namespace {
 
     void writeMesh(RefinedMesh&& mesh, Tessara::Object& object)
     {
-        using namespace Tessara::Geometry;
+        MeshArrays refined{Orvan::makePtr<Orvan::Array<float3>>(std::move(mesh.positions)),
+            Orvan::makePtr<IndexArray>(std::move(mesh.faceVertex)),
+            Orvan::makePtr<IndexArray>(std::move(mesh.faceOffset)), mesh.numPoints, mesh.numFaceVertices,
+            mesh.numFaces};
         PreparedWrites writes(object);
-        writes.setElementCount(sPointComp, mesh.numPoints);
-        writes.setElementCount(sFaceVertexComp, mesh.numFaceVertices);
-        writes.setElementCount(sFaceComp, mesh.numFaces);
-        writes.writeGeoPropData(sPointPosition, Orvan::makePtr<Orvan::Array<float3>>(std::move(mesh.positions)));
-        writes.writeGeoPropData(sFaceVertex, Orvan::makePtr<IndexArray>(std::move(mesh.faceVertex)));
-        writes.writeGeoPropData(sFaceOffset, Orvan::makePtr<IndexArray>(std::move(mesh.faceOffset)));
+        writeMeshArrays(std::move(refined), writes);
         writes.commit();
     }
 

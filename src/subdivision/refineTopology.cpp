@@ -21,8 +21,6 @@ using Tessara::Math::float3;
 
 namespace {
 
-    using IndexArray = Orvan::Array<unsigned int>;
-
     void takeMarks(Orvan::Array<bool> const& marks, unsigned int numFaces, Orvan::Array<unsigned char>& faceStates)
     {
         bool const* const mark = marks.data;
@@ -58,7 +56,7 @@ namespace {
             unsigned int const across = faces.neighbors[face][k];
             if (across == kInvalidIndex)
                 continue;
-            unsigned int const a = c[k], b = c[k == 2 ? 0 : k + 1];
+            unsigned int const a = c[k], b = c[nextCorner(k)];
             unsigned char const other = faces.states[across];
             unsigned int const center = faces.newPoint(face);
             if (!isSplit(other)) {
@@ -92,14 +90,13 @@ namespace {
     {
         Numbering numbering;
         numbering.newPointOffsets = offsetsFromCounts(
-            faces.faceCount, [&](std::size_t face) { return isSplitAroundPoint(faces.states[face]) ? 1u : 0u; });
+            faces.count, [&](std::size_t face) { return isSplitAroundPoint(faces.states[face]) ? 1u : 0u; });
         faces.newPointOffsets = numbering.newPointOffsets.data;
         numbering.keptFaceOffsets =
-            offsetsFromCounts(faces.faceCount, [&](std::size_t face) { return isSplit(faces.states[face]) ? 0u : 1u; });
-        numbering.keptCornerOffsets = offsetsFromCounts(faces.faceCount, [&](std::size_t face) {
-            return isSplit(faces.states[face]) ? 0u : faces.faceOffset[face + 1] - faces.faceOffset[face];
-        });
-        numbering.emittedOffsets = offsetsFromCounts(faces.faceCount, [&](std::size_t face) {
+            offsetsFromCounts(faces.count, [&](std::size_t face) { return isSplit(faces.states[face]) ? 0u : 1u; });
+        numbering.keptCornerOffsets = offsetsFromCounts(
+            faces.count, [&](std::size_t face) { return isSplit(faces.states[face]) ? 0u : faces.size(face); });
+        numbering.emittedOffsets = offsetsFromCounts(faces.count, [&](std::size_t face) {
             auto const number = static_cast<unsigned int>(face);
             return isSplitAroundPoint(faces.states[face]) ? countReplacements(faces, number) : 0u;
         });
@@ -148,7 +145,7 @@ namespace {
     {
         unsigned int const keptFaces = numbering.keptFaceCount(), keptCorners = numbering.keptCornerCount();
         // Each face writes at its own offsets.
-        parallelFor(tbb::blocked_range<unsigned int>(0, faces.faceCount, kFaceGrain), [&](auto const& range) {
+        parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [&](auto const& range) {
             for (unsigned int face = range.begin(); face != range.end(); ++face) {
                 if (!isSplit(faces.states[face]))
                     keepFace(faces, face, numbering, refined);
@@ -178,10 +175,10 @@ void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& hal
     MODELING_ASSERT(marks.size >= numFaces && faceStates.size >= numFaces);
     MODELING_ASSERT(areOffsets(faceOffset.data, numFaces, faceVertex.size));
     takeMarks(marks, numFaces, faceStates);
-    FaceNeighbors const neighbors = balanceFaceStates(halfEdges, numFaces, faceVertex, faceOffset, faceStates);
+    FaceAdjacency const neighbors = balanceFaceStates(halfEdges, numFaces, faceVertex, faceOffset, faceStates);
 
     SettledFaces faces{
-        halfEdges, faceVertex.data, faceOffset.data, faceStates.data, neighbors.data, numFaces, numPoints, nullptr};
+        {faceVertex.data, faceOffset, numFaces}, halfEdges, faceStates.data, neighbors.data, numPoints, nullptr};
     Numbering const numbering = numberPointsAndFaces(faces);
     unsigned int const newPoints = sumOfCounts(numPoints, numbering.newPointCount());
     unsigned int const newFaces = sumOfCounts(numbering.keptFaceCount(), numbering.emittedCount());

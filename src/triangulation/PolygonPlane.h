@@ -12,12 +12,15 @@
 
 namespace Modeling::Internal {
 
-// What clipping ears measures: the polygon's plane, and how sharp a corner is. Inline, because it runs for each corner.
+// The measurements of ear clipping: the plane of a polygon, and the sharpness of a corner. Inline because they run per
+// corner.
 
 using Tessara::Math::float2;
 
-inline constexpr float kFlat = 1e-8f; // squared length of the normal, which is twice the area: absolute on purpose
-inline constexpr float kUpsideDown = 1e-5f; // 1 plus the z of a normal that points along -z
+// Squared length of the normal, whose length is twice the area. Not relative to the size of the polygon: faces below it
+// become fans, and existing scenes depend on it.
+inline constexpr float kFlat = 1e-8f;
+inline constexpr float kUpsideDown = 1e-5f; // 1 plus the z of a unit normal that is nearly -z
 
 /// Its length is twice the area of the polygon.
 inline float3 newellNormal(std::span<float3 const> corners)
@@ -44,13 +47,13 @@ inline Quaternion rotationToZ(float3 const& normal)
 {
     float const w = normal.z + 1;
     if (kUpsideDown > w)
-        return {normal.z, -normal.y, normal.x, 0}; // a half-turn, not normalised: used as it stands
+        return {normal.z, -normal.y, normal.x, 0}; // a half-turn; not normalized, because results depend on it
     float const norm = std::sqrt((normal.y * normal.y + normal.x * normal.x) + w * w);
     return {normal.y / norm, -normal.x / norm, 0, w / norm};
 }
 
-/// x and y of the rotated point: two Hamilton products, q (p, 0) and then that with the conjugate of q. Left out are
-/// the products with the 0, which could change no more than the sign of a zero.
+/// x and y of the rotated point: the Hamilton product of q and (p, 0), and its product with the conjugate of q.
+/// Products with the 0 are left out; they could change only the sign of a zero.
 inline float2 rotateAndDropZ(Quaternion const& q, float3 const& p)
 {
     float const x = (q.w * p.x + q.y * p.z) - q.z * p.y;
@@ -60,8 +63,8 @@ inline float2 rotateAndDropZ(Quaternion const& q, float3 const& p)
     return {((x * q.w - w * q.x) - y * q.z) + z * q.y, ((y * q.w - w * q.y) - z * q.x) + x * q.z};
 }
 
-/// The rotation that lays the polygon into the plane z = 0, where it is counter-clockwise. Nothing for a polygon
-/// that is too small to have a plane.
+/// The rotation of the polygon into a plane parallel to z = 0, in which it is counter-clockwise; nullopt if the polygon
+/// is too small to have a plane.
 inline std::optional<Quaternion> findPlane(std::span<float3 const> corners)
 {
     float3 const normal = newellNormal(corners);
@@ -72,17 +75,18 @@ inline std::optional<Quaternion> findPlane(std::span<float3 const> corners)
     return rotationToZ({normal.x / norm, normal.y / norm, normal.z / norm});
 }
 
-/// How sharp a corner is between the edges that enter and leave it, which are unit vectors: 1 minus the cosine of the
+/// The sharpness of a corner, from the unit vectors along the edges that enter and leave it: 1 minus the cosine of the
 /// inner angle in space. 0 for a needle, 2 for a straight line.
 inline float sharpnessBetween(float3 const& entering, float3 const& leaving)
 {
-    // The edge back to the previous corner is the one that enters turned around, to the bit.
+    // The direction back to the previous corner is minus `entering`, to the bit.
     float const sharpness = 1 + dot(leaving, entering);
-    float const atMost2 = 2.0f > sharpness ? sharpness : 2.0f; // also where it is not a number
+    float const atMost2 = 2.0f > sharpness ? sharpness : 2.0f; // also if it is NaN
     return atMost2 > 0.0f ? atMost2 : 0.0f;
 }
 
-inline constexpr float kNoEar = std::numeric_limits<float>::infinity(); // the sharpness of other corners
-inline constexpr float kSharper = 0.0001f; // by so much an ear has to be sharper than one with a lower number
+inline constexpr float kNoEar = std::numeric_limits<float>::infinity(); // the sharpness of corners that are no ears
+inline constexpr float kSharper =
+    0.0001f; // an ear must be sharper by more than this to precede one with a lower number
 
 }

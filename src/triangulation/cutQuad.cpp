@@ -23,7 +23,7 @@ namespace {
         return (corner + 3) % 4;
     }
 
-    /// Something of each corner: plain arrays, which compilers turn into vector registers.
+    /// One vector per corner, as arrays of coordinates that compilers turn into vector registers.
     struct QuadVectors {
         float x[4], y[4], z[4];
 
@@ -41,7 +41,7 @@ namespace {
         return positions;
     }
 
-    /// The direction of each corner's edge to the next.
+    /// For each corner the unit vector along its edge to the next corner.
     QuadVectors directionsOf(QuadVectors const& positions)
     {
         QuadVectors directions;
@@ -68,7 +68,7 @@ namespace {
         return isCounterClockwise(a, b, c) && !pointInTriangle(projected[opposite(corner)], a, b, c, u, v, w, nullptr);
     }
 
-    /// A sharp ear; of ears that are about as sharp one with a low number.
+    /// The sharpest ear; of ears that are about equally sharp, one with a low number.
     unsigned int sharpestOf(float const* sharpness)
     {
         unsigned int best = kNone;
@@ -101,7 +101,8 @@ bool cutQuad(std::span<float3 const, 4> corners, Quaternion const& rotation, std
     if (ear == kNone)
         return false;
 
-    // The triangle that remains is written from its own sharpest ear. The corner across has kept its neighbours.
+    // The remaining triangle is written from its own sharpest ear. The corner opposite the first ear has kept its
+    // neighbors.
     unsigned int const before = previous(ear);
     unsigned int const after = next(ear);
     unsigned int const across = opposite(ear);

@@ -1,11 +1,11 @@
 #include <Modeling/triangulate.h>
 
 #include "frame/Arrays.h"
+#include "frame/Assert.h"
 #include "frame/ElementTypes.h"
-#include "host/GeoProperties.h"
+#include "host/MeshArrays.h"
 #include "triangulatePolygon.h"
 
-#include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometryVolume/ChannelParser.h>
 
@@ -22,58 +22,41 @@ using namespace Modeling;
 
 namespace {
 
-    using IndexArray = Orvan::Array<unsigned int>;
-
-    /// The arrays as the object held them: they stay readable while it receives the new ones.
-    struct PolygonMesh {
-        Orvan::Ptr<Orvan::Array<float3>> positions;
-        Orvan::Ptr<IndexArray> faceVertex;
-        Orvan::Ptr<IndexArray> faceOffset;
-        unsigned int faceCount = 0;
-
-        /// 0 also where the offsets fall or lead out of the corners.
-        unsigned int cornerCount(std::size_t face) const
-        {
-            unsigned int const begin = faceOffset->data[face];
-            unsigned int const end = faceOffset->data[face + 1];
-            return begin <= end && end <= faceVertex->size ? end - begin : 0;
-        }
-    };
-
-    /// Which triangles a face becomes, and which corner each of their corners was.
     struct Triangulation {
-        IndexArray triangleOffset; // entry f is the first triangle of face f
-        IndexArray sourceCorner;
+        IndexArray triangleOffset; // the first triangle of each face, and the end of the last one
+        IndexArray sourceCorner; // for each corner of the triangles, the corner of the mesh that it was
 
         unsigned int triangleCount() const { return triangleOffset.data[triangleOffset.size - 1]; }
     };
 
-    /// Nothing where an array is missing or too short for its count.
-    std::optional<PolygonMesh> readPolygonMesh(Tessara::Object const& object)
+    /// nullopt if an array is missing or shorter than its count says. The arrays stay readable while the object
+    /// receives the new ones.
+    std::optional<MeshArrays> readPolygonMesh(Tessara::Object const& object)
     {
-        using namespace Tessara::Geometry;
-        PolygonMesh mesh;
-        mesh.faceCount = getElementCount(object, sFaceComp);
-        mesh.positions = readGeoPropData<float3>(object, sPointPosition);
-        mesh.faceVertex = readGeoPropData<unsigned int>(object, sFaceVertex);
-        mesh.faceOffset = readGeoPropData<unsigned int>(object, sFaceOffset);
-        bool const fits = mesh.positions && mesh.faceVertex && mesh.faceOffset
-            && mesh.positions->size >= getElementCount(object, sPointComp)
-            && mesh.faceVertex->size >= getElementCount(object, sFaceVertexComp)
+        MeshArrays mesh = readMeshArrays(object);
+        bool const fits = mesh.isComplete() && mesh.positions->size >= mesh.pointCount
+            && mesh.faceVertex->size >= mesh.cornerCount
             && (mesh.faceCount == 0 || mesh.faceOffset->size > mesh.faceCount);
         if (!fits)
             return std::nullopt;
         return mesh;
     }
 
-    /// Cuts one face: `source` receives the corners of the mesh that the corners of its triangles were.
+    /// 0 if the offsets of the face decrease or lead beyond the corners.
+    unsigned int cornerCountOf(MeshArrays const& mesh, std::size_t face)
+    {
+        return OffsetView(*mesh.faceOffset).sizeWithin(mesh.faceVertex->size, face);
+    }
+
+    /// Cuts one face: `source` receives, for each corner of its triangles, the corner of the mesh that it was.
     void cutFace(
-        PolygonMesh const& mesh, unsigned int face, std::span<unsigned int> source, Internal::PolygonStorage& storage)
+        MeshArrays const& mesh, unsigned int face, std::span<unsigned int> source, Internal::PolygonStorage& storage)
     {
         unsigned int const firstCorner = mesh.faceOffset->data[face];
-        unsigned int const cornerCount = mesh.cornerCount(face);
+        unsigned int const cornerCount = cornerCountOf(mesh, face);
         unsigned int const* const vertex = mesh.faceVertex->data + firstCorner;
         float3 const* const position = mesh.positions->data;
+        MODELING_ASSERT(areBelow(mesh.positions->size, vertex, cornerCount));
         if (cornerCount > 3) {
             float3* const corners = storage.positions.take(cornerCount);
             for (unsigned int i = 0; i != cornerCount; ++i)
@@ -86,11 +69,11 @@ namespace {
             corner += firstCorner;
     }
 
-    Triangulation cutFaces(PolygonMesh const& mesh)
+    Triangulation cutFaces(MeshArrays const& mesh)
     {
         Triangulation triangulation;
         triangulation.triangleOffset = offsetsFromCounts(mesh.faceCount, [&](std::size_t face) {
-            unsigned int const cornerCount = mesh.cornerCount(face);
+            unsigned int const cornerCount = cornerCountOf(mesh, face);
             return cornerCount < 2 ? 0 : cornerCount - 2;
         });
         std::uint64_t const cornerCount = std::uint64_t{3} * triangulation.triangleCount();
@@ -110,10 +93,12 @@ namespace {
                     cutFace(mesh, face, {sourceCorner + begin, end - begin}, storage);
             }
         });
+        MODELING_ASSERT(areOffsets(triangleOffset, mesh.faceCount, triangulation.sourceCorner.size / 3));
+        MODELING_ASSERT(areBelow(mesh.faceVertex->size, sourceCorner, triangulation.sourceCorner.size));
         return triangulation;
     }
 
-    /// What each corner of the triangles has where the corners of the faces had `values`.
+    /// Values of the corners of the faces, for the corners of the triangles.
     template <class T> Orvan::Array<T> transferToCorners(Orvan::Array<T> const& values, IndexArray const& sourceCorner)
     {
         Orvan::Array<T> transferred = uninitializedArray<T>(sourceCorner.size);
@@ -127,7 +112,7 @@ namespace {
         return transferred;
     }
 
-    /// What each triangle has where the faces had `values`.
+    /// Values of the faces, for the triangles.
     template <class T>
     Orvan::Array<T> transferToTriangles(Orvan::Array<T> const& values, IndexArray const& triangleOffset)
     {
@@ -145,10 +130,8 @@ namespace {
         return transferred;
     }
 
-    void writeTriangles(PolygonMesh const& mesh, Triangulation const& triangulation, PreparedWrites& writes)
+    IndexArray offsetsOfTriangles(unsigned int triangleCount)
     {
-        using namespace Tessara::Geometry;
-        unsigned int const triangleCount = triangulation.triangleCount();
         IndexArray faceOffset = uninitializedArray<unsigned int>(std::uint64_t{triangleCount} + 1);
         // Each triangle writes its own entry.
         parallelFor(tbb::blocked_range<std::size_t>(0, faceOffset.size, kElementGrain),
@@ -156,14 +139,21 @@ namespace {
                 for (std::size_t triangle = triangles.begin(); triangle != triangles.end(); ++triangle)
                     offset[triangle] = static_cast<unsigned int>(3 * triangle);
             });
-        writes.setElementCount(sFaceVertexComp, 3 * triangleCount);
-        writes.writeGeoPropData(
-            sFaceVertex, Orvan::makePtr<IndexArray>(transferToCorners(*mesh.faceVertex, triangulation.sourceCorner)));
-        writes.setElementCount(sFaceComp, triangleCount);
-        writes.writeGeoPropData(sFaceOffset, Orvan::makePtr<IndexArray>(std::move(faceOffset)));
+        return faceOffset;
     }
 
-    /// What the triangles get of values of the faces or of their corners.
+    void writeTriangles(MeshArrays const& mesh, Triangulation const& triangulation, PreparedWrites& writes)
+    {
+        MeshArrays triangles; // points stay as they are
+        triangles.faceCount = triangulation.triangleCount();
+        triangles.cornerCount = 3 * triangles.faceCount;
+        triangles.faceOffset = Orvan::makePtr<IndexArray>(offsetsOfTriangles(triangles.faceCount));
+        triangles.faceVertex =
+            Orvan::makePtr<IndexArray>(transferToCorners(*mesh.faceVertex, triangulation.sourceCorner));
+        writeMeshArrays(std::move(triangles), writes);
+    }
+
+    /// Transfers values of the faces, or of their corners, to the triangles.
     struct Transfer {
         Triangulation const& triangulation;
         bool ofCorners;
@@ -175,7 +165,8 @@ namespace {
         }
     };
 
-    /// Whether the property is data of a core type; then the transferred array is to be written.
+    /// Adds the transferred array of a data property to the changes. \return false if the property is no data of a core
+    /// type
     bool transferData(
         Orvan::String const& name, Transfer const& transfer, Tessara::Object const& mesh, PreparedWrites& writes)
     {
@@ -193,8 +184,8 @@ namespace {
         return isTransferred;
     }
 
-    /// Transfers or removes what targets a component, but for the standard property of it. What is neither data of a
-    /// core type nor a range stays as it is.
+    /// Transfers or removes the properties that target a component, except its standard property. Properties that are
+    /// neither data of a core type nor ranges are kept as they are.
     void carryProperties(Orvan::String const& component, Orvan::String const& standardProperty,
         TSR::Utils::ChannelParser const& channels, Transfer const& transfer, Tessara::Object const& mesh,
         PreparedWrites& writes)
@@ -210,7 +201,7 @@ namespace {
                     writes.eraseProperty(dependent);
                 writes.eraseProperty(name);
             } else if (!transferData(name, transfer, mesh, writes)) {
-                // The index that a triangle or corner has into the range's data is its source's.
+                // A triangle or corner has the same index into the data of the range as its source.
                 if (Orvan::Ptr<IndexArray> const indices = getRangeGeoPropIndices(mesh, name))
                     writes.setRangeIndices(name, Orvan::makePtr<IndexArray>(transfer(*indices)));
             }
@@ -222,7 +213,7 @@ namespace {
 void triangulate(Orvan::String const& channels, Tessara::Object& mesh)
 {
     using namespace Tessara::Geometry;
-    std::optional<PolygonMesh> const polygons = readPolygonMesh(mesh);
+    std::optional<MeshArrays> const polygons = readPolygonMesh(mesh);
     if (!polygons)
         return;
     Triangulation const triangulation = cutFaces(*polygons);
@@ -230,7 +221,7 @@ void triangulate(Orvan::String const& channels, Tessara::Object& mesh)
     PreparedWrites writes(mesh);
     writeTriangles(*polygons, triangulation, writes);
     TSR::Utils::ChannelParser parser;
-    parser.parses(channels); // entries that are malformed are left out; that is no failure here
+    parser.parses(channels); // false if an entry is malformed; such entries are ignored
     carryProperties(sFaceVertexComp, sFaceVertex, parser, Transfer{triangulation, true}, mesh, writes);
     carryProperties(sFaceComp, sFaceOffset, parser, Transfer{triangulation, false}, mesh, writes);
     writes.commit();

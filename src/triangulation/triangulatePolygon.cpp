@@ -3,6 +3,8 @@
 #include "PolygonPlane.h"
 #include "cutQuad.h"
 
+#include "frame/Assert.h"
+
 #include <TessaraGeometry/Names.h>
 #include <TessaraSpatial/SpatialQuery.h>
 
@@ -18,7 +20,7 @@ using namespace Tessara::SpatialQuery;
 
 namespace {
 
-    constexpr float kNotANumber = std::numeric_limits<float>::quiet_NaN();
+    constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
     constexpr float kInfinity = std::numeric_limits<float>::infinity();
 
     constexpr std::size_t kBlockSize = 32;
@@ -42,7 +44,7 @@ namespace {
         }
     };
 
-    /// A polygon that is being clipped.
+    /// A polygon whose ears are being clipped.
     class EarClipping {
     public:
         EarClipping(std::span<float3 const> positions, PolygonStorage& storage)
@@ -52,7 +54,7 @@ namespace {
         {
         }
 
-        /// False where the ears run out; the triangles are then to be written anew.
+        /// \return false if no ear is left before the end; the triangles written so far are then useless
         bool run(Quaternion const& rotation, std::span<unsigned int> triangles)
         {
             project(rotation);
@@ -68,7 +70,7 @@ namespace {
                 triangles[3 * triangle + 1] = ear;
                 triangles[3 * triangle + 2] = next;
                 clip(ear);
-                // Of all other ears the neighbours have not changed, so they still are ears.
+                // The neighbors of all other ears have not changed, so they still are ears.
                 testEar(previous);
                 testEar(next);
             }
@@ -99,7 +101,7 @@ namespace {
                 float2 max{-kInfinity, -kInfinity};
                 for (PolygonStorage::Corner const& corner : cornersOf(block)) {
                     float2 const& p = corner.projected;
-                    min = {std::min(min.x, p.x), std::min(min.y, p.y)}; // what is not a number is passed over
+                    min = {std::min(min.x, p.x), std::min(min.y, p.y)}; // ignores NaN
                     max = {std::max(max.x, p.x), std::max(max.y, p.y)};
                 }
                 blocks_[block] = {min, max, 0};
@@ -135,7 +137,7 @@ namespace {
                 && !containsOtherCorner(i);
         }
 
-        /// Whether another live corner lies in the triangle at corner i.
+        /// Whether another live corner is inside the triangle at corner i.
         bool containsOtherCorner(unsigned int i) const
         {
             unsigned int const before = corners_[i].previous;
@@ -161,7 +163,7 @@ namespace {
             return false;
         }
 
-        /// A sharp ear; of ears that are about as sharp one with a low number.
+        /// The sharpest ear; of ears that are about equally sharp, one with a low number.
         unsigned int nextEar()
         {
             unsigned int best = kInvalidIndex;
@@ -190,7 +192,7 @@ namespace {
             corners_[corner.previous].next = corner.next;
             corners_[corner.next].previous = corner.previous;
             corners_[corner.previous].toNext = directionBetween(corner.previous, corner.next);
-            corner.projected = {kNotANumber, kNotANumber};
+            corner.projected = {kNaN, kNaN};
             corner.sharpness = kNoEar;
         }
 
@@ -203,6 +205,7 @@ namespace {
 
 void triangulatePolygon(std::span<float3 const> corners, std::span<unsigned int> triangles, PolygonStorage& storage)
 {
+    MODELING_ASSERT(corners.size() >= 2 && triangles.size() == 3 * (corners.size() - 2));
     bool isCut = false;
     if (corners.size() > 3)
         if (std::optional<Quaternion> const rotation = findPlane(corners))
@@ -210,6 +213,7 @@ void triangulatePolygon(std::span<float3 const> corners, std::span<unsigned int>
                                         : EarClipping(corners, storage).run(*rotation, triangles);
     if (!isCut)
         writeFan(triangles);
+    MODELING_ASSERT(areBelow(corners.size(), triangles.data(), triangles.size()));
 }
 
 }

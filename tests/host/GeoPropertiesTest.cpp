@@ -1,10 +1,11 @@
 #include "host/GeoProperties.h"
+#include "host/IndexArray.h"
 
 #include "support/Testing.h"
 
 using namespace Modeling;
 using namespace TestSupport;
-using Indices = Orvan::Array<unsigned int>;
+using Indices = IndexArray;
 
 namespace {
 
@@ -22,7 +23,7 @@ Orvan::MutablePtr<Object> makeCloud()
 
 }
 
-TEST(GeoProperties, readsAndWritesOnlyWhatIsThereInThatType)
+TEST(GeoProperties, readsAndWritesOnlyExistingPropertiesOfTheType)
 {
     auto const cloud = makeCloud();
     Object const other = *cloud;
@@ -40,18 +41,18 @@ TEST(GeoProperties, readsAndWritesOnlyWhatIsThereInThatType)
     EXPECT_TRUE(sameContents(other, *before));
 }
 
-TEST(GeoProperties, editsInPlaceUnlessSomebodyElseHoldsTheArray)
+TEST(GeoProperties, editsInPlaceUnlessTheArrayIsShared)
 {
-    auto const raise = [](Indices& values) { ++values[0]; };
+    auto const increment = [](Indices& values) { ++values[0]; };
     auto cloud = makeCloud();
     Indices const* const array = readGeoPropData<unsigned int>(*cloud, "values").get();
-    EXPECT_TRUE(editGeoPropData<unsigned int>("values", *cloud, raise));
+    EXPECT_TRUE(editGeoPropData<unsigned int>("values", *cloud, increment));
     EXPECT_EQ(readGeoPropData<unsigned int>(*cloud, "values").get(), array);
     EXPECT_EQ((*array)[0], 8u);
 
     auto const held = readGeoPropData<unsigned int>(*cloud, "values");
     Object const other = *cloud;
-    EXPECT_TRUE(editGeoPropData<unsigned int>("values", *cloud, raise));
+    EXPECT_TRUE(editGeoPropData<unsigned int>("values", *cloud, increment));
     EXPECT_EQ(*readGeoPropData<unsigned int>(*cloud, "values"), (Indices{9, 8, 9}));
     EXPECT_EQ(*held, (Indices{8, 8, 9}));
     EXPECT_EQ(readGeoPropData<unsigned int>(other, "values"), held);

@@ -28,7 +28,7 @@ Edges edgesOf(HalfEdgeDataStructure const& halfEdges, unsigned int pointCount)
 {
     Edges edges(pointCount);
     for (unsigned int point = 0; point != pointCount; ++point) {
-        for (auto const& [from, halfEdge] : halfEdges.neighbours(point)) {
+        for (auto const& [from, halfEdge] : halfEdges.neighbors(point)) {
             EXPECT_TRUE(edges[point].empty() || from > edges[point].rbegin()->first) << "ascending at " << point;
             EXPECT_EQ(halfEdges.halfEdge(point, from), halfEdge);
             edges[point][from] = halfEdge;

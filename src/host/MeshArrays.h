@@ -1,0 +1,43 @@
+#pragma once
+
+#include "GeoProperties.h"
+#include "IndexArray.h"
+
+#include <TessaraMathSupport/Types.h>
+
+namespace Modeling {
+
+/// The faces of a mesh in flat arrays. A view: loop bodies capture it by value.
+struct FaceView {
+    unsigned int const* faceVertex; // the point of each corner
+    OffsetView offsets; // of the corners of each face
+    unsigned int count;
+
+    unsigned int const* corners(std::size_t face) const { return faceVertex + offsets.begin(face); }
+    unsigned int size(std::size_t face) const { return offsets.size(face); }
+};
+
+/// The standard arrays of a mesh and the element counts of its components. Arrays that were read from an object are
+/// shared with it, so `makeMutable` copies them: operations read from these and write to arrays of their own.
+struct MeshArrays {
+    Orvan::Ptr<Orvan::Array<Tessara::Math::float3>> positions; // one per point
+    Orvan::Ptr<IndexArray> faceVertex; // the point of each corner
+    Orvan::Ptr<IndexArray> faceOffset; // the first corner of each face, and the end of the last one
+    unsigned int pointCount = 0;
+    unsigned int cornerCount = 0;
+    unsigned int faceCount = 0;
+
+    bool isComplete() const { return positions && faceVertex && faceOffset; }
+
+    /// Requires `faceVertex` and `faceOffset`.
+    FaceView faces() const { return {faceVertex->data, *faceOffset, faceCount}; }
+};
+
+/// Copies no array. Each array is null if the object has none of that name and type; neither lengths nor offsets are
+/// checked.
+MeshArrays readMeshArrays(Tessara::Object const& object);
+
+/// Adds the arrays and the counts of their components to the changes. A null array is left out together with its count.
+void writeMeshArrays(MeshArrays&& mesh, PreparedWrites& writes);
+
+}
