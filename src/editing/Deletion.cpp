@@ -224,7 +224,6 @@ void Deletion::fillArrays()
     std::uint64_t elementCount = 0;
     for (Change const& change : changes_)
         elementCount += change.array->newSize();
-    constexpr std::uint64_t kFewElements = 1 << 16; // one thread is done with these before a second one has woken up
     std::size_t const grain = elementCount <= kFewElements ? changes_.size() : 1;
     // Each change fills an array of its own.
     parallelFor(tbb::blocked_range<std::size_t>(0, changes_.size(), grain), [this](auto const& range) {

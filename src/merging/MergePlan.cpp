@@ -161,7 +161,7 @@ MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*
     MergePlan plan{{components.begin(), components.end()}, std::vector<MergeInput>(inputs.size())};
     LookupKeys const keys(plan.components);
     // Each input writes its own entry.
-    parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), kFaceGrain), [&](auto const& range) {
+    parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), kCoarseGrain), [&](auto const& range) {
         InputReader reader(keys);
         for (std::size_t input = range.begin(); input != range.end(); ++input)
             if (accepts(*inputs[input]))

@@ -24,7 +24,7 @@ void transferComponentProperties(Orvan::String const& component, Tessara::Object
 void rebaseRegions(Offsets const& regionOffsets, Orvan::Array<unsigned int>& values, Offsets const& baseOffsets)
 {
     // Each region belongs to one iteration. The base of the first one is 0.
-    parallelFor(tbb::blocked_range<std::size_t>(1, baseOffsets.size - 1, kFaceGrain), [&](auto const& regions) {
+    parallelFor(tbb::blocked_range<std::size_t>(1, baseOffsets.size - 1, kCoarseGrain), [&](auto const& regions) {
         for (std::size_t region = regions.begin(); region != regions.end(); ++region) {
             unsigned int const base = baseOffsets[region];
             std::size_t const end = std::min<std::size_t>(regionOffsets[region + 1], values.size);

@@ -37,7 +37,7 @@ namespace {
         Orvan::String const& name, unsigned char type, Write const& write)
     {
         // Each input writes its own elements, from its offset on.
-        parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kFaceGrain), [&](auto const& range) {
+        parallelFor(tbb::blocked_range<std::size_t>(0, plan.inputs.size(), kCoarseGrain), [&](auto const& range) {
             PropertyFinder find(name);
             for (std::size_t input = range.begin(); input != range.end(); ++input) {
                 if (input + 1 != range.end())

@@ -50,7 +50,7 @@ namespace {
         std::vector<DataPropertyMergeEntry>& entries)
     {
         // Each property belongs to one iteration.
-        parallelFor(tbb::blocked_range<std::size_t>(0, entries.size(), kFaceGrain), [&](auto const& properties) {
+        parallelFor(tbb::blocked_range<std::size_t>(0, entries.size(), kCoarseGrain), [&](auto const& properties) {
             for (std::size_t i = properties.begin(); i != properties.end(); ++i) {
                 bool const isConnectivity = connectivity && entries[i].name == connectivity->name;
                 mergeDataProperty(plan, elementOffsets, isConnectivity ? connectivity : nullptr, entries[i]);
@@ -93,7 +93,7 @@ namespace {
         MergePlan const& plan, Offsets const& elementOffsets, std::vector<RangePropertyMergeEntry>& entries)
     {
         // Each range belongs to one iteration.
-        parallelFor(tbb::blocked_range<std::size_t>(0, entries.size(), kFaceGrain), [&](auto const& ranges) {
+        parallelFor(tbb::blocked_range<std::size_t>(0, entries.size(), kCoarseGrain), [&](auto const& ranges) {
             for (std::size_t i = ranges.begin(); i != ranges.end(); ++i)
                 mergeRangeProperty(plan, elementOffsets, entries[i]);
         });

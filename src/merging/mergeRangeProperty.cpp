@@ -32,7 +32,7 @@ namespace {
     {
         std::vector<Orvan::Ptr<IndexArray>> sources(plan.inputs.size());
         // Each input writes its own entry.
-        parallelFor(tbb::blocked_range<std::size_t>(0, sources.size(), kFaceGrain), [&](auto const& inputs) {
+        parallelFor(tbb::blocked_range<std::size_t>(0, sources.size(), kCoarseGrain), [&](auto const& inputs) {
             for (std::size_t input = inputs.begin(); input != inputs.end(); ++input)
                 sources[input] = sourceIndices(plan.inputs[input], rangeName);
         });
@@ -99,7 +99,7 @@ namespace {
             writeOverruns(sources, elementOffsets, dependentOffsets, merged);
         }
         // Each input writes its own elements.
-        parallelFor(tbb::blocked_range<std::size_t>(0, inputCount, kFaceGrain), [&](auto const& inputs) {
+        parallelFor(tbb::blocked_range<std::size_t>(0, inputCount, kCoarseGrain), [&](auto const& inputs) {
             for (std::size_t input = inputs.begin(); input != inputs.end(); ++input) {
                 std::uint64_t const count = countOf(input);
                 unsigned int* const target = merged.data + elementOffsets[input];
@@ -145,7 +145,7 @@ void mergeRangeProperty(MergePlan const& plan, Offsets const& elementOffsets, Ra
 
     bool const needsDefaultSlot = std::find(sources.begin(), sources.end(), nullptr) != sources.end();
     // Each dependent belongs to one iteration.
-    parallelFor(tbb::blocked_range<std::size_t>(0, entry.dependents.size(), kFaceGrain), [&](auto const& dependents) {
+    parallelFor(tbb::blocked_range<std::size_t>(0, entry.dependents.size(), kCoarseGrain), [&](auto const& dependents) {
         for (std::size_t dependent = dependents.begin(); dependent != dependents.end(); ++dependent) {
             mergeDataProperty(plan, dependentOffsets, nullptr, entry.dependents[dependent]);
             if (needsDefaultSlot)

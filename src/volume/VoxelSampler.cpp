@@ -21,6 +21,14 @@ namespace {
         return std::min({depth, state.maxDepth, Traits::kDeepest});
     }
 
+    /// Finds the values of a tile that has just been entered. Not inlined: most samples do not need it.
+    template <class Traits> [[gnu::noinline]] void fetchValues(
+        Internal::TileCursor<Traits> const& cursor, Internal::LinearSamplerState<Traits>& state)
+    {
+        state.fetchedVisit = cursor.visit;
+        state.values = cursor.hasTile() ? state.valuesOf(cursor.currentTile()) : nullptr;
+    }
+
     /// In a volume whose halos are on the upper sides only.
     template <class Traits> float samplePositive(Internal::LinearSamplerState<Traits>& state,
         typename Container<Traits>::TileType const& tile, Internal::Place const& place)
@@ -100,10 +108,8 @@ float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sample(float3 c
 {
     auto& cursor = Base::cursor_;
     Internal::Place const place = locate(cursor, point, readDepth(state_, depth), space == kWorldSpace);
-    if (cursor.visit != state_.fetchedVisit) {
-        state_.fetchedVisit = cursor.visit;
-        state_.values = cursor.hasTile() ? state_.valuesOf(cursor.currentTile()) : nullptr;
-    }
+    if (cursor.visit != state_.fetchedVisit)
+        fetchValues(cursor, state_);
     if (!state_.values)
         return state_.background;
     if (state_.haloChannel)

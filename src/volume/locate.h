@@ -49,8 +49,8 @@ template <int side> inline Coordinate coordinateOf(float value)
     return {-1, value - std::floor(value)};
 }
 
-/// Enters the tile that contains the point, if there is one.
-template <class Traits> void enterTile(TileCursor<Traits>& cursor, float3 const& p, int depth)
+/// Enters the tile that contains the point, if there is one. Not inlined: it would slow down samples in the same tile.
+template <class Traits> [[gnu::noinline]] void enterTile(TileCursor<Traits>& cursor, float3 const& p, int depth)
 {
     ++cursor.visit;
     cursor.depth = depth;
