@@ -3,7 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <string>
 #include <thread>
 #include <vector>
@@ -69,30 +68,27 @@ TEST(ChannelParser, reportsTheFirstFaultAndKeepsTheOtherEntries)
     }
 }
 
-TEST(ChannelParser, takesNoExponentialTime)
+TEST(ChannelParser, matchesManyWildcardsWithoutBacktrackingExponentially)
 {
     ChannelParser parser;
-    parser.parses("*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*b");
-    auto const start = std::chrono::steady_clock::now();
+    parser.parses("*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*b"); // would run for years
     EXPECT_FALSE(parser.accepts(std::string(5000, 'a').c_str()));
     EXPECT_TRUE(parser.accepts((std::string(5000, 'a') + "b").c_str()));
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(5));
 }
 
 TEST(Canceller, countsCallsFromAllThreads)
 {
     TSR::Canceller::resetCallCount();
-    std::vector<std::thread> threads;
-    for (int thread = 0; thread < 4; ++thread)
-        threads.emplace_back([] {
-            TSR::Canceller::ID place{4};
-            for (int i = 0; i < 1000; ++i)
-                TSR::Canceller::cancelID(place);
-            EXPECT_EQ(place.value, 4u);
-        });
-    for (std::thread& thread : threads)
-        thread.join();
-    EXPECT_EQ(TSR::Canceller::callCount(), 4000u);
+    auto const call = [] {
+        TSR::Canceller::ID place{4};
+        for (int i = 0; i < 1000; ++i)
+            TSR::Canceller::cancelID(place);
+        EXPECT_EQ(place.value, 4u);
+    };
+    std::thread other(call);
+    call();
+    other.join();
+    EXPECT_EQ(TSR::Canceller::callCount(), 2000u);
     TSR::Canceller::resetCallCount();
     EXPECT_EQ(TSR::Canceller::callCount(), 0u);
 }
