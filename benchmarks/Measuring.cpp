@@ -1,80 +1,78 @@
 #include "Measuring.h"
 
-#include <algorithm>
+#include "support/AllocationHooks.h"
+
 #include <atomic>
 #include <cstdlib>
 #include <new>
 
 #include <malloc.h>
 
-namespace Benchmarks {
-
 namespace {
 
-    std::atomic<bool> isCounting = false; // off while time is measured
-    std::atomic<std::int64_t> taken = 0;
-    std::atomic<std::int64_t> mostTaken = 0;
+std::atomic<bool> isCounting = false; // off while time is measured
+std::atomic<std::int64_t> allocated = 0;
+std::atomic<std::int64_t> mostAllocated = 0;
 
-    void* take(void* block)
-    {
-        if (!block)
-            throw std::bad_alloc();
-        if (isCounting.load(std::memory_order_relaxed)) {
-            auto const bytes = static_cast<std::int64_t>(::malloc_usable_size(block));
-            std::int64_t const now = taken.fetch_add(bytes) + bytes;
-            std::int64_t most = mostTaken.load();
-            while (now > most && !mostTaken.compare_exchange_weak(most, now)) { }
-        }
-        return block;
+}
+
+namespace Benchmarks {
+
+void countElements(benchmark::State& state, std::size_t elements)
+{
+    auto const all = static_cast<double>(state.iterations()) * static_cast<double>(elements);
+    state.counters["time/element"] = benchmark::Counter(all, benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
+}
+
+void copyBytes(benchmark::State& state, std::size_t bytes, std::size_t elements)
+{
+    Orvan::Array<unsigned char> const source(bytes);
+    for (auto _ : state) {
+        Orvan::Array<unsigned char> target(bytes, Orvan::kUninitialized);
+        std::memcpy(target.data, source.data, bytes);
+        benchmark::DoNotOptimize(target.data);
+        benchmark::ClobberMemory();
     }
-
-    void giveBack(void* block) noexcept
-    {
-        if (block && isCounting.load(std::memory_order_relaxed))
-            taken.fetch_sub(static_cast<std::int64_t>(::malloc_usable_size(block)));
-        std::free(block);
-    }
-
+    state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
+    if (elements != 0)
+        countElements(state, elements);
 }
 
 Memory memoryOf(std::function<void()> const& work)
 {
-    taken = mostTaken = 0;
+    allocated = mostAllocated = 0;
     isCounting = true;
     work();
     isCounting = false;
-    return {mostTaken, taken};
+    return {mostAllocated, allocated};
 }
 
-}
-
-void* operator new(std::size_t bytes)
+void countWorkingBytes(
+    benchmark::State& state, std::size_t elements, std::size_t resultBytes, std::function<void()> const& work)
 {
-    return Benchmarks::take(std::malloc(std::max<std::size_t>(bytes, 1)));
+    auto const bytes = static_cast<double>(memoryOf(work).peak) - static_cast<double>(resultBytes);
+    state.counters["working bytes/element"] = bytes / static_cast<double>(elements);
 }
 
-void* operator new(std::size_t bytes, std::align_val_t alignment)
-{
-    auto const multiple = static_cast<std::size_t>(alignment);
-    return Benchmarks::take(std::aligned_alloc(multiple, (bytes + multiple - 1) / multiple * multiple));
 }
 
-void operator delete(void* block) noexcept
+void* TestSupport::allocateBlock(std::size_t bytes, std::size_t alignment)
 {
-    Benchmarks::giveBack(block);
+    void* const block = systemBlock(bytes, alignment);
+    if (!block)
+        throw std::bad_alloc();
+    if (isCounting.load(std::memory_order_relaxed)) {
+        auto const usable = static_cast<std::int64_t>(::malloc_usable_size(block));
+        std::int64_t const now = allocated.fetch_add(usable) + usable;
+        std::int64_t most = mostAllocated.load();
+        while (now > most && !mostAllocated.compare_exchange_weak(most, now)) { }
+    }
+    return block;
 }
 
-void operator delete(void* block, std::size_t) noexcept
+void TestSupport::freeBlock(void* block) noexcept
 {
-    Benchmarks::giveBack(block);
-}
-
-void operator delete(void* block, std::align_val_t) noexcept
-{
-    Benchmarks::giveBack(block);
-}
-
-void operator delete(void* block, std::size_t, std::align_val_t) noexcept
-{
-    Benchmarks::giveBack(block);
+    if (block && isCounting.load(std::memory_order_relaxed))
+        allocated.fetch_sub(static_cast<std::int64_t>(::malloc_usable_size(block)));
+    std::free(block);
 }

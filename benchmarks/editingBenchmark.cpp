@@ -13,12 +13,11 @@
 #include <TessaraGeometry/Makers.h>
 
 #include <algorithm>
-#include <array>
-#include <memory>
-#include <unordered_map>
 
+using namespace Benchmarks;
 using namespace Modeling;
 using namespace Tessara::Geometry;
+namespace Algorithms = Tessara::GeometryAlgorithms;
 using Tessara::Object;
 using Tessara::Math::float2;
 using Tessara::Math::float3;
@@ -28,40 +27,24 @@ using TestSupport::Random;
 
 namespace {
 
-std::size_t sizeOf(benchmark::State const& state)
-{
-    return static_cast<std::size_t>(state.range(0));
-}
-
-/// Times `edit(object)` on objects that share their arrays with `source`, as those of a host's document do, and reports
-/// what memory it took beyond the bytes of the result.
+/// Times edits of shared copies, and counts what memory they take beyond the bytes of the result.
 template <class Edit> void measureEdit(
-    benchmark::State& state, Object const& source, std::size_t elements, std::size_t resultBytes, Edit edit)
+    benchmark::State& state, Object const& source, std::size_t elements, std::size_t resultBytes, Edit const& edit)
 {
-    for (auto _ : state) {
-        state.PauseTiming();
-        auto object = Tessara::createObject();
-        *object = source;
-        state.ResumeTiming();
-        edit(*object);
-        state.PauseTiming();
-        object = nullptr;
-        state.ResumeTiming();
-    }
-    Benchmarks::countElements(state, elements);
+    timeOnCopies(state, source, edit);
+    countElements(state, elements);
     Object object = source;
-    auto const peak = static_cast<double>(Benchmarks::peakBytesOf([&] { edit(object); }));
-    state.counters["working bytes/element"] = (peak - static_cast<double>(resultBytes)) / static_cast<double>(elements);
+    countWorkingBytes(state, elements, resultBytes, [&] { edit(object); });
 }
 
-/// The attributes of a cloud, 32 bytes a point.
+/// The attributes of a cloud, 32 bytes per point.
 struct FlatCloud {
     Orvan::Array<float3> positions;
     Orvan::Array<float3> normals;
-    Orvan::Array<uchar4> colours;
+    Orvan::Array<uchar4> colors;
     Orvan::Array<float> intensities;
 
-    static constexpr std::size_t kBytesAPoint = 32;
+    static constexpr std::size_t kBytesPerPoint = 32;
 };
 
 FlatCloud makeCloud(std::size_t count)
@@ -70,8 +53,8 @@ FlatCloud makeCloud(std::size_t count)
         Orvan::Array<uchar4>(count), Orvan::Array<float>(count, 0.5f)};
     Random random(1);
     for (std::size_t point = 0; point != count; ++point) {
-        cloud.positions[point] = {random.coordinate(), random.coordinate(), random.coordinate()};
-        cloud.colours[point].x = static_cast<unsigned char>(point);
+        cloud.positions[point] = random.point();
+        cloud.colors[point].x = static_cast<unsigned char>(point);
     }
     return cloud;
 }
@@ -80,22 +63,20 @@ Orvan::MutablePtr<Object> makeObject(FlatCloud const& cloud)
 {
     auto object = makePointCloud(cloud.positions);
     addDataProperty("normal", sPointComp, cloud.normals, *object);
-    addDataProperty("color", sPointComp, cloud.colours, *object);
+    addDataProperty("color", sPointComp, cloud.colors, *object);
     addDataProperty("intensity", sPointComp, cloud.intensities, *object);
     return object;
 }
 
 // The arguments are the points that are there and those that are added.
-
 void addPoints(benchmark::State& state)
 {
-    auto const added = static_cast<std::size_t>(state.range(1));
     auto const cloud = makeObject(makeCloud(sizeOf(state)));
-    Orvan::Array<float3> const positions(added, float3{1, 2, 3});
-    std::size_t const count = sizeOf(state) + added;
-    // Unused capacity is no memory that is touched, but it is counted.
-    measureEdit(state, *cloud, count, (count + count) * FlatCloud::kBytesAPoint,
-        [&](Object& object) { Tessara::GeometryAlgorithms::addPointsToPointCloud(positions, {}, object, nullptr); });
+    Orvan::Array<float3> const positions(sizeOf(state, 1), float3{1, 2, 3});
+    std::size_t const count = sizeOf(state) + positions.size;
+    // Unused capacity is counted, although its memory is never touched.
+    measureEdit(state, *cloud, count, (count + count) * FlatCloud::kBytesPerPoint,
+        [&](Object& object) { Algorithms::addPointsToPointCloud(positions, {}, object, nullptr); });
 }
 
 template <class T> Orvan::Array<T> flatExtended(Orvan::Array<T> const& source, std::size_t added)
@@ -106,25 +87,23 @@ template <class T> Orvan::Array<T> flatExtended(Orvan::Array<T> const& source, s
     return array;
 }
 
-/// The same bytes into fresh memory, on one thread: copied where they are known, filled where they are not.
+/// The same bytes into fresh memory, on one thread: copied if they are known, filled if not.
 void copyAndFill(benchmark::State& state)
 {
-    auto const added = static_cast<std::size_t>(state.range(1));
     FlatCloud const cloud = makeCloud(sizeOf(state));
+    std::size_t const added = sizeOf(state, 1);
     Orvan::Array<float3> const positions(added, float3{1, 2, 3});
-    for (auto _ : state) {
-        auto extended = uninitializedArray<float3>(cloud.positions.size + added);
-        std::memcpy(extended.data, cloud.positions.data, cloud.positions.size * sizeof(float3));
-        std::memcpy(extended.data + cloud.positions.size, positions.data, added * sizeof(float3));
-        FlatCloud result{std::move(extended), flatExtended(cloud.normals, added), flatExtended(cloud.colours, added),
-            flatExtended(cloud.intensities, added)};
-        benchmark::DoNotOptimize(result.positions.data);
-        benchmark::ClobberMemory();
-        state.PauseTiming();
-        result = FlatCloud();
-        state.ResumeTiming();
-    }
-    Benchmarks::countElements(state, sizeOf(state) + added);
+    timeOnEach(
+        state, [] { return FlatCloud(); },
+        [&](FlatCloud& result) {
+            auto extended = uninitializedArray<float3>(cloud.positions.size + added);
+            std::memcpy(extended.data, cloud.positions.data, cloud.positions.size * sizeof(float3));
+            std::memcpy(extended.data + cloud.positions.size, positions.data, added * sizeof(float3));
+            result = {std::move(extended), flatExtended(cloud.normals, added), flatExtended(cloud.colors, added),
+                flatExtended(cloud.intensities, added)};
+            benchmark::DoNotOptimize(result.positions.data);
+        });
+    countElements(state, sizeOf(state) + added);
 }
 
 /// Half of the points, in no order.
@@ -144,26 +123,19 @@ void deletePoints(benchmark::State& state)
 {
     auto const cloud = makeObject(makeCloud(sizeOf(state)));
     auto const indices = everySecondAtRandom(sizeOf(state));
-    std::size_t const resultBytes = (sizeOf(state) - indices.size) * FlatCloud::kBytesAPoint;
-    measureEdit(state, *cloud, sizeOf(state), resultBytes,
-        [&](Object& object) { Tessara::GeometryAlgorithms::deletePointsInPointCloud(indices, object, nullptr); });
+    measureEdit(state, *cloud, sizeOf(state), (sizeOf(state) - indices.size) * FlatCloud::kBytesPerPoint,
+        [&](Object& object) { Algorithms::deletePointsInPointCloud(indices, object, nullptr); });
 }
 
-/// The same on an object that nobody else shares: arrays are edited in place.
-void deletePointsOfOwnCloud(benchmark::State& state)
+/// On an object that is not shared: arrays are edited in place.
+void deletePointsInPlace(benchmark::State& state)
 {
     FlatCloud const cloud = makeCloud(sizeOf(state));
     auto const indices = everySecondAtRandom(sizeOf(state));
-    for (auto _ : state) {
-        state.PauseTiming();
-        auto object = makeObject(cloud);
-        state.ResumeTiming();
-        Tessara::GeometryAlgorithms::deletePointsInPointCloud(indices, *object, nullptr);
-        state.PauseTiming();
-        object = nullptr;
-        state.ResumeTiming();
-    }
-    Benchmarks::countElements(state, sizeOf(state));
+    timeOnEach(
+        state, [&] { return makeObject(cloud); },
+        [&](auto& object) { Algorithms::deletePointsInPointCloud(indices, *object, nullptr); });
+    countElements(state, sizeOf(state));
 }
 
 template <class T> void flatCompact(Orvan::Array<bool> const& deleted, Orvan::Array<T>& array)
@@ -175,35 +147,24 @@ template <class T> void flatCompact(Orvan::Array<bool> const& deleted, Orvan::Ar
     array.resize(count);
 }
 
-/// Flags and one loop an array over arrays of its own, on one thread.
+/// Flags and one loop per array over plain arrays, on one thread.
 void flatDeletePoints(benchmark::State& state)
 {
     FlatCloud const source = makeCloud(sizeOf(state));
     auto const indices = everySecondAtRandom(sizeOf(state));
-    for (auto _ : state) {
-        state.PauseTiming();
-        FlatCloud cloud = source;
-        state.ResumeTiming();
-        Orvan::Array<bool> deleted(source.positions.size);
-        for (unsigned int const point : indices)
-            deleted[point] = true;
-        flatCompact(deleted, cloud.positions);
-        flatCompact(deleted, cloud.normals);
-        flatCompact(deleted, cloud.colours);
-        flatCompact(deleted, cloud.intensities);
-        benchmark::DoNotOptimize(cloud.positions.data);
-        benchmark::ClobberMemory();
-        state.PauseTiming();
-        cloud = FlatCloud();
-        state.ResumeTiming();
-    }
-    Benchmarks::countElements(state, sizeOf(state));
-}
-
-void copyCloud(benchmark::State& state)
-{
-    Benchmarks::copyBytes(state, sizeOf(state) * FlatCloud::kBytesAPoint);
-    Benchmarks::countElements(state, sizeOf(state));
+    timeOnEach(
+        state, [&] { return FlatCloud(source); },
+        [&](FlatCloud& cloud) {
+            Orvan::Array<bool> deleted(source.positions.size);
+            for (unsigned int const point : indices)
+                deleted[point] = true;
+            flatCompact(deleted, cloud.positions);
+            flatCompact(deleted, cloud.normals);
+            flatCompact(deleted, cloud.colors);
+            flatCompact(deleted, cloud.intensities);
+            benchmark::DoNotOptimize(cloud.positions.data);
+        });
+    countElements(state, sizeOf(state));
 }
 
 /// A sphere with attributes of points, corners and faces.
@@ -220,11 +181,7 @@ struct FlatMesh {
 
 FlatMesh makeFlatMesh(std::size_t faces)
 {
-    static std::unordered_map<std::size_t, MeshBuilder> made; // takes longer than what is measured
-    auto const [entry, isNew] = made.try_emplace(faces);
-    if (isNew)
-        entry->second = MeshBuilder::sphereWithFaces(faces);
-    auto const mesh = entry->second.build();
+    auto const mesh = madeOnce(faces, [](std::size_t count) { return MeshBuilder::sphereWithFaces(count); }).build();
     FlatMesh flat{*dataOf<float3>(*mesh, sPointPosition), {}, *dataOf<unsigned int>(*mesh, sFaceVertex), {},
         *dataOf<unsigned int>(*mesh, sFaceOffset), {}};
     flat.normals = flat.positions;
@@ -257,121 +214,109 @@ void deleteFaces(benchmark::State& state)
     auto const mesh = makeObject(flat);
     auto const deleted = everySecondPatch(flat.materials.size);
     measureEdit(state, *mesh, deleted.size, flat.bytes() / 2,
-        [&](Object& object) { Tessara::GeometryAlgorithms::deleteFaces(deleted, object); });
+        [&](Object& object) { Algorithms::deleteFaces(deleted, object); });
 }
 
-/// Marks, numbers and compacts arrays of its own, on one thread.
+/// Marks, numbers and compacts plain arrays, on one thread.
 void flatDeleteFaces(benchmark::State& state)
 {
     FlatMesh const source = makeFlatMesh(sizeOf(state));
     auto const deleted = everySecondPatch(source.materials.size);
-    for (auto _ : state) {
-        state.PauseTiming();
-        FlatMesh mesh = source;
-        state.ResumeTiming();
-        Orvan::Array<bool> unused(mesh.positions.size, true);
-        std::size_t corners = 0, faces = 0;
-        for (std::size_t face = 0; face != deleted.size; ++face) {
-            if (deleted[face])
-                continue;
-            for (unsigned int corner = source.faceOffset[face]; corner != source.faceOffset[face + 1]; ++corner) {
-                unused[mesh.faceVertex[corner]] = false;
-                mesh.faceVertex[corners] = mesh.faceVertex[corner];
-                mesh.coordinates[corners++] = mesh.coordinates[corner];
+    timeOnEach(
+        state, [&] { return FlatMesh(source); },
+        [&](FlatMesh& mesh) {
+            Orvan::Array<bool> unused(mesh.positions.size, true);
+            std::size_t corners = 0, faces = 0;
+            for (std::size_t face = 0; face != deleted.size; ++face) {
+                if (deleted[face])
+                    continue;
+                for (unsigned int corner = source.faceOffset[face]; corner != source.faceOffset[face + 1]; ++corner) {
+                    unused[mesh.faceVertex[corner]] = false;
+                    mesh.faceVertex[corners] = mesh.faceVertex[corner];
+                    mesh.coordinates[corners++] = mesh.coordinates[corner];
+                }
+                mesh.materials[faces] = mesh.materials[face];
+                mesh.faceOffset[++faces] = static_cast<unsigned int>(corners);
             }
-            mesh.materials[faces] = mesh.materials[face];
-            mesh.faceOffset[++faces] = static_cast<unsigned int>(corners);
-        }
-        Orvan::Array<unsigned int> remap(unused.size, Orvan::kUninitialized);
-        unsigned int count = 0;
-        for (std::size_t point = 0; point != unused.size; ++point) {
-            remap[point] = count;
-            if (!unused[point])
-                ++count;
-        }
-        flatCompact(unused, mesh.positions);
-        flatCompact(unused, mesh.normals);
-        for (std::size_t corner = 0; corner != corners; ++corner)
-            mesh.faceVertex[corner] = remap[mesh.faceVertex[corner]];
-        benchmark::DoNotOptimize(mesh.positions.data);
-        benchmark::ClobberMemory();
-        state.PauseTiming();
-        mesh = FlatMesh();
-        state.ResumeTiming();
-    }
-    Benchmarks::countElements(state, deleted.size);
+            Orvan::Array<unsigned int> remap(unused.size, Orvan::kUninitialized);
+            unsigned int count = 0;
+            for (std::size_t point = 0; point != unused.size; ++point) {
+                remap[point] = count;
+                if (!unused[point])
+                    ++count;
+            }
+            flatCompact(unused, mesh.positions);
+            flatCompact(unused, mesh.normals);
+            for (std::size_t corner = 0; corner != corners; ++corner)
+                mesh.faceVertex[corner] = remap[mesh.faceVertex[corner]];
+            benchmark::DoNotOptimize(mesh.positions.data);
+        });
+    countElements(state, deleted.size);
 }
 
-void copyMesh(benchmark::State& state)
+[[maybe_unused]] void deleteWithPeer(benchmark::State& state, std::size_t elements, PeerDeletion const& peer)
 {
-    FlatMesh const flat = makeFlatMesh(sizeOf(state));
-    Benchmarks::copyBytes(state, flat.bytes());
-    Benchmarks::countElements(state, flat.materials.size);
-}
-
-void copyExtendedCloud(benchmark::State& state)
-{
-    auto const count = sizeOf(state) + static_cast<std::size_t>(state.range(1));
-    Benchmarks::copyBytes(state, count * FlatCloud::kBytesAPoint);
-    Benchmarks::countElements(state, count);
-}
-
-void measurePeer(benchmark::State& state, std::size_t elements, Benchmarks::PeerDeletion const& peer)
-{
-    for (auto _ : state) {
-        state.PauseTiming();
+    auto const prepare = [&] {
         peer.prepare();
-        state.ResumeTiming();
-        peer.run();
-    }
-    Benchmarks::countElements(state, elements);
+        return 0;
+    };
+    timeOnEach(state, prepare, [&](int) { peer.run(); });
+    countElements(state, elements);
     state.counters["remaining"] = static_cast<double>(peer.remaining());
 }
 
-using MakePointPeer = Benchmarks::PeerDeletion (*)(std::size_t, Orvan::Array<unsigned int> const&);
-[[maybe_unused]] void deletePointsWithPeer(benchmark::State& state, MakePointPeer makePeer)
+using MakePointPeer = PeerDeletion (*)(std::size_t, Orvan::Array<unsigned int> const&);
+[[maybe_unused]] void addPointPeer(char const* name, Sizes const& sizes, MakePointPeer makePeer)
 {
-    measurePeer(state, sizeOf(state), makePeer(sizeOf(state), everySecondAtRandom(sizeOf(state))));
+    addRow(name, sizes, [=](benchmark::State& state) {
+        deleteWithPeer(state, sizeOf(state), makePeer(sizeOf(state), everySecondAtRandom(sizeOf(state))));
+    });
 }
 
-using MakeFacePeer = Benchmarks::PeerDeletion (*)(Benchmarks::PeerMesh const&);
-[[maybe_unused]] void deleteFacesWithPeer(benchmark::State& state, MakeFacePeer makePeer)
+using MakeFacePeer = PeerDeletion (*)(PeerMesh const&);
+[[maybe_unused]] void addFacePeer(char const* name, Sizes const& sizes, MakeFacePeer makePeer)
 {
-    FlatMesh const flat = makeFlatMesh(sizeOf(state));
-    auto const deleted = everySecondPatch(flat.materials.size);
-    measurePeer(state, deleted.size, makePeer({flat.positions, flat.faceVertex, deleted}));
+    addRow(name, sizes, [=](benchmark::State& state) {
+        FlatMesh const flat = makeFlatMesh(sizeOf(state));
+        auto const deleted = everySecondPatch(flat.materials.size);
+        deleteWithPeer(state, deleted.size, makePeer({flat.positions, flat.faceVertex, deleted}));
+    });
 }
 
-#define MODELING_ADDED Args({1'000, 1'000})->Args({1'000'000, 9'000'000})->Args({9'000'000, 1'000'000})->UseRealTime()
-BENCHMARK(addPoints)->Name("addPointsToPointCloud")->MODELING_ADDED;
-BENCHMARK(copyAndFill)->Name("addPointsToPointCloud:copy and fill")->MODELING_ADDED;
-BENCHMARK(copyExtendedCloud)->Name("addPointsToPointCloud:memcpy")->MODELING_ADDED;
+[[maybe_unused]] bool const areRowsAdded = [] {
+    Sizes const added{{1'000, 1'000}, {1'000'000, 9'000'000}, {9'000'000, 1'000'000}};
+    addRow("addPointsToPointCloud", added, addPoints);
+    addRow("addPointsToPointCloud:copy and fill", added, copyAndFill);
+    addRow("addPointsToPointCloud:memcpy", added, [](benchmark::State& state) {
+        std::size_t const count = sizeOf(state) + sizeOf(state, 1);
+        copyBytes(state, count * FlatCloud::kBytesPerPoint, count);
+    });
 
-#define MODELING_POINTS Arg(1'000)->Arg(100'000)->Arg(10'000'000)->UseRealTime()
-BENCHMARK(deletePoints)->Name("deletePointsInPointCloud")->MODELING_POINTS;
-BENCHMARK(deletePointsOfOwnCloud)->Name("deletePointsInPointCloud:in place")->MODELING_POINTS;
-BENCHMARK(flatDeletePoints)->Name("deletePointsInPointCloud:flat")->MODELING_POINTS;
-BENCHMARK(copyCloud)->Name("deletePointsInPointCloud:memcpy")->MODELING_POINTS;
+    Sizes const points{{1'000}, {100'000}, {10'000'000}};
+    addRow("deletePointsInPointCloud", points, deletePoints);
+    addRow("deletePointsInPointCloud:in place", points, deletePointsInPlace);
+    addRow("deletePointsInPointCloud:flat", points, flatDeletePoints);
+    addRow("deletePointsInPointCloud:memcpy", points,
+        [](benchmark::State& state) { copyBytes(state, sizeOf(state) * FlatCloud::kBytesPerPoint, sizeOf(state)); });
+
+    Sizes const faces{{1'000}, {100'000}, {1'000'000}};
+    addRow("deleteFaces", faces, deleteFaces);
+    addRow("deleteFaces:flat", faces, flatDeleteFaces);
+    addRow("deleteFaces:memcpy", faces, [](benchmark::State& state) {
+        FlatMesh const flat = makeFlatMesh(sizeOf(state));
+        copyBytes(state, flat.bytes(), flat.materials.size);
+    });
 #ifdef MODELING_HAS_PCL
-BENCHMARK_CAPTURE(deletePointsWithPeer, PCL, Benchmarks::pclDeletion)
-    ->Name("deletePointsInPointCloud:PCL")
-    ->MODELING_POINTS;
+    addPointPeer("deletePointsInPointCloud:PCL", points, pclDeletion);
 #endif
 #ifdef MODELING_HAS_VTK
-BENCHMARK_CAPTURE(deletePointsWithPeer, VTK, Benchmarks::vtkPointDeletion)
-    ->Name("deletePointsInPointCloud:VTK")
-    ->MODELING_POINTS;
+    addPointPeer("deletePointsInPointCloud:VTK", points, vtkPointDeletion);
+    addFacePeer("deleteFaces:VTK", faces, vtkFaceDeletion);
 #endif
-
-#define MODELING_FACES Arg(1'000)->Arg(100'000)->Arg(1'000'000)->UseRealTime()
-BENCHMARK(deleteFaces)->MODELING_FACES;
-BENCHMARK(flatDeleteFaces)->Name("deleteFaces:flat")->MODELING_FACES;
-BENCHMARK(copyMesh)->Name("deleteFaces:memcpy")->MODELING_FACES;
 #ifdef MODELING_HAS_CGAL
-BENCHMARK_CAPTURE(deleteFacesWithPeer, CGAL, Benchmarks::cgalFaceDeletion)->Name("deleteFaces:CGAL")->MODELING_FACES;
+    addFacePeer("deleteFaces:CGAL", faces, cgalFaceDeletion);
 #endif
-#ifdef MODELING_HAS_VTK
-BENCHMARK_CAPTURE(deleteFacesWithPeer, VTK, Benchmarks::vtkFaceDeletion)->Name("deleteFaces:VTK")->MODELING_FACES;
-#endif
+    return true;
+}();
 
 }

@@ -5,18 +5,14 @@
 
 #include "support/MeshBuilder.h"
 
+#include <string>
+
 using namespace Modeling;
+using Benchmarks::sizeOf;
 
 namespace {
 
-constexpr std::int64_t kSmall = 1'000, kMiddle = 1'000'000, kLarge = 30'000'000;
-
-std::size_t sizeOf(benchmark::State const& state)
-{
-    return static_cast<std::size_t>(state.range(0));
-}
-
-void parallelForAddsOne(benchmark::State& state)
+void addOne(benchmark::State& state)
 {
     Orvan::Array<float> values(sizeOf(state));
     float* const value = values.data;
@@ -27,7 +23,6 @@ void parallelForAddsOne(benchmark::State& state)
         });
         benchmark::ClobberMemory();
     }
-    Benchmarks::countElements(state, values.size);
 }
 
 void copyArray(benchmark::State& state)
@@ -35,14 +30,12 @@ void copyArray(benchmark::State& state)
     Orvan::Array<float> const source(sizeOf(state));
     for (auto _ : state)
         benchmark::DoNotOptimize(copyOfFirst(source.size, source).data);
-    Benchmarks::countElements(state, source.size);
 }
 
 void fillArray(benchmark::State& state)
 {
     for (auto _ : state)
         benchmark::DoNotOptimize(filledArray(sizeOf(state), 1.5f).data);
-    Benchmarks::countElements(state, sizeOf(state));
 }
 
 void sumOffsets(benchmark::State& state)
@@ -52,12 +45,6 @@ void sumOffsets(benchmark::State& state)
     for (auto _ : state)
         benchmark::DoNotOptimize(
             offsetsFromCounts(counts.size, [=](std::size_t i) -> unsigned int { return count[i]; }).data);
-    Benchmarks::countElements(state, counts.size);
-}
-
-void copyFloats(benchmark::State& state)
-{
-    Benchmarks::copyBytes(state, sizeOf(state) * sizeof(float));
 }
 
 /// The corners around each point of a sphere; the second argument shuffles points and faces.
@@ -72,15 +59,22 @@ void listCornersByPoint(benchmark::State& state)
     Benchmarks::countElements(state, mesh.faces.size());
 }
 
-#define MODELING_SIZES Arg(kSmall)->Arg(kMiddle)->Arg(kLarge)->UseRealTime()
-BENCHMARK(parallelForAddsOne)->MODELING_SIZES;
-BENCHMARK(copyArray)->MODELING_SIZES;
-BENCHMARK(fillArray)->MODELING_SIZES;
-BENCHMARK(sumOffsets)->MODELING_SIZES;
-BENCHMARK(copyFloats)->Name("parallelForAddsOne:memcpy")->MODELING_SIZES;
-BENCHMARK(copyFloats)->Name("copyArray:memcpy")->MODELING_SIZES;
-BENCHMARK(copyFloats)->Name("fillArray:memcpy")->MODELING_SIZES;
-BENCHMARK(copyFloats)->Name("sumOffsets:memcpy")->MODELING_SIZES;
-BENCHMARK(listCornersByPoint)->Args({30'000, 0})->Args({1'000'000, 0})->Args({1'000'000, 1})->UseRealTime();
+[[maybe_unused]] bool const areRowsAdded = [] {
+    Benchmarks::Sizes const sizes{{1'000}, {1'000'000}, {30'000'000}};
+    auto const addWithCopy = [&](std::string const& name, void (*run)(benchmark::State&)) {
+        Benchmarks::addRow(name.c_str(), sizes, [=](benchmark::State& state) {
+            run(state);
+            Benchmarks::countElements(state, sizeOf(state));
+        });
+        Benchmarks::addRow((name + ":memcpy").c_str(), sizes,
+            [](benchmark::State& state) { Benchmarks::copyBytes(state, sizeOf(state) * sizeof(float), 0); });
+    };
+    addWithCopy("parallelForAddsOne", addOne);
+    addWithCopy("copyArray", copyArray);
+    addWithCopy("fillArray", fillArray);
+    addWithCopy("sumOffsets", sumOffsets);
+    Benchmarks::addRow("listCornersByPoint", {{30'000, 0}, {1'000'000, 0}, {1'000'000, 1}}, listCornersByPoint);
+    return true;
+}();
 
 }

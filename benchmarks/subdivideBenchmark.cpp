@@ -21,7 +21,9 @@
 #include <algorithm>
 #include <cmath>
 #include <map>
+#include <memory>
 
+using namespace Benchmarks;
 using namespace Modeling;
 using Geometry::Mesh::HalfEdgeDataStructure;
 using TestSupport::MeshBuilder;
@@ -30,17 +32,12 @@ namespace {
 
 constexpr unsigned int kUniformSteps = 4;
 
-// Meshes are made once: that takes longer than what is measured.
-
 MeshBuilder const& sphereOf(std::size_t faces, bool isShuffled)
 {
-    static std::map<std::pair<std::size_t, bool>, MeshBuilder> made;
-    auto const [entry, isNew] = made.try_emplace({faces, isShuffled});
-    if (isNew) {
-        MeshBuilder sphere = MeshBuilder::sphereWithFaces(faces);
-        entry->second = isShuffled ? std::move(sphere).shuffled(1) : std::move(sphere);
-    }
-    return entry->second;
+    return madeOnce(std::pair(faces, isShuffled), [](auto const& key) {
+        MeshBuilder sphere = MeshBuilder::sphereWithFaces(key.first);
+        return key.second ? std::move(sphere).shuffled(1) : sphere;
+    });
 }
 
 /// Cuts each face into four, with the new points moved out to the unit sphere.
@@ -66,44 +63,19 @@ MeshBuilder cutIntoFour(MeshBuilder mesh)
 /// 20 · 4ⁿ faces.
 MeshBuilder const& icosphereOf(std::size_t faces)
 {
-    static std::map<std::size_t, MeshBuilder> made;
-    auto const [entry, isNew] = made.try_emplace(faces);
-    if (isNew) {
+    return madeOnce(faces, [](std::size_t count) {
         MeshBuilder mesh = MeshBuilder::icosahedron();
         for (float3& p : mesh.points)
             p = safeNormalize(p);
-        while (mesh.faces.size() < faces)
+        while (mesh.faces.size() < count)
             mesh = cutIntoFour(std::move(mesh));
-        entry->second = std::move(mesh);
-    }
-    return entry->second;
+        return mesh;
+    });
 }
 
-/// A sphere whose faces are larger the closer they are to one side of it, by a factor of up to about 10.
 MeshBuilder const& gradedSphereOf(std::size_t faces)
 {
-    static std::map<std::size_t, MeshBuilder> made;
-    auto const [entry, isNew] = made.try_emplace(faces);
-    if (isNew) {
-        entry->second = icosphereOf(faces);
-        for (float3& p : entry->second.points) {
-            // The same sphere seen from a point close to its surface.
-            float3 const from{p.x, p.y, p.z + 0.5f};
-            float const norm = length(from);
-            p = from * (1 / (norm * norm));
-        }
-    }
-    return entry->second;
-}
-
-std::size_t facesOf(benchmark::State const& state)
-{
-    return static_cast<std::size_t>(state.range(0));
-}
-
-std::size_t faceCountOf(Tessara::Object const& mesh)
-{
-    return Tessara::Geometry::getElementCount(mesh, Tessara::Geometry::sFaceComp);
+    return madeOnce(faces, [](std::size_t count) { return MeshBuilder(icosphereOf(count)).graded(); });
 }
 
 struct FlatMesh {
@@ -123,54 +95,40 @@ struct FlatMesh {
 
 void halfEdges(benchmark::State& state, bool isShuffled)
 {
-    FlatMesh const mesh(sphereOf(facesOf(state), isShuffled));
+    FlatMesh const mesh(sphereOf(sizeOf(state), isShuffled));
+    auto const faces = static_cast<unsigned int>(mesh.faceOffset.size - 1);
     auto const build = [&] {
-        HalfEdgeDataStructure const built(static_cast<unsigned int>(mesh.points.size),
-            static_cast<unsigned int>(mesh.faceOffset.size - 1), mesh.faceVertex, mesh.faceOffset);
+        HalfEdgeDataStructure const built(
+            static_cast<unsigned int>(mesh.points.size), faces, mesh.faceVertex, mesh.faceOffset);
         benchmark::DoNotOptimize(built.valence(0));
     };
     for (auto _ : state)
         build();
-    std::size_t const faces = mesh.faceOffset.size - 1;
-    Benchmarks::countElements(state, faces);
-    state.counters["working bytes/element"] =
-        static_cast<double>(Benchmarks::peakBytesOf(build)) / static_cast<double>(faces);
+    countElements(state, faces);
+    countWorkingBytes(state, faces, 0, build);
 }
 
-void copyCorners(benchmark::State& state)
+/// Elements are the faces of the result.
+void countRefinement(benchmark::State& state, std::size_t faces, std::function<void()> const& refine)
 {
-    MeshBuilder const& mesh = sphereOf(facesOf(state), false);
-    Benchmarks::copyBytes(state, mesh.faces.size() * 3 * sizeof(unsigned int));
-    Benchmarks::countElements(state, mesh.faces.size());
+    countElements(state, faces);
+    state.counters["result faces"] = static_cast<double>(faces);
+    countWorkingBytes(state, faces, 0, refine);
 }
 
-/// Runs `refine(mesh)` on shared copies of a mesh; elements are the faces of the result.
 template <class Refine>
 void measureRefinement(benchmark::State& state, MeshBuilder const& builder, Refine const& refine)
 {
     auto const source = builder.build();
-    std::size_t faces = 0;
-    for (auto _ : state) {
-        state.PauseTiming();
-        auto mesh = Tessara::createObject();
-        *mesh = *source; // shares the arrays, as a host's document does
-        state.ResumeTiming();
-        refine(*mesh);
-        state.PauseTiming();
-        faces = faceCountOf(*mesh);
-        mesh = nullptr;
-        state.ResumeTiming();
-    }
-    Benchmarks::countElements(state, faces);
-    state.counters["result faces"] = static_cast<double>(faces);
+    auto const result = timeOnCopies(state, *source, refine);
     Tessara::Object mesh = *source;
-    state.counters["working bytes/element"] =
-        static_cast<double>(Benchmarks::peakBytesOf([&] { refine(mesh); })) / static_cast<double>(faces);
+    countRefinement(
+        state, Tessara::Geometry::getElementCount(*result, Tessara::Geometry::sFaceComp), [&] { refine(mesh); });
 }
 
 void subdivideUniformly(benchmark::State& state)
 {
-    measureRefinement(state, icosphereOf(facesOf(state)), [](Tessara::Object& mesh) {
+    measureRefinement(state, icosphereOf(sizeOf(state)), [](Tessara::Object& mesh) {
         unsigned int pass = 0;
         auto const markAll = [&](auto const&, Orvan::Array<bool>& marks) {
             if (pass++ != kUniformSteps)
@@ -188,8 +146,8 @@ float toleranceFor(std::size_t faces)
 
 void subdivideAdaptively(benchmark::State& state)
 {
-    float const tolerance = toleranceFor(facesOf(state));
-    measureRefinement(state, gradedSphereOf(facesOf(state)),
+    float const tolerance = toleranceFor(sizeOf(state));
+    measureRefinement(state, gradedSphereOf(sizeOf(state)),
         [=](Tessara::Object& mesh) { Geometry::Mesh::subdivide(tolerance, mesh); });
 }
 
@@ -234,7 +192,7 @@ void flatStep(Orvan::Array<float3>& points, Orvan::Array<unsigned int>& corners)
 
 void flatUniform(benchmark::State& state)
 {
-    FlatMesh const mesh(icosphereOf(facesOf(state)));
+    FlatMesh const mesh(icosphereOf(sizeOf(state)));
     std::size_t faces = 0;
     for (auto _ : state) {
         Orvan::Array<float3> points = mesh.points;
@@ -244,100 +202,73 @@ void flatUniform(benchmark::State& state)
         faces = corners.size / 3;
         benchmark::DoNotOptimize(points.data);
     }
-    Benchmarks::countElements(state, faces);
+    countElements(state, faces);
 }
 
-/// The result's own bytes.
-void copyRefined(benchmark::State& state)
+/// `prepare(state)` returns what is timed, which returns a number of faces. Peers take their mesh from arrays in that time.
+template <class Prepare> [[maybe_unused]] void addPeer(char const* name, Sizes const& sizes, Prepare const& prepare)
 {
-    std::size_t const faces = facesOf(state) * 81;
-    Benchmarks::copyBytes(state, faces * (4 * sizeof(unsigned int) + sizeof(float3) / 2));
-    Benchmarks::countElements(state, faces);
+    addRow(name, sizes, [=](benchmark::State& state) {
+        auto const refine = prepare(state);
+        std::size_t faces = 0;
+        for (auto _ : state)
+            faces = refine();
+        countRefinement(state, faces, refine);
+    });
 }
 
-/// Runs `refine()`, which gives a number of faces. Peers take their mesh from arrays in the time that is measured.
-template <class Refine> void measurePeer(benchmark::State& state, Refine const& refine)
-{
-    std::size_t faces = 0;
-    for (auto _ : state)
-        faces = refine();
-    Benchmarks::countElements(state, faces);
-    state.counters["result faces"] = static_cast<double>(faces);
-    state.counters["working bytes/element"] =
-        static_cast<double>(Benchmarks::peakBytesOf([&] { refine(); })) / static_cast<double>(faces);
-}
+[[maybe_unused]] bool const areRowsAdded = [] {
+    Sizes const sizes{{100'000}, {2'000'000}, {10'000'000}};
+    Sizes const uniform{{1'280}, {20'480}, {81'920}}; // faces of the coarse mesh; 81 times as many in the result
+    Sizes const adaptive{{5'120}, {81'920}, {1'310'720}}; // about 15 times as many in the result
+    addRow("halfEdges", sizes, [](benchmark::State& state) { halfEdges(state, false); });
+    addRow("halfEdges:memcpy", sizes, [](benchmark::State& state) {
+        std::size_t const faces = sphereOf(sizeOf(state), false).faces.size();
+        copyBytes(state, faces * 3 * sizeof(unsigned int), faces);
+    });
+    addRow("halfEdges shuffled", sizes, [](benchmark::State& state) { halfEdges(state, true); });
+    addRow("subdivide uniform", uniform, subdivideUniformly);
+    addRow("subdivide uniform:flat kernel", uniform, flatUniform);
+    addRow("subdivide uniform:memcpy", uniform, [](benchmark::State& state) { // the result's own bytes
+        std::size_t const faces = sizeOf(state) * 81;
+        copyBytes(state, faces * (4 * sizeof(unsigned int) + sizeof(float3) / 2), faces);
+    });
+    addRow("subdivide adaptive", adaptive, subdivideAdaptively);
 
+    // Peers are not measured on the largest meshes.
+    [[maybe_unused]] Sizes const peerSizes{sizes[0], sizes[1]}, peerUniform{uniform[0], uniform[1]};
+    [[maybe_unused]] Sizes const peerAdaptive{adaptive[0], adaptive[1]};
 #ifdef MODELING_HAS_CGAL
-void cgalAdjacency(benchmark::State& state, bool isShuffled)
-{
-    MeshBuilder const& sphere = sphereOf(facesOf(state), isShuffled);
-    Benchmarks::CgalRefinement const mesh(sphere);
-    measurePeer(state, [&] { return mesh.buildAdjacency() / 3; });
-}
-
-void cgalUniform(benchmark::State& state)
-{
-    Benchmarks::CgalRefinement const mesh(icosphereOf(facesOf(state)));
-    measurePeer(state, [&] { return mesh.refine(kUniformSteps); });
-}
-#endif
-
-#ifdef MODELING_HAS_OPENMESH
-void openMeshAdjacency(benchmark::State& state, bool isShuffled)
-{
-    MeshBuilder const& sphere = sphereOf(facesOf(state), isShuffled);
-    measurePeer(state, [&] { return Benchmarks::buildOpenMesh(sphere) / 3; });
-}
-
-void openMeshUniform(benchmark::State& state)
-{
-    MeshBuilder const& mesh = icosphereOf(facesOf(state));
-    measurePeer(state, [&] { return Benchmarks::refineOpenMesh(mesh, kUniformSteps); });
-}
-
-void openMeshAdaptive(benchmark::State& state)
-{
-    MeshBuilder const& mesh = gradedSphereOf(facesOf(state));
-    float const tolerance = toleranceFor(facesOf(state));
-    measurePeer(state, [&] { return Benchmarks::refineOpenMeshAdaptively(mesh, tolerance); });
-}
-#endif
-
-#define MODELING_SIZES Arg(100'000)->Arg(2'000'000)->Arg(10'000'000)->UseRealTime()
-#define MODELING_PEER_SIZES Arg(100'000)->Arg(2'000'000)->UseRealTime()
-BENCHMARK_CAPTURE(halfEdges, ordered, false)->Name("halfEdges")->MODELING_SIZES;
-BENCHMARK(copyCorners)->Name("halfEdges:memcpy")->MODELING_SIZES;
-BENCHMARK_CAPTURE(halfEdges, shuffled, true)->Name("halfEdges shuffled")->MODELING_SIZES;
-#ifdef MODELING_HAS_CGAL
-BENCHMARK_CAPTURE(cgalAdjacency, ordered, false)->Name("halfEdges:CGAL")->MODELING_PEER_SIZES;
-BENCHMARK_CAPTURE(cgalAdjacency, shuffled, true)->Name("halfEdges shuffled:CGAL")->MODELING_PEER_SIZES;
+    auto const cgalAdjacency = [](bool isShuffled) {
+        return [=](benchmark::State const& state) {
+            auto const mesh = std::make_shared<CgalRefinement>(sphereOf(sizeOf(state), isShuffled));
+            return [=] { return mesh->buildAdjacency() / 3; };
+        };
+    };
+    addPeer("halfEdges:CGAL", peerSizes, cgalAdjacency(false));
+    addPeer("halfEdges shuffled:CGAL", peerSizes, cgalAdjacency(true));
+    addPeer("subdivide uniform:CGAL", peerUniform, [](benchmark::State const& state) {
+        auto const mesh = std::make_shared<CgalRefinement>(icosphereOf(sizeOf(state)));
+        return [=] { return mesh->refine(kUniformSteps); };
+    });
 #endif
 #ifdef MODELING_HAS_OPENMESH
-BENCHMARK_CAPTURE(openMeshAdjacency, ordered, false)->Name("halfEdges:OpenMesh")->MODELING_PEER_SIZES;
-BENCHMARK_CAPTURE(openMeshAdjacency, shuffled, true)->Name("halfEdges shuffled:OpenMesh")->MODELING_PEER_SIZES;
+    auto const openMeshAdjacency = [](bool isShuffled) {
+        return [=](benchmark::State const& state) {
+            return [&mesh = sphereOf(sizeOf(state), isShuffled)] { return buildOpenMesh(mesh) / 3; };
+        };
+    };
+    addPeer("halfEdges:OpenMesh", peerSizes, openMeshAdjacency(false));
+    addPeer("halfEdges shuffled:OpenMesh", peerSizes, openMeshAdjacency(true));
+    addPeer("subdivide uniform:OpenMesh", peerUniform, [](benchmark::State const& state) {
+        return [&mesh = icosphereOf(sizeOf(state))] { return refineOpenMesh(mesh, kUniformSteps); };
+    });
+    addPeer("subdivide adaptive:OpenMesh", peerAdaptive, [](benchmark::State const& state) {
+        float const tolerance = toleranceFor(sizeOf(state));
+        return [tolerance, &mesh = gradedSphereOf(sizeOf(state))] { return refineOpenMeshAdaptively(mesh, tolerance); };
+    });
 #endif
-#undef MODELING_SIZES
-#undef MODELING_PEER_SIZES
-
-// Faces of the coarse mesh; 81 times as many in the result.
-#define MODELING_SIZES Arg(1'280)->Arg(20'480)->Arg(81'920)->UseRealTime()
-#define MODELING_PEER_SIZES Arg(1'280)->Arg(20'480)->UseRealTime()
-BENCHMARK(subdivideUniformly)->Name("subdivide uniform")->MODELING_SIZES;
-BENCHMARK(flatUniform)->Name("subdivide uniform:flat kernel")->MODELING_SIZES;
-BENCHMARK(copyRefined)->Name("subdivide uniform:memcpy")->MODELING_SIZES;
-#ifdef MODELING_HAS_CGAL
-BENCHMARK(cgalUniform)->Name("subdivide uniform:CGAL")->MODELING_PEER_SIZES;
-#endif
-#ifdef MODELING_HAS_OPENMESH
-BENCHMARK(openMeshUniform)->Name("subdivide uniform:OpenMesh")->MODELING_PEER_SIZES;
-#endif
-#undef MODELING_SIZES
-#undef MODELING_PEER_SIZES
-
-// Faces of the coarse mesh; about 15 times as many in the result.
-BENCHMARK(subdivideAdaptively)->Name("subdivide adaptive")->Arg(5'120)->Arg(81'920)->Arg(1'310'720)->UseRealTime();
-#ifdef MODELING_HAS_OPENMESH
-BENCHMARK(openMeshAdaptive)->Name("subdivide adaptive:OpenMesh")->Arg(5'120)->Arg(81'920)->UseRealTime();
-#endif
+    return true;
+}();
 
 }

@@ -11,14 +11,13 @@
 
 #include <algorithm>
 #include <cmath>
-#include <map>
 #include <random>
 #include <string>
 #include <vector>
 
+using namespace Benchmarks;
 using namespace TSR::TileTree3D;
 using TestSupport::float3;
-using TestSupport::MeshBuilder;
 
 namespace {
 
@@ -39,8 +38,15 @@ std::vector<Voxel> bandOfVoxels(float radius)
     return voxels;
 }
 
-/// How samples come by the values across the border of a tile: from a padded channel, from a layer on the upper sides, or
-/// from one all around, since values are in the middle of their voxels.
+template <class Traits> Volume<Traits> volumeOf(std::vector<Voxel> const& voxels, unsigned int offsetType = 7)
+{
+    VoxelList const list{Traits::kUnitDepth, voxels};
+    return buildVolume<Traits>(
+        {.background = 1, .offsetType = offsetType, .depth = Traits::kUnitDepth, .lists = {&list, 1}});
+}
+
+/// Where samples find the values across the border of a tile: in a padded channel, in a layer on the upper sides, or in one
+/// all around, because values are at the centers of their voxels.
 enum class Layers { padded, positive, full };
 
 template <class Traits, Layers layers> struct Guide {
@@ -52,13 +58,7 @@ template <class Traits, Layers layers> struct Guide {
     {
         static Guide const guide = [] {
             std::vector<Voxel> const voxels = bandOfVoxels(kRadius);
-            VoxelList const list{Traits::kUnitDepth, voxels};
-            VolumeSource source;
-            source.background = 1;
-            source.offsetType = kIsFull ? 0 : 7;
-            source.depth = Traits::kUnitDepth;
-            source.lists = {&list, 1};
-            Guide made{buildVolume<Traits>(source), Channel<Traits, float>()};
+            Guide made{volumeOf<Traits>(voxels, kIsFull ? 0 : 7), Channel<Traits, float>()};
             if (layers == Layers::padded)
                 made.padded = makeHaloChannel(made.volume);
             return made;
@@ -81,35 +81,25 @@ struct FlatMesh {
     unsigned int faces;
 };
 
-/// The unit sphere with a few faces more than asked for.
+/// The unit sphere with a few faces more than that.
 FlatMesh const& sphereOf(std::size_t faces)
 {
-    static std::map<std::size_t, FlatMesh> made;
-    auto const [entry, isNew] = made.try_emplace(faces);
-    if (isNew) {
-        MeshBuilder const sphere = MeshBuilder::sphereWithFaces(faces);
-        FlatMesh& mesh = entry->second;
-        mesh.points = Orvan::Array<float3>(sphere.points);
-        mesh.offsets.append(0);
-        for (auto const& face : sphere.faces) {
-            for (unsigned int const point : face)
-                mesh.corners.append(point);
-            mesh.offsets.append(static_cast<unsigned int>(mesh.corners.size));
-        }
-        mesh.faces = static_cast<unsigned int>(sphere.faces.size());
-    }
-    return entry->second;
+    return madeOnce(faces, [](std::size_t count) {
+        auto const sphere = TestSupport::MeshBuilder::sphereWithFaces(count).polygons();
+        return FlatMesh{Orvan::Array<float3>(sphere.points), Orvan::Array<unsigned int>(sphere.faceVertex),
+            Orvan::Array<unsigned int>(sphere.faceOffset), static_cast<unsigned int>(sphere.faceCount())};
+    });
 }
 
 template <class Mark> void measureMarking(benchmark::State& state, Mark const& mark)
 {
-    FlatMesh const& mesh = sphereOf(static_cast<std::size_t>(state.range(0)));
+    FlatMesh const& mesh = sphereOf(sizeOf(state));
     Orvan::Array<bool> marks(mesh.faces);
     for (auto _ : state) {
         mark(mesh, marks);
         benchmark::DoNotOptimize(marks.data);
     }
-    Benchmarks::countElements(state, mesh.faces);
+    countElements(state, mesh.faces);
 }
 
 template <class Traits, Layers layers> void markByVolume(benchmark::State& state)
@@ -129,7 +119,7 @@ void markByLength(benchmark::State& state)
     });
 }
 
-/// The second corners of the faces, in their order, that lie in the band.
+/// The second corners of the faces, in order of the faces, that are in the band.
 std::vector<float3> pointsInBand(std::size_t faces, float scale)
 {
     FlatMesh const& mesh = sphereOf(faces);
@@ -140,18 +130,11 @@ std::vector<float3> pointsInBand(std::size_t faces, float scale)
     return points;
 }
 
-void allFaceCounts(benchmark::internal::Benchmark* benchmark)
-{
-    for (std::int64_t const faces : {20'000, 200'000, 2'000'000})
-        benchmark->Arg(faces);
-    benchmark->UseRealTime();
-}
-
 enum class Order { alongMesh, random };
 
 template <class Traits, Layers layers, Order order, bool inRows> void sampleVolume(benchmark::State& state)
 {
-    std::vector<float3> points = pointsInBand(static_cast<std::size_t>(state.range(0)), 1);
+    std::vector<float3> points = pointsInBand(sizeOf(state), 1);
     if (order == Order::random)
         std::shuffle(points.begin(), points.end(), std::mt19937(1));
     auto sampler = Guide<Traits, layers>::get().sampler();
@@ -165,93 +148,74 @@ template <class Traits, Layers layers, Order order, bool inRows> void sampleVolu
         benchmark::DoNotOptimize(values.data());
         benchmark::ClobberMemory();
     }
-    Benchmarks::countElements(state, points.size());
+    countElements(state, points.size());
 }
-
-/// Rows of points, and beside them the same points one by one.
-template <class Traits, Layers layers> void registerSampling(std::string const& name)
-{
-    auto const add = [](std::string const& full, void (*run)(benchmark::State&)) {
-        benchmark::RegisterBenchmark(full.c_str(), run)->Apply(allFaceCounts);
-    };
-    add(name, sampleVolume<Traits, layers, Order::alongMesh, true>);
-    add(name + ":single", sampleVolume<Traits, layers, Order::alongMesh, false>);
-    add(name + "AtRandom", sampleVolume<Traits, layers, Order::random, true>);
-    add(name + "AtRandom:single", sampleVolume<Traits, layers, Order::random, false>);
-}
-
-#ifdef MODELING_HAS_OPENVDB
-void sampleOpenvdb(benchmark::State& state)
-{
-    std::vector<float3> const points = pointsInBand(static_cast<std::size_t>(state.range(0)), kRadius);
-    Benchmarks::OpenvdbGrid const grid(bandOfVoxels(kRadius), 1);
-    for (auto _ : state)
-        benchmark::DoNotOptimize(grid.sumOfSamples(points));
-    Benchmarks::countElements(state, points.size());
-}
-
-void buildOpenvdb(benchmark::State& state)
-{
-    std::vector<Voxel> const voxels = bandOfVoxels(static_cast<float>(state.range(0)));
-    for (auto _ : state)
-        benchmark::DoNotOptimize(Benchmarks::OpenvdbGrid(voxels, 1).sumOfSamples({}));
-    Benchmarks::countElements(state, voxels.size());
-}
-#endif
 
 template <class Traits> void build(benchmark::State& state)
 {
     std::vector<Voxel> const voxels = bandOfVoxels(static_cast<float>(state.range(0)));
-    VoxelList const list{Traits::kUnitDepth, voxels};
-    VolumeSource source;
-    source.background = 1;
-    source.depth = Traits::kUnitDepth;
-    source.lists = {&list, 1};
     for (auto _ : state)
-        benchmark::DoNotOptimize(buildVolume<Traits>(source));
+        benchmark::DoNotOptimize(volumeOf<Traits>(voxels));
     state.counters["voxels"] = static_cast<double>(voxels.size());
-    Benchmarks::countElements(state, voxels.size());
+    countElements(state, voxels.size());
 }
 
-void copyVoxels(benchmark::State& state)
+Sizes const& faceCounts()
 {
-    Benchmarks::copyBytes(state, bandOfVoxels(static_cast<float>(state.range(0))).size() * sizeof(Voxel));
+    static Sizes const counts{{20'000}, {200'000}, {2'000'000}};
+    return counts;
 }
 
-void allRadii(benchmark::internal::Benchmark* benchmark)
+template <class Traits, Layers layers> void addMarking(std::string const& name)
 {
-    for (std::int64_t const voxels : {28, 122})
-        benchmark->Arg(voxels);
-    benchmark->UseRealTime();
+    addRow(name.c_str(), faceCounts(), markByVolume<Traits, layers>);
+    addRow((name + ":length").c_str(), faceCounts(), markByLength);
 }
 
+/// Rows of points, and beside them the same points one by one.
+template <class Traits, Layers layers> void addSampling(std::string const& name)
+{
+    addRow(name.c_str(), faceCounts(), sampleVolume<Traits, layers, Order::alongMesh, true>);
+    addRow((name + ":single").c_str(), faceCounts(), sampleVolume<Traits, layers, Order::alongMesh, false>);
+    addRow((name + "AtRandom").c_str(), faceCounts(), sampleVolume<Traits, layers, Order::random, true>);
+    addRow((name + "AtRandom:single").c_str(), faceCounts(), sampleVolume<Traits, layers, Order::random, false>);
 }
 
-BENCHMARK(markByVolume<Traits2, Layers::padded>)->Name("markByPaddedVolume")->Apply(allFaceCounts);
-BENCHMARK(markByLength)->Name("markByPaddedVolume:length")->Apply(allFaceCounts);
-BENCHMARK(markByVolume<Traits2, Layers::positive>)->Name("markByVolume")->Apply(allFaceCounts);
-BENCHMARK(markByLength)->Name("markByVolume:length")->Apply(allFaceCounts);
-BENCHMARK(markByVolume<Traits5, Layers::padded>)->Name("markByPaddedVolume5")->Apply(allFaceCounts);
-BENCHMARK(markByLength)->Name("markByPaddedVolume5:length")->Apply(allFaceCounts);
-BENCHMARK(markByVolume<Traits5, Layers::positive>)->Name("markByVolume5")->Apply(allFaceCounts);
-BENCHMARK(markByLength)->Name("markByVolume5:length")->Apply(allFaceCounts);
-
-[[maybe_unused]] bool const areSamplesRegistered = [] {
-    registerSampling<Traits2, Layers::padded>("samplePaddedVolume");
-    registerSampling<Traits2, Layers::positive>("sampleVolume");
-    registerSampling<Traits2, Layers::full>("sampleCenteredVolume");
-    registerSampling<Traits5, Layers::padded>("samplePaddedVolume5");
-    registerSampling<Traits5, Layers::positive>("sampleVolume5");
-    registerSampling<Traits5, Layers::full>("sampleCenteredVolume5");
+[[maybe_unused]] bool const areRowsAdded = [] {
+    addMarking<Traits2, Layers::padded>("markByPaddedVolume");
+    addMarking<Traits2, Layers::positive>("markByVolume");
+    addMarking<Traits5, Layers::padded>("markByPaddedVolume5");
+    addMarking<Traits5, Layers::positive>("markByVolume5");
+    addSampling<Traits2, Layers::padded>("samplePaddedVolume");
+    addSampling<Traits2, Layers::positive>("sampleVolume");
+    addSampling<Traits2, Layers::full>("sampleCenteredVolume");
+    addSampling<Traits5, Layers::padded>("samplePaddedVolume5");
+    addSampling<Traits5, Layers::positive>("sampleVolume5");
+    addSampling<Traits5, Layers::full>("sampleCenteredVolume5");
+    Sizes const radii{{28}, {122}};
+    addRow("buildVolume", radii, build<Traits2>);
+    addRow("buildVolume5", radii, build<Traits5>);
+    addRow("buildVolume:memcpy", radii, [](benchmark::State& state) {
+        copyBytes(state, bandOfVoxels(static_cast<float>(state.range(0))).size() * sizeof(Voxel), 0);
+    });
+#ifdef MODELING_HAS_OPENVDB
+    auto const sample = [](benchmark::State& state) {
+        std::vector<float3> const points = pointsInBand(sizeOf(state), kRadius);
+        OpenvdbGrid const grid(bandOfVoxels(kRadius), 1);
+        for (auto _ : state)
+            benchmark::DoNotOptimize(grid.sumOfSamples(points));
+        countElements(state, points.size());
+    };
+    addRow("samplePaddedVolume:openvdb", faceCounts(), sample);
+    addRow("sampleVolume:openvdb", faceCounts(), sample);
+    addRow("buildVolume:openvdb", radii, [](benchmark::State& state) {
+        std::vector<Voxel> const voxels = bandOfVoxels(static_cast<float>(state.range(0)));
+        for (auto _ : state)
+            benchmark::DoNotOptimize(OpenvdbGrid(voxels, 1).sumOfSamples({}));
+        countElements(state, voxels.size());
+    });
+#endif
     return true;
 }();
 
-BENCHMARK(build<Traits2>)->Name("buildVolume")->Apply(allRadii);
-BENCHMARK(build<Traits5>)->Name("buildVolume5")->Apply(allRadii);
-BENCHMARK(copyVoxels)->Name("buildVolume:memcpy")->Apply(allRadii);
-
-#ifdef MODELING_HAS_OPENVDB
-BENCHMARK(sampleOpenvdb)->Name("samplePaddedVolume:openvdb")->Apply(allFaceCounts);
-BENCHMARK(sampleOpenvdb)->Name("sampleVolume:openvdb")->Apply(allFaceCounts);
-BENCHMARK(buildOpenvdb)->Name("buildVolume:openvdb")->Apply(allRadii);
-#endif
+}

@@ -18,8 +18,8 @@ struct PeerDeletion {
 PeerDeletion pclDeletion(std::size_t pointCount, Orvan::Array<unsigned int> const& indices);
 PeerDeletion vtkPointDeletion(std::size_t pointCount, Orvan::Array<unsigned int> const& indices);
 
-/// Triangles, with a normal a point, coordinates a corner (which VTK does not know, so left out there) and a number a
-/// face.
+/// Triangles with a normal per point, texture coordinates per corner (omitted by VTK, which has no corner attributes) and a
+/// number per face.
 struct PeerMesh {
     Orvan::Array<Tessara::Math::float3> const& positions;
     Orvan::Array<unsigned int> const& faceVertex;

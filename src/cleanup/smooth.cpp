@@ -177,7 +177,7 @@ namespace {
     {
         auto const pointCount = static_cast<unsigned int>(sums.size);
         // Each point adds to its own sums; positions do not change meanwhile.
-        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kFaceGrain), [&](auto const& points) {
+        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kOneRingGrain), [&](auto const& points) {
             for (unsigned int point = points.begin(); point != points.end(); ++point)
                 addFacesAround(point, mesh, around, terms.data, position, sums[point]);
         });

@@ -87,7 +87,7 @@ FaceAdjacency buildFaceAdjacency(FaceView const& faces, PointCorners const& arou
     unsigned int const* const corners = around.corners.data;
     unsigned int const* const faceVertex = faces.faceVertex;
     // Each half-edge leaves one point, whose iteration writes its entry.
-    parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kFaceGrain), [=](auto const& points) {
+    parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kOneRingGrain), [=](auto const& points) {
         TwinFinder twins;
         for (unsigned int point = points.begin(); point != points.end(); ++point) {
             twins.gather(corners + offset[point], offset[point + 1] - offset[point], faceVertex);

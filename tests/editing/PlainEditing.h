@@ -4,8 +4,8 @@
 
 #include <algorithm>
 
-// The operations once more, written plainly: one property after the other, each array copied and then edited element by
-// element. For any property bag.
+// A plain reference for any property bag: one property after the other, each array copied and then edited element by
+// element.
 
 namespace PlainEditing {
 
@@ -38,7 +38,7 @@ template <class T> Orvan::Array<T> compacted(Orvan::Array<T> array, Indices cons
     return array;
 }
 
-/// False where there is no array, or one that is too short.
+/// Returns false if the array is missing or too short.
 inline bool compactData(Orvan::String const& name, Indices const& remap, Object& object)
 {
     bool isDone = false;
@@ -163,7 +163,7 @@ inline bool deleteFaces(Flags const& deleted, Object& mesh)
     if (!deleteComponents(mapping(deleted), sFaceComp, mesh))
         return false;
     Indices faceOffset = *dataOf<unsigned int>(mesh, sFaceOffset);
-    cornerRemap.append(getElementCount(mesh, sFaceVertexComp)); // behind a face without corners at the end
+    cornerRemap.append(getElementCount(mesh, sFaceVertexComp)); // for a face without corners at the end
     for (unsigned int& entry : faceOffset)
         entry = cornerRemap[entry];
     faceOffset.append(getElementCount(mesh, sFaceVertexComp));

@@ -36,7 +36,7 @@ template <class... T> Types typesOf(ElementTypeList<T...>)
 
 }
 
-TEST(ElementTypes, areTheHostsFortyAndMatchExactlyOneTypeInOneForm)
+TEST(ElementTypes, areTheHostsFortyAndMatchOneTypeInOneForm)
 {
     struct Sample {
         PropertyValue plain, array;

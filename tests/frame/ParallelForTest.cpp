@@ -18,7 +18,7 @@ using Range = tbb::blocked_range<std::size_t>;
 
 namespace {
 
-/// Cancels the job for as long as it lives.
+/// Cancels the job during its lifetime.
 struct CancelledJob {
     CancelledJob() { Orvan::setJobCancelled(true); }
     ~CancelledJob() { Orvan::setJobCancelled(false); }
@@ -40,7 +40,7 @@ TEST(ParallelFor, staysOnTheCallingThreadUpToItsGrain)
     EXPECT_GT(callsFor(1001), 1);
 }
 
-TEST(ParallelFor, looksAtCancellationOnlyWhenNotIsolatedAndLargerThanItsGrain)
+TEST(ParallelFor, checksForCancellationOnlyIfNotIsolatedAndLargerThanItsGrain)
 {
     CancelledJob const cancelled;
     EXPECT_NO_THROW(parallelFor(Range(0, 1000, 1000), doNothing, false));
@@ -53,10 +53,10 @@ TEST(ParallelFor, looksAtCancellationOnlyWhenNotIsolatedAndLargerThanItsGrain)
     } catch (std::runtime_error const& error) {
         EXPECT_STREQ(error.what(), "job cancelled");
     }
-    EXPECT_EQ(visited, 1001u) << "the loop itself runs to its end";
+    EXPECT_EQ(visited, 1001u) << "the loop itself is completed";
 }
 
-TEST(ParallelFor, isOutOfReachOfACancelledGroupWhenIsolated)
+TEST(ParallelFor, ignoresACancelledGroupWhenIsolated)
 {
     std::atomic<std::size_t> visited = 0;
     std::atomic<bool> hasRun = false;
@@ -72,7 +72,7 @@ TEST(ParallelFor, isOutOfReachOfACancelledGroupWhenIsolated)
     EXPECT_TRUE(hasRun);
 }
 
-TEST(ParallelFor, carriesExceptionsToTheCallerEvenIfMemoryIsExhausted)
+TEST(ParallelFor, rethrowsExceptionsEvenIfMemoryIsExhausted)
 {
     std::optional<TestSupport::ExhaustedMemory> exhausted;
     auto const caught = [&](auto const& work) {
@@ -97,7 +97,7 @@ TEST(ParallelFor, carriesExceptionsToTheCallerEvenIfMemoryIsExhausted)
         };
     };
     auto const tasks = [](auto const& fail) { EXPECT_TRUE(runTasks([] {}, fail, [] {})); };
-    TestSupport::withThreads(1, [&] { // which keeps the memory of its tasks for the next loop
+    TestSupport::withThreads(1, [&] { // one thread keeps the memory of its tasks for the next loop
         loopOf(1)([] {});
         EXPECT_TRUE(caught(loopOf(1)));
         EXPECT_TRUE(caught(loopOf(1000)));
@@ -121,7 +121,7 @@ TEST(ParallelFor, runsOnTheCallingThreadIfNoOtherCanBeCreated)
     EXPECT_EXIT(std::_Exit(TestSupport::withThreads(8, runEverything) ? 0 : 1), testing::ExitedWithCode(0), "");
 }
 
-TEST(RunTasks, tellWhetherAllWereRun)
+TEST(RunTasks, reportWhetherAllHaveRun)
 {
     EXPECT_TRUE(runTasks([] {}, [] {}, [] {}));
     std::atomic<int> runCount = 0;

@@ -90,7 +90,7 @@ namespace {
             bases.push_back(bases.back() + dependentCount(*input, dependents));
         Orvan::Array<unsigned int> merged(offsets.back());
         bool needsSlot = false;
-        for (bool const isOwnPart : {false, true}) { // what runs over the own elements is written first
+        for (bool const isOwnPart : {false, true}) { // surplus indices are written first
             for (std::size_t i = 0; i != inputs.size; ++i) {
                 auto const source = getRangeGeoPropIndices(*inputs[i], range);
                 unsigned int const count = offsets[i + 1] - offsets[i];
@@ -134,8 +134,8 @@ namespace {
                 output.setProperty(key, source.getProperty(key));
     }
 
-    /// Raises the elements of each input by its base, and appends the closing entry.
-    void raise(char const* name, Offsets const& offsets, Offsets const& bases, bool isOffsets, Object& output)
+    /// Adds the base of each input to its elements, and appends the closing entry.
+    void rebase(char const* name, Offsets const& offsets, Offsets const& bases, bool isOffsets, Object& output)
     {
         auto values = *dataOf<unsigned int>(output, name);
         for (std::size_t i = 0; i + 1 < offsets.size(); ++i)
@@ -197,10 +197,10 @@ bool mergePlainly(Kind kind, Inputs const& inputs, Object& output)
         transfer(component, merged, output);
     }
     if (kind == Kind::Meshes) {
-        raise(sFaceVertex, offsets[1], offsets[0], false, output);
-        raise(sFaceOffset, offsets[2], offsets[1], true, output);
+        rebase(sFaceVertex, offsets[1], offsets[0], false, output);
+        rebase(sFaceOffset, offsets[2], offsets[1], true, output);
     } else if (kind == Kind::Strands) {
-        raise(sStrandOffset, offsets[1], offsets[0], true, output);
+        rebase(sStrandOffset, offsets[1], offsets[0], true, output);
     }
     copyTheRest(valid, output);
     return true;

@@ -4,7 +4,7 @@
 
 #include <vector>
 
-/// Merging once more, written plainly: one step after the other, everything looked up where it is needed.
+/// A plain reference: one step after the other, with every look-up where its result is needed.
 namespace PlainMerge {
 
 using Inputs = Orvan::Array<Orvan::Ptr<Tessara::Object>>;

@@ -7,29 +7,31 @@
 
 namespace TestSupport {
 
-// Programs that link this take memory through replaced `operator new`, which can be told to fail.
+// Programs that link this allocate through a replaced `operator new`, which can be made to fail.
 
-/// Runs an action; false where it ended in `std::bad_alloc`. Other exceptions pass through.
+/// Runs an action; false if it ended in `std::bad_alloc`. Other exceptions pass through.
 using Attempt = std::function<bool(std::function<void()> const& action)>;
 
-/// Calls `trial` again and again. Inside the action that the trial hands to its attempt, the n-th allocation fails:
-/// once, and in a second trial all from then on; for n = 1, 2, 3 and so on, until the action succeeds. The trial makes
-/// its inputs and checks what the action left of them; afterwards, nothing it took may still be taken.
+/// Calls `trial` again and again. Inside the action that the trial passes to its attempt the n-th allocation fails, for
+/// n = 1, 2, 3 and so on until the action succeeds: first that allocation alone, then all from it on. The trial makes its
+/// inputs and checks what the action left of them; blocks that are still allocated after the trial are reported as leaks.
 void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial);
 
-/// While one lives, no allocation succeeds on any thread, not those of oneTBB either.
+/// While one is alive, all allocations fail on all threads, those of oneTBB too.
 struct ExhaustedMemory {
     ExhaustedMemory();
     ~ExhaustedMemory();
 };
 
-/// Runs an action, and `meanwhile` inside its allocation of that number.
-/// \return false if the action has fewer allocations
+/// Runs an action, and `meanwhile` during its allocation of that number.
+/// \return false if the action allocates less often
 bool runDuringAllocation(
     std::int64_t number, std::function<void()> const& meanwhile, std::function<void()> const& action);
 
-/// Edits copies of an object while allocations fail: each is then as it was, or edited as a whole. Copies share what
-/// they hold with the source, which stays as it is, or have it to themselves.
-void expectAllOrNothing(Tessara::Object const& source, std::function<void(Tessara::Object&)> const& edit);
+/// Edits copies of an object while allocations fail: each copy is then either edited completely or unchanged. Some copies
+/// share their contents with the source, which must not change; others own them. If `mayGrow` names a float3 point
+/// property, that may be longer than before.
+void expectAllOrNothing(
+    Tessara::Object const& source, std::function<void(Tessara::Object&)> const& edit, char const* mayGrow = nullptr);
 
 }

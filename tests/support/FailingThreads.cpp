@@ -25,7 +25,7 @@ NoNewThreads::~NoNewThreads()
 
 }
 
-// Takes the place of the system's function in the whole program.
+// Replaces the system's function in the whole program.
 extern "C" int pthread_create(
     pthread_t* thread, pthread_attr_t const* attributes, void* (*routine)(void*), void* argument) noexcept
 {

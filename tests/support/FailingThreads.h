@@ -2,7 +2,7 @@
 
 namespace TestSupport {
 
-/// While one lives, the thread that made it can create no threads.
+/// While one is alive, the thread that made it cannot create threads.
 struct NoNewThreads {
     NoNewThreads();
     ~NoNewThreads();

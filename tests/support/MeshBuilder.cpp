@@ -63,7 +63,7 @@ MeshBuilder MeshBuilder::sphere(unsigned int segments)
                 mesh.faces.push_back(isUpper ? Triangle{a, b, c} : Triangle{b, a, c});
             };
             for (unsigned int t = 0; t != 4 * r; ++t) {
-                unsigned int const below = t - t / r; // without a point for each side before
+                unsigned int const below = t - t / r; // without one point per side before
                 add(outer(t), outer(t + 1), inner(below));
                 if (t % r + 1 != r)
                     add(inner(below), outer(t + 1), inner(below + 1));
@@ -191,6 +191,15 @@ MeshBuilder MeshBuilder::withNeedles(std::size_t cuts, float fraction) &&
 MeshBuilder MeshBuilder::withNoise(float amount, unsigned int seed) &&
 {
     addNoise(amount, seed, points);
+    return std::move(*this);
+}
+
+MeshBuilder MeshBuilder::graded() &&
+{
+    for (float3& p : points) {
+        float const squared = p.x * p.x + p.y * p.y + (p.z + 0.5f) * (p.z + 0.5f);
+        p = {p.x / squared, p.y / squared, (p.z + 0.5f) / squared};
+    }
     return std::move(*this);
 }
 

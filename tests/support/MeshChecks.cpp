@@ -39,22 +39,22 @@ namespace {
         return uses;
     }
 
-    /// The first point around which the faces do not form one closed fan.
+    /// The faces around each point form one closed fan.
     testing::AssertionResult hasSingleFans(Tessara::Object const& mesh)
     {
-        // Around a point each face leads from one neighbour to the next; one fan is one cycle through all of them.
-        std::map<unsigned int, std::map<unsigned int, unsigned int>> nextNeighbour;
+        // Around a point each face leads from one neighbor to the next; one fan is one cycle through all of them.
+        std::map<unsigned int, std::map<unsigned int, unsigned int>> nextNeighbor;
         forEachFace(mesh, [&](std::size_t, Face face) {
             for (std::size_t k = 0; k != face.size(); ++k)
-                nextNeighbour[face[k]][face[(k + 1) % face.size()]] = face[(k + face.size() - 1) % face.size()];
+                nextNeighbor[face[k]][face[(k + 1) % face.size()]] = face[(k + face.size() - 1) % face.size()];
         });
-        for (auto const& [point, successor] : nextNeighbour) {
+        for (auto const& [point, successor] : nextNeighbor) {
             std::size_t steps = 0;
-            unsigned int neighbour = successor.begin()->first;
+            unsigned int neighbor = successor.begin()->first;
             do {
-                neighbour = successor.at(neighbour);
+                neighbor = successor.at(neighbor);
                 ++steps;
-            } while (neighbour != successor.begin()->first && steps <= successor.size());
+            } while (neighbor != successor.begin()->first && steps <= successor.size());
             if (steps != successor.size())
                 return testing::AssertionFailure() << "more than one fan of faces around point " << point;
         }

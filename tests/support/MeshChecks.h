@@ -17,7 +17,7 @@ struct Counts {
     friend bool operator==(Counts const&, Counts const&) = default;
 };
 
-/// The values of a data property; none where it is not there or of another type.
+/// The values of a data property; empty if it is missing or has another type.
 template <class T> std::vector<T> valuesOf(Tessara::Object const& object, Orvan::String const& name)
 {
     auto const values = Tessara::Geometry::dataOf<T>(object, name);
@@ -26,17 +26,17 @@ template <class T> std::vector<T> valuesOf(Tessara::Object const& object, Orvan:
 
 Counts countsOf(Tessara::Object const& mesh);
 
-/// Points minus edges plus faces; points without a face do not count.
+/// Points minus edges plus faces; points that belong to no face are not counted.
 long eulerCharacteristic(Tessara::Object const& mesh);
 
 /// Every directed edge once and with its opposite, one fan of faces around each point, no point twice in a face.
-/// Otherwise says where not.
+/// Otherwise names the first edge or point where that fails.
 testing::AssertionResult isClosedManifold(Tessara::Object const& mesh);
 
-/// Passes the host's validator, whichever of the kinds it is.
+/// Passes the host's validator for a mesh, strand set or point cloud.
 testing::AssertionResult isValid(Tessara::Object const& geometry);
 
-/// A hash of the standard arrays: equal for equal bits.
+/// A hash of the bits of the standard arrays.
 std::uint64_t fingerprint(Tessara::Object const& mesh);
 
 }

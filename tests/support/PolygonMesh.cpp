@@ -48,7 +48,7 @@ PolygonMesh PolygonMesh::stars(std::size_t count, unsigned int minCorners, unsig
     PolygonMesh mesh;
     for (std::size_t polygon = 0; polygon != count; ++polygon) {
         unsigned int const cornerCount = minCorners + random.below(maxCorners - minCorners + 1);
-        // Two directions at a right angle, of any length: the plane.
+        // Two perpendicular directions of any length span the plane.
         float3 const u = random.point();
         float3 const v = std::abs(u.x) > std::abs(u.z) ? float3{-u.y, u.x, 0} : float3{0, -u.z, u.y};
         std::vector<float3> corners;

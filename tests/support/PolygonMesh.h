@@ -18,7 +18,7 @@ struct OnSquare {
     float x, y;
 };
 
-/// A place on the square from (-1, -1) to (1, 1): that fraction of the way around, which takes no sines.
+/// The position at that fraction of the way around the square from (-1, -1) to (1, 1). Needs no sines.
 OnSquare aroundSquare(unsigned int step, unsigned int stepCount);
 
 /// A mesh whose faces have any number of corners: `PolygonMesh::quads(100).build()`. As with `MeshBuilder`, every
@@ -30,20 +30,20 @@ struct PolygonMesh {
 
     /// n² quads over an open square in the plane z = 0.
     static PolygonMesh quads(unsigned int segments);
-    /// Polygons beside each other, each star-shaped around its middle with random radii: mostly concave. Each lies in a
-    /// random plane and has points of its own.
+    /// Polygons side by side, each star-shaped with random radii and so mostly concave. Each is in a random plane; none
+    /// share points.
     static PolygonMesh stars(std::size_t count, unsigned int minCorners, unsigned int maxCorners, unsigned int seed);
 
-    /// Faces with so many corners each, over random points: which may be twice in a face, or in none.
+    /// Faces over random points, which may be used twice by a face or by no face.
     static PolygonMesh soup(std::size_t pointCount, std::size_t faceCount, unsigned int minCorners,
         unsigned int maxCorners, Random& random);
 
     PolygonMesh withNoise(float amount, unsigned int seed) &&;
-    /// A further mesh, with points of its own.
+    /// Adds a mesh that shares no points.
     PolygonMesh joinedWith(PolygonMesh const& other) &&;
 
     std::size_t faceCount() const { return faceOffset.size() - 1; }
-    /// A further face, with points of its own.
+    /// Adds a face that shares no points.
     void addPolygon(std::vector<float3> const& corners);
 
     Orvan::MutablePtr<Tessara::Object> build() const;

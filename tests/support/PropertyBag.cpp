@@ -18,7 +18,7 @@ namespace {
     {
         T value{};
         if constexpr (std::is_same_v<T, Orvan::String>) {
-            value = std::string(random.below(30), 'a').c_str(); // up to 15 take no memory of their own
+            value = std::string(random.below(30), 'a').c_str(); // up to 15 characters allocate nothing
         } else if constexpr (std::is_same_v<T, Common::GeoLocation>) {
             value = {randomValue<Orvan::String>(random), randomValue<Orvan::String>(random), random.below(99), {}};
         } else if constexpr (std::is_same_v<T, bool>) {
@@ -50,14 +50,14 @@ namespace {
     void addDataOfAnyType(
         Orvan::String const& name, Orvan::String const& target, std::size_t length, Random& random, Object& object)
     {
-        unsigned int type = random.below(40); // which is counted down
+        unsigned int type = random.below(40); // counts down
         forEachElementTypeName([&]<class T>(ElementType<T>) {
             if (type-- == 0)
                 addData<T>(name, target, length, random, object);
         });
     }
 
-    /// Mostly the length itself.
+    /// Usually the length itself.
     std::size_t lengthNear(std::size_t length, Random& random)
     {
         unsigned int const choice = random.below(12);
@@ -92,6 +92,13 @@ void replaceIn(Orvan::String const& name, char const* key, Tessara::PropertyValu
     object.setProperty(name, Orvan::makePtr<Object>(changed));
 }
 
+void cutToElements(Orvan::String const& name, Object& object)
+{
+    auto values = *dataOf<Tessara::Math::float3>(object, name);
+    values.resize(std::min<std::uint64_t>(values.size, getElementCount(object, sPointComp)));
+    replaceIn(name, sData, Orvan::makePtr<Orvan::Array<Tessara::Math::float3>>(std::move(values)), object);
+}
+
 void addRandomProperties(Orvan::String const& component, Random& random, Object& object)
 {
     std::size_t const count = getElementCount(object, component);
@@ -109,7 +116,7 @@ void addRandomProperties(Orvan::String const& component, Random& random, Object&
         else if (kind == 5)
             replaceIn(name, sData, {}, object);
         else if (kind == 6)
-            replaceIn(name, sData, 1.5f, object); // of no type that operations know
+            replaceIn(name, sData, 1.5f, object); // a type that operations do not know
         else if (kind == 7)
             replaceIn(name, sDefault, {}, object);
         else if (kind == 8)

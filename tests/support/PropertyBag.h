@@ -7,11 +7,14 @@
 
 namespace TestSupport {
 
-/// Sets a value inside a geo property; its other holders see no change.
+/// Sets a value inside a geo property; other holders of the property see no change.
 void replaceIn(Orvan::String const& name, char const* key, Tessara::PropertyValue value, Tessara::Object& object);
 
-/// Adds properties to a component: data of any of the forty element types, with and without a default, some as long as
-/// the component and some not, and ranges with and without data. Some hold null or no array.
+/// Shortens a float3 point property to the number of points; other holders see no change.
+void cutToElements(Orvan::String const& name, Tessara::Object& object);
+
+/// Adds properties to a component: data of any of the forty element types, with and without a default, mostly as long as
+/// the component, and ranges with and without data. Some hold null or no array.
 void addRandomProperties(Orvan::String const& component, Random& random, Tessara::Object& object);
 
 /// One data property of each of the forty element types, as long as the component and named after it and the type.
@@ -19,10 +22,10 @@ void addAllTypes(Orvan::String const& component, Random& random, Tessara::Object
 
 Orvan::Array<Tessara::Math::float3> randomPositions(std::size_t count, Random& random);
 
-/// References that somebody else holds to what an object holds.
+/// Further references to the contents of an object.
 enum class Holders { None, Object, Properties, Arrays };
 
-/// An object that holds the same as another one: all of it, its geo properties, or the arrays in those.
+/// An object that shares all contents of another one, its geo properties, or only the arrays in those.
 Tessara::Object held(Holders holders, Tessara::Object const& object);
 
 }

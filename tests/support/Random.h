@@ -6,7 +6,7 @@
 
 namespace TestSupport {
 
-/// Random numbers that are the same everywhere for one seed.
+/// Random numbers that depend on the seed only, not on the platform.
 class Random {
 public:
     explicit Random(unsigned int seed)
@@ -15,7 +15,7 @@ public:
     }
 
     unsigned int below(std::size_t bound) { return static_cast<unsigned int>(engine_() % bound); }
-    /// From -1 up to but excluding 1, in steps that single precision holds.
+    /// From -1 up to but excluding 1, exact in single precision.
     float coordinate() { return static_cast<float>(below(0x10000)) / 32768.0f - 1.0f; }
     Tessara::Math::float3 point(float reach = 1)
     {

@@ -10,7 +10,7 @@
 
 namespace TestSupport {
 
-/// A folder that goes with what is in it.
+/// A folder that is removed with its contents.
 class TemporaryFolder {
 public:
     TemporaryFolder()
@@ -36,7 +36,7 @@ private:
 
 inline void store(std::filesystem::path const& file, std::string_view content)
 {
-    std::filesystem::remove(file); // for writing over it can wait for the disk
+    std::filesystem::remove(file); // overwriting can wait for the disk
     std::ofstream(file, std::ios::binary) << content;
 }
 

@@ -1,6 +1,6 @@
 #pragma once
 
-// What most tests need: builders, checks, and the makers and look-ups of the host.
+// What most tests need: builders, checks, and the makers and lookups of the host.
 
 #include "Compare.h"
 #include "FailingAllocations.h"

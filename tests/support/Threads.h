@@ -9,14 +9,14 @@
 
 namespace TestSupport {
 
-/// Runs `work` with that many threads, also where the machine has fewer cores.
+/// Runs `work` with that many threads, even if the machine has fewer cores.
 template <class Work> auto withThreads(int threads, Work const& work)
 {
     tbb::global_control const allowed(tbb::global_control::max_allowed_parallelism, static_cast<std::size_t>(threads));
     return tbb::task_arena(threads).execute(work);
 }
 
-/// `make` gives a `MutablePtr<Object>`, which has to have the same bits for each number of threads.
+/// `make` returns a `MutablePtr<Object>`, which must have the same bits for each number of threads.
 template <class Make> void expectSameForThreads(std::initializer_list<int> threadCounts, Make const& make)
 {
     auto const expected = withThreads(*threadCounts.begin(), make);

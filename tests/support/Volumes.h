@@ -17,13 +17,13 @@ template <class Visit> void forEachVoxel(int first, int end, Visit const& visit)
                 visit(i, j, k);
 }
 
-/// A field that blends give back exactly, or nearly so.
+/// A field that interpolation reproduces, up to rounding.
 inline float linearField(float x, float y, float z)
 {
     return 1.5f * x - 2 * y + 0.25f * z + 10;
 }
 
-/// Values for all voxels from `first` up to `end` along each axis, and a plain look-up.
+/// Values for all voxels from `first` up to `end` along each axis, with plain lookup.
 struct Field {
     int first, end;
     std::vector<float> values;

@@ -16,7 +16,7 @@ using Triangles = std::vector<unsigned int>;
 
 Triangles triangulated(Corners const& corners)
 {
-    static Modeling::Internal::PolygonStorage storage; // used again, as in a mesh
+    static Modeling::Internal::PolygonStorage storage; // reused, as for the faces of a mesh
     Triangles triangles(3 * (corners.size() - 2), 12345);
     Modeling::Internal::triangulatePolygon(corners, triangles, storage);
     return triangles;
@@ -30,7 +30,7 @@ Triangles fan(std::size_t cornerCount)
     return triangles;
 }
 
-/// Ear clipping once more, written plainly: the ring is walked, every ear is measured anew, all corners are scanned.
+/// Plain ear clipping: walks the ring, measures every changed ear and scans all corners for each cut.
 class PlainReference {
 public:
     explicit PlainReference(Corners const& corners)
@@ -130,13 +130,12 @@ private:
     std::vector<float> quality_;
 };
 
-/// Corners of any kind: on a coarse lattice they repeat, line up and intersect; some are not even numbers.
+/// Corners of any kind: on a coarse lattice they repeat, line up and intersect; some are NaN or infinite.
 Corners soup(std::size_t n, Random& random)
 {
     static float const kScales[] = {0.01f, 1, 1, 1, 1e4f, 1e18f};
     unsigned int const lattice = random.below(3);
-    static float const kFlatness[] = {
-        0, 0.3f, 0.005f}; // the last tilts normals that point along -z about as far as told apart
+    static float const kFlatness[] = {0, 0.3f, 0.005f}; // the last tilts normals along -z by about the tolerance
     float const flatness = kFlatness[random.below(3)];
     float const scale = kScales[random.below(6)];
     Corners corners(n);
@@ -175,12 +174,12 @@ TEST(TriangulatePolygon, cutsOrFallsBackToTheFan)
         {"reflex at corner 0", {{{1, 1, 0}, {0, 3, 0}, {0, 0, 0}, {3, 0, 0}}, {0, 1, 2, 2, 3, 0}}},
         {"all corners on a line", {{{0, 0, 0}, {1, 0, 0}, {2, 0, 0}, {3, 0, 0}}, fan(4)}},
         {"all corners equal", {{{1, 2, 3}, {1, 2, 3}, {1, 2, 3}, {1, 2, 3}, {1, 2, 3}}, fan(5)}},
-        {"reflex, but of less area than is looked at",
+        {"reflex, but below the smallest area",
             {{{0.001f, 0.001f, 0}, {0, 0.003f, 0}, {0, 0, 0}, {0.003f, 0, 0}}, fan(4)}},
-        {"two equal corners in a row, which never become ears",
+        {"two equal consecutive corners, which never become ears",
             {{{0, 0, 0}, {1, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}}, fan(5)}},
         {"bow-tie without area", {{{0, 0, 0}, {1, 1, 0}, {1, 0, 0}, {0, 1, 0}}, fan(4)}},
-        {"not numbers", {{{0, 0, 0}, {1, kNan, 0}, {1, 1, 0}, {0, 1, 0}, {0, 0.5f, 0}}, fan(5)}},
+        {"NaN", {{{0, 0, 0}, {1, kNan, 0}, {1, 1, 0}, {0, 1, 0}, {0, 0.5f, 0}}, fan(5)}},
         {"triangle without area", {{{0, 0, 0}, {0, 0, 0}, {2, 0, 0}}, {0, 1, 2}}},
         {"two corners", {{{0, 0, 0}, {1, 0, 0}}, {}}},
     };

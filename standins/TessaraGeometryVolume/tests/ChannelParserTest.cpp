@@ -68,10 +68,10 @@ TEST(ChannelParser, reportsTheFirstFaultAndKeepsTheOtherEntries)
     }
 }
 
-TEST(ChannelParser, runsInPolynomialTime)
+TEST(ChannelParser, matchesManyWildcardsWithoutBacktrackingExponentially)
 {
     ChannelParser parser;
-    parser.parses("*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*b");
+    parser.parses("*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*b"); // would run for years
     EXPECT_FALSE(parser.accepts(std::string(5000, 'a').c_str()));
     EXPECT_TRUE(parser.accepts((std::string(5000, 'a') + "b").c_str()));
 }
@@ -79,17 +79,16 @@ TEST(ChannelParser, runsInPolynomialTime)
 TEST(Canceller, countsCallsFromAllThreads)
 {
     TSR::Canceller::resetCallCount();
-    std::vector<std::thread> threads;
-    for (int thread = 0; thread < 4; ++thread)
-        threads.emplace_back([] {
-            TSR::Canceller::ID place{4};
-            for (int i = 0; i < 1000; ++i)
-                TSR::Canceller::cancelID(place);
-            EXPECT_EQ(place.value, 4u);
-        });
-    for (std::thread& thread : threads)
-        thread.join();
-    EXPECT_EQ(TSR::Canceller::callCount(), 4000u);
+    auto const call = [] {
+        TSR::Canceller::ID place{4};
+        for (int i = 0; i < 1000; ++i)
+            TSR::Canceller::cancelID(place);
+        EXPECT_EQ(place.value, 4u);
+    };
+    std::thread other(call);
+    call();
+    other.join();
+    EXPECT_EQ(TSR::Canceller::callCount(), 2000u);
     TSR::Canceller::resetCallCount();
     EXPECT_EQ(TSR::Canceller::callCount(), 0u);
 }

@@ -8,7 +8,6 @@
 #include <climits>
 #include <map>
 #include <stdexcept>
-#include <thread>
 #include <tuple>
 
 using namespace TSR::TileTree3D;
@@ -262,30 +261,4 @@ TYPED_TEST(TileTree, refusesDepthsAndVoxelsThatTheLayoutDoesNotHave)
     source.offsetType = 8;
     EXPECT_THROW(buildVolume<TypeParam>(source), std::invalid_argument);
     EXPECT_EQ(buildVolume<TypeParam>(sourceOf<TypeParam>()).channel.coarsestDepth(), TypeParam::kDepthCount);
-}
-
-TYPED_TEST(TileTree, usesMemoryForActiveTilesOnlyAndIsReadByManyThreads)
-{
-    // The shell of a ball in 464³ voxels.
-    std::vector<Voxel> shell;
-    for (int k = -66; k <= 66; ++k)
-        for (int j = -66; j <= 66; ++j)
-            for (int i = -66; i <= 66; ++i)
-                if (int const squared = i * i + j * j + k * k; 65 * 65 < squared && squared < 66 * 66)
-                    shell.push_back({3 * i, 3 * j, 3 * k, float(squared)});
-    ASSERT_GT(shell.size(), 50'000);
-    auto const volume = volumeOf<TypeParam>(shell, sourceOf<TypeParam>());
-    std::size_t const bytes = volume.container.memoryInBytes() + volume.channel.memoryInBytes();
-    EXPECT_LT(bytes, 60'000'000); // a dense field would take 400 MB
-
-    std::vector<std::thread> threads;
-    std::vector<std::size_t> wrong(4);
-    for (std::size_t& count : wrong)
-        threads.emplace_back([&] {
-            for (std::size_t v = 0; v < shell.size(); v += 7)
-                count += valueAt(volume, {shell[v].i, shell[v].j, shell[v].k}) != shell[v].value;
-        });
-    for (std::thread& thread : threads)
-        thread.join();
-    EXPECT_EQ(wrong, std::vector<std::size_t>(4));
 }
