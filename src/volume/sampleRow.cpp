@@ -32,7 +32,7 @@ namespace {
                 state.knownTiles = std::make_unique<KnownTiles<Traits>>();
         }
 
-        /// Gives each run its values. Known tiles come first, without an unpredictable branch.
+        /// Finds the values that each run reads. Known tiles come first, without an unpredictable branch.
         /// \return  the number of runs whose tiles hold no data
         std::size_t findTiles(std::size_t runCount)
         {
