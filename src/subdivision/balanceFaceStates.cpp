@@ -100,7 +100,7 @@ namespace {
         {
             std::atomic<bool> isChanged = false;
             // Each face reads the states of the previous sweep and writes its own; any of them may set flags, which are
-            // read after the loop.
+            // read after the loop. The loop is not isolated, so that it checks for cancellation of the job.
             parallelFor(
                 tbb::blocked_range<unsigned int>(0, faceCount_, kFaceGrain),
                 [&, this](auto const& faces) {

@@ -97,6 +97,7 @@ namespace {
             if (!isUnchanged)
                 rebuild(halfEdges, mesh);
             MODELING_ASSERT(!isClosed || isClosedAndBalanced(halfEdges, mesh));
+            // Also if the first pass splits nothing: points without a face become NaN in all cases.
             if (!isUnchanged || isFirst)
                 computePositions(halfEdges, mesh.numPoints, mesh.basePositions, mesh.limitPositions, mesh.vertexLevels,
                     mesh.faceStates, mesh.positions);

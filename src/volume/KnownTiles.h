@@ -19,8 +19,8 @@ template <class Traits> struct KnownTile {
     int depth = -1;
     typename Container<Traits>::TileType tile; // a copy, as repeated tiles are not stored; may be a coarser one
     bool hasData = false;
-    // The tile's own values, null if the tile is coarser than that depth, and those with the layer around it, null
-    // until they are built.
+    // 0: the tile's own values. 1: those with the layer around it, null until they are built. Both are null if the tile
+    // is coarser than that depth.
     float const* values[2] = {};
 
     bool isOf(IJK asked, int askedDepth) const noexcept

@@ -24,6 +24,7 @@ template <class Traits> void fillHalo(
 template <class Traits> void fillHalo(
     LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, FullHalo<Traits>& halo);
 
+/// The slot of the halo with a key; `kNoSlot` if it is not cached.
 template <class Traits, class Cache>
 std::uint32_t findHalo(LinearSamplerState<Traits>& state, std::uint64_t key, int depth, Cache& cache)
 {
@@ -37,6 +38,7 @@ std::uint32_t findHalo(LinearSamplerState<Traits>& state, std::uint64_t key, int
     return state.lastSlot[slot] = slot;
 }
 
+/// Builds the halo of a tile in place of the last one of its depth. \return its slot
 template <class Traits, class Cache> std::uint32_t buildHalo(
     LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, Cache& cache)
 {

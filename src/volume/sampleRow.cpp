@@ -162,6 +162,7 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
         return false;
     std::size_t const runCount = findRuns(count, row);
     bool const isPadded = state.haloChannel, isPositive = isPadded || state.hasPositiveHalos();
+    // If layers are on the upper sides only, places below the tile read its first voxels.
     if (!isPadded)
         findLayers(count, isPositive ? -kLargestOffset : 1, kSide - 1, row);
     std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
@@ -169,6 +170,7 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
     MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);
     int const padded = kSide + (isPositive ? 1 : 2);
     TileArrays const arrays{{isPadded ? padded : kSide, padded}, isPositive ? 0 : -1, kSide - 1};
+    // No place is below its tile if no offset is positive.
     if (isPadded && largestCoordinate(settings.voxelOffset) <= 0)
         interpolateRow<kSide + 1>(count, arrays, row, values);
     else

@@ -12,8 +12,8 @@ namespace TestSupport {
 /// Runs an action; false if it ended in `std::bad_alloc`. Other exceptions pass through.
 using Attempt = std::function<bool(std::function<void()> const& action)>;
 
-/// Calls `trial` repeatedly. Inside the action that the trial passes to its attempt the n-th allocation fails, for
-/// n = 1, 2, 3 and so on until the action succeeds: first that allocation alone, then all from it on. The trial makes
+/// Calls `trial` repeatedly. Inside the action that the trial passes to its attempt, the n-th allocation fails, for
+/// n = 1, 2, 3 and so on, until the action succeeds: first that allocation alone, then all from it on. The trial makes
 /// its inputs and checks what the action left of them; blocks that are still allocated after the trial are reported as
 /// leaks.
 void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial);
@@ -24,7 +24,7 @@ struct ExhaustedMemory {
     ~ExhaustedMemory();
 };
 
-/// Runs an action, and `meanwhile` during the allocation of the action that has that number, counted from 1.
+/// Runs an action, and `meanwhile` during one of its allocations: `number` counts from 1.
 /// \return false if the action makes fewer allocations
 bool runDuringAllocation(
     std::int64_t number, std::function<void()> const& meanwhile, std::function<void()> const& action);
