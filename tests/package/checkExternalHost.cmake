@@ -1,4 +1,4 @@
-# The library builds against a host that is installed elsewhere; the stand-ins, installed apart, play that part.
+# The library builds against a host that is installed elsewhere; the stand-ins, installed separately, take its place.
 
 include(${CMAKE_CURRENT_LIST_DIR}/consumer.cmake)
 

@@ -1,4 +1,4 @@
-# The line is written once, when the variable is a number other than 0, and to standard error alone.
+# The line is written once, to standard error only, if the variable begins with a number other than 0.
 
 set(line "^        Modeling: Tessara version 2\\.10\\.0\\.0 \\([0-9-]+, build 96, commit ([0-9a-f][0-9a-f][0-9a-f][0-9a-f][0-9a-f][0-9a-f][0-9a-f]|unknown), branch [^ ]+\\)\n$")
 
