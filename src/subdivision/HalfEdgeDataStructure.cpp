@@ -41,7 +41,7 @@ namespace {
     /// into the bucket of the point at which they end, in the order of their corners, and then by point within the
     /// bucket. So each step writes to few places at a time, however the points are numbered.
     struct Layout {
-        unsigned int bucketBits; // points in the same bucket differ only in that many low bits of their number
+        unsigned int bucketBits; // points in the same bucket differ only in these low bits of their number
         std::size_t bucketCount;
         std::size_t facesPerBlock;
         std::size_t blockCount;

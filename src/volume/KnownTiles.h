@@ -13,14 +13,14 @@
 
 namespace TSR::TileTree3D::Internal {
 
-/// A tile that rows have looked up, found by its lower corner and the depth that was asked for.
+/// A tile that rows have looked up, found by the lower corner and the depth that were requested.
 template <class Traits> struct KnownTile {
     IJK index{};
     int depth = -1;
     typename Container<Traits>::TileType tile; // a copy, as repeated tiles are not stored; may be a coarser one
     bool hasData = false;
     // 0: the tile's own values. 1: those with the layer around it, null until they are built. Both are null if the tile
-    // is coarser than that depth.
+    // is coarser than `depth`.
     float const* values[2] = {};
 
     bool isOf(IJK asked, int askedDepth) const noexcept

@@ -87,7 +87,7 @@ namespace {
             return known;
         }
 
-        /// Places the points of a run in a coarser tile than the one that was asked for.
+        /// Places the points of a run in a tile that is coarser than requested.
         void placeInTile(std::size_t run, TileType const& tile)
         {
             constexpr int kSide = Traits::kSide;

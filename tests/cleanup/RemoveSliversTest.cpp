@@ -64,7 +64,7 @@ private:
         }
         std::ranges::set_intersection(ringA, ringB, std::inserter(shared, shared.end()));
         float3 const middle = (points_[a] + points_[b]) * 0.5f;
-        // Each ring holds both ends too: two more shared points, and not both ends of valence 3.
+        // Each ring contains both ends too, so that two common neighbors make four shared points.
         bool const keepsLink = shared.size() == 4 && (ringA.size() != 4 || ringB.size() != 4);
         if (!keepsLink
             || !std::ranges::all_of(around, [&](unsigned int f) { return keepsOrientation(f, a, b, middle); }))

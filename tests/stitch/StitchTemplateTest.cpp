@@ -326,7 +326,7 @@ TEST(StitchTemplate, letsStrandsMeetOnSharedEdges)
     made.findControlPointPos(right, made.getStrands()[0].controlPoints[0], 1, false, start);
     EXPECT_EQ(std::memcmp(&end, &start, sizeof end), 0);
 
-    // Short arrays are read up to their end; without a height or a triangle the point stays in the polygon.
+    // Short arrays are read up to their end; without a height or a triangle there is no offset.
     Weights const quarter{0.25f, 0.25f};
     made.findControlPointPos(Points{{4, 8, 0}}, quarter, 1, false, end);
     EXPECT_TRUE(end.x == 1 && end.y == 2 && end.z == 0);
