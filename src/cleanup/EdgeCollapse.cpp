@@ -60,7 +60,7 @@ namespace {
     }
 
     /// Lists the faces around an end of the edge. The walk stops at the first face that `accept` refuses.
-    /// \return whether `accept` took all faces and the fan is closed and holds all faces at the point, which is not the
+    /// \return whether all faces were accepted and the fan is closed and has all faces at the point, which is not the
     ///         case on boundaries and at non-manifold points
     template <class Accept> bool collectFan(CollapsingMesh const& mesh, Accept const& accept, EdgeEnd& end)
     {
@@ -102,7 +102,7 @@ namespace {
         return sharedRing.size() == 2;
     }
 
-    /// Unit vectors along the edges of a face around a point, which is its corner `entry`.
+    /// Unit vectors along the edges of a face around a point.
     struct FaceDirections {
         float3 toFirst; // from the point to the next corner
         float3 toSecond; // from the point to the corner after that
@@ -110,7 +110,7 @@ namespace {
     };
 
     /// The normal that a face had before the first collapse: the cross product of the directions from its first corner
-    /// to the other two. It is not normalized; its length is the sine of the angle.
+    /// to the other two. It is not normalized; its length is the sine of the angle between them.
     float3 originalNormal(
         MeshArrays const& original, CollapsingMesh const& mesh, FanFace const& around, FaceDirections const& now)
     {
@@ -137,11 +137,11 @@ namespace {
         float3 const p2 = mesh.positions[c[previousCorner(around.entry)]];
         FaceDirections const now{safeNormalize(p1 - p0), safeNormalize(p2 - p0), safeNormalize(p2 - p1)};
 
-        // The midpoint has to be strictly on the inner side of the opposite edge,
+        // The midpoint must be strictly on the inner side of the opposite edge.
         float3 const normal = cross(now.toFirst, now.toSecond);
         if (dot(cross(normal, now.opposite), midpoint - p1) <= 0)
             return false;
-        // and the new normal must be within 90 degrees of the original one.
+        // The angle between the new normal and the original one must be less than 90 degrees.
         float3 const newNormal = cross(safeNormalize(p1 - midpoint), safeNormalize(p2 - midpoint));
         return !(dot(newNormal, originalNormal(original, mesh, around, now)) <= 0);
     }
@@ -187,13 +187,14 @@ namespace {
         return entry->second.fan == Hub::Fan::Tangled ? nullptr : &entry->second;
     }
 
+    /// The link condition. A hub has more than three faces, so it needs no check for a tetrahedron.
     bool hubKeepsLink(Hub const& hub, EdgeEnd const& other)
     {
         auto const isShared = [&](unsigned int point) { return point != other.point && hub.ring.contains(point); };
         return hub.fan == Hub::Fan::Closed && std::count_if(other.ring.begin(), other.ring.end(), isShared) == 2;
     }
 
-    /// The key of the cell that holds a direction in a grid of 2^(level + 1) cells per axis.
+    /// The key of the cell that contains a direction, in a grid with 2^(level + 1) cells per axis.
     std::uint64_t directionCell(float3 const& direction, unsigned int level)
     {
         std::uint64_t cell = level;
@@ -207,7 +208,7 @@ namespace {
     constexpr unsigned int kFinestLevel = 16;
     constexpr unsigned int kLevelStep = 2;
 
-    /// The face that refused to let the hub move into the most similar direction; `otherwise` if none is known.
+    /// The face that refused the move of the hub in the most similar direction; `otherwise` if none is known.
     FanFace findRefusing(
         CollapsingMesh const& mesh, Hub const& hub, unsigned int point, float3 const& direction, FanFace otherwise)
     {
@@ -225,11 +226,11 @@ namespace {
     }
 
     /// As `collectFan`, for a hub whose fan is closed, but in another order: starts at the face that is most likely to
-    /// refuse and continues on both sides of it, because moves into similar directions are refused by nearby faces.
+    /// refuse and continues on both sides of it, because moves in similar directions are refused by nearby faces.
     template <class Accept> bool collectFanOfHub(
         CollapsingMesh const& mesh, Accept const& accept, float3 const& midpoint, Hub& hub, EdgeEnd& end)
     {
-        constexpr unsigned int kNear = 8;
+        constexpr unsigned int kNear = 8; // a face that is found sooner is not worth remembering
         float3 const direction = safeNormalize(midpoint - mesh.positions[end.point]);
         std::optional<FanFace> ahead = findRefusing(mesh, hub, end.point, direction, end.first);
         std::optional<FanFace> behind = previousAround(mesh, *ahead);
@@ -239,7 +240,7 @@ namespace {
             bool const isAhead = visited % 2 == 0;
             std::optional<FanFace>& side = isAhead ? ahead : behind;
             if (!side)
-                return collectFan(mesh, accept, end); // two faces share two edges
+                return collectFan(mesh, accept, end); // only if two faces share two edges
             FanFace const current = *side;
             if (current.face != end.first.face && current.face != end.last.face) {
                 if (!accept(current)) {
@@ -281,7 +282,8 @@ namespace {
             && std::find(beyond.begin(), beyond.end(), mesh.adjacency[face][previousCorner(edge)]) == beyond.end();
     }
 
-    /// Updates what is known about hubs for the collapse that comes next.
+    /// Brings what is known about hubs up to date for a collapse that is about to happen: the kept point becomes the
+    /// hub of the larger end, and a hub around faces that will share two edges is forgotten.
     void updateHubs(CollapsingEdge const& edge, CollapsingMesh& mesh)
     {
         if (mesh.hubs.empty())
@@ -337,8 +339,8 @@ namespace {
         replaceNeighbor(acrossBehindStart, g, acrossBehindEnd, mesh);
     }
 
-    /// Marks a face of the edge as removed. One of its corners still is the removed end, whose faces have been counted
-    /// for the start.
+    /// Marks a face of the edge as removed. One of its corners is still the removed end, whose faces now count for the
+    /// start.
     void removeFace(unsigned int face, CollapsingEdge const& edge, CollapsingMesh& mesh)
     {
         unsigned int* const corners = mesh.corners(face);

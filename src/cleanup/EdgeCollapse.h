@@ -13,20 +13,21 @@ namespace Modeling::Internal {
 
 using Tessara::Math::float3;
 
-/// What the sweep over the faces has to do with a face. Only slivers and faces changed by a collapse can collapse.
+/// Whether the sweep over the faces must visit a face: only slivers, and faces changed by a collapse, can collapse.
 enum class FaceVisit : unsigned char { None = 0, Sliver = 1, Changed = 2 };
 
 /// What a walk around a point with many faces has found. All spokes of such a hub may be the shortest edges of slivers,
 /// and one walk per spoke would take quadratic time.
 struct Hub {
     enum class Fan : unsigned char {
-        Closed, // and each point of the ring occurs once
+        Closed, // and no neighbor occurs twice
         Open, // the point is on a boundary or has several fans
-        Tangled
+        Tangled // a neighbor occurs twice: the outcome of a walk depends on where it starts
     };
     Fan fan = Fan::Tangled;
     std::unordered_set<unsigned int> ring; // the neighbors of the point if the fan is closed
-    std::unordered_map<std::uint64_t, unsigned int> refusing; // by direction, a face that refused a move into it
+    // By direction cell, a face that refused a move of the point.
+    std::unordered_map<std::uint64_t, unsigned int> refusing;
 };
 
 /// The mesh while its edges collapse. A removed face has `kInvalidIndex` at its first corner.
@@ -34,7 +35,7 @@ struct CollapsingMesh {
     Orvan::Array<float3> positions;
     IndexArray faceVertex;
     FaceAdjacency adjacency;
-    IndexArray valence; // number of faces around each point; a closed fan of fewer faces is not the only one
+    IndexArray valence; // number of faces around each point; if a closed fan has fewer, the point has other fans
     Orvan::Array<FaceVisit> visits; // one per face
     std::unordered_map<unsigned int, Hub> hubs; // by point; collapses keep them up to date
     std::vector<unsigned int> removedFaces;
@@ -45,7 +46,7 @@ struct CollapsingMesh {
     bool isRemoved(unsigned int face) const { return corners(face)[0] == Tessara::Geometry::kInvalidIndex; }
 };
 
-/// A face around a point, which is its corner `entry`.
+/// A face around a point; the point is corner `entry` of the face.
 struct FanFace {
     unsigned int face;
     unsigned int entry;
@@ -58,30 +59,30 @@ struct EdgeEnd {
     FanFace last{}; // its entry is the other end
     unsigned int point = 0;
     std::vector<FanFace> fan; // the faces around the point, those after `first` and before `last`
-    std::vector<unsigned int> ring; // the neighbors of the point except the other end, ascending
+    std::vector<unsigned int> ring; // the neighbors of the point except the other end, ascending; not set for a hub
 };
 
 struct CollapsingEdge {
     EdgeEnd start; // its point is kept and moves to the midpoint
     EdgeEnd end; // its point is removed
     float3 midpoint{};
-    std::vector<unsigned int> sharedRing; // the points in both rings
+    std::vector<unsigned int> sharedRing; // the points in both rings; scratch memory of `canCollapse`
 };
 
 /// Copies the mesh and finds its adjacency.
 /// \param mesh     triangles; `pointCount` positions
-/// \param slivers  what the sweep has to do with each face
+/// \param slivers  which faces the sweep must visit
 CollapsingMesh prepareCollapses(MeshArrays const& mesh, Orvan::Array<FaceVisit>&& slivers);
 
 /// Whether edge `entry` of the face can collapse: it has a face on both sides, both ends have closed fans, no face
-/// around them turns over, and the surface stays manifold. Takes time linear in the valences of both ends; if the
+/// around them turns over, and the surface remains manifold. Takes time linear in the valences of both ends; if the
 /// answer is no, mostly in the smaller one.
 /// \param original  the mesh before the first collapse
 /// \param edge      describes the edge if the answer is yes; reused from call to call to allocate less
 bool canCollapse(MeshArrays const& original, FanFace const& face, CollapsingMesh& mesh, CollapsingEdge& edge);
 
 /// Moves the start of the edge to the midpoint, and removes the end and the two faces of the edge.
-/// \pre  `canCollapse` has described the edge, and nothing has changed since
+/// \pre  `canCollapse` has described the edge, and the mesh has not changed since
 void collapseEdge(CollapsingEdge const& edge, CollapsingMesh& mesh);
 
 }

@@ -38,7 +38,7 @@ namespace {
     struct EdgeLengths {
         float shortest = std::numeric_limits<float>::max();
         float longest = -std::numeric_limits<float>::max();
-        unsigned int shortestEdge = 0; // the first of equal ones
+        unsigned int shortestEdge = 0; // the first of equally short ones
     };
 
     EdgeLengths measureEdges(unsigned int const* corners, float3 const* position)
@@ -78,7 +78,7 @@ namespace {
         return visits;
     }
 
-    /// The first face that has to be visited, `face` or above; the face count if there is none.
+    /// The first face from `face` on that must be visited; the face count if there is none.
     unsigned int nextVisit(Orvan::Array<FaceVisit> const& visits, std::uint64_t face)
     {
         // Most faces need no visit, so they are skipped eight at a time.
@@ -105,7 +105,8 @@ namespace {
         }
     }
 
-    /// Moves points from the end into the holes. Entry p of the result is the new index of point p.
+    /// Moves points from the end into the holes. Entry p of the result is the new index of point p, or `kInvalidIndex`
+    /// if it has been removed.
     IndexArray compactPoints(CollapsingMesh& mesh)
     {
         IndexArray pointRemap = uninitializedArray<unsigned int>(mesh.positions.size);
@@ -133,7 +134,8 @@ namespace {
         return pointRemap;
     }
 
-    /// Moves faces from the end into the holes, starting with the last hole.
+    /// Moves faces from the end into the holes. Holes are filled in descending order, so that no removed face is
+    /// moved.
     void compactFaces(CollapsingMesh& mesh)
     {
         std::sort(mesh.removedFaces.begin(), mesh.removedFaces.end(), std::greater<>());
@@ -167,7 +169,7 @@ namespace {
         collapsed.faceCount = collapsed.cornerCount / 3;
         collapsed.positions = Orvan::makePtr<Orvan::Array<float3>>(std::move(mesh.positions));
         collapsed.faceVertex = Orvan::makePtr<IndexArray>(std::move(mesh.faceVertex));
-        // The offsets of triangles are 0, 3, 6, ..., so those of fewer triangles are the first ones of the original.
+        // The offsets of triangles are 0, 3, 6, ..., so those of fewer triangles are a prefix of the original ones.
         collapsed.faceOffset =
             Orvan::makePtr<IndexArray>(copyOfFirst(std::uint64_t{collapsed.faceCount} + 1, *original.faceOffset));
         PreparedWrites writes(object);

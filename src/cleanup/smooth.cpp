@@ -20,12 +20,12 @@ namespace {
     struct PointFaces {
         IndexArray offsets; // point count + 1
         IndexArray faces;
-        IndexArray corners; // the corner of the face that is at the point, counted from its first one
+        IndexArray corners; // which corner of the face is at the point: 0 for its first one
     };
 
     /// What a face contributes to its points in a step.
     struct FaceTerms {
-        float3 normal; // of a triangle; not normalized
+        float3 normal; // of a triangle, not normalized; zero for other faces
         float3 middle; // the centroid of a triangle, the mean of the corners of another face
     };
 
@@ -106,8 +106,8 @@ namespace {
             });
     }
 
-    /// A polygon as the fan of triangles between its edges and the mean of its corners; adds those that contain a
-    /// point.
+    /// A polygon as the fan of triangles between its edges and the mean of its corners. Adds the triangles at a point
+    /// to the sums of that point.
     class FanOfPolygon {
     public:
         FanOfPolygon(FaceView const& mesh, unsigned int face, float3 const& mean, float3 const* position)
@@ -118,7 +118,7 @@ namespace {
         {
         }
 
-        /// For a point that is corner k only: the triangles of the edges before and after it, in ascending order.
+        /// For a point that is at corner k only: the triangles of the edges before and after it, in ascending order.
         void addAround(unsigned int k, PointSums& sums) const
         {
             unsigned int const before = k == 0 ? size_ - 1 : k - 1;
@@ -127,7 +127,7 @@ namespace {
                 addTriangle(std::max(before, k), sums);
         }
 
-        /// For a point that may be several corners.
+        /// For a point that may be at several corners.
         void addAllAt(unsigned int point, PointSums& sums) const
         {
             for (unsigned int k = 0; k != size_; ++k)

@@ -67,8 +67,9 @@ namespace {
         return kNoEdge;
     }
 
-    /// Adds the mean value weights of a point off the edges to `weights`, and normalizes these. \return how many of
-    /// them are below `kLowestWeight`
+    /// Adds the mean value weights of a point off the edges to `weights`, and normalizes them: in triangles with the
+    /// angles α and β at the point, a corner at distance r has the weight 2 (tan(α / 2) + tan(β / 2)) / r.
+    /// \return how many weights are below `kLowestWeight`
     unsigned int weighCorners(unsigned int polySize, float areaTol, CornerView const* corners, float* weights)
     {
         float sum = 0;

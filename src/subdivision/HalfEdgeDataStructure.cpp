@@ -37,11 +37,11 @@ namespace {
         return last <= faceVertex.size && areBelow(pointCount, faceVertex.data + first, last - first);
     }
 
-    /// How faces are divided into blocks, and points into buckets. Directed edges are first sorted into the bucket of
-    /// the point at which they end, in the order of their corners, and then by point within the bucket. So each step
-    /// writes to few places at a time, however the points are numbered.
+    /// How faces are divided into blocks, and points into buckets, for a bucket sort. Directed edges are first sorted
+    /// into the bucket of the point at which they end, in the order of their corners, and then by point within the
+    /// bucket. So each step writes to few places at a time, however the points are numbered.
     struct Layout {
-        unsigned int bucketBits; // points in the same bucket differ only in that many low bits of their number
+        unsigned int bucketBits; // points in the same bucket differ only in these low bits of their number
         std::size_t bucketCount;
         std::size_t facesPerBlock;
         std::size_t blockCount;
@@ -115,7 +115,7 @@ namespace {
     /// Sorts the edges that end at one point.
     void sortEdges(std::uint64_t* first, std::uint64_t* last)
     {
-        constexpr std::ptrdiff_t kFew = 32;
+        constexpr std::ptrdiff_t kFew = 32; // up to here, insertion sort is faster
         if (last - first > kFew)
             return std::sort(first, last);
         for (std::uint64_t* next = first; next != last; ++next) {
@@ -165,8 +165,8 @@ namespace {
         std::vector<std::uint64_t> copy_;
     };
 
-    /// Lists the directed edges by the points at which they end, ascending. \return whether two have the same start and
-    /// end
+    /// Lists the directed edges by the points at which they end, ascending.
+    /// \return whether two edges have the same start and end
     bool listEdges(
         Faces const& faces, unsigned int pointCount, unsigned int* offset, Orvan::Array<std::uint64_t>& entries)
     {

@@ -22,8 +22,8 @@ namespace {
 
     constexpr unsigned int kCancelPlace = 4; // the host's number for this loop
 
-    /// The new state of a face, from its own state and those of its neighbors. Bits are only ever set, so the sweeps come
-    /// to an end.
+    /// The new state of a face, from its own state and those of its neighbors. Bits are only ever set, so the sweeps
+    /// terminate.
     unsigned char settledState(
         unsigned char state, std::array<unsigned int, 3> const& across, unsigned char const* states)
     {
@@ -36,13 +36,14 @@ namespace {
             unsigned char const other = states[neighbor];
             unsigned int const otherLevel = levelOf(other);
             lowestLevel = std::min(lowestLevel, otherLevel);
-            // A whole face follows finer neighbors only; a third has to flip together with the face at its gate.
+            // A whole face takes over the marks of finer neighbors only; a third must flip together with the face at
+            // its gate.
             if (isMarked(other) && (isThird(state) ? otherLevel != level : level < otherLevel))
                 marked = 1;
             if (isSplit(other) && isThird(state) && otherLevel < level)
                 split = 1;
         }
-        // A whole face waits for coarser neighbors, which have taken over its mark by now.
+        // A whole face waits for coarser neighbors, which take over its mark by the rule above.
         if (!isThird(state) && marked && level <= lowestLevel)
             split = 1;
         return static_cast<unsigned char>(level << 2 | split << 1 | marked);
@@ -60,12 +61,12 @@ namespace {
         TSR::Canceller::cancelID(place);
     }
 
-    /// The sweeps of one pass. A sweep visits only faces that may change, and looks up the neighbors of these alone: most
-    /// passes affect few of the faces.
+    /// The sweeps of one pass. A sweep visits only faces that may change, and looks up the neighbors of these alone:
+    /// most passes affect few of the faces.
     class Balance {
     public:
-        /// \param areMutual  whether each face is a neighbor of its neighbors. If not, a face whose state changes cannot
-        ///                   tell which faces read it, so each sweep visits all faces.
+        /// \param areMutual  whether each face is a neighbor of its neighbors. If not, a face whose state changes
+        ///                   cannot tell which faces read it, so each sweep visits all faces.
         Balance(HalfEdgeDataStructure const& halfEdges, bool areMutual, unsigned int faceCount,
             unsigned int const* faceVertex, unsigned int const* faceOffset, unsigned char* states)
             : halfEdges_(halfEdges)
@@ -99,7 +100,7 @@ namespace {
         {
             std::atomic<bool> isChanged = false;
             // Each face reads the states of the previous sweep and writes its own; any of them may set flags, which are
-            // read after the loop.
+            // read after the loop. The loop is not isolated, so that it checks for cancellation of the job.
             parallelFor(
                 tbb::blocked_range<unsigned int>(0, faceCount_, kFaceGrain),
                 [&, this](auto const& faces) {
@@ -180,7 +181,7 @@ namespace {
         FaceAdjacency neighbors_;
     };
 
-    /// True if all faces are triangles and no directed edge is repeated, as on closed manifolds.
+    /// True if all faces are triangles and no directed edge is repeated, as on closed manifolds; judged by the counts.
     bool areNeighborsMutual(
         HalfEdgeDataStructure const& halfEdges, unsigned int faceCount, Orvan::Array<unsigned int> const& faceOffset)
     {

@@ -6,8 +6,8 @@
 
 namespace Geometry::Mesh::Internal {
 
-/// Whether some side of the triangle's axis-aligned box is longer than `length`, a value >= 0 in all lanes. A difference
-/// that is NaN counts as 0.
+/// Whether some side of the triangle's axis-aligned bounding box is longer than `length`, which is the same in all
+/// lanes and not negative. A difference of coordinates that is NaN counts as 0.
 inline bool isBoxLonger(Tessara::Math::float3 const& a, Tessara::Math::float3 const& b, Tessara::Math::float3 const& c,
     Modeling::Lanes length)
 {

@@ -34,24 +34,24 @@ constexpr bool isSplit(unsigned char state)
 {
     return state & kSplitBit;
 }
-/// A third of a split face. The edge that is still to flip is its gate.
+/// Whether the face is a third of a split face. Its edge that is still to flip is called its gate.
 constexpr bool isThird(unsigned char state)
 {
     return levelOf(state) & 1;
 }
-/// Whether the face gets a point in its middle.
+/// Whether the face gets a new point at its center.
 constexpr bool isSplitAroundPoint(unsigned char state)
 {
     return isSplit(state) && !isThird(state);
 }
 
-/// The finest level. A face of this level is never marked: its replacements would have levels 63 and 64, and six bits hold
-/// at most 63.
+/// The finest level. A face of this level is never marked: its replacements would have levels 63 and 64, and six bits
+/// hold at most 63.
 ///
-/// No face exceeds it, even on non-manifold meshes. New faces come from marked faces of even level, at most two levels up.
-/// Neighbors do not mark a face of this level either, because only a finer neighbor marks a face of even level. So it is
-/// like any face without a request: a pass stays balanced and closed for all sets of marks. No other face waits for it,
-/// since faces wait for coarser neighbors only.
+/// No face exceeds it, even on non-manifold meshes. New faces come from marked faces of even level, at most two levels
+/// up. Neighbors do not mark a face of this level either, because only a finer neighbor marks a face of even level. So
+/// it is like any face without a request: a pass stays balanced and closed for all sets of marks. No other face waits
+/// for it, since faces wait for coarser neighbors only.
 inline constexpr unsigned int kFinestLevel = 62;
 
 constexpr bool canTakeMark(unsigned char state)
@@ -64,10 +64,10 @@ constexpr unsigned char stateOfLevel(unsigned int level)
     return static_cast<unsigned char>(level << 2);
 }
 
-/// Spreads requests until neighbors agree on which faces split in this pass. The only place that checks for cancellation:
-/// at the end of each sweep over the faces.
-/// \return the neighbors of all faces that split. Entries of other faces may be uninitialized, and the array is empty if
-///         no face is requested.
+/// Spreads requests until neighbors agree on which faces split in this pass. The only place that checks for
+/// cancellation: at the end of each sweep over the faces.
+/// \return the neighbors of all faces that split. Entries of other faces may be uninitialized, and the array is empty
+///         if no face is requested.
 /// \throws std::runtime_error  if the job is cancelled; `faceStates` may then be partly balanced
 Modeling::FaceAdjacency balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,

@@ -18,8 +18,9 @@ namespace Internal {
 
     namespace {
 
-        // One step moves a point p of valence n to (1 - β) p + β m, where m is the mean of its neighbors. This reduces its
-        // distance to its limit by the factor λ; γ is the weight of m in the limit itself.
+        // One step moves a point p of valence n to (1 - β) p + β m, where m is the mean of its neighbors and β the
+        // `smoothingWeight`. This multiplies its distance to its limit by λ = 2/3 - β. The limit is (1 - γ) p + γ m,
+        // where γ is the `limitWeight`. Both take the cosine of 2π / n.
 
         float smoothingWeight(float cosine)
         {
@@ -37,8 +38,8 @@ namespace Internal {
             return std::cos(6.2831855f / valence);
         }
 
-        /// λ to the power of a number of steps. For a point that is younger than the step in question the number is
-        /// negative and wraps around: λ is below 1/2, so the power is 0, and the point is at its limit.
+        /// λ to the power of a number of steps. If the point is younger than the step in question, the number is
+        /// negative and wraps around. As λ is below 1/2, the power is then 0: the point is at its limit.
         float remainingWeight(std::uint64_t valence, unsigned int steps)
         {
             constexpr unsigned int kWrapped = 1u << 31;
@@ -57,6 +58,7 @@ namespace Internal {
             float3 const* limitPositions;
             unsigned char const* levels;
 
+            /// The position a number of steps after the point was created.
             float3 after(unsigned int point, unsigned int steps) const
             {
                 float const weight = remainingWeight(halfEdges.valence(point), steps);
@@ -81,7 +83,7 @@ namespace Internal {
         }
 
         /// The sum of the one-ring that a new point will have after its step: the corners of its face and, across each
-        /// edge, the middle of the neighbor or, if that is a third, the point across its gate.
+        /// edge, the center of the neighbor or, if that is a third, its corner opposite the gate.
         float3 sumOfFutureNeighbors(SettledFaces const& faces, PointsInTime const& points, unsigned int face)
         {
             unsigned int const step = stepOf(faces.states[face]);
@@ -95,15 +97,15 @@ namespace Internal {
                 if (isThird(faces.states[across]))
                     sum = sum + points.at(faces.pointAcross(face, k), step);
                 else if (splitsAtStep(faces.states[across], step))
-                    sum = sum + points.basePositions[faces.newPoint(across)]; // the same middle
+                    sum = sum + points.basePositions[faces.newPoint(across)]; // the same center
                 else
                     sum = sum + points.center(faces.corners(across), step);
             }
             return sum;
         }
 
-        /// γ for valence 6, which all new points have. The cosine is computed at run time, like all others: compilers
-        /// round it differently.
+        /// γ for valence 6, which all new points have. The cosine is computed at run time, like all others, because
+        /// compilers round constants differently.
         float limitWeightOfNewPoint()
         {
             float const volatile sector = 1.0471976f;
@@ -131,6 +133,7 @@ namespace Internal {
                 points.center(faces.corners(face), stepOf(faces.states[face]));
         });
 
+        // Limit positions need the base positions of adjacent new points, so they take a second loop.
         float const weight = limitWeightOfNewPoint();
         forEachSplitFace(faces, [&](unsigned int face) {
             unsigned int const* const c = faces.corners(face);

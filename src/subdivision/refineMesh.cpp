@@ -19,7 +19,7 @@ using Tessara::Math::float3;
 
 namespace {
 
-    /// The arrays of a run. The object keeps its own ones until the end.
+    /// The arrays of a run. The object keeps its own arrays until the end.
     struct RefinedMesh {
         unsigned int numPoints = 0;
         unsigned int numFaceVertices = 0;
@@ -33,7 +33,7 @@ namespace {
         Orvan::Array<unsigned char> faceStates;
     };
 
-    /// Returns nullopt if an array is missing.
+    /// nullopt if an array is missing.
     std::optional<RefinedMesh> readMesh(Tessara::Object const& object)
     {
         MeshArrays const original = readMeshArrays(object);
@@ -68,7 +68,7 @@ namespace {
 
     void rebuild(HalfEdgeDataStructure& halfEdges, RefinedMesh& mesh)
     {
-        // Release what is no longer needed first: together it is a third of the memory in use.
+        // First release what is no longer needed: a third of the memory in use.
         halfEdges.clear();
         mesh.positions = {};
         HalfEdgeDataStructure rebuilt(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
@@ -92,11 +92,12 @@ namespace {
             unsigned int const facesBefore = mesh.numFaces, pointsBefore = mesh.numPoints;
             refineFaces(markFaces, halfEdges, mesh, object);
             hasMore = mesh.numFaces != facesBefore;
-            // As many points and as many faces: no face has split, and nothing has changed since the pass before.
+            // The counts are the same: no face has split, and nothing has changed since the pass before.
             bool const isUnchanged = !hasMore && mesh.numPoints == pointsBefore;
             if (!isUnchanged)
                 rebuild(halfEdges, mesh);
             MODELING_ASSERT(!isClosed || isClosedAndBalanced(halfEdges, mesh));
+            // Also if the first pass splits nothing: points without a face become NaN in all cases.
             if (!isUnchanged || isFirst)
                 computePositions(halfEdges, mesh.numPoints, mesh.basePositions, mesh.limitPositions, mesh.vertexLevels,
                     mesh.faceStates, mesh.positions);

@@ -33,8 +33,8 @@ namespace {
         });
     }
 
-    /// Which faces are kept, and how many new faces and points there are: entry f of each array counts those of the faces
-    /// before f, and the last entry is the total.
+    /// Which faces are kept, and how many new faces and points there are: entry f of each array counts those of the
+    /// faces before f, and the last entry is the total.
     struct Numbering {
         IndexArray newPointOffsets;
         IndexArray keptFaceOffsets;
@@ -47,7 +47,8 @@ namespace {
         unsigned int emittedCount() const { return emittedOffsets[emittedOffsets.size - 1]; }
     };
 
-    /// Calls `emit(a, b, c, level)` for the triangles that replace a face that splits around its new point, in their order.
+    /// Calls `emit(a, b, c, level)` for the triangles that replace a face that splits around its new point, in edge
+    /// order.
     template <class Emit> void replaceFace(SettledFaces const& faces, unsigned int face, Emit const& emit)
     {
         unsigned int const level = levelOf(faces.states[face]);
@@ -69,7 +70,7 @@ namespace {
             } else if (levelOf(other) == level) {
                 // The edge flips; each of the two faces emits the side of its own corner a.
                 emit(a, faces.newPoint(across), center, level + 2);
-            } // Nothing beside a coarser face: in a balanced mesh there is none here.
+            } // Nothing next to a coarser face: a balanced mesh has none here.
         }
     }
 
@@ -115,7 +116,7 @@ namespace {
         IndexArray faceOffset;
         Orvan::Array<unsigned char> states;
 
-        /// The faces are uninitialized.
+        /// All entries are uninitialized except the first offset.
         static FaceArrays ofSize(unsigned int faceCount, unsigned int cornerCount)
         {
             FaceArrays arrays{uninitializedArray<unsigned int>(cornerCount),
@@ -133,7 +134,8 @@ namespace {
         unsigned int const cornerEnd = numbering.keptCornerOffsets[face + std::uint64_t{1}];
         unsigned int const number = numbering.keptFaceOffsets[face];
         std::copy_n(faces.corners(face), 3, refined.faceVertex.data + corner);
-        // Further corners of a polygon are not copied: those that were at this place remain.
+        // Only triangles are supported: instead of the further corners of a polygon, the entries that were at these
+        // indices are kept.
         for (unsigned int further = corner + 3; further < cornerEnd; ++further)
             refined.faceVertex[further] = faces.faceVertex[further];
         refined.faceOffset[number + std::uint64_t{1}] = cornerEnd;

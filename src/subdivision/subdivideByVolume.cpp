@@ -20,7 +20,7 @@ using TSR::TileTree3D::Traits5;
 
 namespace {
 
-    /// The mean of each point taken three times, whose rounding is part of the results.
+    /// Writes (p + p + p) / 3 for each point p: results depend on its rounding.
     void writeMeans(float3 const* points, std::size_t count, float3* means)
     {
         float const* const coordinate = &points->x;
@@ -29,7 +29,7 @@ namespace {
             mean[n] = (0 + coordinate[n] + coordinate[n] + coordinate[n]) / 3.0f;
     }
 
-    /// The limit on the sides of a face's box; infinite if the tolerance is too small.
+    /// The limit on the sides of a face's bounding box; infinite if the tolerance is too small or NaN.
     float longestSide(float tolerance)
     {
         constexpr float kNoLimit = std::numeric_limits<float>::infinity();
@@ -60,7 +60,7 @@ namespace {
         }
     };
 
-    /// A face has the limit of its second corner, not of its middle: existing scenes depend on it.
+    /// A face has the limit of its second corner, not of its center: existing scenes depend on it.
     void markFaces(float const* limit, unsigned int faceCount, float3 const* position, unsigned int const* corner,
         unsigned int const* offset, bool* mark)
     {

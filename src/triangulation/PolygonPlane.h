@@ -12,8 +12,8 @@
 
 namespace Modeling::Internal {
 
-// The measurements of ear clipping: the plane of a polygon, and the sharpness of a corner. Inline because they run per
-// corner.
+// The measurements of ear clipping: the plane of a polygon, and the sharpness of a corner. They are inline because they
+// are called per corner.
 
 using Tessara::Math::float2;
 
@@ -47,7 +47,7 @@ inline Quaternion rotationToZ(float3 const& normal)
 {
     float const w = normal.z + 1;
     if (kUpsideDown > w)
-        return {normal.z, -normal.y, normal.x, 0}; // a half-turn; not normalized, because results depend on it
+        return {normal.z, -normal.y, normal.x, 0}; // a half-turn; not normalized: results depend on it
     float const norm = std::sqrt((normal.y * normal.y + normal.x * normal.x) + w * w);
     return {normal.y / norm, -normal.x / norm, 0, w / norm};
 }
@@ -76,7 +76,7 @@ inline std::optional<Quaternion> findPlane(std::span<float3 const> corners)
 }
 
 /// The sharpness of a corner, from the unit vectors along the edges that enter and leave it: 1 minus the cosine of the
-/// inner angle in space. 0 for a needle, 2 for a straight line.
+/// inner angle in space. Less is sharper: 0 for a needle, 2 for a straight line.
 inline float sharpnessBetween(float3 const& entering, float3 const& leaving)
 {
     // The direction back to the previous corner is minus `entering`, to the bit.
@@ -85,8 +85,8 @@ inline float sharpnessBetween(float3 const& entering, float3 const& leaving)
     return atMost2 > 0.0f ? atMost2 : 0.0f;
 }
 
-inline constexpr float kNoEar = std::numeric_limits<float>::infinity(); // the sharpness of corners that are no ears
-inline constexpr float kSharper =
-    0.0001f; // an ear must be sharper by more than this to precede one with a lower number
+inline constexpr float kNoEar = std::numeric_limits<float>::infinity(); // the sharpness of corners that are not ears
+/// A later ear must be sharper than an earlier one by more than this to be cut first.
+inline constexpr float kSharper = 0.0001f;
 
 }

@@ -41,7 +41,7 @@ namespace {
         return positions;
     }
 
-    /// For each corner the unit vector along its edge to the next corner.
+    /// For each corner, the unit vector along the edge to the next corner.
     QuadVectors directionsOf(QuadVectors const& positions)
     {
         QuadVectors directions;
@@ -68,7 +68,7 @@ namespace {
         return isCounterClockwise(a, b, c) && !pointInTriangle(projected[opposite(corner)], a, b, c, u, v, w, nullptr);
     }
 
-    /// The sharpest ear; of ears that are about equally sharp, one with a low number.
+    /// The sharpest ear, up to `kSharper` in favor of earlier ones; `kNone` if there is none.
     unsigned int sharpestOf(float const* sharpness)
     {
         unsigned int best = kNone;
@@ -101,8 +101,8 @@ bool cutQuad(std::span<float3 const, 4> corners, Quaternion const& rotation, std
     if (ear == kNone)
         return false;
 
-    // The remaining triangle is written from its own sharpest ear. The corner opposite the first ear has kept its
-    // neighbors.
+    // The remaining triangle starts before its own sharpest ear. The corner opposite the first ear has kept its
+    // neighbors, so its sharpness still holds.
     unsigned int const before = previous(ear);
     unsigned int const after = next(ear);
     unsigned int const across = opposite(ear);

@@ -24,12 +24,12 @@ namespace {
 
     struct Triangulation {
         IndexArray triangleOffset; // the first triangle of each face, and the end of the last one
-        IndexArray sourceCorner; // for each corner of the triangles, the corner of the mesh that it was
+        IndexArray sourceCorner; // for each corner of the triangles, the corner of the mesh that it comes from
 
         unsigned int triangleCount() const { return triangleOffset.data[triangleOffset.size - 1]; }
     };
 
-    /// nullopt if an array is missing or shorter than its count says. The arrays stay readable while the object
+    /// nullopt if an array is missing or shorter than its count says. The arrays remain readable while the object
     /// receives the new ones.
     std::optional<MeshArrays> readPolygonMesh(Tessara::Object const& object)
     {
@@ -48,7 +48,7 @@ namespace {
         return OffsetView(*mesh.faceOffset).sizeWithin(mesh.faceVertex->size, face);
     }
 
-    /// Cuts one face: `source` receives, for each corner of its triangles, the corner of the mesh that it was.
+    /// Cuts one face: `source` receives, for each corner of its triangles, the corner of the mesh that it comes from.
     void cutFace(
         MeshArrays const& mesh, unsigned int face, std::span<unsigned int> source, Internal::PolygonStorage& storage)
     {
@@ -144,7 +144,7 @@ namespace {
 
     void writeTriangles(MeshArrays const& mesh, Triangulation const& triangulation, PreparedWrites& writes)
     {
-        MeshArrays triangles; // points stay as they are
+        MeshArrays triangles; // without points, which are kept
         triangles.faceCount = triangulation.triangleCount();
         triangles.cornerCount = 3 * triangles.faceCount;
         triangles.faceOffset = Orvan::makePtr<IndexArray>(offsetsOfTriangles(triangles.faceCount));
@@ -165,8 +165,8 @@ namespace {
         }
     };
 
-    /// Adds the transferred array of a data property to the changes. \return false if the property is no data of a core
-    /// type
+    /// Adds the transferred array of a data property to the changes. \return false if the property is not data of a
+    /// core type
     bool transferData(
         Orvan::String const& name, Transfer const& transfer, Tessara::Object const& mesh, PreparedWrites& writes)
     {

@@ -70,7 +70,7 @@ namespace {
                 triangles[3 * triangle + 1] = ear;
                 triangles[3 * triangle + 2] = next;
                 clip(ear);
-                // The neighbors of all other ears have not changed, so they still are ears.
+                // All other ears have kept their neighbors, so they are still ears.
                 testEar(previous);
                 testEar(next);
             }
@@ -163,7 +163,7 @@ namespace {
             return false;
         }
 
-        /// The sharpest ear; of ears that are about equally sharp, one with a low number.
+        /// The sharpest ear, up to `kSharper` in favor of earlier ones; `kInvalidIndex` if there is none.
         unsigned int nextEar()
         {
             unsigned int best = kInvalidIndex;

@@ -13,13 +13,14 @@
 
 namespace TSR::TileTree3D::Internal {
 
-/// A tile that rows have looked up, found by its lower corner and the depth that was asked for.
+/// A tile that rows have looked up, found by the lower corner and the depth that were requested.
 template <class Traits> struct KnownTile {
     IJK index{};
     int depth = -1;
     typename Container<Traits>::TileType tile; // a copy, as repeated tiles are not stored; may be a coarser one
     bool hasData = false;
-    // Of a tile of that depth: its own, and those with the layer that samples read, null until they are built.
+    // 0: the tile's own values. 1: those with the layer around it, null until they are built. Both are null if the tile
+    // is coarser than `depth`.
     float const* values[2] = {};
 
     bool isOf(IJK asked, int askedDepth) const noexcept
@@ -28,16 +29,16 @@ template <class Traits> struct KnownTile {
     }
 };
 
-/// Tiles by the upper bits of a hash; a new one replaces the one before. The table is small, because each task of a
-/// parallel loop sets one up.
+/// Tiles by the upper bits of a hash; a new tile replaces the one with the same bits. The table is small because each
+/// task of a parallel loop sets one up.
 template <class Traits> struct KnownTiles {
     static constexpr int kBits = 9;
     static constexpr std::size_t kCapacity = std::size_t{1} << kBits;
     static_assert(kCapacity >= PointRow::kCapacity);
 
     std::array<KnownTile<Traits>, kCapacity> tiles;
-    // Rows read halos in place, so none may be replaced within a row: if there is no room for as many as a row may need,
-    // all are dropped before it. One of the two stays empty.
+    // Rows read halos in place, so none may be replaced within a row: if there is no room for as many as a row may
+    // need, all are dropped before it. One of the two stays empty.
     std::deque<PositiveHalo<Traits>> positiveHalos;
     std::deque<FullHalo<Traits>> fullHalos;
     std::size_t haloCount = 0;

@@ -14,7 +14,7 @@ namespace {
     /// The lower side of the tile that contains a coordinate. \param perWidth  1 / width, perhaps rounded
     Lanes tileBegin(Lanes p, Lanes width, Lanes perWidth)
     {
-        Lanes const round = broadcast(0x1.8p23f); // adding it rounds the fraction away
+        Lanes const round = broadcast(0x1.8p23f); // adding and subtracting it rounds to the nearest integer
         Lanes const nearest = (p * perWidth + round - round) * width;
         return nearest - selectOrZero(nearest > p, width);
     }
@@ -47,7 +47,7 @@ namespace {
         Lanes voxel, fraction;
     };
 
-    /// Cuts places in a tile into voxel, at least -1, and fraction.
+    /// Divides places in a tile into voxel, at least -1, and fraction.
     template <bool canBeBelow> Coordinates coordinatesOf(Lanes place, Lanes lastVoxel)
     {
         Lanes const inside = min(max(place, Lanes{}), lastVoxel);

@@ -7,8 +7,8 @@
 #include <cstdint>
 
 /// Samples a row of points in phases that take four points at a time: where the points are, which of them share a tile,
-/// and their values. Finding the tiles is left to the caller, before the last phase: how many points follow one another
-/// in a tile is unpredictable, and a phase of its own keeps those branches out of the others.
+/// and their values. The caller finds the tiles before the last phase: how many consecutive points share a tile is
+/// unpredictable, and a separate phase keeps those branches out of the others.
 namespace TSR::TileTree3D::Internal {
 
 struct PointRow {
@@ -21,8 +21,8 @@ struct PointRow {
     float tileX[kFirstTile + kCapacity], tileY[kFirstTile + kCapacity], tileZ[kFirstTile + kCapacity];
 
     // Consecutive points in one tile are a run.
-    std::uint32_t run[kCapacity]; // of each point
-    std::uint32_t last[kCapacity]; // point of each run
+    std::uint32_t run[kCapacity]; // the number of each point's run
+    std::uint32_t last[kCapacity]; // the number of the last point of each run
     std::uint32_t needsLayer[kCapacity]; // of each run: 1 if some point reads voxels of other tiles, else 0
     float const* values[kCapacity]; // that each run reads, at voxel (0, 0, 0)
     std::uint32_t open[kCapacity]; // runs whose tiles are still to be found
@@ -46,7 +46,7 @@ struct Placing {
 
 /// The widest tiles that points are placed in.
 constexpr float kWidestTile = 0x1p23f;
-/// A larger one would place points below the layer around a tile.
+/// A larger offset would place points below the layer around a tile.
 constexpr float kLargestOffset = 1;
 
 constexpr float kBelowTile = 1e-5f; // voxels; how far rounding can put a point below the tile that contains it
@@ -69,7 +69,7 @@ std::size_t findRuns(std::size_t count, PointRow& row);
 void findLayers(std::size_t count, float begin, float end, PointRow& row);
 
 /// Blends the values of all points.
-/// \tparam onlySide  The side of all arrays if no place is below its tile; 0 to read `arrays.side`, for all places.
+/// \tparam onlySide  The side of all arrays, if no place is below its tile; otherwise 0, which reads `arrays.side`.
 template <int onlySide>
 void interpolateRow(std::size_t count, TileArrays const& arrays, PointRow const& row, float* values);
 

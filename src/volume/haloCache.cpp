@@ -6,7 +6,7 @@ namespace TSR::TileTree3D::Internal {
 
 namespace {
 
-    /// The distance at which the neighbors of a tile are looked up, in index units. It does not change with the depth.
+    /// The distance at which the neighbors of a tile are looked up, in index units. It does not depend on the depth.
     template <class Traits> constexpr int kNeighborStep = 0;
     template <> constexpr int kNeighborStep<Traits2> = 2;
     template <> constexpr int kNeighborStep<Traits5> = 5;
@@ -18,8 +18,8 @@ namespace {
         return tile.depth != 0 && tile.parent >= 0 && tile.depth > state.coarsestDepth;
     }
 
-    /// The data of the tiles of this depth at a fixed distance, which makes a wider tile its own upper neighbor: existing
-    /// volumes depend on it.
+    /// The data of the tiles of this depth at a fixed distance, which makes a wider tile its own upper neighbor:
+    /// existing volumes depend on it.
     template <class Traits>
     TilesAround<Traits> tilesAround(LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile)
     {

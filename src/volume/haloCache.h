@@ -9,7 +9,8 @@
 #include <algorithm>
 #include <cstdint>
 
-/// Layers around tiles: how they are filled, and the last one of each depth, which single samples read.
+/// Halos (copies of tiles with a layer of voxels around them): how they are filled, and a cache of the last one of each
+/// depth, which single samples read.
 namespace TSR::TileTree3D::Internal {
 
 inline int clampedIndex(std::int64_t index)
@@ -17,12 +18,13 @@ inline int clampedIndex(std::int64_t index)
     return static_cast<int>(std::clamp<std::int64_t>(index, INT32_MIN, INT32_MAX));
 }
 
-/// Fills the layer from the volume. A tile whose parent has data needs the parent's layer, which is put into the caches.
+/// Fills the halo of a tile from the volume. A tile whose parent has data needs the parent's halo, which is cached.
 template <class Traits> void fillHalo(
     LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, PositiveHalo<Traits>& halo);
 template <class Traits> void fillHalo(
     LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, FullHalo<Traits>& halo);
 
+/// The slot of the halo with a key; `kNoSlot` if it is not cached.
 template <class Traits, class Cache>
 std::uint32_t findHalo(LinearSamplerState<Traits>& state, std::uint64_t key, int depth, Cache& cache)
 {
@@ -36,6 +38,7 @@ std::uint32_t findHalo(LinearSamplerState<Traits>& state, std::uint64_t key, int
     return state.lastSlot[slot] = slot;
 }
 
+/// Builds the halo of a tile in place of the last one of its depth. \return its slot
 template <class Traits, class Cache> std::uint32_t buildHalo(
     LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, Cache& cache)
 {
@@ -50,7 +53,8 @@ template <class Traits, class Cache> std::uint32_t buildHalo(
     return state.lastSlot[number] = number;
 }
 
-/// The tile with its layer. \param cache  one of the two of `state`
+/// The halo of a tile, built unless it is cached.
+/// \param cache  one of the two of `state`
 template <class Traits, class Cache>
 auto const& haloOf(LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, Cache& cache)
 {

@@ -15,8 +15,9 @@ template <class Traits> using TileValues = ConstTileData<float, Traits::kSide, 0
 /// The tile itself and those around it, x fastest: (dx + 1) + (dy + 1) * 3 + (dz + 1) * 9.
 template <class Traits> using TilesAround = std::array<TileValues<Traits>, 27>;
 
-/// For a tile without neighbors or parent: along axes with a clear bit of `offsetType`, the layer mirrors the tile at
-/// `background`. Along axes with a set bit it is `background`, and so is the tile's own layer at 0.
+/// For a tile without parent values, whose neighbors are ignored: along axes with a clear bit of `offsetType`, the
+/// layer mirrors the tile at `background`. Along axes with a set bit it is `background`, and so is the tile's own first
+/// layer.
 template <class Traits>
 void fillHaloFromTile(unsigned int offsetType, float background, TileValues<Traits> tile, FullHalo<Traits>& out);
 

@@ -14,7 +14,8 @@ inline float blend(float from, float to, float fraction)
     return (to - from) * fraction + from;
 }
 
-/// Blends the eight values from voxel (i, j, k) on in an array of `side`³ values, along x, then y, then z.
+/// Trilinear interpolation between the eight values from voxel (i, j, k) to (i + 1, j + 1, k + 1) of an array of
+/// `side`³ values: along x, then y, then z.
 template <int side> inline float interpolate(float const* values, int i, int j, int k, float3 const& fraction)
 {
     constexpr int kNextRow = side, kNextLayer = side * side;
@@ -32,7 +33,7 @@ template <int side> inline float interpolateFromFirst(float const* values, IJK v
     return interpolate<side>(values, std::max(voxel.i, 0), std::max(voxel.j, 0), std::max(voxel.k, 0), fraction);
 }
 
-/// The position of voxel (0, 0, 0) in an array of `side`³ values with a layer all around.
+/// The index of voxel (0, 0, 0) in an array of `side`³ values that includes a layer all around.
 constexpr int firstInLayer(int side)
 {
     return 1 + (1 + side) * side;

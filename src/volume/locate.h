@@ -18,7 +18,7 @@ struct Place {
     float3 fraction;
 };
 
-/// A coordinate in a tile, cut into voxel and fraction.
+/// A coordinate in a tile, divided into voxel and fraction.
 struct Coordinate {
     int voxel;
     float fraction;
@@ -29,7 +29,7 @@ inline bool fitsIndex(float coordinate)
     return coordinate >= -0x1p31f && coordinate < 0x1p31f;
 }
 
-/// Rounds down, without a call of `floor`.
+/// Rounds down, without calling `floor`.
 inline int indexOf(float coordinate)
 {
     int const towardsZero = static_cast<int>(coordinate);
@@ -40,7 +40,7 @@ inline int indexOf(float coordinate)
 /// wrong offset points, so nothing in front of the tile's data is read.
 template <int side> inline Coordinate coordinateOf(float value)
 {
-    if (value >= 0) [[likely]] { // no call of `floor`: it would be most of the cost of a sample
+    if (value >= 0) [[likely]] { // calling `floor` would be most of the cost of a sample
         int const voxel = static_cast<int>(std::min(value, static_cast<float>(side - 1)));
         return {voxel, value - static_cast<float>(voxel)};
     }
@@ -86,7 +86,7 @@ template <class Traits> inline float3 distanceFromTile(TileCursor<Traits> const&
     return {distance(p.x, cursor.tile->i), distance(p.y, cursor.tile->j), distance(p.z, cursor.tile->k)};
 }
 
-/// Finds the place of a point. If no tile contains it, the cursor is in none, and the place means nothing.
+/// Finds the place of a point. If no tile contains it, the cursor is in none, and the place is meaningless.
 /// \param isWorldPoint  whether the point is in units of length, not in index units
 /// \pre                 depth <= kDeepest
 template <class Traits>

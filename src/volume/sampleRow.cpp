@@ -32,7 +32,7 @@ namespace {
                 state.knownTiles = std::make_unique<KnownTiles<Traits>>();
         }
 
-        /// Gives each run its values. Known tiles come first, without an unpredictable branch.
+        /// Finds the values that each run reads. Known tiles come first, without an unpredictable branch.
         /// \return  the number of runs whose tiles hold no data
         std::size_t findTiles(std::size_t runCount)
         {
@@ -87,7 +87,7 @@ namespace {
             return known;
         }
 
-        /// Places the points of a run in a coarser tile than the one that was asked for.
+        /// Places the points of a run in a tile that is coarser than requested.
         void placeInTile(std::size_t run, TileType const& tile)
         {
             constexpr int kSide = Traits::kSide;
@@ -162,6 +162,7 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
         return false;
     std::size_t const runCount = findRuns(count, row);
     bool const isPadded = state.haloChannel, isPositive = isPadded || state.hasPositiveHalos();
+    // If layers are on the upper sides only, places below the tile read its first voxels.
     if (!isPadded)
         findLayers(count, isPositive ? -kLargestOffset : 1, kSide - 1, row);
     std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
@@ -169,6 +170,7 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
     MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);
     int const padded = kSide + (isPositive ? 1 : 2);
     TileArrays const arrays{{isPadded ? padded : kSide, padded}, isPositive ? 0 : -1, kSide - 1};
+    // No place is below its tile if no offset is positive.
     if (isPadded && largestCoordinate(settings.voxelOffset) <= 0)
         interpolateRow<kSide + 1>(count, arrays, row, values);
     else

@@ -64,7 +64,7 @@ private:
         }
         std::ranges::set_intersection(ringA, ringB, std::inserter(shared, shared.end()));
         float3 const middle = (points_[a] + points_[b]) * 0.5f;
-        // Each ring holds both ends too: two more shared points, and not both ends of valence 3.
+        // Each ring contains both ends too, so that two common neighbors make four shared points.
         bool const keepsLink = shared.size() == 4 && (ringA.size() != 4 || ringB.size() != 4);
         if (!keepsLink
             || !std::ranges::all_of(around, [&](unsigned int f) { return keepsOrientation(f, a, b, middle); }))
@@ -189,8 +189,8 @@ TEST(RemoveSlivers, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
     };
     static float const kScales[] = {1, 1, 1e6f, 1e-18f};
     Random random(1);
-    for (unsigned int run = 0; run != 60;
-         ++run) { // zero dot products, from right angles on a lattice and from underflow
+    // Zero dot products, from right angles on a lattice and from underflow.
+    for (unsigned int run = 0; run != 60; ++run) {
         MeshBuilder& mesh = meshes["lattice " + std::to_string(run)] = MeshBuilder::sphere(2);
         for (float3& p : mesh.points)
             p = float3{std::floor(2 * random.coordinate()), std::floor(2 * random.coordinate()),
@@ -267,8 +267,8 @@ TEST(RemoveSlivers, survivesSoupsAndPositionsThatAreNotFinite)
 TEST(RemoveSlivers, staysLinearAroundAHub)
 {
     EXPECT_LT(countsOf(*withoutSlivers(MeshBuilder::bipyramid(100'000), 0.1f)).faces, 200'000);
-    // The short edges end at the hubs. A walk around a hub for each of them would take hours: one collapse joins the hubs,
-    // after which their other spokes share too many neighbors, or faces far away would flip.
+    // All short edges end at the hubs. Only one collapses: it joins the hubs, after which the ends of the other spokes
+    // share too many neighbors, or faces far away would flip. One walk around a hub per spoke would take hours.
     EXPECT_EQ(countsOf(*withoutSlivers(MeshBuilder::wheel(400'000), 0.5f)).faces, 800'000 - 2);
     EXPECT_TRUE(isValid(*withoutSlivers(MeshBuilder::wheel(300'000, {0.02f, 1, 0.5f}), 0.5f)));
 }

@@ -44,7 +44,8 @@ std::vector<float3> smoothedPlainly(PolygonMesh const& mesh, float amount, Weigh
     std::vector<unsigned int> samples(count);
     auto const& v = mesh.faceVertex;
     for (Tessara::Math::Stepper stepper(amount, 0.9f); stepper; stepper.step(CoreGL::NOPLogger())) {
-        for (std::size_t corner = 0, f = 0; corner != v.size(); ++corner) { // adds its face's triangles to its point
+        // Each corner adds the triangles of its face to its point.
+        for (std::size_t corner = 0, f = 0; corner != v.size(); ++corner) {
             while (corner >= mesh.faceOffset[f + 1])
                 ++f;
             auto const add = [&](float3 normal, float3 centroid) {
@@ -82,7 +83,7 @@ std::vector<float3> smoothedPlainly(PolygonMesh const& mesh, float amount, Weigh
     return p;
 }
 
-/// NaN compares equal to NaN, whose bits compilers choose.
+/// The same bits for every NaN, because those depend on the compiler.
 std::vector<unsigned int> bitsOf(std::vector<float3> const& points)
 {
     std::vector<unsigned int> bits;

@@ -15,7 +15,7 @@ using Positions = Orvan::Array<float3>;
 
 namespace {
 
-/// Polygons of one to five corners, some perhaps without corners; some points may belong to no face.
+/// Polygons with one to five corners, optionally also with none. Some points may belong to no face.
 Orvan::MutablePtr<Object> randomMesh(std::size_t pointCount, std::size_t faceCount, bool withEmptyFaces, Random& random)
 {
     auto mesh = PolygonMesh::soup(pointCount, faceCount, withEmptyFaces ? 0 : 1, 5, random).build();

@@ -52,7 +52,7 @@ TEST(MeshArrays, areWrittenWithTheirCountsUnlessNull)
     MeshArrays triangle;
     triangle.faceVertex = Orvan::makePtr<IndexArray>(IndexArray{2, 1, 0});
     triangle.faceOffset = Orvan::makePtr<IndexArray>(IndexArray{0, 3});
-    triangle.pointCount = 17; // of no array
+    triangle.pointCount = 17; // ignored, because there are no positions
     triangle.cornerCount = 3;
     triangle.faceCount = 1;
 

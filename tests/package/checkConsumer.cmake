@@ -1,4 +1,4 @@
-# The installed tree, library and stand-ins together, serves a project that knows nothing but its prefix.
+# The installed tree, library and stand-ins together, can be used by a project that knows only its prefix.
 
 include(${CMAKE_CURRENT_LIST_DIR}/consumer.cmake)
 

@@ -1,11 +1,11 @@
-# The library builds against a host that is installed elsewhere; the stand-ins, installed apart, play that part.
+# The library builds against a host that is installed elsewhere; the stand-ins, installed separately, take its place.
 
 include(${CMAKE_CURRENT_LIST_DIR}/consumer.cmake)
 
 set(folder ${BUILD_DIR}/package-test/apart)
 file(REMOVE_RECURSE ${folder})
 run(${CMAKE_COMMAND} --install ${BUILD_DIR} --component TessaraHost --prefix ${folder}/host)
-# Whether it can be built and linked does not depend on how far it is optimised.
+# Whether it can be built and linked does not depend on the optimization level.
 run(${CMAKE_COMMAND} -S ${SOURCE_DIR} -B ${folder}/build ${flags} -DMODELING_HOST=external
     -DCMAKE_CXX_FLAGS_RELEASE=-O1
     -DCMAKE_PREFIX_PATH=${folder}/host -DMODELING_SANITIZE=${SANITIZE} -DMODELING_WARNINGS_AS_ERRORS=ON

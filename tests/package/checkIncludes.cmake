@@ -84,7 +84,7 @@ function(check_quoted tree file)
     set(wrong ${wrong} PARENT_SCOPE)
 endfunction()
 
-# Public headers, which a source of subsystem `folder` includes, or another public header.
+# Includes of public headers, by a source of subsystem `folder` or by another public header.
 function(check_public folder file)
     read_includes(${file} "<" ">")
     list(FILTER includes INCLUDE REGEX "^Modeling/")

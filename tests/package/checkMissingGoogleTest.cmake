@@ -1,4 +1,4 @@
-# Without GoogleTest all the rest can be built, unless tests are asked for.
+# Without GoogleTest everything else can be built, unless tests are requested.
 
 set(folder ${BUILD_DIR}/package-test/without-googletest)
 function(configure)

@@ -1,4 +1,4 @@
-# The library exports exactly the operations, and asks of the host's libraries nothing that is not listed.
+# The library exports exactly the operations, and requires nothing of the host's libraries that is not listed.
 
 # The demangled names that nm lists, and those in a file of this folder.
 function(read_names what pattern list_file)
@@ -10,7 +10,7 @@ function(read_names what pattern list_file)
         string(REPLACE "\n" ";" ${list} "${${list}}")
     endforeach()
     list(FILTER symbols INCLUDE REGEX "${pattern}")
-    # A line is "name T address size", "name U" where it is undefined; names of functions hold blanks.
+    # A line is "name T address size", "name U" where it is undefined; function names contain blanks.
     list(TRANSFORM symbols REPLACE " [A-Za-z]( [0-9a-f]+)?( [0-9a-f]+)? *$" "")
     set(symbols "${symbols}" PARENT_SCOPE)
     set(expected "${expected}" PARENT_SCOPE)

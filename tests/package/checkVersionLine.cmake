@@ -1,4 +1,4 @@
-# The line is written once, when the variable is a number other than 0, and to standard error alone.
+# The line is written once, to standard error only, if the variable begins with a number other than 0.
 
 set(line "^        Modeling: Tessara version 2\\.10\\.0\\.0 \\([0-9-]+, build 96, commit ([0-9a-f][0-9a-f][0-9a-f][0-9a-f][0-9a-f][0-9a-f][0-9a-f]|unknown), branch [^ ]+\\)\n$")
 
@@ -16,7 +16,7 @@ check(ZEPHRAN_DUMP_VERSION_INFO=0 "^$")
 check(ZEPHRAN_DUMP_VERSION_INFO=yes "^$")
 check(ZEPHRAN_DUMP_VERSION_INFO=1 "${line}")
 check(ZEPHRAN_DUMP_VERSION_INFO=-2x "${line}")
-# Without a standard error the line must not go into whatever file gets its number.
+# If standard error is closed, the line must not be written to a file that reuses its descriptor.
 execute_process(COMMAND sh -c "ZEPHRAN_DUMP_VERSION_INFO=1 '${PROBE}' 2>&-"
     OUTPUT_VARIABLE output COMMAND_ERROR_IS_FATAL ANY)
 if(NOT output STREQUAL "")

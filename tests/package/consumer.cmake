@@ -1,4 +1,4 @@
-# Builds and runs the program that the README shows against packages installed below the given prefixes.
+# Builds and runs the README's example program against packages installed below the given prefixes.
 
 function(run)
     execute_process(COMMAND ${ARGN} OUTPUT_VARIABLE output ERROR_VARIABLE output RESULT_VARIABLE failed)

@@ -66,7 +66,7 @@ float3 randomPoint(Points const& polygon, Random& random)
     return points[random.below(std::size(points))];
 }
 
-/// What filling must leave of strands whose coordinates are those of `computeMeanValueCoordinates`.
+/// What `construct` must record of strands whose coordinates are those of `computeMeanValueCoordinates`.
 struct ExpectedEnds {
     Orvan::Array<Ends> onEdges;
     std::string errors;
@@ -82,8 +82,8 @@ struct ExpectedEnds {
     }
 };
 
-/// Two ends are sorted by the weight of the edge's first corner, more of them by that of its second corner, where only the
-/// last of several at one place is kept.
+/// Two ends are sorted by the weight of the edge's first corner. More than two are sorted by the weight of its second
+/// corner, and of several at the same place only the last is kept.
 void expectInOrder(Ends const& found, Ends const& recorded, StitchTemplate const& made, unsigned int edge)
 {
     auto const along = [&](pair const& place) {
@@ -267,7 +267,7 @@ TEST(StitchTemplate, computesMeanValueCoordinates)
         EXPECT_EQ(edgeWeights[1], 1 - edgeWeights[0]);
         EXPECT_EQ(std::count(edgeWeights.begin(), edgeWeights.end(), 0.0f), corners - 1);
 
-        // By the tangents of half the angles under which the point sees the edges.
+        // From the tangents of half the angles that the edges subtend at the point.
         EXPECT_EQ(made.computeMeanValueCoordinates(polygon, point, weights, 0.5f), 0xFFFFFFFF);
         float sum = 0;
         for (unsigned int i = 0; i != corners; ++i) {
@@ -306,7 +306,7 @@ TEST(StitchTemplate, excludesTolerancesAndRightAnglesFromEdges)
     EXPECT_EQ(made.computeMeanValueCoordinates(square(), {0.25f, 0.5f, 0}, weights, 1), 0xFFFFFFFF);
     made.findControlPointPos(square(), weights, 1, false, found);
     EXPECT_LT(length(found - float3{0.25f, 0.5f, 0}), 1e-6f);
-    // The point sees a short edge under a right angle, in a triangle smaller than the tolerance.
+    // A short edge subtends a right angle at the point, in a triangle smaller than the tolerance.
     EXPECT_EQ(made.computeMeanValueCoordinates({{0.25f, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0.25f, 0}}, {}, weights, 1),
         0xFFFFFFFF);
 
@@ -326,7 +326,7 @@ TEST(StitchTemplate, letsStrandsMeetOnSharedEdges)
     made.findControlPointPos(right, made.getStrands()[0].controlPoints[0], 1, false, start);
     EXPECT_EQ(std::memcmp(&end, &start, sizeof end), 0);
 
-    // Short arrays are read up to their end; without a height or a triangle the point stays in the polygon.
+    // Short arrays are read up to their end; without a height or a triangle there is no offset.
     Weights const quarter{0.25f, 0.25f};
     made.findControlPointPos(Points{{4, 8, 0}}, quarter, 1, false, end);
     EXPECT_TRUE(end.x == 1 && end.y == 2 && end.z == 0);

@@ -10,7 +10,7 @@ namespace TestSupport {
 
 using namespace Modeling;
 
-/// Of the axis-aligned box around a face.
+/// The longest side of a face's axis-aligned bounding box.
 inline float largestSide(MeshBuilder::Triangle const& face, std::vector<float3> const& points)
 {
     float side = 0;

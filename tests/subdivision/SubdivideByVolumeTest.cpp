@@ -29,7 +29,7 @@ template <class Traits> Volume<Traits> volumeOf(float atCentre, float perUnit, f
     return buildVolume<Traits>({.background = background, .depth = Traits::kUnitDepth, .block = field.block()});
 }
 
-/// Two pyramids whose hexagonal bases have their centers at the origin, where these stay.
+/// Two hexagonal pyramids whose bases have their centers at the origin, where they stay.
 MeshBuilder twoCaps()
 {
     MeshBuilder cap = MeshBuilder::bipyramid(6), turned = cap;

@@ -30,7 +30,8 @@ Orvan::MutablePtr<Object> refined(MeshBuilder const& builder, float tolerance)
     return mesh;
 }
 
-/// Only the tips differ from all other points, by one float, so they stay there however fine the faces get.
+/// Only the two tips differ from the other points, by one unit in the last place: they stay there however fine the
+/// faces get.
 MeshBuilder tipsOneFloatApart()
 {
     MeshBuilder mesh = MeshBuilder::bipyramid(8).shuffled(1);
@@ -53,7 +54,7 @@ std::map<std::string, MeshBuilder> closedMeshes()
     };
 }
 
-/// Passes with any marks, through the steps themselves.
+/// Runs passes with any marks by calling the steps.
 struct Passes {
     explicit Passes(MeshBuilder const& builder)
         : object(meshOf(builder))
@@ -88,7 +89,7 @@ struct Passes {
     Geometry::Mesh::HalfEdgeDataStructure halfEdges{numPoints, numFaces, faceVertex, faceOffset};
 };
 
-/// Gives a tetrahedron values of a type that is made of scalars, and has the mean of its first three points checked.
+/// Gives the points of a tetrahedron values of a type that is made of scalars, and checks the mean of the first three.
 template <class T, class Scalar> void expectMean(Scalar third)
 {
     auto const mesh = MeshBuilder::tetrahedron().build();
@@ -153,7 +154,8 @@ TEST(Subdivide, agreesWithThePlainReferenceForAnyMarks)
 
 TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
 {
-    // By symmetry a corner of a solid moves along its own direction: so far in one step, and so far at the limit.
+    // By symmetry, a corner of a solid moves along its own direction: to this fraction of its distance from the center
+    // in one step, and at the limit.
     struct Solid {
         MeshBuilder mesh;
         float once, limit;
@@ -179,13 +181,13 @@ TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
 
 TEST(Subdivide, stepsHandleStatesThatDriversNeverProduce)
 {
-    // Beside a coarser face nothing is emitted; the balance does not change such a state if all have split.
+    // Next to a coarser face nothing is emitted. Balancing does not change such a state if all faces split.
     Passes unbalanced(MeshBuilder::tetrahedron());
     unbalanced.faceStates = {2 << 2 | 2, 2, 2, 2};
     EXPECT_FALSE(unbalanced.isBalanced());
     PlainSubdivision plain(MeshBuilder::tetrahedron());
     plain.states = {2 << 2 | 2, 2, 2, 2};
-    for (bool const mark : {false, true}) { // the second pass moves points towards their limits
+    for (bool const mark : {false, true}) { // the second pass moves points toward their limits
         Orvan::Array<bool> const marks(unbalanced.numFaces, mark);
         unbalanced.pass(marks);
         plain.pass(marks);
@@ -198,7 +200,7 @@ TEST(Subdivide, stepsHandleStatesThatDriversNeverProduce)
     EXPECT_EQ(thirds.numFaces, 6) << "thirds do not follow a finer face";
 
     Passes fan(MeshBuilder::of(std::vector<float3>(5), {{0, 1, 2}, {0, 1, 3}, {1, 0, 4}}));
-    fan.faceStates[1] = 2 << 2; // its neighbor has another one in turn
+    fan.faceStates[1] = 2 << 2; // its neighbor, face 2, has face 0 as a neighbor instead
     EXPECT_FALSE(fan.isBalanced());
 
     Passes aged(MeshBuilder::tetrahedron());
@@ -294,8 +296,8 @@ TEST(Subdivide, survivesMeshesOutsideOfItsPreconditions)
         MeshBuilder soup = MeshBuilder::sphere(2).withNoise(1, run);
         for (unsigned int change = 0; change != 3; ++change)
             soup.faces[random.below(32)][random.below(3)] = random.below(18);
-        for (std::size_t face = 0; face != 32;
-             ++face) // closed, but not manifold: each face again, with opposite orientation
+        // Closed, but not manifold: each face again, with opposite orientation.
+        for (std::size_t face = 0; face != 32; ++face)
             soup.faces.push_back({soup.faces[face][2], soup.faces[face][1], soup.faces[face][0]});
         PlainSubdivision plain(soup);
         plain.run(0.4f);

@@ -50,8 +50,8 @@ template <class Traits> float sampled(LinearSampler<Traits>& sampler, float3 p, 
     return sampler.sample(p, depth, kIndexSpace);
 }
 
-/// Rows give the same values as single points. Points are random starts of short lines; half of them are at multiples of a
-/// quarter, so at the sides of tiles and voxels.
+/// Rows give the same values as single samples. Points are on short lines from random points; half of the lines are at
+/// multiples of a quarter, and so at the sides of tiles and voxels.
 template <class Traits> void expectSameInRows(LinearSampler<Traits> sampler, float reach)
 {
     Random random(9);
@@ -80,7 +80,7 @@ float blend(float u, float v, float f)
     return (v - u) * f + u;
 }
 
-/// A coordinate as voxel of its tile and fraction, computed in the plainest way.
+/// A coordinate as a voxel of its tile and a fraction, computed in the simplest way.
 struct Local {
     int tileOrigin, voxel;
     float fraction;
@@ -467,7 +467,7 @@ TYPED_TEST(VoxelSampling, readsTheAllowedDepthsAndScalesWorldPoints)
     EXPECT_EQ(sampledBy(with({.scale = 2})), value);
     EXPECT_EQ(with({.scale = 2}).sample({p.x / 2, p.y / 2, p.z / 2}, kDepth, kWorldSpace), value);
 
-    // A coarse tile, where the tree ends there.
+    // A coarse tile at which the tree ends.
     std::vector<Voxel> const coarse{{0, 0, 0, 4}, {1, 0, 0, 8}, {0, 2, 0, std::numeric_limits<float>::infinity()}};
     VoxelList const lists[] = {{kDepth - 1, coarse}};
     auto const coarseVolume = buildVolume<TypeParam>({.depth = kDepth, .lists = lists});

@@ -49,7 +49,7 @@ void* allocateBlock(std::size_t bytes, std::size_t alignment)
     void* const block = mustFail() ? nullptr : systemBlock(bytes, alignment);
     if (!block)
         throw std::bad_alloc();
-    std::memset(block, 0xA5, std::min<std::size_t>(bytes, 4096)); // makes reads of unwritten memory show
+    std::memset(block, 0xA5, std::min<std::size_t>(bytes, 4096)); // exposes reads of uninitialized memory
     liveBlocks.fetch_add(1, std::memory_order_relaxed);
     return block;
 }
@@ -140,8 +140,8 @@ void expectAllOrNothing(
 
 }
 
-// Keeps oneTBB from loading its own allocator, so that it calls the functions below, which may fail. It keeps the memory of
-// its tasks for later loops, so these blocks are not counted as live.
+// Keeps oneTBB from loading its own allocator, so that it calls the functions below, which may fail. It keeps the
+// memory of its tasks for later loops, so these blocks are not counted as live.
 extern "C" {
 
 void* dlopen(char const* file, int mode) noexcept

@@ -12,9 +12,10 @@ namespace TestSupport {
 /// Runs an action; false if it ended in `std::bad_alloc`. Other exceptions pass through.
 using Attempt = std::function<bool(std::function<void()> const& action)>;
 
-/// Calls `trial` again and again. Inside the action that the trial passes to its attempt the n-th allocation fails, for
-/// n = 1, 2, 3 and so on until the action succeeds: first that allocation alone, then all from it on. The trial makes its
-/// inputs and checks what the action left of them; blocks that are still allocated after the trial are reported as leaks.
+/// Calls `trial` repeatedly. Inside the action that the trial passes to its attempt, the n-th allocation fails, for
+/// n = 1, 2, 3 and so on, until the action succeeds: first that allocation alone, then all from it on. The trial makes
+/// its inputs and checks what the action left of them; blocks that are still allocated after the trial are reported as
+/// leaks.
 void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial);
 
 /// While one is alive, all allocations fail on all threads, those of oneTBB too.
@@ -23,14 +24,14 @@ struct ExhaustedMemory {
     ~ExhaustedMemory();
 };
 
-/// Runs an action, and `meanwhile` during its allocation of that number.
-/// \return false if the action allocates less often
+/// Runs an action, and `meanwhile` during one of its allocations: `number` counts from 1.
+/// \return false if the action makes fewer allocations
 bool runDuringAllocation(
     std::int64_t number, std::function<void()> const& meanwhile, std::function<void()> const& action);
 
-/// Edits copies of an object while allocations fail: each copy is then either edited completely or unchanged. Some copies
-/// share their contents with the source, which must not change; others own them. If `mayGrow` names a float3 point
-/// property, that may be longer than before.
+/// Edits copies of an object while allocations fail: each copy is then either edited completely or unchanged. Some
+/// copies share their contents with the source, which must not change; others own them. If `mayGrow` names a float3
+/// point property, that may be longer than before.
 void expectAllOrNothing(
     Tessara::Object const& source, std::function<void(Tessara::Object&)> const& edit, char const* mayGrow = nullptr);
 

@@ -63,7 +63,7 @@ MeshBuilder MeshBuilder::sphere(unsigned int segments)
                 mesh.faces.push_back(isUpper ? Triangle{a, b, c} : Triangle{b, a, c});
             };
             for (unsigned int t = 0; t != 4 * r; ++t) {
-                unsigned int const below = t - t / r; // without one point per side before
+                unsigned int const below = t - t / r; // the inner ring has one point fewer per side
                 add(outer(t), outer(t + 1), inner(below));
                 if (t % r + 1 != r)
                     add(inner(below), outer(t + 1), inner(below + 1));

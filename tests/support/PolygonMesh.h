@@ -18,7 +18,7 @@ struct OnSquare {
     float x, y;
 };
 
-/// The position at that fraction of the way around the square from (-1, -1) to (1, 1). Needs no sines.
+/// The position at the fraction step / stepCount of the way around the square [-1, 1]². Needs no sines.
 OnSquare aroundSquare(unsigned int step, unsigned int stepCount);
 
 /// A mesh whose faces have any number of corners: `PolygonMesh::quads(100).build()`. As with `MeshBuilder`, every

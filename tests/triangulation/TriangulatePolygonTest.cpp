@@ -130,12 +130,13 @@ private:
     std::vector<float> quality_;
 };
 
-/// Corners of any kind: on a coarse lattice they repeat, line up and intersect; some are NaN or infinite.
+/// Polygons of any kind: on a coarse lattice, corners coincide or are collinear, and edges intersect. Some corners are
+/// NaN or infinite.
 Corners soup(std::size_t n, Random& random)
 {
     static float const kScales[] = {0.01f, 1, 1, 1, 1e4f, 1e18f};
     unsigned int const lattice = random.below(3);
-    static float const kFlatness[] = {0, 0.3f, 0.005f}; // the last tilts normals along -z by about the tolerance
+    static float const kFlatness[] = {0, 0.3f, 0.005f}; // the last one tilts normals from -z by about the tolerance
     float const flatness = kFlatness[random.below(3)];
     float const scale = kScales[random.below(6)];
     Corners corners(n);
@@ -198,7 +199,7 @@ TEST(TriangulatePolygon, agreesWithPlainEarClipping)
         Corners const polygon = soup(5 + random.below(run % 50 ? 12 : 150), random);
         ASSERT_EQ(triangulated(polygon), PlainReference(polygon).triangles) << "polygon " << run;
     }
-    for (unsigned int run = 0; run != 400; ++run) { // simple ones, mostly concave
+    for (unsigned int run = 0; run != 400; ++run) { // simple polygons, mostly concave
         unsigned int const corners = run == 0 ? 3000 : 6 + random.below(run % 10 ? 20 : 200);
         Corners const polygon = PolygonMesh::stars(1, corners, corners, run).points;
         ASSERT_EQ(triangulated(polygon), PlainReference(polygon).triangles) << "star " << run;
