@@ -15,7 +15,7 @@ template <class Traits> using PositiveHalo = TileData<float, Traits::kSide + 1, 
 ///
 /// \param parentTile  May be null.
 /// \param parentHalo  Of the parent tile; if it is empty, the parent's values are not used.
-/// \param order       How the parent's values are interpolated: 2, linearly; 1, the next lower one.
+/// \param order       How the parent's values are interpolated: 2, trilinearly; 1, the nearest lower voxel.
 /// \param accessor    Fetches the neighbors.
 /// \param out         Empty afterwards if the tile holds no data.
 /// Allocates nothing.

@@ -86,7 +86,7 @@ struct VolumeSource {
 template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source);
 
 /// A channel whose tiles have an additional layer on their upper sides (`setHaloTile`), so that samplers need not build it.
-/// Twice the memory of stored tiles; tiles of one value no longer share theirs.
+/// Takes up to twice the memory of the stored tiles, and more where tiles shared values: here each has its own.
 template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume);
 
 extern template TESSARAGEOMETRYVOLUME_EXPORT Volume<Traits2> buildVolume(VolumeSource const& source);
