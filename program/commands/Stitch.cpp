@@ -49,7 +49,7 @@ namespace {
         std::optional<std::uint64_t> strand, point, edge; // the point is counted within its strand
     };
 
-    /// The texts between the dashes.
+    /// Splits the errors of a template, each of which begins with dashes.
     std::vector<std::string> splitMessages(Orvan::String const& errors)
     {
         constexpr std::string_view kDashes = "---";
