@@ -1,6 +1,6 @@
 # Decides whether tests are built. By default they are, unless the project is part of another one or a dependency of the
-# tests is not installed. If MODELING_BUILD_TESTS is set to ON, as the presets do, anything missing is an error: no test is dropped
-# silently.
+# tests is not installed. If MODELING_BUILD_TESTS is set to ON, as the presets do, anything missing is an error: no test is
+# dropped silently.
 
 set(wanted ${PROJECT_IS_TOP_LEVEL})
 if(DEFINED MODELING_BUILD_TESTS)

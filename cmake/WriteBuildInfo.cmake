@@ -1,6 +1,7 @@
-# Writes the header with the build information of the version line: cmake -DOUTPUT= -DSOURCE_DIR= -DVERSION= -DBUILD_NUMBER= -P <this>
-# Commit and branch come from the checkout; outside of one they are "unknown". The date is that of SOURCE_DATE_EPOCH if
-# it is set, otherwise today's.
+# Writes the header with the build information of the version line:
+#     cmake -DOUTPUT= -DSOURCE_DIR= -DVERSION= -DBUILD_NUMBER= -P <this>
+# Commit and branch come from the checkout; outside of one they are "unknown". The date is that of SOURCE_DATE_EPOCH if it is
+# set, otherwise today's.
 
 function(ask_git result)
     set(${result} unknown PARENT_SCOPE)

@@ -99,9 +99,9 @@ namespace {
 
     void requireMemory(VdbGridSize const& size, std::filesystem::path const& file, MemoryLimit const& limit)
     {
-        // In memory at once are OpenVDB's tree and the values copied from it, later these values and the library's tiles.
-        // The values take at most as much as the tree; the tiles, which may be aligned differently, at most twice as
-        // much.
+        // In memory at once are OpenVDB's tree and the values copied from it, later these values and the library's
+        // tiles. The values take at most as much as the tree; the tiles, which may be aligned differently, at most
+        // twice as much.
         constexpr std::uint64_t kTreesInMemory = 3, kCodecBytes = 32'000'000;
         limit.require(kCodecBytes + kTreesInMemory * size.treeBytes,
             fmt::format("reading {} with {}", file.string(), countOf(size.activeVoxels, "single voxel")),

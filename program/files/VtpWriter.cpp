@@ -34,8 +34,8 @@ namespace {
         return result;
     }
 
-    /// The file is XML that states the offset of each array in the raw data at its end. The arrays are declared first, then
-    /// written in the same order.
+    /// The file is XML that states the offset of each array in the raw data at its end. The arrays are declared first,
+    /// then written in the same order.
     class VtpWriter {
     public:
         explicit VtpWriter(WritableGeometry& geometry)

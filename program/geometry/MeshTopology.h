@@ -67,8 +67,8 @@ void addPartsAndGenus(MeshTopology const& topology, Json& values);
 /// The points that no face uses.
 Finding findIsolatedPoints(MeshArrays const& mesh);
 
-/// The number of faces whose shortest edge is shorter than `ratio` times their longest edge, with edge lengths rounded as
-/// in the library.
+/// The number of faces whose shortest edge is shorter than `ratio` times their longest edge, with edge lengths rounded
+/// as in the library.
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio);
 
 /// The number of points at exactly the same position as an earlier point: many of them suggest that the mesh is split

@@ -213,8 +213,8 @@ namespace {
             });
         }
 
-        /// Inserts all tiles with voxels of lists, cubes and the block, and their ancestors: boxes are stored differently
-        /// next to them.
+        /// Inserts all tiles with voxels of lists, cubes and the block, and their ancestors: boxes are stored
+        /// differently next to them.
         void insertTiles()
         {
             if (source_.boxes.empty())
@@ -284,7 +284,8 @@ namespace {
                 {(number.i + 1) * voxels, (number.j + 1) * voxels, (number.k + 1) * voxels}};
         }
 
-        /// The voxels that samples in a tile can depend on: its own, and those of its upper neighbors at the source's depth.
+        /// The voxels that samples in a tile can depend on: its own, and those of its upper neighbors at the source's
+        /// depth.
         static VoxelRange withUpperNeighbors(VoxelRange const& tile)
         {
             return {tile.first, {tile.end.i + kSide, tile.end.j + kSide, tile.end.k + kSide}};
@@ -312,7 +313,8 @@ namespace {
             }
         }
 
-        /// Calls `visit(number, boxes)` for the tiles of depth 0 near boxes, with the boxes that samples in them depend on.
+        /// Calls `visit(number, boxes)` for the tiles of depth 0 near boxes, with the boxes that samples in them depend
+        /// on.
         template <class Visit> void forEachRoot(Visit const& visit) const
         {
             if (boxes_.empty())
@@ -517,8 +519,8 @@ namespace {
             }
         }
 
-        /// Restricts a tile's values to its part of the parent: takes the voxel at the same place along axes whose offset
-        /// bit is set, and the mean along axes whose bit is clear.
+        /// Restricts a tile's values to its part of the parent: takes the voxel at the same place along axes whose
+        /// offset bit is set, and the mean along axes whose bit is clear.
         void restrictToParent(Tile const& tile)
         {
             if (volume_.container.tile(tile.parentTreeIndex()).isTerminal)

@@ -14,8 +14,8 @@ namespace TSR::TileTree3D::Internal {
 /// values, if some voxel is in no box, or if a range of more than 2^20 voxels along an axis overlaps several boxes.
 std::optional<float> commonValue(std::span<ConstantBox const* const> boxes, VoxelRange const& range);
 
-/// Cuts the tiles of a range into parts along each axis, such that all tiles in the same three parts have the same voxels
-/// in each box, counted from the tile's lower corner, and so do their upper neighbors.
+/// Cuts the tiles of a range into parts along each axis, such that all tiles in the same three parts have the same
+/// voxels in each box, counted from the tile's lower corner, and so do their upper neighbors.
 /// \param tileSide  In voxels; the range begins and ends with tiles.
 /// \param boxes     All boxes that overlap the range or its upper neighbors.
 /// \return          The first tile of each part, counted from the beginning of the range; ascending from 0.

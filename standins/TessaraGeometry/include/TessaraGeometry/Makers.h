@@ -8,7 +8,8 @@
 
 namespace Tessara::Geometry {
 
-// For host programs: make whole objects in one call. Arrays are moved in, or constructed in place from a span or a list:
+// For host programs: make whole objects in one call. Arrays are moved in, or constructed in place from a span or a
+// list:
 //     makePointCloud({{0, 0, 0}, {1, 0, 0}})
 //     makeMesh(Orvan::Array<float3>(positionSpan), ...)
 // Nothing is checked here except the counts: 2^32 - 2 or more elements throw std::length_error, because the highest two

@@ -11,8 +11,8 @@
 
 namespace TSR::TileTree3D {
 
-/// The values of a volume: `side`³ per tile that holds data. Tiles of equal values can share them. Any number of threads
-/// may read a channel at once.
+/// The values of a volume: `side`³ per tile that holds data. Tiles of equal values can share them. Any number of
+/// threads may read a channel at once.
 template <class Traits, class T> class TESSARAGEOMETRYVOLUME_EXPORT Channel {
 public:
     /// Without data. \param side  that of a tile, or one more for tiles with an additional layer on their upper sides

@@ -12,9 +12,9 @@ namespace TSR::Utils {
 /// Selects names (of channels, of properties) by a list of patterns, such as "* -weight* weightTotal".
 ///
 /// Entries are separated by any number of whitespace characters and commas. In an entry `*` matches any number of
-/// characters, `?` one character (of UTF-8), and every other character itself; matching is case-sensitive. A leading `^`
-/// or `-` makes the entry exclude names. The last entry that matches a name decides; a name that no entry matches is not
-/// accepted. An empty list therefore accepts nothing, and neither does one that only excludes.
+/// characters, `?` one character (of UTF-8), and every other character itself; matching is case-sensitive. A leading
+/// `^` or `-` makes the entry exclude names. The last entry that matches a name decides; a name that no entry matches
+/// is not accepted. An empty list therefore accepts nothing, and neither does one that only excludes.
 ///
 /// Any number of threads may call `accepts` at once.
 class TESSARAGEOMETRYVOLUME_EXPORT ChannelParser {
@@ -40,9 +40,9 @@ public:
     ChannelParser() = default;
     ~ChannelParser() = default;
 
-    /// Replaces the list. An entry is malformed if it is a `^` or `-` without a pattern, or begins with two of these signs.
-    /// Malformed entries are skipped and the others are kept, so that a typo in one entry does not invert the meaning of
-    /// the rest.
+    /// Replaces the list. An entry is malformed if it is a `^` or `-` without a pattern, or begins with two of these
+    /// signs. Malformed entries are skipped and the others are kept, so that a typo in one entry does not invert the
+    /// meaning of the rest.
     /// \throws std::bad_alloc  the parser then keeps its old list
     Status parses(Orvan::String const& list);
 

@@ -17,14 +17,14 @@ struct Division {
     static constexpr std::uint32_t kNoRepeated = ~std::uint32_t{0};
 };
 
-/// A tree of tiles: the parts of space in which a volume has values. Any number of threads may read it at once, each with
-/// its own accessors.
+/// A tree of tiles: the parts of space in which a volume has values. Any number of threads may read it at once, each
+/// with its own accessors.
 template <class Traits> class TESSARAGEOMETRYVOLUME_EXPORT Container {
 public:
     using TileType = Tile<Traits, Traits::kChildCount>;
     class ConstTileAccessor;
 
-    /// Repeated tiles share an index, which returns the first of them. \pre  the tile exists
+    /// For an index that repeated tiles share, the first of them. \pre  the tile exists
     TileType const& tile(std::uint64_t index, int depth) const
     {
         if (index >= kFirstRepeated)
@@ -106,9 +106,9 @@ public:
         return *this;
     }
 
-    /// The tile at `depth` that contains the index. If there is none, the deepest coarser one with values of its own, which
-    /// apply to everything inside it. If there is none either, or if the layout does not have this depth, a tile whose
-    /// valid flag is false. A reference to a repeated tile is valid until the next call.
+    /// The tile at `depth` that contains the index. If there is none, the deepest coarser one with values of its own,
+    /// which apply to everything inside it. If there is none either, or if the layout does not have this depth, a tile
+    /// whose valid flag is false. A reference to a repeated tile is valid until the next call.
     TileType const& tileImpl(int i, int j, int k, int depth)
     {
         if (!(isAnswerAt(depth) && contains(*tile_, i, j, k)))

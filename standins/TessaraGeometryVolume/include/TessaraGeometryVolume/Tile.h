@@ -7,8 +7,8 @@ namespace TSR::TileTree3D {
 /// The lowest index of repeated tiles; stored tiles have lower indices.
 inline constexpr std::uint32_t kFirstRepeated = std::uint32_t{1} << 31;
 
-/// A tile in a tree with `childCount` children per tile, whatever their arrangement. Invalid by default; a cursor without
-/// a tile points to an invalid one.
+/// A tile in a tree with `childCount` children per tile, whatever their arrangement. Invalid by default; a cursor
+/// without a tile points to an invalid one.
 template <int childCount> struct TileBinaryNonCompatible {
     // The corner with the lowest indices: a multiple of the tile's width, so perhaps below the range of 32 bits.
     std::int64_t i = 0, j = 0, k = 0;
