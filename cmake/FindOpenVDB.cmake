@@ -1,5 +1,5 @@
-# Finds OpenVDB by its header and library alone. The module that comes with it asks for development packages of all that
-# it is built from; the headers that this project includes need those of oneTBB, Imath and Boost only.
+# Finds OpenVDB by its header and library alone. The module that OpenVDB provides requires the development packages of all
+# its dependencies; the headers that this project includes need only those of oneTBB, Imath and Boost.
 
 find_path(OpenVDB_INCLUDE_DIR openvdb/openvdb.h)
 find_library(OpenVDB_LIBRARY openvdb)

@@ -1,5 +1,5 @@
 include(CMakeFindDependencyMacro)
 find_dependency(TBB)
-# The stand-ins of the host, where they are installed, stand beside this package.
+# If the stand-ins of the host are installed, they are next to this package.
 find_dependency(TessaraHost HINTS "${CMAKE_CURRENT_LIST_DIR}/../TessaraHost")
 include("${CMAKE_CURRENT_LIST_DIR}/ModelingTargets.cmake")

@@ -7,11 +7,11 @@ target_compile_features(modeling_flags INTERFACE cxx_std_20)
 target_compile_options(modeling_flags INTERFACE
     # Fused multiply-adds round differently: results would depend on the compiler and the machine.
     -ffp-contract=off
-    # Square roots need not report errors through errno, so that they can be taken several at a time: same values.
+    # Square roots that do not set errno can be vectorized; their values are the same.
     -fno-math-errno
     -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor -Woverloaded-virtual)
 if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
-    target_compile_options(modeling_flags INTERFACE -Wno-restrict) # g++ 12 sees overlaps in std::string that are not there
+    target_compile_options(modeling_flags INTERFACE -Wno-restrict) # g++ 12 reports false overlaps in std::string
 endif()
 if(MODELING_WARNINGS_AS_ERRORS)
     target_compile_options(modeling_flags INTERFACE -Werror)
@@ -24,20 +24,20 @@ if(MODELING_SANITIZE)
     endif()
 endif()
 
-# A target with the project's language level, warnings and sanitizers. Nothing of that reaches its users.
+# Gives a target the project's language level, warnings and sanitizers. Only the language level propagates to its users.
 function(modeling_use_flags target)
     target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:modeling_flags>)
     target_compile_features(${target} PUBLIC cxx_std_20)
     set_target_properties(${target} PROPERTIES CXX_EXTENSIONS OFF)
 endfunction()
 
-# A test program; further arguments are its libraries. Each gtest case becomes a test of CTest. The target tests_<LABEL>
-# builds all programs of a label.
+# Adds a test program from SOURCES and LIBRARIES. Each gtest case becomes a CTest test. The target tests_<LABEL> builds all
+# programs of a label.
 function(modeling_add_test name)
     cmake_parse_arguments(arg "" "LABEL" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     modeling_use_flags(${name})
-    # What is tested is in libraries; tests themselves take longer to optimise than to run.
+    # The code under test is in libraries; the tests themselves take longer to optimize than to run.
     target_compile_options(${name} PRIVATE $<$<CONFIG:Release>:-O1>)
     target_link_libraries(${name} PRIVATE ${arg_LIBRARIES} GTest::gmock GTest::gtest_main)
     if(NOT TARGET tests_${arg_LABEL})

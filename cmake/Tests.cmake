@@ -1,6 +1,6 @@
-# Decides whether tests are built. By default they are, unless the project is part of another one or what they need is not
-# installed. If MODELING_BUILD_TESTS is set to ON, as the presets do, anything missing is an error: no test is dropped
-# silently.
+# Decides whether tests are built. By default they are, unless the project is part of another one or a dependency of the
+# tests is not installed. If MODELING_BUILD_TESTS is set to ON, as the presets do, anything missing is an error: no test is
+# dropped silently.
 
 set(wanted ${PROJECT_IS_TOP_LEVEL})
 if(DEFINED MODELING_BUILD_TESTS)
@@ -30,7 +30,7 @@ if(missing AND MODELING_BUILD_TESTS)
         "On Debian: apt-get install libgtest-dev libgmock-dev libtinyobjloader-dev")
 elseif(missing)
     message(STATUS "Tests are not built, as they need what is not installed: ${missing}")
-    set(MODELING_BUILD_TESTS OFF) # not in the cache, so that they are once it is installed
+    set(MODELING_BUILD_TESTS OFF) # not cached, so that the next run finds what is installed by then
     return()
 endif()
 option(MODELING_BUILD_TESTS "Build the tests" ON)

@@ -1,11 +1,12 @@
-# Writes the header with what the version line tells: cmake -DOUTPUT= -DSOURCE_DIR= -DVERSION= -DBUILD_NUMBER= -P <this>
-# Commit and branch come from the checkout; outside of one they are "unknown". The date is that of SOURCE_DATE_EPOCH where
-# it is set, otherwise today's.
+# Writes the header with the build information of the version line:
+#     cmake -DOUTPUT= -DSOURCE_DIR= -DVERSION= -DBUILD_NUMBER= -P <this>
+# Commit and branch come from the checkout; outside of one they are "unknown". The date is that of SOURCE_DATE_EPOCH if it is
+# set, otherwise today's.
 
 function(ask_git result)
     set(${result} unknown PARENT_SCOPE)
     find_program(GIT git)
-    # Only the project's own checkout counts, not one that happens to lie around an unpacked archive.
+    # Only the project's own checkout counts, not one that happens to contain an unpacked archive.
     if(GIT AND EXISTS ${SOURCE_DIR}/.git)
         execute_process(COMMAND ${GIT} ${ARGN} WORKING_DIRECTORY ${SOURCE_DIR}
             OUTPUT_VARIABLE answer OUTPUT_STRIP_TRAILING_WHITESPACE ERROR_QUIET RESULT_VARIABLE failed)

@@ -7,7 +7,7 @@
 
 namespace ModelingProgram {
 
-// Vector arithmetic for all wings of the program, in double precision unless stated otherwise.
+// Vector arithmetic for all folders of the program, in double precision unless stated otherwise.
 
 using Tessara::Math::double3;
 using Tessara::Math::float3;
@@ -70,7 +70,7 @@ inline float distanceInFloats(float3 const& a, float3 const& b)
     return std::hypot(b.x - a.x, b.y - a.y, b.z - a.z);
 }
 
-/// In single precision, rounded as the library rounds the lengths of edges, so that both count the same slivers.
+/// In single precision, rounded exactly as the library rounds edge lengths, so that both find the same slivers.
 inline float edgeLengthInFloats(float3 const& a, float3 const& b)
 {
     float3 const d{b.x - a.x, b.y - a.y, b.z - a.z};

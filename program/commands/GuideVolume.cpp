@@ -99,9 +99,9 @@ namespace {
 
     void requireMemory(VdbGridSize const& size, std::filesystem::path const& file, MemoryLimit const& limit)
     {
-        // OpenVDB's tree is in memory together with the values copied from it, and these later together with the
-        // library's tiles. The values need at most as much as the tree, the tiles, which may be aligned differently, at
-        // most twice as much.
+        // In memory at once are OpenVDB's tree and the values copied from it, later these values and the library's
+        // tiles. The values take at most as much as the tree; the tiles, which may be aligned differently, at most
+        // twice as much.
         constexpr std::uint64_t kTreesInMemory = 3, kCodecBytes = 32'000'000;
         limit.require(kCodecBytes + kTreesInMemory * size.treeBytes,
             fmt::format("reading {} with {}", file.string(), countOf(size.activeVoxels, "single voxel")),
@@ -248,8 +248,8 @@ void GuideVolume::reportCoverage(MeshArrays const& mesh, Report& report) const
 std::uint64_t GuideVolume::refine(float tolerance, Tessara::Object& mesh) const
 {
     using namespace Tessara::Geometry;
-    // An offset in the sampler would make it read beyond the neighbors of a tile. So the mesh is translated instead, by
-    // at most half a voxel, and back.
+    // The mesh is translated by at most half a voxel, and back afterwards. An offset in the sampler would make it read
+    // beyond the neighbors of a tile.
     auto const movePoints = [&](float sign) {
         if (shift_.x == 0 && shift_.y == 0 && shift_.z == 0)
             return;

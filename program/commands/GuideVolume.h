@@ -62,9 +62,10 @@ private:
     std::optional<float> smallestPositive_;
     float scale_ = 1; // voxels per unit of length
     Tessara::Math::float3 shift_{0, 0, 0}; // offset of the voxels from multiples of their size
+    // Without halos, which would double the memory and save hardly any time.
     std::variant<std::monostate, TSR::TileTree3D::Volume<TSR::TileTree3D::Traits2>,
         TSR::TileTree3D::Volume<TSR::TileTree3D::Traits5>>
-        volume_; // not padded: that would double the memory and save hardly any time
+        volume_;
 };
 
 }

@@ -106,7 +106,7 @@ namespace {
         return type == GeometryType::Mesh ? sFaceComp : type == GeometryType::Strands ? sStrandComp : sPointComp;
     }
 
-    /// Stores the number of its input for each face, strand, or point of a cloud.
+    /// Stores, for each face, strand, or point of a cloud, the number of its input.
     void numberSources(std::string const& attribute, Sources& sources)
     {
         using namespace Tessara::Geometry;

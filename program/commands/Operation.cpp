@@ -27,7 +27,7 @@ namespace {
 
     std::uint64_t peakMemory()
     {
-        // Not from getrusage if possible: its peak includes what the process used before it executed this program.
+        // getrusage is the fallback only: its peak includes what the process used before it executed this program.
         std::ifstream status("/proc/self/status");
         for (std::string line; std::getline(status, line);)
             if (line.starts_with("VmHWM:"))

@@ -12,7 +12,7 @@
 
 namespace ModelingProgram {
 
-// The steps of a command that makes a file from files:
+// The steps of a command that reads files and writes one:
 //
 //     requireWritable(out, GeometryType::Mesh);
 //     Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(in, report);
@@ -22,7 +22,7 @@ namespace ModelingProgram {
 //     reportOperation(before, after, report);
 //
 // Each step throws `Failure` or `FileError`, which ends the command, if it fails or the user has cancelled the job.
-// Nothing is written before `saveGeometry`, which replaces a file only by a complete one.
+// Nothing is written before `saveGeometry`, which replaces a file only with a complete one.
 
 /// A file to write.
 struct Output {

@@ -22,7 +22,7 @@ using Flags = Orvan::Array<bool>;
 
 namespace {
 
-    /// Picks the elements whose indices a file lists, separated by blanks, line ends and comments.
+    /// Picks the elements whose indices a file lists, separated by whitespace; # begins a comment.
     Flags pickByIndices(std::filesystem::path const& file, Pickable const& elements, unsigned int count)
     {
         InputFile const input(file);

@@ -31,7 +31,7 @@ struct Pickable {
 void addSelection(Pickable const& elements, Selection& selection, Command& command);
 
 /// True for each picked element. Adds their number to the report. A face is in the box if all of its corners are;
-/// points on the border are in it.
+/// points on its boundary are in it.
 /// \pre  the object is valid
 Orvan::Array<bool> pickElements(
     Selection const& selection, Pickable const& elements, Tessara::Object const& object, Report& report);

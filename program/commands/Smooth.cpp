@@ -144,7 +144,7 @@ namespace {
         std::vector<std::string> dropped;
         for (Property const& property : propertiesOf(mesh)) {
             std::string_view const name = property.name;
-            if (name != "normal" && !name.ends_with(":normal")) // the prefix distinguishes those of several components
+            if (name != "normal" && !name.ends_with(":normal")) // prefixed if several components have normals
                 continue;
             mesh.eraseProperty(property.name.c_str());
             dropped.push_back(property.name);

@@ -49,7 +49,7 @@ namespace {
         std::optional<std::uint64_t> strand, point, edge; // the point is counted within its strand
     };
 
-    /// The texts between the dashes.
+    /// Splits the errors of a template into messages, each of which is enclosed in dashes.
     std::vector<std::string> splitMessages(Orvan::String const& errors)
     {
         constexpr std::string_view kDashes = "---";
@@ -184,7 +184,8 @@ namespace {
         float scale = 0; // the mean edge length of these faces: one for all, so that raised strand ends meet
     };
 
-    /// The mean normal of the faces around each point, weighted by area; zero if there is none.
+    /// The unit normal of each point: the area-weighted mean of the normals of its faces (Newell's method). Zero if the
+    /// mean has no direction.
     Points sumPointNormals(MeshArrays const& mesh)
     {
         Points normals(mesh.pointCount());

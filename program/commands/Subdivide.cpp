@@ -45,8 +45,8 @@ namespace {
     };
 
     /// A mesh that prints its number of faces to standard error after each pass of a refinement. The library has no
-    /// progress callback, but it extends the data of points once per pass. So this adds such a property and observes
-    /// writes of it; on a closed mesh each new point adds two faces.
+    /// progress callback, but it extends the data of points once per pass. So this class adds such a property and
+    /// observes writes to it; on a closed mesh each new point adds two faces.
     class ProgressMesh : public Object {
     public:
         explicit ProgressMesh(Object const& mesh)

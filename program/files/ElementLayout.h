@@ -8,7 +8,7 @@ namespace ModelingProgram {
 
 // Element types as files see them: a fixed number of scalars of the same type.
 
-/// Other types, such as texts and records, have 0 components.
+/// Other types, such as strings and records, have 0 components.
 template <class T> struct ElementLayout {
     using Scalar = void;
     static constexpr unsigned int components = 0;

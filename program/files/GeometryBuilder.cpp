@@ -214,7 +214,7 @@ void GeometryBuilder::addProperties(Tessara::Object& object)
         if (property.component != std::string_view(sPointComp) && !object.hasProperty(sFaceComp))
             continue;
         std::string name = property.name;
-        std::replace(name.begin(), name.end(), '\0', '_'); // names of properties end there
+        std::replace(name.begin(), name.end(), '\0', '_'); // property names cannot contain null characters
         while (isReservedName(name) || object.hasProperty(Orvan::String(name)))
             name.insert(0, namePrefix(property.component));
         object.setProperty(Orvan::String(name), Orvan::Ptr<Tessara::Object>(std::move(property.object)));

@@ -23,7 +23,7 @@ std::string elementNames(Orvan::String const& component);
 /// Whether the name is reserved for the geometry itself.
 bool isReservedName(std::string_view name);
 
-/// Optional entry of a data property: the names that its components had as columns of a file, separated by blanks, so
+/// Optional entry of a data property: the names that its components had as columns of a file, separated by spaces, so
 /// that they are written under the same names.
 inline constexpr char const* sColumnNames = "columnNames";
 
@@ -42,7 +42,7 @@ struct PropertyValues {
     std::size_t elementBytes;
 };
 
-/// Collects and checks what a reader finds: the only place that decides which geometry is accepted.
+/// Collects and checks what a reader finds. All readers use it, so that all formats accept the same geometry.
 class GeometryBuilder {
     using float3 = Tessara::Math::float3;
 

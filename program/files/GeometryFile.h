@@ -24,7 +24,7 @@ struct ReadOptions {
     /// corners, and bytes after the last element. By default such files are refused.
     bool isLenient = false;
     /// Subtracts a point near the middle of the geometry from all positions, in double precision: far from the origin,
-    /// single precision has only few decimal places.
+    /// single precision has only a few decimal places.
     bool isCentered = false;
     /// Subtracts this point instead, such as the center of a file read before.
     std::optional<Tessara::Math::double3> origin = {};
@@ -35,8 +35,8 @@ struct ReadOptions {
 struct GeometryFile {
     Orvan::MutablePtr<Tessara::Object> object;
     std::string format; // "OBJ", "PLY (binary, little endian)", ...
-    std::vector<std::string>
-        notes; // what the file contains and the object does not, and what was guessed; one sentence each
+    // What the file contains but the object does not, and what was guessed; one sentence each.
+    std::vector<std::string> notes;
     std::optional<Tessara::Math::double3> origin = {}; // what was subtracted from all positions
 };
 

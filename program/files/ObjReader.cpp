@@ -14,7 +14,7 @@ namespace {
 
     constexpr float3 kWhite{1, 1, 1};
 
-    /// Distinct texts in order of appearance.
+    /// Distinct strings in order of appearance.
     class Texts {
     public:
         void add(std::string_view text)

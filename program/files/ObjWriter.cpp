@@ -8,8 +8,8 @@ using namespace Tessara::Math;
 
 namespace {
 
-    /// Texture coordinates or normals: a list of vectors, and an entry of it for each corner. Without entries the list
-    /// is one of the points.
+    /// Texture coordinates or normals: a list of vectors, and the number of one of them for each corner. If they belong
+    /// to points, the list has one entry per point and `numbers` is empty.
     struct Vectors {
         Tessara::PropertyValue list;
         Orvan::Array<unsigned int> numbers;

@@ -14,7 +14,7 @@ namespace {
 
     constexpr mode_t kReadAndWriteForAll = 0666; // minus the umask
 
-    /// The end of a chain of links, so that the link itself is not replaced.
+    /// The end of a chain of symbolic links, so that the file is replaced rather than the link.
     std::filesystem::path followLinks(std::filesystem::path file)
     {
         constexpr int kMostLinks = 40;
@@ -28,7 +28,7 @@ namespace {
         return file;
     }
 
-    /// The owner and root could replace such a file anyway, but its permissions ask to keep it.
+    /// Renaming could replace such a file, but its permissions say that it is to be kept.
     bool isWriteProtected(std::filesystem::path const& file, std::filesystem::perms permissions)
     {
         using std::filesystem::perms;

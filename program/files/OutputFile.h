@@ -59,7 +59,7 @@ public:
     /// \throws FileError  also if a file that is to be kept has been created in the meantime
     void commit();
 
-    /// Throws what the constructor would throw, and leaves no file behind.
+    /// Throws what the constructor would throw, and leaves no file behind. Devices and pipes are not checked.
     static void checkWritable(std::filesystem::path const& file, Existing existing);
 
     /// Removes an incomplete temporary file. Async-signal-safe, for handlers of signals that end the process.

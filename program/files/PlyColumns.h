@@ -8,7 +8,7 @@ namespace ModelingProgram {
 struct PlyColumns {
     std::string_view property;
     unsigned int components;
-    std::string_view names; // separated by blanks
+    std::string_view names; // separated by spaces
 };
 
 // If a group is a prefix of another, the longer one comes first.

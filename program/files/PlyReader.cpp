@@ -185,7 +185,7 @@ namespace {
             return bytes;
         }
 
-        static constexpr int kMostLines = 10'000; // each name is compared with those before it
+        static constexpr int kMostLines = 10'000; // each name is compared with all names before it
 
         TextScanner& in_;
         Header header_;
@@ -347,8 +347,8 @@ namespace {
             }
             T const value = in_.template number<T>(property.name.c_str());
             if (property.use == Use::Position) {
-                position_[property.axis] =
-                    coordinateOf(value); // out of range of float it becomes infinite, and is refused
+                // Beyond the range of float it becomes infinite, which the builder refuses or leaves out.
+                position_[property.axis] = coordinateOf(value);
             } else if (property.use == Use::Value) {
                 std::memcpy(property.target, &value, sizeof(T));
                 property.target += property.stride;

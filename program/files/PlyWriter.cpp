@@ -60,7 +60,7 @@ namespace {
         return {std::istream_iterator<std::string>(stream), {}};
     }
 
-    /// The columns or the list of one element: its lines in the header, and the source of its values.
+    /// The values of one property, and whether they are written as one list or as a column per component.
     struct Column {
         Values values;
         bool isList;

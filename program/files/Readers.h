@@ -15,13 +15,13 @@ GeometryFile readObj(InputFile const& file, ReadOptions const& options);
 /// or matrices. Lists "texcoord" of the faces become "uv" of their corners.
 GeometryFile readPly(InputFile const& file, ReadOptions const& options);
 
-/// Binary if and only if the file is exactly as long as its count requires, or longer if read leniently. Corners at
-/// equal positions become one point; 0 and -0 are equal. Normals are ignored, because the corners determine them; the
-/// two bytes after each triangle become "attribute" of the faces, unless all are 0.
+/// Binary if the file is exactly as long as its count requires, or, if read leniently, longer with a zero byte
+/// somewhere. Corners at equal positions become one point; 0 and -0 are equal. Normals are ignored, because the corners
+/// determine them; the two bytes after each triangle become "attribute" of the faces, unless all are 0.
 GeometryFile readStl(InputFile const& file, ReadOptions const& options);
 
-/// With colors and normals of points and colors of faces ("color", "normal"): colors are bytes if all are whole numbers
-/// up to 255, otherwise floats.
+/// With normals, colors and texture coordinates of points and colors of faces ("normal", "color", "uv"). Colors are
+/// bytes if all are whole numbers up to 255, otherwise floats.
 GeometryFile readOff(InputFile const& file, ReadOptions const& options);
 
 /// Tables of points, as docs/program.md describes: the heading line or the values determine the columns.

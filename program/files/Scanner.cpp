@@ -13,8 +13,8 @@ namespace {
         throw FileError(file.string() + " cannot be read: " + why);
     }
 
-    /// Half a unit of the last digit: a number within this distance is still written with the same digits. Six digits
-    /// always fit.
+    /// Half a unit of the last digit: a number within this distance is still written with the same digits. Infinite for
+    /// up to six significant digits, which every float preserves.
     double leastReportedLoss(std::string_view number)
     {
         int digitCount = 0, decimalCount = 0, exponent = 0;

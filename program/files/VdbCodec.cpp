@@ -27,7 +27,7 @@ namespace {
     {
         static bool const isDone = [] {
             openvdb::initialize();
-            // Types whose sizes the file could contradict are read as bytes.
+            // Metadata of types whose sizes the file could contradict is read as raw bytes.
             openvdb::Metadata::clearRegistry();
             openvdb::BoolMetadata::registerType();
             openvdb::StringMetadata::registerType();
@@ -226,7 +226,7 @@ void modelingReadVdb(
         throw;
     } catch (std::bad_alloc const&) {
         throw;
-    } catch (std::exception const& error) { // OpenVDB's, and those of streams
+    } catch (std::exception const& error) { // from OpenVDB or the stream
         refuse(file.path, "grid \"" + volume.name + "\" is broken: " + error.what());
     }
 }

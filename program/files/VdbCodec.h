@@ -14,7 +14,7 @@ constexpr char const* kVdbCodec = "libModelingVdb.so";
 extern "C" void modelingReadVdb(
     InputFile const& file, VdbGridEntry const& entry, std::vector<VdbGridEntry> const& all, SparseVolume& volume);
 
-/// Writes the volume to the bytes of a file.
+/// Serializes the volume to the contents of a file.
 extern "C" void modelingWriteVdb(SparseVolume const& volume, std::string& bytes);
 
 }

@@ -63,7 +63,8 @@ std::vector<VdbGrid> listVdbGrids(std::filesystem::path const& file);
 /// \param grid        index in the result of `listVdbGrids`
 /// \throws FileError  if the grid is cut off or broken, has a value that is not finite, or voxels that are not cubes
 ///                    along the axes
-/// \throws std::bad_alloc, and what `onSize` throws, which is called before values are read
+/// \param onSize      called before values are read; may throw to refuse the grid
+/// \throws std::bad_alloc, and what `onSize` throws
 SparseVolume readVdbGrid(
     std::filesystem::path const& file, std::size_t grid,
     std::function<void(VdbGridSize const&)> const& onSize = [](VdbGridSize const&) {});

@@ -71,7 +71,7 @@ namespace {
             std::string_view const name = in.text("the name of a piece of metadata");
             std::string_view const type = in.text("the type of a piece of metadata");
             std::string_view const value = in.text("a piece of metadata");
-            // OpenVDB reads the others as bytes and texts here.
+            // Other types are harmless: they are read as raw bytes or strings.
             if (type != "bool")
                 continue;
             if (value.size() != 1 || static_cast<unsigned char>(value[0]) > 1)
@@ -117,7 +117,7 @@ namespace {
         return entry;
     }
 
-    /// Parses the data of a float grid.
+    /// Walks over the data of a float grid and checks all sizes in it.
     class FloatGridWalk {
     public:
         FloatGridWalk(InputFile const& file, VdbGridEntry const& entry)
@@ -221,8 +221,8 @@ namespace {
 
         void skipValues(std::uint32_t active, std::uint32_t all, char const* what)
         {
-            // The values of inactive voxels: the background, or one or two other values selected by a mask; or all are
-            // stored.
+            // How inactive values are stored: as the background, as one or two other values selected by a mask, or all
+            // of them.
             enum : unsigned char { OneOther = 2, Mask = 3, MaskAndOne = 4, MaskAndTwo = 5, AllStored = 6 };
             auto const inactive = in_.number<unsigned char>(what);
             if (inactive > AllStored)

@@ -9,7 +9,7 @@
 namespace ModelingProgram {
 
 // OpenVDB trusts the sizes in a file: if one is wrong, it overruns buffers, allocates any amount of memory, or silently
-// reads past the end of the file. So files are checked first.
+// reads past the end of the file. Files are therefore checked first.
 
 struct VdbGridEntry {
     std::string name; // "density", or "density[1]" if an earlier grid has that name

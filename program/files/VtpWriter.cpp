@@ -34,7 +34,7 @@ namespace {
         return result;
     }
 
-    /// The file is XML with the offset of each array in the raw data that follows. So the arrays are declared first,
+    /// The file is XML that states the offset of each array in the raw data at its end. The arrays are declared first,
     /// then written in the same order.
     class VtpWriter {
     public:

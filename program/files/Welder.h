@@ -55,8 +55,8 @@ private:
     }
 
     Orvan::Array<T> values_;
-    Orvan::Array<unsigned int>
-        slots_; // open addressing: a number plus one, or 0; the size is a power of two, at most half full
+    // Hash table with open addressing: a number plus one, or 0. The size is a power of two, and at most half is in use.
+    Orvan::Array<unsigned int> slots_;
 };
 
 }

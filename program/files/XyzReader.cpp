@@ -11,7 +11,7 @@ namespace {
 
     constexpr std::size_t kNone = static_cast<std::size_t>(-1);
 
-    /// What the columns of a file are, counted from 0.
+    /// What the columns of a file contain; columns are counted from 0.
     struct Columns {
         std::size_t position[3] = {0, 1, 2};
         std::size_t color = kNone; // the first of three
@@ -249,7 +249,7 @@ namespace {
             return columns;
         }
 
-        /// Colors of another range than bytes look like normals that are not unit vectors.
+        /// Colors whose range is not that of bytes look like normals that are not unit vectors.
         void noteDoubtfulNormals()
         {
             builder_.note("columns " + std::to_string(columns_.normal + 1) + " to "

@@ -10,7 +10,7 @@
 
 namespace ModelingProgram {
 
-/// The standard arrays of a mesh. They stay unchanged while this lives, because edits of the mesh then copy them.
+/// A snapshot of the standard arrays of a mesh: as long as it shares them, edits of the mesh copy them first.
 struct MeshArrays {
     Orvan::Ptr<Orvan::Array<float3>> positions;
     Orvan::Ptr<Orvan::Array<unsigned int>> faceVertex;
@@ -28,7 +28,7 @@ struct MeshArrays {
 /// \pre  the mesh is valid
 MeshArrays arraysOf(Tessara::Object const& mesh);
 
-/// A vector along the normal of a polygon, twice as long as the polygon's area.
+/// The vector area of a polygon times two: it points along the normal, and its length is twice the polygon's area.
 inline double3 areaVector(std::span<unsigned int const> corners, float3 const* position)
 {
     double3 area{0, 0, 0};

@@ -229,7 +229,7 @@ std::uint64_t countSlivers(MeshArrays const& mesh, float ratio)
 
 std::uint64_t countCoincidentPoints(MeshArrays const& mesh)
 {
-    // Compared by bits, which is a total order even with NaN. Adding 0 makes both zeros equal.
+    // Bits are totally ordered, unlike floats with NaN. Adding 0 turns -0 into 0.
     std::vector<std::array<std::uint32_t, 3>> keys;
     keys.reserve(mesh.pointCount());
     for (float3 const& p : *mesh.positions)

@@ -11,7 +11,7 @@
 
 namespace ModelingProgram {
 
-/// The number of elements with some quality, and the lowest of them.
+/// The number of elements that have some property, and the lowest of them.
 struct Finding {
     std::uint64_t count = 0;
     unsigned int first = Tessara::Geometry::kInvalidIndex;
@@ -36,19 +36,20 @@ struct MeshTopology {
 
     std::uint64_t edgeCount = 0;
     // `first` is the lowest corner at which a side of such an edge starts.
-    Finding boundaryEdges; // one side: boundary edges
-    Finding nonManifoldEdges; // more than two sides
+    Finding boundaryEdges; // edges with one side
+    Finding nonManifoldEdges; // edges with more than two sides
     Finding windingConflicts; // edges with two or more sides in the same direction; counted per direction
     Finding flippedEdges; // edges with two sides, both in the same direction
 
     // `first` is the lowest point.
     Finding nonManifoldPoints; // non-manifold vertices: their faces are not all connected by edges at the point
-    Finding isolatedPoints; // points of no face
+    Finding isolatedPoints; // points that no face uses
 
     std::uint64_t partCount = 0; // connected components: faces that share a point are in the same one
     std::optional<std::int64_t> genus; // summed over the parts; for closed manifolds
 
-    /// True if each edge has two sides in opposite directions and each point one closed fan of faces.
+    /// True if all faces have at least three corners, each edge has two sides in opposite directions, and the faces at
+    /// each point form one fan. Isolated points do not matter.
     bool isClosedManifold() const;
 };
 
@@ -63,11 +64,11 @@ MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges);
 /// Adds the rows "parts" and "genus" to the table of a command.
 void addPartsAndGenus(MeshTopology const& topology, Json& values);
 
-/// The points of no face.
+/// The points that no face uses.
 Finding findIsolatedPoints(MeshArrays const& mesh);
 
-/// The number of faces whose shortest edge is shorter than `ratio` times their longest one, measured as the library
-/// does.
+/// The number of faces whose shortest edge is shorter than `ratio` times their longest edge, with edge lengths rounded
+/// as in the library.
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio);
 
 /// The number of points at exactly the same position as an earlier point: many of them suggest that the mesh is split

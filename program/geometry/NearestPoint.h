@@ -21,7 +21,7 @@ inline Corner blend(Corner const& a, Corner const& b, double t)
         between(a.number, b.number)};
 }
 
-/// The point of a triangle nearest to `p`. Ericson, "Real-Time Collision Detection", 2005, 5.1.5.
+/// The point of a triangle nearest to `p`. Ericson, "Real-Time Collision Detection", 2005, section 5.1.5.
 inline Corner nearestOf(Triangle const& triangle, double3 const& p)
 {
     auto const& [a, b, c] = triangle;

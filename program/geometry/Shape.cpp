@@ -17,11 +17,11 @@ namespace ModelingProgram {
 
 namespace {
 
-    // Relative changes of the shape above these values are a warning.
+    // Relative changes of the shape above these values cause a warning.
 
-    // A mass computed from the mesh is off by as much; scans and prints are about as accurate.
+    // A mass computed from the mesh would be off by as much; scans and prints are about as accurate.
     constexpr double kVolumeFraction = 0.01;
-    // Noise accounts for a few percent of the area of a scan, which smoothing is meant to remove.
+    // Noise adds a few percent to the area of a scan, and removing it is the purpose of smoothing.
     constexpr double kAreaFraction = 0.05;
     // Visible on a screen that shows the whole mesh: 20 of 1,000 pixels.
     constexpr double kMoveFraction = 0.02;
@@ -104,7 +104,7 @@ namespace {
         }
     };
 
-    /// \param origin  inside or near the mesh: far away, the volumes of single faces would cancel badly
+    /// \param origin  inside or near the mesh: far away, the signed volumes of faces would suffer from cancellation
     Measures measure(MeshArrays const& mesh, std::vector<double3> const& vectors, double3 const& origin)
     {
         return sumOverBlocks<Measures>(vectors.size(), [&](std::size_t begin, std::size_t end) {

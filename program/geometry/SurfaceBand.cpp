@@ -30,7 +30,8 @@ namespace {
 
         void add(Triangle const& triangle)
         {
-            // The band fills a large part of the boxes of small pieces.
+            // Long triangles are bisected, because the band fills a large part of the bounding box only around small
+            // pieces.
             constexpr double kLongest = 16;
             std::size_t longest = 0;
             double lengths[3];
@@ -220,7 +221,7 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
     }
     auto const sides = reachOf(mesh, voxelSize, halfWidth).sides;
     double const box = sides[0] * sides[1] * sides[2];
-    // A band wider than the surface contains about the parallel body of a convex body (Steiner's formula).
+    // A band wider than the surface is about as large as the parallel body of a convex body (Steiner's formula).
     double const meanWidth = std::max(0.0, (sides[0] + sides[1] + sides[2]) / 2 - 3 * (halfWidth + 1));
     auto const around = [&](double width) {
         return width * (voxels / (2 * halfWidth) + 2 * kPi * width * (meanWidth + width * 2 / 3));
@@ -228,7 +229,8 @@ BandSize estimateBand(MeshArrays const& mesh, double voxelSize, double halfWidth
     BandSize size;
     size.voxels = std::min(std::max(voxels, around(halfWidth)), box);
     double const blocks = std::min(std::max(touched, around(halfWidth + Band::kBlockSide / 2.0)), box) / kBlockVoxels;
-    // A leaf of OpenVDB, the bytes of the file, whose buffer doubles as it grows, and OpenVDB itself.
+    // An OpenVDB leaf per block, the bytes of the file per voxel (their buffer doubles as it grows), and OpenVDB
+    // itself.
     constexpr double kWrittenPerBlock = 2300, kWrittenPerVoxel = 12, kCodecBytes = 32e6;
     size.bytes = kCodecBytes + size.voxels * sizeof(Voxel)
         + std::max(blocks * Band::kBytesPerBlock, blocks * kWrittenPerBlock + size.voxels * kWrittenPerVoxel);

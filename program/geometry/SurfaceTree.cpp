@@ -124,8 +124,8 @@ double SurfaceTree::squaredDistanceInLeaf(std::size_t leaf, double3 const& point
             return Corner{inDoubles((*surface_.positions)[triangles_[i][corner]]), 0};
         };
         double3 const away = nearestOf({cornerAt(0), cornerAt(1), cornerAt(2)}, point).position - point;
-        nearest = std::min(
-            nearest, dot(away, away)); // NaN for some triangles without area, whose edges other triangles share
+        // Some triangles without area give NaN, which `min` ignores here; other triangles share their edges.
+        nearest = std::min(nearest, dot(away, away));
     }
     return nearest;
 }

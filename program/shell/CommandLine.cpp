@@ -28,7 +28,7 @@ namespace {
         return !text.empty() && end == text.c_str() + text.size() ? number : std::nan("");
     }
 
-    /// The bytes in "1.5GB" or "2 MiB", or nullopt if the text is no such amount or less than one byte.
+    /// The bytes in "1.5GB" or "2 MiB", or nullopt if the text is not such an amount or is less than one byte.
     std::optional<std::uint64_t> bytesIn(std::string const& text)
     {
         constexpr std::string_view kPrefixes = "kmgtpe";
@@ -215,8 +215,8 @@ namespace {
         return fallback;
     }
 
-    /// Describes the mistake in a command line. Unknown names come first: a misspelled option also appears as a missing
-    /// one.
+    /// Describes the mistake in a command line. Unknown names are checked first, because a misspelled option also looks
+    /// like a missing one.
     std::string describeMistake(CLI::ParseError const& error, CLI::App const& program)
     {
         std::vector<CLI::App*> const commands = program.get_subcommands();
@@ -504,7 +504,7 @@ std::optional<int> CommandLine::parse(int argumentCount, char const* const* argu
 {
     std::string mistake;
     Arguments given = argumentsOf(argumentCount, arguments);
-    std::reverse(given.texts.begin(), given.texts.end()); // as the parser takes them
+    std::reverse(given.texts.begin(), given.texts.end()); // the parser expects them in reverse order
     try {
         app_->parse(std::move(given.texts));
         if (given.firstEmpty == 0)

@@ -22,10 +22,10 @@ namespace fs = std::filesystem;
 
 namespace {
 
-    // The rest is for what is allocated until the next cancellation check, and for other programs.
+    // The rest is left for allocations until the next cancellation check, and for other programs.
     constexpr double kFractionOfFree = 0.9;
 
-    /// The number after a word at the start of a line.
+    /// The number after `word` in the first line that begins with it.
     std::optional<std::uint64_t> numberAfter(std::string_view word, fs::path const& file)
     {
         std::ifstream in(file);
@@ -46,7 +46,7 @@ namespace {
         return std::ifstream(file) >> number ? std::optional(number) : std::nullopt;
     }
 
-    /// The files of a hierarchy of control groups.
+    /// The files of a control group hierarchy.
     struct Hierarchy {
         char const* folder;
         char const* limit;

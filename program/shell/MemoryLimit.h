@@ -18,7 +18,7 @@ namespace ModelingProgram {
 /// whose size is known in advance calls `require` first.
 class MemoryLimit {
 public:
-    /// \param bytes  0 for the default: most of the free memory, so that the kernel does not have to kill a process
+    /// \param bytes  0 for the default: most of the free memory, so that the kernel never has to kill a process
     explicit MemoryLimit(std::uint64_t bytes);
     MemoryLimit(MemoryLimit const&) = delete;
     MemoryLimit& operator=(MemoryLimit const&) = delete;
@@ -53,8 +53,8 @@ void addMemoryLimit(std::uint64_t& bytes, Command& command);
 std::uint64_t presentMemory();
 
 /// The memory that the program can still allocate: what the machine has available, or less if a control group (version
-/// 1 or 2) of the program leaves less. Caches that the kernel can drop count as free.
-/// \param root  directory that holds /proc and /sys; tests use one of their own
+/// 1 or 2) limits it further. Caches that the kernel can drop count as free.
+/// \param root  the directory that contains /proc and /sys; tests pass their own
 std::uint64_t freeMemory(std::filesystem::path const& root = "/");
 
 }

@@ -33,8 +33,8 @@ std::string toText(Json const& document);
 [[nodiscard]] bool writeToStandardOutput(std::string const& text);
 inline constexpr char kCannotWriteOutput[] = "cannot write to standard output";
 
-/// A decimal number with the fewest digits from which the same float is read, "64.0" included: a table shows whole JSON
-/// numbers as counts. Null if the value is not finite.
+/// The shortest decimal number that reads back as the same float. Whole numbers end in ".0", because tables show JSON
+/// integers as counts. Null if the value is not finite.
 Json numberOf(float value);
 /// 1234567 as "1,234,567".
 std::string groupDigits(std::uint64_t number);

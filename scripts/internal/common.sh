@@ -11,7 +11,7 @@ fail() {
     exit 1
 }
 
-# Installs the packages that are missing, and says so. Takes nothing when all are there.
+# Installs the packages that are missing and says so. Does nothing if all are installed.
 require_packages() {
     local missing=() package
     for package in "$@"; do
@@ -39,7 +39,7 @@ run_logged() {
     fi
 }
 
-# build_preset NAME OPTIONS...: with these options of cmake; only the targets in $targets where that is set.
+# build_preset NAME OPTIONS...: configures with these options of cmake and builds; only the targets in $targets if it is set.
 build_preset() {
     say "building preset $1"
     run_logged "configure-$1" cmake --preset "$1" "${@:2}"

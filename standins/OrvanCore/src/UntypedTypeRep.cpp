@@ -13,8 +13,8 @@ namespace Orvan::Internal {
 namespace {
 
     constexpr std::size_t kHugePage = std::size_t{1} << 21;
-    constexpr std::size_t kHugeBlock =
-        2 * kHugePage; // rounding smaller blocks up to huge pages costs more than it gains
+    // For smaller blocks, aligning to huge pages costs more than it gains.
+    constexpr std::size_t kHugeBlock = 2 * kHugePage;
 
     std::size_t byteCount(UntypedTypeRep const& rep, std::uint64_t count)
     {
@@ -26,7 +26,7 @@ namespace {
 
     std::align_val_t blockAlignment(UntypedTypeRep const& rep, std::size_t bytes)
     {
-        constexpr std::size_t kCacheLine = 64; // so that threads that write different arrays never share a line
+        constexpr std::size_t kCacheLine = 64; // less false sharing between threads that write different arrays
         std::size_t const minimum = bytes >= kHugeBlock ? kHugePage
             : bytes >= 4096                             ? kCacheLine
                                                         : alignof(std::max_align_t);

@@ -71,7 +71,7 @@ TEST(Array, constructsAndDestroysEachElementOnce)
         Array<std::shared_ptr<int>> copy(array);
         EXPECT_EQ(watched.use_count(), 11);
         copy = Array<std::shared_ptr<int>>(2, watched);
-        array = copy; // fits the present storage
+        array = copy; // fits the current storage
         array = static_cast<Array<std::shared_ptr<int>> const&>(array);
         EXPECT_EQ(watched.use_count(), 5);
         Array<std::shared_ptr<int>> moved(std::move(array));
@@ -95,7 +95,7 @@ TEST(Array, reusesItsStorageWhenAssigned)
     EXPECT_EQ(target, source);
     EXPECT_EQ(target.data, storage);
     EXPECT_EQ(target.capacity, 4u);
-    target = Array<int>(5); // moved: takes over the other storage
+    target = Array<int>(5); // a move takes over the storage
     EXPECT_EQ(target, Array<int>(5));
     EXPECT_NE(target.data, storage);
 }
@@ -147,7 +147,7 @@ TEST(UntypedTypeRep, givesAlignedStorage)
         for (std::uint64_t const bytes : {256u, 4096u, 1u << 22, (1u << 22) + 256u}) {
             std::uint64_t const count = bytes / rep.elementSize;
             std::uint64_t const alignment = std::max<std::uint64_t>(rep.elementAlignment, bytes < 4096 ? 16 : 64);
-            void* blocks[4]; // of several adjacent blocks, not all are aligned by chance
+            void* blocks[4]; // several in a row: a single one may be aligned by chance
             for (void*& block : blocks) {
                 block = rep.allocate(count);
                 EXPECT_EQ(reinterpret_cast<std::uintptr_t>(block) % alignment, 0u) << bytes << " bytes";

@@ -10,7 +10,7 @@ namespace Tessara::Geometry::Internal {
 
 inline constexpr char const* sElementCount = "sElementCount"; // unsigned int, in component geo properties
 
-// The prototypes by reference, because all threads would write the count of a shared `Ptr`.
+// The prototypes by reference: if `Ptr`s were copied, all threads would write the same reference counts.
 Object const& dataPrototype();
 Object const& rangePrototype();
 Object const& componentPrototype();
@@ -48,7 +48,7 @@ inline unsigned int elementCountOf(Object const& component)
 /// \throws std::bad_alloc  with the object unchanged
 inline void setInGeoProp(Orvan::String const& key, Orvan::String const& inner, PropertyValue&& value, Object& object)
 {
-    // Puts the geo property back, also if making it mutable throws.
+    // Puts the geo property back, even if making it mutable throws.
     struct PutBack {
         Orvan::String const& key;
         Object& object;

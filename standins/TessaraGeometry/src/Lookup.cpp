@@ -21,7 +21,7 @@ namespace {
         }
     }
 
-    /// Whether it is of a kind that has a target: data and ranges.
+    /// Whether it has a target, as data and ranges do but components do not.
     bool hasTarget(Object const& geoProperty)
     {
         return Object::isA(geoProperty, Internal::dataPrototype())

@@ -31,7 +31,7 @@ namespace {
         return "\"" + std::string(name.view()) + "\"";
     }
 
-    /// The length of the array that a data property holds; nullopt if it holds none of a listed type.
+    /// The length of the array that a data property holds; nullopt if it holds no array of a known element type.
     std::optional<std::uint64_t> dataLength(Object const& property)
     {
         std::optional<std::uint64_t> length;

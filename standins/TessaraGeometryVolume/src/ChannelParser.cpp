@@ -19,8 +19,8 @@ namespace {
         return position;
     }
 
-    // On a mismatch only the last `*` is extended, by one byte: extending an earlier one could not match more. So the time
-    // is at most the pattern's length times the name's.
+    // On a mismatch only the last `*` is extended, by one byte: extending an earlier one could not match more. The time
+    // is therefore at most proportional to the pattern's length times the name's.
     bool matches(std::string_view pattern, std::string_view name)
     {
         std::size_t at = 0;

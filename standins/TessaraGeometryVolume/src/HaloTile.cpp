@@ -31,7 +31,7 @@ namespace {
         PlaceInParent const z = placeInParent<Traits>(child.k, voxel.k);
         if (order < 2)
             return halo(x.voxel, y.voxel, z.voxel);
-        // At the last voxel there is no next one to read, and its share would be 0.
+        // At the last voxel there is no next one to read, and its weight would be 0.
         int const nextX = x.voxel + (x.fraction > 0), nextY = y.voxel + (y.fraction > 0),
                   nextZ = z.voxel + (z.fraction > 0);
         auto const alongX = [&](int j, int k) { return blend(halo(x.voxel, j, k), halo(nextX, j, k), x.fraction); };

@@ -29,7 +29,7 @@ namespace {
         return {a.i + b.i, a.j + b.j, a.k + b.k};
     }
 
-    /// Visits the steps to a tile itself and to its seven upper neighbors.
+    /// Whether `visit(step)` is true for a tile itself (a step of 0) or any of its seven upper neighbors.
     template <class Visit> bool anyUpwards(Visit const& visit)
     {
         for (int across = 0; across < 8; ++across)
@@ -213,8 +213,8 @@ namespace {
             });
         }
 
-        /// Inserts all tiles with voxels of lists, cubes and the block, and their ancestors: boxes are stored differently
-        /// next to them.
+        /// Inserts all tiles with voxels of lists, cubes and the block, and their ancestors: boxes are stored
+        /// differently next to them.
         void insertTiles()
         {
             if (source_.boxes.empty())
@@ -272,7 +272,7 @@ namespace {
 
         // ---- Boxes
 
-        /// The number of voxels of the source's depth in a tile along an axis.
+        /// The width of a tile of `depth`, in voxels of the source's depth.
         std::int64_t voxelsOfTile(int depth) const
         {
             return Traits::tileWidth(depth) / Traits::tileWidth(source_.depth) * kSide;
@@ -284,7 +284,8 @@ namespace {
                 {(number.i + 1) * voxels, (number.j + 1) * voxels, (number.k + 1) * voxels}};
         }
 
-        /// The voxels that samples in a tile can depend on: its own, and those of its upper neighbors at the source's depth.
+        /// The voxels that samples in a tile can depend on: its own, and those of its upper neighbors at the source's
+        /// depth.
         static VoxelRange withUpperNeighbors(VoxelRange const& tile)
         {
             return {tile.first, {tile.end.i + kSide, tile.end.j + kSide, tile.end.k + kSide}};
@@ -312,7 +313,8 @@ namespace {
             }
         }
 
-        /// Calls `visit(number, boxes)` for the tiles of depth 0.
+        /// Calls `visit(number, boxes)` for the tiles of depth 0 near boxes, with the boxes that samples in them depend
+        /// on.
         template <class Visit> void forEachRoot(Visit const& visit) const
         {
             if (boxes_.empty())
@@ -362,7 +364,7 @@ namespace {
             return tile.valid && tile.division < 0;
         }
 
-        /// Fills tiles with listed voxels from boxes, before the lists overwrite them.
+        /// Writes the boxes into tiles that also contain listed voxels, before the lists overwrite them.
         void fillListedTiles(Index const& number, int depth, Boxes boxes)
         {
             if (!isInserted(number, depth))
@@ -517,7 +519,8 @@ namespace {
             }
         }
 
-        /// Takes the voxel at the same place along axes with a set bit, and the mean along axes with a clear bit.
+        /// Restricts a tile's values to its part of the parent: takes the voxel at the same place along axes whose
+        /// offset bit is set, and the mean along axes whose bit is clear.
         void restrictToParent(Tile const& tile)
         {
             if (volume_.container.tile(tile.parentTreeIndex()).isTerminal)
@@ -547,7 +550,7 @@ namespace {
         VolumeSource const& source_;
         Volume<Traits> volume_;
         int coarsestTerminal_ = Traits::kDepthCount;
-        bool hasCoarserData_ = false; // besides the source's depth
+        bool hasCoarserData_ = false; // at depths coarser than the source's
         Boxes boxes_;
         // By the bits of the value.
         std::unordered_map<std::uint32_t, TreeIndex> constants_;

@@ -35,7 +35,7 @@ namespace {
     {
         std::int64_t const tileBegin = range.first / side - (range.first % side < 0 ? 1 : 0);
         std::int64_t const tileEnd = tileBegin + (range.end - range.first) / side;
-        // Shares change only near the ends of boxes.
+        // Shares differ only between tiles next to the end of a box.
         std::vector<std::int64_t> candidates;
         for (Interval const& box : boxes)
             for (std::int64_t const end : {floorDivide(box.first, side), floorDivide(box.end - 1, side)})

@@ -11,7 +11,7 @@ using TSR::Utils::ChannelParser;
 
 namespace {
 
-// The names that the list accepts, separated by blanks.
+// The names that the list accepts, separated by spaces.
 std::string accepted(char const* list, std::vector<char const*> const& names)
 {
     ChannelParser parser;

@@ -251,7 +251,7 @@ TYPED_TEST(TileTree, halosContinueNeighborsThenParentsThenTheTile)
 TYPED_TEST(TileTree, refusesDepthsAndVoxelsThatTheLayoutDoesNotHave)
 {
     VolumeSource source = sourceOf<TypeParam>();
-    source.depth = TypeParam::kUnitDepth - 1; // there are not that many voxels of this size
+    source.depth = TypeParam::kUnitDepth - 1; // 32-bit indices have fewer voxels of this size
     EXPECT_THROW(volumeOf<TypeParam>({{INT_MAX, 0, 0, 1}}, source), std::invalid_argument);
     for (int const depth : {-1, TypeParam::kDeepest + 1}) {
         source.depth = depth;

@@ -14,7 +14,7 @@ Stepper::Stepper(float amount, float limit) noexcept
 void Stepper::advance() noexcept
 {
     float const next = remainder_ - increment();
-    remainder_ = next < remainder_ ? next : 0.0f; // otherwise, the steps would never end
+    remainder_ = next < remainder_ ? next : 0.0f; // otherwise the steps would never end
     ++stepCount_;
 }
 

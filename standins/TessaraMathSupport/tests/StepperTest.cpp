@@ -115,7 +115,7 @@ TEST(Loggers, recoverFromASinkThatThrows)
 
 TEST(Loggers, shareTheSinkBetweenThreads)
 {
-    int lineCount = 0; // not atomic: calls of a sink do not overlap
+    int lineCount = 0; // not atomic: sink calls are serialized
     std::vector<std::thread> threads;
     for (int thread = 0; thread < 3; ++thread)
         threads.emplace_back([] { stepThrough(Stepper(100.0f, 0.5f), CoreGL::OrvanLogger()); });

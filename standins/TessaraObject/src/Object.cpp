@@ -8,7 +8,7 @@ namespace Tessara {
 
 namespace {
 
-    constexpr std::size_t kFewKeys = 16; // for so few, comparing all keys is faster than hashing one
+    constexpr std::size_t kFewKeys = 16; // up to here, comparing all keys is faster than hashing one
 
     /// As `==`. Keys of equal length mostly differ in their last character, and comparing that inline is faster.
     bool isSame(std::string_view a, std::string_view b)
@@ -29,7 +29,7 @@ namespace {
 
 }
 
-// Inline, because most time is spent here, and calls within a shared library go through its linkage table.
+// Inline because lookups dominate, and calls to members of an exported class go through the procedure linkage table.
 
 // The slot of the key, or the free slot to insert it into.
 inline std::size_t Object::slotOf(std::string_view key) const
@@ -122,7 +122,7 @@ void Object::setProperty(Orvan::String const& key, PropertyValue&& value)
 
 bool Object::isA(Object const& object, Object const& prototype)
 {
-    // Values are not copied: all threads would write the reference count of one shared prototype.
+    // Values are read in place: copying them would make all threads write the reference counts of shared prototypes.
     constexpr std::string_view kExcluded = kExcludedKeys;
     auto const lacksAll = [&](PropertyValue const& excluded) {
         if (auto const* const values = excluded.get<Orvan::Ptr<Object>>(); values && *values)

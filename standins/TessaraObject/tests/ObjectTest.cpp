@@ -43,7 +43,7 @@ Ptr<Object> objectOf(std::vector<std::pair<String, PropertyValue>> properties)
 
 }
 
-// Against a plain list, with numbers of keys below and above the one at which look-ups start to hash.
+// Compares with a plain list, for key counts below and above the one at which lookups start to hash.
 TEST(Object, behavesLikeAListInInsertionOrder)
 {
     std::mt19937 random(5);

@@ -64,7 +64,7 @@ TEST(PointEdgeOrientation, findsTheTurn)
         EXPECT_EQ(turn(a, b, c), expected) << name;
         EXPECT_EQ(turn(c, b, a), -expected) << name;
     }
-    // Paths with equal points do not turn, even if areas round.
+    // Paths with equal points do not turn, even if areas are rounded.
     std::mt19937 random(1);
     auto const coordinate = [&] {
         auto const mantissa = static_cast<float>(random() % 65536);
@@ -128,7 +128,7 @@ TEST(PointInTriangle, findsNothingInTrianglesWithoutArea)
         EXPECT_FALSE(query(p, {0, 0}, {4, 0}, {0, 4}).isInside());
 }
 
-// Points near the shared edge of two triangles: however areas round, each is in at least one of them.
+// Each point near the shared edge of two triangles is in at least one of them, even if areas are rounded.
 TEST(PointInTriangle, leavesNoGapAtASharedEdge)
 {
     std::mt19937 random(2);

@@ -20,8 +20,8 @@ inline constexpr Uninitialized kUninitialized{};
 
 /// The runtime's growable array: four plain fields, and the operations that keep them consistent.
 ///
-/// `data` holds `capacity` elements, of which the first `size` are alive. Growing by n elements where
-/// `capacity - size < n` gives the capacity `capacity + max(capacity, n)`; shrinking only lowers `size`.
+/// `data` has room for `capacity` elements, of which the first `size` are constructed. If adding n elements exceeds the
+/// capacity, it grows to `capacity + max(capacity, n)`. Shrinking only lowers `size`.
 /// New elements are value-initialized (zero for numbers) unless `kUninitialized` is passed; elements of types that
 /// need a constructor are always constructed. Each `bool` element is a byte.
 ///

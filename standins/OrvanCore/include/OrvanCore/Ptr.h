@@ -13,10 +13,10 @@ template <class T> class MutablePtr;
 
 namespace Internal {
 
-    /// Counts the references to one shared value, and copies and destroys it.
+    /// Counts the references to one shared value, and knows how to copy and destroy it.
     template <class T> class ControlBlock {
     public:
-        virtual Ptr<T> clone(T const& value) const = 0; ///< A deep copy of the value, with one reference.
+        virtual Ptr<T> clone(T const& value) const = 0; ///< A copy of the value, with one reference.
         virtual void dispose() noexcept = 0; ///< Destroys the value and this block.
 
         std::atomic<std::uint64_t> count{1};
@@ -25,7 +25,7 @@ namespace Internal {
         ~ControlBlock() = default;
     };
 
-    /// Contains the value, so that a shared value takes one allocation.
+    /// Contains the value, so that a shared value needs only one allocation.
     template <class T> class InlineControlBlock final : public ControlBlock<T> {
     public:
         template <class... Arguments> explicit InlineControlBlock(Arguments&&... arguments)
@@ -55,8 +55,8 @@ namespace Internal {
 
 /// A reference to a shared, immutable value. Null by default; null has no control block.
 ///
-/// The count is atomic: references to one value may be copied and released on any threads. Two threads must not write
-/// the same `Ptr` at once.
+/// The count is atomic: references to one value may be copied and released on any thread. One `Ptr` must not be written
+/// while another thread reads or writes it.
 template <class T> class Ptr {
 public:
     Ptr() noexcept = default;
@@ -89,6 +89,7 @@ public:
     /// The number of references; 0 for null. Exact only while no other thread copies or releases one.
     std::uint64_t useCount() const noexcept { return control_ ? control_->count.load(std::memory_order_acquire) : 0; }
 
+    /// Compares identity, not values.
     friend bool operator==(Ptr const& a, Ptr const& b) noexcept { return a.value_ == b.value_; }
 
 private:
@@ -150,9 +151,9 @@ template <class T> Ptr<T>::Ptr(MutablePtr<T>&& other) noexcept
 {
 }
 
-/// Makes a shared value mutable, and empties `shared`. Returns the value itself if this was the only reference, a deep
-/// copy if it is shared, null for null.
-/// \throws  What copying throws, with `shared` unchanged.
+/// Makes a shared value mutable (copy on write) and sets `shared` to null. Returns the value itself if `shared` was the
+/// only reference, otherwise a copy made by the copy constructor of `T`. Returns null for null.
+/// \throws  Whatever copying throws, with `shared` unchanged.
 template <class T> MutablePtr<T> makeMutable(Ptr<T>&& shared)
 {
     if (!shared.control_) {

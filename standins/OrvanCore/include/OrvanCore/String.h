@@ -6,10 +6,10 @@
 
 namespace Orvan {
 
-/// A string value; immutable by convention. Short strings (up to 15 characters) are stored without an allocation.
+/// A string value. Short strings (up to 15 bytes) are stored without an allocation.
 ///
-/// Any number of threads may read and copy one string at once, and different threads may write different strings, also
-/// if these are elements of one array. A null `char const*` counts as the empty string.
+/// Any number of threads may read and copy one string at once, and different threads may write different strings, even
+/// if they are elements of the same array. A null `char const*` counts as the empty string.
 class String {
 public:
     String() = default;

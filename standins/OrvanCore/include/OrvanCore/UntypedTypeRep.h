@@ -13,10 +13,10 @@ struct ORVANCORE_EXPORT UntypedTypeRep {
     std::uint32_t elementSize;
     std::uint32_t elementAlignment;
 
-    /// Allocates aligned, uninitialized storage for `count` elements (not bytes); null for no elements. Large blocks
-    /// are aligned to huge pages and ask the system for them, which cuts the cost of touching new memory to about a
-    /// third.
-    /// \throws std::bad_alloc  also if the byte count exceeds the address space
+    /// Allocates aligned, uninitialized storage for `count` elements (not bytes); null if there are none.
+    /// Blocks of 4 MiB or more are aligned for huge pages and request them, which cuts the cost of first touching the
+    /// memory to about a third.
+    /// \throws std::bad_alloc  also if the byte count exceeds PTRDIFF_MAX
     void* allocate(std::uint64_t count) const;
 
     /// Frees what `allocate` returned for the same count. Does nothing for null.

@@ -9,13 +9,13 @@
 
 namespace Tessara::Geometry {
 
-/// An element type of data properties, with the name that host programs display.
+/// An element type of data properties, and the name that host programs display for it.
 template <class T> struct ElementType {
     using Type = T;
     char const* name;
 };
 
-/// Calls `visit(ElementType<T>)` for each of the forty element types, in the order of the conventions.
+/// Calls `visit(ElementType<T>)` for each of the forty element types, always in the same order.
 template <class Visit> constexpr void forEachElementTypeName(Visit&& visit)
 {
     using namespace Math;

@@ -5,7 +5,7 @@
 
 namespace Tessara::Geometry {
 
-// Look-ups of geo properties. If a property is missing or of another kind, the result is null, an empty string or an
+// Lookups of geo properties. If a property is missing or of another kind, the result is null, an empty string or an
 // empty array. Any number of threads may look up the same object at once. Lists are in the order of the object's keys.
 
 TESSARAGEOMETRY_EXPORT Orvan::Array<Orvan::String> getGeoPropNamesByPrototype(

@@ -8,11 +8,12 @@
 
 namespace Tessara::Geometry {
 
-// For host programs: whole objects in one call. Arrays are moved in, or constructed in the call from a span or a list:
+// For host programs: make whole objects in one call. Arrays are moved in, or constructed in place from a span or a
+// list:
 //     makePointCloud({{0, 0, 0}, {1, 0, 0}})
 //     makeMesh(Orvan::Array<float3>(positionSpan), ...)
-// Nothing is checked here except that counts fit 32 bits (otherwise std::length_error): the validators tell whether the
-// arrays match.
+// Nothing is checked here except the counts: 2^32 - 2 or more elements throw std::length_error, because the highest two
+// indices are sentinels. The validators check whether the arrays match.
 
 /// \param faceOffset  Face count + 1 entries; an empty array is replaced by the single entry 0.
 TESSARAGEOMETRY_EXPORT Orvan::MutablePtr<Object> makeMesh(

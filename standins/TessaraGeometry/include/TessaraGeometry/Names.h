@@ -2,17 +2,17 @@
 
 namespace Tessara::Geometry {
 
-// The value of each constant is its own name, so that a message that quotes a key also names the constant. All are
-// short enough for an `Orvan::String` to store without an allocation, which makes look-ups of standard properties
+// The value of each key is the name of its constant, so that a message that quotes a key also names the constant. All
+// are short enough for an `Orvan::String` to store without an allocation, which makes lookups of standard properties
 // cheap.
 
-// Components: classes of elements, with their number.
+// Components: classes of elements, each with an element count.
 inline constexpr char const* sPointComp = "sPointComp";
 inline constexpr char const* sFaceComp = "sFaceComp";
 inline constexpr char const* sFaceVertexComp = "sFaceVertexComp"; // face corners
 inline constexpr char const* sStrandComp = "sStrandComp";
 
-// Standard data properties. The offset arrays have one entry more than there are faces or strands.
+// Standard data properties. The offset arrays have one more entry than there are faces or strands.
 inline constexpr char const* sPointPosition = "sPointPosition"; // float3 per point
 inline constexpr char const* sFaceVertex = "sFaceVertex"; // unsigned int per face corner: its point
 inline constexpr char const* sFaceOffset = "sFaceOffset"; // unsigned int per face: its first corner

@@ -66,8 +66,8 @@ public:
 };
 
 /// Describes suspicious properties that the validators ignore, in one sentence each: lengths that do not match the
-/// target, range entries beyond the data that targets the range, missing targets. None of these makes an object
-/// invalid.
+/// target, range entries beyond the data that targets the range, missing targets, data without an array of one of the
+/// forty element types, ranges without indices. None of these makes an object invalid.
 TESSARAGEOMETRY_EXPORT Orvan::Array<Orvan::String> reportProperties(Object const& object);
 
 }

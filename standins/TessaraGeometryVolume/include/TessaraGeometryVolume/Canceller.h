@@ -10,7 +10,7 @@ namespace TSR {
 /// announcements, so that tests can verify them.
 class TESSARAGEOMETRYVOLUME_EXPORT Canceller {
 public:
-    /// The kind of place in a program that announces itself.
+    /// Identifies the loop that makes the announcement.
     struct ID {
         unsigned int value;
     };

@@ -11,8 +11,8 @@
 
 namespace TSR::TileTree3D {
 
-/// The values of a volume: `side`³ per tile that holds data. Tiles of equal values can share them. Any number of threads
-/// may read a channel at once.
+/// The values of a volume: `side`³ per tile that holds data. Tiles of equal values can share them. Any number of
+/// threads may read a channel at once.
 template <class Traits, class T> class TESSARAGEOMETRYVOLUME_EXPORT Channel {
 public:
     /// Without data. \param side  that of a tile, or one more for tiles with an additional layer on their upper sides
@@ -48,7 +48,8 @@ public:
 
     int side() const noexcept { return side_; }
 
-    /// For filling a channel: the values of a tile, added with zeros at the first call. \pre  not shared
+    /// For filling a channel: the values of a tile, which the first call adds as zeros.
+    /// \pre  the tile does not share its values
     T* values(TreeIndex tile)
     {
         Level& level = levels_[tile.depth];
@@ -60,7 +61,7 @@ public:
         }
         return level.valuesOf(room, voxelCount());
     }
-    /// Makes a tile share the values of another one of its depth.
+    /// Makes a tile share the values of another one of its depth. \pre  `other` has values
     void share(TreeIndex tile, TreeIndex other)
     {
         Level& level = levels_[tile.depth];
@@ -78,6 +79,7 @@ public:
     }
 
 private:
+    // A room stores the values of one tile; tiles that share values have the same room.
     static constexpr std::uint32_t kNoRoom = ~std::uint32_t{0};
     static constexpr std::size_t kPageRooms = 64; // growing adds a page and copies no values
 

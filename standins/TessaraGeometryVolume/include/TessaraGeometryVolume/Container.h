@@ -17,14 +17,14 @@ struct Division {
     static constexpr std::uint32_t kNoRepeated = ~std::uint32_t{0};
 };
 
-/// A tree of tiles: the parts of space in which a volume has values. Any number of threads may read it at once, each with
-/// its own accessors.
+/// A tree of tiles: the parts of space in which a volume has values. Any number of threads may read it at once, each
+/// with its own accessors.
 template <class Traits> class TESSARAGEOMETRYVOLUME_EXPORT Container {
 public:
     using TileType = Tile<Traits, Traits::kChildCount>;
     class ConstTileAccessor;
 
-    /// For an index of repeated tiles, the first of them. \pre  the tile exists
+    /// For an index that repeated tiles share, the first of them. \pre  the tile exists
     TileType const& tile(std::uint64_t index, int depth) const
     {
         if (index >= kFirstRepeated)
@@ -63,7 +63,7 @@ public:
     std::uint32_t addRepeated(std::int64_t i, std::int64_t j, std::int64_t k, int depth);
     /// \return  the number for `divide`
     std::int32_t addDivision(Division division);
-    /// Makes a tile answer look-ups of finer tiles from the division. \pre  no finer tile is inside
+    /// Makes a tile answer lookups of finer tiles from the division. \pre  no finer tile is inside
     void divide(std::uint32_t index, int depth, std::int32_t division);
 
 private:
@@ -85,7 +85,7 @@ private:
     int repeatedDepth_ = Traits::kDepthCount;
 };
 
-/// A cursor that remembers its last tile, so that a look-up in the same tile costs a few comparisons. Cheap to copy. For
+/// A cursor that remembers its last tile, so that a lookup in the same tile costs a few comparisons. Cheap to copy. For
 /// one thread; the container must outlive it.
 template <class Traits> class TESSARAGEOMETRYVOLUME_EXPORT Container<Traits>::ConstTileAccessor {
 public:
@@ -106,9 +106,9 @@ public:
         return *this;
     }
 
-    /// The tile at `depth` that contains the index. If there is none, the deepest coarser one with values of its own, which
-    /// apply to everything inside it. If there is none either, or if the layout does not have this depth, a tile whose
-    /// valid flag is false. A reference to a repeated tile is valid until the next call.
+    /// The tile at `depth` that contains the index. If there is none, the deepest coarser one with values of its own,
+    /// which apply to everything inside it. If there is none either, or if the layout does not have this depth, a tile
+    /// whose valid flag is false. A reference to a repeated tile is valid until the next call.
     TileType const& tileImpl(int i, int j, int k, int depth)
     {
         if (!(isAnswerAt(depth) && contains(*tile_, i, j, k)))

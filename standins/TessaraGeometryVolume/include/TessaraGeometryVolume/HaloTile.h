@@ -8,14 +8,14 @@ namespace TSR::TileTree3D {
 /// A tile with an additional layer on its upper sides, for trilinear samples between its last voxels and the next ones.
 template <class Traits> using PositiveHalo = TileData<float, Traits::kSide + 1, 0>;
 
-/// Fills the halo tile of `tile`, coordinates 0 to `kSide`. Values across the upper faces, edges and corner are copied from
-/// the first layer of the neighbors of the same depth that hold data. If a coarser tile holds the data there, they are
-/// interpolated from the parent's values; if no tile does, they repeat the outermost layer of the tile itself, whatever
-/// the parent holds. Values are at the lower sides of their voxels.
+/// Fills the halo tile of `tile`, coordinates 0 to `kSide`. Values across the upper faces, edges and corner are copied
+/// from the first layer of the neighbors of the same depth that hold data. If a coarser tile holds the data there, they
+/// are interpolated from the parent's values; if no tile does, they repeat the outermost layer of the tile itself,
+/// whatever the parent holds. Values are at the lower sides of their voxels.
 ///
 /// \param parentTile  May be null.
 /// \param parentHalo  Of the parent tile; if it is empty, the parent's values are not used.
-/// \param order       How the parent's values are interpolated: 2, linearly; 1, the next lower one.
+/// \param order       How the parent's values are interpolated: 2, trilinearly; 1, the nearest lower voxel.
 /// \param accessor    Fetches the neighbors.
 /// \param out         Empty afterwards if the tile holds no data.
 /// Allocates nothing.

@@ -4,11 +4,11 @@
 
 namespace TSR::TileTree3D {
 
-/// Stored tiles have lower indices.
+/// The lowest index of repeated tiles; stored tiles have lower indices.
 inline constexpr std::uint32_t kFirstRepeated = std::uint32_t{1} << 31;
 
-/// A tile in a tree with `childCount` children per tile, whatever their arrangement. Invalid by default; a cursor without
-/// a tile points to such a one.
+/// A tile in a tree with `childCount` children per tile, whatever their arrangement. Invalid by default; a cursor
+/// without a tile points to an invalid one.
 template <int childCount> struct TileBinaryNonCompatible {
     // The corner with the lowest indices: a multiple of the tile's width, so perhaps below the range of 32 bits.
     std::int64_t i = 0, j = 0, k = 0;
@@ -18,7 +18,7 @@ template <int childCount> struct TileBinaryNonCompatible {
     bool valid = false;
     bool isTerminal = false; // has values of its own; if the tree ends here, they apply at all deeper depths
     bool hasChildren = false;
-    // One of many tiles with the same values. It is not stored, but valid until the next look-up of the accessor.
+    // One of many tiles with the same values. It is not stored, but valid until the next lookup of the accessor.
     bool isRepeated = false;
     std::int32_t division = -1; // the container's division that describes the finer tiles inside; negative if none
 

@@ -28,7 +28,7 @@ private:
     int first_ = 0;
 };
 
-/// The same with storage of its own. Empty if default constructed.
+/// The same with its own storage. Empty if default-constructed.
 template <class T, int side, int> class TileData {
 public:
     static constexpr int kVoxelCount = side * side * side;

@@ -42,8 +42,9 @@ namespace Internal {
 
 }
 
-/// The layout of a tree of tiles. Space is measured in index units along three axes. A tile is a cube of `kSide`³ voxels;
-/// the tiles of the next depth divide it into `kChildrenPerAxis`³ children of as many voxels each.
+/// The layout of a tree of tiles. Space is measured in index units along three axes. A tile is a cube of `kSide`³
+/// voxels; the next depth divides it into `kChildrenPerAxis`³ children, each of `kSide`³ voxels again. The last two
+/// parameters are not used here.
 template <int childrenPerAxis, int voxelsPerAxis, int, int> struct Traits {
     static constexpr int kChildrenPerAxis = childrenPerAxis;
     static constexpr int kChildCount = childrenPerAxis * childrenPerAxis * childrenPerAxis;

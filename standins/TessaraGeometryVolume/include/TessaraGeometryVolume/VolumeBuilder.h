@@ -52,9 +52,9 @@ struct DenseBlock {
     float const* values;
 };
 
-/// What a volume is built from. Boxes must not overlap one another. If other sources overlap, the finer one wins; at the
-/// same depth, lists win over boxes, cubes over both, and the block over all. The rest of a tile that is inside a coarser
-/// one gets the coarser one's values.
+/// What a volume is built from. Boxes must not overlap one another. If other sources overlap, the finer one wins; at
+/// the same depth, lists win over boxes, cubes over both, and the block over all. The rest of a tile that is inside a
+/// coarser one gets the coarser one's values.
 struct VolumeSource {
     float background = 0;
     unsigned int offsetType = 7; // see VoxelTopology
@@ -64,29 +64,30 @@ struct VolumeSource {
     std::span<VoxelCube const> cubes = {};
     std::span<float const> cubeValues = {};
     DenseBlock block = {{0, 0, 0}, {0, 0, 0}, nullptr};
-    /// Tiles of this depth and all deeper ones hold data, computed from the tiles inside them. Clamped to the depth of the
-    /// coarsest source, which is also the default.
+    /// Tiles of this depth and all deeper ones hold data, computed from the tiles inside them. Clamped to the depth of
+    /// the coarsest source, which is also the default.
     std::optional<int> coarsestDepth = {};
 };
 
-/// Builds the tree. A box is equivalent to a list of all its voxels: any sample gives the same value to the bit. But if all
-/// data is at `depth` or deeper, tiles inside boxes and along their sides are stored once for all that have the same
-/// values; touching boxes of one value count as one. Tiles are numbered in the order in which they are first needed.
+/// Builds the tree. A box is equivalent to a list of all its voxels: any sample gives the same value to the bit. But if
+/// all data is at `depth` or deeper, tiles inside boxes and along their sides are stored once for all that have the
+/// same values; touching boxes of one value count as one. Tiles are numbered in the order in which they are first
+/// needed.
 ///
 /// Values of coarser tiles without a source of their own are computed from finer ones: along an axis with a set bit of
-/// `offsetType` the finer value at the same place, along an axis with a clear bit the mean of the voxels covered. If there
-/// are no finer ones, they are those of the next coarser tile with a source, or `background`.
+/// `offsetType` the finer value at the same place, along an axis with a clear bit the mean of the voxels covered. If
+/// there are no finer ones, they are those of the next coarser tile with a source, or `background`.
 ///
 /// Linear in the number of voxels. Memory is proportional to the number of tiles with active voxels plus the number of
-/// boxes: each box takes a few kilobytes at most, and tiles of its own only next to listed voxels or many other boxes. If
-/// there is coarser data, boxes take time and memory for all their tiles.
-/// \throws std::invalid_argument  if the layout does not have a depth, a voxel is beyond 32-bit indices, or `offsetType` is
-///                                above 7
+/// boxes: each box takes a few kilobytes at most, and tiles of its own only next to listed voxels or many other boxes.
+/// If there is coarser data, boxes take time and memory for all their tiles.
+/// \throws std::invalid_argument  if the layout does not have a depth, a voxel is beyond 32-bit indices, or
+///                                `offsetType` is above 7
 /// \throws std::bad_alloc         also for 2^31 tiles of one depth
 template <class Traits> Volume<Traits> buildVolume(VolumeSource const& source);
 
-/// A channel whose tiles have an additional layer on their upper sides (`setHaloTile`), so that samplers need not build it.
-/// Twice the memory of stored tiles; tiles of one value no longer share theirs.
+/// A channel whose tiles have an additional layer on their upper sides (`setHaloTile`), so that samplers need not build
+/// it. Takes up to twice the memory of the stored tiles, and more where tiles shared values: here each has its own.
 template <class Traits> Channel<Traits, float> makeHaloChannel(Volume<Traits> const& volume);
 
 extern template TESSARAGEOMETRYVOLUME_EXPORT Volume<Traits2> buildVolume(VolumeSource const& source);

@@ -29,7 +29,7 @@ public:
     /// The line is valid only during the call. An exception of the sink reaches the caller of `Stepper::step`.
     using Sink = std::function<void(char const* line)>;
 
-    /// An empty sink ends the output. Calls of sinks do not overlap. Once `setSink` has returned, the old sink is not
+    /// An empty sink turns logging off. Sink calls are serialized. Once `setSink` has returned, the old sink is not
     /// running and will not be called again. A sink must not call `setSink` or a logger.
     static void setSink(Sink sink);
 

@@ -52,8 +52,8 @@ public:
     /// - any other value requires a value of the same type.
     static bool isA(Object const& object, Object const& prototype);
 
-    /// The stored value under a key, null if the key is absent. Valid until the object is changed. For the host's own
-    /// libraries, in which copies of values would cost too much.
+    /// The stored value under a key; null if the key is absent. Valid until the object is changed. Meant for the host's
+    /// own libraries, where copying the value would cost too much.
     PropertyValue const* findProperty(std::string_view key) const;
 
     static constexpr char const* kExcludedKeys = "excludedKeys";
@@ -70,7 +70,7 @@ private:
 
     std::vector<Entry> entries_;
     // Hash table with open addressing: entry indices plus one, 0 for a free slot; at least two slots per entry. Empty
-    // as long as there are few keys.
+    // while there are only a few keys.
     std::vector<std::uint32_t> slots_;
 };
 
@@ -81,7 +81,7 @@ TESSARAOBJECT_EXPORT Orvan::MutablePtr<Object> createObject();
 
 namespace Orvan::Internal {
 
-/// The shared default instance of a class, used if an absent `Ptr` needs a value.
+/// The shared default instance of a class, which takes the place of a null `Ptr`.
 template <class T> Ptr<T> const& getDefaultClass();
 template <> TESSARAOBJECT_EXPORT Ptr<Tessara::Object> const& getDefaultClass<Tessara::Object>();
 

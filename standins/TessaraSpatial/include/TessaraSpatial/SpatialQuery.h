@@ -9,12 +9,12 @@
 
 namespace Tessara::SpatialQuery {
 
-// Signed areas are computed in double precision from single-precision coordinates. Their signs are exact if the coordinates
-// of a call are multiples of a common unit and span at most 2^26 of it (all integers up to 33 million, all floats in
-// [1, 8), ...). Otherwise nearly collinear points may be classified wrongly. Must be compiled without contraction to fused
-// multiply-adds: equal points would no longer cancel exactly.
+// Signed areas are computed in double precision from single-precision coordinates. Their signs are exact if the
+// coordinates of a call are multiples of a common unit and span at most 2^26 of it (all integers up to 33 million, all
+// floats in [1, 8), ...). Otherwise nearly collinear points may be classified wrongly. Must be compiled without
+// contraction to fused multiply-adds: equal points would no longer cancel exactly.
 //
-// Any number of threads may call these. They are inline because they run in inner loops.
+// Any number of threads may call these functions. They are inline because they run in inner loops.
 
 /// The direction in which a path turns, seen with x to the right and y up.
 enum class PointEdgeOrientation : int { Clockwise = -1, Collinear = 0, CounterClockwise = 1 };
@@ -33,8 +33,8 @@ enum TrianglePlace : int {
 
 namespace Internal {
 
-    /// Twice the signed area of o, a, b; positive when they turn counter-clockwise. Exchanging a and b gives exactly
-    /// the negative value, and two equal points give exactly 0.
+    /// Twice the signed area of the triangle o, a, b; positive if it is counter-clockwise. Exchanging a and b gives
+    /// exactly the negative value, and two equal points give exactly 0.
     inline double doubledArea(Math::float2 const& o, Math::float2 const& a, Math::float2 const& b)
     {
         double const left = (double{a.x} - o.x) * (double{b.y} - o.y);
@@ -42,10 +42,10 @@ namespace Internal {
         return left - right;
     }
 
-    /// For a point inside: in the interior, or on the edge whose triangle with the point has area 0. The areas are those
-    /// opposite a, b, c.
+    /// Classifies a point inside: on an edge if it spans area 0 with that edge, otherwise in the interior. `areaA`
+    /// belongs to the edge opposite a, and so on.
     TESSARASPATIAL_EXPORT TrianglePlace placeInside(double areaA, double areaB, double areaC) noexcept;
-    /// For a point that is not inside: at the corner that it equals, or outside.
+    /// Classifies a point that is not inside: at the corner that it equals, otherwise outside.
     TESSARASPATIAL_EXPORT TrianglePlace placeNotInside(
         Math::float2 const& p, Math::float2 const& a, Math::float2 const& b, Math::float2 const& c) noexcept;
 
@@ -56,8 +56,8 @@ namespace Internal {
 
 }
 
-/// How the path from a via b to c turns. `Collinear` also if any two of the points are equal (a path that returns to its
-/// start does not turn) or a coordinate is NaN.
+/// How the path from a via b to c turns. `Collinear` also if any two of the points are equal (a path that returns to
+/// its start does not turn) or a coordinate is NaN.
 inline PointEdgeOrientation pointEdgeOrientation(Math::float2 const& a, Math::float2 const& b, Math::float2 const& c)
 {
     double const area = Internal::doubledArea(a, b, c);
@@ -66,16 +66,16 @@ inline PointEdgeOrientation pointEdgeOrientation(Math::float2 const& a, Math::fl
                       : PointEdgeOrientation::Collinear;
 }
 
-/// Whether p is in the triangle a, b, c, of either winding, including its edges but excluding its corners. A point on an
-/// edge that two triangles share is in both of them, and if signs are exact, no point near it is in neither. No point is in
-/// a triangle whose corners are collinear or not all finite, nor, however areas round, if it is outside the corners'
-/// bounding box: callers may test that first.
+/// Whether p is in the triangle a, b, c, of either winding, including its edges but excluding its corners. A point on
+/// an edge that two triangles share is in both of them, and if signs are exact, there is no gap along that edge. A
+/// triangle whose corners are collinear or not all finite contains no point. A point outside the corners' bounding box
+/// is never inside, even if areas are rounded, so callers may test the box first.
 ///
 /// \param u, v, w  Always written: the barycentric coordinates of p, the weights of a, b and c, even if p is outside.
-///                 Their sum is 1, up to rounding. All 0 if no point can be in the triangle; unspecified if only p is not
-///                 finite. If a caller ignores them, the compiler removes their computation.
-/// \param out      May be null. Otherwise receives the `TrianglePlace` of p: inside or on an edge if the result is true;
-///                 outside or at a corner if it is false.
+///                 Their sum is 1, up to rounding. All 0 if no point can be in the triangle; unspecified if only p is
+///                 not finite. If a caller ignores them, the compiler eliminates their computation.
+/// \param out      May be null. Otherwise receives the `TrianglePlace` of p: inside or on an edge if the result is
+///                 true; outside or at a corner if it is false.
 inline bool pointInTriangle(Math::float2 const& p, Math::float2 const& a, Math::float2 const& b, Math::float2 const& c,
     float& u, float& v, float& w, int* out)
 {
