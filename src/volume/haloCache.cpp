@@ -73,7 +73,7 @@ template <class Traits> void fillHalo(
     }
     FullHalo<Traits> const& parentHalo =
         haloOf(state, state.container->tile(tile.parentTreeIndex()), state.fullHaloCache);
-    fillHaloFromNeighbors<Traits>(state.offsetType, halo, tile.childIJK(), tilesAround(state, tile), parentHalo);
+    fillHaloFromNeighbours<Traits>(state.offsetType, halo, tile.childIJK(), tilesAround(state, tile), parentHalo);
 }
 
 template void fillHalo(LinearSamplerState<Traits2>&, Container<Traits2>::TileType const&, PositiveHalo<Traits2>&);

@@ -156,7 +156,7 @@ void fillHaloFromTile(unsigned int offsetType, float background, TileValues<Trai
     });
 }
 
-template <class Traits> void fillHaloFromNeighbors(unsigned int offsetType, FullHalo<Traits>& out, IJK child,
+template <class Traits> void fillHaloFromNeighbours(unsigned int offsetType, FullHalo<Traits>& out, IJK child,
     TilesAround<Traits> const& around, FullHalo<Traits> const& parentHalo)
 {
     constexpr int kSide = Traits::kSide;
@@ -185,9 +185,9 @@ template <class Traits> void fillHaloFromNeighbors(unsigned int offsetType, Full
 
 template void fillHaloFromTile<Traits2>(unsigned int, float, TileValues<Traits2>, FullHalo<Traits2>&);
 template void fillHaloFromTile<Traits5>(unsigned int, float, TileValues<Traits5>, FullHalo<Traits5>&);
-template void fillHaloFromNeighbors<Traits2>(
+template void fillHaloFromNeighbours<Traits2>(
     unsigned int, FullHalo<Traits2>&, IJK, TilesAround<Traits2> const&, FullHalo<Traits2> const&);
-template void fillHaloFromNeighbors<Traits5>(
+template void fillHaloFromNeighbours<Traits5>(
     unsigned int, FullHalo<Traits5>&, IJK, TilesAround<Traits5> const&, FullHalo<Traits5> const&);
 
 }

@@ -25,7 +25,7 @@ void fillHaloFromTile(unsigned int offsetType, float background, TileValues<Trai
 /// values; without a parent, it extrapolates the tile itself linearly.
 /// \param child       The position of the tile in its parent.
 /// \param parentHalo  Of the parent; may be empty.
-template <class Traits> void fillHaloFromNeighbors(unsigned int offsetType, FullHalo<Traits>& out, IJK child,
+template <class Traits> void fillHaloFromNeighbours(unsigned int offsetType, FullHalo<Traits>& out, IJK child,
     TilesAround<Traits> const& around, FullHalo<Traits> const& parentHalo);
 
 }

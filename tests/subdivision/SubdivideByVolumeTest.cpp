@@ -21,11 +21,11 @@ using Layouts = testing::Types<Traits2, Traits5>;
 TYPED_TEST_SUITE(SubdivideByVolume, Layouts);
 
 /// A field of constant value, or one that grows with x, around the origin.
-template <class Traits> Volume<Traits> volumeOf(float atCentre, float perUnit, float background)
+template <class Traits> Volume<Traits> volumeOf(float atCenter, float perUnit, float background)
 {
     constexpr int kReach = 13; // the unit ball and a voxel more, where neighbors end
     Field const field = Field::of(
-        -kReach, kReach, [=](int i, int, int) { return atCentre + perUnit * static_cast<float>(i) / kScale; });
+        -kReach, kReach, [=](int i, int, int) { return atCenter + perUnit * static_cast<float>(i) / kScale; });
     return buildVolume<Traits>({.background = background, .depth = Traits::kUnitDepth, .block = field.block()});
 }
 

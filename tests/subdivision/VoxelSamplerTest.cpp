@@ -332,7 +332,7 @@ TYPED_TEST(VoxelSampling, continuesTheParentIfNeighborsAreMissing)
             around[13] = tile;
             around[12] = beside; // x - 1
             for (bool const hasParent : {true, false}) {
-                fillHaloFromNeighbors<TypeParam>(
+                fillHaloFromNeighbours<TypeParam>(
                     offsetType, halo, child, around, hasParent ? parent : FullHalo<TypeParam>());
                 forEachVoxel(-1, kSide + 1, [&](int i, int j, int k) {
                     bool const isBeside = i == -1 && std::min(j, k) >= 0 && std::max(j, k) < kSide;
@@ -354,7 +354,7 @@ TEST(HaloTiles, blendTheParentInQuartersAndEighths)
     TilesAround<Traits2> around{};
     around[13] = tile;
     auto const row = [&](unsigned int offsetType) { // across y, where there is no tile
-        fillHaloFromNeighbors<Traits2>(offsetType, halo, {1, 0, 0}, around, parent);
+        fillHaloFromNeighbours<Traits2>(offsetType, halo, {1, 0, 0}, around, parent);
         return std::vector<float>{halo(0, 4, 1), halo(1, 4, 1), halo(2, 4, 1), halo(3, 4, 1)};
     };
     float const a = 100, b = 10, next = 1, mean = 1.5f * 1 - 0.5f * 10; // after it: extrapolated
