@@ -186,7 +186,7 @@ namespace {
             std::size_t count = 0;
             for (; count < most && !in_.atLineEnd(); ++count) {
                 fractions |= (in_.peekWord().find('.') != std::string_view::npos ? 1u : 0u) << count;
-                values[count] = in_.number<float>("a color");
+                values[count] = in_.number<float>("a color or texture coordinate");
             }
             return count;
         }

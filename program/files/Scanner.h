@@ -175,7 +175,7 @@ public:
     {
         skipEmptyLines();
         if (atEnd())
-            refuse("the file is cut off before " + std::string(kind) + " " + std::to_string(index + 1));
+            refuse("the file is cut off before " + std::string(kind) + " " + std::to_string(index));
     }
     void endElement() { expectLineEnd(); }
 

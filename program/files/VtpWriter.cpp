@@ -26,7 +26,10 @@ namespace {
     {
         std::string result;
         for (char const c : text) {
-            if (c == '&' || c == '<' || c == '>' || c == '"' || static_cast<unsigned char>(c) < ' ')
+            bool const isControl = static_cast<unsigned char>(c) < ' ';
+            if (isControl && c != '\t' && c != '\n' && c != '\r')
+                result += '?'; // XML cannot represent it
+            else if (isControl || c == '&' || c == '<' || c == '>' || c == '"')
                 result += "&#" + std::to_string(static_cast<unsigned char>(c)) + ";";
             else
                 result += c;

@@ -28,7 +28,7 @@ def main(path):
             own[operation, size] = run
     context = report["context"]
     print(f"{context['num_cpus']} cores at {context['mhz_per_cpu']} MHz, {context['date']}, load {context['load_avg'][:1]}\n")
-    print("| benchmark | size | time | an element | working memory an element | times as long as |\n|---|---|---|---|---|---|")
+    print("| benchmark | size | time | per element | working memory per element | times as long as |\n|---|---|---|---|---|---|")
     for (operation, size), run in own.items():
         time = nanoseconds(run)
         element = run.get("time/element")

@@ -153,7 +153,7 @@ namespace {
                 "\"4OFF\" files are not supported: only points with three coordinates are"},
             {".off", offPoints + "3 0 1 3\n", 6, "a face refers to point 3, but the file has 3 points, counted from 0"},
             {".off", "OFF\n1 0 0\n0 0 0 1 1\n", 3, "a color has 2 values instead of 3 or 4"},
-            {".off", "OFF\n2 0 0\n0 0 0 # 0 0 0\n", 4, "the file is cut off before point 2"},
+            {".off", "OFF\n2 0 0\n0 0 0 # 0 0 0\n", 4, "the file is cut off before point 1"},
             {".xyz", "0 0\n1 2\n", 1,
                 "there are 2 values; without a heading line that names the columns, 3, 4, 6, 7 or 9"},
             {".xyz", "0 0 0\n1 2 3 0 0 1\n", 2, "there are 6 values, but 3 in the lines above"},

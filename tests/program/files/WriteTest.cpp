@@ -216,7 +216,7 @@ namespace {
         auto const arraysIn = [](Object const& object) { return arraysOf(written(*object, ".vtp").content); };
 
         Object const mesh = twoFaces();
-        addDataProperty<float3>("a<\"b\">&", sPointComp, someValues<float3>(5), *mesh);
+        addDataProperty<float3>("a<\"b\">&\x01", sPointComp, someValues<float3>(5), *mesh);
         addDataProperty<unsigned long long>("id", sFaceComp, someValues<unsigned long long>(2), *mesh);
         addDataProperty<float3x3>("face:id", sFaceComp, someValues<float3x3>(2), *mesh);
         addDataProperty<bool>("tag", sFaceComp, {true, false}, *mesh);
@@ -224,7 +224,7 @@ namespace {
         addDataProperty<Orvan::String>("text", sFaceComp, {"a", "b"}, *mesh);
         EXPECT_THAT(written(*mesh, ".vtp").notes, ElementsAre(HasSubstr("\"text\""), HasSubstr("\"uv\"")));
         EXPECT_EQ(arraysIn(mesh),
-            (Arrays{{"<PointData> a&#60;&#34;b&#34;&#62;&#38; Float32x3", bytesOfArray<float3>(*mesh, "a<\"b\">&")},
+            (Arrays{{"<PointData> a&#60;&#34;b&#34;&#62;&#38;? Float32x3", bytesOfArray<float3>(*mesh, "a<\"b\">&\x01")},
                 {"<CellData> id UInt64x1", bytesOfArray<unsigned long long>(*mesh, "id")},
                 {"<CellData> id Float32x9", bytesOfArray<float3x3>(*mesh, "face:id")},
                 {"<CellData> tag UInt8x1", bytesOfArray<bool>(*mesh, "tag")},
