@@ -6,16 +6,16 @@
 #include <TessaraMathSupport/Types.h>
 #include <TessaraObject/Object.h>
 
-/// The steps of adaptive √3-subdivision (`subdivide.h`), for callers that run the passes themselves. A pass is: mark faces,
-/// `subdivide`, rebuild the half-edges, `computePositions`.
+/// The steps of adaptive √3-subdivision (`subdivide.h`), for callers that run the passes themselves. A pass is: mark
+/// faces, `subdivide`, rebuild the half-edges, `computePositions`.
 ///
 /// All take triangle meshes in the flat arrays that `subdivide.h` describes. `faceStates` has one byte per face and
 /// `vertexLevels` one per point; all are 0 in the coarse mesh. Of a state
 /// - bit 0 (marked) is set while a requested refinement is pending,
 /// - bit 1 (split) means that the current pass removes the face,
 /// - bits 2 to 7 are the level, two per step. A face of odd level is a third of a split face whose outer edge has not
-///   flipped yet, because the face across that edge has not split. A face of level 62 cannot be marked and never splits,
-///   since the levels of its replacements would not fit.
+///   flipped yet, because the face across that edge has not split. A face of level 62 cannot be marked and never
+///   splits, since the levels of its replacements would not fit.
 /// A point's level is the step that created it.
 ///
 /// Nothing is checked: arrays that do not fit together are undefined behavior. Results do not depend on the number of
@@ -35,12 +35,12 @@ MODELING_EXPORT bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned
     Orvan::Array<unsigned char> const& faceStates);
 
 /// One pass: balances marks across neighbors to find which faces split, replaces these faces, and adds their points. On
-/// return the counts, the arrays and the point data of `object` describe the refined mesh, and `halfEdges` still describes
-/// the mesh before. The standard properties of `object` and its counts are not modified.
+/// return the counts, the arrays and the point data of `object` describe the refined mesh, and `halfEdges` still
+/// describes the mesh before. The standard properties of `object` and its counts are not modified.
 /// \throws std::runtime_error  if the job is cancelled; only `faceStates` may have changed
 /// \throws std::bad_alloc      also if a count does not fit 32 bits. The counts, `faceVertex` and `faceOffset` then
-///                             describe the mesh before the pass; `faceStates` may have changed, and the arrays of points
-///                             and the point data of `object` may be longer than before.
+///                             describe the mesh before the pass; `faceStates` may have changed, and the arrays of
+///                             points and the point data of `object` may be longer than before.
 MODELING_EXPORT void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStructure const& halfEdges,
     unsigned int& numPoints, unsigned int& numFaceVertices, unsigned int& numFaces,
     Orvan::Array<Tessara::Math::float3>& basePositions, Orvan::Array<Tessara::Math::float3>& limitPositions,
@@ -52,8 +52,8 @@ MODELING_EXPORT void subdivide(Orvan::Array<bool> const& marks, HalfEdgeDataStru
 MODELING_EXPORT void computePositionsInfinity(HalfEdgeDataStructure const& halfEdges, unsigned int numPoints,
     Orvan::Array<Tessara::Math::float3> const& positions, Orvan::Array<Tessara::Math::float3>& limitPositions);
 
-/// Computes where each point is at the step of the finest face around it: between its base position, where it was created,
-/// and its limit position. Resizes `positions`.
+/// Computes where each point is at the step of the finest face around it: between its base position, where it was
+/// created, and its limit position. Resizes `positions`.
 MODELING_EXPORT void computePositions(HalfEdgeDataStructure const& halfEdges, unsigned int numPoints,
     Orvan::Array<Tessara::Math::float3> const& basePositions, Orvan::Array<Tessara::Math::float3> const& limitPositions,
     Orvan::Array<unsigned char> const& vertexLevels, Orvan::Array<unsigned char> const& faceStates,

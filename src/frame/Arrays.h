@@ -21,8 +21,8 @@ template <class T> Orvan::Array<T> uninitializedArray(std::uint64_t count)
     return Orvan::Array<T>(count, Orvan::kUninitialized);
 }
 
-// For elements of trivially copyable types: compiled once for all of them. Large arrays are cut into blocks, which run in
-// parallel.
+// For elements of trivially copyable types: compiled once for all of them. Large arrays are cut into blocks, which run
+// in parallel.
 
 /// Copies between memory that does not overlap.
 void copyBytes(void const* source, std::size_t bytes, void* target);
@@ -74,8 +74,8 @@ template <class T> Orvan::Array<T> zeroedArray(std::uint64_t count)
     return filledArray(count, T{});
 }
 
-/// The exclusive prefix sums of the counts, followed by the total: entry i is the offset of the output of element i, and
-/// the array has one entry more than there are elements.
+/// The exclusive prefix sums of the counts, followed by the total: entry i is the offset of the output of element i,
+/// and the array has one entry more than there are elements.
 /// \param countOf  `unsigned int (std::size_t element)`; called more than once per element, from several threads; must
 ///                 not throw
 /// \throws std::bad_alloc  also if the total does not fit 32 bits

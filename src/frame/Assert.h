@@ -4,9 +4,10 @@
 #include <cstdio>
 #include <cstdlib>
 
-/// Checks in debug and sanitizer builds what a caller or an earlier phase guarantees, and aborts with the condition and its
-/// place if it does not hold. Other builds do not evaluate the condition. For entries of operations and for the transitions
-/// between their phases, not for inner loops. A function that only assertions call is marked [[maybe_unused]].
+/// Checks in debug and sanitizer builds what a caller or an earlier phase guarantees, and aborts with the condition and
+/// its place if it does not hold. Other builds do not evaluate the condition. For entries of operations and for the
+/// transitions between their phases, not for inner loops. A function that only assertions call is marked
+/// [[maybe_unused]].
 #ifdef MODELING_ASSERTIONS
 #define MODELING_ASSERT(...)                                                                                           \
     ((__VA_ARGS__) ? static_cast<void>(0) : Modeling::Internal::assertionFailed(#__VA_ARGS__, __FILE__, __LINE__))

@@ -67,8 +67,8 @@ struct PlainForm {
 ///
 /// The rule takes `Form::Of<T>&`, deduced: `[&]<class T>(Orvan::Ptr<Orvan::Array<T>>& shared) { ...; return true; }`.
 /// It gets a copy of what the value holds, so an array is shared with the value while the rule runs, and `makeMutable`
-/// copies it. The rule must not modify `*value`. If `value` is null or empty, or holds no listed type in that form, no rule
-/// runs and `*result` is unchanged: the caller sets it to false beforehand and decides what a missing match means.
+/// copies it. The rule must not modify `*value`. If `value` is null or empty, or holds no listed type in that form, no
+/// rule runs and `*result` is unchanged: the caller sets it to false beforehand and decides what a missing match means.
 template <class Form, class Rule, class... T> void forEachElementType(
     ElementTypeList<T...>, Form, Tessara::PropertyValue const* value, bool* result, Rule const& rule)
 {

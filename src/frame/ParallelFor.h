@@ -34,17 +34,17 @@ namespace Internal {
 
 /// Runs `body` over sub-ranges of `range`, on the caller's thread and oneTBB's workers. All loops go through here.
 ///
-/// If the range is not larger than its grain, `body` is called once on the calling thread, without a task or a check for
-/// cancellation; for an empty range it is not called. `body` walks its sub-range in ascending order and writes only what
-/// belongs to these elements. All threads share it; it is not copied.
+/// If the range is not larger than its grain, `body` is called once on the calling thread, without a task or a check
+/// for cancellation; for an empty range it is not called. `body` walks its sub-range in ascending order and writes only
+/// what belongs to these elements. All threads share it; it is not copied.
 ///
 /// \param isolated  True: a cancellation of an enclosing oneTBB group does not reach the loop. False: it does, and the
 ///                  job's cancellation is checked after the loop. Only the balance sweep of subdivision passes false;
 ///                  all other operations run to completion once started.
-/// \throws          std::runtime_error with the text of `TSR::exceptionMessage` if not isolated and the job is cancelled.
-///                  The first exception of `body`, which cancels sub-ranges that have not started. std::bad_alloc if
-///                  oneTBB can allocate no tasks or start no worker thread after part of the range has run; if nothing
-///                  has run yet, the whole range runs on the calling thread instead.
+/// \throws          std::runtime_error with the text of `TSR::exceptionMessage` if not isolated and the job is
+///                  cancelled. The first exception of `body`, which cancels sub-ranges that have not started.
+///                  std::bad_alloc if oneTBB can allocate no tasks or start no worker thread after part of the range
+///                  has run; if nothing has run yet, the whole range runs on the calling thread instead.
 template <class Index, class Body>
 void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool isolated = true)
 {
@@ -76,8 +76,8 @@ template <class... Task> [[nodiscard]] bool runTasks(Task const&... tasks)
     return runCount.load(std::memory_order_relaxed) == sizeof...(Task);
 }
 
-/// Runs a scan or reduction of oneTBB that a cancellation of an enclosing task group does not reach: oneTBB would skip it
-/// silently.
+/// Runs a scan or reduction of oneTBB that a cancellation of an enclosing task group does not reach: oneTBB would skip
+/// it silently.
 /// \param work  Its loop bodies must not throw.
 /// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work may be done then. If
 ///         oneTBB runs out of memory between two tasks of one scan, it may terminate the process.

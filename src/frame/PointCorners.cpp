@@ -13,9 +13,9 @@ namespace Modeling {
 
 namespace {
 
-    /// Calls `work(first, last)` for parts of the points in parallel. Each part writes only what belongs to its points and
-    /// walks all corners in the same order: there are no atomics and nothing to sort, and the result does not depend on
-    /// the number of parts.
+    /// Calls `work(first, last)` for parts of the points in parallel. Each part writes only what belongs to its points
+    /// and walks all corners in the same order: there are no atomics and nothing to sort, and the result does not
+    /// depend on the number of parts.
     template <class Work> void forEachPartOfPoints(unsigned int pointCount, Work const& work)
     {
         auto const threads = static_cast<unsigned int>(tbb::this_task_arena::max_concurrency());

@@ -4,12 +4,13 @@
 #include <cstddef>
 #include <cstdint>
 
-/// Grain sizes of parallel loops: how many elements a task works on at least, and up to how many a loop runs on the calling
-/// thread alone.
+/// Grain sizes of parallel loops: how many elements a task works on at least, and up to how many a loop runs on the
+/// calling thread alone.
 ///
-/// With oneTBB 2021 on x86-64, starting a task takes about half a microsecond and waking up a thread takes several. oneTBB first
-/// cuts a range into a few parts per thread, and divides a part further only if a thread runs out of work. So a grain of 1
-/// costs nothing in long loops and balances uneven work; larger ones keep short loops off the scheduler.
+/// With oneTBB 2021 on x86-64, starting a task takes about half a microsecond and waking up a thread takes several.
+/// oneTBB first cuts a range into a few parts per thread, and divides a part further only if a thread runs out of work.
+/// So a grain of 1 costs nothing in long loops and balances uneven work; larger ones keep short loops off the
+/// scheduler.
 namespace Modeling {
 
 /// A small fixed amount of work per element: copy, fill or transfer a value. 1000 take 0.2 to a few microseconds, so a
@@ -24,8 +25,8 @@ inline constexpr unsigned int kFaceGrain = 1;
 inline constexpr unsigned int kOneRingGrain = 1;
 /// An input, a property, or a part of an array: microseconds to seconds each, and often few of them.
 inline constexpr std::size_t kCoarseGrain = 1;
-/// Sampling a volume at a point takes some nanoseconds once the tiles around it are known. But each task copies the sampler,
-/// whose tables begin empty: 48 kilobytes to set up, and tens of tiles to look up.
+/// Sampling a volume at a point takes some nanoseconds once the tiles around it are known. But each task copies the
+/// sampler, whose tables begin empty: 48 kilobytes to set up, and tens of tiles to look up.
 inline constexpr unsigned int kSampledPointGrain = 4096;
 
 /// Up to here, listing corners by point is done on the calling thread before a second one has woken up.
