@@ -37,7 +37,7 @@ namespace {
             }
         }
 
-        // For after the loop:
+        // To be called after the loop.
 
         bool hasBegun() const { return hasBegun_; }
 
