@@ -35,8 +35,8 @@ struct LocalStrand {
 ///
 /// Each control point is stored as mean value coordinates with respect to the corners of the polygon, and a height
 /// above it; neither the polygon nor the positions are kept. For each edge of the polygon the template records which
-/// strands end there, so that strands on neighboring polygons can be connected. Edge i runs from corner i to corner (i
-/// + 1) modulo `polySize`.
+/// strands end there, so that strands on neighboring polygons can be connected. Edge i runs from corner i to corner
+/// i + 1, and the last one to corner 0.
 ///
 ///     StitchTemplate const loop(polygon, positions, offsets, true);
 ///     if (loop.getErrors().empty())

@@ -28,9 +28,9 @@ namespace Tessara::GeometryAlgorithms {
 /// \param inputs  Null inputs, and those that the host's validator rejects, are skipped silently. An object may occur
 ///                more than once, and the output may be one of the inputs: its properties before the call are merged.
 /// \param output  Receives the merged mesh; its other keys are kept. If the result is false, it is unchanged with two
-///                exceptions. If an enclosing oneTBB task group was cancelled, all its keys are erased. If the first
-///                input has a connectivity array whose default is not an `unsigned int`, it receives the merged mesh,
-///                but none of the properties that are not geometry.
+///                exceptions. If an enclosing oneTBB task group was cancelled, all its keys are erased. If the default
+///                of the first input's `sFaceVertex` or `sFaceOffset` is not an `unsigned int`, it receives the merged
+///                mesh, but none of the properties that are not geometry.
 /// \param runtimeServices  Ignored; may be null.
 /// \return        False if no input is valid, a component would have more than 2^32 - 1 elements, or oneTBB skipped
 ///                part of the work because an enclosing task group was cancelled.

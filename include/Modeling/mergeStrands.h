@@ -17,7 +17,7 @@ namespace Tessara::GeometryAlgorithms {
 ///
 /// \param inputs  As for `mergeMeshes`.
 /// \param output  Receives the merged strands; its other keys are kept. If the result is false, it is unchanged with
-///                one exception: if the first input has strand offsets whose default is not an `unsigned int`, it
+///                one exception: if the default of the first input's `sStrandOffset` is not an `unsigned int`, it
 ///                receives the merged strands, but none of the properties that are not geometry.
 /// \param runtimeServices  Ignored; may be null.
 /// \return        False if no input is a valid strand set, there would be more than 2^32 - 1 points or strands, or

@@ -18,13 +18,13 @@ namespace Geometry::Mesh {
 /// point is between its position in the coarse mesh and its position on the limit surface, and its number of steps
 /// decides how far. The tolerance applies to the smoothed mesh. The last pass is one in which no face splits.
 ///
-/// A face is the result of at most 31 steps, which divide edge lengths by 25 million. It is then left as it is, even if
+/// No face is refined by more than 31 steps, which divide edge lengths by 25 million: it is then left as it is, even if
 /// it is still too large. This adds few faces if the tolerance is out of reach in isolated places only, such as around
 /// a point whose coordinates are so large that adjacent floats are farther apart than the tolerance.
 /// `markForSubdivision` of `subdivisionSteps.h` finds the faces of a result that are still too large; on a closed
 /// manifold, all of them have reached this limit.
 ///
-/// Existing points keep their numbers, and new ones follow. In each pass, faces that do not split keep their order, and
+/// Existing points keep their indices, and new ones follow. In each pass, faces that do not split keep their order, and
 /// new ones follow in the order of the faces that they replace, with the same orientation. Levels are not stored: a
 /// second call treats the refined mesh as a coarse one.
 ///
@@ -53,8 +53,8 @@ namespace Geometry::Mesh {
 ///                   with a closed but coarser mesh.
 /// \throws           std::bad_alloc, also if a count does not fit 32 bits. std::runtime_error with the text of
 ///                   `TSR::exceptionMessage` if the job is cancelled, which is checked several times per pass. The mesh
-///                   is then unchanged except for the removed data, and point data that may already have additional
-///                   values at its end.
+///                   is then unchanged except for the removed data, and for kept point data, whose arrays may already
+///                   have another length.
 ///
 /// Runs in parallel over faces and points, with the same result for any number of threads. Each pass is linear in its
 /// number of faces, so the run is linear in the size of the result if faces split evenly. Memory peaks at about 130

@@ -42,7 +42,7 @@ namespace Internal {
     /// the marks of faces that do not fit into twice their tolerance along every axis, and clears none. Samples the
     /// volume at all of `positions`.
     /// \pre  `marks` has at least `numFaces` entries.
-    /// \throws std::bad_alloc  before any mark is set
+    /// \throws std::bad_alloc  before any mark is set, unless oneTBB itself runs out of memory while faces are marked
     template <class Traits> void markForSubdivision(TSR::TileTree3D::LinearSampler<Traits> const& sampler,
         unsigned int numFaces, Orvan::Array<Tessara::Math::float3> const& positions,
         Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
