@@ -26,7 +26,7 @@ namespace {
         return isRequested;
     }
 
-    // Once, when the library is loaded: the line tells support which build a host is using.
+    // Written when the library is loaded: the line tells support which build a host is using.
     [[maybe_unused]] bool const hasWrittenVersionLine = writeVersionLine();
 
 }

@@ -21,22 +21,23 @@ struct HalfEdge {
     friend bool operator==(HalfEdge const&, HalfEdge const&) = default;
 };
 
-/// The adjacency of a mesh: for each point the directed edges that end there, indexed by the point at which they start.
+/// Half-edge adjacency of a polygon mesh: for each point, the directed edges (half-edges) that end there, looked up by
+/// the point at which they start.
 ///
-/// The mesh itself stays in its flat arrays. The face across the edge from a to b of some face is the one with the edge
-/// from b to a: `halfEdge(a, b)`. Its `corner` is at a and, in a triangle, is followed by the corner opposite the edge.
-/// On a closed manifold, the start points of the edges that end at a point are its neighbors, and the faces of these
-/// edges are the faces around it, each once.
+/// The mesh itself stays in its flat arrays. The face across an edge from a to b is the one with the edge from b to a:
+/// `halfEdge(a, b)`. Its `corner` is at a and, in a triangle, is followed by the corner opposite the edge. On a closed
+/// manifold, the start points of the edges that end at a point are its neighbors, and the faces of these edges are the
+/// faces around it, each once.
 ///
 /// Faces may have any number of corners, although `corner` and `faceSize` are truncated to 8 bits. If several faces
-/// have the same directed edge, the face with the lowest number is kept (within a face, the lowest corner), and the
-/// others are ignored silently: manifoldness is not checked.
+/// have the same directed edge, only that of the face with the lowest number is kept (within a face, that of the lowest
+/// corner), and the others are ignored silently: manifoldness is not checked.
 ///
 /// Any number of threads may read a structure concurrently. Building runs in parallel with the same result for any
 /// number of threads. It takes linear time however the points are numbered, plus the time to sort the edges at each
-/// point. Looking up an edge takes a few steps, or a binary search at points of high valence. Memory: 8 bytes per
-/// corner and 4 per point, and 8 more per corner if not all faces are triangles; temporarily up to 8 more per corner
-/// during construction for points of high valence and for repeated edges.
+/// point. Looking up an edge is a short linear search, or a binary search at points of high valence. Memory: 8 bytes
+/// per corner and 4 per point, and 8 more per corner if not all faces are triangles. During construction: 2 more per
+/// corner, and up to 8 more for points of high valence and repeated edges.
 class HalfEdgeDataStructure {
 public:
     struct Neighbor {
@@ -58,6 +59,7 @@ public:
         Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset);
 
     /// The directed edge from `other` to `point`; a default `HalfEdge` if there is none.
+    /// \pre  `point` is below the number of points, here and below.
     HalfEdge halfEdge(unsigned int point, unsigned int other) const
     {
         std::uint64_t const* const found = find(point, other);
@@ -67,26 +69,27 @@ public:
     /// The number of directed edges that end at the point: its valence on a closed manifold. Constant time.
     std::uint64_t valence(unsigned int point) const { return offsets_[std::uint64_t{point} + 1] - offsets_[point]; }
 
-    /// The number of directed edges: that of all corners of faces, less the edges that were ignored.
+    /// The number of directed edges: one per corner of a face, less the repeated edges that were ignored.
     std::uint64_t size() const { return entries_.size; }
 
     /// The directed edges that end at the point, in ascending order of the points at which they start.
     Neighbors neighbors(unsigned int point) const;
 
-    /// Removes all points and edges: no query about a point is valid afterwards.
+    /// Removes all points and edges, and releases the memory of the edges. No point may be queried afterwards.
     MODELING_EXPORT void clear() noexcept;
     MODELING_EXPORT void swap(HalfEdgeDataStructure& other) noexcept;
 
-    /// Whether some face has an edge that no face has in the opposite direction. Of each face only the triangle of its
-    /// first three corners is considered; a face with fewer corners counts as a boundary.
+    /// Whether some face has an edge that no face has in the opposite direction. Takes the arrays of the constructor,
+    /// and considers only the triangle of the first three corners of each face; a face with fewer corners counts as a
+    /// boundary. Runs in parallel over faces.
     MODELING_EXPORT bool hasBoundary(unsigned int numFaces, Orvan::Array<unsigned int> const& faceVertex,
         Orvan::Array<unsigned int> const& faceOffset) const;
 
 private:
     static constexpr std::ptrdiff_t kShortList = 24; // up to this length a linear search is faster than a binary search
 
-    // An entry holds the start point of the edge in its high half and the corner at the end of the edge in its low
-    // half. So ascending entries are in the order of the start points, and repeated edges in the order of the faces.
+    // An entry holds the start point of the edge in its high half, and the corner at the end of the edge in its low
+    // half. So sorted entries are in the order of their start points, and repeated edges in the order of their faces.
     static unsigned int startOf(std::uint64_t entry) { return static_cast<unsigned int>(entry >> 32); }
     static unsigned int cornerOf(std::uint64_t entry) { return static_cast<unsigned int>(entry); }
 

@@ -35,8 +35,8 @@ struct LocalStrand {
 ///
 /// Each control point is stored as mean value coordinates with respect to the corners of the polygon, and a height
 /// above it; neither the polygon nor the positions are kept. For each edge of the polygon the template records which
-/// strands end there, so that strands on neighboring polygons can be connected. Edge i runs from corner i to corner (i
-/// + 1) modulo `polySize`.
+/// strands end there, so that strands on neighboring polygons can be connected. Edge i runs from corner i to corner
+/// i + 1, and the last one to corner 0.
 ///
 ///     StitchTemplate const loop(polygon, positions, offsets, true);
 ///     if (loop.getErrors().empty())
@@ -45,9 +45,9 @@ struct LocalStrand {
 ///                 loop.findControlPointPos(corners, weights, scale, false, position);
 ///
 /// No function throws on bad input or returns a status: each error appends a fixed text, such as "---invalid input:
-/// polygon is empty---", to `errors`, without separators and in the order in which errors occur. A template with empty
-/// `errors` is usable. Functions that allocate throw std::bad_alloc; the template is then incomplete, but can be read,
-/// filled, assigned to and destroyed.
+/// polygon is empty---", to `errors` (see `getErrors`), without separators and in the order in which errors occur. A
+/// template with empty `errors` is usable. Functions that allocate throw std::bad_alloc; the template is then
+/// incomplete, but can be read, filled, assigned to and destroyed.
 ///
 /// Any number of threads may read a template concurrently, and `findControlPointPos` only reads it. Filling a template
 /// and computing coordinates modify it. All computation is in single precision and on the calling thread.
@@ -65,29 +65,31 @@ public:
 
     /// Takes the polygon from the only face of a mesh, and the strands from a strand set.
     ///
+    /// Three errors come before those of `construct`, and leave `polySize` 0:
+    /// - "---input mesh not single polygon---": the mesh does not have exactly one face.
+    /// - "---input poly missing face_vertices property---"
+    /// - "---input poly missing point_positions property---"
+    ///
     /// \param mesh       Its `sFaceVertex` and `sPointPosition` give the polygon: one corner per entry of
     ///                   `sFaceVertex`, in the plane z = 0. If a point index is out of range, the polygon counts as
     ///                   missing.
     /// \param strandSet  Its `sPointPosition` and `sStrandOffset` are the other arguments of `construct`.
-    /// \param strict     As in `construct`. Three errors stop before that, with `polySize` 0:
-    ///                   "---input mesh not single polygon---" if the mesh does not have exactly one face;
-    ///                   "---input poly missing face_vertices property---";
-    ///                   "---input poly missing point_positions property---".
+    /// \param strict     As in `construct`.
     MODELING_EXPORT StitchTemplate(Tessara::Object const& mesh, Tessara::Object const& strandSet, bool strict);
 
     /// Fills the template.
     ///
     /// Each position becomes a control point with the weights from `computeMeanValueCoordinates`, even if it causes
-    /// errors. The `scale` of the coordinates is the mean edge length of the polygon in the plane. Strand ends on
-    /// polygon edges are recorded in order from corner i to corner i + 1: two ends are ordered by the weight of corner
-    /// i, more than two, unless `strict`, by the weight of corner i + 1; of more than two, ends at the same position
-    /// are reduced to the one that was recorded last. An end at a corner is on no edge.
+    /// errors. The `scale` of the coordinates is the mean edge length of the polygon in the plane. The strand ends on
+    /// edge i are recorded in order from corner i to corner i + 1. Two ends are sorted by descending weight of corner
+    /// i. More than two are, unless `strict`, sorted by ascending weight of corner i + 1, and of ends with equal
+    /// weights only the one recorded last is kept. An end at a corner is on no edge.
     ///
-    /// On entry, `tol` is a fraction of the mean edge length; it is overwritten by the corresponding length. Nothing is
-    /// cleared: texts and strands are appended to existing ones, although the recorded ends count strands from 0. So
-    /// fill only templates that were never filled, and call `setErrors("")` first on a default-constructed one.
+    /// On entry, `tol` is a fraction of the mean edge length; it is multiplied by that length. Nothing is cleared:
+    /// texts and strands are appended to existing ones, although the recorded ends count strands from 0. So fill a
+    /// template only once, and call `setErrors("")` first on a default-constructed one.
     ///
-    /// \param polygon          The corners in order, all with |z| up to the tolerance.
+    /// \param polygon          The corners in order, each with |z| up to the resulting `tol`.
     /// \param strandPositions  The control points of all strands, one strand after the other.
     /// \param strandOffsets    Strand count + 1 entries: strand s has the positions from entry s up to but excluding
     ///                         entry s + 1. A strand whose entries decrease or lead beyond the positions has no control
@@ -96,16 +98,17 @@ public:
     ///                         one or two ends.
     ///
     /// These errors stop before any strand is added:
-    /// - "---invalid input: missing polygon or strand---": an argument is null; nothing has changed.
+    /// - "---invalid input: missing polygon or strand---": an argument is null; nothing else has changed.
     /// - "---invalid input: polygon is empty---"
     /// - "---invalid input: polygon is degenerated---": one or two corners.
     /// - "---invalid input: empty input strands offset---": fewer than two entries.
-    /// - "---invalid input: input polygon must lie in the xy plane---": a corner is off it; `tol` is already a length.
+    /// - "---invalid input: input polygon must lie in the xy plane---": a corner is off that plane; `tol` is already a
+    ///   length.
     ///
-    /// The others do not stop, so that all errors of a template are reported together. For each control point, those of
-    /// `computeMeanValueCoordinates` come first:
+    /// After the others, filling continues, so that all errors of a template are reported together. For each control
+    /// point, those of `computeMeanValueCoordinates` come first:
     /// - "---strand starting point not on polygon edge---", "---strand ending point not on polygon edge---": only if
-    ///   `strict`; otherwise such an end is simply not recorded.
+    ///   `strict`; otherwise such an end is not recorded.
     /// - "---strand starting point on edge but outside of polygon---",
     ///   "---strand ending point on edge but outside of polygon---": a corner of that edge has no positive weight; the
     ///   end is not recorded.
@@ -125,10 +128,10 @@ public:
     /// A point closer than `tol` to a corner has weight 1 at that corner. A point between the ends of an edge of length
     /// l, and closer to the edge than about 2 * `tol` * `scale` / l, has weights at these two corners only.
     ///
-    /// \param polygon  `polySize` corners, clockwise or counter-clockwise, convex or not
-    /// \param weights  `polySize` + 1 entries, of which the first `polySize` must be zero, because results are added to
-    ///                 them
-    /// \param scale    The unit of the height, and of the area tolerance `tol` * `scale`. Not zero.
+    /// \param polygon  `polySize` corners, clockwise or counterclockwise, convex or not.
+    /// \param weights  `polySize` + 1 entries: receives the coordinates, then the height. The first `polySize` must be
+    ///                 zero on entry, because coordinates are added to them.
+    /// \param scale    The unit of the height, not zero. The tolerance for triangle areas is `tol` * `scale`.
     /// \return         The first edge with the point on it; 0xFFFFFFFF if there is none.
     ///
     /// Appends to `errors`: "---control point too close to polygon vertex---", with the other weights unchanged;
@@ -136,14 +139,15 @@ public:
     /// -0.2; "---point lies too far out side of polygon---" for each weight below -0.2. The weights are written in all
     /// cases. Divisions are not guarded: if the weights sum to 0, they become infinite or NaN.
     ///
-    /// Takes time linear in the number of corners. Allocates only if there are more than 16 corners.
+    /// Takes time linear in the number of corners. Apart from error texts, allocates only if there are more than 16
+    /// corners.
     MODELING_EXPORT unsigned int computeMeanValueCoordinates(Orvan::Array<Math::float3> const& polygon,
         Math::float3 const& point, Orvan::Array<float>& weights, float scale);
 
     /// Computes the position of a control point on another polygon, offset by its height along a normal that is blended
     /// from the normals at the corners.
     ///
-    /// \param polygon   `polySize` corners in space; missing entries of shorter arrays are ignored
+    /// \param polygon   `polySize` corners in space. Corners that this array, `weights` or `normals` lacks are ignored.
     /// \param weights   Of a control point. Without the last entry, the height, there is no offset.
     /// \param scale     The unit of the height, such as the mean edge length of this polygon.
     /// \param normals   One per corner, of any length. If their blend is zero, the position is NaN.

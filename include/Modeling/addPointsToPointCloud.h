@@ -9,11 +9,11 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Appends points to a point cloud, and values for them to all its properties.
+/// Appends points to a point cloud, with values for them in all its properties.
 ///
 /// - Data properties of the 36 scalar, vector, matrix and string types get the property's `sDefault` for the new
-///   points. If there is no default of their type, they get zeros (also for matrices) or empty strings. Arrays of
-///   another length than the old point count are padded or trimmed to the new count too.
+///   points. If there is no default of their type, they get zeros (also for matrices) or empty strings. Arrays whose
+///   length differs from the old point count are padded in the same way, or trimmed, to the new count.
 /// - Data properties of the host's record types (`GeometryType`, `GeoLocation`, `FaceEdge`, `GraphTransforms`), and
 ///   those whose array is null, lose their array: `sData` becomes empty.
 /// - Range properties get `kInvalidIndex`, so that new points refer to no data; null indices stay null.
@@ -23,13 +23,13 @@ namespace Tessara::GeometryAlgorithms {
 ///                   the new ones. Replaces any property of that name. Empty for no tag.
 /// \param object     A point cloud. Other references to its properties and arrays see no change.
 /// \param services   Ignored; may be null.
-/// \return           False, with the object unchanged: it is not a point cloud, has further components or no float3
-///                   array of positions for its points, or the new count exceeds 32 bits. False, with all of the above
-///                   done: the tag is named `sPointPosition` and has replaced the positions.
-/// \throws           std::bad_alloc, with the object unchanged. Does not look at job cancellation.
+/// \return           False, with the object unchanged: it is not a point cloud, has other components or no float3 array
+///                   of positions for its points, or the new count exceeds 32 bits. False, with all of the above done:
+///                   the tag is named `sPointPosition` and has replaced the positions.
+/// \throws           std::bad_alloc, with the object unchanged. Job cancellation is ignored.
 ///
-/// Linear in the new number of points, in parallel. Copies each array once, into a new one with the capacity that
-/// growing gives; the old arrays are released at the end.
+/// Linear in the new number of points. Copies one array after another, blocks of large ones in parallel, each into a
+/// new array with spare capacity for later points; the old arrays are released at the end.
 MODELING_EXPORT bool addPointsToPointCloud(Orvan::Array<Tessara::Math::float3> const& positions,
     Orvan::String const& tag, Tessara::Object& object, Orvan::RuntimeServices const* services);
 

@@ -5,14 +5,14 @@
 
 namespace Tessara::GeometryAlgorithms {
 
-/// Computes the new indices of a component's elements after some of them are deleted: the order of the others is kept,
-/// without gaps.
+/// Computes the remap of a deletion: the new index of each element of a component after some of them are deleted. The
+/// others keep their order and are renumbered without gaps.
 ///
 /// \param deleted  One entry per element of a component; true deletes the element.
 /// \pre            Fewer than 4,294,967,294 entries, so that indices differ from the sentinels.
 /// \return         One entry per element: its new index, which counts up from 0 over the kept elements, or
 ///                 `kDeletedElement`. A new index is never greater than the old one. `deleteComponents` takes such
-///                 arrays.
+///                 a remap.
 /// \throws         std::bad_alloc.
 ///
 /// One pass on the calling thread; 4 bytes per element.

@@ -11,9 +11,9 @@ namespace Tessara::GeometryAlgorithms {
 /// elements is kept.
 ///
 /// - The count of the component becomes the number of kept elements.
-/// - Data properties of any of the forty element types lose the values of deleted elements. What an array holds beyond
-///   the count is trimmed: an offset array, which has one more entry, loses its last entry, and the entries of kept
-///   elements are unchanged.
+/// - Data properties of any of the forty element types lose the values of deleted elements, and values beyond the
+///   count. So an offset array, which has one more entry than there are elements, loses its last entry; the entries of
+///   kept elements are unchanged.
 /// - Range properties lose the entries of deleted elements. The data that targets the range then loses the values that
 ///   no entry refers to any more, even if no element was deleted, and the entries are renumbered; `kInvalidIndex` is
 ///   kept.
@@ -28,20 +28,19 @@ namespace Tessara::GeometryAlgorithms {
 /// \param component  Name of the component, for instance `sPointComp`.
 /// \param object     Any geometry object. Other references to its properties and arrays see no change; arrays that are
 ///                   not shared are edited in place.
-/// \pre              Kept entries of the remap count up from 0. Otherwise elements may end up at other indices than it
-///                   says, but nothing is read or written outside the arrays. Range entries that are neither an index
-///                   into the data nor `kInvalidIndex` become `kInvalidIndex` if the data has elements.
+/// \pre              The new indices in the remap count up from 0. Otherwise elements may end up at other indices than
+///                   it says, but nothing is read or written outside the arrays. Range entries that are neither an
+///                   index into the data nor `kInvalidIndex` become `kInvalidIndex` if the data has elements.
 /// \return           False, with the object unchanged: there is no such component, its count is 0, or its count differs
 ///                   from the remap's length. False, without rollback, if a range of the component is refused: data
-///                   that targets it has no array or one of another element type than the forty; `sIndices` is null or
-///                   empty, but there is data; or a data property follows one that has elements. The count, the
-///                   properties that precede the range in the order of the object's keys, and the range's data that
-///                   precedes what was refused have then been changed, while the entries of the range keep their old
-///                   numbers.
+///                   that targets it has no array of the forty element types; `sIndices` is null or empty, but there
+///                   is data; or a data property of the range follows one that has elements. The count, the properties
+///                   that precede the range in the order of the object's keys, and the range's data that precedes what
+///                   was refused have then been changed, while the range itself and what follows it have not.
 /// \throws           std::bad_alloc, with the object unchanged.
 ///
 /// Linear in the number of elements. Shared arrays are compacted concurrently, each on one thread, into memory of the
-/// final size; the others in place, one after another. Uses 4 bytes per kept element, and up to 9 per value of a
+/// final size; the others in place, one after another. Allocates 4 bytes per kept element, and up to 9 per value of a
 /// range's data.
 MODELING_EXPORT bool deleteComponents(
     Orvan::Array<unsigned int> const& remap, Orvan::String const& component, Tessara::Object& object);

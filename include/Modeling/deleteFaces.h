@@ -19,15 +19,15 @@ namespace Tessara::GeometryAlgorithms {
 ///                 corners becomes the new index of the corner after it, or `kDeletedElement` if that corner is
 ///                 deleted.
 /// \return         False, with the mesh unchanged: it is not a mesh or has no points, the length of `deleted` is not
-///                 the number of faces, `sFaceOffset` does not have one entry more, or one of the two index arrays is
-///                 missing, has another type, targets another component or (`sFaceVertex`) is shorter than it. False,
-///                 without rollback: the mesh has points but no corners, and loses all points; or `deleteComponents`
-///                 refuses a range property. Points come first, then corners, then faces, and what precedes the refusal
-///                 has been changed: the two index arrays may then hold old indices.
+///                 the number of faces, `sFaceOffset` does not have face count + 1 entries, `sFaceVertex` is shorter
+///                 than the corner count, or one of the two is missing, has another type or targets another component.
+///                 False, without rollback: the mesh has points but no corners or no faces, and loses all points; or
+///                 `deleteComponents` would refuse a range property. Points come first, then corners, then faces, and
+///                 what precedes the refusal has been changed: the two index arrays may then hold old indices.
 /// \throws         std::bad_alloc, with the mesh unchanged.
 ///
 /// Linear in the number of points, corners and faces. Marks used points on the calling thread, and compacts arrays as
-/// `deleteComponents` does. Uses 5 bytes per point, and 4 per kept point, corner and face.
+/// `deleteComponents` does. Allocates 5 bytes per point, and 4 per kept point, corner and face.
 MODELING_EXPORT bool deleteFaces(Orvan::Array<bool> const& deleted, Tessara::Object& mesh);
 
 }

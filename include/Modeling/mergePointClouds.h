@@ -15,8 +15,8 @@ namespace Tessara::GeometryAlgorithms {
 /// \param output  Receives the merged cloud; its other keys are kept. If the result is false, it is unchanged.
 /// \param runtimeServices  Ignored; may be null.
 /// \return        False if no input is a valid point cloud, or there would be more than 2^32 - 1 points.
-/// \throws        std::bad_alloc, also if the data of a range does not fit 32 bits, with the output unchanged. Does not
-///                look at job cancellation.
+/// \throws        std::bad_alloc, also if the data of a range does not fit 32 bits, with the output unchanged. Job
+///                cancellation is ignored.
 ///
 /// Runs in parallel over properties, inputs and elements. The result does not depend on the number of threads. Writes
 /// each byte of the result once; temporary memory is small.

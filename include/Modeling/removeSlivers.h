@@ -17,14 +17,14 @@ namespace Geometry::Mesh {
 /// A face is a needle if its shortest edge is shorter than `ratio` times its longest edge. Faces are visited once, in
 /// ascending order, and measured as the earlier collapses have left them. A collapse is skipped if it would make the
 /// surface non-manifold or reduce it to nothing (the ends of the edge must have exactly two common neighbors, and must
-/// not both have valence 3), or if it would turn over a face around either end, compared to the normal that this face
-/// had before the first collapse.
+/// not both have valence 3), or if it would flip a face around either end: move the point to or across the opposite
+/// edge, or turn the normal by 90 degrees or more from the one that this face had before the first collapse.
 ///
 /// Each collapse removes one point and two faces: the point at the start of the edge moves to the midpoint, and the
 /// point at the end is removed. Remaining points and faces are renumbered: holes are filled from the end of the arrays,
 /// so the order is kept only before the first hole.
 ///
-/// \param ratio  Fraction of the longest edge, dimensionless. 0 collapses nothing.
+/// \param ratio  Fraction of the longest edge, dimensionless. Nothing collapses if it is 0, negative or NaN.
 /// \param mesh   Reads and rewrites `sPointPosition` (one float3 per point, in scene units), `sFaceVertex` (one point
 ///               index per corner) and `sFaceOffset` (face count + 1 entries), and the counts of `sPointComp`,
 ///               `sFaceVertexComp` and `sFaceComp`. Other properties keep their old arrays and old lengths: the
@@ -33,7 +33,7 @@ namespace Geometry::Mesh {
 /// \pre          Closed and manifold, three corners per face, arrays that fit their counts, point indices in range. A
 ///               mesh with faces other than triangles is left unchanged; at boundaries and around non-manifold edges
 ///               and points nothing collapses. If an index is out of range, the behavior is undefined.
-/// \return       Always true. A mesh without one of the three arrays is left unchanged.
+/// \return       Always true. A mesh in which one of the three arrays is missing or too short is left unchanged.
 /// \throws       std::bad_alloc, with the mesh unchanged. Job cancellation is ignored.
 ///
 /// Measuring and adjacency run in parallel, the collapses on the calling thread; the result is the same for any number

@@ -17,25 +17,26 @@ namespace Modeling::Internal {
 /// The elements that are kept, out of `oldCount`.
 struct KeptElements {
     std::uint64_t oldCount = 0;
-    IndexArray sources; // per kept element its old index, ascending
+    IndexArray sources; // the old index of each kept element, ascending
 };
 
-/// The compaction of one array to the kept elements: into a new array or, if the old one is not shared, in place.
+/// Compacts one array to the kept elements: into a new array or, if the old one is not shared, in place.
 class ArrayCompaction {
 public:
     virtual ~ArrayCompaction() = default;
     virtual std::uint64_t newSize() const = 0;
-    /// Fills the new array, unless the compaction is in place or copying may throw. May be called on any thread.
+    /// Fills the new array. Does nothing if the compaction is in place, or if copying may throw: the constructor has
+    /// filled the array then. May be called on any thread.
     virtual void fill() = 0;
-    /// Returns the compacted array, once the object has released the old one. Does not allocate.
+    /// Returns the compacted array. To be called once the object has released the old one. Does not allocate.
     virtual Tessara::PropertyValue finish() = 0;
 
-    // For index arrays, before they are filled. The arguments must live until `finish`.
+    // To be called for index arrays before `fill`. The arguments must live until `finish`.
 
     /// Entry e becomes `remap[e]`, or `kInvalidIndex` if the remap is too short for it.
     virtual void renumber(IndexArray const&) { }
-    /// For offset arrays, which have one more entry: from old into new indices of the elements that the offsets refer
-    /// to.
+    /// For offset arrays: maps entries from old to new indices of the elements that they refer to, of which `kept`
+    /// remain, and appends the closing entry.
     virtual void renumberOffsets(KeptElements const&) { }
 };
 
@@ -50,7 +51,7 @@ public:
         if (inPlace)
             return;
         target_ = Orvan::MutablePtr<Orvan::Array<T>>::make();
-        // Offset arrays, which are longer than their component, get a closing entry in the end.
+        // Reserves room for the closing entry of offset arrays, which are longer than their component.
         target_->reserve(kept_.size + (source_->size > kept.oldCount ? 1 : 0));
         target_->resize(kept_.size, Orvan::kUninitialized);
         if constexpr (!kTrivial)
@@ -88,7 +89,7 @@ protected:
         target_ = makeMutable(std::move(source_)); // does not copy: this is the last reference
         T* const values = target_->data;
         unsigned int const* const source = kept_.data;
-        // Values only move forward, so none is overwritten before it has moved.
+        // Values only move toward the front, so none is overwritten before it has moved.
         for (std::uint64_t element = 0; element != kept_.size; ++element)
             if (source[element] != element)
                 values[element] = std::move(values[source[element]]);
@@ -100,7 +101,7 @@ protected:
     Orvan::MutablePtr<Orvan::Array<T>> target_; // if in place, null until `finish`
 };
 
-/// Maps old indices of elements to new ones. Fast for ascending queries.
+/// Maps old indices of elements to new ones. Fastest if the queries ascend.
 class NewIndices {
 public:
     explicit NewIndices(KeptElements const& kept)
@@ -109,7 +110,7 @@ public:
     {
     }
 
-    /// The new index; `kDeletedElement` for a deleted element, and the new number of elements for an index beyond all.
+    /// The new index; `kDeletedElement` for a deleted element, and the new element count for an index past the end.
     unsigned int of(unsigned int oldIndex)
     {
         if (oldIndex >= oldCount_)
@@ -118,7 +119,7 @@ public:
             last_ = 0;
         if (sources_.empty() || sources_[last_] > oldIndex)
             return Tessara::Geometry::kDeletedElement;
-        // At the latest here, which it is if no element in between was deleted.
+        // The new index is at most `latest`, and equal to it if no element in between was deleted.
         std::uint64_t const latest = std::min(last_ + (oldIndex - sources_[last_]), sources_.size - 1);
         last_ = sources_[latest] == oldIndex
             ? latest
@@ -130,7 +131,7 @@ public:
 private:
     std::uint64_t oldCount_;
     IndexArray const& sources_;
-    std::uint64_t last_ = 0; // new index near that of the last query
+    std::uint64_t last_ = 0; // where the search of the last query ended
 };
 
 class IndexCompaction final : public TypedCompaction<unsigned int> {
@@ -160,8 +161,8 @@ public:
     }
 
 private:
-    /// Writes the renumbered entries. Returns false, with nothing written, if there is no renumbering.
-    /// \param source  Indices into `entries`; null if entries keep their places.
+    /// Writes the renumbered entries. Returns false, with nothing written, if they are not to be renumbered.
+    /// \param source  For each kept element, its index in `entries`; null if `entries` is already compact.
     bool writeRenumbered(unsigned int const* entries, unsigned int const* source)
     {
         auto const writeAll = [&](auto&& newEntryOf) {

@@ -30,7 +30,8 @@ namespace {
         return newIndex != kDeletedElement;
     }
 
-    /// \param entries  Flags or a remap.
+    /// Lists the kept elements.
+    /// \param entries  Flags of deleted elements, or a remap.
     template <class Entries> KeptElements keptElements(Entries const& entries)
     {
         auto const* const entry = entries.data;
@@ -40,8 +41,8 @@ namespace {
 
         KeptElements kept{entries.size, uninitializedArray<unsigned int>(keptCount)};
         unsigned int* const source = kept.sources.data;
-        // Without a branch, which would be mispredicted half of the time: the index of a deleted element is overwritten
-        // by the next one.
+        // Without a branch, which would often be mispredicted: the index of a deleted element is overwritten by the
+        // next one.
         std::uint64_t count = 0;
         for (unsigned int element = 0; count != keptCount; ++element) {
             source[count] = element;
@@ -57,7 +58,7 @@ namespace {
             && (sources.empty() || sources[sources.size - 1] < kept.oldCount);
     }
 
-    /// 0 if the value holds no array of a listed type.
+    /// The length of the array that a value holds; 0 if it holds none of a listed type.
     std::uint64_t lengthOfArray(PropertyValue const& value)
     {
         std::uint64_t length = 0;
@@ -69,7 +70,7 @@ namespace {
         return length;
     }
 
-    /// Marks the values of a range's data that no entry of a kept element refers to.
+    /// Marks the values of a range's data that no kept entry of the range refers to.
     Orvan::Array<bool> findUnused(std::uint64_t length, IndexArray const& indices, KeptElements const& kept)
     {
         Orvan::Array<bool> isUnused = filledArray<bool>(length, true);
@@ -79,7 +80,7 @@ namespace {
         return isUnused;
     }
 
-    /// Whether entries that refer to a value still do after it has been renumbered.
+    /// Whether each kept entry that refers to a value gets the new index of a kept value.
     [[maybe_unused]] bool leadsToKeptValues(
         IndexArray const& indices, KeptElements const& kept, IndexArray const& dataRemap, std::uint64_t keptValueCount)
     {
@@ -88,9 +89,9 @@ namespace {
         });
     }
 
-    /// Whether the array, or the property that holds it, has references outside the object, which would see an edit in
-    /// place.
-    /// \param localReferences  References to the array in the caller's variables.
+    /// Whether the array, or the property that holds it, is shared with something outside the object, which would see
+    /// an edit in place.
+    /// \param localReferences  How many variables of the caller refer to the array.
     template <class T> bool isShared(Object const& object, Orvan::String const& key,
         Orvan::Ptr<Orvan::Array<T>> const& array, std::uint64_t localReferences)
     {
@@ -99,7 +100,7 @@ namespace {
         return property.useCount() > kOwner + 1 || array.useCount() > kOwner + localReferences;
     }
 
-    /// Takes the array out of a clone of a property, so that the clone's reference does not count as sharing.
+    /// Removes the array from a clone of a property, so that the clone's reference does not count as sharing.
     PropertyValue takeArray(char const* arrayKey, Object& property)
     {
         PropertyValue array = property.getProperty(arrayKey);
@@ -141,7 +142,7 @@ bool Deletion::prepare(Orvan::String const& component, KeptElements const& kept)
 
     for (auto& [name, property] : collectGeoPropsByTarget(object_, component)) {
         GeoPropertyKind const kind = classifier_.kindOf(*property);
-        // Data without a matching array is kept unchanged, and that is no failure.
+        // Data without an array that can be compacted is kept unchanged, which is not a failure.
         if (kind == GeoPropertyKind::Data)
             prepareArray<AllElementTypes>(name, sData, std::move(property), kept);
         else if (kind == GeoPropertyKind::Range && !prepareRange(name, std::move(property), kept))
@@ -175,7 +176,7 @@ bool Deletion::prepareRange(Orvan::String const& name, Orvan::MutablePtr<Object>
         if (!prepareArray<AllElementTypes>(dataName, sData, std::move(data), *kept_.back()))
             return false;
     }
-    indices = nullptr; // or it would count as sharing
+    indices = nullptr; // otherwise it would count as sharing
     if (prepareArray<ElementTypeList<unsigned int>>(name, sIndices, std::move(range), kept) && dataRemap)
         renumber(name, *dataRemap);
     return true;
@@ -238,7 +239,7 @@ void Deletion::commit()
     for (Count const& count : counts_)
         setElementCount(count.component, count.count, object_);
     for (Change& change : changes_) {
-        object_.setProperty(change.key, Orvan::Ptr<Object>()); // releases the array, which may be edited in place
+        object_.setProperty(change.key, Orvan::Ptr<Object>()); // releases the array, so that it can be edited in place
         PropertyValue array = change.array->finish();
         MODELING_ASSERT(lengthOfArray(array) == change.array->newSize());
         change.property->setProperty(change.arrayKey, std::move(array));

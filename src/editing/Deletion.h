@@ -11,7 +11,8 @@
 
 namespace Modeling::Internal {
 
-/// Deletes elements of components of one object: prepares all changes first, and then makes them without failing.
+/// Deletes elements of components of one object. All changes are prepared first, so that an operation that runs out of
+/// memory leaves the object unchanged.
 class Deletion {
 public:
     explicit Deletion(Tessara::Object& object)
@@ -20,7 +21,7 @@ public:
     }
 
     // These prepare what `deleteComponents` does to one component. If one returns false, the changes up to the refusal
-    // stay prepared: operations make them, and do not roll back.
+    // stay prepared: operations commit them, and do not roll back.
 
     bool prepare(Orvan::String const& component, Orvan::Array<bool> const& deleted);
     bool prepare(Orvan::String const& component, IndexArray const& remap);
@@ -32,8 +33,9 @@ public:
     void renumber(Orvan::String const& key, IndexArray const& remap);
     void renumberOffsets(Orvan::String const& key, KeptElements const& kept);
 
-    /// Makes the prepared changes. Does not allocate, provided that the host does not allocate to replace the value of
-    /// a present key.
+    /// Makes the prepared changes. Nothing is allocated once the first one is made, provided that the host does not
+    /// allocate to replace the value of a present key.
+    /// \throws std::bad_alloc  if oneTBB runs out of memory while arrays are filled, with the object unchanged
     void commit();
 
 private:
@@ -44,7 +46,7 @@ private:
     struct Change {
         Orvan::String key;
         char const* arrayKey; // `sData` or `sIndices`
-        Orvan::MutablePtr<Tessara::Object> property; // replaces the present one; has no array until the commit
+        Orvan::MutablePtr<Tessara::Object> property; // replaces the present one; has no array before the commit
         std::unique_ptr<ArrayCompaction> array;
     };
 

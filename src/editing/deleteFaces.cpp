@@ -22,7 +22,7 @@ using Modeling::Internal::KeptElements;
 
 namespace {
 
-    /// The corners that are kept with the faces, and the points that are deleted with them.
+    /// What the deletion of faces means for the other elements: the corners that are kept, and the points that are not.
     struct FaceElements {
         KeptElements corners;
         Orvan::Array<bool> unusedPoints;
@@ -79,7 +79,7 @@ namespace {
         return isUnused;
     }
 
-    /// Whether the points of all kept corners are kept.
+    /// Whether the point of every kept corner is kept.
     [[maybe_unused]] bool keepsPointsOfCorners(FaceElements const& elements, IndexArray const& faceVertex)
     {
         Orvan::Array<bool> const& isUnused = elements.unusedPoints;
@@ -100,8 +100,8 @@ namespace {
         return elements;
     }
 
-    /// Points, then corners, then faces. An index array is renumbered once its whole component has been prepared: if
-    /// that is refused, it keeps its old numbers.
+    /// Prepares points, then corners, then faces. An index array is renumbered only after its whole component has been
+    /// prepared: if that is refused, the array keeps its old indices.
     bool prepareDeletion(Orvan::Array<bool> const& deleted, FaceElements const& elements, IndexArray const& pointRemap,
         Deletion& deletion)
     {

@@ -31,7 +31,7 @@ namespace {
         NewValues const& given;
     };
 
-    /// A copy of `source` that is trimmed or extended to `newCount` elements, with the capacity that growing gives. The
+    /// A copy of `source`, trimmed or extended to `newCount` elements, with the capacity that appending would give. The
     /// added elements are uninitialized.
     template <class T> Orvan::Array<T> grownCopy(Orvan::Array<T> const& source, std::uint64_t newCount)
     {
@@ -61,7 +61,7 @@ namespace {
         return array;
     }
 
-    /// Like `extended`, but the new elements get the given values.
+    /// As `extended`, but the new elements get the given values.
     Orvan::Array<Math::float3> extendedByGiven(
         Orvan::Array<Math::float3> const& source, Object const& property, Extension const& extension)
     {
@@ -73,8 +73,8 @@ namespace {
         return array;
     }
 
-    /// The value of `sData` for the new count. Empty if the property has no array, or one that is not of a core type:
-    /// what cannot be extended is dropped.
+    /// The value of `sData` for the new count. Empty if the property has no array of a core type: an array that cannot
+    /// be extended is dropped.
     PropertyValue extendedData(Orvan::String const& name, Object const& property, Extension const& extension)
     {
         PropertyValue const data = property.getProperty(sData);
@@ -154,7 +154,7 @@ bool extendComponent(Orvan::String const& component, std::uint64_t addCount, Orv
     MODELING_ASSERT(given.values.size == addCount);
     Extension const extension{component, oldCount, oldCount + addCount, given};
 
-    // The arguments may be stored in the object itself: they are read before its first change.
+    // The arguments may be stored in the object itself, so all of them are read before the object changes.
     PreparedWrites writes(object);
     if (!writes.setElementCount(component, static_cast<unsigned int>(extension.newCount)))
         return false;

@@ -9,17 +9,18 @@
 
 namespace Modeling::Internal {
 
-/// Values for the new elements of one float3 property, which get these instead of its default: one value per element.
+/// Values that the new elements of one float3 property get instead of its default.
 struct NewValues {
     Orvan::String property;
-    Orvan::Array<Tessara::Math::float3> const& values;
+    Orvan::Array<Tessara::Math::float3> const& values; // one per new element
 };
 
 /// Adds elements to a component, and values for them to all data and range properties that target it, as
-/// `addPointsToPointCloud` says for points. A tag, which is stored unless its name is empty, always targets the points.
+/// `addPointsToPointCloud` documents for points. The tag is stored unless its name is empty; it always targets the
+/// points.
 /// \pre     `given` has one value per new element.
-/// \return  False, with nothing changed, if there is no such component or the new count exceeds 32 bits.
-/// \throws  std::bad_alloc, with the object as it was.
+/// \return  False, with the object unchanged, if there is no such component or the new count exceeds 32 bits.
+/// \throws  std::bad_alloc, with the object unchanged.
 bool extendComponent(Orvan::String const& component, std::uint64_t addCount, Orvan::String const& tag,
     NewValues const& given, Tessara::Object& object);
 

@@ -8,11 +8,11 @@ namespace Modeling {
 
 namespace {
 
-    /// Fills the start value by value and copies it from there, which is several times as fast for sizes that are not a
-    /// power of two.
+    /// Writes one value, doubles the filled part until it is a few kilobytes long, and copies that part to the rest.
+    /// For sizes that are not a power of two, this is several times as fast as copying value by value.
     void fillBlock(std::byte* target, std::size_t bytes, void const* value, std::size_t size)
     {
-        constexpr std::size_t kCopied = 4096; // remains in the first-level cache
+        constexpr std::size_t kCopied = 4096; // bytes; remains in the L1 cache
         std::memcpy(target, value, size);
         std::size_t filled = size;
         for (; filled < bytes && filled < kCopied; filled *= 2)

@@ -15,18 +15,18 @@
 
 namespace Modeling {
 
-/// An array whose elements the caller must write before reading them; elements of non-trivial types are constructed.
+/// An array whose elements the caller must write before reading them. Elements of non-trivial types are constructed.
 template <class T> Orvan::Array<T> uninitializedArray(std::uint64_t count)
 {
     return Orvan::Array<T>(count, Orvan::kUninitialized);
 }
 
-// For elements of trivially copyable types: compiled once for all of them. Large arrays are cut into blocks, which run in
-// parallel.
+// For elements of trivially copyable types, so that the loops are compiled once for all of them. Large arrays are cut
+// into blocks, which run in parallel.
 
-/// Copies between memory that does not overlap.
+/// Copies bytes. The two ranges of memory must not overlap.
 void copyBytes(void const* source, std::size_t bytes, void* target);
-/// Sets `count` elements of `size` bytes each to the value at `value`, which must not be one of them.
+/// Sets `count` elements of `size` bytes each to the value at `value`, which must be outside of the target.
 void fillBytes(void* target, std::size_t count, void const* value, std::size_t size);
 
 /// Copies elements between arrays that do not overlap; blocks of large arrays are copied in parallel.
@@ -42,7 +42,8 @@ template <class T> void copyElements(T const* source, std::size_t count, T* targ
     }
 }
 
-/// Sets elements of an array to one value; blocks of large arrays are filled in parallel.
+/// Sets elements of an array to one value, which must not be one of them; blocks of large arrays are filled in
+/// parallel.
 template <class T> void fillElements(T* target, std::size_t count, T const& value)
 {
     if constexpr (std::is_trivially_copyable_v<T>) {
@@ -74,8 +75,8 @@ template <class T> Orvan::Array<T> zeroedArray(std::uint64_t count)
     return filledArray(count, T{});
 }
 
-/// The exclusive prefix sums of the counts, followed by the total: entry i is the offset of the output of element i, and
-/// the array has one entry more than there are elements.
+/// The exclusive prefix sums of the counts, followed by the total: entry i is the offset of the output of element i,
+/// and the array has one entry more than there are elements.
 /// \param countOf  `unsigned int (std::size_t element)`; called more than once per element, from several threads; must
 ///                 not throw
 /// \throws std::bad_alloc  also if the total does not fit 32 bits

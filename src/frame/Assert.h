@@ -4,9 +4,10 @@
 #include <cstdio>
 #include <cstdlib>
 
-/// Checks in debug and sanitizer builds what a caller or an earlier phase guarantees, and aborts with the condition and its
-/// place if it does not hold. Other builds do not evaluate the condition. For entries of operations and for the transitions
-/// between their phases, not for inner loops. A function that only assertions call is marked [[maybe_unused]].
+/// In debug and sanitizer builds, checks what a caller or an earlier phase guarantees; if it does not hold, prints the
+/// condition and its location, and aborts. Other builds do not evaluate the condition. Meant for the entry of an
+/// operation and between its phases, not for inner loops. A function that only assertions call is marked
+/// [[maybe_unused]].
 #ifdef MODELING_ASSERTIONS
 #define MODELING_ASSERT(...)                                                                                           \
     ((__VA_ARGS__) ? static_cast<void>(0) : Modeling::Internal::assertionFailed(#__VA_ARGS__, __FILE__, __LINE__))
@@ -37,7 +38,7 @@ inline bool isNonDecreasing(unsigned int const* values, std::size_t count)
     return true;
 }
 
-/// `offsets` has an entry per element and a closing one: it begins at 0, never decreases, and ends at `total`.
+/// Whether `offsets`, with one entry per element and a closing one, begins at 0, never decreases, and ends at `total`.
 inline bool areOffsets(unsigned int const* offsets, std::size_t elementCount, std::size_t total)
 {
     return offsets[0] == 0 && isNonDecreasing(offsets, elementCount + 1) && offsets[elementCount] == total;

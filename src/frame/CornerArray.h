@@ -7,16 +7,16 @@
 
 namespace Modeling {
 
-/// Scratch memory for one value per corner of a polygon: on the stack for up to `kStackCount` corners, otherwise on the
-/// heap, which grows on demand and is reused by the polygons that follow.
+/// Scratch memory for one value per corner of a polygon: inside the object, and so on the stack, for up to
+/// `kStackCount` corners, otherwise on the heap. Heap memory grows on demand and is reused for later polygons.
 template <class T, std::size_t kStackCount = 32> class CornerArray {
 public:
     CornerArray() = default;
     CornerArray(CornerArray const&) = delete;
     CornerArray& operator=(CornerArray const&) = delete;
 
-    /// Elements without a value; what an earlier call returned is no longer valid.
-    /// \throws std::bad_alloc  if the heap has to grow
+    /// Returns `count` elements with unspecified values. Invalidates what earlier calls returned.
+    /// \throws std::bad_alloc  if the heap memory has to grow
     T* take(std::size_t count)
     {
         if (count <= kStackCount)

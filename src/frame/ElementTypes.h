@@ -14,7 +14,7 @@ namespace Modeling {
 template <class... T> struct ElementTypeList {
 };
 
-/// The element types that operations can extend, interpolate and give defaults. Dispatch tries them in this order.
+/// The element types that operations can copy, pad with defaults and transfer. Dispatch tries them in this order.
 using CoreElementTypes = ElementTypeList<signed char, short, int, long long, unsigned char, unsigned short,
     unsigned int, unsigned long long, bool, Orvan::String, float, double, Tessara::Math::int2, Tessara::Math::int2x2,
     Tessara::Math::int2x3, Tessara::Math::int3, Tessara::Math::float2, Tessara::Math::float4, Tessara::Math::float3,
@@ -49,7 +49,7 @@ namespace Internal {
 
 }
 
-/// The position of an element type among all of them: for records that are not templates over `T`.
+/// The index of an element type in `AllElementTypes`: stored by types that are not templates over `T`.
 template <class T> constexpr unsigned char kPlaceOfElementType = Internal::placeIn<T>(AllElementTypes{});
 
 // The two forms in which an element type occurs; they are different types to a property value.
@@ -67,8 +67,8 @@ struct PlainForm {
 ///
 /// The rule takes `Form::Of<T>&`, deduced: `[&]<class T>(Orvan::Ptr<Orvan::Array<T>>& shared) { ...; return true; }`.
 /// It gets a copy of what the value holds, so an array is shared with the value while the rule runs, and `makeMutable`
-/// copies it. The rule must not modify `*value`. If `value` is null or empty, or holds no listed type in that form, no rule
-/// runs and `*result` is unchanged: the caller sets it to false beforehand and decides what a missing match means.
+/// copies it. The rule must not modify `*value`. If `value` is null or empty, or holds no listed type in that form, no
+/// rule runs and `*result` is unchanged: the caller sets it to false beforehand and decides what a missing match means.
 template <class Form, class Rule, class... T> void forEachElementType(
     ElementTypeList<T...>, Form, Tessara::PropertyValue const* value, bool* result, Rule const& rule)
 {

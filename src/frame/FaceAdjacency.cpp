@@ -23,9 +23,10 @@ namespace {
         friend auto operator<=>(Incoming const&, Incoming const&) = default;
     };
 
-    /// Finds the twins of the half-edges that leave one point, among those that enter it.
+    /// Finds the twins of the half-edges that start at a point among those that end there.
     class TwinFinder {
     public:
+        /// Lists the half-edges that end at a point, given the corners there.
         void gather(unsigned int const* corners, std::size_t count, unsigned int const* faceVertex)
         {
             incoming_.resize(count);
@@ -67,7 +68,7 @@ bool isTriangleMesh(unsigned int faceCount, IndexArray const& faceOffset)
 {
     std::atomic<bool> areTriangles = true;
     unsigned int const* const offset = faceOffset.data;
-    // Any thread may clear the flag; it is read after the loop.
+    // Any thread may clear the flag, which is read after the loop.
     parallelFor(
         tbb::blocked_range<std::size_t>(0, std::size_t{faceCount} + 1, kElementGrain), [&](auto const& entries) {
             for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry)
@@ -86,7 +87,7 @@ FaceAdjacency buildFaceAdjacency(FaceView const& faces, PointCorners const& arou
     unsigned int const* const offset = around.offsets.data;
     unsigned int const* const corners = around.corners.data;
     unsigned int const* const faceVertex = faces.faceVertex;
-    // Each half-edge leaves one point, whose iteration writes its entry.
+    // Each half-edge starts at one point, whose iteration writes its entry.
     parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kOneRingGrain), [=](auto const& points) {
         TwinFinder twins;
         for (unsigned int point = points.begin(); point != points.end(); ++point) {

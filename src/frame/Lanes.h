@@ -7,9 +7,9 @@
 
 namespace Modeling {
 
-/// Four floats that are computed with at once. Each lane gives the same bits as the operation on single floats.
+/// Four floats in a SIMD register. Each lane gives the same bits as scalar arithmetic.
 using Lanes = float __attribute__((vector_size(16)));
-/// Four integers. Comparisons of lanes give a mask: all bits of a lane set, or none.
+/// Four integers. Comparisons of lanes give a mask: in each lane, all bits are set or none is.
 using IntLanes = std::int32_t __attribute__((vector_size(16)));
 
 inline Lanes broadcast(float value)
@@ -17,7 +17,7 @@ inline Lanes broadcast(float value)
     return Lanes{value, value, value, value};
 }
 
-/// Four consecutive floats, of any alignment.
+/// Four consecutive floats, with any alignment.
 inline Lanes load(float const* values)
 {
     Lanes lanes;
@@ -25,7 +25,7 @@ inline Lanes load(float const* values)
     return lanes;
 }
 
-/// A vector; the last lane is 0.
+/// The three coordinates of a vector; the last lane is 0.
 inline Lanes load(Tessara::Math::float3 const& v)
 {
     using Pairs = double __attribute__((vector_size(16)));
@@ -56,7 +56,7 @@ inline Lanes max(Lanes a, Lanes b)
     return a > b ? a : b;
 }
 
-/// Without the sign: NaN remains NaN.
+/// The absolute value of each lane; NaN remains NaN.
 inline Lanes abs(Lanes lanes)
 {
     return reinterpret_cast<Lanes>(reinterpret_cast<IntLanes>(lanes) & (IntLanes{} + INT32_MAX));

@@ -14,8 +14,8 @@ namespace Modeling::Internal {
 
 namespace {
 
-    /// Calls a loop's body and keeps the first exception. oneTBB allocates for an exception that reaches it, and terminates
-    /// the process if it cannot.
+    /// Calls a loop's body and keeps the first exception. oneTBB allocates for an exception that reaches it, and
+    /// terminates the process if it cannot.
     class Calls {
     public:
         Calls(LoopBody const& body, tbb::task_group_context& context)
@@ -37,7 +37,7 @@ namespace {
             }
         }
 
-        // For after the loop:
+        // To be called after the loop.
 
         bool hasBegun() const { return hasBegun_; }
 

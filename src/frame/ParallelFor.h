@@ -12,7 +12,7 @@ namespace Modeling {
 
 namespace Internal {
 
-    /// A type-erased loop body. The loop itself is compiled once, not for each body and each element type in it.
+    /// A type-erased loop body, so that the oneTBB loop is compiled once, not once per body and element type.
     struct LoopBody {
         void const* body;
         void (*run)(void const* body, std::size_t begin, std::size_t end);
@@ -34,17 +34,17 @@ namespace Internal {
 
 /// Runs `body` over sub-ranges of `range`, on the caller's thread and oneTBB's workers. All loops go through here.
 ///
-/// If the range is not larger than its grain, `body` is called once on the calling thread, without a task or a check for
-/// cancellation; for an empty range it is not called. `body` walks its sub-range in ascending order and writes only what
-/// belongs to these elements. All threads share it; it is not copied.
+/// If the range is not larger than its grain, `body` is called once on the calling thread, without a task or a check
+/// for cancellation; for an empty range it is not called. `body` must walk its sub-range in ascending order and write
+/// only what belongs to these elements. All threads share it; it is not copied.
 ///
 /// \param isolated  True: a cancellation of an enclosing oneTBB group does not reach the loop. False: it does, and the
-///                  job's cancellation is checked after the loop. Only the balance sweep of subdivision passes false;
-///                  all other operations run to completion once started.
-/// \throws          std::runtime_error with the text of `TSR::exceptionMessage` if not isolated and the job is cancelled.
-///                  The first exception of `body`, which cancels sub-ranges that have not started. std::bad_alloc if
-///                  oneTBB can allocate no tasks or start no worker thread after part of the range has run; if nothing
-///                  has run yet, the whole range runs on the calling thread instead.
+///                  job's cancellation is checked after the loop. Only subdivision passes false, where it balances
+///                  marks; all other operations run to completion once started.
+/// \throws          std::runtime_error with the text of `TSR::exceptionMessage` if not isolated and the job is
+///                  cancelled. The first exception of `body`, which cancels sub-ranges that have not started.
+///                  std::bad_alloc if oneTBB can allocate no tasks or start no worker thread after part of the range
+///                  has run; if nothing has run yet, the whole range runs on the calling thread instead.
 template <class Index, class Body>
 void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool isolated = true)
 {
@@ -58,7 +58,7 @@ void parallelFor(tbb::blocked_range<Index> const& range, Body const& body, bool 
         Internal::throwIfJobIsCancelled();
 }
 
-/// Runs tasks concurrently and waits for all of them, even if one throws. Failures are those of `parallelFor`.
+/// Runs tasks concurrently and waits for all of them, even if one throws. Throws like `parallelFor`.
 /// \return false if some were skipped, which oneTBB does silently if an enclosing task group is cancelled
 template <class... Task> [[nodiscard]] bool runTasks(Task const&... tasks)
 {
@@ -76,10 +76,10 @@ template <class... Task> [[nodiscard]] bool runTasks(Task const&... tasks)
     return runCount.load(std::memory_order_relaxed) == sizeof...(Task);
 }
 
-/// Runs a scan or reduction of oneTBB that a cancellation of an enclosing task group does not reach: oneTBB would skip it
-/// silently.
-/// \param work  Its loop bodies must not throw.
-/// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work may be done then. If
+/// Runs a scan or reduction of oneTBB isolated from the cancellation of enclosing task groups, in which case oneTBB
+/// would skip it silently.
+/// \param work  Calls the oneTBB algorithm. Its loop bodies must not throw.
+/// \return false if oneTBB could allocate no tasks or start no worker thread; part of the work may have been done. If
 ///         oneTBB runs out of memory between two tasks of one scan, it may terminate the process.
 template <class Work> [[nodiscard]] bool runIsolated(Work const& work)
 {
@@ -90,7 +90,7 @@ template <class Work> [[nodiscard]] bool runIsolated(Work const& work)
         try {
             work();
             isDone = true;
-        } catch (...) { // of oneTBB; if it passed through the group, oneTBB would allocate for it once more
+        } catch (...) { // thrown by oneTBB, which would allocate once more to pass it through the group
         }
     });
     return isDone;

@@ -13,9 +13,9 @@ namespace Modeling {
 
 namespace {
 
-    /// Calls `work(first, last)` for parts of the points in parallel. Each part writes only what belongs to its points and
-    /// walks all corners in the same order: there are no atomics and nothing to sort, and the result does not depend on
-    /// the number of parts.
+    /// Calls `work(first, last)` for parts of the points in parallel. Each part walks all corners in the same order and
+    /// writes only what belongs to its points. So there are no atomics and nothing to sort, and the result does not
+    /// depend on the number of parts.
     template <class Work> void forEachPartOfPoints(unsigned int pointCount, Work const& work)
     {
         auto const threads = static_cast<unsigned int>(tbb::this_task_arena::max_concurrency());
@@ -42,7 +42,7 @@ namespace {
         if (pointCount <= kFewPoints)
             addUp(all, 0, true);
         else if (!runIsolated([&] { tbb::parallel_scan(all, 0u, addUp, std::plus<>()); }))
-            throw std::bad_alloc(); // part of the counts may be sums already
+            throw std::bad_alloc(); // some counts may already be sums, so they cannot be summed up again
     }
 
 }
@@ -53,6 +53,7 @@ PointCorners cornersByPoint(unsigned int pointCount, unsigned int const* faceVer
     unsigned int* const offset = lists.offsets.data;
     forEachPartOfPoints(pointCount, [=](unsigned int first, unsigned int last) {
         std::fill(offset + first, offset + last, 0u);
+        // One unsigned comparison tests first <= point < last, here and below.
         for (std::size_t corner = 0; corner != cornerCount; ++corner)
             if (unsigned int const point = faceVertex[corner]; point - first < last - first)
                 ++offset[point];
@@ -62,7 +63,7 @@ PointCorners cornersByPoint(unsigned int pointCount, unsigned int const* faceVer
 
     lists.corners = uninitializedArray<unsigned int>(offset[pointCount]);
     unsigned int* const entry = lists.corners.data;
-    // From the last corner to the first: each list ascends, and its offset ends at its beginning.
+    // Filled from the last corner to the first, so that each list ascends and its offset ends up at its first entry.
     forEachPartOfPoints(pointCount, [=](unsigned int first, unsigned int last) {
         for (std::size_t corner = cornerCount; corner-- != 0;)
             if (unsigned int const point = faceVertex[corner]; point - first < last - first)

@@ -11,8 +11,8 @@ struct PointCorners {
     Orvan::Array<unsigned int> corners;
 };
 
-/// Lists the corners at each point. Linear, whatever the valence of the points; the same result for any number of
-/// threads. Corners whose point is not below `pointCount` are left out.
+/// Lists the corners at each point. Takes linear time whatever the valences, and gives the same result for any number
+/// of threads. Corners whose point is not below `pointCount` are left out.
 /// \param faceVertex  the point of each corner, `cornerCount` entries; `cornerCount` fits 32 bits
 PointCorners cornersByPoint(unsigned int pointCount, unsigned int const* faceVertex, std::size_t cornerCount);
 

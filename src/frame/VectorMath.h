@@ -7,7 +7,7 @@
 
 namespace Modeling {
 
-// Single-precision vector arithmetic. The order of the operations is part of the results: keep it.
+// Single-precision vector arithmetic. The results depend on the order of the operations: keep it.
 
 using Tessara::Math::float3;
 

@@ -15,10 +15,10 @@ namespace Modeling {
 /// The object under a key; null if there is none.
 Orvan::Ptr<Tessara::Object> objectAt(Tessara::Object const& object, Orvan::String const& key);
 
-/// The data property under a key; null if the key holds no object with `sData`.
+/// The data property under a key; null if the key holds no object that has `sData`.
 Orvan::Ptr<Tessara::Object> dataPropertyAt(Tessara::Object const& object, Orvan::String const& key);
 
-/// The array of a data property, shared with the object, not copied. Null if there is none of that type.
+/// The array of a data property, shared with the object, not copied. Null if the key holds no data of that type.
 template <class T> Orvan::Ptr<Orvan::Array<T>> readGeoPropData(Tessara::Object const& object, Orvan::String const& key)
 {
     Orvan::Ptr<Tessara::Object> const property = dataPropertyAt(object, key);
@@ -29,8 +29,8 @@ template <class T> Orvan::Ptr<Orvan::Array<T>> readGeoPropData(Tessara::Object c
     return values ? *values : nullptr;
 }
 
-/// Replaces the value under `sData` of a data property: the only way in which operations modify one. The property is
-/// cloned, which copies no array, so that other objects that share it see no change.
+/// Replaces the value under `sData` of a data property. The property is cloned, which copies no array, so that other
+/// objects that share it see no change.
 /// \return false, with nothing changed, if the key holds no data property
 bool writeGeoPropValue(Orvan::String const& key, Tessara::PropertyValue&& data, Tessara::Object& object);
 
@@ -40,10 +40,9 @@ bool writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& da
     return writeGeoPropValue(key, std::move(data), object);
 }
 
-/// Changes to one object that are all made or, if preparing them fails, none. They are prepared first, which allocates,
-/// and then made without allocating. (Adding a change clones its geo property; adding the count of a component sets it
-/// to its present value, so that the object no longer shares it. Only keys that are new to the object allocate later,
-/// before the first change.)
+/// Changes to one object of which either all are made or, if memory runs out, none: everything is allocated before the
+/// first change. Adding a change clones its geo property; adding the count of a component sets it to its present value,
+/// so that the object no longer shares the component; and `commit` begins by adding the keys that are new to the object.
 class PreparedWrites {
 public:
     explicit PreparedWrites(Tessara::Object& object)
@@ -51,10 +50,10 @@ public:
     {
     }
 
-    /// As `setElementCount`; false, with no effect, if there is no such component.
+    /// As `setElementCount` of the host. Returns false, with nothing added, if there is no such component.
     bool setElementCount(Orvan::String const& component, unsigned int count);
 
-    /// As `writeGeoPropData`; no effect if the key holds no data property.
+    /// As the function `writeGeoPropData`; no effect if the key holds no data property.
     template <class T> void writeGeoPropData(Orvan::String const& key, Orvan::Ptr<Orvan::Array<T>>&& data)
     {
         writeValue(key, std::move(data));
@@ -63,15 +62,14 @@ public:
     /// As `setProperty` of the object; no effect if the key is empty.
     void setProperty(Orvan::String const& key, Tessara::PropertyValue&& value);
 
-    /// As `setRangeGeoPropIndices`; no effect if there is no range of that name.
+    /// As `setRangeGeoPropIndices` of the host; no effect if there is no range of that name.
     void setRangeIndices(Orvan::String const& name, Orvan::Ptr<Orvan::Array<unsigned int>>&& indices);
 
     /// As `eraseProperty` of the object.
     void eraseProperty(Orvan::String const& key);
 
-    /// Makes the changes in the order in which they were added. Requires of the host that it allocates nothing when it
-    /// replaces the value of an existing key, sets the count of a component that is not shared, or erases a key; the
-    /// stand-ins comply.
+    /// Makes the changes in the order in which they were added. Relies on the host to allocate nothing when it replaces
+    /// the value of a present key, sets the count of a component that is not shared, or erases a key.
     /// \throws std::bad_alloc  for a key that is new to the object, with the object unchanged
     void commit();
 
@@ -96,8 +94,8 @@ private:
 /// something other than this object.
 ///
 /// An array that is merely read from an object is shared with it, and making it mutable would copy it. So the property
-/// releases it first and gets it back afterwards, even if `edit` throws; what this needs is allocated beforehand.
-/// \return false, with nothing called, if the key is empty or holds no data property of that type
+/// releases it first and gets it back afterwards, even if `edit` throws: what this needs is allocated beforehand.
+/// \return false, without a call of `edit`, if the key is empty or holds no data of that type
 template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Tessara::Object& object, Edit&& edit)
 {
     using SharedArray = Orvan::Ptr<Orvan::Array<T>>;
@@ -105,7 +103,7 @@ template <class T, class Edit> bool editGeoPropData(Orvan::String const& key, Te
     if (!shared || key.empty())
         return false;
 
-    // Puts the array back even if an exception is thrown.
+    // The destructor puts the array back, even if an exception is thrown.
     struct PutBack {
         Orvan::String key;
         Tessara::Object& object;

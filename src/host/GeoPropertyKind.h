@@ -5,11 +5,11 @@
 
 namespace Modeling {
 
-/// The three kinds of geo properties, which exclude one another, and everything else.
+/// The three kinds of geo properties, which are mutually exclusive. `None` is everything else.
 enum class GeoPropertyKind : unsigned char { None, Component, Data, Range };
 
 /// Decides which kind of geo property an object is. Holds the host's prototypes: fetching them for each property would
-/// make all threads write their reference counts.
+/// make all threads contend for their reference counts.
 class GeoPropertyClassifier {
 public:
     GeoPropertyClassifier();

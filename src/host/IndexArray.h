@@ -11,10 +11,11 @@ namespace Modeling {
 /// Indices of points, corners, faces or other elements, or offsets into an array of them.
 using IndexArray = Orvan::Array<unsigned int>;
 
-/// Offsets that divide an array into one part per element, as the corners of a mesh into faces. The part of an element
-/// runs from its own offset up to but excluding the next one, so there is one more offset than there are elements.
+/// Offsets that divide an array into one part per element, as they divide the corners of a mesh into faces. The part of
+/// an element runs from its own offset up to but excluding the next one, so there is one more offset than there are
+/// elements.
 ///
-/// A view: the offsets have to outlive it. Loop bodies capture it by value, like a pointer.
+/// A view: the offsets must outlive it. Loop bodies capture it by value, like a pointer.
 class OffsetView {
 public:
     OffsetView(IndexArray const& offsets)

@@ -7,7 +7,7 @@
 
 namespace Modeling {
 
-/// The faces of a mesh in flat arrays. A view: loop bodies capture it by value.
+/// The faces of a mesh in flat arrays. A view: the arrays must outlive it, and loop bodies capture it by value.
 struct FaceView {
     unsigned int const* faceVertex; // the point of each corner
     OffsetView offsets; // of the corners of each face
@@ -18,7 +18,7 @@ struct FaceView {
 };
 
 /// The standard arrays of a mesh and the element counts of its components. Arrays that were read from an object are
-/// shared with it, so `makeMutable` copies them: operations read from these and write to arrays of their own.
+/// shared with it, so that `makeMutable` would copy them: operations read from them and write to new arrays.
 struct MeshArrays {
     Orvan::Ptr<Orvan::Array<Tessara::Math::float3>> positions; // one per point
     Orvan::Ptr<IndexArray> faceVertex; // the point of each corner
@@ -29,12 +29,12 @@ struct MeshArrays {
 
     bool isComplete() const { return positions && faceVertex && faceOffset; }
 
-    /// Requires `faceVertex` and `faceOffset`.
+    /// \pre  `faceVertex` and `faceOffset` are not null.
     FaceView faces() const { return {faceVertex->data, *faceOffset, faceCount}; }
 };
 
-/// Copies no array. Each array is null if the object has none of that name and type; neither lengths nor offsets are
-/// checked.
+/// Reads without copying the arrays. Each array is null if the object has none of that name and type. Neither lengths
+/// nor offsets are checked.
 MeshArrays readMeshArrays(Tessara::Object const& object);
 
 /// Adds the arrays and the counts of their components to the changes. A null array is left out together with its count.

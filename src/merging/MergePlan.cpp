@@ -18,7 +18,7 @@ using Tessara::PropertyValue;
 
 namespace {
 
-    /// Whether the value holds an array of type `T`, or a null reference to one: `found` then stays empty.
+    /// Whether the value holds a reference to an array of `T`. If it is null, `found` stays empty.
     template <class T> bool findArray(PropertyValue const& value, ArrayView& found)
     {
         auto const* const array = value.get<ArrayForm::Of<T>>();
@@ -36,7 +36,7 @@ namespace {
 
     constexpr auto kArrayFinders = findersOf(AllElementTypes{});
 
-    /// The strings and prototypes that every look-up needs, made once for all threads.
+    /// The strings and prototypes that every look-up needs, created once for all threads.
     struct LookupKeys {
         explicit LookupKeys(std::vector<Orvan::String> const& planned)
             : components(planned)
@@ -50,7 +50,7 @@ namespace {
         GeoPropertyClassifier classifier;
     };
 
-    /// Looks up successive inputs. What equals the previous input costs the least.
+    /// Looks up successive inputs. An input with the same properties as the previous one reuses its layout.
     class InputReader {
     public:
         explicit InputReader(LookupKeys const& keys)
@@ -119,7 +119,7 @@ namespace {
 
         LookupKeys const& keys_;
         Orvan::Ptr<PropertyLayout> layout_; // of the previous input
-        std::vector<PropertyRole> roles_; // those of `layout_`, updated while an input is read
+        std::vector<PropertyRole> roles_; // as in `layout_`, until the next input is read over them
         std::vector<unsigned char> likelyTypes_; // element types of the previous input's arrays
         bool isNewLayout_ = true;
     };

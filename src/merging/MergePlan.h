@@ -21,9 +21,9 @@
 
 namespace Modeling::Internal {
 
-/// What a merge needs to know about its inputs, looked up once. All of it lives for one merge.
+/// What a merge needs to know about its inputs, looked up once. All of it lives only as long as the merge.
 ///
-/// Nothing here adds references to what the inputs hold: with thousands of small inputs, counting references would cost
+/// Nothing here holds references to the inputs' arrays: with thousands of small inputs, counting references would cost
 /// more than copying the values. The caller's references keep the inputs alive.
 
 /// The inputs of a merge. The output may be one of them: it is not written until the result is complete.
@@ -40,11 +40,11 @@ struct ArrayView {
     explicit operator bool() const { return type != kNoType; }
 
     /// Views the array that a value holds; empty if it holds none of a listed type.
-    /// \param likelyType  tried first, before all types in the order of the list
+    /// \param likelyType  Index of the type that is tried before the others; `kNoType` if there is none.
     static ArrayView of(Tessara::PropertyValue const& value, unsigned char likelyType = kNoType);
 };
 
-/// What a property is to its input.
+/// The role of a property in its input.
 struct PropertyRole {
     Orvan::String name;
     Orvan::String owner; // for data, its target; for a range, the component that its chain of targets leads to
@@ -56,7 +56,8 @@ inline bool isData(PropertyRole const& role)
     return role.kind == GeoPropertyKind::Data;
 }
 
-/// The properties of an input in the order of its keys. Consecutive inputs with equal properties share one layout.
+/// The properties of an input in the order of its keys. Consecutive inputs with equal properties share one layout if
+/// the same task has read them.
 class PropertyLayout {
 public:
     explicit PropertyLayout(std::vector<PropertyRole> const& roles);
@@ -75,18 +76,18 @@ struct MergeInput {
 
     Tessara::Object const* object = nullptr;
     Orvan::Ptr<PropertyLayout> layout;
-    std::vector<ArrayView> arrays; // per property of the layout, the array under `sData`
-    std::array<unsigned int, kMaxComponents> counts{}; // elements of each component of the plan
+    std::vector<ArrayView> arrays; // the array under `sData` of each property of the layout
+    std::array<unsigned int, kMaxComponents> counts{}; // element count of each component of the plan
 };
 
-/// The accepted inputs, whose order is the order of the merged elements.
+/// The components to merge, and the accepted inputs in the order of their elements in the result.
 struct MergePlan {
     std::vector<Orvan::String> components;
     std::vector<MergeInput> inputs;
 };
 
 /// Looks up the accepted inputs, in parallel.
-/// \param components  Those to merge, at most `MergeInput::kMaxComponents`.
+/// \param components  The components to merge, at most `MergeInput::kMaxComponents`.
 /// \param accepts     `bool (Tessara::Object const&)`, called from several threads.
 /// \pre               No input is null.
 MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*> components,
@@ -94,11 +95,11 @@ MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*
 /// The same if all inputs are accepted.
 MergePlan planMerge(MergeInputs const& validInputs, std::initializer_list<char const*> components);
 
-/// Per input its first element in something merged, and as last entry the total.
+/// Where the elements of each input begin in a merged array or component; the last entry is the total.
 using Offsets = IndexArray;
 
-/// The first element of each input in a merged component, and the total; nullopt if the total does not fit 32 bits.
-/// \param component  One of the plan's.
+/// Where the elements of each input begin in a merged component; nullopt if the total does not fit 32 bits.
+/// \param component  One of the plan's components.
 std::optional<Offsets> computeElementOffsets(MergePlan const& plan, Orvan::String const& component);
 
 MergeInputs withoutNulls(Orvan::Array<Orvan::Ptr<Tessara::Object>> const& inputs);

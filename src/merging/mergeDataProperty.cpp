@@ -22,13 +22,13 @@ namespace {
         std::uint64_t first; // index of its first element in the merged array
     };
 
-    /// Small arrays are scattered in memory, and each costs a cache miss: this starts loading the next one early.
+    /// Starts loading the next array early: small arrays are scattered in memory, and each costs a cache miss.
     void prefetchStart(MergeInput const& input, PropertyFinder& find)
     {
         constexpr std::size_t kCacheLine = 64;
         auto const* const bytes = static_cast<char const*>(find.arrayIn(input).data);
         for (std::size_t line = 0; bytes && line != 4; ++line)
-            __builtin_prefetch(bytes + line * kCacheLine); // has no effect past the end
+            __builtin_prefetch(bytes + line * kCacheLine); // never faults, not even past the end
     }
 
     /// Calls `write(input, contribution)` for all inputs, from several threads.
@@ -50,7 +50,8 @@ namespace {
         });
     }
 
-    /// Writes elements of any trivially copyable type, so that one loop over the inputs is compiled for all of them.
+    /// Writes elements of any trivially copyable type, so that the loop over the inputs is compiled once for all of
+    /// them.
     struct ByteWriter {
         std::byte* target;
         std::size_t size; // of one element, in bytes
@@ -74,7 +75,8 @@ namespace {
         }
     };
 
-    /// Has capacity for one more element, so that appending a closing entry or a default does not reallocate.
+    /// An uninitialized array for all values, with capacity for one more: appending a closing entry or a default does
+    /// not reallocate.
     template <class T> Orvan::Array<T> arrayForMerging(Offsets const& offsets)
     {
         std::uint64_t const total = offsets[offsets.size - 1];

@@ -8,14 +8,14 @@ namespace Modeling::Internal {
 struct DataPropertyMergeEntry {
     Orvan::String name;
     Orvan::Ptr<Tessara::Object> property; // of the first input that qualifies: defines type, default and target
-    Tessara::PropertyValue mergedData; // Ptr<Array<T>>; stays empty if the default is of no listed type
+    Tessara::PropertyValue mergedData; // Ptr<Array<T>>; empty if the default is missing or of no listed type
 };
 
-/// A new entry for a data property of an input.
+/// An entry for a data property of an input, with nothing merged yet.
 DataPropertyMergeEntry dataEntry(MergeInput const& input, Orvan::String const& name);
 
-/// An array of `unsigned int` that holds indices into another merged component: while the elements of input i are
-/// copied, entry i of `baseOffsets` is added to them.
+/// An array of `unsigned int` that holds indices into another merged component. Merging it adds entry i of
+/// `baseOffsets` to the values of input i.
 struct Connectivity {
     Orvan::String name; // of the property
     Offsets const& baseOffsets;
@@ -23,14 +23,14 @@ struct Connectivity {
     Orvan::Ptr<Orvan::Array<unsigned int>> merged; // null until the property has been merged
 };
 
-/// Copies indices and adds `base` to each. Large counts are split over several threads.
+/// Copies indices and adds `base` to each. Blocks of large arrays are copied in parallel.
 void copyRebased(unsigned int const* source, std::size_t count, unsigned int base, unsigned int* target);
 
 /// Builds the merged array of one data property, whose element type is that of the default of `entry.property`. An
 /// input contributes its array of that name, whatever its target is: an array that is too long is trimmed; one that is
 /// too short, missing or of another type is padded with the default. Leaves `entry.mergedData` empty if the default is
 /// missing or of no listed type.
-/// \param offsets       First value of each input, and the total.
+/// \param offsets       Where the values of each input begin, and the total.
 /// \param connectivity  Null unless the values are to be rebased.
 void mergeDataProperty(
     MergePlan const& plan, Offsets const& offsets, Connectivity* connectivity, DataPropertyMergeEntry& entry);
@@ -39,8 +39,8 @@ void mergeDataProperty(
 /// range indices that refer to the default lead past its end: existing scenes depend on these lengths.
 void appendDefaultValue(DataPropertyMergeEntry& entry);
 
-/// Gives the target a new data property with the merged array, without dependencies and with interpolation mode 1,
-/// whatever the inputs have. Does nothing if there is no merged array.
+/// Adds to the target a data property with the merged array, without dependencies and with interpolation mode 1,
+/// whatever the inputs have. Does nothing if there is no merged array or the name is empty.
 void addMergedDataProperty(DataPropertyMergeEntry const& entry, Tessara::Object& target);
 
 }

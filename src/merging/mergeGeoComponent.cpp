@@ -58,7 +58,7 @@ namespace {
         });
     }
 
-    /// Whether each merged array has a value per element of the component, and the closing entry if it has one.
+    /// Whether each merged array has one value per element of the component, and connectivity its closing entry if any.
     [[maybe_unused]] bool haveComponentLength(std::vector<DataPropertyMergeEntry> const& entries,
         std::uint64_t elementCount, Connectivity const* connectivity)
     {

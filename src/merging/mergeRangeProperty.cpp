@@ -39,7 +39,8 @@ namespace {
         return sources;
     }
 
-    /// The length of the data in one input: that of its shortest array. Only the low 32 bits of lengths count.
+    /// The length of the data in one input: that of its shortest array, 0 if it has none. Only the low 32 bits of
+    /// lengths count.
     unsigned int smallestDependentSize(MergeInput const& input, std::vector<PropertyFinder>& dependents)
     {
         unsigned int smallest = kInvalidIndex;
@@ -61,16 +62,16 @@ namespace {
         for (std::size_t input = 0; input != plan.inputs.size(); ++input) {
             offsets[input] = static_cast<unsigned int>(total);
             total += smallestDependentSize(plan.inputs[input], finders);
-            if (total >= std::numeric_limits<unsigned int>::max()) // the default after all data has an index too
+            if (total >= std::numeric_limits<unsigned int>::max()) // the index of the default must fit too
                 throw std::bad_alloc();
         }
         offsets[plan.inputs.size()] = static_cast<unsigned int>(total);
         return offsets;
     }
 
-    /// Writes what index arrays hold beyond their component's count: it overruns into the elements of later inputs, up
-    /// to the end. Inputs are visited in ascending order, and afterwards each writes its own elements, so an overrun
-    /// lasts only where a later input's index array is too short.
+    /// Writes the entries of index arrays beyond their component's count, which overrun into the elements of later
+    /// inputs and are cut off at the end of the merged array. Inputs are visited in ascending order, and afterwards
+    /// each writes its own elements, so an overrun survives only where a later input's index array is too short.
     void writeOverruns(std::vector<Orvan::Ptr<IndexArray>> const& sources, Offsets const& elementOffsets,
         Offsets const& dependentOffsets, IndexArray& merged)
     {

@@ -10,12 +10,13 @@
 #include <memory>
 #include <vector>
 
-/// What the samplers of VoxelSampler.h hold. It is part of their size, and nothing else: all of it may change.
+/// The state of the samplers of VoxelSampler.h. It is here only because it determines their size: it is not part of the
+/// interface and may change.
 namespace TSR::TileTree3D::Internal {
 
 template <class Traits> struct KnownTiles;
 
-/// The tile that contains the last point.
+/// Remembers the tile that contains the last point.
 template <class Traits> struct TileCursor {
     using TileType = typename Container<Traits>::TileType;
 
@@ -47,11 +48,11 @@ template <class Traits> struct TileCursor {
     TileBinaryNonCompatible<Traits::kChildCount> const* tile;
     TileBinaryNonCompatible<Traits::kChildCount> noTile;
 
-    // Points between these corners are in the tile. Empty if the tile may not be kept for the next point.
+    // The tile's box: points inside are in the tile. Empty if the tile has to be looked up again for the next point.
     Tessara::Math::float3 tileBegin; // in index units
     Tessara::Math::float3 tileEnd;
     float voxelsPerUnit = 0;
-    int depth = -1; // that was asked for
+    int depth = -1; // the requested one; the tile may be coarser
     std::uint64_t visit = 0; // incremented for each tile that is entered
 };
 
@@ -64,17 +65,17 @@ template <class Traits> struct LinearSamplerState {
 
     using TileType = typename Container<Traits>::TileType;
 
-    /// A tile with a layer of voxels around it, found by the tile's index.
+    /// A tile with its halo, found by the tile's index.
     template <int side> struct HaloSlot {
         std::uint64_t key = kNoKey;
         TileData<float, side, 0> values;
-        std::uint64_t stamp = 0; // when it was used last
+        std::uint64_t stamp = 0; // of the sample that looked it up
     };
     template <int side> using HaloCache = std::vector<HaloSlot<side>>;
 
     bool hasPositiveHalos() const noexcept { return offsetType == kAllAxes; }
 
-    /// Null if the tile has no values that may be read.
+    /// Null if the tile has no values, or is coarser than `minDepth`.
     float const* valuesOf(TileType const& tile) const noexcept
     {
         if (!tile.valid || tile.depth < minDepth)
@@ -83,7 +84,7 @@ template <class Traits> struct LinearSamplerState {
                            : channel->tileData(tile.treeIndex()).values();
     }
 
-    typename Container<Traits>::ConstTileAccessor neighbors; // fetches other tiles than the cursor's
+    typename Container<Traits>::ConstTileAccessor neighbors; // looks up tiles other than the cursor's
     unsigned int offsetType;
     HaloCache<kSide + 1> positiveHaloCache = {}; // one slot per depth, once one is needed
     HaloCache<kSide + 2> fullHaloCache = {};
@@ -97,11 +98,11 @@ template <class Traits> struct LinearSamplerState {
     float background;
     int minDepth;
     int maxDepth;
-    int coarsestDepth; // with data
+    int coarsestDepth; // the coarsest depth with data
 
-    std::unique_ptr<KnownTiles<Traits>> knownTiles = {}; // once a row needs them
+    std::unique_ptr<KnownTiles<Traits>> knownTiles = {}; // null until `sampleAll` needs them
 
-    // Of the tile that the cursor has entered.
+    // The values of the cursor's tile, and the visit for which they were fetched.
     std::uint64_t fetchedVisit = 0;
     float const* values = nullptr; // null if there are none that may be read
 };
