@@ -224,7 +224,8 @@ namespace {
         addDataProperty<Orvan::String>("text", sFaceComp, {"a", "b"}, *mesh);
         EXPECT_THAT(written(*mesh, ".vtp").notes, ElementsAre(HasSubstr("\"text\""), HasSubstr("\"uv\"")));
         EXPECT_EQ(arraysIn(mesh),
-            (Arrays{{"<PointData> a&#60;&#34;b&#34;&#62;&#38;? Float32x3", bytesOfArray<float3>(*mesh, "a<\"b\">&\x01")},
+            (Arrays{
+                {"<PointData> a&#60;&#34;b&#34;&#62;&#38;? Float32x3", bytesOfArray<float3>(*mesh, "a<\"b\">&\x01")},
                 {"<CellData> id UInt64x1", bytesOfArray<unsigned long long>(*mesh, "id")},
                 {"<CellData> id Float32x9", bytesOfArray<float3x3>(*mesh, "face:id")},
                 {"<CellData> tag UInt8x1", bytesOfArray<bool>(*mesh, "tag")},
