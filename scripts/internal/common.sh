@@ -47,7 +47,17 @@ build_preset() {
     run_logged "build-$1" cmake --build --preset "$1" --parallel "$(nproc)" ${targets:+--target $targets}
 }
 
+# test_preset NAME OPTIONS...: with these options of ctest. Prints only the summary line unless a test fails.
+test_preset() {
+    say "testing preset $1"
+    ctest --preset "$1" --parallel "$(nproc)" --no-tests=error "${@:2}" >"$logs/test-$1.log" 2>&1 </dev/null || {
+        sed -n '/\*\*\*/,$p' "$logs/test-$1.log" | tail -n 200 >&2
+        fail "tests of preset $1 ($logs/test-$1.log)"
+    }
+    grep 'tests passed' "$logs/test-$1.log"
+}
+
 build_packages=(g++ cmake ninja-build git ca-certificates libtbb-dev)
 program_packages=(libcli11-dev libfmt-dev nlohmann-json3-dev libopenvdb-dev libboost-dev)
-test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev)
-check_packages=(clang clang-format clang-tidy)
+test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev clang-format)
+check_packages=(clang clang-tidy)
