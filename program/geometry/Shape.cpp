@@ -123,8 +123,9 @@ namespace {
     /// Classifies edges by the angle between the normals of their faces.
     class Creases {
     public:
-        Creases(MeshArrays const& mesh, std::vector<double3> const& vectors, double degrees)
+        Creases(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors, double degrees)
             : mesh_(mesh)
+            , edges_(edges)
             , vectors_(vectors)
             , cosine_(std::cos(degrees * std::numbers::pi / 180))
         {
@@ -133,7 +134,7 @@ namespace {
         /// Whether the normals at an edge with two sides differ by more than the angle.
         bool isSharp(std::span<Side const> sides) const
         {
-            double3 const &a = vectors_[faceAt(sides[0])], &b = vectors_[faceAt(sides[1])];
+            double3 const &a = vectors_[edges_.faceOf(sides[0].corner)], &b = vectors_[edges_.faceOf(sides[1].corner)];
             bool const areAlike = (*mesh_.faceVertex)[sides[0].corner] == (*mesh_.faceVertex)[sides[1].corner];
             double const product = areAlike ? -dot(a, b) : dot(a, b); // the faces have opposite orientations
             double const lengths = std::sqrt(dot(a, a) * dot(b, b));
@@ -141,23 +142,15 @@ namespace {
         }
 
     private:
-        unsigned int faceAt(Side const& side) const
-        {
-            // If all faces have equally many corners, as in most meshes, this finds the face without a search.
-            unsigned int const* const offset = mesh_.faceOffset->data;
-            auto const face =
-                static_cast<unsigned int>(std::uint64_t{side.corner} * mesh_.faceCount() / mesh_.cornerCount());
-            return offset[face] <= side.corner && side.corner < offset[face + 1] ? face : mesh_.faceOf(side.corner);
-        }
-
         MeshArrays const& mesh_;
+        EdgeSides const& edges_;
         std::vector<double3> const& vectors_;
         double cosine_;
     };
 
     std::uint64_t countFoldOvers(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors)
     {
-        Creases const creases(mesh, vectors, kFoldOverDegrees);
+        Creases const creases(mesh, edges, vectors, kFoldOverDegrees);
         return sumOverBlocks<std::uint64_t>(mesh.pointCount(), [&](std::size_t begin, std::size_t end) {
             std::uint64_t count = 0;
             edges.forEachEdge(begin, end, [&](unsigned int, std::span<Side const> sides) {
@@ -233,7 +226,7 @@ ExaminedMesh examine(MeshArrays const& mesh)
 std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& edges, double degrees)
 {
     std::vector<double3> const vectors = areaVectors(mesh);
-    Creases const creases(mesh, vectors, degrees);
+    Creases const creases(mesh, edges, vectors, degrees);
     return edges.pointsOfEdges(
         [&](std::span<Side const> sides) { return sides.size() > 2 || (sides.size() == 2 && creases.isSharp(sides)); });
 }
