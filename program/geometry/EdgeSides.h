@@ -36,6 +36,13 @@ public:
     /// three corners.
     template <class Visit> void forEachCornerAt(unsigned int point, Visit const& visit) const
     {
+        if (cornersPerFace_ == 3) { // the usual case, in which offsets need not be read
+            for (unsigned int const corner : cornersAt(point)) {
+                unsigned int const k = corner % 3;
+                visit(CornerNeighbors{corner, k == 0 ? corner + 2 : corner - 1, k == 2 ? corner - 2 : corner + 1});
+            }
+            return;
+        }
         unsigned int const* const offset = mesh_.faceOffset->data;
         for (unsigned int const corner : cornersAt(point)) {
             unsigned int const face = faceOf(corner);

@@ -1,5 +1,6 @@
 #include "MeshTopology.h"
 
+#include "ClosedFan.h"
 #include "EdgeSides.h"
 #include "connectedComponents.h"
 
@@ -147,65 +148,12 @@ namespace {
         std::vector<std::array<unsigned int, 2>> joined_; // pairs of corners
     };
 
-    /// Whether the faces at a point form one closed fan in which all have the same orientation, as at nearly all points.
-    /// Then each edge at the point has two sides in opposite directions. Only tried on few faces, where comparing all
-    /// pairs is faster than sorting.
-    class RegularFan {
-    public:
-        RegularFan(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point)
-        {
-            if (edges.cornersAt(point).size() > kMaxValence)
-                return;
-            unsigned int const* const pointAt = mesh.faceVertex->data;
-            edges.forEachCornerAt(point, [&](CornerNeighbors const& at) {
-                next_[valence_] = pointAt[at.next];
-                previous_[valence_++] = pointAt[at.previous];
-            });
-            isRegular_ = valence_ != 0 && isOneCycle(point);
-        }
-
-        explicit operator bool() const { return isRegular_; }
-
-        unsigned int countHigherNeighbors(unsigned int point) const
-        {
-            return static_cast<unsigned int>(
-                std::count_if(next_.data(), next_.data() + valence_, [=](unsigned int next) { return next > point; }));
-        }
-
-    private:
-        static constexpr unsigned int kMaxValence = 16;
-
-        /// Whether each face is followed by exactly one other around the point, and the last one by the first.
-        bool isOneCycle(unsigned int point) const
-        {
-            unsigned int face = 0;
-            for (unsigned int step = 1; step <= valence_; ++step) {
-                unsigned int follower = 0, count = 0;
-                for (unsigned int other = 0; other != valence_; ++other)
-                    if (previous_[other] == next_[face]) {
-                        follower = other;
-                        ++count;
-                    }
-                if (count != 1 || next_[face] == point || (follower == 0) != (step == valence_))
-                    return false;
-                face = follower;
-            }
-            return true;
-        }
-
-        // The points before and after the point in its faces.
-        std::array<unsigned int, kMaxValence> next_;
-        std::array<unsigned int, kMaxValence> previous_;
-        unsigned int valence_ = 0;
-        bool isRegular_ = false;
-    };
-
     void examinePoint(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point, MeshTopology& topology)
     {
         if (edges.cornersAt(point).empty())
             topology.isolatedPoints.add(point);
-        else if (RegularFan const fan(mesh, edges, point); fan)
-            topology.edgeCount += fan.countHigherNeighbors(point);
+        else if (ClosedFan const fan(mesh, edges, point); fan)
+            fan.forEachHigherEdge([&](unsigned int, unsigned int) { ++topology.edgeCount; });
         else
             PointStar(mesh, edges, point).examine(topology);
     }

@@ -1,5 +1,6 @@
 #include "Shape.h"
 
+#include "ClosedFan.h"
 #include "Geometry.h"
 #include "SurfaceTree.h"
 
@@ -134,9 +135,16 @@ namespace {
         /// Whether the normals at an edge with two sides differ by more than the angle.
         bool isSharp(std::span<Side const> sides) const
         {
-            double3 const &a = vectors_[edges_.faceOf(sides[0].corner)], &b = vectors_[edges_.faceOf(sides[1].corner)];
-            bool const areAlike = (*mesh_.faceVertex)[sides[0].corner] == (*mesh_.faceVertex)[sides[1].corner];
-            double const product = areAlike ? -dot(a, b) : dot(a, b); // the faces have opposite orientations
+            unsigned int const a = sides[0].corner, b = sides[1].corner;
+            return isSharp(a, b, (*mesh_.faceVertex)[a] != (*mesh_.faceVertex)[b]);
+        }
+
+        /// The same for an edge of the faces of these corners.
+        /// \param areOriented  whether the faces traverse the edge in opposite directions
+        bool isSharp(unsigned int cornerOfA, unsigned int cornerOfB, bool areOriented) const
+        {
+            double3 const &a = vectors_[edges_.faceOf(cornerOfA)], &b = vectors_[edges_.faceOf(cornerOfB)];
+            double const product = areOriented ? dot(a, b) : -dot(a, b);
             double const lengths = std::sqrt(dot(a, a) * dot(b, b));
             return lengths > 0 && product < cosine_ * lengths;
         }
@@ -153,9 +161,15 @@ namespace {
         Creases const creases(mesh, edges, vectors, kFoldOverDegrees);
         return sumOverBlocks<std::uint64_t>(mesh.pointCount(), [&](std::size_t begin, std::size_t end) {
             std::uint64_t count = 0;
-            edges.forEachEdge(begin, end, [&](unsigned int, std::span<Side const> sides) {
-                count += sides.size() == 2 && creases.isSharp(sides) ? 1u : 0u;
-            });
+            for (auto point = static_cast<unsigned int>(begin); point != end; ++point) {
+                if (ClosedFan const fan(mesh, edges, point); fan)
+                    fan.forEachHigherEdge(
+                        [&](unsigned int a, unsigned int b) { count += creases.isSharp(a, b, true) ? 1u : 0u; });
+                else
+                    edges.forEachEdge(point, point + 1, [&](unsigned int, std::span<Side const> sides) {
+                        count += sides.size() == 2 && creases.isSharp(sides) ? 1u : 0u;
+                    });
+            }
             return count;
         });
     }
