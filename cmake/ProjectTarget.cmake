@@ -13,6 +13,10 @@ target_compile_options(modeling_flags INTERFACE
 if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
     target_compile_options(modeling_flags INTERFACE -Wno-restrict) # g++ 12 reports false overlaps in std::string
 endif()
+if(CMAKE_UNITY_BUILD AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
+    # Unnamed namespaces of sources that another source includes are taken for those of a header.
+    target_compile_options(modeling_flags INTERFACE -Wno-subobject-linkage)
+endif()
 if(MODELING_WARNINGS_AS_ERRORS)
     target_compile_options(modeling_flags INTERFACE -Werror)
 endif()
@@ -31,14 +35,22 @@ function(modeling_use_flags target)
     set_target_properties(${target} PROPERTIES CXX_EXTENSIONS OFF)
 endfunction()
 
+# For code of tests: the code under test is in libraries, and what tests do themselves takes longer to optimize than to run.
+function(modeling_compile_quickly target)
+    if(MODELING_SANITIZE)
+        target_compile_options(${target} PRIVATE -O0)
+    else()
+        target_compile_options(${target} PRIVATE $<$<CONFIG:Release>:-O1>)
+    endif()
+endfunction()
+
 # Adds a test program from SOURCES and LIBRARIES. Each gtest case becomes a CTest test. The target tests_<LABEL> builds all
 # programs of a label.
 function(modeling_add_test name)
     cmake_parse_arguments(arg "" "LABEL" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     modeling_use_flags(${name})
-    # The code under test is in libraries; the tests themselves take longer to optimize than to run.
-    target_compile_options(${name} PRIVATE $<$<CONFIG:Release>:-O1>)
+    modeling_compile_quickly(${name})
     target_link_libraries(${name} PRIVATE ${arg_LIBRARIES} GTest::gmock GTest::gtest_main)
     if(NOT TARGET tests_${arg_LABEL})
         add_custom_target(tests_${arg_LABEL})

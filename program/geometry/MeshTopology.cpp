@@ -1,7 +1,11 @@
 #include "MeshTopology.h"
 
+#include "ClosedFan.h"
 #include "EdgeSides.h"
+#include "connectedComponents.h"
 
+#include <tbb/blocked_range.h>
+#include <tbb/parallel_reduce.h>
 #include <tbb/parallel_sort.h>
 
 #include <algorithm>
@@ -13,146 +17,145 @@
 
 namespace ModelingProgram {
 
-using Tessara::Geometry::kInvalidIndex;
-
 namespace {
 
-    /// Disjoint sets of indices (union-find); initially each index is its own set.
-    class DisjointSets {
-    public:
-        explicit DisjointSets(unsigned int count)
-            : parents_(count)
-        {
-            std::iota(parents_.begin(), parents_.end(), 0u);
-        }
+    constexpr unsigned int kGrain = 1000;
 
-        unsigned int find(unsigned int index)
-        {
-            while (parents_[index] != index)
-                index = parents_[index] = parents_[parents_[index]];
-            return index;
-        }
+    /// Calls `find(element, partial result)` for all elements in parallel, and adds up the partial results. Sums of counts
+    /// and lowest elements do not depend on the order.
+    template <class Result, class Find> Result findInAll(unsigned int count, Find const& find)
+    {
+        return tbb::parallel_reduce(
+            tbb::blocked_range<unsigned int>(0, count, kGrain), Result{},
+            [&](auto const& elements, Result result) {
+                for (unsigned int element = elements.begin(); element != elements.end(); ++element)
+                    find(element, result);
+                return result;
+            },
+            [](Result a, Result const& b) {
+                a += b;
+                return a;
+            });
+    }
 
-        void join(unsigned int a, unsigned int b)
-        {
-            a = find(a);
-            b = find(b);
-            parents_[std::max(a, b)] = std::min(a, b);
-        }
-
-        /// Whether the index represents its set; exactly one index per set does.
-        bool isRoot(unsigned int index) const { return parents_[index] == index; }
-
-    private:
-        std::vector<unsigned int> parents_;
-    };
-
-    /// The fans of faces around the points, as sets of corners at the same point.
-    using Fans = DisjointSets;
-
-    bool hasRepeatedPoint(std::span<unsigned int const> corners, std::vector<unsigned int>& scratch)
+    bool hasRepeatedPoint(std::span<unsigned int const> corners)
     {
         if (corners.size() == 3)
             return corners[0] == corners[1] || corners[1] == corners[2] || corners[2] == corners[0];
-        scratch.assign(corners.begin(), corners.end());
-        std::sort(scratch.begin(), scratch.end());
-        return std::adjacent_find(scratch.begin(), scratch.end()) != scratch.end();
+        std::vector<unsigned int> sorted(corners.begin(), corners.end());
+        std::sort(sorted.begin(), sorted.end());
+        return std::adjacent_find(sorted.begin(), sorted.end()) != sorted.end();
     }
 
-    void countFaces(MeshArrays const& mesh, MeshTopology& topology)
+    void countFace(MeshArrays const& mesh, unsigned int face, MeshTopology& topology)
     {
-        std::vector<unsigned int> scratch;
-        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
-            std::span<unsigned int const> const corners = mesh.corners(face);
-            if (corners.size() < 3)
-                topology.facesBelowThreeCorners.add(face);
-            else if (corners.size() == 3)
-                ++topology.triangleCount;
-            else
-                (corners.size() == 4 ? topology.quads : topology.polygons).add(face);
-            if (hasRepeatedPoint(corners, scratch))
-                topology.facesWithRepeatedPoints.add(face);
+        std::span<unsigned int const> const corners = mesh.corners(face);
+        if (corners.size() < 3)
+            topology.facesBelowThreeCorners.add(face);
+        else if (corners.size() == 3)
+            ++topology.triangleCount;
+        else
+            (corners.size() == 4 ? topology.quads : topology.polygons).add(face);
+        if (hasRepeatedPoint(corners))
+            topology.facesWithRepeatedPoints.add(face);
+    }
+
+    /// One end of a side, as seen from the point at that end.
+    struct SideEnd {
+        unsigned int otherPoint;
+        unsigned int startCorner; // of the side
+        unsigned int corner; // the one at the point: equal to `startCorner` if the side leads away from it
+        friend auto operator<=>(SideEnd const&, SideEnd const&) = default;
+    };
+
+    /// The sides at one point: which edges they form, and how these connect the corners of the faces to fans.
+    class PointStar {
+    public:
+        PointStar(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point)
+            : point_(point)
+        {
+            unsigned int const* const pointAt = mesh.faceVertex->data;
+            edges.forEachCornerAt(point, [&](CornerNeighbors const& at) {
+                corners_.push_back(at.corner);
+                if (pointAt[at.next] == point)
+                    joined_.push_back({at.corner, at.next}); // equal consecutive points are one vertex of the face
+                else
+                    ends_.push_back({pointAt[at.next], at.corner, at.corner});
+                if (pointAt[at.previous] != point)
+                    ends_.push_back({pointAt[at.previous], at.previous, at.corner});
+            });
+            std::sort(ends_.begin(), ends_.end());
         }
-    }
 
-    /// \param lower  the lower point of the edge
-    /// \param sides  in ascending order
-    void examineEdge(MeshArrays const& mesh, unsigned int lower, std::span<Side const> sides, MeshTopology& topology)
-    {
-        ++topology.edgeCount;
-        if (sides.size() == 1)
-            topology.boundaryEdges.add(sides[0].corner);
-        if (sides.size() > 2)
-            topology.nonManifoldEdges.add(sides[0].corner);
-
-        std::array<Finding, 2> directions; // away from the lower point, and towards it
-        for (Side const& side : sides)
-            directions[(*mesh.faceVertex)[side.corner] == lower ? 0 : 1].add(side.corner);
-        for (Finding const& direction : directions) {
-            if (direction.count > 1)
-                topology.windingConflicts.add(direction.first);
-            if (direction.count == 2 && sides.size() == 2)
-                topology.flippedEdges.add(direction.first);
-        }
-    }
-
-    void joinFans(MeshArrays const& mesh, unsigned int lower, std::span<Side const> sides, Fans& fans)
-    {
-        unsigned int firstAtLower = kInvalidIndex;
-        unsigned int firstAtHigher = kInvalidIndex;
-        for (Side const& side : sides) {
-            unsigned int atLower = side.corner;
-            unsigned int atHigher = side.nextCorner;
-            if ((*mesh.faceVertex)[atLower] != lower)
-                std::swap(atLower, atHigher);
-            if (firstAtLower == kInvalidIndex) {
-                firstAtLower = atLower;
-                firstAtHigher = atHigher;
+        void examine(MeshTopology& topology)
+        {
+            for (auto first = ends_.begin(); first != ends_.end();) {
+                auto const last = std::find_if(
+                    first, ends_.end(), [=](SideEnd const& end) { return end.otherPoint != first->otherPoint; });
+                if (point_ < first->otherPoint) // each edge once
+                    examineEdge({first, last}, topology);
+                for (SideEnd const& end : std::span(first, last))
+                    joined_.push_back({first->corner, end.corner});
+                first = last;
             }
-            fans.join(firstAtLower, atLower);
-            fans.join(firstAtHigher, atHigher);
+            if (countFans() > 1)
+                topology.nonManifoldPoints.add(point_);
         }
-    }
 
-    void examineEdges(MeshArrays const& mesh, EdgeSides const& edges, Fans& fans, MeshTopology& topology)
-    {
-        edges.forEachEdge(0, mesh.pointCount(), [&](unsigned int lower, std::span<Side const> sides) {
-            examineEdge(mesh, lower, sides, topology);
-            joinFans(mesh, lower, sides, fans);
-        });
-    }
+    private:
+        static void examineEdge(std::span<SideEnd const> sides, MeshTopology& topology)
+        {
+            ++topology.edgeCount;
+            if (sides.size() == 1)
+                topology.boundaryEdges.add(sides[0].startCorner);
+            if (sides.size() > 2)
+                topology.nonManifoldEdges.add(sides[0].startCorner);
+            std::array<Finding, 2> directions; // away from the point, and towards it
+            for (SideEnd const& side : sides)
+                directions[side.startCorner == side.corner ? 0 : 1].add(side.startCorner);
+            for (Finding const& direction : directions) {
+                if (direction.count > 1)
+                    topology.windingConflicts.add(direction.first);
+                if (direction.count == 2 && sides.size() == 2)
+                    topology.flippedEdges.add(direction.first);
+            }
+        }
 
-    void countNonManifoldPoints(MeshArrays const& mesh, Fans& fans, MeshTopology& topology)
-    {
-        unsigned int const* const point = mesh.faceVertex->data;
-        std::vector<bool> hasFan(mesh.pointCount());
-        std::vector<bool> isNonManifold(mesh.pointCount());
-        forEachSide(mesh, [&](unsigned int corner, unsigned int next) {
-            if (point[corner] == point[next]) // equal consecutive points are one vertex of the face
-                fans.join(corner, next);
-        });
-        forEachSide(mesh, [&](unsigned int corner, unsigned int) {
-            if (!fans.isRoot(corner))
-                return;
-            if (hasFan[point[corner]])
-                isNonManifold[point[corner]] = true;
-            hasFan[point[corner]] = true;
-        });
-        for (unsigned int p = 0; p != mesh.pointCount(); ++p)
-            if (isNonManifold[p])
-                topology.nonManifoldPoints.add(p);
-    }
+        /// The number of sets of corners that `joined_` connects.
+        std::size_t countFans() const
+        {
+            std::vector<std::size_t> parents(corners_.size());
+            std::iota(parents.begin(), parents.end(), std::size_t{0});
+            auto const find = [&](unsigned int corner) {
+                auto i = static_cast<std::size_t>(
+                    std::lower_bound(corners_.begin(), corners_.end(), corner) - corners_.begin());
+                while (parents[i] != i)
+                    i = parents[i] = parents[parents[i]];
+                return i;
+            };
+            std::size_t count = corners_.size();
+            for (auto const& [a, b] : joined_)
+                if (std::size_t const i = find(a), k = find(b); i != k) {
+                    parents[std::max(i, k)] = std::min(i, k);
+                    --count;
+                }
+            return count;
+        }
 
-    void countParts(MeshArrays const& mesh, MeshTopology& topology)
+        unsigned int point_;
+        std::vector<unsigned int> corners_; // ascending
+        std::vector<SideEnd> ends_;
+        std::vector<std::array<unsigned int, 2>> joined_; // pairs of corners
+    };
+
+    void examinePoint(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point, MeshTopology& topology)
     {
-        DisjointSets parts(mesh.pointCount());
-        for (unsigned int face = 0; face != mesh.faceCount(); ++face)
-            for (unsigned int const point : mesh.corners(face))
-                parts.join(mesh.corners(face)[0], point);
-        for (unsigned int point = 0; point != mesh.pointCount(); ++point)
-            topology.partCount += parts.isRoot(point) ? 1u : 0u;
-        topology.isolatedPoints = findIsolatedPoints(mesh);
-        topology.partCount -= topology.isolatedPoints.count; // each of them is a set of its own
+        if (edges.cornersAt(point).empty())
+            topology.isolatedPoints.add(point);
+        else if (ClosedFan const fan(mesh, edges, point); fan)
+            fan.forEachHigherEdge([&](unsigned int, unsigned int) { ++topology.edgeCount; });
+        else
+            PointStar(mesh, edges, point).examine(topology);
     }
 
     bool isSliver(std::span<unsigned int const> corners, float3 const* position, float ratio)
@@ -175,6 +178,18 @@ bool MeshTopology::isClosedManifold() const
     return !facesBelowThreeCorners && !boundaryEdges && !nonManifoldEdges && !windingConflicts && !nonManifoldPoints;
 }
 
+MeshTopology& MeshTopology::operator+=(MeshTopology const& other)
+{
+    triangleCount += other.triangleCount;
+    edgeCount += other.edgeCount;
+    for (Finding MeshTopology::*const finding : {&MeshTopology::facesBelowThreeCorners, &MeshTopology::quads,
+             &MeshTopology::polygons, &MeshTopology::facesWithRepeatedPoints, &MeshTopology::boundaryEdges,
+             &MeshTopology::nonManifoldEdges, &MeshTopology::windingConflicts, &MeshTopology::flippedEdges,
+             &MeshTopology::nonManifoldPoints, &MeshTopology::isolatedPoints})
+        this->*finding += other.*finding;
+    return *this;
+}
+
 MeshTopology analyzeTopology(MeshArrays const& mesh)
 {
     return analyzeTopology(mesh, EdgeSides(mesh));
@@ -182,14 +197,11 @@ MeshTopology analyzeTopology(MeshArrays const& mesh)
 
 MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges)
 {
-    MeshTopology topology;
-    countFaces(mesh, topology);
-    {
-        Fans fans(mesh.cornerCount());
-        examineEdges(mesh, edges, fans, topology);
-        countNonManifoldPoints(mesh, fans, topology);
-    }
-    countParts(mesh, topology);
+    auto topology = findInAll<MeshTopology>(
+        mesh.faceCount(), [&](unsigned int face, MeshTopology& found) { countFace(mesh, face, found); });
+    topology += findInAll<MeshTopology>(
+        mesh.pointCount(), [&](unsigned int point, MeshTopology& found) { examinePoint(mesh, edges, point, found); });
+    topology.partCount = countConnectedComponents(mesh, edges);
     if (topology.isClosedManifold()) {
         auto const points = static_cast<std::int64_t>(mesh.pointCount() - topology.isolatedPoints.count);
         std::int64_t const eulerCharacteristic =
@@ -220,11 +232,9 @@ Finding findIsolatedPoints(MeshArrays const& mesh)
 
 std::uint64_t countSlivers(MeshArrays const& mesh, float ratio)
 {
-    std::uint64_t count = 0;
-    for (unsigned int face = 0; face != mesh.faceCount(); ++face)
-        if (isSliver(mesh.corners(face), mesh.positions->data, ratio))
-            ++count;
-    return count;
+    return findInAll<std::uint64_t>(mesh.faceCount(), [&](unsigned int face, std::uint64_t& count) {
+        count += isSliver(mesh.corners(face), mesh.positions->data, ratio) ? 1u : 0u;
+    });
 }
 
 std::uint64_t countCoincidentPoints(MeshArrays const& mesh)

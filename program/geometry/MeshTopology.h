@@ -22,6 +22,12 @@ struct Finding {
         ++count;
         first = std::min(first, element);
     }
+    Finding& operator+=(Finding const& other)
+    {
+        count += other.count;
+        first = std::min(first, other.first);
+        return *this;
+    }
 };
 
 /// How the faces of a mesh are connected. An edge joins two different points that are consecutive in a face of at least
@@ -51,12 +57,15 @@ struct MeshTopology {
     /// True if all faces have at least three corners, each edge has two sides in opposite directions, and the faces at
     /// each point form one fan. Isolated points do not matter.
     bool isClosedManifold() const;
+
+    /// Adds what was found among other faces or points; not `partCount` and `genus`, which concern the whole mesh.
+    MeshTopology& operator+=(MeshTopology const& other);
 };
 
 class EdgeSides;
 
-/// Accepts any valid mesh. Linear, except for sorting the edges at each point; needs up to 16 bytes per corner and 9
-/// per point.
+/// Accepts any valid mesh. Runs in parallel, with the same result for any number of threads. Linear, except for sorting
+/// the edges at each point; needs up to 8 bytes per corner and per point.
 MeshTopology analyzeTopology(MeshArrays const& mesh);
 /// The same for callers that already have the edges of the mesh.
 MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges);

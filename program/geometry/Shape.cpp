@@ -1,5 +1,6 @@
 #include "Shape.h"
 
+#include "ClosedFan.h"
 #include "Geometry.h"
 #include "SurfaceTree.h"
 
@@ -123,8 +124,9 @@ namespace {
     /// Classifies edges by the angle between the normals of their faces.
     class Creases {
     public:
-        Creases(MeshArrays const& mesh, std::vector<double3> const& vectors, double degrees)
+        Creases(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors, double degrees)
             : mesh_(mesh)
+            , edges_(edges)
             , vectors_(vectors)
             , cosine_(std::cos(degrees * std::numbers::pi / 180))
         {
@@ -133,36 +135,41 @@ namespace {
         /// Whether the normals at an edge with two sides differ by more than the angle.
         bool isSharp(std::span<Side const> sides) const
         {
-            double3 const &a = vectors_[faceAt(sides[0])], &b = vectors_[faceAt(sides[1])];
-            bool const areAlike = (*mesh_.faceVertex)[sides[0].corner] == (*mesh_.faceVertex)[sides[1].corner];
-            double const product = areAlike ? -dot(a, b) : dot(a, b); // the faces have opposite orientations
+            unsigned int const a = sides[0].corner, b = sides[1].corner;
+            return isSharp(a, b, (*mesh_.faceVertex)[a] != (*mesh_.faceVertex)[b]);
+        }
+
+        /// The same for an edge of the faces of these corners.
+        /// \param areOriented  whether the faces traverse the edge in opposite directions
+        bool isSharp(unsigned int cornerOfA, unsigned int cornerOfB, bool areOriented) const
+        {
+            double3 const &a = vectors_[edges_.faceOf(cornerOfA)], &b = vectors_[edges_.faceOf(cornerOfB)];
+            double const product = areOriented ? dot(a, b) : -dot(a, b);
             double const lengths = std::sqrt(dot(a, a) * dot(b, b));
             return lengths > 0 && product < cosine_ * lengths;
         }
 
     private:
-        unsigned int faceAt(Side const& side) const
-        {
-            // If all faces have equally many corners, as in most meshes, this finds the face without a search.
-            unsigned int const* const offset = mesh_.faceOffset->data;
-            auto const face =
-                static_cast<unsigned int>(std::uint64_t{side.corner} * mesh_.faceCount() / mesh_.cornerCount());
-            return offset[face] <= side.corner && side.corner < offset[face + 1] ? face : mesh_.faceOf(side.corner);
-        }
-
         MeshArrays const& mesh_;
+        EdgeSides const& edges_;
         std::vector<double3> const& vectors_;
         double cosine_;
     };
 
     std::uint64_t countFoldOvers(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors)
     {
-        Creases const creases(mesh, vectors, kFoldOverDegrees);
+        Creases const creases(mesh, edges, vectors, kFoldOverDegrees);
         return sumOverBlocks<std::uint64_t>(mesh.pointCount(), [&](std::size_t begin, std::size_t end) {
             std::uint64_t count = 0;
-            edges.forEachEdge(begin, end, [&](unsigned int, std::span<Side const> sides) {
-                count += sides.size() == 2 && creases.isSharp(sides) ? 1u : 0u;
-            });
+            for (auto point = static_cast<unsigned int>(begin); point != end; ++point) {
+                if (ClosedFan const fan(mesh, edges, point); fan)
+                    fan.forEachHigherEdge(
+                        [&](unsigned int a, unsigned int b) { count += creases.isSharp(a, b, true) ? 1u : 0u; });
+                else
+                    edges.forEachEdge(point, point + 1, [&](unsigned int, std::span<Side const> sides) {
+                        count += sides.size() == 2 && creases.isSharp(sides) ? 1u : 0u;
+                    });
+            }
             return count;
         });
     }
@@ -233,7 +240,7 @@ ExaminedMesh examine(MeshArrays const& mesh)
 std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& edges, double degrees)
 {
     std::vector<double3> const vectors = areaVectors(mesh);
-    Creases const creases(mesh, vectors, degrees);
+    Creases const creases(mesh, edges, vectors, degrees);
     return edges.pointsOfEdges(
         [&](std::span<Side const> sides) { return sides.size() > 2 || (sides.size() == 2 && creases.isSharp(sides)); });
 }

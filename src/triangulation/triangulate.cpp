@@ -50,7 +50,7 @@ namespace {
 
     /// Cuts one face: `source` receives, for each corner of its triangles, the corner of the mesh that it comes from.
     void cutFace(
-        MeshArrays const& mesh, unsigned int face, std::span<unsigned int> source, Internal::PolygonStorage& storage)
+        MeshArrays const& mesh, unsigned int face, std::span<unsigned int> source, Modeling::Internal::PolygonStorage& storage)
     {
         unsigned int const firstCorner = mesh.faceOffset->data[face];
         unsigned int const cornerCount = cornerCountOf(mesh, face);
@@ -61,7 +61,7 @@ namespace {
             float3* const corners = storage.positions.take(cornerCount);
             for (unsigned int i = 0; i != cornerCount; ++i)
                 corners[i] = position[vertex[i]];
-            Internal::triangulatePolygon({corners, cornerCount}, source, storage);
+            Modeling::Internal::triangulatePolygon({corners, cornerCount}, source, storage);
         } else {
             std::iota(source.begin(), source.end(), 0u);
         }
@@ -85,7 +85,7 @@ namespace {
         unsigned int* const sourceCorner = triangulation.sourceCorner.data;
         // Each face writes its own triangles.
         parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [&](auto const& faces) {
-            Internal::PolygonStorage storage;
+            Modeling::Internal::PolygonStorage storage;
             for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
                 std::size_t const begin = std::size_t{3} * triangleOffset[face];
                 std::size_t const end = std::size_t{3} * triangleOffset[face + 1];

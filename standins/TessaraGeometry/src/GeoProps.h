@@ -4,6 +4,7 @@
 #include <TessaraGeometry/Names.h>
 #include <TessaraObject/Object.h>
 
+#include <string>
 #include <string_view>
 
 namespace Tessara::Geometry::Internal {
@@ -14,6 +15,12 @@ inline constexpr char const* sElementCount = "sElementCount"; // unsigned int, i
 Object const& dataPrototype();
 Object const& rangePrototype();
 Object const& componentPrototype();
+
+/// A name as messages show it.
+inline std::string quoted(Orvan::String const& name)
+{
+    return "\"" + std::string(name.view()) + "\"";
+}
 
 /// The stored value under a key, not copied; null unless it is of type `T`.
 template <class T> T const* valueOf(Object const& object, std::string_view key)

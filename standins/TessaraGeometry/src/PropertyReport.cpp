@@ -26,11 +26,6 @@ namespace {
             std::begin(kStandardNames), std::end(kStandardNames), [&](auto const* n) { return name == n; });
     }
 
-    std::string quoted(Orvan::String const& name)
-    {
-        return "\"" + std::string(name.view()) + "\"";
-    }
-
     /// The length of the array that a data property holds; nullopt if it holds no array of a known element type.
     std::optional<std::uint64_t> dataLength(Object const& property)
     {
@@ -64,7 +59,7 @@ namespace {
                 return;
             Orvan::String const target = getGeoPropTargetName(object_, name);
             if (!length)
-                add(quoted(name) + " holds no array of a known element type");
+                add(Internal::quoted(name) + " holds no array of a known element type");
             else if (getRangeGeoProperty(object_, target))
                 noteRangeData(target, name, *length);
             else
@@ -75,7 +70,7 @@ namespace {
         {
             auto const indices = getRangeGeoPropIndices(object_, name);
             if (!indices) {
-                add(quoted(name) + " holds no indices");
+                add(Internal::quoted(name) + " holds no indices");
                 return;
             }
             Orvan::String const target = getGeoPropTargetName(object_, name);
@@ -87,21 +82,22 @@ namespace {
             auto const beyond = std::find_if(indices->begin(), indices->end(),
                 [&](unsigned int index) { return index != kInvalidIndex && index >= data->second.length; });
             if (beyond != indices->end())
-                add(quoted(name) + "[" + to_string(beyond - indices->begin()) + "] is " + to_string(*beyond) + ", but "
-                    + quoted(data->second.name) + " has " + to_string(data->second.length) + " values");
+                add(Internal::quoted(name) + "[" + to_string(beyond - indices->begin()) + "] is " + to_string(*beyond)
+                    + ", but " + Internal::quoted(data->second.name) + " has " + to_string(data->second.length)
+                    + " values");
         }
 
         void examineLength(Orvan::String const& name, Orvan::String const& target, std::uint64_t length)
         {
             Orvan::Ptr<Object> const component = Internal::objectAt(object_, target.view());
             if (!component || !Object::isA(*component, *getComponentGeoPropPrototype())) {
-                add(quoted(name) + " targets " + quoted(target) + ", which does not exist");
+                add(Internal::quoted(name) + " targets " + Internal::quoted(target) + ", which does not exist");
                 return;
             }
             unsigned int const count = getElementCount(object_, target);
             if (length != count)
-                add(quoted(name) + " has " + to_string(length) + " entries for " + to_string(count) + " elements of "
-                    + std::string(target.view()));
+                add(Internal::quoted(name) + " has " + to_string(length) + " entries for " + to_string(count)
+                    + " elements of " + std::string(target.view()));
         }
 
         void noteRangeData(Orvan::String const& range, Orvan::String const& name, std::uint64_t length)

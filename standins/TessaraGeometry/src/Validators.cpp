@@ -21,11 +21,6 @@ namespace {
         return Status(Orvan::String(sentence));
     }
 
-    std::string quoted(Orvan::String const& text)
-    {
-        return "\"" + std::string(text.view()) + "\"";
-    }
-
     /// What messages call the validated object, and the elements that its offset array refers to.
     struct Wording {
         char const* object;
@@ -75,7 +70,7 @@ namespace {
             return failure(required.name + (" has no sDefault of type " + type));
         auto const* const target = Internal::valueOf<Orvan::String>(*property, sTarget);
         if (!target || *target != required.component.name)
-            return failure(required.name + (" targets " + quoted(target ? *target : "")) + " instead of "
+            return failure(required.name + (" targets " + Internal::quoted(target ? *target : "")) + " instead of "
                 + required.component.name);
         if ((*data)->size != required.length)
             return failure(required.name + (" has " + to_string((*data)->size)) + " entries instead of "
@@ -182,7 +177,7 @@ Status PointCloudValidator::validate(Object const& pointCloud)
                 std::find_if(components.begin(), components.end(), [](auto const& name) { return name != sPointComp; });
             return other == components.end()
                 ? Status()
-                : failure("a point cloud has one component, but there is also " + quoted(*other));
+                : failure("a point cloud has one component, but there is also " + Internal::quoted(*other));
         },
         [&] {
             return checkStandardData<Math::float3>(pointCloud, {sPointPosition, points, points.count});

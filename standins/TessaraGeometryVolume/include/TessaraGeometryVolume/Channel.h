@@ -114,7 +114,7 @@ private:
         }
     };
 
-    std::size_t voxelCount() const noexcept { return static_cast<std::size_t>(side_ * side_ * side_); }
+    std::size_t voxelCount() const noexcept { return static_cast<std::size_t>(side_) * side_ * side_; }
 
     int side_;
     std::array<Level, Traits::kDepthCount> levels_;
