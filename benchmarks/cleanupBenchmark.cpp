@@ -66,6 +66,7 @@ unsigned int twinOf(PointCorners const& around, unsigned int const* corner, unsi
 Row const flatPasses("removeSlivers:flat passes", kSizes, [](State& state) {
     FlatMesh const mesh(needledSphere(state).polygons());
     unsigned int const* const corner = mesh.faceVertex.data;
+    float3 const* const position = mesh.points.data;
     timeRuns(state, sizeOf(state), [&] {
         PointCorners const around = cornersByPoint(mesh.pointCount(), corner, mesh.faceVertex.size);
         auto adjacency = uninitializedArray<unsigned int>(mesh.faceVertex.size);
@@ -76,7 +77,7 @@ Row const flatPasses("removeSlivers:flat passes", kSizes, [](State& state) {
                 unsigned int const* const c = corner + std::size_t{3} * face;
                 for (unsigned int k = 0; k != 3; ++k)
                     adjacency[std::size_t{3} * face + k] = twinOf(around, corner, face, k);
-                float3 const a = mesh.points[c[0]], b = mesh.points[c[1]], d = mesh.points[c[2]];
+                float3 const a = position[c[0]], b = position[c[1]], d = position[c[2]];
                 normals[face] = cross(safeNormalize(b - a), safeNormalize(d - a));
                 float const ab = length(b - a), bd = length(d - b), da = length(a - d);
                 ratios[face] = std::min({ab, bd, da}) / std::max({ab, bd, da});
