@@ -6,9 +6,12 @@
 
 #include <benchmark/benchmark.h>
 
+#include <array>
+#include <cstdint>
 #include <functional>
 #include <map>
 #include <string>
+#include <vector>
 
 // Row names tell the table how rows are related: "<name>/<size>" is compared with "<name>:memcpy/<size>", which copies the
 // bytes of the same input into fresh memory on one thread, and with "<name>:<peer>/<size>".

@@ -217,12 +217,12 @@ CopyRow const faceBytes("deleteFaces", kFaces, [](State const& state) -> CopyRow
 /// A row for a peer, which `make(state)` returns with the number of elements.
 template <class Make> [[maybe_unused]] Row deletion(char const* name, Sizes const& sizes, Make const& make)
 {
-    return {name, sizes, [=](State& state) {
-                auto const [peer, elements] = make(state);
-                auto const prepare = [&peer = peer] { return peer.prepare(), 0; };
-                timeOnEach(state, elements, prepare, [&peer = peer](int) { peer.run(); });
-                state.counters["remaining"] = static_cast<double>(peer.remaining());
-            }};
+    return Row(name, sizes, [=](State& state) {
+        auto const [peer, elements] = make(state);
+        auto const prepare = [&peer = peer] { return peer.prepare(), 0; };
+        timeOnEach(state, elements, prepare, [&peer = peer](int) { peer.run(); });
+        state.counters["remaining"] = static_cast<double>(peer.remaining());
+    });
 }
 
 template <auto makePeer> std::pair<PeerDeletion, std::size_t> pointDeletion(State const& state)

@@ -67,16 +67,16 @@ MeshBuilder const& gradedSphereOf(std::size_t faces)
 
 Row halfEdges(char const* name, MakeMesh meshOf)
 {
-    return {name, kHalfEdges, [=](State& state) {
-                FlatMesh const mesh(meshOf(sizeOf(state)).polygons());
-                auto const build = [&] {
-                    Geometry::Mesh::HalfEdgeDataStructure const built(
-                        mesh.pointCount(), mesh.faceCount(), mesh.faceVertex, mesh.faceOffset);
-                    benchmark::DoNotOptimize(built.valence(0));
-                };
-                timeRuns(state, mesh.faceCount(), build);
-                countWorkingBytes(state, mesh.faceCount(), 0, build);
-            }};
+    return Row(name, kHalfEdges, [=](State& state) {
+        FlatMesh const mesh(meshOf(sizeOf(state)).polygons());
+        auto const build = [&] {
+            Geometry::Mesh::HalfEdgeDataStructure const built(
+                mesh.pointCount(), mesh.faceCount(), mesh.faceVertex, mesh.faceOffset);
+            benchmark::DoNotOptimize(built.valence(0));
+        };
+        timeRuns(state, mesh.faceCount(), build);
+        countWorkingBytes(state, mesh.faceCount(), 0, build);
+    });
 }
 Row const inOrder = halfEdges("halfEdges", sphereOf), shuffled = halfEdges("halfEdges shuffled", shuffledSphereOf);
 
@@ -180,16 +180,16 @@ CopyRow const resultBytes("subdivide uniform", kUniform, [](State const& state) 
 template <class Mesh, class Refine>
 [[maybe_unused]] Row peer(char const* name, Sizes const& sizes, MakeMesh meshOf, Refine const& refine)
 {
-    return {name, {sizes[0], sizes[1]}, [=](State& state) {
-                Mesh const mesh(meshOf(sizeOf(state)));
-                std::size_t faces = 0;
-                auto const run = [&] { faces = refine(mesh, sizeOf(state)); };
-                for (auto _ : state)
-                    run();
-                countElements(state, faces);
-                countWorkingBytes(state, faces, 0, run);
-                state.counters["result faces"] = static_cast<double>(faces);
-            }};
+    return Row(name, {sizes[0], sizes[1]}, [=](State& state) {
+        Mesh const mesh(meshOf(sizeOf(state)));
+        std::size_t faces = 0;
+        auto const run = [&] { faces = refine(mesh, sizeOf(state)); };
+        for (auto _ : state)
+            run();
+        countElements(state, faces);
+        countWorkingBytes(state, faces, 0, run);
+        state.counters["result faces"] = static_cast<double>(faces);
+    });
 }
 
 #ifdef MODELING_HAS_CGAL

@@ -148,11 +148,11 @@ CopyRow const voxelBytes("buildVolume", kRadii, [](State const& state) -> CopyRo
 #ifdef MODELING_HAS_OPENVDB
 Row samplingByOpenvdb(char const* name)
 {
-    return {name, kFaces, [](State& state) {
-                std::vector<float3> const points = pointsInBand(state, kRadius);
-                OpenvdbGrid const grid(bandOfVoxels(kRadius), 1);
-                timeRuns(state, points.size(), [&] { benchmark::DoNotOptimize(grid.sumOfSamples(points)); });
-            }};
+    return Row(name, kFaces, [](State& state) {
+        std::vector<float3> const points = pointsInBand(state, kRadius);
+        OpenvdbGrid const grid(bandOfVoxels(kRadius), 1);
+        timeRuns(state, points.size(), [&] { benchmark::DoNotOptimize(grid.sumOfSamples(points)); });
+    });
 }
 Row const openvdbRows[]{samplingByOpenvdb("samplePaddedVolume:openvdb"), samplingByOpenvdb("sampleVolume:openvdb"),
     {"buildVolume:openvdb", kRadii, [](State& state) {

@@ -52,33 +52,33 @@ void addAttributes(PolygonMesh const& mesh, Object& object)
 
 Row triangulation(char const* name, Sizes const& sizes, MakeMesh make, bool withAttributes = false)
 {
-    return {name, sizes, [=](State& state) {
-                PolygonMesh const& mesh = meshOf(state, make);
-                std::size_t const triangles = triangleCountOf(mesh);
-                auto const source = mesh.build();
-                auto const edit = [](Object& object) { Geometry::Mesh::triangulate("*", object); };
-                if (withAttributes) {
-                    addAttributes(mesh, *source);
-                    timeOnCopies(state, triangles, *source, edit);
-                } else
-                    measureEdit(state, triangles, triangles * 4 * sizeof(unsigned int), *source, edit);
-            }};
+    return Row(name, sizes, [=](State& state) {
+        PolygonMesh const& mesh = meshOf(state, make);
+        std::size_t const triangles = triangleCountOf(mesh);
+        auto const source = mesh.build();
+        auto const edit = [](Object& object) { Geometry::Mesh::triangulate("*", object); };
+        if (withAttributes) {
+            addAttributes(mesh, *source);
+            timeOnCopies(state, triangles, *source, edit);
+        } else
+            measureEdit(state, triangles, triangles * 4 * sizeof(unsigned int), *source, edit);
+    });
 }
 
 CopyRow copying(char const* name, Sizes const& sizes, MakeMesh make, std::size_t attributeBytes = 0)
 {
-    return {name, sizes, [=](State const& state) -> CopyRow::Input {
-                std::size_t const triangles = triangleCountOf(meshOf(state, make));
-                return {triangles * (4 * sizeof(unsigned int) + attributeBytes), triangles};
-            }};
+    return CopyRow(name, sizes, [=](State const& state) -> CopyRow::Input {
+        std::size_t const triangles = triangleCountOf(meshOf(state, make));
+        return {triangles * (4 * sizeof(unsigned int) + attributeBytes), triangles};
+    });
 }
 
 template <class Peer> [[maybe_unused]] Row triangulationBy(char const* name, Sizes const& sizes, MakeMesh make)
 {
-    return {name, sizes, [=](State& state) {
-                PolygonMesh const& mesh = meshOf(state, make);
-                timeOnCopies(state, triangleCountOf(mesh), Peer(mesh), [](Peer& peer) { peer.triangulate(); });
-            }};
+    return Row(name, sizes, [=](State& state) {
+        PolygonMesh const& mesh = meshOf(state, make);
+        timeOnCopies(state, triangleCountOf(mesh), Peer(mesh), [](Peer& peer) { peer.triangulate(); });
+    });
 }
 
 Sizes const kQuads{{10'000}, {102'400}, {1'000'000}}, kPolygons{{2'000}, {20'000}, {200'000}};
