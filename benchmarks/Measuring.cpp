@@ -3,7 +3,9 @@
 #include "support/AllocationHooks.h"
 
 #include <atomic>
+#include <cmath>
 #include <cstdlib>
+#include <cstring>
 #include <new>
 
 #include <malloc.h>
@@ -18,24 +20,51 @@ std::atomic<std::int64_t> mostAllocated = 0;
 
 namespace Benchmarks {
 
-void countElements(benchmark::State& state, std::size_t elements)
+Row::Row(std::string const& name, Sizes const& sizes, std::function<void(State&)> const& run)
+{
+    auto* const row = benchmark::RegisterBenchmark(name.c_str(), run);
+    for (auto const& arguments : sizes)
+        row->Args(arguments);
+    row->UseRealTime();
+}
+
+CopyRow::CopyRow(std::string const& name, Sizes const& sizes, std::function<Input(State const&)> const& inputOf)
+    : Row(name + ":memcpy", sizes, [=](State& state) {
+        auto const [bytes, elements] = inputOf(state);
+        Orvan::Array<unsigned char> const source(bytes);
+        for (auto _ : state) {
+            Orvan::Array<unsigned char> target(bytes, Orvan::kUninitialized);
+            std::memcpy(target.data, source.data, bytes);
+            benchmark::DoNotOptimize(target.data);
+            benchmark::ClobberMemory();
+        }
+        state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
+        if (elements != 0)
+            countElements(state, elements);
+    })
+{
+}
+
+MeshBuilder const& sphereOf(std::size_t faces)
+{
+    return madeOnce(faces, [](std::size_t count) { return MeshBuilder::sphereWithFaces(count); });
+}
+
+MeshBuilder const& shuffledSphereOf(std::size_t faces)
+{
+    return madeOnce(faces, [](std::size_t count) { return MeshBuilder::sphereWithFaces(count).shuffled(1); });
+}
+
+PolygonMesh bentQuads(std::size_t faces)
+{
+    auto const segments = static_cast<unsigned int>(std::sqrt(static_cast<double>(faces)));
+    return PolygonMesh::quads(segments).withNoise(0.2f, 1);
+}
+
+void countElements(State& state, std::size_t elements)
 {
     auto const all = static_cast<double>(state.iterations()) * static_cast<double>(elements);
     state.counters["time/element"] = benchmark::Counter(all, benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
-}
-
-void copyBytes(benchmark::State& state, std::size_t bytes, std::size_t elements)
-{
-    Orvan::Array<unsigned char> const source(bytes);
-    for (auto _ : state) {
-        Orvan::Array<unsigned char> target(bytes, Orvan::kUninitialized);
-        std::memcpy(target.data, source.data, bytes);
-        benchmark::DoNotOptimize(target.data);
-        benchmark::ClobberMemory();
-    }
-    state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
-    if (elements != 0)
-        countElements(state, elements);
 }
 
 Memory memoryOf(std::function<void()> const& work)
@@ -47,8 +76,7 @@ Memory memoryOf(std::function<void()> const& work)
     return {mostAllocated, allocated};
 }
 
-void countWorkingBytes(
-    benchmark::State& state, std::size_t elements, std::size_t resultBytes, std::function<void()> const& work)
+void countWorkingBytes(State& state, std::size_t elements, std::size_t resultBytes, std::function<void()> const& work)
 {
     auto const bytes = static_cast<double>(memoryOf(work).peak) - static_cast<double>(resultBytes);
     state.counters["working bytes/element"] = bytes / static_cast<double>(elements);

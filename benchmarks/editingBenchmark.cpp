@@ -1,10 +1,8 @@
 #include "Measuring.h"
-
 #include "peers/deletions.h"
 
 #include "frame/Arrays.h"
 
-#include "support/MeshBuilder.h"
 #include "support/Random.h"
 
 #include <Modeling/addPointsToPointCloud.h>
@@ -13,38 +11,23 @@
 #include <TessaraGeometry/Makers.h>
 
 #include <algorithm>
+#include <numeric>
 
 using namespace Benchmarks;
 using namespace Modeling;
 using namespace Tessara::Geometry;
-namespace Algorithms = Tessara::GeometryAlgorithms;
-using Tessara::Object;
-using Tessara::Math::float2;
-using Tessara::Math::float3;
-using Tessara::Math::uchar4;
-using TestSupport::MeshBuilder;
+using namespace Tessara::GeometryAlgorithms;
+using Tessara::Math::float2, Tessara::Math::uchar4;
 using TestSupport::Random;
 
 namespace {
 
-/// Times edits of shared copies, and counts what memory they take beyond the bytes of the result.
-template <class Edit> void measureEdit(
-    benchmark::State& state, Object const& source, std::size_t elements, std::size_t resultBytes, Edit const& edit)
-{
-    timeOnCopies(state, source, edit);
-    countElements(state, elements);
-    Object object = source;
-    countWorkingBytes(state, elements, resultBytes, [&] { edit(object); });
-}
+constexpr std::size_t kBytesPerPoint = 32;
 
-/// The attributes of a cloud, 32 bytes per point.
 struct FlatCloud {
-    Orvan::Array<float3> positions;
-    Orvan::Array<float3> normals;
+    Orvan::Array<float3> positions, normals;
     Orvan::Array<uchar4> colors;
     Orvan::Array<float> intensities;
-
-    static constexpr std::size_t kBytesPerPoint = 32;
 };
 
 FlatCloud makeCloud(std::size_t count)
@@ -69,49 +52,53 @@ Orvan::MutablePtr<Object> makeObject(FlatCloud const& cloud)
 }
 
 // The arguments are the points that are there and those that are added.
-void addPoints(benchmark::State& state)
-{
+Sizes const kAdded{{1'000, 1'000}, {1'000'000, 9'000'000}, {9'000'000, 1'000'000}};
+
+Row const addsPoints("addPointsToPointCloud", kAdded, [](State& state) {
     auto const cloud = makeObject(makeCloud(sizeOf(state)));
     Orvan::Array<float3> const positions(sizeOf(state, 1), float3{1, 2, 3});
     std::size_t const count = sizeOf(state) + positions.size;
     // Unused capacity is counted, although its memory is never touched.
-    measureEdit(state, *cloud, count, (count + count) * FlatCloud::kBytesPerPoint,
-        [&](Object& object) { Algorithms::addPointsToPointCloud(positions, {}, object, nullptr); });
-}
+    measureEdit(state, count, (count + count) * kBytesPerPoint, *cloud,
+        [&](Object& object) { addPointsToPointCloud(positions, {}, object, nullptr); });
+});
 
-template <class T> Orvan::Array<T> flatExtended(Orvan::Array<T> const& source, std::size_t added)
+/// The source and the added values in fresh memory, on one thread; zeros if no values are given.
+template <class T>
+Orvan::Array<T> flatExtended(Orvan::Array<T> const& source, std::size_t added, T const* values = nullptr)
 {
     auto array = uninitializedArray<T>(source.size + added);
     std::memcpy(array.data, source.data, source.size * sizeof(T));
-    std::fill(array.data + source.size, array.data + array.size, T{});
+    if (values)
+        std::memcpy(array.data + source.size, values, added * sizeof(T));
+    else
+        std::fill_n(array.data + source.size, added, T{});
     return array;
 }
 
-/// The same bytes into fresh memory, on one thread: copied if they are known, filled if not.
-void copyAndFill(benchmark::State& state)
-{
+Row const copiesAndFills("addPointsToPointCloud:copy and fill", kAdded, [](State& state) {
     FlatCloud const cloud = makeCloud(sizeOf(state));
     std::size_t const added = sizeOf(state, 1);
     Orvan::Array<float3> const positions(added, float3{1, 2, 3});
-    timeOnEach(
-        state, [] { return FlatCloud(); },
-        [&](FlatCloud& result) {
-            auto extended = uninitializedArray<float3>(cloud.positions.size + added);
-            std::memcpy(extended.data, cloud.positions.data, cloud.positions.size * sizeof(float3));
-            std::memcpy(extended.data + cloud.positions.size, positions.data, added * sizeof(float3));
-            result = {std::move(extended), flatExtended(cloud.normals, added), flatExtended(cloud.colors, added),
-                flatExtended(cloud.intensities, added)};
-            benchmark::DoNotOptimize(result.positions.data);
-        });
-    countElements(state, sizeOf(state) + added);
-}
+    timeOnCopies(state, sizeOf(state) + added, FlatCloud(), [&](FlatCloud& result) {
+        result = {flatExtended(cloud.positions, added, positions.data), flatExtended(cloud.normals, added),
+            flatExtended(cloud.colors, added), flatExtended(cloud.intensities, added)};
+        benchmark::DoNotOptimize(result.positions.data);
+    });
+});
+
+CopyRow const addedBytes("addPointsToPointCloud", kAdded, [](State const& state) -> CopyRow::Input {
+    std::size_t const count = sizeOf(state) + sizeOf(state, 1);
+    return {count * kBytesPerPoint, count};
+});
+
+Sizes const kPoints{{1'000}, {100'000}, {10'000'000}};
 
 /// Half of the points, in no order.
-Orvan::Array<unsigned int> everySecondAtRandom(std::size_t count)
+Indices everySecondAtRandom(std::size_t count)
 {
-    Orvan::Array<unsigned int> order(count);
-    for (std::size_t i = 0; i != count; ++i)
-        order[i] = static_cast<unsigned int>(i);
+    Indices order(count);
+    std::iota(order.begin(), order.end(), 0u);
     Random random(2);
     for (std::size_t i = count; i > 1; --i)
         std::swap(order[i - 1], order[random.below(i)]);
@@ -119,24 +106,19 @@ Orvan::Array<unsigned int> everySecondAtRandom(std::size_t count)
     return order;
 }
 
-void deletePoints(benchmark::State& state)
-{
+Row const deletesPoints("deletePointsInPointCloud", kPoints, [](State& state) {
     auto const cloud = makeObject(makeCloud(sizeOf(state)));
     auto const indices = everySecondAtRandom(sizeOf(state));
-    measureEdit(state, *cloud, sizeOf(state), (sizeOf(state) - indices.size) * FlatCloud::kBytesPerPoint,
-        [&](Object& object) { Algorithms::deletePointsInPointCloud(indices, object, nullptr); });
-}
+    measureEdit(state, sizeOf(state), (sizeOf(state) - indices.size) * kBytesPerPoint, *cloud,
+        [&](Object& object) { deletePointsInPointCloud(indices, object, nullptr); });
+});
 
 /// On an object that is not shared: arrays are edited in place.
-void deletePointsInPlace(benchmark::State& state)
-{
-    FlatCloud const cloud = makeCloud(sizeOf(state));
+Row const deletesPointsInPlace("deletePointsInPointCloud:in place", kPoints, [](State& state) {
+    auto const make = [cloud = makeCloud(sizeOf(state))] { return makeObject(cloud); };
     auto const indices = everySecondAtRandom(sizeOf(state));
-    timeOnEach(
-        state, [&] { return makeObject(cloud); },
-        [&](auto& object) { Algorithms::deletePointsInPointCloud(indices, *object, nullptr); });
-    countElements(state, sizeOf(state));
-}
+    timeOnEach(state, sizeOf(state), make, [&](auto& object) { deletePointsInPointCloud(indices, *object, nullptr); });
+});
 
 template <class T> void flatCompact(Orvan::Array<bool> const& deleted, Orvan::Array<T>& array)
 {
@@ -148,175 +130,121 @@ template <class T> void flatCompact(Orvan::Array<bool> const& deleted, Orvan::Ar
 }
 
 /// Flags and one loop per array over plain arrays, on one thread.
-void flatDeletePoints(benchmark::State& state)
-{
+Row const deletesFlatPoints("deletePointsInPointCloud:flat", kPoints, [](State& state) {
     FlatCloud const source = makeCloud(sizeOf(state));
     auto const indices = everySecondAtRandom(sizeOf(state));
-    timeOnEach(
-        state, [&] { return FlatCloud(source); },
-        [&](FlatCloud& cloud) {
-            Orvan::Array<bool> deleted(source.positions.size);
-            for (unsigned int const point : indices)
-                deleted[point] = true;
-            flatCompact(deleted, cloud.positions);
-            flatCompact(deleted, cloud.normals);
-            flatCompact(deleted, cloud.colors);
-            flatCompact(deleted, cloud.intensities);
-            benchmark::DoNotOptimize(cloud.positions.data);
-        });
-    countElements(state, sizeOf(state));
-}
+    timeOnCopies(state, sizeOf(state), source, [&](FlatCloud& cloud) {
+        Orvan::Array<bool> deleted(source.positions.size);
+        for (unsigned int const point : indices)
+            deleted[point] = true;
+        flatCompact(deleted, cloud.positions);
+        flatCompact(deleted, cloud.normals);
+        flatCompact(deleted, cloud.colors);
+        flatCompact(deleted, cloud.intensities);
+        benchmark::DoNotOptimize(cloud.positions.data);
+    });
+});
 
-/// A sphere with attributes of points, corners and faces.
-struct FlatMesh {
-    Orvan::Array<float3> positions;
-    Orvan::Array<float3> normals; // of points
-    Orvan::Array<unsigned int> faceVertex;
-    Orvan::Array<float2> coordinates; // of corners
-    Orvan::Array<unsigned int> faceOffset;
-    Orvan::Array<int> materials; // of faces
+CopyRow const pointBytes("deletePointsInPointCloud", kPoints, [](State const& state) -> CopyRow::Input {
+    return {sizeOf(state) * kBytesPerPoint, sizeOf(state)};
+});
 
-    std::size_t bytes() const { return positions.size * 24 + faceVertex.size * 12 + materials.size * 8 + 4; }
+Sizes const kFaces{{1'000}, {100'000}, {1'000'000}};
+
+/// A sphere with attributes of points, corners and faces, of which half are to be deleted in patches of a hundred.
+struct PatchedSphere : FlatMesh {
+    Orvan::Array<float3> normals = points;
+    Orvan::Array<float2> coordinates = Orvan::Array<float2>(faceVertex.size, float2{0.5f, 0.25f}); // of corners
+    Orvan::Array<int> materials = Orvan::Array<int>(faceCount(), 7); // of faces
+    Orvan::Array<bool> deleted = Orvan::Array<bool>(faceCount());
+
+    explicit PatchedSphere(State const& state)
+        : FlatMesh(sphereOf(sizeOf(state)).polygons())
+    {
+        for (std::size_t face = 0; face != deleted.size; ++face)
+            deleted[face] = face / 100 % 2 == 1;
+    }
+    std::size_t bytes() const { return points.size * 24 + faceVertex.size * 12 + materials.size * 8 + 4; }
 };
 
-FlatMesh makeFlatMesh(std::size_t faces)
-{
-    auto const mesh = madeOnce(faces, [](std::size_t count) { return MeshBuilder::sphereWithFaces(count); }).build();
-    FlatMesh flat{*dataOf<float3>(*mesh, sPointPosition), {}, *dataOf<unsigned int>(*mesh, sFaceVertex), {},
-        *dataOf<unsigned int>(*mesh, sFaceOffset), {}};
-    flat.normals = flat.positions;
-    flat.coordinates = Orvan::Array<float2>(flat.faceVertex.size, float2{0.5f, 0.25f});
-    flat.materials = Orvan::Array<int>(flat.faceOffset.size - 1, 7);
-    return flat;
-}
-
-Orvan::MutablePtr<Object> makeObject(FlatMesh const& flat)
-{
-    auto mesh = makeMesh(flat.positions, flat.faceVertex, flat.faceOffset);
-    addDataProperty("normal", sPointComp, flat.normals, *mesh);
-    addDataProperty("uv", sFaceVertexComp, flat.coordinates, *mesh);
-    addDataProperty("material", sFaceComp, flat.materials, *mesh);
-    return mesh;
-}
-
-/// Half of the faces, in patches of a hundred.
-Orvan::Array<bool> everySecondPatch(std::size_t faceCount)
-{
-    Orvan::Array<bool> deleted(faceCount);
-    for (std::size_t face = 0; face != faceCount; ++face)
-        deleted[face] = face / 100 % 2 == 1;
-    return deleted;
-}
-
-void deleteFaces(benchmark::State& state)
-{
-    FlatMesh const flat = makeFlatMesh(sizeOf(state));
-    auto const mesh = makeObject(flat);
-    auto const deleted = everySecondPatch(flat.materials.size);
-    measureEdit(state, *mesh, deleted.size, flat.bytes() / 2,
-        [&](Object& object) { Algorithms::deleteFaces(deleted, object); });
-}
+Row const deletesFaces("deleteFaces", kFaces, [](State& state) {
+    PatchedSphere const sphere(state);
+    auto const mesh = makeMesh(sphere.points, sphere.faceVertex, sphere.faceOffset);
+    addDataProperty("normal", sPointComp, sphere.normals, *mesh);
+    addDataProperty("uv", sFaceVertexComp, sphere.coordinates, *mesh);
+    addDataProperty("material", sFaceComp, sphere.materials, *mesh);
+    measureEdit(state, sphere.faceCount(), sphere.bytes() / 2, *mesh,
+        [&](Object& object) { deleteFaces(sphere.deleted, object); });
+});
 
 /// Marks, numbers and compacts plain arrays, on one thread.
-void flatDeleteFaces(benchmark::State& state)
+void deleteFlatFaces(PatchedSphere const& source, PatchedSphere& mesh)
 {
-    FlatMesh const source = makeFlatMesh(sizeOf(state));
-    auto const deleted = everySecondPatch(source.materials.size);
-    timeOnEach(
-        state, [&] { return FlatMesh(source); },
-        [&](FlatMesh& mesh) {
-            Orvan::Array<bool> unused(mesh.positions.size, true);
-            std::size_t corners = 0, faces = 0;
-            for (std::size_t face = 0; face != deleted.size; ++face) {
-                if (deleted[face])
-                    continue;
-                for (unsigned int corner = source.faceOffset[face]; corner != source.faceOffset[face + 1]; ++corner) {
-                    unused[mesh.faceVertex[corner]] = false;
-                    mesh.faceVertex[corners] = mesh.faceVertex[corner];
-                    mesh.coordinates[corners++] = mesh.coordinates[corner];
-                }
-                mesh.materials[faces] = mesh.materials[face];
-                mesh.faceOffset[++faces] = static_cast<unsigned int>(corners);
-            }
-            Orvan::Array<unsigned int> remap(unused.size, Orvan::kUninitialized);
-            unsigned int count = 0;
-            for (std::size_t point = 0; point != unused.size; ++point) {
-                remap[point] = count;
-                if (!unused[point])
-                    ++count;
-            }
-            flatCompact(unused, mesh.positions);
-            flatCompact(unused, mesh.normals);
-            for (std::size_t corner = 0; corner != corners; ++corner)
-                mesh.faceVertex[corner] = remap[mesh.faceVertex[corner]];
-            benchmark::DoNotOptimize(mesh.positions.data);
-        });
-    countElements(state, deleted.size);
+    Orvan::Array<bool> unused(mesh.points.size, true);
+    std::size_t corners = 0, faces = 0;
+    for (std::size_t face = 0; face != source.deleted.size; ++face) {
+        if (source.deleted[face])
+            continue;
+        for (unsigned int corner = source.faceOffset[face]; corner != source.faceOffset[face + 1]; ++corner) {
+            unused[mesh.faceVertex[corner]] = false;
+            mesh.faceVertex[corners] = mesh.faceVertex[corner];
+            mesh.coordinates[corners++] = mesh.coordinates[corner];
+        }
+        mesh.materials[faces] = mesh.materials[face];
+        mesh.faceOffset[++faces] = static_cast<unsigned int>(corners);
+    }
+    Indices remap(unused.size, Orvan::kUninitialized);
+    unsigned int count = 0;
+    for (std::size_t point = 0; point != unused.size; ++point)
+        remap[point] = unused[point] ? count : count++;
+    flatCompact(unused, mesh.points);
+    flatCompact(unused, mesh.normals);
+    for (std::size_t corner = 0; corner != corners; ++corner)
+        mesh.faceVertex[corner] = remap[mesh.faceVertex[corner]];
+    benchmark::DoNotOptimize(mesh.points.data);
 }
 
-[[maybe_unused]] void deleteWithPeer(benchmark::State& state, std::size_t elements, PeerDeletion const& peer)
-{
-    auto const prepare = [&] {
-        peer.prepare();
-        return 0;
-    };
-    timeOnEach(state, prepare, [&](int) { peer.run(); });
-    countElements(state, elements);
-    state.counters["remaining"] = static_cast<double>(peer.remaining());
-}
+Row const deletesFlatFaces("deleteFaces:flat", kFaces, [](State& state) {
+    PatchedSphere const source(state);
+    timeOnCopies(state, source.faceCount(), source, [&](PatchedSphere& mesh) { deleteFlatFaces(source, mesh); });
+});
 
-using MakePointPeer = PeerDeletion (*)(std::size_t, Orvan::Array<unsigned int> const&);
-[[maybe_unused]] void addPointPeer(char const* name, Sizes const& sizes, MakePointPeer makePeer)
+CopyRow const faceBytes("deleteFaces", kFaces, [](State const& state) -> CopyRow::Input {
+    PatchedSphere const sphere(state);
+    return {sphere.bytes(), sphere.faceCount()};
+});
+
+/// A row for a peer, which `make(state)` returns with the number of elements.
+template <class Make> [[maybe_unused]] Row deletion(char const* name, Sizes const& sizes, Make const& make)
 {
-    addRow(name, sizes, [=](benchmark::State& state) {
-        deleteWithPeer(state, sizeOf(state), makePeer(sizeOf(state), everySecondAtRandom(sizeOf(state))));
+    return Row(name, sizes, [=](State& state) {
+        auto const [peer, elements] = make(state);
+        auto const prepare = [&peer = peer] { return peer.prepare(), 0; };
+        timeOnEach(state, elements, prepare, [&peer = peer](int) { peer.run(); });
+        state.counters["remaining"] = static_cast<double>(peer.remaining());
     });
 }
 
-using MakeFacePeer = PeerDeletion (*)(PeerMesh const&);
-[[maybe_unused]] void addFacePeer(char const* name, Sizes const& sizes, MakeFacePeer makePeer)
+template <auto makePeer> std::pair<PeerDeletion, std::size_t> pointDeletion(State const& state)
 {
-    addRow(name, sizes, [=](benchmark::State& state) {
-        FlatMesh const flat = makeFlatMesh(sizeOf(state));
-        auto const deleted = everySecondPatch(flat.materials.size);
-        deleteWithPeer(state, deleted.size, makePeer({flat.positions, flat.faceVertex, deleted}));
-    });
+    return {makePeer(sizeOf(state), everySecondAtRandom(sizeOf(state))), sizeOf(state)};
 }
 
-[[maybe_unused]] bool const areRowsAdded = [] {
-    Sizes const added{{1'000, 1'000}, {1'000'000, 9'000'000}, {9'000'000, 1'000'000}};
-    addRow("addPointsToPointCloud", added, addPoints);
-    addRow("addPointsToPointCloud:copy and fill", added, copyAndFill);
-    addRow("addPointsToPointCloud:memcpy", added, [](benchmark::State& state) {
-        std::size_t const count = sizeOf(state) + sizeOf(state, 1);
-        copyBytes(state, count * FlatCloud::kBytesPerPoint, count);
-    });
+template <auto makePeer> std::pair<PeerDeletion, std::size_t> faceDeletion(State const& state)
+{
+    PatchedSphere const sphere(state);
+    return {makePeer({sphere.points, sphere.faceVertex, sphere.deleted}), sphere.faceCount()};
+}
 
-    Sizes const points{{1'000}, {100'000}, {10'000'000}};
-    addRow("deletePointsInPointCloud", points, deletePoints);
-    addRow("deletePointsInPointCloud:in place", points, deletePointsInPlace);
-    addRow("deletePointsInPointCloud:flat", points, flatDeletePoints);
-    addRow("deletePointsInPointCloud:memcpy", points,
-        [](benchmark::State& state) { copyBytes(state, sizeOf(state) * FlatCloud::kBytesPerPoint, sizeOf(state)); });
-
-    Sizes const faces{{1'000}, {100'000}, {1'000'000}};
-    addRow("deleteFaces", faces, deleteFaces);
-    addRow("deleteFaces:flat", faces, flatDeleteFaces);
-    addRow("deleteFaces:memcpy", faces, [](benchmark::State& state) {
-        FlatMesh const flat = makeFlatMesh(sizeOf(state));
-        copyBytes(state, flat.bytes(), flat.materials.size);
-    });
 #ifdef MODELING_HAS_PCL
-    addPointPeer("deletePointsInPointCloud:PCL", points, pclDeletion);
+Row const pclPoints = deletion("deletePointsInPointCloud:PCL", kPoints, pointDeletion<pclDeletion>);
 #endif
 #ifdef MODELING_HAS_VTK
-    addPointPeer("deletePointsInPointCloud:VTK", points, vtkPointDeletion);
-    addFacePeer("deleteFaces:VTK", faces, vtkFaceDeletion);
+Row const vtkPoints = deletion("deletePointsInPointCloud:VTK", kPoints, pointDeletion<vtkPointDeletion>);
+Row const vtkFaces = deletion("deleteFaces:VTK", kFaces, faceDeletion<vtkFaceDeletion>);
 #endif
 #ifdef MODELING_HAS_CGAL
-    addFacePeer("deleteFaces:CGAL", faces, cgalFaceDeletion);
+Row const cgalFaces = deletion("deleteFaces:CGAL", kFaces, faceDeletion<cgalFaceDeletion>);
 #endif
-    return true;
-}();
 
 }

@@ -2,7 +2,6 @@
 #include "peers/meanValues.h"
 
 #include "frame/ParallelFor.h"
-#include "support/PolygonMesh.h"
 #include "support/Random.h"
 
 #include <Modeling/StitchTemplate.h>
@@ -14,10 +13,8 @@
 #include <cmath>
 
 using namespace Benchmarks;
-using Tessara::Math::float3;
 using Tessara::Modeling::StitchTemplate;
 using Points = Orvan::Array<float3>;
-using Indices = Orvan::Array<unsigned int>;
 using Weights = Orvan::Array<float>;
 
 namespace {
@@ -43,13 +40,11 @@ std::vector<DrawnPolygon> drawnPolygons(std::size_t pointCount)
     return polygons;
 }
 
-void computeCoordinates(benchmark::State& state)
-{
-    auto const polygons = drawnPolygons(sizeOf(state));
+Row const coordinates("stitch coordinates", {{200'000}}, [](State& state) {
     StitchTemplate made;
     made.setErrors("");
     Weights weights(9);
-    for (auto _ : state)
+    timeRuns(state, sizeOf(state), [&, polygons = drawnPolygons(sizeOf(state))] {
         for (DrawnPolygon const& polygon : polygons) {
             made.setPolySize(static_cast<unsigned int>(polygon.corners.size));
             for (float3 const& point : polygon.points) {
@@ -57,70 +52,71 @@ void computeCoordinates(benchmark::State& state)
                 benchmark::DoNotOptimize(made.computeMeanValueCoordinates(polygon.corners, point, weights, 1));
             }
         }
+    });
     if (!made.getErrors().empty())
         state.SkipWithError("a point is outside its polygon");
-    countElements(state, sizeOf(state));
-}
+});
 
-StitchTemplate filledSquare(Points const& positions, Indices const& offsets)
+[[maybe_unused]] Row coordinatesByCgal(char const* name, decltype(&cgalMeanValuesInFloat) makeRun)
 {
-    return {Orvan::makePtr<Points>(Points{{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}}),
-        Orvan::makePtr<Points>(positions), Orvan::makePtr<Indices>(offsets), false};
+    return {name, {{200'000}},
+        [=](State& state) { timeRuns(state, sizeOf(state), makeRun(drawnPolygons(sizeOf(state)))); }};
+}
+#ifdef MODELING_HAS_CGAL
+Row const inFloat = coordinatesByCgal("stitch coordinates:CGAL in float", cgalMeanValuesInFloat);
+Row const inDouble = coordinatesByCgal("stitch coordinates:CGAL in double", cgalMeanValuesInDouble);
+#endif
+
+Orvan::Ptr<Points> square()
+{
+    return Orvan::makePtr<Points>(Points{{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}});
 }
 
 /// Two strands across a square.
 StitchTemplate crossing()
 {
-    Points positions;
-    for (float const t : {0.0f, 0.25f, 0.5f, 0.75f, 1.0f})
-        positions.append({t, 0.6f, -0.1f});
-    for (float const t : {0.0f, 0.25f, 0.5f, 0.75f, 1.0f})
-        positions.append({0.4f, t, 0.1f});
-    return filledSquare(positions, {0, 5, 10});
+    Points points(10);
+    for (std::size_t i = 0; i != 5; ++i) {
+        float const t = 0.25f * static_cast<float>(i);
+        points[i] = {t, 0.6f, -0.1f};
+        points[5 + i] = {0.4f, t, 0.1f};
+    }
+    return {square(), Orvan::makePtr<Points>(points), Orvan::makePtr<Indices>(Indices{0, 5, 10}), false};
 }
 
 /// One control point after the other in a quad that stays in the nearest cache.
-void findPositions(benchmark::State& state)
-{
+Row const controlPoints("stitch findControlPointPos", {}, [](State& state) {
     StitchTemplate const made = crossing();
     Points const quad{{0, 0, 0}, {1, 0, 0.5f}, {1, 1, 0}, {0, 1, 0.2f}};
-    auto const& controlPoints = made.getStrands()[0].controlPoints;
+    auto const& strand = made.getStrands()[0].controlPoints;
     float3 position{};
-    for (auto _ : state)
-        for (Weights const& weights : controlPoints) {
+    timeRuns(state, strand.size, [&] {
+        for (Weights const& weights : strand) {
             made.findControlPointPos(quad, weights, 1, false, position);
             benchmark::DoNotOptimize(position);
         }
-    countElements(state, controlPoints.size);
-}
+    });
+});
 
 /// That many strands of eight control points from one edge of a square to the opposite one.
-void fillTemplate(benchmark::State& state)
-{
-    auto const strandCount = static_cast<unsigned int>(state.range(0));
+Row const fill("stitch fill", {{1'000}, {10'000}, {100'000}}, [](State& state) {
     Points positions;
     Indices offsets{0};
-    for (unsigned int strand = 0; strand != strandCount; ++strand) {
-        auto const place = static_cast<float>((strand * 7919ull) % strandCount) / static_cast<float>(strandCount);
+    for (std::size_t strand = 0; strand != sizeOf(state); ++strand) {
+        auto const place = static_cast<float>((strand * 7919) % sizeOf(state)) / static_cast<float>(sizeOf(state));
         for (int point = 0; point != 8; ++point)
             positions.append({0.1f + 0.8f * place, static_cast<float>(point) / 7, 0});
         offsets.append(static_cast<unsigned int>(positions.size));
     }
-    auto const polygon = Orvan::makePtr<Points>(Points{{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}});
-    auto const points = Orvan::makePtr<Points>(positions);
+    auto const polygon = square(), points = Orvan::makePtr<Points>(positions);
     auto const starts = Orvan::makePtr<Indices>(offsets);
-    for (auto _ : state) {
-        StitchTemplate made(polygon, points, starts, false);
-        benchmark::DoNotOptimize(made);
-    }
-    countElements(state, positions.size);
-}
+    timeRuns(state, positions.size, [&] { benchmark::DoNotOptimize(StitchTemplate(polygon, points, starts, false)); });
+});
 
 /// Lays a template on each quad of a bent mesh, with as many threads as the argument says.
-void layOnQuads(benchmark::State& state)
-{
+Row const lay("stitch lay on a million quads, threads", {{1}, {2}}, [](State& state) {
     StitchTemplate const made = crossing();
-    auto const mesh = TestSupport::PolygonMesh::quads(1000).withNoise(0.2f, 1);
+    PolygonMesh const mesh = bentQuads(1'000'000);
     std::size_t const perQuad = 2 * made.getStrands()[0].controlPoints.size;
     Points laid(mesh.faceCount() * perQuad);
     auto const layOnRange = [&](tbb::blocked_range<std::size_t> const& quads) {
@@ -136,32 +132,10 @@ void layOnQuads(benchmark::State& state)
     };
     tbb::global_control const allowed(tbb::global_control::max_allowed_parallelism, sizeOf(state));
     tbb::task_arena arena(static_cast<int>(state.range(0)));
-    for (auto _ : state)
-        arena.execute([&] { // each quad writes its own stretch
-            Modeling::parallelFor(
-                tbb::blocked_range<std::size_t>(0, mesh.faceCount(), Modeling::kElementGrain), layOnRange);
-        });
-    countElements(state, laid.size);
-}
-
-[[maybe_unused]] bool const areRowsAdded = [] {
-    addRow("stitch coordinates", {{200'000}}, computeCoordinates);
-#ifdef MODELING_HAS_CGAL
-    auto const addCgal = [](char const* name, auto const& makeRun) {
-        addRow(name, {{200'000}}, [=](benchmark::State& state) {
-            auto const run = makeRun(drawnPolygons(sizeOf(state)));
-            for (auto _ : state)
-                run();
-            countElements(state, sizeOf(state));
-        });
-    };
-    addCgal("stitch coordinates:CGAL in float", cgalMeanValuesInFloat);
-    addCgal("stitch coordinates:CGAL in double", cgalMeanValuesInDouble);
-#endif
-    addRow("stitch findControlPointPos", {}, findPositions);
-    addRow("stitch fill", {{1'000}, {10'000}, {100'000}}, fillTemplate);
-    addRow("stitch lay on a million quads, threads", {{1}, {2}}, layOnQuads);
-    return true;
-}();
+    tbb::blocked_range<std::size_t> const quads(0, mesh.faceCount(), Modeling::kElementGrain);
+    timeRuns(state, laid.size, [&] { // each quad writes its own stretch
+        arena.execute([&] { Modeling::parallelFor(quads, layOnRange); });
+    });
+});
 
 }

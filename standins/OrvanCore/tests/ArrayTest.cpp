@@ -1,15 +1,8 @@
-#include "support/FailingAllocations.h"
-
-#include <OrvanCore/Array.h>
-#include <OrvanCore/String.h>
-
-#include <gtest/gtest.h>
+#include "support/Testing.h"
 
 #include <cstddef>
 #include <cstring>
-#include <limits>
 #include <memory>
-#include <vector>
 
 using Orvan::Array;
 using Orvan::Internal::UntypedTypeRep;
@@ -20,7 +13,7 @@ static_assert(offsetof(Array<float>, data) == 0 && offsetof(Array<float>, size) 
 
 constexpr char kLong[] = "a string that is too long to be stored without an allocation";
 
-TEST(Array, growsByItsCapacityOrByTheAddedCount)
+TEST(Array, growsByItsCapacityOrByTheAddedCountAndReusesItsStorage)
 {
     Array<int> appended;
     std::vector<std::uint64_t> capacities;
@@ -41,6 +34,13 @@ TEST(Array, growsByItsCapacityOrByTheAddedCount)
         EXPECT_EQ(array.capacity, grown.capacity) << grown.from << " to " << grown.to;
         EXPECT_EQ(array.data == before, grown.to <= grown.from) << "shrinking does not reallocate";
     }
+
+    Array<int> const source{1, 2, 3};
+    int const* const storage = appended.data;
+    appended = source;
+    EXPECT_TRUE(appended == source && appended.data == storage && appended.capacity == 16);
+    appended = Array<int>(5); // a move takes over the storage
+    EXPECT_TRUE(appended == Array<int>(5) && appended.data != storage);
 }
 
 TEST(Array, initializesTheElementsThatResizingAdds)
@@ -53,7 +53,6 @@ TEST(Array, initializesTheElementsThatResizingAdds)
     array.resize(3);
     array.resize(4, Orvan::kUninitialized);
     EXPECT_EQ(array[3], 7) << "nothing is written";
-    EXPECT_EQ(Array<bool>(2, true), (Array<bool>{true, true}));
     EXPECT_EQ(Texts(2, Orvan::kUninitialized), (Texts{"", ""})) << "still constructed";
 }
 
@@ -80,37 +79,18 @@ TEST(Array, constructsAndDestroysEachElementOnce)
         EXPECT_EQ(watched.use_count(), 3);
     }
     EXPECT_EQ(watched.use_count(), 1);
-    Texts own{kLong};
-    for (int i = 0; i < 40; ++i)
-        own.append(own[0]);
-    EXPECT_EQ(own, Texts(41, kLong));
-}
-
-TEST(Array, reusesItsStorageWhenAssigned)
-{
-    Array<int> target{1, 2, 3, 4};
-    int const* const storage = target.data;
-    Array<int> const source{1, 2, 3};
-    target = source;
-    EXPECT_EQ(target, source);
-    EXPECT_EQ(target.data, storage);
-    EXPECT_EQ(target.capacity, 4u);
-    target = Array<int>(5); // a move takes over the storage
-    EXPECT_EQ(target, Array<int>(5));
-    EXPECT_NE(target.data, storage);
 }
 
 TEST(Array, refusesSizesBeyondTheAddressSpace)
 {
     constexpr std::uint64_t kMaxCount = std::numeric_limits<std::uint64_t>::max();
     for (std::uint64_t const count : {kMaxCount, kMaxCount / 4, kMaxCount / 4 + 1, kMaxCount / 8 + 1}) {
-        EXPECT_THROW((void)Array<int>(count), std::bad_alloc);
         Array<int> array{1, 2, 3};
+        EXPECT_THROW((void)Array<int>(count), std::bad_alloc);
         EXPECT_THROW(array.resize(count), std::bad_alloc);
         EXPECT_THROW(array.resize(count, Orvan::kUninitialized), std::bad_alloc);
         EXPECT_THROW(array.reserve(count), std::bad_alloc);
-        EXPECT_EQ(array, (Array<int>{1, 2, 3}));
-        EXPECT_EQ(array.capacity, 3u);
+        EXPECT_TRUE(array == (Array<int>{1, 2, 3}) && array.capacity == 3);
     }
 }
 
@@ -131,9 +111,7 @@ TEST(Array, isUnchangedWhenAnAllocationFails)
                 Orvan::String const* const storage = array.data;
                 if (attempt([&] { action(array); }))
                     return;
-                EXPECT_EQ(array.data, storage);
-                EXPECT_EQ(array.capacity, capacity);
-                EXPECT_EQ(array, (Texts{"x", "y"}));
+                EXPECT_TRUE(array.data == storage && array.capacity == capacity && array == (Texts{"x", "y"}));
             });
 }
 

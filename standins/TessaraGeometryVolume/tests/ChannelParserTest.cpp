@@ -3,9 +3,8 @@
 
 #include <gtest/gtest.h>
 
-#include <string>
+#include <map>
 #include <thread>
-#include <vector>
 
 using TSR::Utils::ChannelParser;
 
@@ -28,11 +27,7 @@ std::string accepted(char const* list, std::vector<char const*> const& names)
 TEST(ChannelParser, selectsNames)
 {
     std::vector<char const*> const names{"uv", "uv2", "UV", "weight", "weightTotal", "a-b", "gr\u00f6\u00dfe"};
-    struct Case {
-        char const* list;
-        char const* accepted;
-    };
-    for (Case const& expected : std::vector<Case>{
+    for (auto const& [list, expected] : std::map<std::string, std::string>{
              {"", ""}, {" ,\t\n, ", ""}, {"uv", "uv"}, {" uv,weight\tabsent\n", "uv weight"},
              {"*", "uv uv2 UV weight weightTotal a-b gr\u00f6\u00dfe"}, {"uv*", "uv uv2"}, {"uv?", "uv2"},
              {"??", "uv UV"}, {"gr??e", "gr\u00f6\u00dfe"}, {"*t*t*", "weightTotal"}, {"w**t", "weight"},
@@ -40,7 +35,7 @@ TEST(ChannelParser, selectsNames)
              {"-uv* *", "uv uv2 UV weight weightTotal a-b gr\u00f6\u00dfe"}, // the last match decides
              {"weight* ^weight* weightTotal", "weightTotal"}, {"[uv]* \\* u.", ""}, // only * and ? are special
          })
-        EXPECT_EQ(accepted(expected.list, names), expected.accepted) << expected.list;
+        EXPECT_EQ(accepted(list.c_str(), names), expected) << list;
     EXPECT_FALSE(ChannelParser().accepts("uv"));
     EXPECT_FALSE(ChannelParser().accepts(""));
 }
@@ -48,11 +43,9 @@ TEST(ChannelParser, selectsNames)
 TEST(ChannelParser, reportsTheFirstFaultAndKeepsTheOtherEntries)
 {
     struct Case {
-        char const* list;
-        char const* fault;
-        char const* accepted;
+        char const *list, *fault, *accepted;
     };
-    for (Case const& expected : std::vector<Case>{
+    for (auto const& [list, fault, names] : std::vector<Case>{
              {"uv -weight", "", "uv"},
              {"* -", "\"-\" at character 3 of the list excludes nothing", "uv weight"},
              {"^ weight", "\"^\" at character 1 of the list excludes nothing", "weight"},
@@ -60,11 +53,11 @@ TEST(ChannelParser, reportsTheFirstFaultAndKeepsTheOtherEntries)
          }) {
         ChannelParser parser;
         parser.parses("*");
-        ChannelParser::Status const status = parser.parses(expected.list);
-        EXPECT_EQ(static_cast<bool>(status), *expected.fault == '\0') << expected.list;
-        EXPECT_STREQ(status.message().c_str(), expected.fault);
-        EXPECT_EQ(accepted(expected.list, {"uv", "weight"}), expected.accepted);
-        EXPECT_FALSE(parser.accepts("absent") && *expected.list != '*') << "a new list replaces the old one";
+        ChannelParser::Status const status = parser.parses(list);
+        EXPECT_EQ(static_cast<bool>(status), *fault == '\0') << list;
+        EXPECT_STREQ(status.message().c_str(), fault);
+        EXPECT_EQ(accepted(list, {"uv", "weight"}), names);
+        EXPECT_FALSE(parser.accepts("absent") && *list != '*') << "a new list replaces the old one";
     }
 }
 

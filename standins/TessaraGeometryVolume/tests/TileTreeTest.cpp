@@ -4,11 +4,8 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <climits>
 #include <map>
-#include <stdexcept>
-#include <tuple>
 
 using namespace TSR::TileTree3D;
 using TestSupport::Field, TestSupport::forEachVoxel, TestSupport::linearField;
@@ -68,22 +65,19 @@ TYPED_TEST(TileTree, holdsWhatItWasBuiltFromAndBackgroundElsewhere)
     // A block, which wins over the voxels inside it.
     IJK const first{-7, 3, -11}, size{23, 9, 14};
     std::vector<float> values;
-    for (int k = first.k; k < first.k + size.k; ++k)
-        for (int j = first.j; j < first.j + size.j; ++j)
-            for (int i = first.i; i < first.i + size.i; ++i) {
-                values.push_back(static_cast<float>(values.size()));
-                expected[{i, j, k}] = values.back();
-            }
+    for (int n = 0; n < size.i * size.j * size.k; ++n) {
+        values.push_back(static_cast<float>(n));
+        int const i = n % size.i, j = n / size.i % size.j, k = n / size.i / size.j;
+        expected[{first.i + i, first.j + j, first.k + k}] = values.back();
+    }
     VolumeSource source = sourceOf<TypeParam>();
     source.block = {first, size, values.data()};
     auto const volume = volumeOf<TypeParam>(voxels, source);
 
+    for (Voxel const& voxel : randomVoxels(3000, 60, 2))
+        expected.try_emplace({voxel.i, voxel.j, voxel.k}, -1.0f);
     for (auto const& [index, value] : expected)
         ASSERT_EQ(valueAt(volume, {std::get<0>(index), std::get<1>(index), std::get<2>(index)}), value);
-    for (Voxel const& voxel : randomVoxels(3000, 60, 2)) {
-        auto const known = expected.find({voxel.i, voxel.j, voxel.k});
-        ASSERT_EQ(valueAt(volume, {voxel.i, voxel.j, voxel.k}), known == expected.end() ? -1 : known->second);
-    }
 }
 
 TYPED_TEST(TileTree, linksTilesWithTheirParents)
@@ -93,8 +87,7 @@ TYPED_TEST(TileTree, linksTilesWithTheirParents)
     for (int depth = 0; depth < TypeParam::kDepthCount; ++depth)
         for (std::size_t number = 0; number < volume.container.tileCount(depth); ++number) {
             auto const& tile = volume.container.tile(number, depth);
-            ASSERT_TRUE(tile.valid);
-            ASSERT_EQ(tile.treeIndex(), (TreeIndex{number, static_cast<std::uint32_t>(depth)}));
+            ASSERT_TRUE(tile.valid && tile.treeIndex() == (TreeIndex{number, static_cast<std::uint32_t>(depth)}));
             ASSERT_EQ(tile.hasChildren, depth < TypeParam::kUnitDepth);
             auto const& parent = volume.container.tile(tile.parentTreeIndex());
             ASSERT_EQ(parent.valid, depth > 0);
@@ -104,9 +97,8 @@ TYPED_TEST(TileTree, linksTilesWithTheirParents)
             auto const [i, j, k] = tile.childIJK();
             std::int64_t const width = TypeParam::tileWidth(depth);
             ASSERT_TRUE(std::max({i, j, k}) < TypeParam::kChildrenPerAxis && std::min({i, j, k}) >= 0);
-            ASSERT_EQ(parent.i + i * width, tile.i);
-            ASSERT_EQ(parent.j + j * width, tile.j);
-            ASSERT_EQ(parent.k + k * width, tile.k);
+            ASSERT_TRUE(
+                parent.i + i * width == tile.i && parent.j + j * width == tile.j && parent.k + k * width == tile.k);
         }
     EXPECT_GT(linked, 500);
     EXPECT_FALSE(volume.container.tile(TreeIndex()).treeIndex().isValid());
@@ -120,22 +112,17 @@ TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
     // Two wide boxes touch, and neither ends at a tile's side.
     std::vector<ConstantBox> const boxes{{{-64, -64, -64}, {64, 64, 64}, 3},
         {{64, -3001, -3001}, {4097, 3001, 3001}, 6}, {{70, 4001, 2}, {83, 4009, 4}, 4}, {{90, 0, 0}, {90, 5, 5}, 9}};
-    auto const isInside = [](ConstantBox const& box, IJK at) {
-        return box.first.i <= at.i && at.i < box.end.i && box.first.j <= at.j && at.j < box.end.j && box.first.k <= at.k
-            && at.k < box.end.k;
-    };
     VolumeSource source = sourceOf<TypeParam>();
     source.boxes = boxes;
     auto const volume = volumeOf<TypeParam>({{0, 0, 0, 5}}, source);
 
     for (Voxel const& at : randomVoxels(20'000, 100, 4)) {
-        IJK const index{at.i, at.j, at.k};
         float expected = -1;
-        for (ConstantBox const& box : boxes)
-            expected = isInside(box, index) ? box.value : expected;
-        if (index == IJK{0, 0, 0})
-            expected = 5;
-        ASSERT_EQ(valueAt(volume, index), expected) << at.i << ' ' << at.j << ' ' << at.k;
+        for (auto const& [first, end, value] : boxes)
+            if (first.i <= at.i && at.i < end.i && first.j <= at.j && at.j < end.j && first.k <= at.k && at.k < end.k)
+                expected = value;
+        bool const isVoxel = at.i == 0 && at.j == 0 && at.k == 0;
+        ASSERT_EQ(valueAt(volume, {at.i, at.j, at.k}), isVoxel ? 5 : expected) << at.i << ' ' << at.j << ' ' << at.k;
     }
     auto const bytesOf = [](Volume<TypeParam> const& made) {
         return made.container.memoryInBytes() + made.channel.memoryInBytes();
@@ -144,12 +131,11 @@ TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
 
     // Many boxes that could be one, each with two values: too many for one division.
     std::vector<ConstantBox> same, others;
-    forEachVoxel(0, 16, [&](int i, int j, int k) {
-        same.push_back({{8 * i, 8 * j, 8 * k}, {8 * i + 8, 8 * j + 8, 8 * k + 8}, 5});
-        if (std::max({i, j, k}) < 4)
-            others.push_back(
-                {{128 * i, 128 * j, 128 * k}, {128 * i + 128, 128 * j + 128, 128 * k + 128}, float(i + j + k)});
-    });
+    auto const box = [](int side, int i, int j, int k, float value) -> ConstantBox {
+        return {{side * i, side * j, side * k}, {side * (i + 1), side * (j + 1), side * (k + 1)}, value};
+    };
+    forEachVoxel(0, 16, [&](int i, int j, int k) { same.push_back(box(8, i, j, k, 5)); });
+    forEachVoxel(0, 4, [&](int i, int j, int k) { others.push_back(box(128, i, j, k, float(i + j + k))); });
     for (auto const* const many : {&same, &others}) {
         source.boxes = *many;
         EXPECT_LT(bytesOf(buildVolume<TypeParam>(source)), 5'000'000);
@@ -171,13 +157,10 @@ TYPED_TEST(TileTree, fineTilesInsideCoarseOnesKeepTheirValues)
         source.boxes = std::span(boxes).first(asBoxes ? 2 : 0);
         source.lists = std::span(lists, asBoxes ? 1 : 2);
         auto const volume = buildVolume<TypeParam>(source);
-        EXPECT_EQ(valueAt(volume, {-1, 0, 0}), 5);
-        EXPECT_EQ(valueAt(volume, {-2, 0, 0}), 8);
-        EXPECT_EQ(valueAt(volume, {-ratio, ratio - 1, 0}), 8);
-        EXPECT_EQ(valueAt(volume, {-ratio - 1, 0, 0}), 6);
-        EXPECT_EQ(valueAt(volume, {-ratio - 1, ratio, 0}), -1);
-        EXPECT_EQ(valueAt(volume, {1000, 0, 0}), 9);
-        EXPECT_EQ(valueAt(volume, {1000 + TypeParam::kSide, 0, 0}), -1) << "not the value of the tile above";
+        for (auto const& [i, j, value] : std::vector<std::tuple<int, int, float>>{{-1, 0, 5.0f}, {-2, 0, 8.0f},
+                 {-ratio, ratio - 1, 8.0f}, {-ratio - 1, 0, 6.0f}, {-ratio - 1, ratio, -1.0f}, {1000, 0, 9.0f},
+                 {1000 + TypeParam::kSide, 0, -1.0f}}) // the last is not the value of the tile above
+            EXPECT_EQ(valueAt(volume, {i, j, 0}), value) << i << ' ' << j;
         EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, coarseDepth), 8);
         EXPECT_EQ(valueAt(volume, {-ratio, 0, 0}, coarseDepth - 1), -1) << "coarser than any data";
     }
@@ -234,13 +217,13 @@ TYPED_TEST(TileTree, halosContinueNeighborsThenParentsThenTheTile)
 
     // Only x + 1 is missing at this depth; two depths up there is a tile instead.
     int const wide = static_cast<int>(TypeParam::tileWidth(TypeParam::kUnitDepth - 2));
-    std::vector<Voxel> someAround; // in the last tiles before the next wide one
+    std::vector<Voxel> someAround, coarse;
     forEachVoxel(0, 2 * kSide, [&](int i, int j, int k) {
-        if (i < kSide)
+        if (i < kSide) // in the last tiles before the next wide one
             someAround.push_back({wide - kSide + i, j, k, around(i, j, k)});
+        if (std::max({i, j, k}) < kSide)
+            coarse.push_back({kSide + i, j, k, 77});
     });
-    std::vector<Voxel> coarse;
-    forEachVoxel(0, kSide, [&](int i, int j, int k) { coarse.push_back({kSide + i, j, k, 77}); });
     VoxelList const lists[] = {{TypeParam::kUnitDepth - 2, coarse}, {TypeParam::kUnitDepth, someAround}};
     source = sourceOf<TypeParam>();
     source.lists = lists;
