@@ -17,8 +17,9 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints,
-        addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth, addRemoveSlivers, addStitch};
+    constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addConvert, addAddPoints,
+        addDeletePoints, addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth,
+        addRemoveSlivers, addStitch};
 
     constexpr char kFooter[] =
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz; written: .obj .ply
@@ -78,6 +79,7 @@ Exit codes:
         if (invocation.threads != 0)
             threadLimit.emplace(tbb::global_control::max_allowed_parallelism, invocation.threads);
         Report report(invocation.command);
+        report.isJson = invocation.asJson;
         report.reading = invocation.reading;
         if (std::vector<double> const& center = invocation.center; !center.empty())
             report.reading.origin = {center[0], center[1], center[2]};
@@ -126,14 +128,15 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
     return command;
 }
 
-void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command, Needed needed)
+void addFile(
+    char const* name, std::string const& description, std::filesystem::path& file, Command& command, Needed needed)
 {
     Option option = command.addOption(name, file, description).synopsis(" ");
     if (needed == Needed::Always)
         option.required();
 }
 
-void addOutput(char const* description, Output& out, Command& command, Needed needed)
+void addOutput(std::string const& description, Output& out, Command& command, Needed needed)
 {
     addFile("OUT", description, out.file, command, needed);
     addForce(out, command);
@@ -142,6 +145,15 @@ void addOutput(char const* description, Output& out, Command& command, Needed ne
 void addForce(Output& out, Command& command)
 {
     command.addFlag("-f,--force", out.replaces, "Replace the file to write if it exists");
+}
+
+void addFiles(FileList& files, Command& command)
+{
+    command.addOption("FILES", files.in, "Files to read; without -o the last one is the output")
+        .required()
+        .synopsis("IN... [OUT]");
+    command.addOption("-o,--output", files.out.file, "The output; all other names are inputs").valueName("OUT");
+    addForce(files.out, command);
 }
 
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run)

@@ -9,6 +9,7 @@
 
 namespace ModelingProgram {
 
+struct FileList;
 struct Output;
 
 /// The command to run, as parsed from the command line.
@@ -27,13 +28,15 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
 enum class Needed { Always, Sometimes };
 
 /// Adds a positional argument that is a file name.
-void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command,
+void addFile(char const* name, std::string const& description, std::filesystem::path& file, Command& command,
     Needed needed = Needed::Always);
 
 /// Adds OUT and --force, which allows replacing an existing file.
-void addOutput(char const* description, Output& out, Command& command, Needed needed = Needed::Always);
+void addOutput(std::string const& description, Output& out, Command& command, Needed needed = Needed::Always);
 /// Adds --force only.
 void addForce(Output& out, Command& command);
+/// Adds FILES, -o and --force.
+void addFiles(FileList& files, Command& command);
 
 /// Sets the invocation if `command` is the one on the command line.
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);
@@ -42,6 +45,7 @@ void onSelected(Command& command, Invocation& invocation, std::function<void(Rep
 void addInfo(CommandLine& program, Invocation& invocation);
 void addValidate(CommandLine& program, Invocation& invocation);
 void addAddPoints(CommandLine& program, Invocation& invocation);
+void addConvert(CommandLine& program, Invocation& invocation);
 void addDeletePoints(CommandLine& program, Invocation& invocation);
 void addDeleteFaces(CommandLine& program, Invocation& invocation);
 void addMakeVolume(CommandLine& program, Invocation& invocation);

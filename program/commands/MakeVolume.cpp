@@ -125,7 +125,7 @@ namespace {
     {
         requireVdb(options.out);
         Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        requireMesh(*mesh, "make-volume", options.in);
+        requireType(GeometryType::Mesh, *mesh, "make-volume", options.in);
         MeshArrays const arrays = arraysOf(*mesh);
         requireFiniteSurface(arrays, options.in);
         SurfaceValue const value = surfaceValueOf(options, *mesh);

@@ -1,6 +1,5 @@
 #include "MeshRequirements.h"
 
-#include "Geometry.h"
 #include "shell/Failure.h"
 #include "shell/Report.h"
 
@@ -99,17 +98,17 @@ std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopo
     return faults;
 }
 
-void requireMesh(Tessara::Object& object, char const* command, std::filesystem::path const& file)
+void requireType(GeometryType type, Tessara::Object& object, char const* command, std::string const& source)
 {
     if (Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
-        makeEmpty(GeometryType::Mesh, object);
-    if (typeOf(object) != GeometryType::Mesh)
+        makeEmpty(type, object);
+    if (typeOf(object) != type)
         throw Failure(ExitCode::Refused,
-            fmt::format("{} needs a mesh, but {} contains a {}", command, file.string(), nameOf(typeOf(object))));
+            fmt::format("{} needs a {}, but {} contains a {}", command, nameOf(type), source, nameOf(typeOf(object))));
 }
 
 void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
-    std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file)
+    std::vector<std::string> furtherFaults, char const* command, std::string const& source)
 {
     std::vector<std::string> reasons = faultsOfTriangles(mesh, topology);
     for (std::string& reason : faultsOfClosedManifold(mesh, topology))
@@ -120,12 +119,12 @@ void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topol
         throw Failure(ExitCode::Refused,
             fmt::format("{} needs a closed manifold mesh of triangles, which {} does not contain "
                         "(points and faces are counted from 0):",
-                command, file.string()),
+                command, source),
             std::move(reasons));
 }
 
 std::vector<float> pointNumbers(
-    char const* option, std::string const& name, Tessara::Object const& mesh, std::filesystem::path const& file)
+    char const* option, std::string const& name, Tessara::Object const& mesh, std::string const& source)
 {
     using namespace Tessara::Geometry;
     unsigned int const pointCount = arraysOf(mesh).pointCount();
@@ -150,8 +149,8 @@ std::vector<float> pointNumbers(
     for (Property const& property : propertiesOf(mesh))
         visitNumbers(property.name, [&](auto const&) { present.push_back(property.name); });
     throw Failure(ExitCode::Refused,
-        fmt::format("{}: {} has no attribute \"{}\" with one number per point. There are: {}", option, file.string(),
-            name, listOf(present)));
+        fmt::format("{}: {} has no attribute \"{}\" with one number per point. There are: {}", option, source, name,
+            listOf(present)));
 }
 
 }

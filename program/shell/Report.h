@@ -23,6 +23,7 @@ public:
 
     Json document; // what --json prints
     std::string text; // what is printed without --json
+    bool isJson = false; // standard output is reserved for the document
     ReadOptions reading; // of all files; the first file read determines the center to subtract
 };
 

@@ -42,8 +42,8 @@ namespace {
         return {std::istream_iterator<std::string>(stream), {}};
     }
 
-    std::vector<std::string> const kCommands = {"info", "validate", "add-points", "delete-points", "delete-faces",
-        "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch"};
+    std::vector<std::string> const kCommands = {"info", "validate", "convert", "add-points", "delete-points",
+        "delete-faces", "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch"};
 
 }
 

@@ -250,6 +250,23 @@ TEST_F(Commands, MergeReportsHowAttributesWereMerged)
         json({"normal", "a.xyz", 3}));
 }
 
+TEST_F(Commands, ConvertKeepsWhatBothFormatsHold)
+{
+    copySamples({"cube.ply", "spider.obj"});
+    store(folder / "cloud.ply", kCloud);
+    store(folder / "lines.obj", "v 0 0 0\nv 1 0 0\nl 1 2\n");
+    json const done = runForJson("convert spider.obj out.ply --threads 1");
+    EXPECT_EQ(done["counts"], runForJson("info out.ply")["counts"]);
+    EXPECT_EQ(done["counts"], runForJson("info spider.obj")["counts"]);
+    EXPECT_THAT(done["warnings"].dump(), HasSubstr("spider.obj: materials are left out"));
+    EXPECT_THAT(runForJson("convert cloud.ply out.obj")["warnings"].dump(), HasSubstr("label"));
+    EXPECT_EQ(run("convert cloud.ply out.ply").exitCode, 0);
+    EXPECT_EQ(runForJson("info out.ply")["properties"], runForJson("info cloud.ply")["properties"]);
+    EXPECT_THAT(run("convert lines.obj out.vtp").output, AllOf(HasSubstr("strands"), HasSubstr("out.vtp")));
+    EXPECT_EQ(run("convert lines.obj out.ply").exitCode, 3);
+    EXPECT_THAT(run("convert cube.ply out.stl").messages, HasSubstr("triangles only, but face 0 has 4 corners"));
+}
+
 TEST_F(Commands, ReadLenientlyAndCenteredOnRequest)
 {
     store(folder / "far.obj",
@@ -506,12 +523,12 @@ TEST_F(Commands, EmptyGeometryIsAccepted)
         else
             ASSERT_EQ(run("delete-faces cube.ply --indices all --invert empty." + extension).exitCode, 0);
         std::string const file = "empty." + extension;
-        for (std::string arguments : {"info @", "validate @", "triangulate @ o.ply", "smooth @ o.ply",
-                 "remove-slivers @ o.ply", "subdivide @ o.ply --relative 0.1", "subdivide @ o.ply --tolerance 1",
-                 "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2", "delete-faces @ o.ply --indices all",
-                 "delete-points @ o.ply --indices all", "add-points @ @ o.ply", "merge @ cube.ply -o o.ply",
-                 "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj", "merge @ @ -o o.ply",
-                 "stitch --template stitch-quad.obj stitch-quad-rings.obj --on @ o.vtp"}) {
+        for (std::string arguments : {"info @", "validate @", "convert @ o.ply", "triangulate @ o.ply",
+                 "smooth @ o.ply", "remove-slivers @ o.ply", "subdivide @ o.ply --relative 0.1",
+                 "subdivide @ o.ply --tolerance 1", "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2",
+                 "delete-faces @ o.ply --indices all", "delete-points @ o.ply --indices all", "add-points @ @ o.ply",
+                 "merge @ cube.ply -o o.ply", "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj",
+                 "merge @ @ -o o.ply", "stitch --template stitch-quad.obj stitch-quad-rings.obj --on @ o.vtp"}) {
             for (auto at = arguments.find('@'); at != std::string::npos; at = arguments.find('@'))
                 arguments.replace(at, 1, file);
             Result const result = run(arguments);
