@@ -9,6 +9,7 @@
 #include <fmt/format.h>
 #include <tbb/global_control.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <new>
 #include <optional>
@@ -19,7 +20,7 @@ namespace {
 
     constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addConvert, addAddPoints,
         addDeletePoints, addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth,
-        addRemoveSlivers, addStitch};
+        addRemoveSlivers, addStitch, addRun};
 
     constexpr char kFooter[] =
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz; written: .obj .ply
@@ -96,6 +97,14 @@ Exit codes:
         }
     }
 
+    int printHelp(std::string const& help)
+    {
+        if (writeToStandardOutput(help))
+            return static_cast<int>(ExitCode::Done);
+        std::fprintf(stderr, "modeling: %s\n", kCannotWriteOutput);
+        return static_cast<int>(ExitCode::File);
+    }
+
     int parseAndRun(int argumentCount, char const* const* arguments)
     {
         Invocation invocation;
@@ -103,9 +112,16 @@ Exit codes:
             "Geometry algorithms for meshes, point clouds and strands, run on files.", kFooter);
         for (auto const add : kCommands)
             add(program, invocation);
-        if (auto const exitCode = program.parse(argumentCount, arguments))
-            return *exitCode;
-        return runCommand(invocation);
+        CommandLine::Parsed const parsed =
+            program.parse({arguments + std::min(1, argumentCount), arguments + argumentCount});
+        if (!parsed.mistake.empty()) {
+            std::fputs(fmt::format("modeling: {}\nRun \"modeling{}{} --help\" for more information.\n", parsed.mistake,
+                           parsed.command.empty() ? "" : " ", parsed.command)
+                           .c_str(),
+                stderr);
+            return static_cast<int>(ExitCode::CommandLine);
+        }
+        return parsed.help.empty() ? runCommand(invocation) : printHelp(parsed.help);
     }
 
 }
@@ -147,11 +163,12 @@ void addForce(Output& out, Command& command)
     command.addFlag("-f,--force", out.replaces, "Replace the file to write if it exists");
 }
 
-void addFiles(FileList& files, Command& command)
+void addFiles(FileList& files, Command& command, Needed needed)
 {
-    command.addOption("FILES", files.in, "Files to read; without -o the last one is the output")
-        .required()
-        .synopsis("IN... [OUT]");
+    Option option = command.addOption("FILES", files.in, "Files to read; without -o the last one is the output")
+                        .synopsis("IN... [OUT]");
+    if (needed == Needed::Always)
+        option.required();
     command.addOption("-o,--output", files.out.file, "The output; all other names are inputs").valueName("OUT");
     addForce(files.out, command);
 }

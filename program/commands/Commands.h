@@ -36,7 +36,7 @@ void addOutput(std::string const& description, Output& out, Command& command, Ne
 /// Adds --force only.
 void addForce(Output& out, Command& command);
 /// Adds FILES, -o and --force.
-void addFiles(FileList& files, Command& command);
+void addFiles(FileList& files, Command& command, Needed needed = Needed::Always);
 
 /// Sets the invocation if `command` is the one on the command line.
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);
@@ -51,6 +51,7 @@ void addDeleteFaces(CommandLine& program, Invocation& invocation);
 void addMakeVolume(CommandLine& program, Invocation& invocation);
 void addMerge(CommandLine& program, Invocation& invocation);
 void addRemoveSlivers(CommandLine& program, Invocation& invocation);
+void addRun(CommandLine& program, Invocation& invocation);
 void addSmooth(CommandLine& program, Invocation& invocation);
 void addStitch(CommandLine& program, Invocation& invocation);
 void addSubdivide(CommandLine& program, Invocation& invocation);

@@ -38,7 +38,7 @@ namespace {
     }
 
     /// Ends the report with a table of these rows and those of every command, as far as they apply.
-    void addRun(std::vector<std::vector<std::string>> rows, Report& report)
+    void addLastRows(std::vector<std::vector<std::string>> rows, Report& report)
     {
         Json& document = report.document;
         if (document.contains("seconds"))
@@ -237,12 +237,12 @@ void reportOperation(
     if (document.contains("keptProperties"))
         rows.push_back({"kept properties", listOf(document["keptProperties"])});
     rows.push_back({"dropped properties", listOf(droppedProperties)});
-    addRun(rows, report);
+    addLastRows(rows, report);
 }
 
 void reportRun(Report& report)
 {
-    addRun({}, report);
+    addLastRows({}, report);
 }
 
 }

@@ -19,12 +19,20 @@ class Report {
 public:
     explicit Report(std::string const& command);
 
+    /// A report of a step of this command. Its warnings begin with the step.
+    Report ofStep(std::size_t number, std::string const& name) const;
+
     void warn(std::string const& sentence);
 
     Json document; // what --json prints
     std::string text; // what is printed without --json
     bool isJson = false; // standard output is reserved for the document
     ReadOptions reading; // of all files; the first file read determines the center to subtract
+
+private:
+    Report() = default;
+
+    std::string prefix_; // of warnings
 };
 
 /// The document as it is printed. Invalid UTF-8, which names in files may contain, becomes replacement characters.

@@ -43,7 +43,8 @@ namespace {
     }
 
     std::vector<std::string> const kCommands = {"info", "validate", "convert", "add-points", "delete-points",
-        "delete-faces", "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch"};
+        "delete-faces", "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch",
+        "run"};
 
 }
 
@@ -54,9 +55,9 @@ TEST(CommandLine, SurvivesArbitraryArguments)
         "--json=", "-f", "--threads", "2", "-1", "-.5", "1e999", "nan", "--indices", "--box", "--attribute", "--invert",
         "--tag", "-o", "--output=", "--source-attribute", "--channels", "--channels=", "--amount", "--weights",
         "--pin-attribute", "--ratio", "--tolerance", "--relative", "--volume", "--grid", "--max-memory", "4GB", "9QB",
-        "--distance-to", "--from", "--to", "--voxels", "--band", "--template", "--on", "--check", "--rotate", "--wrong",
-        "-", "--", "--=", "-=", "---", "[]", "{}", "[a,b]", "%%", "=", "\"", "'", " ", "\n", "\xff", "info", "--help",
-        "--version"};
+        "--distance-to", "--from", "--to", "--voxels", "--band", "--template", "--on", "--check", "--rotate", "--do",
+        "smooth; merge", "--recipe", "--print-recipe", "--wrong", "-", "--", "--=", "-=", "---", "[]", "{}", "[a,b]",
+        "%%", "=", "\"", "'", " ", "\n", "\xff", "info", "--help", "--version"};
     TestSupport::Random random(1);
     for (int i = 0; i != 2000; ++i) {
         std::vector<std::string> line;
