@@ -3,6 +3,7 @@
 #include "commands/Commands.h"
 #include "commands/Operation.h"
 #include "files/GeometryFile.h"
+#include "geometry/MeshRequirements.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
@@ -20,7 +21,7 @@ namespace {
 
     constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addConvert, addAddPoints,
         addDeletePoints, addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth,
-        addRemoveSlivers, addStitch, addRun};
+        addRemoveSlivers, addStitch, addRun, addHelp, addCompletion, addManual};
 
     constexpr char kFooter[] =
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz; written: .obj .ply
@@ -37,6 +38,7 @@ Exit codes:
   5  the operation refuses its input; the message says why
   6  cancelled by Ctrl-C or SIGTERM; nothing was written
   7  out of memory, or beyond --max-memory
+  8  done, but there are warnings about the result, with --strict
 
 "modeling COMMAND --help" explains a command.)";
 
@@ -73,6 +75,14 @@ Exit codes:
         return static_cast<int>(failure.code);
     }
 
+    std::string jsonOf(Report const& report)
+    {
+        std::string text;
+        for (Json const& line : report.lines)
+            text += line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
+        return report.lines.empty() ? toText(report.document) + "\n" : text;
+    }
+
     int runCommand(Invocation const& invocation)
     {
         CancelOnSignal const cancelOnSignal;
@@ -85,13 +95,16 @@ Exit codes:
         if (std::vector<double> const& center = invocation.center; !center.empty())
             report.reading.origin = {center[0], center[1], center[2]};
         try {
+            report.requirements = parseRequirements(invocation.requirements);
             invocation.run(report);
-            report.document["exitCode"] = 0;
+            if (invocation.isStrict && report.hasWarned && report.exitCode == 0)
+                report.exitCode = static_cast<int>(ExitCode::Warned);
+            report.document["exitCode"] = report.exitCode;
             if (report.document.contains("center"))
                 report.text += centerOf(report.reading) + "\n";
-            if (!writeToStandardOutput(invocation.asJson ? toText(report.document) + "\n" : report.text))
+            if (!writeToStandardOutput(invocation.asJson ? jsonOf(report) : report.text))
                 throw Failure(ExitCode::File, kCannotWriteOutput);
-            return 0;
+            return report.exitCode;
         } catch (...) {
             return reportFailure(currentFailure(), invocation.asJson, report);
         }
@@ -129,18 +142,32 @@ Exit codes:
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation)
 {
     Command command = program.addCommand(help);
-    command.addFlag("--json", invocation.asJson, "Print one JSON document instead of text, also on failure");
-    command.addOption("--threads", invocation.threads, "Use at most N threads").valueName("N").between(1, 1024);
-    command.addFlag("--lenient", invocation.reading.isLenient,
-        "Leave out broken elements of files, with a warning: points that are NaN, the faces at them, faces with fewer "
-        "than three corners, bytes at the end");
-    Option const center = command.addFlag("--center", invocation.reading.isCentered,
-        "Subtract a rounded center from all positions, in double precision, and print it");
+    command.addFlag("--json", invocation.asJson, "Print one JSON document instead of text, also on failure").common();
+    command.addOption("--threads", invocation.threads, "Use at most N threads")
+        .valueName("N")
+        .between(1, 1024)
+        .common();
+    command
+        .addFlag("--lenient", invocation.reading.isLenient,
+            "Leave out broken elements of files, with a warning: points that are NaN, the faces at them, faces with "
+            "fewer than three corners, bytes at the end")
+        .common();
+    Option const center = command
+                              .addFlag("--center", invocation.reading.isCentered,
+                                  "Subtract a rounded center from all positions, in double precision, and print it")
+                              .common();
     command.addOption("--center-at", invocation.center, "Subtract this point instead")
         .synopsis("X Y Z")
         .values(3)
         .between(-1e18, 1e18)
-        .excludes(center);
+        .excludes(center)
+        .common();
+    command
+        .addOption("--require", invocation.requirements,
+            "Refuse inputs that are not all of these, separated by commas: " + listOf(requirementNames()))
+        .valueName("LIST")
+        .common();
+    command.addFlag("--strict", invocation.isStrict, "Exit with 8 if there is a warning about the result").common();
     return command;
 }
 

@@ -54,7 +54,7 @@ namespace {
             if (!property.isStandard)
                 names.push_back(property.name);
         if (!names.empty())
-            report.warn(
+            report.warnOfInput(
                 fmt::format("only positions are read from {}; left out: {}", file.string(), fmt::join(names, ", ")));
     }
 

@@ -16,6 +16,8 @@ struct Output;
 struct Invocation {
     std::string command;
     bool asJson = false;
+    bool isStrict = false; // warnings about the result have an exit code of their own
+    std::string requirements; // of inputs, as a list
     unsigned int threads = 0; // upper limit; 0 for all
     ReadOptions reading;
     std::vector<double> center; // three numbers, or empty
@@ -42,6 +44,9 @@ void addFiles(FileList& files, Command& command, Needed needed = Needed::Always)
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);
 
 // Each command has its own source here and is listed in Program.cpp.
+void addHelp(CommandLine& program, Invocation& invocation);
+void addCompletion(CommandLine& program, Invocation& invocation);
+void addManual(CommandLine& program, Invocation& invocation);
 void addInfo(CommandLine& program, Invocation& invocation);
 void addValidate(CommandLine& program, Invocation& invocation);
 void addAddPoints(CommandLine& program, Invocation& invocation);

@@ -25,7 +25,7 @@ std::span<EditKind const* const> editKinds()
 
 Subject Edit::readSubject(std::vector<std::filesystem::path> const& files, Report& report)
 {
-    return {files[0].string(), loadGeometry(files[0], report)};
+    return {files[0].string(), loadInput(files[0], report)};
 }
 
 void addEditCommand(EditKind const& kind, CommandLine& program, Invocation& invocation)

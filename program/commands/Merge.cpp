@@ -1,6 +1,7 @@
 #include "Edit.h"
 #include "files/GeometryBuilder.h"
 #include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
 #include "shell/Failure.h"
 
 #include <Modeling/mergeMeshes.h>
@@ -73,6 +74,7 @@ namespace {
                 report.document["skipped"].push_back({{"file", file}, {"reason", status.message().c_str()}});
                 continue;
             }
+            requireProperties(report.requirements, *object, file);
             sources.objects.append(std::move(object));
             sources.files.push_back(file);
         }

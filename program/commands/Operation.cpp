@@ -4,6 +4,7 @@
 #include "files/Scanner.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshArrays.h"
+#include "geometry/MeshRequirements.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
@@ -156,7 +157,7 @@ Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& re
         report.document["center"] = {geometry.origin->x, geometry.origin->y, geometry.origin->z};
     }
     for (std::string const& note : geometry.notes)
-        report.warn(fmt::format("{}: {}", file.string(), note));
+        report.warnOfInput(fmt::format("{}: {}", file.string(), note));
     report.document["inputs"].push_back(
         {{"file", file.string()}, {"format", geometry.format}, {"kind", nameOf(typeOf(*geometry.object))}});
     return std::move(geometry.object);
@@ -172,6 +173,13 @@ Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& re
 {
     Orvan::MutablePtr<Tessara::Object> object = readGeometry(file, report);
     requireValid(*object, file);
+    return object;
+}
+
+Orvan::MutablePtr<Tessara::Object> loadInput(fs::path const& file, Report& report)
+{
+    Orvan::MutablePtr<Tessara::Object> object = loadGeometry(file, report);
+    requireProperties(report.requirements, *object, file);
     return object;
 }
 

@@ -63,6 +63,9 @@ std::string centerOf(ReadOptions const& reading);
 /// Reads and validates a file.
 Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);
 
+/// The same for an input of the command, which has to have the properties that --require lists.
+Orvan::MutablePtr<Tessara::Object> loadInput(std::filesystem::path const& file, Report& report);
+
 /// Refuses an invalid object, which was read from `file`.
 void requireValid(Tessara::Object const& object, std::filesystem::path const& file);
 

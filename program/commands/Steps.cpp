@@ -99,6 +99,7 @@ namespace {
                 throw;
             }
             report_.reading = reports_[i].reading;
+            report_.hasWarned = report_.hasWarned || reports_[i].hasWarned;
         }
 
         void runStep(std::size_t i, Subject& subject)
@@ -108,7 +109,8 @@ namespace {
             edit.runLimited([&] {
                 requireSubject(*steps_[i].kind, subject);
                 edit.run(subject, report);
-                requireValidResult(*subject.object);
+                if (i + 1 != steps_.size()) // the last result is validated before it is written
+                    requireValidResult(*subject.object);
                 stopIfCancelled();
             });
             edit.report(report);

@@ -20,6 +20,15 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
 /// Isolated points, which smoothing operations cannot handle.
 std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopology const& topology);
 
+/// What the user can require of geometry: types, and properties of meshes.
+std::vector<std::string> requirementNames();
+/// Splits a list such as "closed,triangles".
+/// \throws Failure  if a name is unknown
+std::vector<std::string> parseRequirements(std::string const& list);
+/// Refuses geometry that does not meet all of these. Without points it meets any.
+void requireProperties(
+    std::vector<std::string> const& requirements, Tessara::Object const& object, std::string const& source);
+
 /// Refuses an object of another type, on behalf of `command`. An object without points becomes an empty one of this type.
 /// \param source  where the object comes from, here and below: a file in most cases
 void requireType(GeometryType type, Tessara::Object& object, char const* command, std::string const& source);

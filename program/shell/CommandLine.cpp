@@ -365,6 +365,12 @@ Option& Option::showDefault()
     return *this;
 }
 
+Option& Option::common()
+{
+    declared_->isCommon = true;
+    return *this;
+}
+
 Option& Option::needs(Option const& other)
 {
     option_->needs(other.option_);

@@ -33,6 +33,7 @@ struct OptionDescription {
     std::string synopsis; // of its values, as in the help
     std::string description;
     std::vector<std::string> needs; // names of options
+    bool isCommon = false; // every command has it
     int group = -1; // the number of the group of which exactly one option is required
     std::vector<std::string> given; // the values on the command line, after parsing
 };
@@ -72,6 +73,9 @@ public:
     Option& synopsis(char const* text);
     /// Shows the current value of the variable as the default in the help.
     Option& showDefault();
+
+    /// Says that every command has this option.
+    Option& common();
 
     Option& needs(Option const& other);
     Option& excludes(Option const& other);

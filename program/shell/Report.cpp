@@ -75,6 +75,12 @@ Report Report::ofStep(std::size_t number, std::string const& name) const
 
 void Report::warn(std::string const& sentence)
 {
+    hasWarned = true;
+    warnOfInput(sentence);
+}
+
+void Report::warnOfInput(std::string const& sentence)
+{
     document["warnings"].push_back(sentence);
     std::fputs(fmt::format("modeling: warning: {}{}\n", prefix_, sentence).c_str(), stderr);
 }
