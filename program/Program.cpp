@@ -3,12 +3,14 @@
 #include "commands/Commands.h"
 #include "commands/Operation.h"
 #include "files/GeometryFile.h"
+#include "geometry/MeshRequirements.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
 #include <fmt/format.h>
 #include <tbb/global_control.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <new>
 #include <optional>
@@ -17,8 +19,9 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addAddPoints, addDeletePoints,
-        addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth, addRemoveSlivers, addStitch};
+    constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addConvert, addAddPoints,
+        addDeletePoints, addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth,
+        addRemoveSlivers, addStitch, addRun, addHelp, addCompletion, addManual};
 
     constexpr char kFooter[] =
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz; written: .obj .ply
@@ -35,6 +38,7 @@ Exit codes:
   5  the operation refuses its input; the message says why
   6  cancelled by Ctrl-C or SIGTERM; nothing was written
   7  out of memory, or beyond --max-memory
+  8  done, but there are warnings about the result, with --strict
 
 "modeling COMMAND --help" explains a command.)";
 
@@ -71,6 +75,14 @@ Exit codes:
         return static_cast<int>(failure.code);
     }
 
+    std::string jsonOf(Report const& report)
+    {
+        std::string text;
+        for (Json const& line : report.lines)
+            text += line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
+        return report.lines.empty() ? toText(report.document) + "\n" : text;
+    }
+
     int runCommand(Invocation const& invocation)
     {
         CancelOnSignal const cancelOnSignal;
@@ -78,20 +90,32 @@ Exit codes:
         if (invocation.threads != 0)
             threadLimit.emplace(tbb::global_control::max_allowed_parallelism, invocation.threads);
         Report report(invocation.command);
+        report.isJson = invocation.asJson;
         report.reading = invocation.reading;
         if (std::vector<double> const& center = invocation.center; !center.empty())
             report.reading.origin = {center[0], center[1], center[2]};
         try {
+            report.requirements = parseRequirements(invocation.requirements);
             invocation.run(report);
-            report.document["exitCode"] = 0;
+            if (invocation.isStrict && report.hasWarned && report.exitCode == 0)
+                report.exitCode = static_cast<int>(ExitCode::Warned);
+            report.document["exitCode"] = report.exitCode;
             if (report.document.contains("center"))
                 report.text += centerOf(report.reading) + "\n";
-            if (!writeToStandardOutput(invocation.asJson ? toText(report.document) + "\n" : report.text))
+            if (!writeToStandardOutput(invocation.asJson ? jsonOf(report) : report.text))
                 throw Failure(ExitCode::File, kCannotWriteOutput);
-            return 0;
+            return report.exitCode;
         } catch (...) {
             return reportFailure(currentFailure(), invocation.asJson, report);
         }
+    }
+
+    int printHelp(std::string const& help)
+    {
+        if (writeToStandardOutput(help))
+            return static_cast<int>(ExitCode::Done);
+        std::fprintf(stderr, "modeling: %s\n", kCannotWriteOutput);
+        return static_cast<int>(ExitCode::File);
     }
 
     int parseAndRun(int argumentCount, char const* const* arguments)
@@ -101,9 +125,16 @@ Exit codes:
             "Geometry algorithms for meshes, point clouds and strands, run on files.", kFooter);
         for (auto const add : kCommands)
             add(program, invocation);
-        if (auto const exitCode = program.parse(argumentCount, arguments))
-            return *exitCode;
-        return runCommand(invocation);
+        CommandLine::Parsed const parsed =
+            program.parse({arguments + std::min(1, argumentCount), arguments + argumentCount});
+        if (!parsed.mistake.empty()) {
+            std::fputs(fmt::format("modeling: {}\nRun \"modeling{}{} --help\" for more information.\n", parsed.mistake,
+                           parsed.command.empty() ? "" : " ", parsed.command)
+                           .c_str(),
+                stderr);
+            return static_cast<int>(ExitCode::CommandLine);
+        }
+        return parsed.help.empty() ? runCommand(invocation) : printHelp(parsed.help);
     }
 
 }
@@ -111,29 +142,44 @@ Exit codes:
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation)
 {
     Command command = program.addCommand(help);
-    command.addFlag("--json", invocation.asJson, "Print one JSON document instead of text, also on failure");
-    command.addOption("--threads", invocation.threads, "Use at most N threads").valueName("N").between(1, 1024);
-    command.addFlag("--lenient", invocation.reading.isLenient,
-        "Leave out broken elements of files, with a warning: points that are NaN, the faces at them, faces with fewer "
-        "than three corners, bytes at the end");
-    Option const center = command.addFlag("--center", invocation.reading.isCentered,
-        "Subtract a rounded center from all positions, in double precision, and print it");
+    command.addFlag("--json", invocation.asJson, "Print one JSON document instead of text, also on failure").common();
+    command.addOption("--threads", invocation.threads, "Use at most N threads")
+        .valueName("N")
+        .between(1, 1024)
+        .common();
+    command
+        .addFlag("--lenient", invocation.reading.isLenient,
+            "Leave out broken elements of files, with a warning: points that are NaN, the faces at them, faces with "
+            "fewer than three corners, bytes at the end")
+        .common();
+    Option const center = command
+                              .addFlag("--center", invocation.reading.isCentered,
+                                  "Subtract a rounded center from all positions, in double precision, and print it")
+                              .common();
     command.addOption("--center-at", invocation.center, "Subtract this point instead")
         .synopsis("X Y Z")
         .values(3)
         .between(-1e18, 1e18)
-        .excludes(center);
+        .excludes(center)
+        .common();
+    command
+        .addOption("--require", invocation.requirements,
+            "Refuse inputs that are not all of these, separated by commas: " + listOf(requirementNames()))
+        .valueName("LIST")
+        .common();
+    command.addFlag("--strict", invocation.isStrict, "Exit with 8 if there is a warning about the result").common();
     return command;
 }
 
-void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command, Needed needed)
+void addFile(
+    char const* name, std::string const& description, std::filesystem::path& file, Command& command, Needed needed)
 {
     Option option = command.addOption(name, file, description).synopsis(" ");
     if (needed == Needed::Always)
         option.required();
 }
 
-void addOutput(char const* description, Output& out, Command& command, Needed needed)
+void addOutput(std::string const& description, Output& out, Command& command, Needed needed)
 {
     addFile("OUT", description, out.file, command, needed);
     addForce(out, command);
@@ -142,6 +188,16 @@ void addOutput(char const* description, Output& out, Command& command, Needed ne
 void addForce(Output& out, Command& command)
 {
     command.addFlag("-f,--force", out.replaces, "Replace the file to write if it exists");
+}
+
+void addFiles(FileList& files, Command& command, Needed needed)
+{
+    Option option = command.addOption("FILES", files.in, "Files to read; without -o the last one is the output")
+                        .synopsis("IN... [OUT]");
+    if (needed == Needed::Always)
+        option.required();
+    command.addOption("-o,--output", files.out.file, "The output; all other names are inputs").valueName("OUT");
+    addForce(files.out, command);
 }
 
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run)

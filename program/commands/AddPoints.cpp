@@ -1,5 +1,4 @@
-#include "Commands.h"
-#include "Operation.h"
+#include "Edit.h"
 #include "geometry/Geometry.h"
 #include "shell/Failure.h"
 
@@ -8,8 +7,6 @@
 
 #include <fmt/format.h>
 
-#include <memory>
-
 namespace ModelingProgram {
 
 namespace {
@@ -17,12 +14,29 @@ namespace {
     using namespace Tessara::Geometry;
     using Tessara::Object;
 
-    struct Options {
-        std::filesystem::path in;
-        std::filesystem::path points;
-        Output out;
-        std::string tag;
+    class AddPoints final : public Edit {
+    public:
+        void declareFiles(Command& command) override;
+        void declareOptions(Command& command) override;
+        NewAttribute newAttribute() const override { return {"--tag", tag_}; }
+        void run(Subject& subject, Report& report) override;
+        void report(Report& report) override { reportOperation(before_, after_, {}, report); }
+
+    private:
+        std::filesystem::path points_;
+        std::string tag_;
+        Json before_, after_;
     };
+
+    void AddPoints::declareFiles(Command& command)
+    {
+        addFile("POINTS", "File whose points are added", points_, command);
+    }
+
+    void AddPoints::declareOptions(Command& command)
+    {
+        command.addOption("--tag", tag_, "Name of the attribute that marks the new points").valueName("NAME");
+    }
 
     void checkTag(std::string const& tag, Object const& cloud, Report& report)
     {
@@ -40,46 +54,40 @@ namespace {
             if (!property.isStandard)
                 names.push_back(property.name);
         if (!names.empty())
-            report.warn(
+            report.warnOfInput(
                 fmt::format("only positions are read from {}; left out: {}", file.string(), fmt::join(names, ", ")));
     }
 
-    void addPoints(Options const& options, Report& report)
+    void AddPoints::run(Subject& subject, Report& report)
     {
-        requireWritable(options.out, GeometryType::PointCloud);
-        if (!options.tag.empty())
-            requireAttribute(options.out, "--tag", options.tag);
-        Orvan::MutablePtr<Object> const cloud = loadGeometry(options.in, report);
-        requirePointCloud("add-points", *cloud, options.in);
-        checkTag(options.tag, *cloud, report);
-        Orvan::MutablePtr<Object> const points = loadGeometry(options.points, report);
-        warnOfAttributes(*points, options.points, report);
-        Json const before = countsOf(*cloud);
+        Object& cloud = *subject.object;
+        checkTag(tag_, cloud, report);
+        Orvan::MutablePtr<Object> const points = loadGeometry(points_, report);
+        warnOfAttributes(*points, points_, report);
+        before_ = countsOf(cloud);
         auto const positions = dataOf<float3>(*points, sPointPosition);
         runOperation(report, [&] {
             requireDone("add-points",
-                Tessara::GeometryAlgorithms::addPointsToPointCloud(*positions, options.tag.c_str(), *cloud, nullptr));
+                Tessara::GeometryAlgorithms::addPointsToPointCloud(*positions, tag_.c_str(), cloud, nullptr));
         });
-        saveGeometry(*cloud, options.out, report);
-        reportOperation(before, countsOf(*cloud), {}, report);
+        after_ = countsOf(cloud);
     }
 
 }
 
-void addAddPoints(CommandLine& program, Invocation& invocation)
-{
-    auto const options = std::make_shared<Options>();
-    constexpr CommandHelp kHelp = {"add-points", "Add the points of a file to a point cloud",
+constinit EditKind const kAddPoints = {
+    .help = {"add-points", "Add the points of a file to a point cloud",
         R"(The points are appended, from any kind of file; of a mesh all of its points.
 Only their positions are used: in the attributes of the point cloud they get zero or the attribute's
 default. A tag is a new attribute of the points that is true for the added ones.)",
-        "  modeling add-points scan.ply second-scan.xyz both.ply --tag second"};
-    Command command = addCommand(kHelp, program, invocation);
-    addFile("IN", "Point cloud to read", options->in, command);
-    addFile("POINTS", "File whose points are added", options->points, command);
-    addOutput("Point cloud to write", options->out, command);
-    command.addOption("--tag", options->tag, "Name of the attribute that marks the new points").valueName("NAME");
-    onSelected(command, invocation, [options](Report& report) { addPoints(*options, report); });
+        "  modeling add-points scan.ply second-scan.xyz both.ply --tag second"},
+    .create = createEdit<AddPoints>,
+    .takes = GeometryType::PointCloud,
+    .gives = GeometryType::PointCloud};
+
+void addAddPoints(CommandLine& program, Invocation& invocation)
+{
+    addEditCommand(kAddPoints, program, invocation);
 }
 
 }

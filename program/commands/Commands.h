@@ -9,12 +9,15 @@
 
 namespace ModelingProgram {
 
+struct FileList;
 struct Output;
 
 /// The command to run, as parsed from the command line.
 struct Invocation {
     std::string command;
     bool asJson = false;
+    bool isStrict = false; // warnings about the result have an exit code of their own
+    std::string requirements; // of inputs, as a list
     unsigned int threads = 0; // upper limit; 0 for all
     ReadOptions reading;
     std::vector<double> center; // three numbers, or empty
@@ -27,26 +30,33 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
 enum class Needed { Always, Sometimes };
 
 /// Adds a positional argument that is a file name.
-void addFile(char const* name, char const* description, std::filesystem::path& file, Command& command,
+void addFile(char const* name, std::string const& description, std::filesystem::path& file, Command& command,
     Needed needed = Needed::Always);
 
 /// Adds OUT and --force, which allows replacing an existing file.
-void addOutput(char const* description, Output& out, Command& command, Needed needed = Needed::Always);
+void addOutput(std::string const& description, Output& out, Command& command, Needed needed = Needed::Always);
 /// Adds --force only.
 void addForce(Output& out, Command& command);
+/// Adds FILES, -o and --force.
+void addFiles(FileList& files, Command& command, Needed needed = Needed::Always);
 
 /// Sets the invocation if `command` is the one on the command line.
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);
 
 // Each command has its own source here and is listed in Program.cpp.
+void addHelp(CommandLine& program, Invocation& invocation);
+void addCompletion(CommandLine& program, Invocation& invocation);
+void addManual(CommandLine& program, Invocation& invocation);
 void addInfo(CommandLine& program, Invocation& invocation);
 void addValidate(CommandLine& program, Invocation& invocation);
 void addAddPoints(CommandLine& program, Invocation& invocation);
+void addConvert(CommandLine& program, Invocation& invocation);
 void addDeletePoints(CommandLine& program, Invocation& invocation);
 void addDeleteFaces(CommandLine& program, Invocation& invocation);
 void addMakeVolume(CommandLine& program, Invocation& invocation);
 void addMerge(CommandLine& program, Invocation& invocation);
 void addRemoveSlivers(CommandLine& program, Invocation& invocation);
+void addRun(CommandLine& program, Invocation& invocation);
 void addSmooth(CommandLine& program, Invocation& invocation);
 void addStitch(CommandLine& program, Invocation& invocation);
 void addSubdivide(CommandLine& program, Invocation& invocation);

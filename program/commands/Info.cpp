@@ -3,8 +3,12 @@
 #include "files/GeometryBuilder.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshTopology.h"
+#include "shell/Failure.h"
 
 #include <fmt/format.h>
+
+#include <cstdio>
+#include <memory>
 
 namespace ModelingProgram {
 
@@ -71,43 +75,104 @@ namespace {
         return formatTable({{"property"}, {"type"}, {"of"}, {"length", true}}, rows);
     }
 
+    Json countAndDescribe(Tessara::Object const& object, Report& report)
+    {
+        Json const counts = countsOf(object);
+        report.document["counts"] = counts;
+        report.document["boundingBox"] = describeBox(boundingBoxOf(object));
+        if (typeOf(object) == GeometryType::Mesh)
+            report.document["topology"] = describeTopology(arraysOf(object));
+        report.document["properties"] = describeProperties(propertiesOf(object));
+        return counts;
+    }
+
     void describeFile(std::filesystem::path const& file, Report& report)
     {
-        Orvan::MutablePtr<Tessara::Object> const object = loadGeometry(file, report);
-        Json const counts = countsOf(*object);
-        auto const box = boundingBoxOf(*object);
-        std::vector<Property> const properties = propertiesOf(*object);
+        Orvan::MutablePtr<Tessara::Object> const object = loadInput(file, report);
+        Json const counts = countAndDescribe(*object, report);
         Json const& input = report.document["inputs"][0];
-
         report.text = fmt::format("{}: {}, {}\n\n{}bounding box {}\n", file.string(), input["kind"].get<std::string>(),
-            input["format"].get<std::string>(), formatValues({{"", counts}}), formatBox(box));
-        report.document["counts"] = counts;
-        report.document["boundingBox"] = describeBox(box);
-        if (typeOf(*object) == GeometryType::Mesh) {
-            Json const topology = describeTopology(arraysOf(*object));
-            report.document["topology"] = topology;
-            report.text += "\n" + formatValues({{"", topology}});
+            input["format"].get<std::string>(), formatValues({{"", counts}}), formatBox(boundingBoxOf(*object)));
+        if (report.document.contains("topology"))
+            report.text += "\n" + formatValues({{"", report.document["topology"]}});
+        report.text += "\n" + formatProperties(propertiesOf(*object));
+    }
+
+    /// What is most important, in one line.
+    std::string lineOf(std::filesystem::path const& file, Json const& document)
+    {
+        Json const& input = document["inputs"][0];
+        std::string line = fmt::format(
+            "{}: {}, {}", file.string(), input["kind"].get<std::string>(), input["format"].get<std::string>());
+        for (auto const& [name, count] : document["counts"].items())
+            line += ", " + countOf(count.get<std::uint64_t>(), name.substr(0, name.size() - 1));
+        if (document.contains("topology"))
+            line +=
+                document["topology"]["closedManifold"].get<bool>() ? ", closed manifold" : ", not a closed manifold";
+        return line + "\n";
+    }
+
+    void addFailure(ExitCode code, std::string const& message, std::vector<std::string> const& reasons, Report& report)
+    {
+        std::fputs(fmt::format("modeling: {}\n", message).c_str(), stderr);
+        report.document["error"] = {{"message", message}, {"reasons", reasons}};
+        report.exitCode = static_cast<int>(code);
+    }
+
+    Report describeAlone(std::filesystem::path const& file, Report const& all)
+    {
+        Report report("info");
+        report.reading = all.reading;
+        report.requirements = all.requirements;
+        try {
+            countAndDescribe(*loadInput(file, report), report);
+            report.text = lineOf(file, report.document);
+        } catch (FileError const& error) {
+            addFailure(ExitCode::File, error.what(), {}, report);
+        } catch (Failure const& failure) {
+            if (failure.code != ExitCode::Invalid && failure.code != ExitCode::Refused)
+                throw;
+            addFailure(failure.code, failure.what(), failure.reasons, report);
         }
-        report.document["properties"] = describeProperties(properties);
-        report.text += "\n" + formatProperties(properties);
+        report.document["exitCode"] = report.exitCode;
+        return report;
+    }
+
+    /// One line per file. A file that cannot be described does not end the command, but its exit code is that of the first one.
+    void describeFiles(std::vector<std::filesystem::path> const& files, Report& report)
+    {
+        for (std::filesystem::path const& file : files) {
+            Report const own = describeAlone(file, report);
+            report.reading = own.reading;
+            report.hasWarned = report.hasWarned || own.hasWarned;
+            report.exitCode = report.exitCode == 0 ? own.exitCode : report.exitCode;
+            report.text += own.text;
+            report.lines.push_back(own.document);
+        }
     }
 
 }
 
 void addInfo(CommandLine& program, Invocation& invocation)
 {
-    auto const file = std::make_shared<std::filesystem::path>();
+    auto const files = std::make_shared<std::vector<std::filesystem::path>>();
     constexpr CommandHelp kHelp = {"info", "Show what a file contains, and how the faces of a mesh are connected",
         R"(Open edges are boundary edges, with one face; non-manifold edges have more than two. A winding
 conflict is an edge that two faces traverse in the same direction. Pinched points are non-manifold
 vertices: their faces are not all connected by edges there. Parts are connected components. The genus
 is shown for closed manifolds, summed over the parts. A sliver below 0.1 is a face whose shortest edge
-is shorter than 0.1 times its longest edge.)",
+is shorter than 0.1 times its longest edge.
+
+Several files get one line each, with --json one document per line. A file that cannot be read does not end the
+command, but decides its exit code.)",
         "  modeling info bunny.obj\n"
+        "  modeling info *.ply --json | jq -c '[.inputs[0].file, .topology.closedManifold]'\n"
         "  modeling info bunny.obj --json | jq .topology.openEdges"};
     Command command = addCommand(kHelp, program, invocation);
-    addFile("FILE", "File to read", *file, command);
-    onSelected(command, invocation, [file](Report& report) { describeFile(*file, report); });
+    command.addOption("FILES", *files, "Files to read").required().synopsis("FILE...");
+    onSelected(command, invocation, [files](Report& report) {
+        files->size() == 1 ? describeFile(files->front(), report) : describeFiles(*files, report);
+    });
 }
 
 }

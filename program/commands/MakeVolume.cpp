@@ -124,8 +124,8 @@ namespace {
     void makeVolume(Options const& options, MemoryLimit const& limit, Report& report)
     {
         requireVdb(options.out);
-        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        requireMesh(*mesh, "make-volume", options.in);
+        Orvan::MutablePtr<Object> const mesh = loadInput(options.in, report);
+        requireType(GeometryType::Mesh, *mesh, "make-volume", options.in);
         MeshArrays const arrays = arraysOf(*mesh);
         requireFiniteSurface(arrays, options.in);
         SurfaceValue const value = surfaceValueOf(options, *mesh);

@@ -1,7 +1,7 @@
-#include "Commands.h"
-#include "Operation.h"
+#include "Edit.h"
 #include "files/GeometryBuilder.h"
 #include "geometry/Geometry.h"
+#include "geometry/MeshRequirements.h"
 #include "shell/Failure.h"
 
 #include <Modeling/mergeMeshes.h>
@@ -23,12 +23,6 @@ namespace {
     using Tessara::Object;
     using Inputs = Orvan::Array<Orvan::Ptr<Object>>;
 
-    struct Options {
-        std::vector<std::filesystem::path> files; // the last one is the output if `out` is not given
-        Output out;
-        std::string sourceAttribute;
-    };
-
     /// The inputs to merge, and the files that they come from.
     struct Sources {
         Inputs objects;
@@ -36,30 +30,43 @@ namespace {
         GeometryType type = GeometryType::None;
     };
 
-    /// Moves the output from the end of the list to `out`, unless that is given.
-    void chooseOutput(Options& options)
+    /// How a property was merged: the files whose elements got the default, because they lack it or have another type.
+    struct Outcome {
+        Property property; // as merged
+        std::vector<std::string> missingIn;
+        std::vector<std::string> otherTypeIn;
+    };
+
+    class Merge final : public Edit {
+    public:
+        void declareOptions(Command& command) override;
+        NewAttribute newAttribute() const override { return {"--source-attribute", sourceAttribute_}; }
+        Subject readSubject(std::vector<std::filesystem::path> const& files, Report& report) override;
+        void run(Subject& subject, Report& report) override;
+        void report(Report& report) override;
+
+    private:
+        std::string sourceAttribute_;
+        Sources sources_;
+        Json before_, after_;
+        std::vector<Outcome> outcomes_;
+        std::vector<std::string> dropped_;
+    };
+
+    void Merge::declareOptions(Command& command)
     {
-        Output& out = options.out;
-        if (!out.file.empty())
-            return;
-        if (options.files.size() < 2)
-            throw Failure(ExitCode::CommandLine,
-                "merge needs input files and an output file: modeling merge IN... OUT, or modeling merge IN... -o OUT");
-        out.file = std::move(options.files.back());
-        options.files.pop_back();
-        std::error_code ignored;
-        if (!out.replaces && std::filesystem::is_regular_file(out.file, ignored))
-            throw Failure(ExitCode::File,
-                fmt::format("the last file, {}, exists. If it is an input, name the output with -o OUT; if it is the "
-                            "output, --force replaces it",
-                    out.file.string()));
+        command
+            .addOption("--source-attribute", sourceAttribute_,
+                "Store the number of the file, counted from 0, under this name for each face, strand, or point of a "
+                "cloud")
+            .valueName("NAME");
     }
 
-    Sources readSources(Options const& options, Report& report)
+    Sources readSources(std::vector<std::filesystem::path> const& files, Report& report)
     {
         Sources sources;
         report.document["skipped"] = Json::array();
-        for (std::filesystem::path const& path : options.files) {
+        for (std::filesystem::path const& path : files) {
             std::string const file = path.string();
             Orvan::Ptr<Object> object = readGeometry(path, report);
             if (auto const status = validate(*object); !status) {
@@ -67,6 +74,7 @@ namespace {
                 report.document["skipped"].push_back({{"file", file}, {"reason", status.message().c_str()}});
                 continue;
             }
+            requireProperties(report.requirements, *object, file);
             sources.objects.append(std::move(object));
             sources.files.push_back(file);
         }
@@ -149,13 +157,6 @@ namespace {
         return totals;
     }
 
-    /// How a property was merged: the files whose elements got the default, because they lack it or have another type.
-    struct Outcome {
-        Property property; // as merged
-        std::vector<std::string> missingIn;
-        std::vector<std::string> otherTypeIn;
-    };
-
     std::vector<Outcome> outcomesOf(Sources const& sources, Object const& merged)
     {
         std::vector<Outcome> outcomes;
@@ -214,56 +215,64 @@ namespace {
                 + "\n";
     }
 
-    void mergeFiles(Options options, Report& report)
+    /// The first of the inputs stands for all of them, because they have the same type.
+    Subject Merge::readSubject(std::vector<std::filesystem::path> const& files, Report& report)
     {
-        chooseOutput(options);
-        requireWritable(options.out, GeometryType::None);
-        if (!options.sourceAttribute.empty())
-            requireAttribute(options.out, "--source-attribute", options.sourceAttribute);
-        Sources sources = readSources(options, report);
-        requireOneKind(sources);
-        requireWritable(options.out, sources.type);
-        if (sources.type == GeometryType::Mesh)
-            for (auto const& object : sources.objects)
-                requireWritableFaces(options.out, *object);
-        if (!options.sourceAttribute.empty())
-            numberSources(options.sourceAttribute, sources);
+        sources_ = readSources(files, report);
+        requireOneKind(sources_);
+        return {sources_.files[0], makeMutable(Orvan::Ptr<Object>(sources_.objects[0]))};
+    }
 
-        auto const merged = Tessara::createObject();
+    void Merge::run(Subject& subject, Report& report)
+    {
+        if (!sourceAttribute_.empty())
+            numberSources(sourceAttribute_, sources_);
+        auto merged = Tessara::createObject();
         bool isDone = false;
-        runOperation(report, [&] { isDone = merge(sources, *merged); });
+        runOperation(report, [&] { isDone = merge(sources_, *merged); });
         if (!isDone)
             throw Failure(ExitCode::Refused, "there would be more than 4,294,967,295 elements of one kind");
+        outcomes_ = outcomesOf(sources_, *merged);
+        before_ = totalsOf(sources_);
+        after_ = countsOf(*merged);
+        dropped_ = droppedIn(sources_, *merged);
+        sources_ = {};
+        subject.object = std::move(merged);
+    }
 
-        saveGeometry(*merged, options.out, report);
-        reportOutcomes(outcomesOf(sources, *merged), report);
-        reportOperation(totalsOf(sources), countsOf(*merged), droppedIn(sources, *merged), report);
+    void Merge::report(Report& report)
+    {
+        reportOutcomes(outcomes_, report);
+        reportOperation(before_, after_, dropped_, report);
     }
 
 }
 
-void addMerge(CommandLine& program, Invocation& invocation)
-{
-    auto const options = std::make_shared<Options>();
-    constexpr CommandHelp kHelp = {"merge", "Join meshes, point clouds or strand sets into one, with all attributes",
+constinit EditKind const kMerge = {
+    .help = {"merge", "Join meshes, point clouds or strand sets into one, with all attributes",
         R"(The files may have different formats, but must contain the same kind of geometry. A file with invalid
 geometry is skipped with a warning. The type of each attribute is that of the first file that has it;
 elements of files without it, or with another type, get the default.
 
 Without -o the last name is the output, which must not exist yet (unless --force).)",
         "  modeling merge a.obj b.ply c.off all.ply\n"
-        "  modeling merge scan-*.ply -o all.ply --source-attribute scan"};
-    Command command = addCommand(kHelp, program, invocation);
-    command.addOption("FILES", options->files, "Files to read; without -o the last one is the output")
-        .required()
-        .synopsis("IN... [OUT]");
-    command.addOption("-o,--output", options->out.file, "The output; all other names are inputs").valueName("OUT");
-    addForce(options->out, command);
-    command
-        .addOption("--source-attribute", options->sourceAttribute,
-            "Store the number of the file, counted from 0, under this name for each face, strand, or point of a cloud")
-        .valueName("NAME");
-    onSelected(command, invocation, [options](Report& report) { mergeFiles(*options, report); });
+        "  modeling merge scan-*.ply -o all.ply --source-attribute scan"},
+    .create = createEdit<Merge>,
+    .takes = GeometryType::None,
+    .gives = GeometryType::None,
+    .takesManyFiles = true};
+
+void addMerge(CommandLine& program, Invocation& invocation)
+{
+    auto const files = std::make_shared<FileList>();
+    std::shared_ptr<Edit> const edit = kMerge.create();
+    Command command = addCommand(kMerge.help, program, invocation);
+    addFiles(*files, command);
+    edit->declareOptions(command);
+    onSelected(command, invocation, [files, edit](Report& report) {
+        chooseOutput("merge", *files);
+        runOnFiles(kMerge, *edit, files->in, files->out, report);
+    });
 }
 
 }

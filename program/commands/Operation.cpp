@@ -4,6 +4,7 @@
 #include "files/Scanner.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshArrays.h"
+#include "geometry/MeshRequirements.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
@@ -37,14 +38,17 @@ namespace {
         return static_cast<std::uint64_t>(usage.ru_maxrss) * 1024;
     }
 
-    /// Ends the report with a table of these rows and those of every command.
-    void addRun(std::vector<std::vector<std::string>> rows, Report& report)
+    /// Ends the report with a table of these rows and those of every command, as far as they apply.
+    void addLastRows(std::vector<std::vector<std::string>> rows, Report& report)
     {
         Json& document = report.document;
-        document["peakMemoryBytes"] = peakMemory();
-        rows.push_back({"time", formatSeconds(document["seconds"].get<double>())});
-        rows.push_back({"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())});
-        rows.push_back({"written", document["output"].get<std::string>()});
+        if (document.contains("seconds"))
+            rows.push_back({"time", formatSeconds(document["seconds"].get<double>())});
+        if (document.contains("output")) {
+            document["peakMemoryBytes"] = peakMemory();
+            rows.push_back({"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())});
+            rows.push_back({"written", document["output"].get<std::string>()});
+        }
         report.text += "\n" + formatTable({{}, {}}, rows);
     }
 
@@ -58,9 +62,42 @@ namespace {
         return lowerCase(out.file.extension().string()) == extension;
     }
 
+    /// Refuses a mesh with faces that the format cannot hold.
+    void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
+    {
+        if (!hasExtension(out, ".stl"))
+            return;
+        MeshArrays const arrays = arraysOf(mesh);
+        for (unsigned int face = 0; face != arrays.faceCount(); ++face)
+            if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
+                refuseOutput(out,
+                    fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY and VTP files can hold it",
+                        face, countOf(corners, "corner")));
+    }
+
 }
 
-void requireWritable(Output const& out, GeometryType type)
+void chooseOutput(char const* command, FileList& files)
+{
+    Output& out = files.out;
+    if (!out.file.empty())
+        return;
+    if (files.in.size() < 2)
+        throw Failure(ExitCode::CommandLine,
+            fmt::format(
+                "{0} needs input files and an output file: modeling {0} IN... OUT, or modeling {0} IN... -o OUT",
+                command));
+    out.file = std::move(files.in.back());
+    files.in.pop_back();
+    std::error_code ignored;
+    if (!out.replaces && fs::is_regular_file(out.file, ignored))
+        throw Failure(ExitCode::File,
+            fmt::format("the last file, {}, exists. If it is an input, name the output with -o OUT; if it is the "
+                        "output, --force replaces it",
+                out.file.string()));
+}
+
+void requireHolds(Output const& out, GeometryType type)
 {
     if (!isWritableFormat(out.file))
         refuseOutput(out, "its name has to end in .obj, .ply, .stl or .vtp");
@@ -68,6 +105,19 @@ void requireWritable(Output const& out, GeometryType type)
         refuseOutput(out, "this format cannot hold strands; OBJ and VTP can");
     if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
         refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY and VTP files can");
+}
+
+void requireHolds(Output const& out, Tessara::Object const& object)
+{
+    GeometryType const type = typeOf(object);
+    requireHolds(out, type);
+    if (type == GeometryType::Mesh)
+        requireWritableFaces(out, object);
+}
+
+void requireWritable(Output const& out, GeometryType type)
+{
+    requireHolds(out, type);
     requirePlace(out);
 }
 
@@ -82,18 +132,6 @@ void requirePlace(Output const& out)
     if (!out.replaces && fs::is_regular_file(out.file, ignored))
         refuseOutput(out, "the file exists; --force replaces it");
     OutputFile::checkWritable(out.file, out.existing());
-}
-
-void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
-{
-    if (!hasExtension(out, ".stl"))
-        return;
-    MeshArrays const arrays = arraysOf(mesh);
-    for (unsigned int face = 0; face != arrays.faceCount(); ++face)
-        if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
-            refuseOutput(out,
-                fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY and VTP files can hold it",
-                    face, countOf(corners, "corner")));
 }
 
 void requireAttribute(Output const& out, char const* option, std::string const& name)
@@ -119,7 +157,7 @@ Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& re
         report.document["center"] = {geometry.origin->x, geometry.origin->y, geometry.origin->z};
     }
     for (std::string const& note : geometry.notes)
-        report.warn(fmt::format("{}: {}", file.string(), note));
+        report.warnOfInput(fmt::format("{}: {}", file.string(), note));
     report.document["inputs"].push_back(
         {{"file", file.string()}, {"format", geometry.format}, {"kind", nameOf(typeOf(*geometry.object))}});
     return std::move(geometry.object);
@@ -138,6 +176,13 @@ Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& re
     return object;
 }
 
+Orvan::MutablePtr<Tessara::Object> loadInput(fs::path const& file, Report& report)
+{
+    Orvan::MutablePtr<Tessara::Object> object = loadGeometry(file, report);
+    requireProperties(report.requirements, *object, file);
+    return object;
+}
+
 void requireValid(Tessara::Object const& object, fs::path const& file)
 {
     auto const status = validate(object);
@@ -145,16 +190,6 @@ void requireValid(Tessara::Object const& object, fs::path const& file)
         throw Failure(ExitCode::Invalid,
             fmt::format(
                 "{} does not contain a valid {}: {}", file.string(), nameOf(typeOf(object)), status.message().view()));
-}
-
-void requirePointCloud(char const* command, Tessara::Object& object, fs::path const& file)
-{
-    if (Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
-        makeEmpty(GeometryType::PointCloud, object);
-    if (typeOf(object) != GeometryType::PointCloud)
-        throw Failure(ExitCode::Refused,
-            fmt::format(
-                "{} needs a point cloud, but {} contains a {}", command, file.string(), nameOf(typeOf(object))));
 }
 
 void requireDone(char const* command, bool isDone)
@@ -210,12 +245,12 @@ void reportOperation(
     if (document.contains("keptProperties"))
         rows.push_back({"kept properties", listOf(document["keptProperties"])});
     rows.push_back({"dropped properties", listOf(droppedProperties)});
-    addRun(rows, report);
+    addLastRows(rows, report);
 }
 
 void reportRun(Report& report)
 {
-    addRun({}, report);
+    addLastRows({}, report);
 }
 
 }

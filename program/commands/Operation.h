@@ -32,13 +32,24 @@ struct Output {
     Existing existing() const { return replaces ? Existing::Replace : Existing::Keep; }
 };
 
+/// The files of a command that takes many: IN... OUT, or IN... -o OUT.
+struct FileList {
+    std::vector<std::filesystem::path> in; // ends with the output if `out` is not given
+    Output out;
+};
+
+/// Moves the output from the end of the list to `out`, unless that is given.
+void chooseOutput(char const* command, FileList& files);
+
 /// Refuses before any work what `saveGeometry` would refuse: a format that cannot hold this type of geometry, and what
 /// `requirePlace` refuses. `GeometryType::None` means that the type is not known yet.
 void requireWritable(Output const& out, GeometryType type);
+/// Refuses a format that cannot hold this type of geometry.
+void requireHolds(Output const& out, GeometryType type);
 /// Refuses a folder that does not exist or is not writable, and an existing file without --force.
 void requirePlace(Output const& out);
-/// Refuses a mesh with faces that the format cannot hold.
-void requireWritableFaces(Output const& out, Tessara::Object const& mesh);
+/// Refuses a format that cannot hold this geometry.
+void requireHolds(Output const& out, Tessara::Object const& object);
 /// Refuses a file whose format cannot hold the new attribute that `option` requests.
 void requireAttribute(Output const& out, char const* option, std::string const& name);
 
@@ -52,11 +63,11 @@ std::string centerOf(ReadOptions const& reading);
 /// Reads and validates a file.
 Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);
 
+/// The same for an input of the command, which has to have the properties that --require lists.
+Orvan::MutablePtr<Tessara::Object> loadInput(std::filesystem::path const& file, Report& report);
+
 /// Refuses an invalid object, which was read from `file`.
 void requireValid(Tessara::Object const& object, std::filesystem::path const& file);
-
-/// Refuses an object that is not a point cloud. An object without points becomes an empty point cloud.
-void requirePointCloud(char const* command, Tessara::Object& object, std::filesystem::path const& file);
 
 /// Throws if the operation returned false.
 void requireDone(char const* command, bool isDone);
@@ -68,11 +79,11 @@ void runOperation(Report& report, std::function<void()> const& operation);
 void saveGeometry(Tessara::Object const& object, Output const& out, Report& report);
 
 /// Ends the report with a table of the values before and after, the kept properties (if the document has
-/// "keptProperties"), the dropped properties, time and peak memory.
+/// "keptProperties"), the dropped properties, time, and peak memory and the written file if there is one.
 void reportOperation(
     Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report);
 
-/// Ends the report with time, peak memory and the written file, for commands without such a table.
+/// Ends the report with time, peak memory and the written file, as far as they apply: for commands without such a table.
 void reportRun(Report& report);
 
 }

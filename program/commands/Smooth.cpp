@@ -1,5 +1,4 @@
-#include "Commands.h"
-#include "Operation.h"
+#include "Edit.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
@@ -30,33 +29,67 @@ namespace {
     using Positions = Orvan::Array<float3>;
 
     struct Options {
-        std::filesystem::path in;
-        Output out;
         float amount = 1;
         std::string weights;
         std::string pins;
         bool pinsBoundary = false;
         std::optional<float> sharpDegrees; // points at sharper edges are pinned
         bool dropsIsolated = false;
-        bool* asJson = nullptr; // standard output is then reserved for the document
     };
+
+    /// How far points moved.
+    struct Displacement {
+        double mean = 0;
+        double largest = 0;
+    };
+
+    class Smooth final : public Edit {
+    public:
+        void declareOptions(Command& command) override;
+        void run(Subject& subject, Report& report) override;
+        void report(Report& report) override;
+
+    private:
+        Options options_;
+        ShapeChange change_;
+        Displacement moved_;
+        Json before_, after_;
+        std::vector<std::string> dropped_;
+    };
+
+    void Smooth::declareOptions(Command& command)
+    {
+        command.addOption("--amount", options_.amount, "Amount of smoothing").between(0, 1000, "0..1000").showDefault();
+        command.addOption("--weights", options_.weights, "Scale the moves of points by this attribute")
+            .valueName("ATTRIBUTE");
+        command.addOption("--pin-attribute", options_.pins, "Pin the points where this attribute is not 0")
+            .valueName("ATTRIBUTE");
+        command.addFlag("--pin-boundary", options_.pinsBoundary, "Pin the points of boundary edges");
+        command
+            .addOption("--pin-sharp", options_.sharpDegrees,
+                "Pin the points at edges whose faces have normals that differ by more than this many degrees")
+            .valueName("DEG")
+            .between(0, 180, "0..180");
+        command.addFlag("--drop-isolated", options_.dropsIsolated, "Remove points that belong to no face");
+    }
 
     /// Null if no point is weighted or pinned.
     std::unique_ptr<Orvan::Array<float>> weightsOf(
-        Options const& options, Object const& mesh, EdgeSides const& edges, Report& report)
+        Options const& options, Subject const& subject, EdgeSides const& edges, Report& report)
     {
         if (options.weights.empty() && options.pins.empty() && !options.pinsBoundary && !options.sharpDegrees)
             return nullptr;
+        Object const& mesh = *subject.object;
         MeshArrays const arrays = arraysOf(mesh);
         auto weights = std::make_unique<Orvan::Array<float>>(arrays.pointCount(), 1.0f);
         if (!options.weights.empty()) {
-            std::vector<float> const numbers = pointNumbers("--weights", options.weights, mesh, options.in);
+            std::vector<float> const numbers = pointNumbers("--weights", options.weights, mesh, subject.name);
             if (!std::all_of(numbers.begin(), numbers.end(), [](float number) { return std::isfinite(number); }))
                 throw Failure(ExitCode::Refused, fmt::format("the weights \"{}\" are not all finite", options.weights));
             std::copy(numbers.begin(), numbers.end(), weights->begin());
         }
         if (!options.pins.empty()) {
-            std::vector<float> const numbers = pointNumbers("--pin-attribute", options.pins, mesh, options.in);
+            std::vector<float> const numbers = pointNumbers("--pin-attribute", options.pins, mesh, subject.name);
             for (std::size_t point = 0; point != numbers.size(); ++point)
                 if (numbers[point] != 0)
                     (*weights)[point] = 0;
@@ -73,8 +106,9 @@ namespace {
     }
 
     /// Refuses points without a face, which smoothing cannot move, or removes them.
-    void handleIsolatedPoints(Options const& options, Object& mesh, Report& report)
+    void handleIsolatedPoints(Options const& options, Subject& subject, Report& report)
     {
+        Object& mesh = *subject.object;
         Finding const isolated = findIsolatedPoints(arraysOf(mesh));
         report.document["droppedPoints"] = isolated.count;
         if (!isolated)
@@ -83,7 +117,7 @@ namespace {
             throw Failure(ExitCode::Refused,
                 fmt::format("{} of {} in {} {} to no face, so smoothing cannot move {}; the first is point {} "
                             "(counted from 0). --drop-isolated removes such points.",
-                    groupDigits(isolated.count), countOf(arraysOf(mesh).pointCount(), "point"), options.in.string(),
+                    groupDigits(isolated.count), countOf(arraysOf(mesh).pointCount(), "point"), subject.name,
                     isolated.count == 1 ? "belongs" : "belong", isolated.count == 1 ? "it" : "them", isolated.first));
         Orvan::Array<bool> const noFace(arraysOf(mesh).faceCount());
         if (!Tessara::GeometryAlgorithms::deleteFaces(noFace, mesh))
@@ -124,7 +158,7 @@ namespace {
         return values;
     }
 
-    void reportDisplacement(Positions const& before, Positions const& after, Report& report)
+    Displacement displacementOf(Positions const& before, Positions const& after)
     {
         double sum = 0, largest = 0;
         for (std::uint64_t point = 0; point != before.size; ++point) {
@@ -132,10 +166,7 @@ namespace {
             sum += moved;
             largest = std::max(largest, moved);
         }
-        double const mean = before.empty() ? 0 : sum / static_cast<double>(before.size);
-        report.document["meanDisplacement"] = numberOf(static_cast<float>(mean));
-        report.document["largestDisplacement"] = numberOf(static_cast<float>(largest));
-        report.text += fmt::format("\nPoints moved by {:.4g} on average, by {:.4g} at most.\n", mean, largest);
+        return {before.empty() ? 0 : sum / static_cast<double>(before.size), largest};
     }
 
     /// Removes the normals of points, corners and faces, which no longer fit the surface. \return their names
@@ -152,55 +183,55 @@ namespace {
         return dropped;
     }
 
-    void smooth(Options const& options, Report& report)
+    void Smooth::run(Subject& subject, Report& report)
     {
-        requireWritable(options.out, GeometryType::Mesh);
-        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        requireMesh(*mesh, "smooth", options.in);
-        requireWritableFaces(options.out, *mesh);
-        handleIsolatedPoints(options, *mesh, report);
-        MeshArrays const arrays = arraysOf(*mesh);
+        Object& mesh = *subject.object;
+        handleIsolatedPoints(options_, subject, report);
+        MeshArrays const arrays = arraysOf(mesh);
         EdgeSides const edges(arrays);
-        auto const weights = weightsOf(options, *mesh, edges, report);
-        Json before = describeMesh(*mesh);
+        auto const weights = weightsOf(options_, subject, edges, report);
+        before_ = describeMesh(mesh);
         Positions positions = *arrays.positions;
         auto const run = [&](auto const& logger) {
-            Geometry::Mesh::smooth(options.amount, arrays.pointCount(), arrays.faceCount(), *arrays.faceVertex,
+            Geometry::Mesh::smooth(options_.amount, arrays.pointCount(), arrays.faceCount(), *arrays.faceVertex,
                 *arrays.faceOffset, weights.get(), positions, logger);
         };
-        bool const showsSteps = !*options.asJson && ::isatty(STDOUT_FILENO) == 1;
+        bool const showsSteps = !report.isJson && ::isatty(STDOUT_FILENO) == 1;
         runOperation(report, [&] { showsSteps ? run(CoreGL::ConsoleLogger()) : run(CoreGL::NOPLogger()); });
 
         if (!std::all_of(positions.begin(), positions.end(), [](float3 const& p) { return isFinite(p); }))
             throw Failure(ExitCode::Refused, "the coordinates are too large to be smoothed in single precision");
-        bool const isMoved = !std::equal(positions.begin(), positions.end(), arrays.positions->begin());
-        std::vector<std::string> const dropped = isMoved ? dropNormals(*mesh) : std::vector<std::string>();
-        addDataProperty(sPointPosition, sPointComp, positions, *mesh);
+        moved_ = displacementOf(*arrays.positions, positions);
+        dropped_ = moved_.largest != 0 ? dropNormals(mesh) : std::vector<std::string>();
+        addDataProperty(sPointPosition, sPointComp, std::move(positions), mesh);
         bool const isClosed = analyzeTopology(arrays, edges).isClosedManifold();
-        ShapeChange const change{shapeOf(arrays, edges, isClosed), shapeOf(arraysOf(*mesh), edges, isClosed),
-            largestMove(arrays, arraysOf(*mesh))};
-        saveGeometry(*mesh, options.out, report);
-        warnOfShape(change,
-            options.sharpDegrees
+        change_ = {shapeOf(arrays, edges, isClosed), shapeOf(arraysOf(mesh), edges, isClosed),
+            largestMove(arrays, arraysOf(mesh))};
+        after_ = describeMesh(mesh);
+        addShape(change_, before_, after_);
+    }
+
+    void Smooth::report(Report& report)
+    {
+        warnOfShape(change_,
+            options_.sharpDegrees
                 ? "Smoothing is for noise on rounded surfaces. A smaller --pin-sharp pins more edges, and a smaller "
                   "--amount moves points less."
                 : "Smoothing is for noise on rounded surfaces. --pin-sharp 30 keeps sharp edges, and a smaller "
                   "--amount moves points less.",
             report);
-        report.document["amount"] = numberOf(options.amount);
-        Json after = describeMesh(*mesh);
-        addShape(change, before, after);
-        reportOperation(before, after, dropped, report);
-        reportDisplacement(*arrays.positions, positions, report);
+        report.document["amount"] = numberOf(options_.amount);
+        reportOperation(before_, after_, dropped_, report);
+        report.document["meanDisplacement"] = numberOf(static_cast<float>(moved_.mean));
+        report.document["largestDisplacement"] = numberOf(static_cast<float>(moved_.largest));
+        report.text +=
+            fmt::format("\nPoints moved by {:.4g} on average, by {:.4g} at most.\n", moved_.mean, moved_.largest);
     }
 
 }
 
-void addSmooth(CommandLine& program, Invocation& invocation)
-{
-    auto const options = std::make_shared<Options>();
-    options->asJson = &invocation.asJson;
-    constexpr CommandHelp kHelp = {"smooth", "Even out the edges of a mesh with a rounded surface",
+constinit EditKind const kSmooth = {
+    .help = {"smooth", "Even out the edges of a mesh with a rounded surface",
         R"(Tangential Laplacian smoothing: each point moves within its tangent plane towards the center of its
 one-ring. The amount is divided into steps of at most 0.9: an amount of 1 takes two steps and removes most
 of the unevenness that noise causes on a sphere; 9 takes ten or eleven and converges. Normals would no
@@ -215,23 +246,13 @@ scale the moves (from 0, which pins, to 1) or pin the points where they are not 
         "  modeling smooth scan.ply smooth.ply --amount 3\n"
         "  modeling smooth cloth.obj smooth.obj --amount 1 --pin-boundary\n"
         "  modeling smooth part.stl held.stl --pin-sharp 30\n"
-        "  modeling smooth face.ply face.ply --force --weights quality --pin-attribute locked"};
-    Command command = addCommand(kHelp, program, invocation);
-    addFile("IN", "Mesh to read", options->in, command);
-    addOutput("Mesh to write", options->out, command);
-    command.addOption("--amount", options->amount, "Amount of smoothing").between(0, 1000, "0..1000").showDefault();
-    command.addOption("--weights", options->weights, "Scale the moves of points by this attribute")
-        .valueName("ATTRIBUTE");
-    command.addOption("--pin-attribute", options->pins, "Pin the points where this attribute is not 0")
-        .valueName("ATTRIBUTE");
-    command.addFlag("--pin-boundary", options->pinsBoundary, "Pin the points of boundary edges");
-    command
-        .addOption("--pin-sharp", options->sharpDegrees,
-            "Pin the points at edges whose faces have normals that differ by more than this many degrees")
-        .valueName("DEG")
-        .between(0, 180, "0..180");
-    command.addFlag("--drop-isolated", options->dropsIsolated, "Remove points that belong to no face");
-    onSelected(command, invocation, [options](Report& report) { smooth(*options, report); });
+        "  modeling smooth face.ply face.ply --force --weights quality --pin-attribute locked"},
+    .create = createEdit<Smooth>,
+    .keepsFaces = true};
+
+void addSmooth(CommandLine& program, Invocation& invocation)
+{
+    addEditCommand(kSmooth, program, invocation);
 }
 
 }

@@ -1,5 +1,4 @@
-#include "Commands.h"
-#include "Operation.h"
+#include "Edit.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
@@ -33,14 +32,11 @@ namespace {
 
     struct Options {
         std::vector<std::filesystem::path> drawing; // the polygon and the strands
-        std::filesystem::path on;
-        Output out;
         std::string normals = "points";
         unsigned int rotate = 0;
         bool isOpen = false;
         bool flip = false;
         bool allowsFaults = false;
-        bool checkOnly = false;
     };
 
     /// A message of a template, and the element that it is about if that is known.
@@ -155,7 +151,7 @@ namespace {
         // A template has coordinates of its own: --center translates only the mesh.
         ReadOptions const reading = std::exchange(report.reading, {.isLenient = report.reading.isLenient});
         Orvan::MutablePtr<Object> const polygon = loadGeometry(polygonFile, report);
-        requireMesh(*polygon, "stitch", polygonFile);
+        requireType(GeometryType::Mesh, *polygon, "stitch", polygonFile);
         Orvan::MutablePtr<Object> const strands = loadGeometry(strandFile, report);
         report.reading = reading;
         if (typeOf(*strands) != GeometryType::Strands)
@@ -297,95 +293,136 @@ namespace {
         return offsets;
     }
 
-    void requireFits(StitchTemplate const& made, Target const& target, std::filesystem::path const& file)
+    void requireFits(StitchTemplate const& made, Target const& target, std::string const& source)
     {
         if (target.faces.empty() && target.mesh.faceCount() != 0)
             throw Failure(ExitCode::Refused,
-                fmt::format(
-                    "the template has {} corners, but no face of {} has as many", made.getPolySize(), file.string()));
+                fmt::format("the template has {} corners, but no face of {} has as many", made.getPolySize(), source));
         std::uint64_t const mostOfFace = std::max(controlPointCountOf(made), made.getStrands().size);
         if (mostOfFace * target.faces.size >= std::numeric_limits<unsigned int>::max())
             throw Failure(ExitCode::Refused, "there would be more than 4,294,967,295 control points");
     }
 
-    void reportLaying(Object const& mesh, Object const& result, Target const& target, Report& report)
+    class Stitch final : public Edit {
+    public:
+        void declareFiles(Command& command) override;
+        void declareOptions(Command& command) override;
+        void readFiles(Report& report) override { template_ = readTemplate(options_, report); }
+        void run(Subject& subject, Report& report) override;
+        void report(Report& report) override;
+
+        /// Reports whether the template is usable.
+        void reportTemplate(Report& report);
+
+    private:
+        Options options_;
+        std::optional<StitchTemplate> template_;
+        std::uint64_t coveredCount_ = 0, otherCount_ = 0; // faces
+        Json before_, after_;
+        std::vector<std::string> dropped_;
+    };
+
+    void Stitch::declareFiles(Command& command)
     {
-        std::uint64_t const covered = target.faces.size;
-        std::uint64_t const others = target.mesh.faceCount() - covered;
-        report.document["coveredFaces"] = covered;
-        report.document["otherFaces"] = others;
-        report.text += fmt::format("laid on {}; {} a different number of corners\n\n", countOf(covered, "face"),
-            others == 1 ? "1 face has" : groupDigits(others) + " faces have");
-        Json const from = countsOf(mesh), to = countsOf(result);
-        std::vector<std::string> dropped;
-        for (Property const& property : propertiesOf(mesh))
-            if (!property.isStandard)
-                dropped.push_back(property.name);
-        reportOperation({{"faces", from["faces"]}, {"points", from["points"]}, {"strands", Json()}},
-            {{"faces", Json()}, {"points", to["points"]}, {"strands", to["strands"]}}, dropped, report);
+        command.addOption("--template", options_.drawing, "Files of the polygon and of the strands in it")
+            .required()
+            .values(2)
+            .synopsis("POLYGON STRANDS");
     }
 
-    void stitch(Options const& options, Report& report)
+    void Stitch::declareOptions(Command& command)
     {
-        if (options.checkOnly) {
-            StitchTemplate const made = readTemplate(options, report);
-            report.text = fmt::format("{}: {}, {}, {}\n",
-                report.document["template"]["messages"].empty() ? "a usable template" : "a template with faults",
-                countOf(made.getPolySize(), "corner"), countOf(made.getStrands().size, "strand"),
-                countOf(controlPointCountOf(made), "control point"));
-            return;
-        }
-        if (options.on.empty() || options.out.file.empty())
-            throw Failure(ExitCode::CommandLine, "stitch needs --on MESH and OUT, or --check");
-        requireWritable(options.out, GeometryType::Strands);
-        StitchTemplate const made = readTemplate(options, report);
-        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.on, report);
-        requireMesh(*mesh, "stitch", options.on);
-        Target const target = readTarget(*mesh, made.getPolySize(), options.normals == "points");
-        requireFits(made, target, options.on);
+        command.addOption("--normals", options_.normals, "Raise along normals interpolated from points, or of faces")
+            .oneOf({"points", "faces"})
+            .showDefault();
+        command.addOption("--rotate", options_.rotate, "Begin at corner N of each face, counted from 0")
+            .valueName("N")
+            .between(0, std::numeric_limits<unsigned int>::max());
+        command.addFlag("--flip", options_.flip, "Lower where the template raises");
+        command.addFlag("--open", options_.isOpen, "Allow strand ends anywhere, and any number per edge");
+        command.addFlag("--allow-faults", options_.allowsFaults, "Accept a template despite its faults");
+    }
+
+    void Stitch::run(Subject& subject, Report& report)
+    {
+        Object const& mesh = *subject.object;
+        Target const target = readTarget(mesh, template_->getPolySize(), options_.normals == "points");
+        requireFits(*template_, target, subject.name);
 
         LaidStrands laid;
-        runOperation(report, [&] { laid = layOnFaces(made, target, options); });
+        runOperation(report, [&] { laid = layOnFaces(*template_, target, options_); });
         if (laid.flatCount != 0)
             report.warn(fmt::format("{} not raised, because the faces have no normal there",
                 laid.flatCount == 1 ? "1 control point was" : groupDigits(laid.flatCount) + " control points were"));
-        auto const result =
-            Tessara::Geometry::makeStrands(std::move(laid.positions), repeatOffsets(made, target.faces.size));
-        saveGeometry(*result, options.out, report);
-        reportLaying(*mesh, *result, target, report);
+        coveredCount_ = target.faces.size;
+        otherCount_ = target.mesh.faceCount() - coveredCount_;
+        for (Property const& property : propertiesOf(mesh))
+            if (!property.isStandard)
+                dropped_.push_back(property.name);
+        Json const from = countsOf(mesh);
+        subject.object =
+            Tessara::Geometry::makeStrands(std::move(laid.positions), repeatOffsets(*template_, coveredCount_));
+        Json const to = countsOf(*subject.object);
+        before_ = {{"faces", from["faces"]}, {"points", from["points"]}, {"strands", Json()}};
+        after_ = {{"faces", Json()}, {"points", to["points"]}, {"strands", to["strands"]}};
+    }
+
+    void Stitch::report(Report& report)
+    {
+        report.document["coveredFaces"] = coveredCount_;
+        report.document["otherFaces"] = otherCount_;
+        report.text += fmt::format("laid on {}; {} a different number of corners\n\n", countOf(coveredCount_, "face"),
+            otherCount_ == 1 ? "1 face has" : groupDigits(otherCount_) + " faces have");
+        reportOperation(before_, after_, dropped_, report);
+    }
+
+    void Stitch::reportTemplate(Report& report)
+    {
+        readFiles(report);
+        report.text = fmt::format("{}: {}, {}, {}\n",
+            report.document["template"]["messages"].empty() ? "a usable template" : "a template with faults",
+            countOf(template_->getPolySize(), "corner"), countOf(template_->getStrands().size, "strand"),
+            countOf(controlPointCountOf(*template_), "control point"));
     }
 
 }
 
-void addStitch(CommandLine& program, Invocation& invocation)
-{
-    auto const options = std::make_shared<Options>();
-    constexpr CommandHelp kHelp = {"stitch", "Lay a pattern of strands on the faces of a mesh",
+constinit EditKind const kStitch = {
+    .help = {"stitch", "Lay a pattern of strands on the faces of a mesh",
         R"(A template is a polygon in the plane z = 0 (a mesh with one face) and strands drawn in it (the lines of an
 OBJ file). It is laid on every face with as many corners. Heights in units of the mean edge length of the
 polygon are scaled by the mean edge length of the covered faces. Each strand must begin and end on edges of
 the polygon, and each edge must have one or two ends, unless --open. Ends meet if they are placed
 symmetrically on the edges.)",
         "  modeling stitch --check --template quad.obj loop.obj\n"
-        "  modeling stitch --template quad.obj loop.obj --on body.obj knitted.vtp"};
-    Command command = addCommand(kHelp, program, invocation);
-    command.addOption("--template", options->drawing, "Files of the polygon and of the strands in it")
-        .required()
-        .values(2)
-        .synopsis("POLYGON STRANDS");
-    command.addOption("--on", options->on, "Mesh to lay the template on").synopsis("MESH");
-    addOutput("File of strands to write", options->out, command, Needed::Sometimes);
-    command.addOption("--normals", options->normals, "Raise along normals interpolated from points, or of faces")
-        .oneOf({"points", "faces"})
-        .showDefault();
-    command.addOption("--rotate", options->rotate, "Begin at corner N of each face, counted from 0")
-        .valueName("N")
-        .between(0, std::numeric_limits<unsigned int>::max());
-    command.addFlag("--flip", options->flip, "Lower where the template raises");
-    command.addFlag("--open", options->isOpen, "Allow strand ends anywhere, and any number per edge");
-    command.addFlag("--allow-faults", options->allowsFaults, "Accept a template despite its faults");
-    command.addFlag("--check", options->checkOnly, "Only report whether the template is usable");
-    onSelected(command, invocation, [options](Report& report) { stitch(*options, report); });
+        "  modeling stitch --template quad.obj loop.obj --on body.obj knitted.vtp"},
+    .create = createEdit<Stitch>,
+    .gives = GeometryType::Strands};
+
+void addStitch(CommandLine& program, Invocation& invocation)
+{
+    struct Files {
+        std::vector<std::filesystem::path> on{1};
+        Output out;
+        bool checkOnly = false;
+    };
+    auto const files = std::make_shared<Files>();
+    auto const edit = std::make_shared<Stitch>();
+    Command command = addCommand(kStitch.help, program, invocation);
+    edit->declareFiles(command);
+    command.addOption("--on", files->on[0], "Mesh to lay the template on").synopsis("MESH");
+    addOutput("File of strands to write", files->out, command, Needed::Sometimes);
+    edit->declareOptions(command);
+    command.addFlag("--check", files->checkOnly, "Only report whether the template is usable");
+    onSelected(command, invocation, [files, edit](Report& report) {
+        if (files->checkOnly) {
+            edit->reportTemplate(report);
+            return;
+        }
+        if (files->on[0].empty() || files->out.file.empty())
+            throw Failure(ExitCode::CommandLine, "stitch needs --on MESH and OUT, or --check");
+        runOnFiles(kStitch, *edit, files->on, files->out, report);
+    });
 }
 
 }

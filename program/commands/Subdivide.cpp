@@ -1,6 +1,5 @@
-#include "Commands.h"
+#include "Edit.h"
 #include "GuideVolume.h"
-#include "Operation.h"
 #include "geometry/Geometry.h"
 #include "geometry/LargeFaces.h"
 #include "geometry/MeshRequirements.h"
@@ -35,8 +34,6 @@ namespace {
     using Tessara::Object;
 
     struct Options {
-        std::filesystem::path in;
-        Output out;
         std::optional<float> tolerance;
         std::optional<float> relative;
         std::uint64_t maxMemory = 0;
@@ -191,47 +188,91 @@ namespace {
         return dropped;
     }
 
-    void subdivide(Options const& options, MemoryLimit const& limit, Report& report)
-    {
-        requireWritable(options.out, GeometryType::Mesh);
-        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        requireMesh(*mesh, "subdivide", options.in);
-        if (options.triangulates)
-            *mesh = triangulatedAs(inFineUnits(*mesh), "*", *mesh);
-        auto const [topology, shape] = examine(arraysOf(*mesh));
-        requireClosedTriangleMesh(
-            arraysOf(*mesh), topology, faultsOfIsolatedPoints(arraysOf(*mesh), topology), "subdivide", options.in);
+    class Subdivide final : public Edit {
+    public:
+        void declareOptions(Command& command) override;
+        void runLimited(std::function<void()> const& work) override;
+        void run(Subject& subject, Report& report) override;
+        void report(Report& report) override;
 
+    private:
+        std::optional<GuideVolume> readGuide(Object const& mesh, Report& report) const;
+
+        Options options_;
+        MemoryLimit const* limit_ = nullptr; // while it applies
+        float tolerance_ = 0;
+        ShapeChange change_;
+        Json before_, after_;
+        std::vector<std::string> dropped_;
+    };
+
+    void Subdivide::declareOptions(Command& command)
+    {
+        Command size = command.addChoice("Size of faces", "one of these is required");
+        size.addOption("--tolerance", options_.tolerance, "Half the size of the largest face to keep, in model units")
+            .positive();
+        size.addOption("--relative", options_.relative, "The same, as a fraction of the diagonal of the bounding box")
+            .positive();
+        command.addFlag(
+            "--triangulate", options_.triangulates, "Cut faces with more than three corners into triangles first");
+        addGuideOptions(options_.guide, command);
+        addMemoryLimit(options_.maxMemory, command);
+    }
+
+    void Subdivide::runLimited(std::function<void()> const& work)
+    {
+        MemoryLimit const limit(options_.maxMemory);
+        limit_ = &limit;
+        limit.run(work, kAdvice);
+    }
+
+    std::optional<GuideVolume> Subdivide::readGuide(Object const& mesh, Report& report) const
+    {
         std::optional<GuideVolume> guide;
-        if (!options.guide.file.empty())
-            guide.emplace(options.guide, report, &limit).reportCoverage(arraysOf(*mesh), report);
-        float const tolerance = toleranceOf(options, *mesh, guide);
-        Object result = *mesh;
+        if (!options_.guide.file.empty())
+            guide.emplace(options_.guide, report, limit_).reportCoverage(arraysOf(mesh), report);
+        return guide;
+    }
+
+    void Subdivide::run(Subject& subject, Report& report)
+    {
+        Object& mesh = *subject.object;
+        if (options_.triangulates)
+            mesh = triangulatedAs(inFineUnits(mesh), "*", mesh);
+        auto const [topology, shape] = examine(arraysOf(mesh));
+        requireClosedTriangleMesh(
+            arraysOf(mesh), topology, faultsOfIsolatedPoints(arraysOf(mesh), topology), "subdivide", subject.name);
+
+        std::optional<GuideVolume> const guide = readGuide(mesh, report);
+        tolerance_ = toleranceOf(options_, mesh, guide);
+        Object result = mesh;
         std::uint64_t largeFaces = 0;
-        runOperation(report, [&] { largeFaces = refine(guide, tolerance, result); });
+        runOperation(report, [&] { largeFaces = refine(guide, tolerance_, result); });
 
         reportLargeFaces(largeFaces, guide.has_value(), report);
-        std::vector<std::string> const dropped = explainDropped(*mesh, result, report);
+        dropped_ = explainDropped(mesh, result, report);
         auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
-        ShapeChange const change{shape, shapeAfter, largestMove(arraysOf(*mesh), arraysOf(result))};
-        Json before = countsOf(*mesh), after = countsOf(result);
-        addPartsAndGenus(topology, before);
-        addPartsAndGenus(topologyAfter, after);
-        addShape(change, before, after);
-        saveGeometry(result, options.out, report);
-        warnOfShape(change, "Subdivision rounds every edge and corner; it is meant for coarse meshes of smooth shapes.",
-            report);
-        report.document["tolerance"] = numberOf(tolerance);
-        reportOperation(before, after, dropped, report);
+        change_ = {shape, shapeAfter, largestMove(arraysOf(mesh), arraysOf(result))};
+        before_ = countsOf(mesh);
+        after_ = countsOf(result);
+        addPartsAndGenus(topology, before_);
+        addPartsAndGenus(topologyAfter, after_);
+        addShape(change_, before_, after_);
+        mesh = std::move(result);
+    }
+
+    void Subdivide::report(Report& report)
+    {
+        warnOfShape(change_,
+            "Subdivision rounds every edge and corner; it is meant for coarse meshes of smooth shapes.", report);
+        report.document["tolerance"] = numberOf(tolerance_);
+        reportOperation(before_, after_, dropped_, report);
     }
 
 }
 
-void addSubdivide(CommandLine& program, Invocation& invocation)
-{
-    auto const options = std::make_shared<Options>();
-    constexpr CommandHelp kHelp = {"subdivide",
-        "Refine and smooth a closed manifold mesh of triangles where its faces are large",
+constinit EditKind const kSubdivide = {
+    .help = {"subdivide", "Refine and smooth a closed manifold mesh of triangles where its faces are large",
         R"(Adaptive sqrt(3)-subdivision: faces are split until each fits into a box of twice the tolerance along
 every axis. Small faces are kept, except next to large ones. Floating-point values on points (normals too)
 are interpolated; all other properties are dropped, with a warning that says why.
@@ -252,23 +293,12 @@ A face is split in at most 31 successive steps. If it is still too large, a warn
 happens where the values of a volume fall to 0 at a single point.)",
         "  modeling subdivide coarse.obj fine.ply --relative 0.01\n"
         "  modeling subdivide part.stl fine.stl --tolerance 0.25 --max-memory 4GB\n"
-        "  modeling subdivide head.obj fine.obj --relative 0.01 --volume guide.vdb --grid scale"};
-    Command command = addCommand(kHelp, program, invocation);
-    addFile("IN", "Mesh to read", options->in, command);
-    addOutput("Mesh to write", options->out, command);
-    Command size = command.addChoice("Size of faces", "one of these is required");
-    size.addOption("--tolerance", options->tolerance, "Half the size of the largest face to keep, in model units")
-        .positive();
-    size.addOption("--relative", options->relative, "The same, as a fraction of the diagonal of the bounding box")
-        .positive();
-    command.addFlag(
-        "--triangulate", options->triangulates, "Cut faces with more than three corners into triangles first");
-    addGuideOptions(options->guide, command);
-    addMemoryLimit(options->maxMemory, command);
-    onSelected(command, invocation, [options](Report& report) {
-        MemoryLimit const limit(options->maxMemory);
-        limit.run([&] { subdivide(*options, limit, report); }, kAdvice);
-    });
+        "  modeling subdivide head.obj fine.obj --relative 0.01 --volume guide.vdb --grid scale"},
+    .create = createEdit<Subdivide>};
+
+void addSubdivide(CommandLine& program, Invocation& invocation)
+{
+    addEditCommand(kSubdivide, program, invocation);
 }
 
 }

@@ -1,5 +1,4 @@
-#include "Commands.h"
-#include "Operation.h"
+#include "Edit.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
 #include "geometry/Shape.h"
@@ -11,7 +10,6 @@
 #include <fmt/format.h>
 
 #include <algorithm>
-#include <memory>
 
 namespace ModelingProgram {
 
@@ -19,21 +17,40 @@ namespace {
 
     using Tessara::Object;
 
-    struct Options {
-        std::filesystem::path in;
-        Output out;
-        std::string channels = "*";
-        bool keepsUnits = false;
-        bool checksAreas = false;
+    class Triangulate final : public Edit {
+    public:
+        void declareOptions(Command& command) override;
+        void checkOptions() const override;
+        void run(Subject& subject, Report& report) override;
+        void report(Report& report) override;
+
+    private:
+        std::string channels_ = "*";
+        bool keepsUnits_ = false;
+        bool checksAreas_ = false;
+        ShapeChange change_;
+        Json before_, after_;
+        std::vector<std::string> dropped_;
+        std::vector<CutFaces> check_;
     };
+
+    void Triangulate::declareOptions(Command& command)
+    {
+        command.addOption("--channels", channels_, "Which properties of faces and corners to keep")
+            .valueName("LIST")
+            .showDefault();
+        command.addFlag("--keep-units", keepsUnits_, "Measure faces in the units of the file");
+        command.addFlag(
+            "--check", checksAreas_, "Compare the area of each face with that of its triangles, and count the fans");
+    }
 
     constexpr char kSeparators[] = " \t\n\v\f\r,";
 
-    void requireChannels(std::string const& channels)
+    void Triangulate::checkOptions() const
     {
-        if (channels.find_first_not_of(kSeparators) == std::string::npos)
+        if (channels_.find_first_not_of(kSeparators) == std::string::npos)
             throw Failure(ExitCode::CommandLine, "--channels: the list has no entry; \"^*\" keeps no properties");
-        TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels.c_str());
+        TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels_.c_str());
         if (!status)
             throw Failure(ExitCode::CommandLine, fmt::format("--channels: {}", status.message().view()));
     }
@@ -106,44 +123,45 @@ namespace {
                 rows);
     }
 
-    void triangulate(Options const& options, Report& report)
+    void Triangulate::run(Subject& subject, Report& report)
     {
-        requireChannels(options.channels);
-        requireWritable(options.out, GeometryType::Mesh);
-        Orvan::MutablePtr<Object> const mesh = loadGeometry(options.in, report);
-        requireMesh(*mesh, "triangulate", options.in);
-        requireMatches(options.channels, *mesh);
-
-        Object const measured = options.keepsUnits ? *mesh : inFineUnits(*mesh);
+        Object& mesh = *subject.object;
+        requireMatches(channels_, mesh);
+        Object const measured = keepsUnits_ ? mesh : inFineUnits(mesh);
         Object result;
-        runOperation(report, [&] { result = triangulatedAs(measured, options.channels, *mesh); });
+        runOperation(report, [&] { result = triangulatedAs(measured, channels_, mesh); });
 
-        std::vector<std::string> dropped = namesMissingIn(result, *mesh);
+        dropped_ = namesMissingIn(result, mesh);
         for (std::string const& name : dropOutdatedProperties(result)) {
             report.warn(fmt::format("\"{}\" is dropped: values of its type cannot be copied to triangles", name));
-            dropped.push_back(name);
+            dropped_.push_back(name);
         }
         report.document["keptProperties"] = namesOfOtherProperties(result);
-        report.document["channels"] = options.channels;
-        MeshArrays const arrays = arraysOf(*mesh), triangles = arraysOf(result);
+        report.document["channels"] = channels_;
+        MeshArrays const arrays = arraysOf(mesh), triangles = arraysOf(result);
         auto const [topology, shape] = examine(arrays);
         auto const [topologyAfter, shapeAfter] = examine(triangles);
-        ShapeChange const change{shape, shapeAfter, largestMove(arrays, triangles)};
-        Json before = describeMesh(*mesh, topology), after = describeMesh(result, topologyAfter);
-        addShape(change, before, after);
-        saveGeometry(result, options.out, report);
-        warnOfShape(change, "--check shows which faces are not covered by their triangles.", report);
-        reportOperation(before, after, dropped, report);
-        if (options.checksAreas)
-            reportCheck(checkTriangulation(arraysOf(measured), arraysOf(result)), report);
+        change_ = {shape, shapeAfter, largestMove(arrays, triangles)};
+        before_ = describeMesh(mesh, topology);
+        after_ = describeMesh(result, topologyAfter);
+        addShape(change_, before_, after_);
+        if (checksAreas_)
+            check_ = checkTriangulation(arraysOf(measured), triangles);
+        mesh = std::move(result);
+    }
+
+    void Triangulate::report(Report& report)
+    {
+        warnOfShape(change_, "--check shows which faces are not covered by their triangles.", report);
+        reportOperation(before_, after_, dropped_, report);
+        if (checksAreas_)
+            reportCheck(check_, report);
     }
 
 }
 
-void addTriangulate(CommandLine& program, Invocation& invocation)
-{
-    auto const options = std::make_shared<Options>();
-    constexpr CommandHelp kHelp = {"triangulate", "Cut the faces of a mesh into triangles",
+constinit EditKind const kTriangulate = {
+    .help = {"triangulate", "Cut the faces of a mesh into triangles",
         R"(Each face with n corners becomes n - 2 triangles between its own corners; faces may be concave.
 No point is added, moved or removed. Faces that intersect themselves, have two equal consecutive
 corners or almost no area become a fan from their first corner. The limit for the area is 5e-5 square
@@ -155,17 +173,12 @@ commas: * stands for any characters, ? for one, and a leading ^ or - excludes. T
 matches a name decides. "*" keeps all, "^*" none, "* ^tmp*" all except those that begin with tmp, "uv N"
 these two. Names and including patterns must match a property. Properties of points are kept.)",
         "  modeling triangulate quads.obj triangles.ply\n"
-        "  modeling triangulate cad.obj cad.stl --channels \"^*\" --check"};
-    Command command = addCommand(kHelp, program, invocation);
-    addFile("IN", "Mesh to read", options->in, command);
-    addOutput("Mesh to write", options->out, command);
-    command.addOption("--channels", options->channels, "Which properties of faces and corners to keep")
-        .valueName("LIST")
-        .showDefault();
-    command.addFlag("--keep-units", options->keepsUnits, "Measure faces in the units of the file");
-    command.addFlag("--check", options->checksAreas,
-        "Compare the area of each face with that of its triangles, and count the fans");
-    onSelected(command, invocation, [options](Report& report) { triangulate(*options, report); });
+        "  modeling triangulate cad.obj cad.stl --channels \"^*\" --check"},
+    .create = createEdit<Triangulate>};
+
+void addTriangulate(CommandLine& program, Invocation& invocation)
+{
+    addEditCommand(kTriangulate, program, invocation);
 }
 
 }

@@ -19,7 +19,7 @@ namespace {
     void validateFile(std::filesystem::path const& file, Report& report)
     {
         // Loading throws if the object is invalid.
-        Orvan::MutablePtr<Tessara::Object> const object = loadGeometry(file, report);
+        Orvan::MutablePtr<Tessara::Object> const object = loadInput(file, report);
         for (Orvan::String const& sentence : Tessara::Geometry::reportProperties(*object))
             report.warn(std::string(sentence.view()));
         Json const counts = countsOf(*object);

@@ -1,8 +1,8 @@
 #include "MeshRequirements.h"
 
-#include "Geometry.h"
 #include "shell/Failure.h"
 #include "shell/Report.h"
+#include "shell/Suggestion.h"
 
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Elements.h>
@@ -10,6 +10,8 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
+#include <initializer_list>
 #include <optional>
 #include <type_traits>
 
@@ -45,29 +47,138 @@ namespace {
                                    coincident == 1 ? "1 point is" : groupDigits(coincident) + " points are"));
     }
 
+    using Faults = std::vector<std::string>;
+
+    Faults faultsOfBoundary(MeshArrays const& mesh, MeshTopology const& topology)
+    {
+        return topology.boundaryEdges ? Faults{describeBoundaryEdges(mesh, topology)} : Faults();
+    }
+
+    Faults faultsOfEdges(MeshArrays const& mesh, MeshTopology const& topology)
+    {
+        Finding const& edges = topology.nonManifoldEdges;
+        if (!edges)
+            return {};
+        return {fmt::format("More than two faces meet at {}. The first is the {}. Separate the sheets or solids "
+                            "that meet there.",
+            countOf(edges.count, "edge"), describeEdge(mesh, edges.first))};
+    }
+
+    Faults faultsOfOrientation(MeshArrays const& mesh, MeshTopology const& topology)
+    {
+        Finding const& edges = topology.flippedEdges;
+        if (!edges)
+            return {};
+        return {fmt::format("At {} neighboring faces have opposite orientations. The first is the {}. Flip faces "
+                            "until all normals point outward.",
+            countOf(edges.count, "edge"), describeEdge(mesh, edges.first))};
+    }
+
+    Faults faultsOfPoints(MeshArrays const& mesh, MeshTopology const& topology)
+    {
+        Finding const& points = topology.nonManifoldPoints;
+        if (!points)
+            return {};
+        return {fmt::format("The surface is non-manifold at {}: some faces there share only the point. The first "
+                            "is {}. Give each sheet its own point.",
+            countOf(points.count, "point"), describePoint(mesh, points.first))};
+    }
+
+    using FindFaults = Faults (*)(MeshArrays const&, MeshTopology const&);
+
+    Faults allFaults(std::initializer_list<FindFaults> kinds, MeshArrays const& mesh, MeshTopology const& topology)
+    {
+        Faults faults;
+        for (FindFaults const find : kinds)
+            for (std::string& fault : find(mesh, topology))
+                faults.push_back(std::move(fault));
+        return faults;
+    }
+
+    /// A type, or a property of meshes.
+    struct Requirement {
+        char const* name;
+        GeometryType type;
+        FindFaults faults; // null for a type
+    };
+
+    constexpr Requirement kRequirements[] = {
+        {"mesh", GeometryType::Mesh, nullptr},
+        {"point-cloud", GeometryType::PointCloud, nullptr},
+        {"strands", GeometryType::Strands, nullptr},
+        {"closed", GeometryType::Mesh, faultsOfBoundary},
+        {"manifold", GeometryType::Mesh,
+            [](MeshArrays const& mesh, MeshTopology const& topology) {
+                return allFaults({faultsOfEdges, faultsOfPoints}, mesh, topology);
+            }},
+        {"oriented", GeometryType::Mesh, faultsOfOrientation},
+        {"triangles", GeometryType::Mesh, faultsOfTriangles},
+        {"no-isolated-points", GeometryType::Mesh, faultsOfIsolatedPoints},
+    };
+
+}
+
+std::vector<std::string> requirementNames()
+{
+    std::vector<std::string> names;
+    for (Requirement const& requirement : kRequirements)
+        names.emplace_back(requirement.name);
+    return names;
+}
+
+std::vector<std::string> parseRequirements(std::string const& list)
+{
+    std::vector<std::string> names;
+    std::vector<std::string> const known = requirementNames();
+    for (std::size_t start = 0; start < list.size();) {
+        std::size_t const end = std::min(list.find(',', start), list.size());
+        std::string const name = list.substr(start, end - start);
+        if (std::find(known.begin(), known.end(), name) == known.end())
+            throw Failure(ExitCode::CommandLine,
+                fmt::format("--require: nothing is called \"{}\"{}. There are: {}", name, suggestionFor(name, known),
+                    listOf(known)));
+        names.push_back(name);
+        start = end + 1;
+    }
+    return names;
+}
+
+void requireProperties(
+    std::vector<std::string> const& requirements, Tessara::Object const& object, std::string const& source)
+{
+    if (requirements.empty() || Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
+        return;
+    std::optional<MeshTopology> topology;
+    std::vector<std::string> missing;
+    Faults reasons;
+    for (Requirement const& requirement : kRequirements) {
+        if (std::find(requirements.begin(), requirements.end(), requirement.name) == requirements.end())
+            continue;
+        Faults faults;
+        if (typeOf(object) != requirement.type)
+            faults.push_back(fmt::format("It contains a {}.", nameOf(typeOf(object))));
+        else if (requirement.faults) {
+            MeshArrays const mesh = arraysOf(object);
+            if (!topology)
+                topology = analyzeTopology(mesh);
+            faults = requirement.faults(mesh, *topology);
+        }
+        if (!faults.empty())
+            missing.emplace_back(requirement.name);
+        for (std::string& fault : faults)
+            if (std::find(reasons.begin(), reasons.end(), fault) == reasons.end())
+                reasons.push_back(std::move(fault));
+    }
+    if (!missing.empty())
+        throw Failure(ExitCode::Refused,
+            fmt::format("{} does not meet --require {} (points and faces are counted from 0):", source,
+                fmt::join(missing, ",")),
+            std::move(reasons));
 }
 
 std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopology const& topology)
 {
-    std::vector<std::string> faults;
-    if (topology.boundaryEdges)
-        faults.push_back(describeBoundaryEdges(mesh, topology));
-    if (Finding const& edges = topology.nonManifoldEdges)
-        faults.push_back(
-            fmt::format("More than two faces meet at {}. The first is the {}. Separate the sheets or solids "
-                        "that meet there.",
-                countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
-    if (Finding const& edges = topology.flippedEdges)
-        faults.push_back(
-            fmt::format("At {} neighboring faces have opposite orientations. The first is the {}. Flip faces "
-                        "until all normals point outward.",
-                countOf(edges.count, "edge"), describeEdge(mesh, edges.first)));
-    if (Finding const& points = topology.nonManifoldPoints)
-        faults.push_back(
-            fmt::format("The surface is non-manifold at {}: some faces there share only the point. The first "
-                        "is {}. Give each sheet its own point.",
-                countOf(points.count, "point"), describePoint(mesh, points.first)));
-    return faults;
+    return allFaults({faultsOfBoundary, faultsOfEdges, faultsOfOrientation, faultsOfPoints}, mesh, topology);
 }
 
 std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology const& topology)
@@ -99,17 +210,17 @@ std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopo
     return faults;
 }
 
-void requireMesh(Tessara::Object& object, char const* command, std::filesystem::path const& file)
+void requireType(GeometryType type, Tessara::Object& object, char const* command, std::string const& source)
 {
     if (Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
-        makeEmpty(GeometryType::Mesh, object);
-    if (typeOf(object) != GeometryType::Mesh)
+        makeEmpty(type, object);
+    if (typeOf(object) != type)
         throw Failure(ExitCode::Refused,
-            fmt::format("{} needs a mesh, but {} contains a {}", command, file.string(), nameOf(typeOf(object))));
+            fmt::format("{} needs a {}, but {} contains a {}", command, nameOf(type), source, nameOf(typeOf(object))));
 }
 
 void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
-    std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file)
+    std::vector<std::string> furtherFaults, char const* command, std::string const& source)
 {
     std::vector<std::string> reasons = faultsOfTriangles(mesh, topology);
     for (std::string& reason : faultsOfClosedManifold(mesh, topology))
@@ -120,12 +231,12 @@ void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topol
         throw Failure(ExitCode::Refused,
             fmt::format("{} needs a closed manifold mesh of triangles, which {} does not contain "
                         "(points and faces are counted from 0):",
-                command, file.string()),
+                command, source),
             std::move(reasons));
 }
 
 std::vector<float> pointNumbers(
-    char const* option, std::string const& name, Tessara::Object const& mesh, std::filesystem::path const& file)
+    char const* option, std::string const& name, Tessara::Object const& mesh, std::string const& source)
 {
     using namespace Tessara::Geometry;
     unsigned int const pointCount = arraysOf(mesh).pointCount();
@@ -150,8 +261,8 @@ std::vector<float> pointNumbers(
     for (Property const& property : propertiesOf(mesh))
         visitNumbers(property.name, [&](auto const&) { present.push_back(property.name); });
     throw Failure(ExitCode::Refused,
-        fmt::format("{}: {} has no attribute \"{}\" with one number per point. There are: {}", option, file.string(),
-            name, listOf(present)));
+        fmt::format("{}: {} has no attribute \"{}\" with one number per point. There are: {}", option, source, name,
+            listOf(present)));
 }
 
 }

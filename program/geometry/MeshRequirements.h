@@ -1,8 +1,8 @@
 #pragma once
 
+#include "Geometry.h"
 #include "MeshTopology.h"
 
-#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -20,16 +20,26 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
 /// Isolated points, which smoothing operations cannot handle.
 std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopology const& topology);
 
-/// Refuses an object that is not a mesh, on behalf of `command`. An object without points becomes an empty mesh.
-void requireMesh(Tessara::Object& object, char const* command, std::filesystem::path const& file);
+/// What the user can require of geometry: types, and properties of meshes.
+std::vector<std::string> requirementNames();
+/// Splits a list such as "closed,triangles".
+/// \throws Failure  if a name is unknown
+std::vector<std::string> parseRequirements(std::string const& list);
+/// Refuses geometry that does not meet all of these. Without points it meets any.
+void requireProperties(
+    std::vector<std::string> const& requirements, Tessara::Object const& object, std::string const& source);
+
+/// Refuses an object of another type, on behalf of `command`. An object without points becomes an empty one of this type.
+/// \param source  where the object comes from, here and below: a file in most cases
+void requireType(GeometryType type, Tessara::Object& object, char const* command, std::string const& source);
 /// Refuses a mesh that is not a closed manifold of triangles or has `furtherFaults`, and lists all faults.
 void requireClosedTriangleMesh(MeshArrays const& mesh, MeshTopology const& topology,
-    std::vector<std::string> furtherFaults, char const* command, std::filesystem::path const& file);
+    std::vector<std::string> furtherFaults, char const* command, std::string const& source);
 
 /// One number per point, from a property of any scalar type. Refuses a mesh without this property, and lists the
 /// properties that would do. Empty if the mesh has no points.
 /// \param option  the command line option that names the property; start of the message
 std::vector<float> pointNumbers(
-    char const* option, std::string const& name, Tessara::Object const& mesh, std::filesystem::path const& file);
+    char const* option, std::string const& name, Tessara::Object const& mesh, std::string const& source);
 
 }

@@ -1,7 +1,7 @@
 #include "CommandLine.h"
 
 #include "Failure.h"
-#include "Report.h"
+#include "Suggestion.h"
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
@@ -56,6 +56,9 @@ namespace {
     template <class T> struct ValueOf<std::vector<T>> : ValueOf<T> {
     };
 
+    template <class T> constexpr bool kIsList = false;
+    template <class T> constexpr bool kIsList<std::vector<T>> = true;
+
     /// Says why a text is not a value of the type; empty if it is one.
     template <class T> std::string faultIn(std::string const& text)
     {
@@ -73,48 +76,19 @@ namespace {
         return {};
     }
 
+    template <class T> constexpr ValueKind kindOf()
+    {
+        if constexpr (std::is_integral_v<T>)
+            return ValueKind::Integer;
+        else if constexpr (std::is_floating_point_v<T>)
+            return ValueKind::Number;
+        else
+            return std::is_same_v<T, std::filesystem::path> ? ValueKind::File : ValueKind::Text;
+    }
+
     bool isOption(std::string const& argument)
     {
         return argument.size() > 1 && argument[0] == '-' && std::isnan(numberIn(argument));
-    }
-
-    /// The number of insertions, deletions, substitutions and swaps of adjacent characters that turn one text into the
-    /// other (optimal string alignment distance).
-    std::size_t editDistance(std::string const& a, std::string const& b)
-    {
-        std::vector<std::vector<std::size_t>> distance(a.size() + 1, std::vector<std::size_t>(b.size() + 1));
-        for (std::size_t i = 0; i <= a.size(); ++i) {
-            for (std::size_t j = 0; j <= b.size(); ++j) {
-                std::size_t& least = distance[i][j];
-                least = std::max(i, j);
-                if (i == 0 || j == 0)
-                    continue;
-                bool const isEqual = a[i - 1] == b[j - 1];
-                least = std::min(
-                    {distance[i - 1][j] + 1, distance[i][j - 1] + 1, distance[i - 1][j - 1] + (isEqual ? 0u : 1u)});
-                if (i > 1 && j > 1 && a[i - 1] == b[j - 2] && a[i - 2] == b[j - 1])
-                    least = std::min(least, distance[i - 2][j - 2] + 1);
-            }
-        }
-        return distance[a.size()][b.size()];
-    }
-
-    /// "; did you mean ...?" with the most similar name; empty if no name is similar.
-    std::string suggestionFor(std::string const& text, std::vector<std::string> const& names)
-    {
-        constexpr std::size_t kLongestName = 40; // also bounds the time that a long argument takes
-        if (text.size() > kLongestName)
-            return {};
-        std::string const* best = nullptr;
-        std::size_t bestDistance = 1 + (text.size() + 1) / 3;
-        for (std::string const& name : names) {
-            std::size_t const distance = name.starts_with(text) && text.size() > 2 ? 0 : editDistance(text, name);
-            if (distance < bestDistance) {
-                best = &name;
-                bestDistance = distance;
-            }
-        }
-        return best ? fmt::format("; did you mean {}?", *best) : std::string();
     }
 
     /// The options of a command and of its groups.
@@ -136,7 +110,7 @@ namespace {
         return names;
     }
 
-    /// The options of a group, except its own --help.
+    /// The options of a command or group itself, except its --help.
     std::vector<CLI::Option const*> choicesOf(CLI::App const& group)
     {
         return group.get_options([&](CLI::Option const* option) { return option != group.get_help_ptr(); });
@@ -247,14 +221,15 @@ namespace {
     };
 
     /// The arguments in their order, without the name of the program.
-    Arguments argumentsOf(int count, char const* const* arguments)
+    Arguments argumentsOf(std::vector<std::string> arguments)
     {
         Arguments result;
-        for (int i = 1; i < count; ++i) {
-            std::string argument = arguments[i];
+        int position = 0;
+        for (std::string& argument : arguments) {
+            ++position;
             if (argument.empty() || (argument.starts_with("--") && argument.ends_with('='))) {
                 argument += kEmpty;
-                result.firstEmpty = result.firstEmpty == 0 ? i : result.firstEmpty;
+                result.firstEmpty = result.firstEmpty == 0 ? position : result.firstEmpty;
             }
             if (argument.starts_with("-.") && !std::isnan(numberIn(argument)))
                 argument.insert(1, "0"); // the parser takes -.5 for an option, but not -0.5
@@ -310,17 +285,6 @@ namespace {
         return result;
     }
 
-    /// Prints the help or the version, which the parser reports as an error. \return the exit code
-    int printHelp(CLI::App const& program, CLI::ParseError const& error)
-    {
-        std::ostringstream text;
-        program.exit(error, text, text);
-        if (writeToStandardOutput(text.str()))
-            return static_cast<int>(ExitCode::Done);
-        std::fprintf(stderr, "%s: %s\n", program.get_name().c_str(), kCannotWriteOutput);
-        return static_cast<int>(ExitCode::File);
-    }
-
     /// Keeps the help within the width of a terminal.
     class HelpFormatter : public CLI::Formatter {
     public:
@@ -348,6 +312,26 @@ namespace {
         }
     };
 
+    OptionDescription describeOption(CLI::Option const& option, OptionDescription declared, int group)
+    {
+        auto const plain = [](CLI::Option const& named) {
+            return named.nonpositional() ? named.get_lnames()[0] : CLI::detail::to_lower(named.get_name(true, false));
+        };
+        declared.name = plain(option);
+        declared.shortName = option.get_snames().empty() ? "" : option.get_snames()[0];
+        declared.isPositional = !option.nonpositional();
+        declared.isRequired = option.get_required();
+        declared.defaultValue = option.get_default_str();
+        declared.synopsis = CLI::detail::trim_copy(HelpFormatter().make_option_opts(&option));
+        declared.description = option.get_description();
+        for (CLI::Option const* needed : option.get_needs())
+            declared.needs.push_back(plain(*needed));
+        std::sort(declared.needs.begin(), declared.needs.end());
+        declared.group = group;
+        declared.given = option.results();
+        return declared;
+    }
+
 }
 
 Option& Option::required()
@@ -359,6 +343,7 @@ Option& Option::required()
 Option& Option::values(int count)
 {
     option_->expected(count)->allow_extra_args(false);
+    declared_->count = static_cast<std::size_t>(count);
     return *this;
 }
 
@@ -380,6 +365,12 @@ Option& Option::showDefault()
     return *this;
 }
 
+Option& Option::common()
+{
+    declared_->isCommon = true;
+    return *this;
+}
+
 Option& Option::needs(Option const& other)
 {
     option_->needs(other.option_);
@@ -394,6 +385,8 @@ Option& Option::excludes(Option const& other)
 
 Option& Option::between(double least, double most, char const* shown)
 {
+    declared_->least = least;
+    declared_->most = most;
     option_->check(CLI::Validator(
         [=](std::string const& text) {
             double const number = numberIn(text);
@@ -407,6 +400,7 @@ Option& Option::between(double least, double most, char const* shown)
 
 Option& Option::positive()
 {
+    declared_->isPositive = true;
     option_->check(CLI::Validator(
         [](std::string const& text) {
             auto const number = static_cast<float>(numberIn(text));
@@ -418,12 +412,14 @@ Option& Option::positive()
 
 Option& Option::oneOf(std::vector<std::string> const& texts)
 {
+    declared_->choices = texts;
     option_->check(CLI::IsMember(texts));
     return *this;
 }
 
 Option& Option::bytes()
 {
+    declared_->kind = ValueKind::Size;
     option_->transform(CLI::Validator(
         [](std::string& text) {
             std::optional<std::uint64_t> const bytes = bytesIn(text);
@@ -447,7 +443,10 @@ template <class T> Option Command::addOption(char const* name, T& value, std::st
 {
     CLI::Option& option = *app_->add_option(name, value, description);
     option.check(CLI::Validator([](std::string const& text) { return faultIn<typename ValueOf<T>::Type>(text); }, ""));
-    return Option(option);
+    OptionDescription& declared = (*declarations_)[&option];
+    declared.kind = kindOf<typename ValueOf<T>::Type>();
+    declared.count = kIsList<T> ? 0 : 1;
+    return Option(option, declared);
 }
 
 template Option Command::addOption(char const*, double&, std::string const&);
@@ -465,14 +464,15 @@ template Option Command::addOption(char const*, std::vector<std::filesystem::pat
 
 Option Command::addFlag(char const* names, bool& isSet, char const* description)
 {
-    return Option(*app_->add_flag(names, isSet, description));
+    CLI::Option& option = *app_->add_flag(names, isSet, description);
+    return Option(option, (*declarations_)[&option]);
 }
 
 Command Command::addChoice(char const* title, std::string const& description)
 {
     CLI::App& choice = *app_->add_option_group(title, description);
     choice.require_option(1);
-    return Command(choice);
+    return Command(choice, *declarations_);
 }
 
 void Command::onSelected(std::function<void()> run)
@@ -482,6 +482,7 @@ void Command::onSelected(std::function<void()> run)
 
 CommandLine::CommandLine(char const* name, char const* version, char const* description, char const* footer)
     : app_(std::make_unique<CLI::App>(description, name))
+    , declarations_(std::make_unique<Declarations>())
 {
     app_->set_version_flag("--version", version, "Print the version and exit");
     app_->set_help_flag("-h,--help", "Print this help and exit");
@@ -490,6 +491,7 @@ CommandLine::CommandLine(char const* name, char const* version, char const* desc
     app_->formatter(std::make_shared<HelpFormatter>());
 }
 
+CommandLine::CommandLine(CommandLine&&) noexcept = default;
 CommandLine::~CommandLine() = default;
 
 Command CommandLine::addCommand(CommandHelp const& help)
@@ -497,30 +499,71 @@ Command CommandLine::addCommand(CommandHelp const& help)
     CLI::App& command = *app_->add_subcommand(help.name, help.summary);
     command.set_help_flag("-h,--help", "Print this help and exit");
     command.footer(fmt::format("{}\n\nExamples:\n{}", reflowed(help.details), help.examples));
-    return Command(command);
+    helps_.emplace(help.name, help);
+    return Command(command, *declarations_);
 }
 
-std::optional<int> CommandLine::parse(int argumentCount, char const* const* arguments)
+CommandLine::Parsed CommandLine::parse(std::vector<std::string> arguments)
 {
-    std::string mistake;
-    Arguments given = argumentsOf(argumentCount, arguments);
+    Parsed result;
+    Arguments given = argumentsOf(std::move(arguments));
     std::reverse(given.texts.begin(), given.texts.end()); // the parser expects them in reverse order
     try {
         app_->parse(std::move(given.texts));
-        if (given.firstEmpty == 0)
-            return std::nullopt;
     } catch (CLI::ParseError const& error) {
-        if (given.firstEmpty == 0 && error.get_exit_code() == 0)
-            return printHelp(*app_, error);
-        mistake = describeMistake(error, *app_);
+        if (error.get_exit_code() != 0)
+            result.mistake = describeMistake(error, *app_);
+        else {
+            std::ostringstream text; // the parser reports help and version as an error
+            app_->exit(error, text, text);
+            result.help = text.str();
+        }
     }
     if (given.firstEmpty != 0)
-        mistake = describeEmpty(given.firstEmpty, *app_);
-    std::vector<CLI::App*> const commands = app_->get_subcommands();
-    std::string const help = app_->get_name() + (commands.empty() ? "" : " " + commands[0]->get_name()) + " --help";
-    std::fprintf(
-        stderr, "%s: %s\nRun \"%s\" for more information.\n", app_->get_name().c_str(), mistake.c_str(), help.c_str());
-    return static_cast<int>(ExitCode::CommandLine);
+        result.mistake = describeEmpty(given.firstEmpty, *app_);
+    for (CLI::App const* command : app_->get_subcommands())
+        result.command = command->get_name();
+    return result;
+}
+
+std::string CommandLine::helpOf(std::string const& command) const
+{
+    auto const help = [&](CLI::App const& app, std::string const& path) {
+        return app.get_formatter()->make_help(&app, path, CLI::AppFormatMode::Normal);
+    };
+    if (command.empty())
+        return help(*app_, app_->get_name());
+    std::vector<std::string> names;
+    for (CLI::App const* known : app_->get_subcommands([](CLI::App const*) { return true; })) {
+        if (known->get_name() == command)
+            return help(*known, app_->get_name() + " " + command);
+        names.push_back(known->get_name());
+    }
+    throw Failure(
+        ExitCode::CommandLine, fmt::format("there is no command {}{}", command, suggestionFor(command, names)));
+}
+
+ProgramDescription CommandLine::describe() const
+{
+    ProgramDescription program{app_->get_name(), app_->version(), app_->get_description(), app_->get_footer(), {}};
+    for (CLI::App const* command : app_->get_subcommands([](CLI::App const*) { return true; }))
+        program.commands.push_back(describe(*command));
+    return program;
+}
+
+CommandDescription CommandLine::describe(CLI::App const& command) const
+{
+    CommandHelp const& help = helps_.at(command.get_name());
+    CommandDescription result{help.name, help.summary, help.details, help.examples, {}};
+    auto const addOptions = [&](CLI::App const& app, int group) {
+        for (CLI::Option const* option : choicesOf(app))
+            result.options.push_back(describeOption(*option, declarations_->at(option), group));
+    };
+    addOptions(command, -1);
+    int group = 0;
+    for (CLI::App const* sub : command.get_subcommands([](CLI::App const* sub) { return sub->get_name().empty(); }))
+        addOptions(*sub, group++);
+    return result;
 }
 
 }

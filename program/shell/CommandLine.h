@@ -1,6 +1,7 @@
 #pragma once
 
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -15,11 +16,51 @@ class Option;
 
 namespace ModelingProgram {
 
+enum class ValueKind { Flag, Integer, Number, Size, Text, File }; // a size is in bytes, optionally with a unit
+
+/// An option or positional argument as it was declared.
+struct OptionDescription {
+    std::string name; // without dashes; that of a positional argument in lower case
+    std::string shortName; // without dash; mostly empty
+    bool isPositional = false;
+    bool isRequired = false;
+    ValueKind kind = ValueKind::Flag;
+    std::size_t count = 1; // of its values; 0 for any number
+    bool isPositive = false;
+    std::optional<double> least, most;
+    std::vector<std::string> choices; // the only values, if there are any
+    std::string defaultValue; // if the help shows it
+    std::string synopsis; // of its values, as in the help
+    std::string description;
+    std::vector<std::string> needs; // names of options
+    bool isCommon = false; // every command has it
+    int group = -1; // the number of the group of which exactly one option is required
+    std::vector<std::string> given; // the values on the command line, after parsing
+};
+
+struct CommandDescription {
+    std::string name;
+    std::string summary;
+    std::string details;
+    std::string examples;
+    std::vector<OptionDescription> options; // positional arguments too
+};
+
+/// Everything that --help says.
+struct ProgramDescription {
+    std::string name;
+    std::string version;
+    std::string description;
+    std::string footer;
+    std::vector<CommandDescription> commands;
+};
+
 /// An option of a command. Each function adds one property and can be chained.
 class Option {
 public:
-    explicit Option(CLI::Option& option)
+    Option(CLI::Option& option, OptionDescription& declared)
         : option_(&option)
+        , declared_(&declared)
     {
     }
 
@@ -32,6 +73,9 @@ public:
     Option& synopsis(char const* text);
     /// Shows the current value of the variable as the default in the help.
     Option& showDefault();
+
+    /// Says that every command has this option.
+    Option& common();
 
     Option& needs(Option const& other);
     Option& excludes(Option const& other);
@@ -47,13 +91,17 @@ public:
 
 private:
     CLI::Option* option_;
+    OptionDescription* declared_; // what cannot be asked of the option
 };
+
+using Declarations = std::map<CLI::Option const*, OptionDescription>;
 
 /// A command, or a group of alternative options in it.
 class Command {
 public:
-    explicit Command(CLI::App& app)
+    Command(CLI::App& app, Declarations& declarations)
         : app_(&app)
+        , declarations_(&declarations)
     {
     }
 
@@ -69,6 +117,7 @@ public:
 
 private:
     CLI::App* app_;
+    Declarations* declarations_;
 };
 
 struct CommandHelp {
@@ -81,16 +130,32 @@ struct CommandHelp {
 class CommandLine {
 public:
     CommandLine(char const* name, char const* version, char const* description, char const* footer);
+    CommandLine(CommandLine&&) noexcept;
     ~CommandLine();
 
     Command addCommand(CommandHelp const& help);
 
+    struct Parsed {
+        std::string command; // the selected one, if it is known
+        std::string mistake; // why the arguments are wrong; empty if they are not
+        std::string help; // to be printed instead of running the command, if the arguments ask for it
+    };
+
     /// Sets the variables of the options and calls the function registered for the selected command.
-    /// \return the exit code if nothing else is to be done: help was printed, or the command line is wrong
-    std::optional<int> parse(int argumentCount, char const* const* arguments);
+    /// \param arguments  without the name of the program
+    Parsed parse(std::vector<std::string> arguments);
+
+    ProgramDescription describe() const;
+    /// What `modeling COMMAND --help` prints, or `modeling --help` if the name is empty.
+    /// \throws Failure  if there is no such command
+    std::string helpOf(std::string const& command) const;
 
 private:
+    CommandDescription describe(CLI::App const& command) const;
+
     std::unique_ptr<CLI::App> app_;
+    std::map<std::string, CommandHelp> helps_;
+    std::unique_ptr<Declarations> declarations_;
 };
 
 }

@@ -15,7 +15,8 @@ enum class ExitCode {
     Invalid = 4,
     Refused = 5,
     Cancelled = 6,
-    OutOfMemory = 7
+    OutOfMemory = 7,
+    Warned = 8
 };
 
 /// Ends a command with a sentence for the user. The reasons, if any, are printed below it, one per line.

@@ -64,10 +64,25 @@ Report::Report(std::string const& command)
     document["warnings"] = Json::array();
 }
 
+Report Report::ofStep(std::size_t number, std::string const& name) const
+{
+    Report report;
+    report.document = {{"step", number}, {"do", name}, {"warnings", Json::array()}};
+    report.isJson = isJson;
+    report.prefix_ = fmt::format("step {} ({}): ", number, name);
+    return report;
+}
+
 void Report::warn(std::string const& sentence)
 {
+    hasWarned = true;
+    warnOfInput(sentence);
+}
+
+void Report::warnOfInput(std::string const& sentence)
+{
     document["warnings"].push_back(sentence);
-    std::fputs(fmt::format("modeling: warning: {}\n", sentence).c_str(), stderr);
+    std::fputs(fmt::format("modeling: warning: {}{}\n", prefix_, sentence).c_str(), stderr);
 }
 
 std::string toText(Json const& document)

@@ -19,11 +19,26 @@ class Report {
 public:
     explicit Report(std::string const& command);
 
+    /// A report of a step of this command. Its warnings begin with the step.
+    Report ofStep(std::size_t number, std::string const& name) const;
+
     void warn(std::string const& sentence);
+    /// A warning that is about an input file only, which --strict accepts.
+    void warnOfInput(std::string const& sentence);
 
     Json document; // what --json prints
+    std::vector<Json> lines; // if there are any, --json prints these documents instead, one per line
     std::string text; // what is printed without --json
+    bool isJson = false; // standard output is reserved for the document
+    bool hasWarned = false; // about the result
+    int exitCode = 0; // if the command does not fail
+    std::vector<std::string> requirements; // what inputs have to be, as `parseRequirements` returns it
     ReadOptions reading; // of all files; the first file read determines the center to subtract
+
+private:
+    Report() = default;
+
+    std::string prefix_; // of warnings
 };
 
 /// The document as it is printed. Invalid UTF-8, which names in files may contain, becomes replacement characters.

@@ -11,6 +11,7 @@
 #include <array>
 #include <filesystem>
 #include <iterator>
+#include <regex>
 #include <sstream>
 
 namespace ModelingProgram {
@@ -42,8 +43,11 @@ namespace {
         return {std::istream_iterator<std::string>(stream), {}};
     }
 
-    std::vector<std::string> const kCommands = {"info", "validate", "add-points", "delete-points", "delete-faces",
-        "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch"};
+    std::vector<std::string> const kCommands = {"info", "validate", "convert", "add-points", "delete-points",
+        "delete-faces", "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch",
+        "run"};
+    // They read no files.
+    std::vector<std::string> const kHelpers = {"help", "completion", "man"};
 
 }
 
@@ -54,9 +58,9 @@ TEST(CommandLine, SurvivesArbitraryArguments)
         "--json=", "-f", "--threads", "2", "-1", "-.5", "1e999", "nan", "--indices", "--box", "--attribute", "--invert",
         "--tag", "-o", "--output=", "--source-attribute", "--channels", "--channels=", "--amount", "--weights",
         "--pin-attribute", "--ratio", "--tolerance", "--relative", "--volume", "--grid", "--max-memory", "4GB", "9QB",
-        "--distance-to", "--from", "--to", "--voxels", "--band", "--template", "--on", "--check", "--rotate", "--wrong",
-        "-", "--", "--=", "-=", "---", "[]", "{}", "[a,b]", "%%", "=", "\"", "'", " ", "\n", "\xff", "info", "--help",
-        "--version"};
+        "--distance-to", "--from", "--to", "--voxels", "--band", "--template", "--on", "--check", "--rotate", "--do",
+        "smooth; merge", "--recipe", "--print-recipe", "--wrong", "-", "--", "--=", "-=", "---", "[]", "{}", "[a,b]",
+        "%%", "=", "\"", "'", " ", "\n", "\xff", "info", "--help", "--version"};
     TestSupport::Random random(1);
     for (int i = 0; i != 2000; ++i) {
         std::vector<std::string> line;
@@ -151,8 +155,9 @@ TEST(CommandLine, AcceptsDecimalAmountsOfMemory)
 TEST(CommandLine, HelpFitsATerminal)
 {
     std::vector<std::vector<std::string>> lines = {{"--help"}};
-    for (std::string const& command : kCommands)
-        lines.push_back({command, "--help"});
+    for (auto const* commands : {&kCommands, &kHelpers})
+        for (std::string const& command : *commands)
+            lines.push_back({command, "--help"});
     for (std::vector<std::string> const& line : lines) {
         Result const result = run(line);
         EXPECT_EQ(result.exitCode, 0);
@@ -160,9 +165,58 @@ TEST(CommandLine, HelpFitsATerminal)
         for (std::string row; std::getline(stream, row);)
             EXPECT_LE(row.size(), 100) << row;
         EXPECT_THAT(result.output, Not(HasSubstr("sPoint"))) << line[0];
-        bool const writes = line.size() == 2 && line[0] != "info" && line[0] != "validate";
+        bool const writes = line.size() == 2 && line[0] != "info" && line[0] != "validate"
+            && std::count(kHelpers.begin(), kHelpers.end(), line[0]) == 0;
         EXPECT_EQ(result.output.find("-f,--force ") != std::string::npos, writes) << line[0];
     }
+}
+
+TEST(CommandLine, HelpIsTheSameInAllForms)
+{
+    EXPECT_EQ(run({"help"}).output, run({"--help"}).output);
+    EXPECT_EQ(run({"help", "smooth"}).output, run({"smooth", "--help"}).output);
+    Result const unknown = run({"help", "smoth"});
+    EXPECT_EQ(unknown.exitCode, 2);
+    EXPECT_THAT(unknown.messages, HasSubstr("there is no command smoth; did you mean smooth?"));
+    EXPECT_THAT(run({"completion", "csh"}).messages, HasSubstr("csh"));
+
+    // The manual page and the completions name every option of every command.
+    std::string const page = run({"man"}).output, zsh = run({"completion", "zsh"}).output,
+                      fish = run({"completion", "fish"}).output;
+    auto const escaped = [](std::string const& text) { return std::regex_replace(text, std::regex("-"), "\\-"); };
+    for (std::string const& command : kCommands) {
+        EXPECT_THAT(page, HasSubstr("\n.SS " + escaped(command) + "\n"));
+        std::istringstream help(run({"help", command}).output);
+        std::smatch match;
+        for (std::string row; std::getline(help, row);) {
+            if (!std::regex_search(row, match, std::regex("^ +(?:-.,)?--([a-z-]+)")) || match[1] == "help")
+                continue;
+            std::string const name = match[1];
+            EXPECT_THAT(page, HasSubstr(escaped("--" + name))) << command;
+            EXPECT_THAT(zsh, HasSubstr("'--" + name + "[")) << command;
+            EXPECT_THAT(fish, HasSubstr("'__fish_seen_subcommand_from " + command + "' -l " + name + " "));
+        }
+    }
+}
+
+TEST(CommandLine, CompletesInBash)
+{
+    using namespace TestSupport;
+    TemporaryFolder const folder;
+    store(folder / "completion", run({"completion", "bash"}).output);
+    auto const completionsOf = [&](std::string const& words, int index) {
+        store(folder / "script",
+            "source '" + (folder / "completion").string() + "'; COMP_WORDS=(" + words
+                + "); COMP_CWORD=" + std::to_string(index) + "; _modeling; echo \"${COMPREPLY[@]}\" >'"
+                + (folder / "words").string() + "'");
+        EXPECT_EQ(std::system(("bash '" + (folder / "script").string() + "'").c_str()), 0);
+        return contentOf(folder / "words");
+    };
+    EXPECT_EQ(completionsOf("modeling re", 1), "remove-slivers\n");
+    EXPECT_EQ(completionsOf("modeling smooth a.obj --pin-", 3), "--pin-attribute --pin-boundary --pin-sharp\n");
+    EXPECT_EQ(completionsOf("modeling stitch --normals f", 3), "faces\n");
+    EXPECT_EQ(completionsOf("modeling completion ''", 2), "bash zsh fish\n");
+    EXPECT_EQ(completionsOf("modeling smooth ''", 2), "\n"); // file names
 }
 
 }

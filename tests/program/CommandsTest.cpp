@@ -5,6 +5,7 @@
 #include <nlohmann/json.hpp>
 
 #include <cstring>
+#include <sstream>
 
 #include <sys/wait.h>
 
@@ -250,6 +251,23 @@ TEST_F(Commands, MergeReportsHowAttributesWereMerged)
         json({"normal", "a.xyz", 3}));
 }
 
+TEST_F(Commands, ConvertKeepsWhatBothFormatsHold)
+{
+    copySamples({"cube.ply", "spider.obj"});
+    store(folder / "cloud.ply", kCloud);
+    store(folder / "lines.obj", "v 0 0 0\nv 1 0 0\nl 1 2\n");
+    json const done = runForJson("convert spider.obj out.ply --threads 1");
+    EXPECT_EQ(done["counts"], runForJson("info out.ply")["counts"]);
+    EXPECT_EQ(done["counts"], runForJson("info spider.obj")["counts"]);
+    EXPECT_THAT(done["warnings"].dump(), HasSubstr("spider.obj: materials are left out"));
+    EXPECT_THAT(runForJson("convert cloud.ply out.obj")["warnings"].dump(), HasSubstr("label"));
+    EXPECT_EQ(run("convert cloud.ply out.ply").exitCode, 0);
+    EXPECT_EQ(runForJson("info out.ply")["properties"], runForJson("info cloud.ply")["properties"]);
+    EXPECT_THAT(run("convert lines.obj out.vtp").output, AllOf(HasSubstr("strands"), HasSubstr("out.vtp")));
+    EXPECT_EQ(run("convert lines.obj out.ply").exitCode, 3);
+    EXPECT_THAT(run("convert cube.ply out.stl").messages, HasSubstr("triangles only, but face 0 has 4 corners"));
+}
+
 TEST_F(Commands, ReadLenientlyAndCenteredOnRequest)
 {
     store(folder / "far.obj",
@@ -456,6 +474,58 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesUnchanged)
     }
 }
 
+TEST_F(Commands, StrictAndRequireHaveTheirExitCodes)
+{
+    copySamples({"cube.ply", "cylinder.obj", "sphere-with-hole.stl", "bunny.obj", "spider.obj"});
+    store(folder / "cloud.ply", kCloud);
+    store(folder / "isolated.obj", "v 0 0 0\nv 1 0 0\nv 0 1 0\nv 9 9 9\nf 1 2 3\n");
+    struct Case {
+        char const* arguments;
+        int exitCode;
+        char const* message;
+    };
+    constexpr Case kCases[] = {
+        {"remove-slivers cylinder.obj out.obj --ratio 0.1 --strict", 8, "the shape changed"},
+        {"run cylinder.obj out.obj --do 'remove-slivers --ratio 0.1; smooth --amount 0' --strict", 8, "step 1"},
+        {"convert cloud.ply out.obj --strict", 8, "label"}, // the format drops it
+        {"convert spider.obj out.obj --strict", 0, "materials"}, // only the input has them
+        {"smooth bunny.obj out.obj --strict --require closed,manifold,oriented,triangles,no-isolated-points", 0, ""},
+        {"smooth cube.ply out.obj --require closed,triangles", 5, "cube.ply does not meet --require closed,triangles"},
+        {"run sphere-with-hole.stl out.obj --do smooth --require closed", 5, "9 of 432 edges are boundary edges"},
+        {"merge bunny.obj cube.ply out.obj --require triangles", 5, "6 faces have more than three corners"},
+        {"convert cloud.ply out.obj --require mesh", 5, "It contains a point cloud."},
+        {"validate isolated.obj --require no-isolated-points", 5, "1 point belongs to no face"},
+        {"info cube.ply --require closde", 2, "--require: nothing is called \"closde\"; did you mean closed?"},
+        {"make-volume cube.ply out.vdb --distance-to 0 0 0 --require point-cloud", 5, "It contains a mesh."},
+    };
+    for (Case const& c : kCases) {
+        Result const result = run(c.arguments);
+        EXPECT_EQ(result.exitCode, c.exitCode) << c.arguments << "\n" << result.messages;
+        EXPECT_THAT(result.messages, HasSubstr(c.message)) << c.arguments;
+    }
+    EXPECT_EQ(runForJson("remove-slivers cylinder.obj out.obj --ratio 0.1 --strict")["exitCode"], 8);
+}
+
+TEST_F(Commands, InfoDescribesManyFilesInLines)
+{
+    copySamples({"cube.ply", "bunny.obj"});
+    store(folder / "cloud.ply", kCloud);
+    store(folder / "broken.obj", "v 0 0 0\nf 1 2 3\n");
+    Result const text = run("info cube.ply bunny.obj broken.obj cloud.ply");
+    EXPECT_EQ(text.exitCode, 3);
+    EXPECT_THAT(text.messages, HasSubstr("modeling: broken.obj"));
+    EXPECT_EQ(text.output,
+        "cube.ply: mesh, PLY (ascii), 24 points, 24 corners, 6 faces, not a closed manifold\n"
+        "bunny.obj: mesh, OBJ, 1,839 points, 11,022 corners, 3,674 faces, closed manifold\n"
+        "cloud.ply: point cloud, PLY (ascii), 7 points\n");
+    std::istringstream lines(run("info cube.ply broken.obj --json").output);
+    std::string first, second;
+    std::getline(lines, first);
+    std::getline(lines, second);
+    EXPECT_EQ(json::parse(first), runForJson("info cube.ply"));
+    EXPECT_EQ(json::parse(second)["exitCode"], 3);
+}
+
 TEST_F(Commands, FilesAreReplacedOnlyWithForce)
 {
     copySamples({"cube.ply", "cylinder.obj"});
@@ -506,12 +576,12 @@ TEST_F(Commands, EmptyGeometryIsAccepted)
         else
             ASSERT_EQ(run("delete-faces cube.ply --indices all --invert empty." + extension).exitCode, 0);
         std::string const file = "empty." + extension;
-        for (std::string arguments : {"info @", "validate @", "triangulate @ o.ply", "smooth @ o.ply",
-                 "remove-slivers @ o.ply", "subdivide @ o.ply --relative 0.1", "subdivide @ o.ply --tolerance 1",
-                 "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2", "delete-faces @ o.ply --indices all",
-                 "delete-points @ o.ply --indices all", "add-points @ @ o.ply", "merge @ cube.ply -o o.ply",
-                 "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj", "merge @ @ -o o.ply",
-                 "stitch --template stitch-quad.obj stitch-quad-rings.obj --on @ o.vtp"}) {
+        for (std::string arguments : {"info @", "validate @", "convert @ o.ply", "triangulate @ o.ply",
+                 "smooth @ o.ply", "remove-slivers @ o.ply", "subdivide @ o.ply --relative 0.1",
+                 "subdivide @ o.ply --tolerance 1", "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2",
+                 "delete-faces @ o.ply --indices all", "delete-points @ o.ply --indices all", "add-points @ @ o.ply",
+                 "merge @ cube.ply -o o.ply", "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj",
+                 "merge @ @ -o o.ply", "stitch --template stitch-quad.obj stitch-quad-rings.obj --on @ o.vtp"}) {
             for (auto at = arguments.find('@'); at != std::string::npos; at = arguments.find('@'))
                 arguments.replace(at, 1, file);
             Result const result = run(arguments);

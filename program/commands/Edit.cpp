@@ -1,0 +1,79 @@
+#include "Edit.h"
+
+#include "geometry/MeshRequirements.h"
+#include "shell/Failure.h"
+
+namespace ModelingProgram {
+
+namespace {
+
+    /// "Mesh to read"
+    std::string describeFile(GeometryType type, char const* use)
+    {
+        std::string const name = type == GeometryType::None ? "geometry" : nameOf(type);
+        return std::string(1, static_cast<char>(name[0] - 'a' + 'A')) + name.substr(1) + " to " + use;
+    }
+
+}
+
+std::span<EditKind const* const> editKinds()
+{
+    static constexpr EditKind const* kAll[] = {&kAddPoints, &kDeletePoints, &kDeleteFaces, &kMerge, &kTriangulate,
+        &kSubdivide, &kSmooth, &kRemoveSlivers, &kStitch};
+    return kAll;
+}
+
+Subject Edit::readSubject(std::vector<std::filesystem::path> const& files, Report& report)
+{
+    return {files[0].string(), loadInput(files[0], report)};
+}
+
+void addEditCommand(EditKind const& kind, CommandLine& program, Invocation& invocation)
+{
+    struct Files {
+        std::vector<std::filesystem::path> in{1};
+        Output out;
+    };
+    auto const files = std::make_shared<Files>();
+    std::shared_ptr<Edit> const edit = kind.create();
+    Command command = addCommand(kind.help, program, invocation);
+    addFile("IN", describeFile(kind.takes, "read"), files->in[0], command);
+    edit->declareFiles(command);
+    addOutput(describeFile(kind.gives, "write"), files->out, command);
+    edit->declareOptions(command);
+    onSelected(command, invocation,
+        [&kind, edit, files](Report& report) { runOnFiles(kind, *edit, files->in, files->out, report); });
+}
+
+void runOnFiles(EditKind const& kind, Edit& edit, std::vector<std::filesystem::path> const& files, Output const& out,
+    Report& report)
+{
+    edit.runLimited([&] {
+        edit.checkOptions();
+        requireWritable(out, kind.gives);
+        requireAttribute(edit.newAttribute(), out);
+        edit.readFiles(report);
+        Subject subject = edit.readSubject(files, report);
+        requireSubject(kind, subject);
+        if (kind.gives == GeometryType::None || kind.keepsFaces)
+            requireHolds(out, *subject.object);
+        edit.run(subject, report);
+        requireHolds(out, *subject.object);
+        saveGeometry(*subject.object, out, report);
+        edit.report(report);
+    });
+}
+
+void requireAttribute(Edit::NewAttribute const& attribute, Output const& out)
+{
+    if (!attribute.name.empty())
+        requireAttribute(out, attribute.option, attribute.name);
+}
+
+void requireSubject(EditKind const& kind, Subject& subject)
+{
+    if (kind.takes != GeometryType::None)
+        requireType(kind.takes, *subject.object, kind.help.name, subject.name);
+}
+
+}
