@@ -48,7 +48,7 @@ namespace {
         out.file = std::move(options.files.back());
         options.files.pop_back();
         std::error_code ignored;
-        if (!out.replaces && std::filesystem::is_regular_file(out.file, ignored))
+        if (!out.replaces && std::filesystem::is_regular_file(fileOf(out.file), ignored))
             throw Failure(ExitCode::File,
                 fmt::format("the last file, {}, exists. If it is an input, name the output with -o OUT; if it is the "
                             "output, --force replaces it",
