@@ -24,8 +24,8 @@ namespace {
     constexpr char kFooter[] =
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz .h5; written: .obj
 .ply .stl .vtp .h5. FILE.h5#NAME is one of several objects in an HDF5 file. An existing file is
-replaced only with --force, even if OUT is IN, and only by a complete file; if anything fails it stays
-unchanged. Results are printed to standard output, messages to standard error.
+replaced only with --force, even if OUT is IN, and only by a complete file; if anything fails it
+stays unchanged. Results are printed to standard output, messages to standard error.
 
 Exit codes:
   0  done

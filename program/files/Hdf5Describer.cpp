@@ -121,8 +121,8 @@ namespace {
 
         void describeSelected(Hdf5Selection selection, std::string const& name)
         {
-            Hdf5Properties const creation(H5Fget_create_plist(file_));
             Hdf5Group const root(H5Gopen2(file_, "/", H5P_DEFAULT));
+            Hdf5Properties const creation(H5Gget_create_plist(root));
             std::vector<Link> const links = linksOf(root, creation);
             requireSelected(selection, name, links);
             for (Link const& link : links)

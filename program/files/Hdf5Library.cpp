@@ -1,8 +1,21 @@
 #include "Hdf5Library.h"
 
+#include <string_view>
+
 namespace ModelingProgram {
 
 namespace {
+
+    /// Of a message with all details of a write, what the system says: "... error message = 'No space left', ...".
+    std::string shortened(std::string const& message)
+    {
+        constexpr std::string_view kBegin = "error message = '";
+        std::size_t const begin = message.find(kBegin);
+        if (begin == std::string::npos)
+            return "the HDF5 library says \"" + message + "\"";
+        std::size_t const first = begin + kBegin.size();
+        return message.substr(first, message.find('\'', first) - first);
+    }
 
     /// The innermost error is the cause of the others.
     std::string firstMessage()
@@ -17,7 +30,7 @@ namespace {
             },
             &message);
         H5Eclear2(H5E_DEFAULT);
-        return message.empty() ? "the HDF5 library fails" : "the HDF5 library says \"" + message + "\"";
+        return message.empty() ? "the HDF5 library fails" : shortened(message);
     }
 
 }

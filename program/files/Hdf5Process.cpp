@@ -7,6 +7,9 @@
 #include <csignal>
 #include <cstring>
 #include <fstream>
+#include <new>
+#include <optional>
+#include <stdexcept>
 
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -68,22 +71,27 @@ namespace {
     constexpr bool kLimitsMemory = true;
 #endif
 
-    /// What a process that reads the structure of a file may use.
-    void limitProcess(std::uint64_t fileBytes)
+    /// Limits a process that reads the structure of a file.
+    void limitUse(std::uint64_t fileBytes)
     {
         constexpr std::uint64_t kMemoryBytes = std::uint64_t{1} << 30;
         constexpr std::uint64_t kSeconds = 30, kBytesPerSecond = 1 << 20; // measured: 10 MB of structure per second
-        constexpr int kSignals[] = {SIGSEGV, SIGBUS, SIGABRT, SIGFPE, SIGILL, SIGXCPU, SIGPIPE, SIGHUP, SIGQUIT};
-        for (int const signal : kSignals)
-            ::signal(signal, SIG_DFL);
-        ::signal(SIGINT, SIG_IGN); // the parent decides what an interrupt means
-        ::signal(SIGTERM, SIG_IGN);
-        ::prctl(PR_SET_PDEATHSIG, SIGKILL);
         std::uint64_t pages = 0;
         std::ifstream("/proc/self/statm") >> pages;
         if (kLimitsMemory)
             limit(RLIMIT_AS, pages * static_cast<std::uint64_t>(::sysconf(_SC_PAGESIZE)) + kMemoryBytes);
         limit(RLIMIT_CPU, kSeconds + fileBytes / kBytesPerSecond);
+    }
+
+    /// A new process ends with its parent, which decides what an interrupt means, and prints nothing.
+    void settleIn()
+    {
+        constexpr int kSignals[] = {SIGSEGV, SIGBUS, SIGABRT, SIGFPE, SIGILL, SIGXCPU, SIGPIPE, SIGHUP, SIGQUIT};
+        for (int const signal : kSignals)
+            ::signal(signal, SIG_DFL);
+        ::signal(SIGINT, SIG_IGN);
+        ::signal(SIGTERM, SIG_IGN);
+        ::prctl(PR_SET_PDEATHSIG, SIGKILL);
         limit(RLIMIT_CORE, 0);
         if (int const null = ::open("/dev/null", O_WRONLY); null >= 0) {
             ::dup2(null, STDOUT_FILENO);
@@ -128,11 +136,48 @@ namespace {
             int status = 0;
             while (::waitpid(id, &status, 0) < 0 && errno == EINTR) { }
             id = -1;
+            if (WIFEXITED(status) && WEXITSTATUS(status) == kOutOfMemory)
+                throw std::bad_alloc();
             return WIFEXITED(status) && WEXITSTATUS(status) == 0;
         }
 
+        static constexpr int kFailed = 1, kOutOfMemory = 2;
         pid_t id;
     };
+
+    /// Calls `work` with a pipe in a new process. \return what it writes; nullopt if it crashes, or writes more than `most`
+    /// \throws FileError, std::bad_alloc
+    template <class Work>
+    std::optional<std::string> runInProcess(std::filesystem::path const& file, std::uint64_t most, Work const& work)
+    {
+        Descriptor reading, writing;
+        int ends[2];
+        pid_t process = -1;
+        if (::pipe2(ends, O_CLOEXEC) == 0) {
+            reading.number = ends[0];
+            writing.number = ends[1];
+            process = ::fork();
+        }
+        if (process < 0)
+            throw FileError(file.string() + ": no process can be started: " + std::strerror(errno));
+        if (process == 0) {
+            try {
+                settleIn();
+                work(writing.number);
+            } catch (std::bad_alloc const&) {
+                ::_exit(Child::kOutOfMemory);
+            } catch (...) {
+                ::_exit(Child::kFailed);
+            }
+            ::_exit(0);
+        }
+        Child child(process);
+        writing.close();
+        std::string bytes;
+        if (!readAll(reading.number, most, bytes) || !child.wait())
+            return std::nullopt;
+        return bytes;
+    }
 
 }
 
@@ -142,36 +187,35 @@ std::string outlineOf(
     // The outline repeats parts of the file: names, small values, and places.
     constexpr std::uint64_t kLeastBytes = 1 << 20;
     auto* const describe = codec<decltype(modelingDescribeHdf5)>("modelingDescribeHdf5"); // before the process starts
-    Descriptor reading, writing;
-    int ends[2];
-    if (::pipe2(ends, O_CLOEXEC) != 0)
-        throw FileError(file.string() + " cannot be read: " + std::strerror(errno));
-    reading.number = ends[0];
-    writing.number = ends[1];
-    pid_t const process = ::fork();
-    if (process < 0)
-        throw FileError(file.string() + " cannot be read: " + std::strerror(errno));
-    if (process == 0) {
-        try {
-            limitProcess(fileBytes);
-            describe(file.c_str(), selection, name.c_str(), writing.number);
-        } catch (...) {
-            ::_exit(1);
-        }
-        ::_exit(0);
+    std::optional<std::string> outline;
+    try {
+        outline = runInProcess(file, 2 * fileBytes + kLeastBytes, [&](int pipe) {
+            limitUse(fileBytes);
+            describe(file.c_str(), selection, name.c_str(), pipe);
+        });
+    } catch (std::bad_alloc const&) {
+        // The process may use enough for any file that is not broken.
     }
-    Child child(process);
-    writing.close();
-    std::string outline;
-    bool const isComplete = readAll(reading.number, 2 * fileBytes + kLeastBytes, outline);
-    if (!isComplete || !child.wait())
+    if (!outline)
         throw FileError(file.string() + " cannot be read: it is broken in a way that the HDF5 library cannot handle");
-    return outline;
+    return std::move(*outline);
 }
 
 void writeHdf5With(std::vector<Hdf5Object> const& objects, std::filesystem::path const& file, unsigned int compression)
 {
-    codec<decltype(modelingWriteHdf5)>("modelingWriteHdf5")(objects, file.c_str(), compression);
+    auto* const write = codec<decltype(modelingWriteHdf5)>("modelingWriteHdf5");
+    constexpr std::uint64_t kMostBytes = 1 << 20;
+    std::optional<std::string> const failure = runInProcess(file, kMostBytes, [&](int pipe) {
+        try {
+            write(objects, file.c_str(), compression);
+        } catch (std::runtime_error const& error) {
+            std::string_view const text = error.what();
+            if (::write(pipe, text.data(), text.size()) < 0)
+                throw;
+        }
+    });
+    if (!failure || !failure->empty())
+        throw std::runtime_error(failure.value_or("the HDF5 library fails"));
 }
 
 }

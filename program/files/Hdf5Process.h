@@ -6,13 +6,18 @@
 
 namespace ModelingProgram {
 
-/// The outline of an HDF5 file, which the library makes in a process of its own: it may crash or run forever on a broken
-/// file, and reading there needs no more memory than the process may use.
-/// \throws FileError  if that process fails
+// The HDF5 library runs in processes of its own. It may crash or run forever on a broken file; and after a write has
+// failed, such as on a full disk, it crashes when the program ends. A process shares the memory of the program, so that
+// nothing is copied.
+
+/// The outline of an HDF5 file.
+/// \throws FileError  if the library cannot make one with limited time and memory
 std::string outlineOf(
     std::filesystem::path const& file, Hdf5Selection selection, std::string const& name, std::uint64_t fileBytes);
 
-/// Calls the library to write a file, in this process.
+/// Writes a file.
+/// \throws std::runtime_error  that says why the file cannot be written
+/// \throws std::bad_alloc
 void writeHdf5With(std::vector<Hdf5Object> const& objects, std::filesystem::path const& file, unsigned int compression);
 
 }

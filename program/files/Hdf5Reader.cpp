@@ -300,6 +300,8 @@ namespace {
             while (!outline_.atEnd()) {
                 Hdf5Record const kind = outline_.kind();
                 std::string const name(outline_.text());
+                if (kind == Hdf5Record::Refusal)
+                    refuseAsOutlined(name, root);
                 Place const place = root.in(name);
                 std::string remark;
                 PropertyValue const value = readValue(kind, place, 0, &remark);
@@ -312,6 +314,11 @@ namespace {
         }
 
     private:
+        [[noreturn]] void refuseAsOutlined(std::string const& path, Place const& place)
+        {
+            Place{place.file, path}.refuse(std::string(outline_.text()));
+        }
+
         PropertyValue readValue(Hdf5Record kind, Place const& place, int level, std::string* remark = nullptr)
         {
             switch (kind) {
@@ -339,7 +346,6 @@ namespace {
                 return values_[number] = readArray(kind, place);
             }
             case Hdf5Record::Refusal:
-                place.refuse(std::string(outline_.text()));
             case Hdf5Record::End:
                 break;
             }
@@ -360,7 +366,7 @@ namespace {
                 if (record == Hdf5Record::End)
                     break;
                 if (record == Hdf5Record::Refusal)
-                    Place{place.file, std::string(name)}.refuse(std::string(outline_.text()));
+                    refuseAsOutlined(std::string(name), place);
                 Place const inside = place.in(name);
                 std::optional<std::string> const key = unescapedName(name);
                 if (!key)
