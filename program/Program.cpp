@@ -6,6 +6,7 @@
 #include "geometry/MeshRequirements.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
+#include "shell/MemoryLimit.h"
 
 #include <fmt/format.h>
 #include <tbb/global_control.h>
@@ -24,10 +25,10 @@ namespace {
         addRemoveSlivers, addStitch, addRun, addHelp, addCompletion, addManual};
 
     constexpr char kFooter[] =
-        R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz; written: .obj .ply
-.stl .vtp. An existing file is replaced only with --force, even if OUT is IN, and only by a complete
-file; if anything fails it stays unchanged. Results are printed to standard output, messages to
-standard error.
+        R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz .h5; written: .obj
+.ply .stl .vtp .h5. FILE.h5#NAME is one of several objects in an HDF5 file. An existing file is
+replaced only with --force, even if OUT is IN, and only by a complete file; if anything fails it
+stays unchanged. Results are printed to standard output, messages to standard error.
 
 Exit codes:
   0  done
@@ -92,6 +93,7 @@ Exit codes:
         Report report(invocation.command);
         report.isJson = invocation.asJson;
         report.reading = invocation.reading;
+        report.reading.onSize = [](std::uint64_t bytes) { requireMemory(bytes, "an array of the file"); };
         if (std::vector<double> const& center = invocation.center; !center.empty())
             report.reading.origin = {center[0], center[1], center[2]};
         try {
@@ -188,6 +190,9 @@ void addOutput(std::string const& description, Output& out, Command& command, Ne
 void addForce(Output& out, Command& command)
 {
     command.addFlag("-f,--force", out.replaces, "Replace the file to write if it exists");
+    command.addOption("--compress", out.compression, "Compress an HDF5 file, from 1 (fast) to 9 (small)")
+        .valueName("N")
+        .between(1, 9);
 }
 
 void addFiles(FileList& files, Command& command, Needed needed)

@@ -59,7 +59,7 @@ namespace {
 
     bool hasExtension(Output const& out, std::string_view extension)
     {
-        return lowerCase(out.file.extension().string()) == extension;
+        return extensionOf(out.file) == extension;
     }
 
     /// Refuses a mesh with faces that the format cannot hold.
@@ -71,7 +71,8 @@ namespace {
         for (unsigned int face = 0; face != arrays.faceCount(); ++face)
             if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
                 refuseOutput(out,
-                    fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY and VTP files can hold it",
+                    fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY, VTP and HDF5 files can "
+                                "hold it",
                         face, countOf(corners, "corner")));
     }
 
@@ -90,7 +91,7 @@ void chooseOutput(char const* command, FileList& files)
     out.file = std::move(files.in.back());
     files.in.pop_back();
     std::error_code ignored;
-    if (!out.replaces && fs::is_regular_file(out.file, ignored))
+    if (!out.replaces && fs::is_regular_file(fileOf(out.file), ignored))
         throw Failure(ExitCode::File,
             fmt::format("the last file, {}, exists. If it is an input, name the output with -o OUT; if it is the "
                         "output, --force replaces it",
@@ -100,11 +101,11 @@ void chooseOutput(char const* command, FileList& files)
 void requireHolds(Output const& out, GeometryType type)
 {
     if (!isWritableFormat(out.file))
-        refuseOutput(out, "its name has to end in .obj, .ply, .stl or .vtp");
+        refuseOutput(out, "its name has to end in .obj, .ply, .stl, .vtp or .h5");
     if (type == GeometryType::Strands && (hasExtension(out, ".ply") || hasExtension(out, ".stl")))
-        refuseOutput(out, "this format cannot hold strands; OBJ and VTP can");
+        refuseOutput(out, "this format cannot hold strands; OBJ, VTP and HDF5 can");
     if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
-        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY and VTP files can");
+        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY, VTP and HDF5 files can");
 }
 
 void requireHolds(Output const& out, Tessara::Object const& object)
@@ -124,22 +125,26 @@ void requireWritable(Output const& out, GeometryType type)
 void requirePlace(Output const& out)
 {
     std::error_code ignored;
-    if (fs::is_directory(out.file, ignored))
+    fs::path const file = fileOf(out.file);
+    if (fs::is_directory(file, ignored))
         refuseOutput(out, "it is a folder");
-    fs::path const folder = out.file.has_parent_path() ? out.file.parent_path() : fs::path(".");
+    fs::path const folder = file.has_parent_path() ? file.parent_path() : fs::path(".");
     if (!fs::is_directory(folder, ignored))
         refuseOutput(out, fmt::format("there is no folder {}", folder.string()));
-    if (!out.replaces && fs::is_regular_file(out.file, ignored))
+    if (!out.replaces && fs::is_regular_file(file, ignored))
         refuseOutput(out, "the file exists; --force replaces it");
-    OutputFile::checkWritable(out.file, out.existing());
+    if (out.compression != 0 && !hasExtension(out, ".h5"))
+        throw Failure(ExitCode::CommandLine,
+            fmt::format("--compress applies to HDF5 files only, and {} is none", out.file.string()));
+    OutputFile::checkWritable(file, out.existing());
 }
 
 void requireAttribute(Output const& out, char const* option, std::string const& name)
 {
-    if (!hasExtension(out, ".ply") && !hasExtension(out, ".vtp"))
+    if (!hasExtension(out, ".ply") && !hasExtension(out, ".vtp") && !hasExtension(out, ".h5"))
         throw Failure(ExitCode::Refused,
-            fmt::format(
-                "{}: {} cannot hold the attribute \"{}\"; PLY and VTP files can", option, out.file.string(), name));
+            fmt::format("{}: {} cannot hold the attribute \"{}\"; PLY, VTP and HDF5 files can", option,
+                out.file.string(), name));
     constexpr std::string_view kTaken[] = {"x", "y", "z", "vertex_index", "vertex_indices"};
     if (hasExtension(out, ".ply")
         && (name.find_first_of(" \t\n\r\v\f") != std::string::npos
@@ -227,7 +232,7 @@ void saveGeometry(Tessara::Object const& object, Output const& out, Report& repo
             fmt::format("the result is invalid, so nothing was written: {}", status.message().view()));
     stopIfCancelled();
     std::string const remark = report.reading.origin ? centerOf(report.reading) : std::string();
-    for (std::string const& note : writeGeometryFile(object, out.file, {out.existing(), remark}))
+    for (std::string const& note : writeGeometryFile(object, out.file, {out.existing(), remark, out.compression}))
         report.warn(note);
     report.document["output"] = out.file.string();
 }

@@ -28,6 +28,7 @@ namespace ModelingProgram {
 struct Output {
     std::filesystem::path file;
     bool replaces = false; // otherwise an existing file is refused
+    unsigned int compression = 0; // of an HDF5 file, 1 to 9
 
     Existing existing() const { return replaces ? Existing::Replace : Existing::Keep; }
 };

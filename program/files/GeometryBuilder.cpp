@@ -40,25 +40,6 @@ namespace {
         return box;
     }
 
-    /// A point near the middle of the box with few digits, so that it can be read, typed and added back: its
-    /// coordinates are multiples of a power of ten about as large as the box.
-    double3 roundedCenterOf(Orvan::Array<float3> const& floats, Orvan::Array<double3> const& positions)
-    {
-        Box const box = boxOf(floats, positions);
-        double const side = box.longestSide();
-        if (!(side >= 0))
-            return {0, 0, 0}; // no point is finite
-        int const digits = side > 0 ? static_cast<int>(std::ceil(std::log10(side))) : 0;
-        double const power = std::pow(10.0, std::abs(digits));
-        auto const rounded = [&](double least, double most) {
-            double const middle = least + (most - least) / 2;
-            double const multiple =
-                digits < 0 ? std::round(middle * power) / power : std::round(middle / power) * power;
-            return multiple + 0.0; // -0 becomes 0
-        };
-        return {rounded(box.min.x, box.max.x), rounded(box.min.y, box.max.y), rounded(box.min.z, box.max.z)};
-    }
-
     /// "4,100,235", "0.25", "3e-08".
     std::string shortNumber(double number)
     {
@@ -71,6 +52,22 @@ namespace {
         return result;
     }
 
+}
+
+double3 roundedCenterOf(Orvan::Array<float3> const& floats, Orvan::Array<double3> const& positions)
+{
+    Box const box = boxOf(floats, positions);
+    double const side = box.longestSide();
+    if (!(side >= 0))
+        return {0, 0, 0}; // no point is finite
+    int const digits = side > 0 ? static_cast<int>(std::ceil(std::log10(side))) : 0;
+    double const power = std::pow(10.0, std::abs(digits));
+    auto const rounded = [&](double least, double most) {
+        double const middle = least + (most - least) / 2;
+        double const multiple = digits < 0 ? std::round(middle * power) / power : std::round(middle / power) * power;
+        return multiple + 0.0; // -0 becomes 0
+    };
+    return {rounded(box.min.x, box.max.x), rounded(box.min.y, box.max.y), rounded(box.min.z, box.max.z)};
 }
 
 std::string_view namePrefix(Orvan::String const& component)

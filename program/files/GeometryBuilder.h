@@ -27,6 +27,12 @@ bool isReservedName(std::string_view name);
 /// that they are written under the same names.
 inline constexpr char const* sColumnNames = "columnNames";
 
+/// A point near the middle of the positions with few digits, so that it can be read, typed and added back: its
+/// coordinates are multiples of a power of ten about as large as the box of the positions. `wide` has the same positions
+/// in double precision; those that are not finite in single precision do not count.
+Tessara::Math::double3 roundedCenterOf(
+    Orvan::Array<Tessara::Math::float3> const& positions, Orvan::Array<Tessara::Math::double3> const& wide);
+
 /// The values at these indices; zero for `kInvalidIndex`.
 template <class T> Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan::Array<unsigned int> const& indices)
 {

@@ -1,5 +1,6 @@
 #include "GeometryFile.h"
 
+#include "Hdf5File.h"
 #include "Readers.h"
 #include "Writers.h"
 
@@ -29,7 +30,7 @@ namespace {
 
     Format formatOf(std::filesystem::path const& file)
     {
-        auto const format = formats().find(lowerCase(file.extension().string()));
+        auto const format = formats().find(extensionOf(file));
         return format == formats().end() ? Format{} : format->second;
     }
 
@@ -37,9 +38,12 @@ namespace {
 
 GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options)
 {
+    if (auto const location = hdf5LocationOf(file))
+        return readHdf5Geometry(*location, options);
     Format const format = formatOf(file);
     if (!format.read)
-        throw FileError(file.string() + " cannot be read: its extension is none of .obj, .ply, .stl, .off and .xyz");
+        throw FileError(
+            file.string() + " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .h5 and .hdf5");
     InputFile const input(file);
     if (input.size == 0 && format.read != readObj && format.read != readXyz) // the others have headers
         throw FileError(file.string() + " cannot be read: it is empty");
@@ -49,9 +53,14 @@ GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions con
 std::vector<std::string> writeGeometryFile(
     Tessara::Object const& object, std::filesystem::path const& file, WriteOptions const& options)
 {
+    if (auto const location = hdf5LocationOf(file)) {
+        writeHdf5Geometry(object, *location, options);
+        return {};
+    }
     Format const format = formatOf(file);
     if (!format.write)
-        throw FileError(file.string() + " cannot be written: its extension is none of .obj, .ply, .stl and .vtp");
+        throw FileError(
+            file.string() + " cannot be written: its extension is none of .obj, .ply, .stl, .vtp, .h5 and .hdf5");
     WritableGeometry geometry = takeApart(object, file);
     geometry.existing = options.existing;
     geometry.remark = options.remark;
@@ -61,7 +70,18 @@ std::vector<std::string> writeGeometryFile(
 
 bool isWritableFormat(std::filesystem::path const& file)
 {
-    return formatOf(file).write != nullptr;
+    return hdf5LocationOf(file) || formatOf(file).write;
+}
+
+std::string extensionOf(std::filesystem::path const& file)
+{
+    return hdf5LocationOf(file) ? ".h5" : lowerCase(file.extension().string());
+}
+
+std::filesystem::path fileOf(std::filesystem::path const& file)
+{
+    auto const location = hdf5LocationOf(file);
+    return location ? location->file : file;
 }
 
 }

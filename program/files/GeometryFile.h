@@ -3,7 +3,9 @@
 #include <TessaraMathSupport/Types.h>
 #include <TessaraObject/Object.h>
 
+#include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <optional>
 #include <stdexcept>
 #include <string>
@@ -28,6 +30,8 @@ struct ReadOptions {
     bool isCentered = false;
     /// Subtracts this point instead, such as the center of a file read before.
     std::optional<Tessara::Math::double3> origin = {};
+    /// Called with the number of bytes before larger arrays of an HDF5 file are allocated; may throw to refuse them.
+    std::function<void(std::uint64_t)> onSize = {};
 };
 
 /// The contents of a file: a mesh if there are faces, otherwise a strand set if there are polylines, otherwise a point
@@ -40,7 +44,8 @@ struct GeometryFile {
     std::optional<Tessara::Math::double3> origin = {}; // what was subtracted from all positions
 };
 
-/// Reads OBJ, PLY, STL, OFF and XYZ files, determined by the extension in upper or lower case.
+/// Reads OBJ, PLY, STL, OFF, XYZ and HDF5 files, determined by the extension in upper or lower case. "scan.h5#left" is
+/// one of several objects in an HDF5 file. The object of an HDF5 file may be invalid, that of other files never is.
 /// \throws FileError  if the file does not exist, is cut off, or is malformed
 GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options = {});
 
@@ -50,9 +55,10 @@ enum class Existing { Replace, Keep };
 struct WriteOptions {
     Existing existing = Existing::Replace;
     std::string remark = {}; // a line of text without a line end, stored as a comment; empty for none
+    unsigned int compression = 0; // of HDF5 files, 1 to 9 as those of gzip; 0 for none
 };
 
-/// Writes OBJ, PLY (binary, little-endian), STL (binary) and VTP files. The file appears under its name only when it is
+/// Writes OBJ, PLY (binary, little-endian), STL (binary), VTP and HDF5 files. The file appears under its name only when it is
 /// complete: it is written to a temporary file in the same folder first.
 /// \return what the format cannot hold and was therefore dropped or converted, one sentence each
 /// \throws FileError  if the file cannot be written, the format cannot hold this type of geometry, or the geometry is
@@ -63,5 +69,10 @@ std::vector<std::string> writeGeometryFile(
 
 /// Whether `writeGeometryFile` supports the extension.
 bool isWritableFormat(std::filesystem::path const& file);
+
+/// What determines the format: the extension in lower case, ".h5" for all HDF5 files.
+std::string extensionOf(std::filesystem::path const& file);
+/// The file without the object that it names: "scan.h5" for "scan.h5#left".
+std::filesystem::path fileOf(std::filesystem::path const& file);
 
 }

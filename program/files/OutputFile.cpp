@@ -138,6 +138,13 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
     }
 }
 
+std::filesystem::path const& OutputFile::temporaryFile() const
+{
+    if (temporary_.empty())
+        fail("this format needs a regular file, not a device or a pipe");
+    return temporary_;
+}
+
 void OutputFile::commit()
 {
     flush();

@@ -55,6 +55,10 @@ public:
     /// Writes the bytes of a number as in memory.
     template <class T> void writeBinary(T number) { write(&number, sizeof(T)); }
 
+    /// The temporary file, for a library that writes a file by its name.
+    /// \throws FileError  if the file is not a regular one
+    std::filesystem::path const& temporaryFile() const;
+
     /// Completes the file and renames it.
     /// \throws FileError  also if a file that is to be kept has been created in the meantime
     void commit();

@@ -28,10 +28,12 @@ namespace {
         static_cast<void>(Tessara::GeometryAlgorithms::deleteComponents(remap, component, object));
     }
 
-    /// The offsets of the remaining runs. Calls `visit(begin, end)` for each of them.
-    template <class Visit> Indices remainingOffsets(Indices const& offsets, Flags const& deleted, Visit const& visit)
+    /// The offsets of the remaining runs, of which the first begins at `start`. Calls `visit(begin, end)` for each of
+    /// them.
+    template <class Visit>
+    Indices remainingOffsets(unsigned int start, Indices const& offsets, Flags const& deleted, Visit const& visit)
     {
-        Indices result{0u};
+        Indices result{start};
         for (std::uint64_t run = 0; run < deleted.size; ++run) {
             if (deleted[run])
                 continue;
@@ -73,14 +75,17 @@ void UnusableElements::deleteFrom(RawGeometry const& geometry, Tessara::Object& 
 {
     deleteElements(points, sPointComp, object);
     if (!strands.empty()) {
-        Indices offsets = remainingOffsets(geometry.strandOffset, strands, [](unsigned int, unsigned int) {});
+        // Points before the first strand belong to none.
+        auto const start =
+            static_cast<unsigned int>(std::count(points.data, points.data + geometry.strandOffset[0], false));
+        Indices offsets = remainingOffsets(start, geometry.strandOffset, strands, [](unsigned int, unsigned int) {});
         deleteElements(strands, sStrandComp, object);
         addDataProperty(sStrandOffset, sStrandComp, std::move(offsets), object);
     } else if (anyFaceRemains()) {
         Indices const pointRemap = Tessara::GeometryAlgorithms::computeDeletedComponentMapping(points);
         Flags corners(geometry.faceVertex.size, true);
         Indices faceVertex;
-        Indices offsets = remainingOffsets(geometry.faceOffset, faces, [&](unsigned int begin, unsigned int end) {
+        Indices offsets = remainingOffsets(0, geometry.faceOffset, faces, [&](unsigned int begin, unsigned int end) {
             for (unsigned int corner = begin; corner != end; ++corner) {
                 corners[corner] = false;
                 faceVertex.append(pointRemap[geometry.faceVertex[corner]]);

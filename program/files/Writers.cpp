@@ -5,7 +5,6 @@
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Prototypes.h>
-#include <TessaraGeometry/Validators.h>
 
 namespace ModelingProgram {
 
@@ -24,14 +23,6 @@ namespace {
         if (object.hasProperty(sFaceComp))
             return WritableGeometry::Kind::Mesh;
         return object.hasProperty(sStrandComp) ? WritableGeometry::Kind::Strands : WritableGeometry::Kind::PointCloud;
-    }
-
-    GeoValidator::Status validate(Tessara::Object const& object, WritableGeometry::Kind kind)
-    {
-        if (kind == WritableGeometry::Kind::Mesh)
-            return validateMesh(object);
-        return kind == WritableGeometry::Kind::Strands ? StrandValidator().validate(object)
-                                                       : PointCloudValidator().validate(object);
     }
 
     void checkValues(WritableGeometry const& geometry, std::filesystem::path const& file)
@@ -91,6 +82,19 @@ namespace {
 
 }
 
+GeoValidator::Status validateGeometry(Tessara::Object const& object)
+{
+    switch (kindOf(object)) {
+    case WritableGeometry::Kind::Mesh:
+        return validateMesh(object);
+    case WritableGeometry::Kind::Strands:
+        return StrandValidator().validate(object);
+    case WritableGeometry::Kind::PointCloud:
+        break;
+    }
+    return PointCloudValidator().validate(object);
+}
+
 void leaveOut(Attribute const& attribute, std::string const& why, std::vector<std::string>& sentences)
 {
     std::string type;
@@ -103,7 +107,7 @@ WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path 
 {
     WritableGeometry geometry;
     geometry.kind = kindOf(object);
-    if (GeoValidator::Status const status = validate(object, geometry.kind); !status)
+    if (GeoValidator::Status const status = validateGeometry(object); !status)
         refuse(file, "the geometry is invalid: " + std::string(status.message().view()));
     geometry.positions = dataOf<float3>(object, sPointPosition);
     geometry.faceVertex = dataOf<unsigned int>(object, sFaceVertex);

@@ -4,6 +4,7 @@
 #include "OutputFile.h"
 
 #include <TessaraGeometry/Names.h>
+#include <TessaraGeometry/Validators.h>
 
 namespace ModelingProgram {
 
@@ -42,6 +43,9 @@ template <class T, class Visit> bool visitAs(Tessara::PropertyValue const& value
 
 /// Adds a sentence on why an attribute is left out.
 void leaveOut(Attribute const& attribute, std::string const& why, std::vector<std::string>& sentences);
+
+/// Validates an object with faces as a mesh, one with strands as a strand set, any other as a point cloud.
+Tessara::Geometry::GeoValidator::Status validateGeometry(Tessara::Object const& object);
 
 /// Checks what all formats require: a valid object, finite positions, at least three corners per face.
 /// \throws FileError, which names the file

@@ -25,6 +25,13 @@ namespace {
     // The rest is left for allocations until the next cancellation check, and for other programs.
     constexpr double kFractionOfFree = 0.9;
 
+    std::atomic<MemoryLimit const*> limitInForce = nullptr;
+
+    std::uint64_t mostOfFreeMemory()
+    {
+        return static_cast<std::uint64_t>(static_cast<double>(freeMemory()) * kFractionOfFree);
+    }
+
     /// The number after `word` in the first line that begins with it.
     std::optional<std::uint64_t> numberAfter(std::string_view word, fs::path const& file)
     {
@@ -106,10 +113,9 @@ std::uint64_t freeMemory(fs::path const& root)
 
 MemoryLimit::MemoryLimit(std::uint64_t bytes)
     : isUsers_(bytes != 0)
-    , bytes_(isUsers_
-              ? bytes
-              : presentMemory() + static_cast<std::uint64_t>(static_cast<double>(freeMemory()) * kFractionOfFree))
+    , bytes_(isUsers_ ? bytes : presentMemory() + mostOfFreeMemory())
 {
+    limitInForce = this;
     look();
     watcher_ = std::thread([this] {
         std::unique_lock lock(mutex_);
@@ -120,6 +126,7 @@ MemoryLimit::MemoryLimit(std::uint64_t bytes)
 
 MemoryLimit::~MemoryLimit()
 {
+    limitInForce = nullptr;
     {
         std::lock_guard const lock(mutex_);
         isOver_ = true;
@@ -161,6 +168,15 @@ void MemoryLimit::run(std::function<void()> const& work, std::string const& advi
         throw Failure(ExitCode::OutOfMemory,
             fmt::format("stopped: this needs more than the {}; nothing was written. {}", limit(), advice));
     }
+}
+
+void requireMemory(std::uint64_t bytes, std::string const& what)
+{
+    if (MemoryLimit const* const limit = limitInForce)
+        limit->require(bytes, what, "Compressed files can hold far more than their size.");
+    else if (std::uint64_t const most = mostOfFreeMemory(); bytes > most)
+        throw Failure(ExitCode::OutOfMemory,
+            fmt::format("{} would need about {}, but only {} are free", what, formatBytes(bytes), formatBytes(most)));
 }
 
 void addMemoryLimit(std::uint64_t& bytes, Command& command)

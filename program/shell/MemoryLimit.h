@@ -46,6 +46,9 @@ private:
     std::thread watcher_;
 };
 
+/// Refuses work that would exceed the limit in force, or most of the free memory if there is none.
+void requireMemory(std::uint64_t bytes, std::string const& what);
+
 /// Adds --max-memory to a command.
 void addMemoryLimit(std::uint64_t& bytes, Command& command);
 

@@ -58,5 +58,5 @@ test_preset() {
 }
 
 build_packages=(g++ cmake ninja-build git ca-certificates libtbb-dev)
-program_packages=(libcli11-dev libfmt-dev nlohmann-json3-dev libopenvdb-dev libboost-dev)
+program_packages=(libcli11-dev libfmt-dev nlohmann-json3-dev libopenvdb-dev libboost-dev libhdf5-dev zlib1g-dev)
 test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev clang clang-format clang-tidy)

@@ -429,7 +429,7 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesUnchanged)
         {"triangulate cube.ply out.obj --channels '* ^'", 2, "--channels: "},
         {"triangulate cube.ply out.obj --channels ' , '", 2, "--channels: the list has no entry"},
         {"remove-slivers broken.obj out.obj", 3, "broken.obj"},
-        {"remove-slivers cylinder.obj out.off", 3, "has to end in .obj, .ply, .stl or .vtp"},
+        {"remove-slivers cylinder.obj out.off", 3, "has to end in .obj, .ply, .stl, .vtp or .h5"},
         {"remove-slivers cylinder.obj nowhere/out.obj", 3, "there is no folder nowhere"},
         {"remove-slivers cylinder.obj folder.obj", 3, "it is a folder"},
         {"remove-slivers cylinder.obj out.obj --ratio 1.5", 2, "1.5 is not a number from 0 to 1"},

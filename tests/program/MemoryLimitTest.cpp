@@ -80,6 +80,16 @@ TEST(MemoryLimit, RefusesBandsAndVolumesBeforeTheyAreMade)
     }
 }
 
+TEST(MemoryLimit, RefusesMemoryThatNobodyHas)
+{
+    constexpr std::uint64_t kMegabyte = 1'000'000;
+    requireMemory(kMegabyte, "an array");
+    EXPECT_THROW(requireMemory(freeMemory(), "an array"), Failure);
+    MemoryLimit const limit(presentMemory() + 20 * kMegabyte);
+    requireMemory(kMegabyte, "an array");
+    EXPECT_THROW(requireMemory(30 * kMegabyte, "an array"), Failure);
+}
+
 TEST(MemoryLimit, BandsOfSingleFacesCanBeCancelled)
 {
     auto const mesh = Tessara::Geometry::makeMesh({{0, 0, 0}, {1, 0, 0}, {0, 1, 0}}, {0, 1, 2}, {0, 3});

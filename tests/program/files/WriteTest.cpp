@@ -262,7 +262,7 @@ namespace {
                 "point 1 has a coordinate that is not finite"},
             {makeMesh({{0, 0, 0}}, {0, 0}, {0, 2}), "a.obj", "face 0 has fewer than three corners"},
             {makeMesh({{0, 0, 0}}, {0, 0, 7}, {0, 3}), "a.obj", "is invalid: sFaceVertex[2] is 7"},
-            {triangle(), "a.off", "its extension is none of .obj, .ply, .stl and .vtp"},
+            {triangle(), "a.off", "its extension is none of .obj, .ply, .stl, .vtp, .h5 and .hdf5"},
         };
         for (Case const& test : cases) {
             TemporaryFolder const folder;
