@@ -55,6 +55,9 @@ std::vector<std::string> writeGeometryFile(
     WritableGeometry geometry = takeApart(object, file);
     geometry.existing = options.existing;
     geometry.remark = options.remark;
+    if (format.write != writeObj)
+        for (FaceNames const& names : geometry.faceNames)
+            leaveOut(names.data, "only OBJ files can hold names of faces", geometry.leftOut);
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }

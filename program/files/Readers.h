@@ -7,7 +7,9 @@ namespace ModelingProgram {
 // One reader per format; all throw `FileError`.
 
 /// Polygons, or polylines if there are none, or points. Texture coordinates and normals become properties of the face
-/// corners ("uv", "normal"), colors after positions a property of the points ("color").
+/// corners ("uv", "normal"), colors after positions a property of the points ("color"). Objects, groups, materials and
+/// material libraries become ranges of the faces whose data is the names ("object", "group", "material",
+/// "material_library"), smoothing groups numbers of the faces ("smoothing_group", 0 for none).
 GeometryFile readObj(InputFile const& file, ReadOptions const& options);
 
 /// All three encodings. Groups of columns become one property: nx ny nz "normal", red green blue alpha "color", u v or

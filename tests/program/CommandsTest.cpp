@@ -239,10 +239,14 @@ TEST_F(Commands, MergeReportsHowAttributesWereMerged)
     json const done = runForJson("merge cube.ply spider.obj cube.ply -o cube.ply --source-attribute file");
     EXPECT_EQ(at(done, {"exitCode", "after/faces"}), json({0, 6 + 1368 + 6}));
     EXPECT_EQ(done["after"], done["before"]);
+    json const everywhere{"normal", "uv", "file"}; // the names of groups and materials are not
+    EXPECT_EQ(done["properties"].size(), everywhere.size() + 7);
     for (json const& property : done["properties"]) {
-        EXPECT_THAT(json({"normal", "uv", "file"}), testing::Contains(property["name"])) << property;
-        EXPECT_EQ(property["missingIn"].size(), 0) << property;
+        bool const isEverywhere = std::find(everywhere.begin(), everywhere.end(), property["name"]) != everywhere.end();
+        EXPECT_EQ(property["missingIn"], isEverywhere ? json::array() : json({"cube.ply", "cube.ply"})) << property;
     }
+    EXPECT_EQ(run("merge -f cube.ply spider.obj -o all.obj").exitCode, 0);
+    EXPECT_THAT(contentOf(folder / "all.obj"), AllOf(HasSubstr("mtllib spider.mtl\n"), HasSubstr("\nusemtl Skin\n")));
     store(folder / "a.xyz", "0 0 0\n1 1 1\n");
     store(folder / "b.xyz", "0 0 0 0 0 1\n");
     EXPECT_EQ(

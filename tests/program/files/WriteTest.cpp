@@ -164,6 +164,32 @@ namespace {
                 HasSubstr("f 1/1/1 2/1/2 3/1/3\nf 1/1/1 3/1/3 5/1/5 4/1/4\n")));
     }
 
+    TEST(WriteObj, preservesTheNamesOfFaces)
+    {
+        std::string const faces = "mtllib a b.mtl\nmtllib c.mtl\nv 0 0 0\nv 1 0 0\nv 1 1 0\no one two\nf 1 2 3\ng x y\n"
+                                  "usemtl red\ns 4294967295\nf 1 2 3\no two\nusemtl blue\nf 1 3 2\nusemtl red\ns 0\n"
+                                  "f 2 3 1\ng\nusemtl\nf 2 1 3\n";
+        GeometryFile const file = readContent(".obj", faces);
+        EXPECT_THAT(file.notes, testing::IsEmpty());
+        Written const again = written(*file.object, ".obj");
+        EXPECT_EQ(again.content, faces);
+        EXPECT_THAT(again.notes, testing::IsEmpty());
+        EXPECT_TRUE(sameContents(*again.object, *file.object));
+        EXPECT_THAT(written(*file.object, ".ply").notes,
+            ElementsAre("\"object_name\" (string, object) is left out: only OBJ files can hold names of faces",
+                HasSubstr("\"group_name\""), HasSubstr("\"material_name\""), HasSubstr("\"material_library_name\"")));
+        EXPECT_EQ(valuesOf<unsigned int>(*written(*file.object, ".ply").object, "smoothing_group")[1], 4294967295u);
+
+        // The merged range repeats names and libraries, and has entries beyond the names.
+        Object const merged = triangle();
+        addRangeProperty("material_library", sFaceComp, {7}, *merged);
+        addDataProperty<Orvan::String>("material_library_name", "material_library", {"a\nb", "b"}, *merged);
+        addRangeProperty("material", sFaceComp, {1}, *merged);
+        addDataProperty<Orvan::String>("material_name", "material", {"a", "#b\nv 1\\"}, *merged);
+        EXPECT_THAT(written(*merged, ".obj").content,
+            AllOf(testing::StartsWith("v 0"), HasSubstr("\nusemtl _b_v 1_\nf 1 2 3\n")));
+    }
+
     TEST(WriteStl, preservesTriangles)
     {
         Object const mesh = triangle();
