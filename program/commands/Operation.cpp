@@ -63,11 +63,11 @@ namespace {
 void requireWritable(Output const& out, GeometryType type)
 {
     if (!isWritableFormat(out.file))
-        refuseOutput(out, "its name has to end in .obj, .ply, .stl or .vtp");
+        refuseOutput(out, "its name has to end in .obj, .ply, .stl, .vtp or .glb");
     if (type == GeometryType::Strands && (hasExtension(out, ".ply") || hasExtension(out, ".stl")))
-        refuseOutput(out, "this format cannot hold strands; OBJ and VTP can");
+        refuseOutput(out, "this format cannot hold strands; OBJ, VTP and GLB can");
     if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
-        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY and VTP files can");
+        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY, VTP and GLB files can");
     requirePlace(out);
 }
 
@@ -86,14 +86,15 @@ void requirePlace(Output const& out)
 
 void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
 {
-    if (!hasExtension(out, ".stl"))
+    bool const isStl = hasExtension(out, ".stl");
+    if (!isStl && !hasExtension(out, ".glb"))
         return;
     MeshArrays const arrays = arraysOf(mesh);
     for (unsigned int face = 0; face != arrays.faceCount(); ++face)
         if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
             refuseOutput(out,
-                fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY and VTP files can hold it",
-                    face, countOf(corners, "corner")));
+                fmt::format("{} files hold triangles only, but face {} has {}; OBJ, PLY and VTP files can hold it",
+                    isStl ? "STL" : "GLB", face, countOf(corners, "corner")));
 }
 
 void requireAttribute(Output const& out, char const* option, std::string const& name)

@@ -17,6 +17,8 @@ namespace {
     std::map<std::string, Format> const& formats()
     {
         static std::map<std::string, Format> const result{
+            {".glb", {readGltf, writeGltf}},
+            {".gltf", {readGltf, nullptr}},
             {".obj", {readObj, writeObj}},
             {".off", {readOff, nullptr}},
             {".ply", {readPly, writePly}},
@@ -39,7 +41,9 @@ GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions con
 {
     Format const format = formatOf(file);
     if (!format.read)
-        throw FileError(file.string() + " cannot be read: its extension is none of .obj, .ply, .stl, .off and .xyz");
+        throw FileError(file.string()
+            + " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .glb and "
+              ".gltf");
     InputFile const input(file);
     if (input.size == 0 && format.read != readObj && format.read != readXyz) // the others have headers
         throw FileError(file.string() + " cannot be read: it is empty");
@@ -51,7 +55,7 @@ std::vector<std::string> writeGeometryFile(
 {
     Format const format = formatOf(file);
     if (!format.write)
-        throw FileError(file.string() + " cannot be written: its extension is none of .obj, .ply, .stl and .vtp");
+        throw FileError(file.string() + " cannot be written: its extension is none of .obj, .ply, .stl, .vtp and .glb");
     WritableGeometry geometry = takeApart(object, file);
     geometry.existing = options.existing;
     geometry.remark = options.remark;

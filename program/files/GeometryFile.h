@@ -40,7 +40,7 @@ struct GeometryFile {
     std::optional<Tessara::Math::double3> origin = {}; // what was subtracted from all positions
 };
 
-/// Reads OBJ, PLY, STL, OFF and XYZ files, determined by the extension in upper or lower case.
+/// Reads OBJ, PLY, STL, OFF, XYZ and glTF (.glb, .gltf) files, determined by the extension in upper or lower case.
 /// \throws FileError  if the file does not exist, is cut off, or is malformed
 GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options = {});
 
@@ -52,7 +52,7 @@ struct WriteOptions {
     std::string remark = {}; // a line of text without a line end, stored as a comment; empty for none
 };
 
-/// Writes OBJ, PLY (binary, little-endian), STL (binary) and VTP files. The file appears under its name only when it is
+/// Writes OBJ, PLY (binary, little-endian), STL (binary), VTP and GLB (binary glTF) files. The file appears under its name only when it is
 /// complete: it is written to a temporary file in the same folder first.
 /// \return what the format cannot hold and was therefore dropped or converted, one sentence each
 /// \throws FileError  if the file cannot be written, the format cannot hold this type of geometry, or the geometry is

@@ -29,4 +29,11 @@ GeometryFile readOff(InputFile const& file, ReadOptions const& options);
 /// Tables of points, as docs/program.md describes: the heading line or the values determine the columns.
 GeometryFile readXyz(InputFile const& file, ReadOptions const& options);
 
+/// glTF 2.0: the triangles of all meshes in the scene, or lines if there are none, or points, at their places in the
+/// scene. NORMAL becomes "normal", TEXCOORD_0 "uv", COLOR_0 "color", TEXCOORD_1 "uv1" and so on; an attribute whose name
+/// begins with an underscore has the rest as its name. Vertices of a mesh at equal positions become one point, and
+/// attributes in which such vertices differ become attributes of corners. If there is more than one primitive, "source"
+/// has the number of the primitive of each face, strand, or point of a cloud.
+GeometryFile readGltf(InputFile const& file, ReadOptions const& options);
+
 }

@@ -63,6 +63,7 @@ WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path 
 
 // One writer per format. They add to `leftOut`, and throw `FileError` if the format cannot hold the type of geometry.
 
+void writeGltf(WritableGeometry& geometry, std::filesystem::path const& file);
 void writeObj(WritableGeometry& geometry, std::filesystem::path const& file);
 void writePly(WritableGeometry& geometry, std::filesystem::path const& file);
 void writeStl(WritableGeometry& geometry, std::filesystem::path const& file);

@@ -50,17 +50,6 @@ namespace {
         return {contentOf(file), std::move(notes), extension == ".vtp" ? nullptr : readGeometryFile(file).object};
     }
 
-    /// The same, with its keys in alphabetical order.
-    Object sorted(Tessara::Object const& object)
-    {
-        auto keys = *object.keys();
-        std::sort(keys.begin(), keys.end());
-        Object result = Tessara::createObject();
-        for (Orvan::String const& key : keys)
-            result->setProperty(key, object.getProperty(key));
-        return result;
-    }
-
     TEST(WritePly, preservesPropertiesOfAllTypes)
     {
         Object const mesh = twoFaces();
@@ -288,7 +277,8 @@ namespace {
                 "point 1 has a coordinate that is not finite"},
             {makeMesh({{0, 0, 0}}, {0, 0}, {0, 2}), "a.obj", "face 0 has fewer than three corners"},
             {makeMesh({{0, 0, 0}}, {0, 0, 7}, {0, 3}), "a.obj", "is invalid: sFaceVertex[2] is 7"},
-            {triangle(), "a.off", "its extension is none of .obj, .ply, .stl and .vtp"},
+            {twoFaces(), "a.glb", "GLB files hold triangles only, but face 1 has 4 corners"},
+            {triangle(), "a.off", "its extension is none of .obj, .ply, .stl, .vtp and .glb"},
         };
         for (Case const& test : cases) {
             TemporaryFolder const folder;
