@@ -65,6 +65,7 @@ public:
     /// later.
     void expectPoints(std::uint64_t count);
     void expectFaces(std::uint64_t count) { raw_.faceOffset.reserve(count + 1); }
+    void expectCorners(std::uint64_t count) { raw_.faceVertex.reserve(count); }
 
     void addPoint(Coordinate const& x, Coordinate const& y, Coordinate const& z)
     {

@@ -4,6 +4,7 @@
 #include "Welder.h"
 
 #include <map>
+#include <set>
 
 namespace ModelingProgram {
 
@@ -51,6 +52,16 @@ namespace {
                 visit(element, double3{value(0), value(1), value(2)});
             });
         });
+    }
+
+    unsigned int indexAt(std::byte const* bytes, GltfScalar scalar)
+    {
+        std::uint32_t index = 0;
+        std::memcpy(&index, bytes,
+            scalar == GltfScalar::UnsignedInt         ? sizeof(std::uint32_t)
+                : scalar == GltfScalar::UnsignedShort ? sizeof(std::uint16_t)
+                                                      : sizeof(std::uint8_t));
+        return index; // little-endian
     }
 
     float3 roundedUnit(double3 const& v)
@@ -136,25 +147,67 @@ namespace {
             return primitives;
         }
 
-        /// Faces if there are any, otherwise lines, otherwise points.
+        /// The attributes of a primitive; null without positions.
+        static Json const* attributesOf(Json const& primitive)
+        {
+            auto const attributes = primitive.find("attributes");
+            bool const hasPositions =
+                attributes != primitive.end() && attributes->is_object() && attributes->contains("POSITION");
+            return hasPositions ? &*attributes : nullptr;
+        }
+
+        struct MeshSize {
+            std::uint64_t primitives = 0;
+            std::uint64_t vertices = 0; // of triangles
+            std::uint64_t corners = 0;
+        };
+
+        MeshSize measure(std::uint64_t mesh)
+        {
+            Json const& primitives = primitivesOf(mesh);
+            MeshSize size{primitives.size()};
+            std::set<std::uint64_t> counted;
+            for (std::uint64_t number = 0; number < primitives.size(); ++number) {
+                Json const& primitive = primitives[number];
+                Mode const mode = modeOf(primitive);
+                kind_ = std::max(kind_, kindOf(mode));
+                Json const* const attributes = attributesOf(primitive);
+                if (!isTriangles(mode) || !attributes)
+                    continue;
+                goTo(mesh, number);
+                std::uint64_t const positions = document_.number(*attributes, "POSITION");
+                std::uint64_t const vertexCount = document_.array(positions).count;
+                size.vertices += counted.insert(positions).second ? vertexCount : 0;
+                hasAttributes_ = hasAttributes_ || attributes->size() > 1;
+                auto const indices = document_.findNumber(primitive, "indices");
+                std::uint64_t const count = indices ? document_.array(*indices).count : vertexCount;
+                size.corners += mode == Mode::Triangles ? count : count < 3 ? 0 : 3 * (count - 2);
+            }
+            return size;
+        }
+
+        /// Faces if there are any, otherwise lines, otherwise points. Reserves the memory for faces.
         void chooseKind(std::vector<GltfInstance> const& instances)
         {
             constexpr std::uint64_t kMostPrimitives = 1 << 24; // instances may multiply a small file without end
-            std::vector<std::uint64_t> primitiveCounts(document_.list("meshes").size());
-            std::vector<bool> isKnown(primitiveCounts.size());
-            std::uint64_t total = 0;
+            std::map<std::uint64_t, MeshSize> sizes;
+            MeshSize total;
             for (GltfInstance const& instance : instances) {
-                if (!isKnown[instance.mesh]) {
-                    isKnown[instance.mesh] = true;
-                    Json const& primitives = primitivesOf(instance.mesh);
-                    primitiveCounts[instance.mesh] = primitives.size();
-                    for (Json const& primitive : primitives)
-                        kind_ = std::max(kind_, kindOf(modeOf(primitive)));
-                }
-                total += primitiveCounts[instance.mesh];
-                if (total > kMostPrimitives)
+                auto const [known, isNew] = sizes.try_emplace(instance.mesh);
+                if (isNew)
+                    known->second = measure(instance.mesh);
+                total.primitives += known->second.primitives;
+                total.vertices += known->second.vertices;
+                total.corners += known->second.corners;
+                if (total.primitives > kMostPrimitives)
                     document_.refuse("the scene has more than 16,777,216 primitives");
+                if (std::max(total.vertices, total.corners) >= GeometryBuilder::kMostElements)
+                    document_.refuse("the scene has more points or face corners than a mesh can hold");
             }
+            pointOf_.reserve(total.vertices);
+            builder_.expectFaces(total.corners / 3);
+            builder_.expectCorners(total.corners);
+            vertexOfCorner_.reserve(hasAttributes_ ? total.corners : 0);
         }
 
         void readInstance(GltfInstance const& instance)
@@ -173,8 +226,8 @@ namespace {
                     continue;
                 }
                 morphTargets_ += document_.listIn(primitive, "targets").size();
-                auto const attributes = primitive.find("attributes");
-                if (attributes == primitive.end() || !attributes->is_object() || !attributes->contains("POSITION")) {
+                Json const* const attributes = attributesOf(primitive);
+                if (!attributes) {
                     ++withoutPositions_;
                     continue;
                 }
@@ -205,7 +258,6 @@ namespace {
             bool const isMoved = !transform.isIdentity();
             bool const isExact = !isMoved && positions.scalar == GltfScalar::Float;
             double const tolerance = isExact ? 0 : kReportedFraction * reachOf(positions, transform);
-            pointOf_.reserve(pointOf_.size + positions.count);
             forEachVector(positions, [&](std::uint64_t, double3 const& local) {
                 std::uint64_t point = builder_.pointCount();
                 if (kind_ == Mode::Triangles)
@@ -349,49 +401,51 @@ namespace {
             });
         }
 
-        /// The vertices of a primitive in their order, counted from its first one.
-        Indices readIndices(Json const& primitive, std::uint64_t vertexCount)
+        /// Checks the indices of a primitive.
+        GltfArray indices(std::uint64_t accessor, std::uint64_t vertexCount)
         {
-            auto const accessor = document_.findNumber(primitive, "indices");
-            if (!accessor) {
-                Indices result(vertexCount, Orvan::kUninitialized);
-                for (unsigned int vertex = 0; vertex < vertexCount; ++vertex)
-                    result[vertex] = vertex;
-                return result;
-            }
-            GltfArray const array = document_.array(*accessor);
+            GltfArray const array = document_.array(accessor);
             bool const isUnsigned = array.scalar == GltfScalar::UnsignedByte
                 || array.scalar == GltfScalar::UnsignedShort || array.scalar == GltfScalar::UnsignedInt;
             if (array.components != 1 || !isUnsigned)
                 document_.refuse("the indices are not unsigned integers");
-            Indices result(array.count, Orvan::kUninitialized);
-            visitGltfScalar(array.scalar, [&]<class Number>(Number) {
-                array.forEach([&](std::uint64_t element, std::byte const* bytes) {
-                    Number number;
-                    std::memcpy(&number, bytes, sizeof(Number));
-                    auto const vertex = static_cast<std::uint64_t>(number);
-                    if (vertex >= vertexCount)
-                        document_.refuse("index " + std::to_string(element) + " refers to vertex "
-                            + std::to_string(vertex) + ", but there are " + std::to_string(vertexCount)
-                            + ", counted from 0");
-                    result[element] = static_cast<unsigned int>(vertex);
-                });
+            array.forEach([&](std::uint64_t element, std::byte const* bytes) {
+                std::uint64_t const vertex = indexAt(bytes, array.scalar);
+                if (vertex >= vertexCount)
+                    document_.refuse("index " + std::to_string(element) + " refers to vertex " + std::to_string(vertex)
+                        + ", but there are " + std::to_string(vertexCount) + ", counted from 0");
             });
-            return result;
+            return array;
         }
 
         void readElements(Json const& primitive, Mode mode, Vertices const& run, bool isMirrored)
         {
+            auto const accessor = document_.findNumber(primitive, "indices");
             if (mode == Mode::Points) {
-                withIndices_ += primitive.contains("indices");
+                withIndices_ += accessor ? 1 : 0;
                 return;
             }
-            Indices const vertices = readIndices(primitive, run.count);
-            auto const vertex = [&](std::uint64_t i) { return static_cast<unsigned int>(run.first + vertices[i]); };
-            if (isLines(mode))
-                readLines(mode, vertices.size, vertex);
-            else
-                readTriangles(mode, isMirrored, vertices.size, vertex);
+            auto const read = [&](std::uint64_t count, auto const& vertex) {
+                if (isLines(mode))
+                    readLines(mode, count, vertex);
+                else
+                    readTriangles(mode, isMirrored, count, vertex);
+            };
+            auto const first = static_cast<unsigned int>(run.first);
+            if (!accessor) {
+                read(run.count, [=](std::uint64_t i) { return first + static_cast<unsigned int>(i); });
+                return;
+            }
+            GltfArray const array = indices(*accessor, run.count);
+            if (array.data && array.replacedCount == 0) {
+                read(array.count,
+                    [=](std::uint64_t i) { return first + indexAt(array.data + i * array.stride, array.scalar); });
+                return;
+            }
+            Indices vertices;
+            array.forEach(
+                [&](std::uint64_t, std::byte const* bytes) { vertices.append(first + indexAt(bytes, array.scalar)); });
+            read(vertices.size, [&](std::uint64_t i) { return vertices[i]; });
         }
 
         template <class Vertex>
@@ -400,7 +454,8 @@ namespace {
             auto const add = [&](unsigned int a, unsigned int b, unsigned int c) {
                 for (unsigned int const corner : {a, isMirrored ? c : b, isMirrored ? b : c}) {
                     builder_.addCorner(pointOf_[corner]);
-                    vertexOfCorner_.append(corner);
+                    if (hasAttributes_)
+                        vertexOfCorner_.append(corner);
                 }
                 builder_.endFace();
             };
@@ -570,7 +625,8 @@ namespace {
         Mode kind_ = Mode::Points; // Points, Lines or Triangles
         Indices pointOf_; // one entry per vertex
         Indices firstVertexOf_; // one entry per point
-        Indices vertexOfCorner_;
+        bool hasAttributes_ = false; // besides positions, at faces
+        Indices vertexOfCorner_; // only if there are such attributes
         Indices strandPoints_;
         Indices strandOffset_{0u};
         Orvan::Array<int> sources_; // one entry per face, strand, or point of a cloud
