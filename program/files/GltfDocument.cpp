@@ -169,7 +169,7 @@ void GltfDocument::checkVersionAndExtensions() const
     if (!version.starts_with("2."))
         refuse("asset.version is " + TextScanner::quoted(version) + "; version 2 is read");
     for (Json const& extension : list("extensionsRequired")) {
-        std::string const name = extension.is_string() ? extension.get<std::string>() : extension.dump();
+        std::string const name = extension.is_string() ? extension.get<std::string>() : std::string();
         if (name == "KHR_draco_mesh_compression" || name == "EXT_meshopt_compression"
             || name == "KHR_meshopt_compression")
             refuse("the geometry is compressed (" + name

@@ -156,6 +156,15 @@ namespace {
             return hasPositions ? &*attributes : nullptr;
         }
 
+        /// Equal for equal attributes. (Writing JSON as text is recursive, and the values may be nested without end.)
+        std::string keyOf(Json const& attributes) const
+        {
+            std::string key;
+            for (auto const& [semantic, accessor] : attributes.items())
+                key += std::to_string(document_.number(attributes, semantic.c_str())) + " " + semantic + "\n";
+            return key;
+        }
+
         struct MeshSize {
             std::uint64_t primitives = 0;
             std::uint64_t vertices = 0; // of triangles
@@ -231,7 +240,7 @@ namespace {
                     ++withoutPositions_;
                     continue;
                 }
-                auto const [known, isNew] = knownVertices.try_emplace(attributes->dump());
+                auto const [known, isNew] = knownVertices.try_emplace(keyOf(*attributes));
                 Vertices& vertices = known->second;
                 if (isNew) {
                     vertices.first = pointOf_.size;
@@ -607,7 +616,7 @@ namespace {
             Texts extensions;
             for (Json const& extension : document_.list("extensionsUsed"))
                 if (extension != "KHR_mesh_quantization") // only allows more types of numbers
-                    extensions.add(extension.is_string() ? extension.get<std::string>() : extension.dump());
+                    extensions.add(extension.is_string() ? extension.get<std::string>() : std::string());
             if (!extensions.empty())
                 builder_.note("extensions are left out: " + extensions.countedList());
             std::vector<bool> isPlaced(document_.list("meshes").size());

@@ -249,6 +249,7 @@ namespace {
             return Gltf{primitive(4), std::string(12, '\0'), accessors, views, rest}.content();
         };
         auto const withRest = [&](std::string const& rest) { return with(accessor(5123, 3, "SCALAR"), {}, rest); };
+        std::string const deep = std::string(200'000, '[') + std::string(200'000, ']');
         std::string const whole = with(accessor(5123, 3, "SCALAR"));
         std::string versionOne = whole;
         versionOne[4] = 1;
@@ -265,6 +266,8 @@ namespace {
             {glbOf(R"({"asset":{"version":"1.0"}})", ""), "asset.version is \"1.0\""},
             {withRest(R"(,"extensionsRequired":["KHR_draco_mesh_compression"])"), "the geometry is compressed"},
             {withRest(R"(,"extensionsRequired":["X_y"])"), "requires the extension \"X_y\""},
+            {withRest(",\"extensionsRequired\":" + deep), "requires the extension"},
+            {Gltf{primitive(4, "", ",\"_x\":" + deep)}.content(), "_x is not a whole number"},
             {with({}, R"(,{"buffer":1,"byteLength":1})"), "refers to accessors 1, but the file has 1"},
             {with(R"(,{"bufferView":2,"componentType":5123,"count":3,"type":"SCALAR"})"), "refers to bufferViews 2"},
             {with(accessor(5123, 7, "SCALAR")), "mesh 0, primitive 0: accessor 1 ends after its buffer view"},
