@@ -250,7 +250,12 @@ GltfDocument::Bytes GltfDocument::loadBuffer(Json const& json, std::uint64_t ind
     }
     std::string const uri = text(json, "uri");
     if (!uri.starts_with("data:")) {
-        files_.push_back(std::make_unique<InputFile>(fileBeside(uri)));
+        std::filesystem::path const path = fileBeside(uri);
+        try {
+            files_.push_back(std::make_unique<InputFile>(path));
+        } catch (FileError const& error) {
+            refuse("buffer " + std::to_string(index) + ": " + error.what());
+        }
         return {reinterpret_cast<std::byte const*>(files_.back()->bytes.get()), files_.back()->size};
     }
     std::size_t const comma = uri.find(',');

@@ -2,6 +2,8 @@
 
 #include <TessaraMathSupport/Types.h>
 
+#include <array>
+
 namespace ModelingProgram {
 
 using Tessara::Math::double3;
