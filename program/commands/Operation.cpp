@@ -65,15 +65,17 @@ namespace {
     /// Refuses a mesh with faces that the format cannot hold.
     void requireWritableFaces(Output const& out, Tessara::Object const& mesh)
     {
-        if (!hasExtension(out, ".stl"))
+        bool const isStl = hasExtension(out, ".stl");
+        if (!isStl && !hasExtension(out, ".glb"))
             return;
         MeshArrays const arrays = arraysOf(mesh);
         for (unsigned int face = 0; face != arrays.faceCount(); ++face)
             if (std::size_t const corners = arrays.corners(face).size(); corners != 3)
                 refuseOutput(out,
-                    fmt::format("STL files hold triangles only, but face {} has {}; OBJ, PLY, VTP and HDF5 files can "
-                                "hold it",
-                        face, countOf(corners, "corner")));
+                    fmt::format(
+                        "{} files hold triangles only, but face {} has {}; OBJ, PLY, VTP and HDF5 files can hold "
+                        "it",
+                        isStl ? "STL" : "GLB", face, countOf(corners, "corner")));
     }
 
 }
@@ -101,11 +103,11 @@ void chooseOutput(char const* command, FileList& files)
 void requireHolds(Output const& out, GeometryType type)
 {
     if (!isWritableFormat(out.file))
-        refuseOutput(out, "its name has to end in .obj, .ply, .stl, .vtp or .h5");
+        refuseOutput(out, "its name has to end in .obj, .ply, .stl, .vtp, .glb or .h5");
     if (type == GeometryType::Strands && (hasExtension(out, ".ply") || hasExtension(out, ".stl")))
-        refuseOutput(out, "this format cannot hold strands; OBJ, VTP and HDF5 can");
+        refuseOutput(out, "this format cannot hold strands; OBJ, VTP, GLB and HDF5 can");
     if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
-        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY, VTP and HDF5 files can");
+        refuseOutput(out, "STL files cannot hold point clouds; OBJ, PLY, VTP, GLB and HDF5 files can");
 }
 
 void requireHolds(Output const& out, Tessara::Object const& object)

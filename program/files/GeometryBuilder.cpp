@@ -208,13 +208,23 @@ Orvan::MutablePtr<Tessara::Object> GeometryBuilder::makeObject()
 void GeometryBuilder::addProperties(Tessara::Object& object)
 {
     for (Property& property : properties_) {
-        if (property.component != std::string_view(sPointComp) && !object.hasProperty(sFaceComp))
+        if (!object.hasProperty(property.component))
             continue;
         std::string name = property.name;
         std::replace(name.begin(), name.end(), '\0', '_'); // property names cannot contain null characters
         while (isReservedName(name) || object.hasProperty(Orvan::String(name)))
             name.insert(0, namePrefix(property.component));
         object.setProperty(Orvan::String(name), Orvan::Ptr<Tessara::Object>(std::move(property.object)));
+    }
+    for (FaceNames& faceNames : faceNames_) {
+        if (!object.hasProperty(sFaceComp))
+            continue;
+        std::string name = faceNames.name;
+        while (object.hasProperty(Orvan::String(name)) || object.hasProperty(Orvan::String(name + kNameSuffix)))
+            name.insert(0, namePrefix(sFaceComp));
+        addRangeProperty(Orvan::String(name), sFaceComp, std::move(faceNames.numbers), object);
+        addDataProperty<Orvan::String>(
+            Orvan::String(name + kNameSuffix), Orvan::String(name), std::move(faceNames.names), object);
     }
 }
 

@@ -27,6 +27,9 @@ bool isReservedName(std::string_view name);
 /// that they are written under the same names.
 inline constexpr char const* sColumnNames = "columnNames";
 
+/// What the name of a range of faces is extended by to name its data, the names of the faces.
+inline constexpr char const* kNameSuffix = "_name";
+
 /// A point near the middle of the positions with few digits, so that it can be read, typed and added back: its
 /// coordinates are multiples of a power of ten about as large as the box of the positions. `wide` has the same positions
 /// in double precision; those that are not finite in single precision do not count.
@@ -68,6 +71,7 @@ public:
     /// later.
     void expectPoints(std::uint64_t count);
     void expectFaces(std::uint64_t count) { raw_.faceOffset.reserve(count + 1); }
+    void expectCorners(std::uint64_t count) { raw_.faceVertex.reserve(count); }
 
     void addPoint(Coordinate const& x, Coordinate const& y, Coordinate const& z)
     {
@@ -129,11 +133,18 @@ public:
         return result;
     }
 
+    /// Adds names of faces, one number of a name per face: a range property with this name, and the names as the data of
+    /// this range. So each name is stored once, however many faces have it.
+    void addFaceNames(std::string name, Orvan::Array<unsigned int> numbers, Orvan::Array<Orvan::String> names)
+    {
+        faceNames_.push_back({std::move(name), std::move(numbers), std::move(names)});
+    }
+
     void note(std::string sentence) { notes_.push_back(std::move(sentence)); }
     /// Adds a note if the scanner has not reached the end of the file.
     void noteBytesLeft();
 
-    /// The geometry. Properties of faces are dropped if there are no faces.
+    /// The geometry. Properties of faces and corners are dropped if there are no faces, those of strands likewise.
     GeometryFile finish(std::string format) &&;
 
     static constexpr std::uint64_t kMostElements = Tessara::Geometry::kDeletedElement;
@@ -143,6 +154,12 @@ private:
         std::string name;
         char const* component;
         Orvan::MutablePtr<Tessara::Object> object;
+    };
+
+    struct FaceNames {
+        std::string name;
+        Orvan::Array<unsigned int> numbers;
+        Orvan::Array<Orvan::String> names;
     };
 
     template <class T> void addShared(std::string const& name, char const* component,
@@ -171,6 +188,7 @@ private:
     double largestLoss_ = 0; // of coordinates that lose digits
     bool hasUnusableElements_ = false;
     std::vector<Property> properties_;
+    std::vector<FaceNames> faceNames_;
     std::vector<std::string> notes_;
 };
 

@@ -18,6 +18,8 @@ namespace {
     std::map<std::string, Format> const& formats()
     {
         static std::map<std::string, Format> const result{
+            {".glb", {readGltf, writeGltf}},
+            {".gltf", {readGltf, nullptr}},
             {".obj", {readObj, writeObj}},
             {".off", {readOff, nullptr}},
             {".ply", {readPly, writePly}},
@@ -42,8 +44,8 @@ GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions con
         return readHdf5Geometry(*location, options);
     Format const format = formatOf(file);
     if (!format.read)
-        throw FileError(
-            file.string() + " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .h5 and .hdf5");
+        throw FileError(file.string()
+            + " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .glb, .gltf, .h5 and .hdf5");
     InputFile const input(file);
     if (input.size == 0 && format.read != readObj && format.read != readXyz) // the others have headers
         throw FileError(file.string() + " cannot be read: it is empty");
@@ -60,10 +62,13 @@ std::vector<std::string> writeGeometryFile(
     Format const format = formatOf(file);
     if (!format.write)
         throw FileError(
-            file.string() + " cannot be written: its extension is none of .obj, .ply, .stl, .vtp, .h5 and .hdf5");
+            file.string() + " cannot be written: its extension is none of .obj, .ply, .stl, .vtp, .glb, .h5 and .hdf5");
     WritableGeometry geometry = takeApart(object, file);
     geometry.existing = options.existing;
     geometry.remark = options.remark;
+    if (format.write != writeObj)
+        for (FaceNames const& names : geometry.faceNames)
+            leaveOut(names.data, "only OBJ files can hold names of faces", geometry.leftOut);
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }

@@ -44,8 +44,9 @@ struct GeometryFile {
     std::optional<Tessara::Math::double3> origin = {}; // what was subtracted from all positions
 };
 
-/// Reads OBJ, PLY, STL, OFF, XYZ and HDF5 files, determined by the extension in upper or lower case. "scan.h5#left" is
-/// one of several objects in an HDF5 file. The object of an HDF5 file may be invalid, that of other files never is.
+/// Reads OBJ, PLY, STL, OFF, XYZ, glTF (.glb, .gltf) and HDF5 files, determined by the extension in upper or lower case.
+/// "scan.h5#left" is one of several objects in an HDF5 file. The object of an HDF5 file may be invalid, that of other
+/// files never is.
 /// \throws FileError  if the file does not exist, is cut off, or is malformed
 GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options = {});
 
@@ -58,8 +59,8 @@ struct WriteOptions {
     unsigned int compression = 0; // of HDF5 files, 1 to 9 as those of gzip; 0 for none
 };
 
-/// Writes OBJ, PLY (binary, little-endian), STL (binary), VTP and HDF5 files. The file appears under its name only when it is
-/// complete: it is written to a temporary file in the same folder first.
+/// Writes OBJ, PLY (binary, little-endian), STL (binary), VTP, GLB (binary glTF) and HDF5 files. The file appears under
+/// its name only when it is complete: it is written to a temporary file in the same folder first.
 /// \return what the format cannot hold and was therefore dropped or converted, one sentence each
 /// \throws FileError  if the file cannot be written, the format cannot hold this type of geometry, or the geometry is
 ///                    invalid, has positions that are not finite or faces with fewer than three corners; an existing

@@ -1,8 +1,9 @@
 #include "Readers.h"
+#include "Texts.h"
 
 #include <TessaraGeometry/Names.h>
 
-#include <set>
+#include <unordered_map>
 
 namespace ModelingProgram {
 
@@ -14,26 +15,82 @@ namespace {
 
     constexpr float3 kWhite{1, 1, 1};
 
-    /// Distinct strings in order of appearance.
-    class Texts {
+    /// Names that statements give to all faces after them, such as materials, as runs of faces with the same name.
+    class NameRuns {
     public:
-        void add(std::string_view text)
+        struct Kind {
+            std::string_view keyword;
+            char const* property;
+            char const* plural;
+        };
+
+        explicit NameRuns(Kind const& namedParts)
+            : kind(namedParts)
         {
-            if (known_.insert(std::string(text)).second && known_.size() <= kShown)
-                shown_ += (shown_.empty() ? "" : ", ") + TextScanner::quoted(text);
+            begin({}, 0);
         }
-        bool empty() const { return known_.empty(); }
-        std::string list() const
+
+        Kind const kind;
+
+        /// Faces from this one on have this name; the empty name means none.
+        void begin(std::string_view name, std::uint64_t face)
         {
-            return shown_ + (known_.size() > kShown ? " and " + std::to_string(known_.size() - kShown) + " more" : "");
+            auto const [known, isNew] = numbers_.try_emplace(std::string(name), numbers_.size());
+            if (isNew)
+                names_.push_back(known->first);
+            if (!runs_.empty() && runs_.back().firstFace == face)
+                runs_.pop_back();
+            runs_.push_back({face, known->second});
         }
-        std::string countedList() const { return std::to_string(known_.size()) + " (" + list() + ")"; }
+
+        struct Numbered {
+            Orvan::Array<unsigned int> numbers; // of the texts of all faces; empty if no face has a name
+            Orvan::Array<Orvan::String> texts; // each once; empty for faces without a name
+            Texts unused; // names without faces
+        };
+
+        Numbered numbered(std::uint64_t faceCount) const
+        {
+            Numbered result;
+            std::uint64_t namedCount = 0;
+            forEachRun(
+                faceCount, [&](std::size_t, std::uint64_t first, std::uint64_t end) { namedCount += end - first; });
+            result.numbers.resize(namedCount != 0 ? faceCount : 0);
+            if (namedCount != 0 && namedCount != faceCount)
+                result.texts.append("");
+            std::vector<unsigned int> numberOf(names_.size(), kInvalidIndex);
+            forEachRun(faceCount, [&](std::size_t name, std::uint64_t first, std::uint64_t end) {
+                if (numberOf[name] == kInvalidIndex) {
+                    numberOf[name] = static_cast<unsigned int>(result.texts.size);
+                    result.texts.append(Orvan::String(names_[name]));
+                }
+                std::fill(result.numbers.data + first, result.numbers.data + end, numberOf[name]);
+            });
+            for (std::size_t name = 1; name < names_.size(); ++name)
+                if (numberOf[name] == kInvalidIndex)
+                    result.unused.add(names_[name]);
+            return result;
+        }
 
     private:
-        static constexpr std::size_t kShown = 5;
+        struct Run {
+            std::uint64_t firstFace;
+            std::size_t name;
+        };
 
-        std::set<std::string> known_;
-        std::string shown_;
+        /// Calls `visit(name, first, end)` for each run of faces that have one.
+        template <class Visit> void forEachRun(std::uint64_t faceCount, Visit const& visit) const
+        {
+            for (std::size_t run = 0; run < runs_.size(); ++run) {
+                std::uint64_t const end = run + 1 < runs_.size() ? runs_[run + 1].firstFace : faceCount;
+                if (runs_[run].name != 0 && runs_[run].firstFace != end)
+                    visit(runs_[run].name, runs_[run].firstFace, end);
+            }
+        }
+
+        std::unordered_map<std::string, std::size_t> numbers_;
+        std::vector<std::string_view> names_; // the keys of `numbers_`; the first is empty
+        std::vector<Run> runs_; // ends where the next one begins
     };
 
     class ObjReader {
@@ -56,6 +113,7 @@ namespace {
             addCornerValues("normal", normalOf_, normals_);
             noteUnused("texture coordinates (vt)", textureOf_, textures_.size);
             addPointValues();
+            addFaceNames();
             noteLeftOut();
             return std::move(builder_).finish("OBJ");
         }
@@ -93,7 +151,7 @@ namespace {
             TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
             scanner.skipEmptyLines();
             std::string_view const keyword = scanner.atEnd() ? std::string_view() : scanner.peekWord();
-            if (!keyword.empty() && !isGeometry(keyword) && !namesOf(keyword) && keyword != "p")
+            if (!keyword.empty() && !isGeometry(keyword) && !namesOf(keyword) && keyword != "mtllib" && keyword != "p")
                 scanner.refuse(TextScanner::quoted(keyword) + " is not a keyword of OBJ files");
         }
 
@@ -123,32 +181,34 @@ namespace {
             return keyword == "v" || keyword == "f" || keyword == "vt" || keyword == "vn" || keyword == "l";
         }
 
-        struct Names {
-            std::string_view keyword;
-            char const* plural;
-            Texts names;
-        };
-
         /// Null if the keyword does not name parts of the geometry.
-        Names* namesOf(std::string_view keyword)
+        NameRuns* namesOf(std::string_view keyword)
         {
-            auto const known = std::find_if(
-                std::begin(names_), std::end(names_), [=](Names const& names) { return names.keyword == keyword; });
+            auto const known = std::find_if(std::begin(names_), std::end(names_),
+                [=](NameRuns const& names) { return names.kind.keyword == keyword; });
             return known == std::end(names_) ? nullptr : known;
         }
 
-        /// Reads names of parts of the geometry. Those of `s` are numbers; 0 and off mean none.
+        /// Reads a name of the faces that follow. A face can be in several groups, which are kept as one name.
         bool readName(std::string_view keyword)
         {
-            Names* const known = namesOf(keyword);
+            if (keyword == "mtllib") {
+                if (std::string_view const library = in_.restOfLine(); !library.empty())
+                    libraries_.add(library);
+                return true;
+            }
+            NameRuns* const known = namesOf(keyword);
             if (!known)
                 return false;
-            if (keyword == "g")
-                for (std::string_view name = in_.word(); !name.empty(); name = in_.word())
-                    known->names.add(name);
-            else if (std::string_view const name = in_.restOfLine();
-                     !name.empty() && (keyword != "s" || (name != "0" && name != "off")))
-                known->names.add(name);
+            std::string_view name = in_.restOfLine();
+            if (keyword == "g") {
+                groups_.clear();
+                for (std::string_view group = in_.word(); !group.empty(); group = in_.word())
+                    groups_.append(groups_.empty() ? "" : " ").append(group);
+                name = groups_;
+            }
+            bool const isNone = keyword == "s" && (name == "0" || name == "off");
+            known->begin(isNone ? std::string_view() : name, builder_.faceCount());
             return true;
         }
 
@@ -317,6 +377,53 @@ namespace {
             builder_.makeStrands(std::move(lineOffset_), linePoints_);
         }
 
+        /// Each name that faces have is stored once, and the number of their name for all faces.
+        void addFaceNames()
+        {
+            std::uint64_t const faceCount = builder_.faceCount();
+            for (NameRuns const& names : names_) {
+                NameRuns::Numbered faces = names.numbered(faceCount);
+                if (!faces.unused.empty())
+                    builder_.note(
+                        std::string(names.kind.plural) + " without faces are left out: " + faces.unused.countedList());
+                if (faces.numbers.empty())
+                    continue;
+                if (names.kind.keyword == "s")
+                    addSmoothingGroups(std::move(faces.numbers), faces.texts);
+                else
+                    builder_.addFaceNames(names.kind.property, std::move(faces.numbers), std::move(faces.texts));
+            }
+            if (faceCount != 0 && !libraries_.empty())
+                builder_.addFaceNames("material_library", Orvan::Array<unsigned int>(faceCount),
+                    {Orvan::String(std::string_view(libraries_.lines()))});
+            else if (!libraries_.empty())
+                builder_.note("material libraries are left out: " + libraries_.countedList());
+        }
+
+        /// Smoothing groups are numbers; "on" is written by some programs.
+        void addSmoothingGroups(Orvan::Array<unsigned int> groups, Orvan::Array<Orvan::String> const& texts)
+        {
+            Texts unknown;
+            std::vector<unsigned int> groupOf(texts.size);
+            for (std::size_t text = 0; text < texts.size; ++text) {
+                std::string_view const name = texts[text].view();
+                if (name.empty())
+                    continue; // 0
+                auto const [rest, error] = std::from_chars(name.data(), name.data() + name.size(), groupOf[text]);
+                if (name == "on")
+                    groupOf[text] = 1;
+                else if (error != std::errc{} || rest != name.data() + name.size()) {
+                    groupOf[text] = 0;
+                    unknown.add(name);
+                }
+            }
+            for (unsigned int& group : groups)
+                group = groupOf[group];
+            if (!unknown.empty())
+                builder_.note("smoothing groups that are not numbers are left out: " + unknown.countedList());
+            builder_.addProperty<unsigned int>("smoothing_group", sFaceComp, std::move(groups));
+        }
+
         void noteLeftOut()
         {
             auto const noteCount = [&](std::uint64_t count, char const* what) {
@@ -326,9 +433,6 @@ namespace {
             noteCount(pointElements_, " lines of point elements (p) are left out: every point is kept anyway");
             noteCount(weightedPoints_, " weights of points are left out");
             noteCount(deepTextures_, " third texture coordinates are left out");
-            for (Names const& names : names_)
-                if (!names.names.empty())
-                    builder_.note(std::string(names.plural) + " are left out: " + names.names.countedList());
             if (!unknownKeywords_.empty())
                 builder_.note("lines that begin with " + unknownKeywords_.list() + " are left out");
         }
@@ -348,8 +452,10 @@ namespace {
         std::uint64_t pointElements_ = 0;
         std::uint64_t weightedPoints_ = 0;
         std::uint64_t deepTextures_ = 0;
-        Names names_[5] = {{"o", "objects", {}}, {"g", "groups", {}}, {"s", "smoothing groups", {}},
-            {"usemtl", "materials", {}}, {"mtllib", "material libraries", {}}};
+        NameRuns names_[4] = {NameRuns({"o", "object", "objects"}), NameRuns({"g", "group", "groups"}),
+            NameRuns({"s", "smoothing_group", "smoothing groups"}), NameRuns({"usemtl", "material", "materials"})};
+        std::string groups_; // of a statement
+        Texts libraries_;
         Texts unknownKeywords_;
     };
 

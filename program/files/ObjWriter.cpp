@@ -1,6 +1,8 @@
 #include "Welder.h"
 #include "Writers.h"
 
+#include <set>
+
 namespace ModelingProgram {
 
 using namespace Tessara::Geometry;
@@ -21,6 +23,25 @@ namespace {
             return isOfPoints ? point : numbers[corner];
         }
     };
+
+    /// A statement that names all faces after it.
+    struct NameStatement {
+        char const* keyword;
+        FaceNames const* names = nullptr;
+        unsigned int number = kInvalidIndex; // of the last face
+        std::string_view text = {}; // its name; empty for none, as at the start of the file
+    };
+
+    /// A name as one line of the file: nothing in it ends the line, continues it, or begins a comment.
+    std::string inOneLine(std::string_view text)
+    {
+        std::string line(text);
+        std::replace_if(
+            line.begin(), line.end(), [](char c) { return c == '\n' || c == '\r' || c == '#'; }, '_');
+        if (line.ends_with('\\'))
+            line.back() = '_';
+        return line;
+    }
 
     template <class T> OutputFile& writeComponents(T const& vector, OutputFile& out)
     {
@@ -43,6 +64,7 @@ namespace {
             OutputFile out(file, geometry_.existing);
             if (!geometry_.remark.empty())
                 out << "# " << geometry_.remark << "\n";
+            writeLibraries(out);
             writePoints(out);
             writeVectors<float2, double2>("vt", textures_, out);
             writeVectors<float3, double3>("vn", normals_, out);
@@ -64,9 +86,38 @@ namespace {
                 }
             }
             for (Attribute const& attribute : geometry_.attributes) {
-                if (attribute.component != sFaceVertexComp && attribute.component != sPointComp)
+                if (attribute.component != sFaceVertexComp && attribute.component != sPointComp
+                    && !takeSmoothingGroups(attribute))
                     leaveOut(attribute, "OBJ files cannot hold it", geometry_.leftOut);
             }
+            for (FaceNames const& names : geometry_.faceNames) {
+                if (!takeNames(names))
+                    leaveOut(names.data, "OBJ files cannot hold it", geometry_.leftOut);
+            }
+        }
+
+        bool takeSmoothingGroups(Attribute const& attribute)
+        {
+            auto const* const groups = attribute.values.get<Orvan::Ptr<Orvan::Array<unsigned int>>>();
+            if (!groups || attribute.name != "smoothing_group" || attribute.component != sFaceComp)
+                return false;
+            smoothingGroups_ = *groups;
+            return true;
+        }
+
+        bool takeNames(FaceNames const& names)
+        {
+            if (names.name == "material_library") {
+                libraries_ = &names;
+                return true;
+            }
+            constexpr std::pair<char const*, std::string_view> kKeywords[] = {
+                {"o", "object"}, {"g", "group"}, {"usemtl", "material"}};
+            for (auto const& [keyword, name] : kKeywords) {
+                if (names.name == name)
+                    statements_.push_back({keyword, &names});
+            }
+            return !statements_.empty() && statements_.back().names == &names;
         }
 
         bool isTaken(Attribute const& attribute)
@@ -114,6 +165,28 @@ namespace {
             });
         }
 
+        /// Each library that faces refer to, once. The text of a face has a line per library.
+        void writeLibraries(OutputFile& out) const
+        {
+            if (!libraries_)
+                return;
+            std::vector<bool> isUsed(libraries_->texts->size);
+            for (unsigned int const number : *libraries_->numbers) {
+                if (number < isUsed.size())
+                    isUsed[number] = true;
+            }
+            std::set<std::string_view> written;
+            for (unsigned int number = 0; number < isUsed.size(); ++number) {
+                std::string_view rest = isUsed[number] ? libraries_->textAt(number) : std::string_view();
+                while (!rest.empty()) {
+                    std::string_view const library = rest.substr(0, rest.find('\n'));
+                    rest.remove_prefix(std::min(rest.size(), library.size() + 1));
+                    if (!library.empty() && written.insert(library).second)
+                        out << "mtllib " << inOneLine(library) << "\n";
+                }
+            }
+        }
+
         void writePoints(OutputFile& out) const
         {
             Orvan::Array<float3> const& positions = *geometry_.positions;
@@ -149,11 +222,31 @@ namespace {
             static_cast<void>((visitAs<T>(vectors.list, writeAll) || ...));
         }
 
-        void writeFaces(OutputFile& out) const
+        void writeNames(std::uint64_t face, OutputFile& out)
+        {
+            for (NameStatement& statement : statements_) {
+                unsigned int const number = (*statement.names->numbers)[face];
+                if (number == statement.number)
+                    continue;
+                statement.number = number;
+                std::string_view const text = statement.names->textAt(number);
+                if (text == statement.text)
+                    continue;
+                statement.text = text;
+                out << statement.keyword << (text.empty() ? "" : " ") << inOneLine(text) << "\n";
+            }
+            if (smoothingGroups_ && (*smoothingGroups_)[face] != smoothingGroup_) {
+                smoothingGroup_ = (*smoothingGroups_)[face];
+                out << "s " << smoothingGroup_ << "\n"; // 0 is off
+            }
+        }
+
+        void writeFaces(OutputFile& out)
         {
             Orvan::Array<unsigned int> const& point = *geometry_.faceVertex;
             Orvan::Array<unsigned int> const& offset = *geometry_.offsets;
             for (std::uint64_t face = 0; face + 1 < offset.size; ++face) {
+                writeNames(face, out);
                 out << "f";
                 for (std::uint64_t corner = offset[face]; corner < offset[face + 1]; ++corner) {
                     out << " " << oneBased(point[corner]);
@@ -190,6 +283,10 @@ namespace {
         Tessara::PropertyValue colors_;
         Vectors textures_;
         Vectors normals_;
+        FaceNames const* libraries_ = nullptr;
+        std::vector<NameStatement> statements_;
+        Orvan::Ptr<Orvan::Array<unsigned int>> smoothingGroups_; // null if there are none
+        unsigned int smoothingGroup_ = 0; // of the last face
     };
 
 }

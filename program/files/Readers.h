@@ -7,7 +7,9 @@ namespace ModelingProgram {
 // One reader per format; all throw `FileError`.
 
 /// Polygons, or polylines if there are none, or points. Texture coordinates and normals become properties of the face
-/// corners ("uv", "normal"), colors after positions a property of the points ("color").
+/// corners ("uv", "normal"), colors after positions a property of the points ("color"). Objects, groups, materials and
+/// material libraries become ranges of the faces whose data is the names ("object", "group", "material",
+/// "material_library"), smoothing groups numbers of the faces ("smoothing_group", 0 for none).
 GeometryFile readObj(InputFile const& file, ReadOptions const& options);
 
 /// All three encodings. Groups of columns become one property: nx ny nz "normal", red green blue alpha "color", u v or
@@ -26,5 +28,12 @@ GeometryFile readOff(InputFile const& file, ReadOptions const& options);
 
 /// Tables of points, as docs/program.md describes: the heading line or the values determine the columns.
 GeometryFile readXyz(InputFile const& file, ReadOptions const& options);
+
+/// glTF 2.0: the triangles of all meshes in the scene, or lines if there are none, or points, at their places in the
+/// scene. NORMAL becomes "normal", TEXCOORD_0 "uv", COLOR_0 "color", TEXCOORD_1 "uv1" and so on; an attribute whose name
+/// begins with an underscore has the rest as its name. Vertices of a mesh at equal positions become one point, and
+/// attributes in which such vertices differ become attributes of corners. If there is more than one primitive, "source"
+/// has the number of the primitive of each face, strand, or point of a cloud.
+GeometryFile readGltf(InputFile const& file, ReadOptions const& options);
 
 }

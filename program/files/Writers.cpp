@@ -53,11 +53,26 @@ namespace {
         return isReservedName(plain) || object.hasProperty(Orvan::String(plain)) ? plain : std::string(name.view());
     }
 
+    /// \return whether the attribute is the names of a range of faces
+    bool addFaceNames(Tessara::Object const& object, Attribute const& attribute, WritableGeometry& geometry)
+    {
+        auto const* const texts = attribute.values.get<Orvan::Ptr<Orvan::Array<Orvan::String>>>();
+        auto numbers = getRangeGeoPropIndices(object, attribute.component);
+        bool const isOfFaces = texts && *texts && numbers && geometry.kind == WritableGeometry::Kind::Mesh
+            && getGeoPropTargetName(object, attribute.component) == sFaceComp && numbers->size == geometry.cellCount();
+        if (isOfFaces)
+            geometry.faceNames.push_back(
+                {nameInFile(object, attribute.component, sFaceComp), attribute, *texts, std::move(numbers)});
+        return isOfFaces;
+    }
+
     void addAttribute(Tessara::Object const& object, Orvan::String const& name, WritableGeometry& geometry)
     {
         Orvan::Ptr<Tessara::Object> const property = getDataGeoProperty(object, name);
         Attribute attribute{
             std::string(name.view()), getGeoPropTargetName(object, name), property->getProperty(sData), {}};
+        if (addFaceNames(object, attribute, geometry))
+            return;
         bool const isOfElements = !namePrefix(attribute.component).empty() && object.hasProperty(attribute.component);
         if (!isOfElements) {
             leaveOut(attribute, "it belongs to a range or to nothing, not to elements", geometry.leftOut);

@@ -16,6 +16,19 @@ struct Attribute {
     std::string columnNames; // from the input file, if any
 };
 
+/// Names of faces, each stored once. Files other than OBJ cannot hold them.
+struct FaceNames {
+    std::string name; // of the range
+    Attribute data; // of the range
+    Orvan::Ptr<Orvan::Array<Orvan::String>> texts;
+    Orvan::Ptr<Orvan::Array<unsigned int>> numbers; // one entry per face: its text, perhaps beyond the last one
+
+    std::string_view textAt(unsigned int number) const
+    {
+        return number < texts->size ? (*texts)[number].view() : std::string_view();
+    }
+};
+
 /// The arrays of a valid object. A mesh has faces, a strand set has strands, a point cloud has neither.
 struct WritableGeometry {
     enum class Kind { Mesh, Strands, PointCloud } kind;
@@ -23,6 +36,7 @@ struct WritableGeometry {
     Orvan::Ptr<Orvan::Array<unsigned int>> faceVertex;
     Orvan::Ptr<Orvan::Array<unsigned int>> offsets; // of faces or strands
     std::vector<Attribute> attributes;
+    std::vector<FaceNames> faceNames;
     std::string remark; // becomes a comment
     std::vector<std::string> leftOut; // what the file does not contain, one sentence each
     Existing existing = Existing::Replace;
@@ -53,6 +67,7 @@ WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path 
 
 // One writer per format. They add to `leftOut`, and throw `FileError` if the format cannot hold the type of geometry.
 
+void writeGltf(WritableGeometry& geometry, std::filesystem::path const& file);
 void writeObj(WritableGeometry& geometry, std::filesystem::path const& file);
 void writePly(WritableGeometry& geometry, std::filesystem::path const& file);
 void writeStl(WritableGeometry& geometry, std::filesystem::path const& file);

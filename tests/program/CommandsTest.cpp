@@ -240,10 +240,14 @@ TEST_F(Commands, MergeReportsHowAttributesWereMerged)
     json const done = runForJson("merge cube.ply spider.obj cube.ply -o cube.ply --source-attribute file");
     EXPECT_EQ(at(done, {"exitCode", "after/faces"}), json({0, 6 + 1368 + 6}));
     EXPECT_EQ(done["after"], done["before"]);
+    json const everywhere{"normal", "uv", "file"}; // the names of groups and materials are not
+    EXPECT_EQ(done["properties"].size(), everywhere.size() + 7);
     for (json const& property : done["properties"]) {
-        EXPECT_THAT(json({"normal", "uv", "file"}), testing::Contains(property["name"])) << property;
-        EXPECT_EQ(property["missingIn"].size(), 0) << property;
+        bool const isEverywhere = std::find(everywhere.begin(), everywhere.end(), property["name"]) != everywhere.end();
+        EXPECT_EQ(property["missingIn"], isEverywhere ? json::array() : json({"cube.ply", "cube.ply"})) << property;
     }
+    EXPECT_EQ(run("merge -f cube.ply spider.obj -o all.obj").exitCode, 0);
+    EXPECT_THAT(contentOf(folder / "all.obj"), AllOf(HasSubstr("mtllib spider.mtl\n"), HasSubstr("\nusemtl Skin\n")));
     store(folder / "a.xyz", "0 0 0\n1 1 1\n");
     store(folder / "b.xyz", "0 0 0 0 0 1\n");
     EXPECT_EQ(
@@ -429,7 +433,7 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesUnchanged)
         {"triangulate cube.ply out.obj --channels '* ^'", 2, "--channels: "},
         {"triangulate cube.ply out.obj --channels ' , '", 2, "--channels: the list has no entry"},
         {"remove-slivers broken.obj out.obj", 3, "broken.obj"},
-        {"remove-slivers cylinder.obj out.off", 3, "has to end in .obj, .ply, .stl, .vtp or .h5"},
+        {"remove-slivers cylinder.obj out.off", 3, "has to end in .obj, .ply, .stl, .vtp, .glb or .h5"},
         {"remove-slivers cylinder.obj nowhere/out.obj", 3, "there is no folder nowhere"},
         {"remove-slivers cylinder.obj folder.obj", 3, "it is a folder"},
         {"remove-slivers cylinder.obj out.obj --ratio 1.5", 2, "1.5 is not a number from 0 to 1"},
@@ -447,6 +451,7 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesUnchanged)
         {"make-volume bunny.obj out.vdb --distance-to 0 0 0 --voxel-size 1e-9", 5, "too small"},
         {"delete-points cloud.ply out.stl --indices list", 3, "STL files cannot hold point clouds"},
         {"delete-faces cube.ply out.stl --indices list", 3, "STL files hold triangles only, but face 0 has 4 corners"},
+        {"delete-faces cube.ply out.glb --indices list", 3, "GLB files hold triangles only, but face 0 has 4 corners"},
         {"merge cube.ply spider.obj out.obj --source-attribute file", 5, "out.obj cannot hold the attribute \"file\""},
         {"add-points cloud.ply cube.ply out.ply --tag x", 5, "PLY files cannot hold an attribute named \"x\""},
         {"triangulate cube.ply out.obj --channels 'nor* normal'", 5, "matches \"nor*\". There are: none"},

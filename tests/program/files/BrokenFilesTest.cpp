@@ -30,7 +30,7 @@ namespace {
         addDataProperty<float4>("axis", sFaceComp, Orvan::Array<float4>(2, {1, 2, 3, 4}), *mesh);
         TemporaryFolder const folder;
         std::map<std::string, std::string> files;
-        for (std::string const extension : {".obj", ".ply", ".stl"}) {
+        for (std::string const extension : {".glb", ".obj", ".ply", ".stl"}) {
             writeGeometryFile(*mesh, folder / ("a" + extension));
             files[extension] = contentOf(folder / ("a" + extension));
         }
@@ -46,6 +46,15 @@ namespace {
         files["-text.stl"] =
             "solid\nfacet normal 0 0 1\nouter loop\nvertex 0 0 0\nvertex 1 0 0\nvertex 0 1 0\nendloop\n"
             "endfacet\nendsolid\n";
+        files["-sparse.gltf"] =
+            R"({"asset":{"version":"2.0"},"buffers":[{"byteLength":48,"uri":"data:;base64,)"
+            R"(AAAAAAAAAAAAAAAAAACAPwAAAAAAAAAAAACAPwAAgD8AAAAAAAAAAAAAgD8AAAAA"}],"bufferViews":[{"buffer":0,)"
+            R"("byteLength":48,"byteStride":12}],"accessors":[{"bufferView":0,"componentType":5126,"count":4,)"
+            R"("type":"VEC3"},{"componentType":5126,"count":4,"type":"VEC2","sparse":{"count":1,"indices":{)"
+            R"("bufferView":0,"byteOffset":8,"componentType":5121},"values":{"bufferView":0,"byteOffset":8}}}],)"
+            R"("meshes":[{"primitives":[{"attributes":{"POSITION":0,"TEXCOORD_0":1},"mode":5},{"attributes":{)"
+            R"("POSITION":0,"_x":1},"mode":3}]}],"scenes":[{"nodes":[0]}],"nodes":[{"children":[1]},)"
+            R"({"mesh":0,"rotation":[0,0,0,1],"scale":[1,-2,1],"translation":[3,0,0]}]})";
         return files;
     }
 
@@ -55,7 +64,7 @@ namespace {
         for (auto const& [ending, content] : wholeFiles())
             for (std::size_t length = 0; length <= content.size(); ++length) {
                 readBroken(folder / ("a" + ending), content.substr(0, length));
-                if ((ending == ".ply" || ending == ".stl") && length != content.size()) { // binary
+                if ((ending == ".glb" || ending == ".ply" || ending == ".stl") && length != content.size()) { // binary
                     EXPECT_THROW(readGeometryFile(folder / ("a" + ending)), FileError) << ending << " " << length;
                 }
             }

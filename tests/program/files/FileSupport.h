@@ -37,6 +37,17 @@ inline std::string refusalOf(std::string const& extension, std::string_view cont
     return {};
 }
 
+/// The same, with its keys in alphabetical order.
+inline Orvan::MutablePtr<Tessara::Object> sorted(Tessara::Object const& object)
+{
+    auto keys = *object.keys();
+    std::sort(keys.begin(), keys.end());
+    Orvan::MutablePtr<Tessara::Object> result = Tessara::createObject();
+    for (Orvan::String const& key : keys)
+        result->setProperty(key, object.getProperty(key));
+    return result;
+}
+
 /// The bytes of consecutive numbers in a byte order.
 template <class... T> std::string bytesOf(std::endian order, T... numbers)
 {

@@ -32,13 +32,18 @@ namespace {
                 {".obj", square + "vt 0 0\nvn 0 0 1\nf 1/1/1 2//1 3/1 4/ 1// 2/1/", 4, {0, 1, 2, 3, 0, 1}, {0, 6},
                     "3 face corners have no \"uv\""}},
             {"numbers too small for a float", {".obj", "v 1e-60 -1e-4000 1e-42", 1, {}, {}}},
-            {"objects", {".obj", "o a b\ns off\nusemtl \n" + square, 4, {}, {}, "objects are left out: 1 (\"a b\")"}},
-            {"groups", {".obj", "g b c\ns 0\ng\ng c\n" + square, 4, {}, {}, "groups are left out: 2 (\"b\", \"c\")"}},
-            {"smoothing groups", {".obj", "s 1\ns 2\n" + square, 4, {}, {}, "smoothing groups are left out: 2 ("}},
-            {"materials",
-                {".obj", "usemtl a\nusemtl b\nusemtl c\nusemtl d\nusemtl e\nusemtl f\nusemtl a\n" + square, 4, {}, {},
-                    "\"e\" and 1 more)"}},
-            {"a file of materials", {".obj", "mtllib x y\n" + square, 4, {}, {}, "1 (\"x y\")"}},
+            {"objects without faces",
+                {".obj", "o a b\ns off\nusemtl \n" + square, 4, {}, {},
+                    "objects without faces are left out: 1 (\"a b\")"}},
+            {"smoothing groups without faces", {".obj", "s 1\ns 2\n" + square, 4, {}, {}, "groups without faces"}},
+            {"materials without faces",
+                {".obj",
+                    "usemtl a\nusemtl b\nusemtl c\nusemtl d\nusemtl e\nusemtl f\nusemtl a\n" + square + "f 1 2 3\n", 4,
+                    {0, 1, 2}, {0, 3}, "5 (\"b\", \"c\", \"d\", \"e\", \"f\")"}},
+            {"smoothing groups that are not numbers",
+                {".obj", square + "s x\nf 1 2 3\ns 1x\nf 1 2 4\n", 4, {0, 1, 2, 0, 1, 3}, {0, 3, 6},
+                    "not numbers are left out: 2 (\"x\", \"1x\")"}},
+            {"a file of materials without faces", {".obj", "mtllib x y\n" + square, 4, {}, {}, "1 (\"x y\")"}},
             {"unknown statements", {".obj", "vp 1\n" + square, 4, {}, {}, "\"vp\""}},
             {"unused texture coordinates",
                 {".obj", square + "vt 0 0\nvt 1 1\nf 1/2 2/2 3/2\n", 4, {0, 1, 2}, {0, 3},
@@ -174,7 +179,7 @@ namespace {
         for (char const* const extension : {".ply", ".stl", ".off"})
             EXPECT_EQ(refusalOf(extension, ""), " cannot be read: it is empty");
         EXPECT_EQ(refusalOf(".abc", "x"),
-            " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .h5 and .hdf5");
+            " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .glb, .gltf, .h5 and .hdf5");
         EXPECT_EQ(refusalOf(".stl", std::string(90, '\0')),
             ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90");
 
@@ -329,6 +334,37 @@ namespace {
                       sPointPosition)
                       .at(0),
             (float3{std::nextafter(1.0f, 2.0f), 1, 1}));
+    }
+
+    /// The names of all faces.
+    std::vector<std::string> namesOf(Tessara::Object const& mesh, std::string const& range)
+    {
+        auto const texts = valuesOf<Orvan::String>(mesh, (range + "_name").c_str());
+        std::vector<std::string> names;
+        for (unsigned int const number : *getRangeGeoPropIndices(mesh, range.c_str()))
+            names.emplace_back(texts.at(number).view());
+        return names;
+    }
+
+    TEST(ReadObj, keepsTheNamesOfFaces)
+    {
+        std::string const triangle = "v 0 0 0\nv 1 0 0\nv 1 1 0\nf 1 2 3\n";
+        std::string const content = "mtllib a.mtl\nv 0 0 0\nv 1 0 0\nv 1 1 0\nv nan 1 0\nf 1 2 3\no one\ng b  c # d\n"
+                                    "usemtl red\ns 7\nf 1 2 3\nf 1 2 4\nmtllib b c.mtl\nmtllib a.mtl\ng\ns on\n"
+                                    "usemtl blue\nf 1 2 4\nusemtl red\nf 1 2 3\n";
+        using Names = std::vector<std::string>;
+        GeometryFile const file = readContent(".obj", content, {.isLenient = true});
+        Tessara::Object const& mesh = *file.object;
+        EXPECT_TRUE(reportProperties(mesh).empty());
+        EXPECT_EQ(namesOf(mesh, "object"), (Names{"", "one", "one"}));
+        EXPECT_EQ(namesOf(mesh, "group"), (Names{"", "b c", ""}));
+        EXPECT_EQ(namesOf(mesh, "material"), (Names{"", "red", "red"}));
+        EXPECT_EQ(namesOf(mesh, "material_library"), Names(3, "a.mtl\nb c.mtl"));
+        EXPECT_EQ(valuesOf<unsigned int>(mesh, "smoothing_group"), (Indices{0, 7, 1}));
+        EXPECT_EQ(valuesOf<Orvan::String>(mesh, "material_name").size(), 2u); // each once, "blue" has no face left
+
+        GeometryFile const unnamed = readContent(".obj", "usemtl a\ns 1\nusemtl \ns 0\n" + triangle);
+        EXPECT_FALSE(unnamed.object->hasProperty("material") || unnamed.object->hasProperty("smoothing_group"));
     }
 
     TEST(ReadObj, keepsPointsSharedAcrossSeamsAndValuesOfStrandPoints)

@@ -50,17 +50,6 @@ namespace {
         return {contentOf(file), std::move(notes), extension == ".vtp" ? nullptr : readGeometryFile(file).object};
     }
 
-    /// The same, with its keys in alphabetical order.
-    Object sorted(Tessara::Object const& object)
-    {
-        auto keys = *object.keys();
-        std::sort(keys.begin(), keys.end());
-        Object result = Tessara::createObject();
-        for (Orvan::String const& key : keys)
-            result->setProperty(key, object.getProperty(key));
-        return result;
-    }
-
     TEST(WritePly, preservesPropertiesOfAllTypes)
     {
         Object const mesh = twoFaces();
@@ -164,6 +153,32 @@ namespace {
                 HasSubstr("f 1/1/1 2/1/2 3/1/3\nf 1/1/1 3/1/3 5/1/5 4/1/4\n")));
     }
 
+    TEST(WriteObj, preservesTheNamesOfFaces)
+    {
+        std::string const faces = "mtllib a b.mtl\nmtllib c.mtl\nv 0 0 0\nv 1 0 0\nv 1 1 0\no one two\nf 1 2 3\ng x y\n"
+                                  "usemtl red\ns 4294967295\nf 1 2 3\no two\nusemtl blue\nf 1 3 2\nusemtl red\ns 0\n"
+                                  "f 2 3 1\ng\nusemtl\nf 2 1 3\n";
+        GeometryFile const file = readContent(".obj", faces);
+        EXPECT_THAT(file.notes, testing::IsEmpty());
+        Written const again = written(*file.object, ".obj");
+        EXPECT_EQ(again.content, faces);
+        EXPECT_THAT(again.notes, testing::IsEmpty());
+        EXPECT_TRUE(sameContents(*again.object, *file.object));
+        EXPECT_THAT(written(*file.object, ".ply").notes,
+            ElementsAre("\"object_name\" (string, object) is left out: only OBJ files can hold names of faces",
+                HasSubstr("\"group_name\""), HasSubstr("\"material_name\""), HasSubstr("\"material_library_name\"")));
+        EXPECT_EQ(valuesOf<unsigned int>(*written(*file.object, ".ply").object, "smoothing_group")[1], 4294967295u);
+
+        // The merged range repeats names and libraries, and has entries beyond the names.
+        Object const merged = triangle();
+        addRangeProperty("material_library", sFaceComp, {7}, *merged);
+        addDataProperty<Orvan::String>("material_library_name", "material_library", {"a\nb", "b"}, *merged);
+        addRangeProperty("material", sFaceComp, {1}, *merged);
+        addDataProperty<Orvan::String>("material_name", "material", {"a", "#b\nv 1\\"}, *merged);
+        EXPECT_THAT(written(*merged, ".obj").content,
+            AllOf(testing::StartsWith("v 0"), HasSubstr("\nusemtl _b_v 1_\nf 1 2 3\n")));
+    }
+
     TEST(WriteStl, preservesTriangles)
     {
         Object const mesh = triangle();
@@ -262,7 +277,8 @@ namespace {
                 "point 1 has a coordinate that is not finite"},
             {makeMesh({{0, 0, 0}}, {0, 0}, {0, 2}), "a.obj", "face 0 has fewer than three corners"},
             {makeMesh({{0, 0, 0}}, {0, 0, 7}, {0, 3}), "a.obj", "is invalid: sFaceVertex[2] is 7"},
-            {triangle(), "a.off", "its extension is none of .obj, .ply, .stl, .vtp, .h5 and .hdf5"},
+            {twoFaces(), "a.glb", "GLB files hold triangles only, but face 1 has 4 corners"},
+            {triangle(), "a.off", "its extension is none of .obj, .ply, .stl, .vtp, .glb, .h5 and .hdf5"},
         };
         for (Case const& test : cases) {
             TemporaryFolder const folder;

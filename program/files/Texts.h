@@ -1,0 +1,36 @@
+#pragma once
+
+#include "Scanner.h"
+
+#include <set>
+
+namespace ModelingProgram {
+
+/// Distinct strings in order of appearance.
+class Texts {
+public:
+    void add(std::string_view text)
+    {
+        if (!known_.insert(std::string(text)).second)
+            return;
+        lines_.append(lines_.empty() ? "" : "\n").append(text);
+        if (known_.size() <= kShown)
+            shown_ += (shown_.empty() ? "" : ", ") + TextScanner::quoted(text);
+    }
+    bool empty() const { return known_.empty(); }
+    std::string list() const
+    {
+        return shown_ + (known_.size() > kShown ? " and " + std::to_string(known_.size() - kShown) + " more" : "");
+    }
+    std::string const& lines() const { return lines_; }
+    std::string countedList() const { return std::to_string(known_.size()) + " (" + list() + ")"; }
+
+private:
+    static constexpr std::size_t kShown = 5;
+
+    std::set<std::string> known_;
+    std::string lines_;
+    std::string shown_;
+};
+
+}
