@@ -12,16 +12,16 @@
 
 namespace ModelingProgram {
 
-// The steps of a command that reads files and writes one:
+// What a command that reads files and writes one consists of (`Edit.h` says who does what):
 //
 //     requireWritable(out, GeometryType::Mesh);
-//     Orvan::MutablePtr<Tessara::Object> const mesh = loadGeometry(in, report);
+//     Orvan::MutablePtr<Tessara::Object> const mesh = loadInput(in, report);
 //     refuse what the operation cannot handle
 //     runOperation(report, [&] { Geometry::Mesh::...(*mesh); });
 //     saveGeometry(*mesh, out, report);
-//     reportOperation(before, after, report);
+//     reportOperation(before, after, dropped, report);
 //
-// Each step throws `Failure` or `FileError`, which ends the command, if it fails or the user has cancelled the job.
+// Each part throws `Failure` or `FileError`, which ends the command, if it fails or the user has cancelled the job.
 // Nothing is written before `saveGeometry`, which replaces a file only with a complete one.
 
 /// A file to write.
@@ -47,10 +47,10 @@ void chooseOutput(char const* command, FileList& files);
 void requireWritable(Output const& out, GeometryType type);
 /// Refuses a format that cannot hold this type of geometry.
 void requireHolds(Output const& out, GeometryType type);
-/// Refuses a folder that does not exist or is not writable, and an existing file without --force.
-void requirePlace(Output const& out);
 /// Refuses a format that cannot hold this geometry.
 void requireHolds(Output const& out, Tessara::Object const& object);
+/// Refuses a folder that does not exist or is not writable, and an existing file without --force.
+void requirePlace(Output const& out);
 /// Refuses a file whose format cannot hold the new attribute that `option` requests.
 void requireAttribute(Output const& out, char const* option, std::string const& name);
 

@@ -103,6 +103,9 @@ namespace {
                 fmt::format("\"{}\" has to be {}", option.name,
                     isList ? fmt::format("a list of {} values, each {}", option.count, nameOfKind(option.kind))
                            : nameOfKind(option.kind)));
+        for (Json const& one : values)
+            if (one.is_string() && one.get<std::string>().find('\0') != std::string::npos)
+                refuse(where, fmt::format("\"{}\" contains a null character", option.name));
         if (option.kind == ValueKind::Flag) {
             if (value.get<bool>())
                 words.push_back("--" + option.name);

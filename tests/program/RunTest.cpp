@@ -196,6 +196,7 @@ TEST_F(Run, RefusesRecipesAndSaysWhere)
         {step(R"({"do": "smooth", "amount": -1})"), 2, "step 2 (smooth): --amount: -1 is not a number from 0 to 1000"},
         {step(R"({"do": "smooth", "pin-boundary": 1})"), 2, "\"pin-boundary\" has to be true or false"},
         {step(R"({"do": "smooth", "weights": ""})"), 2, "the value of --weights is empty"},
+        {step(R"({"do": "smooth", "weights": "a\u0000b"})"), 2, "\"weights\" contains a null character"},
         {step(R"({"do": "delete-faces", "box": [1, 2]})"), 2, "\"box\" has to be a list of 6 values, each a number"},
         {step(R"({"do": "delete-faces", "box": 1})"), 2, "\"box\" has to be a list of 6 values"},
         {step(R"({"do": "stitch", "template": ["a", "b"], "rotate": 1.5})"), 2, "\"rotate\" has to be a whole number"},
