@@ -9,7 +9,7 @@
 
 using namespace Modeling;
 
-TEST(Arrays, offsetsBeyond32BitsAreRefused)
+TEST(Arrays, OffsetsFit32BitsAndAreCompleteInsideACancelledGroup)
 {
     auto const sumsTo = [](std::uint64_t total) {
         return [=](std::size_t i) {
@@ -19,10 +19,7 @@ TEST(Arrays, offsetsBeyond32BitsAreRefused)
     EXPECT_EQ(offsetsFromCounts(3, sumsTo(0xFFFFFFFFu))[3], 0xFFFFFFFFu);
     EXPECT_THROW(offsetsFromCounts(3, sumsTo(0x100000000u)), std::bad_alloc);
     EXPECT_THROW(offsetsFromCounts(5000, sumsTo(0x100000000u)), std::bad_alloc);
-}
 
-TEST(Arrays, offsetsAreCompleteInsideACancelledGroup)
-{
     tbb::task_group group;
     unsigned int total = 0;
     group.run_and_wait([&] {
@@ -32,7 +29,7 @@ TEST(Arrays, offsetsAreCompleteInsideACancelledGroup)
     EXPECT_EQ(total, 20'000u);
 }
 
-TEST(PointCorners, areListedInAscendingOrderForAnyNumberOfThreads)
+TEST(PointCorners, AreListedInAscendingOrderForAnyNumberOfThreads)
 {
     TestSupport::Random random(5);
     constexpr unsigned int kPoints = 20'000;
@@ -55,7 +52,7 @@ TEST(PointCorners, areListedInAscendingOrderForAnyNumberOfThreads)
     EXPECT_EQ(cornersByPoint(0, nullptr, 0).offsets[0], 0u);
 }
 
-TEST(VectorMath, worksByHandAndNormalizesOnlyWhatHasALength)
+TEST(VectorMath, WorksByHandAndNormalizesOnlyWhatHasALength)
 {
     float const smallest = std::numeric_limits<float>::min();
     float const tooLarge = 1e30f; // its square is infinite

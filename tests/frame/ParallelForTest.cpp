@@ -28,7 +28,7 @@ auto const doNothing = [](Range const&) {};
 
 }
 
-TEST(ParallelFor, staysOnTheCallingThreadUpToItsGrain)
+TEST(ParallelFor, StaysOnTheCallingThreadUpToItsGrain)
 {
     auto const callsFor = [](std::size_t size) {
         std::atomic<int> calls = 0;
@@ -40,7 +40,7 @@ TEST(ParallelFor, staysOnTheCallingThreadUpToItsGrain)
     EXPECT_GT(callsFor(1001), 1);
 }
 
-TEST(ParallelFor, checksForCancellationOnlyIfNotIsolatedAndLargerThanItsGrain)
+TEST(ParallelFor, ChecksForCancellationOnlyIfNotIsolatedAndLargerThanItsGrain)
 {
     CancelledJob const cancelled;
     EXPECT_NO_THROW(parallelFor(Range(0, 1000, 1000), doNothing, false));
@@ -56,7 +56,7 @@ TEST(ParallelFor, checksForCancellationOnlyIfNotIsolatedAndLargerThanItsGrain)
     EXPECT_EQ(visited, 1001u) << "the loop itself is completed";
 }
 
-TEST(ParallelFor, ignoresACancelledGroupWhenIsolated)
+TEST(ParallelFor, IgnoresACancelledGroupWhenIsolated)
 {
     std::atomic<std::size_t> visited = 0;
     std::atomic<bool> hasRun = false;
@@ -72,7 +72,7 @@ TEST(ParallelFor, ignoresACancelledGroupWhenIsolated)
     EXPECT_TRUE(hasRun);
 }
 
-TEST(ParallelFor, rethrowsExceptionsEvenIfMemoryIsExhausted)
+TEST(ParallelFor, RethrowsExceptionsEvenIfMemoryIsExhausted)
 {
     std::optional<TestSupport::ExhaustedMemory> exhausted;
     auto const caught = [&](auto const& work) {
@@ -106,7 +106,7 @@ TEST(ParallelFor, rethrowsExceptionsEvenIfMemoryIsExhausted)
     EXPECT_THROW(loopOf(1)([] { throw CancelledJob(); }), CancelledJob) << "with several threads";
 }
 
-TEST(ParallelFor, runsOnTheCallingThreadIfNoOtherCanBeCreated)
+TEST(ParallelFor, RunsOnTheCallingThreadIfNoOtherCanBeCreated)
 {
     GTEST_FLAG_SET(death_test_style, "threadsafe"); // in a process that has no worker threads yet
     auto const runEverything = [] {
@@ -121,7 +121,7 @@ TEST(ParallelFor, runsOnTheCallingThreadIfNoOtherCanBeCreated)
     EXPECT_EXIT(std::_Exit(TestSupport::withThreads(8, runEverything) ? 0 : 1), testing::ExitedWithCode(0), "");
 }
 
-TEST(RunTasks, reportWhetherAllHaveRun)
+TEST(RunTasks, ReportWhetherAllHaveRun)
 {
     EXPECT_TRUE(runTasks([] {}, [] {}, [] {}));
     std::atomic<int> runCount = 0;

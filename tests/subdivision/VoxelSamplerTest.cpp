@@ -122,7 +122,7 @@ float3 offsetsOf(unsigned int offsetType)
 
 }
 
-TYPED_TEST(VoxelSampling, agreesWithADenseFieldForAnyOffset)
+TYPED_TEST(VoxelSampling, AgreesWithADenseFieldForAnyOffset)
 {
     Field const field = Field::random(-20, 21);
     auto const volume = volumeOf<TypeParam>(field);
@@ -151,7 +151,7 @@ TYPED_TEST(VoxelSampling, agreesWithADenseFieldForAnyOffset)
     }
 }
 
-TYPED_TEST(VoxelSampling, treatsBoxesLikeTheirVoxels)
+TYPED_TEST(VoxelSampling, TreatsBoxesLikeTheirVoxels)
 {
     Random random(2);
     auto const below = [&](int count) { return static_cast<int>(random.below(static_cast<std::size_t>(count))); };
@@ -211,7 +211,7 @@ TYPED_TEST(VoxelSampling, treatsBoxesLikeTheirVoxels)
     }
 }
 
-TYPED_TEST(VoxelSampling, givesTheSameValuesInRows)
+TYPED_TEST(VoxelSampling, GivesTheSameValuesInRows)
 {
     // More tiles than a sampler caches, and a few values that would show even in a blend with a share of 0.
     Field field = Field::random(-5 * TypeParam::kSide, 5 * TypeParam::kSide);
@@ -228,7 +228,7 @@ TYPED_TEST(VoxelSampling, givesTheSameValuesInRows)
     }
 }
 
-TYPED_TEST(VoxelSampling, mirrorsTilesWithoutNeighborsOrParent)
+TYPED_TEST(VoxelSampling, MirrorsTilesWithoutNeighborsOrParent)
 {
     constexpr int kSide = TypeParam::kSide;
     Field const field = Field::random(-2 * kSide, 2 * kSide);
@@ -265,7 +265,7 @@ TYPED_TEST(VoxelSampling, mirrorsTilesWithoutNeighborsOrParent)
     }
 }
 
-TYPED_TEST(VoxelSampling, keepsConstantsToTheBitAndLinearFieldsAcrossTiles)
+TYPED_TEST(VoxelSampling, KeepsConstantsToTheBitAndLinearFieldsAcrossTiles)
 {
     // Neighbors all around are looked up at the width of a tile of this depth.
     constexpr int kDepth = std::is_same_v<TypeParam, Traits2> ? TypeParam::kUnitDepth + 1 : TypeParam::kUnitDepth;
@@ -294,7 +294,7 @@ TYPED_TEST(VoxelSampling, keepsConstantsToTheBitAndLinearFieldsAcrossTiles)
     }
 }
 
-TEST(VoxelSampler, readsWideTilesAsTheirOwnUpperNeighbors)
+TEST(VoxelSampler, ReadsWideTilesAsTheirOwnUpperNeighbors)
 {
     // The step to neighbors is half of a tile's width here: existing volumes depend on it.
     Field const field = Field::of(-8, 8, [](int i, int, int) { return static_cast<float>(i); });
@@ -305,7 +305,7 @@ TEST(VoxelSampler, readsWideTilesAsTheirOwnUpperNeighbors)
     EXPECT_EQ(sampled(sampler, {1.75f, 2, 2}), 1.25f);
 }
 
-TYPED_TEST(VoxelSampling, continuesTheParentIfNeighborsAreMissing)
+TYPED_TEST(VoxelSampling, ContinuesTheParentIfNeighborsAreMissing)
 {
     constexpr int kSide = TypeParam::kSide;
     for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
@@ -344,7 +344,7 @@ TYPED_TEST(VoxelSampling, continuesTheParentIfNeighborsAreMissing)
     }
 }
 
-TEST(HaloTiles, blendTheParentInQuartersAndEighths)
+TEST(HaloTiles, BlendTheParentInQuartersAndEighths)
 {
     // Along x, the parent is 100 before the tile, 10 at the tile, and 1 after it as far as its halo reaches.
     FullHalo<Traits2> parent(-1), halo;
@@ -365,7 +365,7 @@ TEST(HaloTiles, blendTheParentInQuartersAndEighths)
         row(1), (std::vector<float>{b, 0.25f * next + 0.75f * b, 0.5f * next + 0.5f * b, 0.75f * next + 0.25f * b}));
 }
 
-TYPED_TEST(VoxelSampling, findsBackgroundOutside)
+TYPED_TEST(VoxelSampling, FindsBackgroundOutside)
 {
     Field const field = Field::random(-TypeParam::kSide, TypeParam::kSide);
     auto const volume = volumeOf<TypeParam>(field);
@@ -379,7 +379,7 @@ TYPED_TEST(VoxelSampling, findsBackgroundOutside)
     EXPECT_EQ(sampled(sampler, {0, 0, 0}), field(0, 0, 0));
 }
 
-TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
+TYPED_TEST(VoxelSampling, ReadsCoarseAndFineTilesInAnyOrder)
 {
     // Few fine voxels, some of them in coarse tiles, and tiles without neighbors.
     std::vector<Voxel> coarse, fine;
@@ -407,7 +407,7 @@ TYPED_TEST(VoxelSampling, readsCoarseAndFineTilesInAnyOrder)
     }
 }
 
-TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
+TYPED_TEST(VoxelSampling, FindsVoxelsFarAway)
 {
     constexpr int kDepth = TypeParam::kUnitDepth, kLowest = std::numeric_limits<int>::min();
     std::vector<Voxel> voxels;
@@ -446,7 +446,7 @@ TYPED_TEST(VoxelSampling, findsVoxelsFarAway)
     EXPECT_EQ(values, std::vector<float>(4, 7));
 }
 
-TYPED_TEST(VoxelSampling, readsTheAllowedDepthsAndScalesWorldPoints)
+TYPED_TEST(VoxelSampling, ReadsTheAllowedDepthsAndScalesWorldPoints)
 {
     constexpr int kDepth = TypeParam::kUnitDepth, kWide = TypeParam::kChildrenPerAxis;
     auto const volume = volumeOf<TypeParam>(Field::linear(-25, 25), 7, 2);

@@ -161,7 +161,7 @@ constexpr int kManyTimes = 1;
 
 }
 
-TEST(TriangulatePolygon, cutsOrFallsBackToTheFan)
+TEST(TriangulatePolygon, CutsOrFallsBackToTheFan)
 {
     struct Case {
         Corners corners;
@@ -188,7 +188,7 @@ TEST(TriangulatePolygon, cutsOrFallsBackToTheFan)
         EXPECT_EQ(triangulated(polygon.corners), polygon.triangles) << name;
 }
 
-TEST(TriangulatePolygon, agreesWithPlainEarClipping)
+TEST(TriangulatePolygon, AgreesWithPlainEarClipping)
 {
     Random random(1);
     for (int run = 0; run != 50'000 * kManyTimes; ++run) {

@@ -17,7 +17,7 @@ Orvan::MutablePtr<Object> quadTwoCornersTriangle()
 
 }
 
-TEST(Triangulate, givesTrianglesTheValuesOfTheirFacesAndCorners)
+TEST(Triangulate, GivesTrianglesTheValuesOfTheirFacesAndCorners)
 {
     auto const mesh = quadTwoCornersTriangle();
     addDataProperty<Orvan::String>("name", sFaceComp, {"quad", "line", "triangle"}, *mesh);
@@ -47,7 +47,7 @@ TEST(Triangulate, givesTrianglesTheValuesOfTheirFacesAndCorners)
     EXPECT_EQ(Indices(seam->begin(), seam->end()), (Indices{5, 8, 7, 5, 7, 6, 2, 1, 0}));
 }
 
-TEST(Triangulate, removesPropertiesThatTheChannelsExcludeAndTheirDependents)
+TEST(Triangulate, RemovesPropertiesThatTheChannelsExcludeAndTheirDependents)
 {
     std::map<std::string, std::vector<std::string>> const kept{
         {"*", {"uv", "material", "color", "density"}}, {"", {"density"}},
@@ -70,7 +70,7 @@ TEST(Triangulate, removesPropertiesThatTheChannelsExcludeAndTheirDependents)
     }
 }
 
-TEST(Triangulate, acceptsOddMeshesAndLeavesIncompleteOnesUnchanged)
+TEST(Triangulate, AcceptsOddMeshesAndLeavesIncompleteOnesUnchanged)
 {
     auto const points = Orvan::Array<float3>{{0, 0, 0}, {1, 0, 0}, {0, 1, 0}};
     auto const empty = makeMesh({}, {}, {});
