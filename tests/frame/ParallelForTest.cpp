@@ -1,8 +1,7 @@
 #include "frame/Arrays.h"
 
 #include "support/FailingAllocations.h"
-#include "support/FailingThreads.h"
-#include "support/Threads.h"
+#include "support/Testing.h"
 
 #include <OrvanCppOpSDK/Job.h>
 #include <TessaraMathSupport/ExceptionMessage.h>

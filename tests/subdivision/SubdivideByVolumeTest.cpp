@@ -29,19 +29,6 @@ template <class Traits> Volume<Traits> volumeOf(float atCenter, float perUnit, f
     return buildVolume<Traits>({.background = background, .depth = Traits::kUnitDepth, .block = field.block()});
 }
 
-/// Two hexagonal pyramids whose bases have their centers at the origin, where they stay.
-MeshBuilder twoCaps()
-{
-    MeshBuilder cap = MeshBuilder::bipyramid(6), turned = cap;
-    cap.points[6] = {0, 0, 0};
-    turned.points[6] = {0, 0, 0};
-    for (float3& point : cap.points)
-        point = point * 20;
-    for (float3& point : turned.points)
-        point = {point.z * 3, point.x * 3, point.y * 3};
-    return std::move(cap).joinedWith(turned, {0, 0, 0});
-}
-
 template <class Traits> LinearSampler<Traits> samplerOf(Volume<Traits> const& volume, float scale = kScale)
 {
     return {
@@ -130,24 +117,4 @@ TYPED_TEST(SubdivideByVolume, LeavesFacesAloneWithoutAPositiveTolerance)
     auto const open = MeshBuilder::sphere(3).withoutFace(4).build(), before = deepCopy(*open);
     EXPECT_FALSE(subdivide(samplerOf(positive), *open, 1));
     EXPECT_TRUE(sameContents(*open, *before));
-}
-
-TYPED_TEST(SubdivideByVolume, EndsAtTheFinestLevelWhereTheToleranceIsZero)
-{
-    // Distances to the origin, where both parts have a point that stays there.
-    Field const field =
-        Field::of(-4, 4, [](int i, int j, int k) { return std::sqrt(static_cast<float>(i * i + j * j + k * k)); });
-    auto const volume =
-        buildVolume<TypeParam>({.background = 4, .depth = TypeParam::kUnitDepth, .block = field.block()});
-    auto const refined = [&] {
-        auto mesh = twoCaps().build();
-        EXPECT_TRUE(subdivide(samplerOf(volume, 1), *mesh, 0.2f));
-        return mesh;
-    };
-    expectSameForThreads({1, 2, 8}, refined);
-    auto const mesh = refined();
-    std::vector<bool> const large = marksOf(samplerOf(volume, 1), *mesh, 0.2f);
-    EXPECT_GT(std::count(large.begin(), large.end(), true), 0);
-    EXPECT_TRUE(isClosedManifold(*mesh));
-    EXPECT_EQ(eulerCharacteristic(*mesh), 4);
 }

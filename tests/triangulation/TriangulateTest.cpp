@@ -85,20 +85,21 @@ TEST(Triangulate, AcceptsOddMeshesAndLeavesIncompleteOnesUnchanged)
     triangulate("*", *odd);
     EXPECT_EQ(valuesOf<unsigned int>(*odd, sFaceVertex), (Indices{1, 2, 0, 0, 1, 2}));
 
-    auto const noCorners = makeMesh(points, {0, 1, 2}, {0, 3});
-    noCorners->eraseProperty(sFaceVertex);
-    auto const noPositions = makeMesh(points, {0, 1, 2}, {0, 3});
-    addDataProperty<double>(sPointPosition, sPointComp, {0, 1, 2}, *noPositions);
-    auto const shortOffsets = makeMesh(points, {0, 1, 2}, {0, 3});
-    setElementCount(sFaceComp, 2, *shortOffsets);
-    auto const shortPositions = makeMesh(points, {0, 1, 2}, {0, 3});
-    setElementCount(sPointComp, 4, *shortPositions);
-    auto const shortCorners = makeMesh(points, {0, 1, 2}, {0, 3});
-    setElementCount(sFaceVertexComp, 4, *shortCorners);
-    for (auto const* const mesh : {&noCorners, &noPositions, &shortOffsets, &shortPositions, &shortCorners}) {
-        addDataProperty<int>("id", sFaceComp, {1}, **mesh);
-        auto const before = deepCopy(**mesh);
-        triangulate("", **mesh);
-        EXPECT_TRUE(sameContents(**mesh, *before));
+    std::function<void(Object&)> const edits[] = {
+        [](Object& mesh) { mesh.eraseProperty(sFaceVertex); },
+        [](Object& mesh) {
+            addDataProperty<double>(sPointPosition, sPointComp, {0, 1, 2}, mesh);
+        },
+        [](Object& mesh) { setElementCount(sFaceComp, 2, mesh); },
+        [](Object& mesh) { setElementCount(sPointComp, 4, mesh); },
+        [](Object& mesh) { setElementCount(sFaceVertexComp, 4, mesh); },
+    };
+    for (auto const& makeIncomplete : edits) {
+        auto const mesh = makeMesh(points, {0, 1, 2}, {0, 3});
+        makeIncomplete(*mesh);
+        addDataProperty<int>("id", sFaceComp, {1}, *mesh);
+        auto const before = deepCopy(*mesh);
+        triangulate("", *mesh);
+        EXPECT_TRUE(sameContents(*mesh, *before));
     }
 }
