@@ -230,16 +230,14 @@ TEST(Merge, IsCompleteOrRefusedIfAnEnclosingGroupIsCancelled)
 TEST(Merge, RunsConcurrentlyOnSharedInputs)
 {
     Random random(1);
-    auto const mesh = PolygonMesh::quads(40).build();
+    auto mesh = PolygonMesh::quads(40).build();
     addAllTypes(sFaceVertexComp, random, *mesh);
-    Orvan::Ptr<Object> const shared = deepCopy(*mesh);
-    auto const expected = merged(Kind::Meshes, inputsOf(shared, shared));
-    std::vector<std::thread> threads;
+    Orvan::Ptr<Object> const shared = std::move(mesh);
+    Inputs const inputs = inputsOf(shared, shared);
+    auto const expected = merged(Kind::Meshes, inputs);
+    std::vector<std::jthread> threads;
     for (int thread = 0; thread != 4; ++thread)
-        threads.emplace_back(
-            [&] { EXPECT_TRUE(sameContents(*merged(Kind::Meshes, inputsOf(shared, shared)), *expected)); });
-    for (std::thread& thread : threads)
-        thread.join();
+        threads.emplace_back([&] { EXPECT_TRUE(sameContents(*merged(Kind::Meshes, inputs), *expected)); });
 }
 
 TEST(Merge, MergesManySmallInputsWithAndWithoutCommonLayouts)

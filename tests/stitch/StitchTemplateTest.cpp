@@ -49,11 +49,6 @@ float3 between(float3 const& a, float3 const& b, float t)
     return a + (b - a) * t;
 }
 
-bool haveSameBits(Weights const& a, Weights const& b)
-{
-    return a.size == b.size && std::memcmp(a.data, b.data, a.size * sizeof(float)) == 0;
-}
-
 /// On an edge, at its middle (so that several strands end there), on its line, inside, near a corner, or anywhere.
 float3 randomPoint(Points const& polygon, Random& random)
 {
@@ -130,7 +125,8 @@ TEST(StitchTemplate, KeepsCoordinatesAndRecordsEndsInOrder)
                 Weights weights(corners + 1);
                 unsigned int const edge =
                     single.computeMeanValueCoordinates(polygon, positions[offsets[strand] + point], weights, scale);
-                EXPECT_TRUE(haveSameBits(points[point], weights));
+                ASSERT_EQ(points[point].size, weights.size);
+                EXPECT_EQ(std::memcmp(points[point].data, weights.data, weights.size * sizeof(float)), 0);
                 for (bool const isEnd : {false, true})
                     if (point != (isEnd ? points.size - 1 : 0))
                         continue;
@@ -288,12 +284,12 @@ TEST(StitchTemplate, ExcludesTolerancesAndRightAnglesFromEdges)
     float3 found{};
     Weights weights(5);
     made.setPolySize(4);
-    made.setTol(0.125f); // the area of the triangles of the point and the edges at corner 0
-    EXPECT_EQ(made.computeMeanValueCoordinates(square(), {0.25f, 0.25f, 0}, weights, 1), 0xFFFFFFFF);
-    made.findControlPointPos(square(), weights, 1, false, found);
+    made.setTol(0.25f); // times the scale, the area of the triangles of the point and the edges at corner 0
+    EXPECT_EQ(made.computeMeanValueCoordinates(square(), {0.25f, 0.25f, 0}, weights, 0.5f), 0xFFFFFFFF);
+    made.findControlPointPos(square(), weights, 0.5f, false, found);
     EXPECT_LT(length(found - float3{0.25f, 0.25f, 0}), 1e-6f);
     // A short edge subtends a right angle at the point, in a triangle smaller than the tolerance.
-    EXPECT_EQ(made.computeMeanValueCoordinates({{0.25f, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0.25f, 0}}, {}, weights, 1),
+    EXPECT_EQ(made.computeMeanValueCoordinates({{0.25f, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0.25f, 0}}, {}, weights, 0.5f),
         0xFFFFFFFF);
 }
 
