@@ -120,9 +120,8 @@ TEST(ParallelFor, RunsOnTheCallingThreadIfNoOtherCanBeCreated)
     EXPECT_EXIT(std::_Exit(TestSupport::withThreads(8, runEverything) ? 0 : 1), testing::ExitedWithCode(0), "");
 }
 
-TEST(RunTasks, ReportWhetherAllHaveRun)
+TEST(RunTasks, ReportsThatSomeWereSkipped)
 {
-    EXPECT_TRUE(runTasks([] {}, [] {}, [] {}));
     std::atomic<int> runCount = 0;
     TestSupport::withThreads(1, [&] {
         tbb::task_group group;
