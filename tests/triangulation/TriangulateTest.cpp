@@ -22,7 +22,7 @@ TEST(Triangulate, GivesTrianglesTheValuesOfTheirFacesAndCorners)
     auto const mesh = quadTwoCornersTriangle();
     addDataProperty<Orvan::String>("name", sFaceComp, {"quad", "line", "triangle"}, *mesh);
     // The last value remains in memory behind the end.
-    auto const shortened = [](Orvan::Array<int> values) { return values.resize(values.size - 1), values; };
+    auto const shortened = [](Orvan::Array<int> values) { return values.resize(values.size - 1), std::move(values); };
     addDataProperty<int>("short", sFaceComp, shortened({7, 8, 9}), *mesh);
     addDataProperty<double>("corner", sFaceVertexComp, {0, 1, 2, 3, 4, 5, 6, 7, 8}, *mesh);
     addDataProperty<int>("short corner", sFaceVertexComp, shortened({5, 6, 7, 8, 9, 10, 11}), *mesh);
