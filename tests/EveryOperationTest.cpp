@@ -236,7 +236,7 @@ std::vector<Orvan::MutablePtr<Object>> copiesOf(Inputs const& inputs)
 
 }
 
-TEST(EveryOperation, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
+TEST(EveryOperation, GivesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
 {
     std::map<std::string, std::uint64_t> found; // rows of one name share a fingerprint
     for (Operation const& operation : operations()) {
@@ -259,7 +259,7 @@ TEST(EveryOperation, givesTheSameBitsForAnyNumberOfThreadsAndEveryCompiler)
     EXPECT_EQ(found, expected) << "unlike other builds";
 }
 
-TEST(EveryOperation, changesNothingThatIsShared)
+TEST(EveryOperation, ChangesNothingThatIsShared)
 {
     for (Operation const& operation : operations()) {
         auto const readBefore = copiesOf(operation.read);
@@ -282,7 +282,7 @@ TEST(EveryOperation, changesNothingThatIsShared)
     }
 }
 
-TEST(EveryOperation, leavesTheObjectAsItWasWhenMemoryRunsOut)
+TEST(EveryOperation, LeavesTheObjectAsItWasWhenMemoryRunsOut)
 {
     for (Operation const& operation : operations())
         for (Input const& input : operation.small) {

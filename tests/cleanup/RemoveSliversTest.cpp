@@ -3,7 +3,6 @@
 #include "frame/VectorMath.h"
 #include "support/Testing.h"
 
-#include <numeric>
 #include <set>
 
 using namespace Modeling;
@@ -23,7 +22,7 @@ public:
             normals_.push_back(normalOf(points_[a], points_[b], points_[c]));
         for (unsigned int face = 0; face != faces_.size(); ++face)
             visit(face, ratio);
-        compact();
+        std::erase(faces_, kRemoved);
     }
 
     MeshBuilder result() const { return MeshBuilder::of(points_, faces_); }
@@ -70,13 +69,10 @@ private:
             || !std::ranges::all_of(around, [&](unsigned int f) { return keepsOrientation(f, a, b, middle); }))
             return;
         points_[a] = middle;
-        removedPoints_.push_back(b);
         for (Triangle& face : faces_)
             std::ranges::replace(face, b, a);
-        for (unsigned int const f : between) {
+        for (unsigned int const f : between)
             faces_[f] = kRemoved;
-            removedFaces_.push_back(f);
-        }
     }
 
     bool keepsOrientation(unsigned int f, unsigned int a, unsigned int b, float3 middle) const
@@ -89,33 +85,8 @@ private:
         return dot(inward, middle - p1) > 0 && dot(normalOf(middle, p1, p2), normals_[f]) > 0;
     }
 
-    /// Fills holes from the end.
-    void compact()
-    {
-        std::vector<unsigned int> map(points_.size());
-        std::iota(map.begin(), map.end(), 0u);
-        std::ranges::sort(removedPoints_);
-        std::size_t const remaining = points_.size() - removedPoints_.size();
-        std::size_t last = points_.size();
-        for (auto p = removedPoints_.begin(); p != removedPoints_.end() && *p < remaining; ++p) {
-            while (std::ranges::binary_search(removedPoints_, --last)) { }
-            map[last] = *p;
-            points_[*p] = points_[last];
-        }
-        points_.resize(remaining);
-        std::ranges::sort(removedFaces_, std::greater<>());
-        for (unsigned int const face : removedFaces_) {
-            faces_[face] = faces_.back();
-            faces_.pop_back();
-        }
-        for (Triangle& face : faces_)
-            for (unsigned int& corner : face)
-                corner = map[corner];
-    }
-
     std::vector<float3> points_, normals_;
     std::vector<Triangle> faces_;
-    std::vector<unsigned int> removedPoints_, removedFaces_;
 };
 
 Orvan::MutablePtr<Object> withoutSlivers(MeshBuilder const& builder, float ratio)
@@ -148,27 +119,28 @@ MeshBuilder dependentNeedlesAtHubs()
     return mesh;
 }
 
-/// The positions of the directed edges that are boundary or non-manifold edges.
-std::multiset<std::array<float, 6>> oddEdges(Object const& mesh)
+/// The directed edges by the positions of their ends, and how often each occurs.
+std::map<std::array<float, 6>, int> edgesOf(Object const& mesh, bool onlyOdd = false)
 {
     auto const corners = valuesOf<unsigned int>(mesh, sFaceVertex);
     auto const positions = valuesOf<float3>(mesh, sPointPosition);
-    std::map<std::pair<unsigned int, unsigned int>, int> uses;
-    for (std::size_t corner = 0; corner != corners.size(); ++corner)
-        ++uses[{corners[corner], corners[corner % 3 == 2 ? corner - 2 : corner + 1]}];
-    std::multiset<std::array<float, 6>> places;
-    for (auto const& [edge, count] : uses) {
-        auto const opposite = uses.find({edge.second, edge.first});
-        float3 const a = positions[edge.first], b = positions[edge.second];
-        for (int use = count == 1 && opposite != uses.end() && opposite->second == 1; use != count; ++use)
-            places.insert({a.x, a.y, a.z, b.x, b.y, b.z});
+    std::map<std::array<float, 6>, int> edges;
+    for (std::size_t corner = 0; corner != corners.size(); ++corner) {
+        float3 const a = positions[corners[corner]], b = positions[corners[corner % 3 == 2 ? corner - 2 : corner + 1]];
+        ++edges[{a.x, a.y, a.z, b.x, b.y, b.z}];
     }
-    return places;
+    auto const all = edges;
+    std::erase_if(edges, [&](auto const& edge) { // which is neither at a boundary nor non-manifold
+        auto const [ax, ay, az, bx, by, bz] = edge.first;
+        auto const opposite = all.find({bx, by, bz, ax, ay, az});
+        return onlyOdd && edge.second == 1 && opposite != all.end() && opposite->second == 1;
+    });
+    return edges;
 }
 
 }
 
-TEST(RemoveSlivers, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
+TEST(RemoveSlivers, AgreesWithThePlainReferenceAndKeepsClosedSurfaces)
 {
     std::map<std::string, MeshBuilder> meshes{
         {"tetrahedron", MeshBuilder::tetrahedron()},
@@ -201,14 +173,14 @@ TEST(RemoveSlivers, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
         for (float const ratio : {0.0f, 0.03f, 0.3f, 0.8f, 2.0f}) {
             SCOPED_TRACE(name + ", ratio " + std::to_string(ratio));
             auto const mesh = withoutSlivers(builder, ratio);
-            EXPECT_TRUE(sameContents(*mesh, *PlainRemoval(builder, ratio).result().build()));
+            EXPECT_EQ(edgesOf(*mesh), edgesOf(*PlainRemoval(builder, ratio).result().build()));
             EXPECT_TRUE(isClosedManifold(*mesh));
-            EXPECT_EQ(eulerCharacteristic(*mesh), eulerCharacteristic(*builder.build()));
+            EXPECT_EQ(countsOf(*mesh).eulerCharacteristic(), countsOf(*builder.build()).eulerCharacteristic());
         }
     EXPECT_EQ(countsOf(*withoutSlivers(meshes.at("needles"), 0.03f)), countsOf(*MeshBuilder::sphere(8).build()));
 }
 
-TEST(RemoveSlivers, leavesOtherInputUnchanged)
+TEST(RemoveSlivers, LeavesOtherInputUnchanged)
 {
     auto const polygons = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 0.01f, 0}, {0, 0.01f, 0}}, {0, 1, 2, 3}, {0, 4});
     auto const mixed = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 0.01f, 0}}, {0, 1, 0, 1, 2, 1}, {0, 2, 6});
@@ -217,7 +189,7 @@ TEST(RemoveSlivers, leavesOtherInputUnchanged)
     auto const otherType = MeshBuilder::sphere(4).withNeedles(9).build();
     addDataProperty<int>(sFaceVertex, sFaceVertexComp, {1, 2, 3}, *otherType);
     auto const empty = MeshBuilder().build();
-    auto const open = MeshBuilder::square(1).withNeedles(1).build();
+    auto const open = MeshBuilder::of({{0, 0, 0}, {9, 0, 0}, {9, 9, 0}, {9, 9.1f, 0}}, {{0, 1, 2}, {0, 2, 3}}).build();
     auto const shortOffsets = MeshBuilder::sphere(4).withNeedles(9).build();
     auto offsets = *dataOf<unsigned int>(*shortOffsets, sFaceOffset);
     offsets.resize(offsets.size - 1); // the last one remains in memory behind the end
@@ -231,7 +203,7 @@ TEST(RemoveSlivers, leavesOtherInputUnchanged)
     }
 }
 
-TEST(RemoveSlivers, survivesSoupsAndPositionsThatAreNotFinite)
+TEST(RemoveSlivers, SurvivesSoupsAndPositionsThatAreNotFinite)
 {
     Random random(1);
     for (unsigned int run = 0; run != 3000; ++run) {
@@ -249,7 +221,7 @@ TEST(RemoveSlivers, survivesSoupsAndPositionsThatAreNotFinite)
                     corner = random.below(pointCount);
         auto const mesh = withoutSlivers(soup, 0.7f);
         EXPECT_TRUE(isValid(*mesh));
-        EXPECT_EQ(oddEdges(*mesh), oddEdges(*soup.build()));
+        EXPECT_EQ(edgesOf(*mesh, true), edgesOf(*soup.build(), true));
         // If all positions are NaN every face is a sliver for this ratio and none flips: topology alone decides.
         soup.points.assign(pointCount, float3{kNan, kNan, kNan});
         EXPECT_TRUE(isValid(*withoutSlivers(soup, -2)));
@@ -264,7 +236,7 @@ TEST(RemoveSlivers, survivesSoupsAndPositionsThatAreNotFinite)
         }
 }
 
-TEST(RemoveSlivers, staysLinearAroundAHub)
+TEST(RemoveSlivers, StaysLinearAroundAHub)
 {
     EXPECT_LT(countsOf(*withoutSlivers(MeshBuilder::bipyramid(100'000), 0.1f)).faces, 200'000);
     // All short edges end at the hubs. Only one collapses: it joins the hubs, after which the ends of the other spokes

@@ -95,7 +95,7 @@ std::vector<unsigned int> bitsOf(std::vector<float3> const& points)
 
 }
 
-TEST(Smooth, agreesWithPlainSmoothingToTheBit)
+TEST(Smooth, AgreesWithPlainSmoothingToTheBit)
 {
     Random random(1);
     float const amounts[] = {0.0f, 0.3f, 0.9f, 2.0f, 5.4f, -1.0f};
@@ -116,7 +116,7 @@ TEST(Smooth, agreesWithPlainSmoothingToTheBit)
         EXPECT_TRUE(bitsOf(smoothed(mesh, 4.0f)) == bitsOf(smoothedPlainly(mesh, 4.0f, {})));
 }
 
-TEST(Smooth, movesPointsWithinTheSurfaceWhereverItsFacesBegin)
+TEST(Smooth, MovesPointsWithinTheSurfaceWhereverItsFacesBegin)
 {
     PolygonMesh square = PolygonMesh::quads(4).withNoise(0.2f, 1);
     for (float3& p : square.points)
@@ -132,7 +132,7 @@ TEST(Smooth, movesPointsWithinTheSurfaceWhereverItsFacesBegin)
     EXPECT_TRUE(smoothed(PolygonMesh(), 1).empty());
 }
 
-TEST(Smooth, logsEachStep)
+TEST(Smooth, LogsEachStep)
 {
     static std::vector<std::string> lines;
     CoreGL::OrvanLogger::setSink([](char const* line) { lines.emplace_back(line); });

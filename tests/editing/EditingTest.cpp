@@ -1,19 +1,175 @@
-#include "PlainEditing.h"
-
 #include <Modeling/addPointsToPointCloud.h>
 #include <Modeling/computeDeletedComponentMapping.h>
 #include <Modeling/deleteComponents.h>
 #include <Modeling/deleteFaces.h>
 #include <Modeling/deletePointsInPointCloud.h>
+
+#include "support/Testing.h"
+
 #include <TessaraGeometry/Validators.h>
 
 using namespace Tessara::GeometryAlgorithms;
 using namespace TestSupport;
-using PlainEditing::Flags;
-using PlainEditing::Indices;
+using Flags = Orvan::Array<bool>;
+using Indices = Orvan::Array<unsigned int>;
 using Positions = Orvan::Array<float3>;
 
 namespace {
+
+/// A plain reference for any property bag: one property after the other, each array copied and then edited element by
+/// element.
+namespace Plain {
+
+    Indices mapping(Flags const& deleted)
+    {
+        Indices remap;
+        unsigned int next = 0;
+        for (bool const isDeleted : deleted)
+            remap.append(isDeleted ? kDeletedElement : next++);
+        return remap;
+    }
+
+    template <class T>
+    void replaceArray(Orvan::String const& name, char const* key, Orvan::Array<T> array, Object& object)
+    {
+        replaceIn(name, key, Orvan::makePtr<Orvan::Array<T>>(std::move(array)), object);
+    }
+
+    template <class T> Orvan::Array<T> compacted(Orvan::Array<T> const& array, Indices const& remap)
+    {
+        Orvan::Array<T> kept;
+        for (std::uint64_t i = 0; i != remap.size; ++i)
+            if (remap[i] != kDeletedElement)
+                kept.append(array[i]);
+        return kept;
+    }
+
+    /// Returns false if the array is missing or too short.
+    bool compactData(Orvan::String const& name, Indices const& remap, Object& object)
+    {
+        bool isDone = false;
+        visitArray(getDataGeoProperty(object, name)->getProperty(sData), [&](auto const& array, auto) {
+            isDone = array.size >= remap.size;
+            if (isDone)
+                replaceArray(name, sData, compacted(array, remap), object);
+        });
+        return isDone;
+    }
+
+    bool deleteRange(Orvan::String const& name, Indices const& remap, Object& object)
+    {
+        auto const held = getRangeGeoPropIndices(object, name);
+        bool const hasIndices = held && !held->empty();
+        if (hasIndices && held->size < remap.size)
+            return true;
+        Indices indices = hasIndices ? compacted(*held, remap) : Indices();
+        Indices dataRemap;
+        for (Orvan::String const& data : getGeoPropNamesByTarget(object, name)) {
+            if (!getDataGeoProperty(object, data))
+                continue;
+            if (!hasIndices || !dataRemap.empty())
+                return false;
+            Flags dropped;
+            visitArray(getDataGeoProperty(object, data)->getProperty(sData),
+                [&](auto const& array, auto) { dropped = Flags(array.size, true); });
+            for (unsigned int const entry : indices)
+                if (entry < dropped.size)
+                    dropped[entry] = false;
+            dataRemap = mapping(dropped);
+            if (!compactData(data, dataRemap, object))
+                return false;
+        }
+        for (unsigned int& entry : indices)
+            if (!dataRemap.empty() && entry != kInvalidIndex)
+                entry = dataRemap[entry];
+        if (hasIndices)
+            replaceArray(name, sIndices, indices, object);
+        return true;
+    }
+
+    template <class T> Orvan::Array<T> extended(Orvan::Array<T> array, std::uint64_t newCount, T const& value)
+    {
+        array.reserve(newCount);
+        while (array.size < newCount)
+            array.append(value);
+        array.resize(newCount);
+        return array;
+    }
+
+    void extendData(Orvan::String const& name, std::uint64_t newCount, Object& object)
+    {
+        Tessara::PropertyValue result;
+        auto const property = getDataGeoProperty(object, name);
+        visitArray(property->getProperty(sData), [&]<class T>(Orvan::Array<T> const& array, auto type) {
+            if (type.name[0] >= 'A' && type.name[0] <= 'Z')
+                return; // the host's record types
+            auto const fallback = property->getProperty(sDefault);
+            result = Orvan::makePtr<Orvan::Array<T>>(
+                extended(array, newCount, fallback.template get<T>() ? *fallback.template get<T>() : T{}));
+        });
+        replaceIn(name, sData, std::move(result), object);
+    }
+
+    bool addPoints(Positions const& positions, Orvan::String const& tag, Object& object)
+    {
+        std::uint64_t const oldCount = getElementCount(object, sPointComp), newCount = oldCount + positions.size;
+        setElementCount(sPointComp, static_cast<unsigned int>(newCount), object);
+        for (Orvan::String const& name : getGeoPropNamesByTarget(object, sPointComp))
+            if (getDataGeoProperty(object, name))
+                extendData(name, newCount, object);
+            else if (auto const indices = getRangeGeoPropIndices(object, name))
+                replaceArray(name, sIndices, extended(*indices, newCount, kInvalidIndex), object);
+        Positions all = *dataOf<float3>(object, sPointPosition);
+        std::copy(positions.begin(), positions.end(), all.data + oldCount);
+        replaceArray(sPointPosition, sData, all, object);
+        if (!tag.empty())
+            addDataProperty(tag, sPointComp, extended(Flags(oldCount), newCount, true), object);
+        return true;
+    }
+
+    bool deleteComponents(Indices const& remap, Orvan::String const& component, Object& object)
+    {
+        unsigned int const count = getElementCount(object, component);
+        if (count != remap.size || count == 0)
+            return false;
+        auto const deletedCount = std::count(remap.begin(), remap.end(), kDeletedElement);
+        setElementCount(component, count - static_cast<unsigned int>(deletedCount), object);
+        for (Orvan::String const& name : getGeoPropNamesByTarget(object, component))
+            if (getDataGeoProperty(object, name))
+                compactData(name, remap, object);
+            else if (!deleteRange(name, remap, object))
+                return false;
+        return true;
+    }
+
+    bool deleteFaces(Flags const& deleted, Object& mesh)
+    {
+        Indices const offsets = *dataOf<unsigned int>(mesh, sFaceOffset),
+                      corners = *dataOf<unsigned int>(mesh, sFaceVertex);
+        Flags pointDeleted(getElementCount(mesh, sPointComp), true), cornerDeleted(corners.size, true);
+        for (unsigned int face = 0; face != deleted.size; ++face)
+            for (unsigned int corner = offsets[face]; !deleted[face] && corner < offsets[face + 1]; ++corner)
+                cornerDeleted[corner] = pointDeleted[corners[corner]] = false;
+        Indices const pointRemap = mapping(pointDeleted);
+        Indices cornerRemap = mapping(cornerDeleted);
+        if (!deleteComponents(pointRemap, sPointComp, mesh) || !deleteComponents(cornerRemap, sFaceVertexComp, mesh))
+            return false;
+        Indices faceVertex = *dataOf<unsigned int>(mesh, sFaceVertex);
+        for (unsigned int& entry : faceVertex)
+            entry = pointRemap[entry];
+        replaceArray(sFaceVertex, sData, faceVertex, mesh);
+        if (!deleteComponents(mapping(deleted), sFaceComp, mesh))
+            return false;
+        Indices faceOffset = *dataOf<unsigned int>(mesh, sFaceOffset);
+        cornerRemap.append(getElementCount(mesh, sFaceVertexComp)); // for a face without corners at the end
+        for (unsigned int& entry : faceOffset)
+            entry = cornerRemap[entry];
+        faceOffset.append(getElementCount(mesh, sFaceVertexComp));
+        replaceArray(sFaceOffset, sData, faceOffset, mesh);
+        return true;
+    }
+
+}
 
 /// Polygons with one to five corners, optionally also with none. Some points may belong to no face.
 Orvan::MutablePtr<Object> randomMesh(std::size_t pointCount, std::size_t faceCount, bool withEmptyFaces, Random& random)
@@ -26,90 +182,74 @@ Orvan::MutablePtr<Object> randomMesh(std::size_t pointCount, std::size_t faceCou
 
 Flags randomFlags(std::size_t count, Random& random)
 {
-    unsigned int const outOf = 1 + random.below(4); // 1: all or none
+    unsigned int const outOf = random.below(5); // 0: all, 1: none
     Flags flags(count);
     for (bool& flag : flags)
-        flag = random.below(outOf + 1) == 0;
-    if (outOf == 1)
-        std::fill(flags.begin(), flags.end(), random.below(2) == 1);
+        flag = outOf == 0 || (outOf > 1 && random.below(outOf) == 0);
     return flags;
 }
 
-struct Edit {
-    std::function<bool(Object&)> edit, plainEdit;
-};
+using Edit = std::function<bool(Object&)>;
 
-/// A random operation and a random object to run it on.
-Orvan::MutablePtr<Object> randomCase(Random& random, Edit& edit)
+/// A random operation, the plain one that must agree, and a random object to run them on.
+Orvan::MutablePtr<Object> randomCase(Random& random, Edit& edit, Edit& plainEdit)
 {
     std::size_t const size = random.below(8) == 0 ? random.below(900) : random.below(9);
-    if (unsigned int const kind = random.below(4); kind != 0) {
-        auto cloud = makePointCloud(randomPositions(size, random));
-        addRandomProperties(sPointComp, random, *cloud);
-        if (kind == 1) {
-            Indices indices;
-            Flags flags(size);
-            for (std::size_t i = random.below(size + 2); i != 0; --i) {
-                indices.append(random.below(size + 2)); // some twice, some out of range
-                if (indices[indices.size - 1] < size)
-                    flags[indices[indices.size - 1]] = true;
-            }
-            edit = {[=](Object& o) { return deletePointsInPointCloud(indices, o, nullptr); },
-                [=](Object& o) { return PlainEditing::deleteComponents(PlainEditing::mapping(flags), sPointComp, o); }};
-        } else if (kind == 2) {
-            Indices const remap = PlainEditing::mapping(randomFlags(size, random));
-            edit = {[=](Object& o) { return deleteComponents(remap, sPointComp, o); },
-                [=](Object& o) { return PlainEditing::deleteComponents(remap, sPointComp, o); }};
-        } else {
-            auto const positions = randomPositions(random.below(2 * size + 3), random);
-            Orvan::String const tag = random.below(2) == 0 ? "" : random.below(2) == 0 ? "isNew" : "sPointComp1";
-            edit = {[=](Object& o) { return addPointsToPointCloud(positions, tag, o, nullptr); },
-                [=](Object& o) { return PlainEditing::addPoints(positions, tag, o); }};
-        }
+    unsigned int const kind = random.below(4);
+    if (kind == 0) {
+        auto mesh = randomMesh(1 + size, size == 0 ? 0 : random.below(size), random.below(4) == 0, random);
+        Flags const deleted = randomFlags(getElementCount(*mesh, sFaceComp), random);
+        edit = [=](Object& o) { return deleteFaces(deleted, o); };
+        plainEdit = [=](Object& o) { return Plain::deleteFaces(deleted, o); };
+        return mesh;
+    }
+    auto cloud = makePointCloud(randomPositions(size, random));
+    addRandomProperties(sPointComp, random, *cloud);
+    if (kind == 1) {
+        auto const positions = randomPositions(random.below(2 * size + 3), random);
+        Orvan::String const tag = random.below(2) == 0 ? "" : random.below(2) == 0 ? "isNew" : "sPointComp1";
+        edit = [=](Object& o) { return addPointsToPointCloud(positions, tag, o, nullptr); };
+        plainEdit = [=](Object& o) { return Plain::addPoints(positions, tag, o); };
         return cloud;
     }
-    auto mesh = randomMesh(1 + size, size == 0 ? 0 : random.below(size), random.below(4) == 0, random);
-    Flags const deleted = randomFlags(getElementCount(*mesh, sFaceComp), random);
-    edit = {[=](Object& o) { return deleteFaces(deleted, o); },
-        [=](Object& o) { return PlainEditing::deleteFaces(deleted, o); }};
-    return mesh;
-}
-
-/// A random operation on a random object that may be shared.
-struct Trial {
-    explicit Trial(unsigned int seed)
-        : holders(static_cast<Holders>(seed % 4))
-        , random(seed)
-    {
+    Flags const flags = randomFlags(size, random);
+    Indices const remap = Plain::mapping(flags);
+    edit = [=](Object& o) { return deleteComponents(remap, sPointComp, o); };
+    plainEdit = [=](Object& o) { return Plain::deleteComponents(remap, sPointComp, o); };
+    if (kind == 2) {
+        Indices indices{static_cast<unsigned int>(size)}; // out of range, the others twice
+        for (unsigned int i = 0; i != 2 * size; ++i)
+            if (flags[i / 2])
+                indices.append(i / 2);
+        edit = [=](Object& o) { return deletePointsInPointCloud(indices, o, nullptr); };
     }
-
-    Holders holders;
-    Random random;
-    Edit edit;
-    Orvan::MutablePtr<Object> object = randomCase(random, edit);
-    Orvan::MutablePtr<Object> before = deepCopy(*object), expected = deepCopy(*object);
-    Object other = held(holders, *object);
-};
+    return cloud;
+}
 
 }
 
-TEST(Editing, agreesWithThePlainReferenceOnRandomPropertyBags)
+TEST(Editing, AgreesWithThePlainReferenceOnRandomPropertyBags)
 {
     unsigned int done = 0;
     for (unsigned int seed = 0; seed != 6000 && !HasFailure(); ++seed) {
         SCOPED_TRACE(seed);
-        Trial trial(seed);
-        bool const isDone = trial.edit.edit(*trial.object);
-        EXPECT_EQ(isDone, trial.edit.plainEdit(*trial.expected));
-        EXPECT_TRUE(sameContents(*trial.object, *trial.expected));
-        EXPECT_TRUE(sameContents(trial.other, held(trial.holders, *trial.before))) << "another holder sees a change";
+        Random random(seed);
+        Edit edit, plainEdit;
+        auto const object = randomCase(random, edit, plainEdit);
+        auto const before = deepCopy(*object), expected = deepCopy(*object);
+        auto const holders = static_cast<Holders>(seed % 4); // some arrays are edited in place
+        Object const other = held(holders, *object);
+        bool const isDone = edit(*object);
+        EXPECT_EQ(isDone, plainEdit(*expected));
+        EXPECT_TRUE(sameContents(*object, *expected));
+        EXPECT_TRUE(sameContents(other, held(holders, *before))) << "another holder sees a change";
         done += isDone ? 1 : 0;
     }
     EXPECT_GT(done, 4000u);
     EXPECT_LT(done, 5800u) << "some are refused halfway";
 }
 
-TEST(Editing, editsInPlaceAndReadsArgumentsStoredInTheObject)
+TEST(Editing, EditsInPlaceAndReadsArgumentsStoredInTheObject)
 {
     auto const own = makePointCloud({{0, 0, 0}, {1, 0, 0}});
     addRangeProperty("range", sPointComp, {0, 1}, *own);
@@ -128,6 +268,7 @@ TEST(Editing, editsInPlaceAndReadsArgumentsStoredInTheObject)
     Positions const& positions = *dataOf<float3>(*cloud, sPointPosition);
     ASSERT_TRUE(addPointsToPointCloud(positions, "isNew", *cloud, nullptr));
     EXPECT_EQ(*dataOf<float3>(*cloud, sPointPosition), (Positions{{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {1, 0, 0}}));
+    EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->capacity, 4u) << "doubles";
     Indices const& chosen = *dataOf<unsigned int>(*cloud, "chosen");
     ASSERT_TRUE(deletePointsInPointCloud(chosen, *cloud, nullptr));
     EXPECT_EQ(*dataOf<unsigned int>(*cloud, "chosen"), (Indices{0, 1}));
@@ -139,22 +280,7 @@ TEST(Editing, editsInPlaceAndReadsArgumentsStoredInTheObject)
     EXPECT_EQ(countsOf(*mesh), (Counts{3, 3, 1}));
 }
 
-TEST(Editing, growsCapacityAndDropsRecords)
-{
-    auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
-    addDataProperty<Mesh::FaceEdge>("edge", sPointComp, Orvan::Array<Mesh::FaceEdge>(3), *cloud);
-    ASSERT_TRUE(addPointsToPointCloud({{9, 9, 9}}, "isNew", *cloud, nullptr));
-    EXPECT_TRUE(getDataGeoProperty(*cloud, "edge")->getProperty(sData).empty())
-        << "values of a record type are dropped";
-    EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->capacity, 6u) << "doubles";
-    ASSERT_TRUE(addPointsToPointCloud(Positions(9), "isNew", *cloud, nullptr));
-    EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->capacity, 13u) << "grows by what is needed";
-    EXPECT_FALSE(addPointsToPointCloud({{1, 1, 1}}, sPointPosition, *cloud, nullptr))
-        << "the tag replaces the positions";
-    EXPECT_EQ(dataOf<bool>(*cloud, sPointPosition)->size, 14u);
-}
-
-TEST(Editing, refusesBeforeTheFirstChange)
+TEST(Editing, RefusesBeforeTheFirstChange)
 {
     auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}}), emptyCloud = makePointCloud({});
     auto const withTwo = makePointCloud({{0, 0, 0}}), withoutPositions = makePointCloud({{0, 0, 0}});
@@ -205,7 +331,7 @@ TEST(Editing, refusesBeforeTheFirstChange)
     tooMany.size = 1;
 }
 
-TEST(Editing, givesResultsWorkedOutByHand)
+TEST(Editing, GivesResultsWorkedOutByHand)
 {
     auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
     addRangeProperty("seam", sPointComp, {3, kInvalidIndex, 1}, *cloud);
@@ -216,21 +342,18 @@ TEST(Editing, givesResultsWorkedOutByHand)
         << "unused values are removed even if no point is";
     ASSERT_TRUE(deletePointsInPointCloud(Orvan::Array<long long>{0, 0, 2}, *cloud, nullptr));
     EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{kInvalidIndex}));
-
-    Positions const points{{0, 0, 0}, {1, 0, 0}, {9, 9, 9}, {1, 1, 0}, {0, 1, 0}};
-    auto const mesh = makeMesh(points, {0, 1, 3, 4, 3, 1}, {0, 3, 3, 6});
-    ASSERT_TRUE(deleteFaces({false, false, true}, *mesh));
-    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceVertex), (Indices{0, 1, 2})) << "without the unused points";
-    EXPECT_EQ(*dataOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, kDeletedElement, 3}));
     EXPECT_EQ(computeDeletedComponentMapping({false, true, false}), (Indices{0, kDeletedElement, 1}));
 
     auto const lacking = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
     addDataProperty<float3>(sPointPosition, sPointComp, {{5, 5, 5}}, *lacking, float3{7, 7, 7});
     ASSERT_TRUE(addPointsToPointCloud({{9, 9, 9}}, "", *lacking, nullptr));
     EXPECT_EQ(*dataOf<float3>(*lacking, sPointPosition), (Positions{{5, 5, 5}, {7, 7, 7}, {7, 7, 7}, {9, 9, 9}}));
+    EXPECT_FALSE(addPointsToPointCloud({{1, 1, 1}}, sPointPosition, *lacking, nullptr))
+        << "the tag replaces the positions";
+    EXPECT_EQ(dataOf<bool>(*lacking, sPointPosition)->size, 5u);
 }
 
-TEST(Editing, staysInsideArraysWhateverTheyHold)
+TEST(Editing, StaysInsideArraysWhateverTheyHold)
 {
     for (unsigned int seed = 0; seed != 2000; ++seed) {
         Random random(seed);

@@ -3,7 +3,7 @@
 #include "geometry/SurfaceTree.h"
 
 #include "support/MeshBuilder.h"
-#include "support/Threads.h"
+#include "support/Testing.h"
 
 #include <TessaraGeometry/Makers.h>
 

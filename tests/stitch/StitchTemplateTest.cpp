@@ -49,11 +49,6 @@ float3 between(float3 const& a, float3 const& b, float t)
     return a + (b - a) * t;
 }
 
-bool haveSameBits(Weights const& a, Weights const& b)
-{
-    return a.size == b.size && std::memcmp(a.data, b.data, a.size * sizeof(float)) == 0;
-}
-
 /// On an edge, at its middle (so that several strands end there), on its line, inside, near a corner, or anywhere.
 float3 randomPoint(Points const& polygon, Random& random)
 {
@@ -66,46 +61,28 @@ float3 randomPoint(Points const& polygon, Random& random)
     return points[random.below(std::size(points))];
 }
 
-/// What `construct` must record of strands whose coordinates are those of `computeMeanValueCoordinates`.
-struct ExpectedEnds {
-    Orvan::Array<Ends> onEdges;
-    std::string errors;
-
-    void add(pair const& place, unsigned int edge, Weights const& weights, bool strict)
-    {
-        std::string const end = place.end ? "---strand ending point " : "---strand starting point ";
-        bool const isOnEdge = edge != 0xFFFFFFFF;
-        if (isOnEdge && weights[edge] > 0 && weights[(edge + 1) % onEdges.size] > 0)
-            onEdges[edge].append(place);
-        else if (isOnEdge || strict)
-            errors += end + (isOnEdge ? "on edge but outside of polygon---" : "not on polygon edge---");
-    }
-};
-
 /// Two ends are sorted by the weight of the edge's first corner. More than two are sorted by the weight of its second
 /// corner, and of several at the same place only the last is kept.
-void expectInOrder(Ends const& found, Ends const& recorded, StitchTemplate const& made, unsigned int edge)
+Ends inOrder(Ends recorded, StitchTemplate const& made, unsigned int edge)
 {
-    auto const along = [&](pair const& place) {
+    auto const weightOf = [&](pair const& place, unsigned int corner) {
         auto const& points = made.getStrands()[place.strand].controlPoints;
-        Weights const& weights = points[place.end ? points.size - 1 : 0];
-        return recorded.size == 2 ? -weights[edge] : weights[(edge + 1) % made.getPolySize()];
+        return points[place.end ? points.size - 1 : 0][corner % made.getPolySize()];
     };
+    if (recorded.size == 2 && weightOf(recorded[1], edge) > weightOf(recorded[0], edge))
+        std::swap(recorded[0], recorded[1]);
+    if (recorded.size <= 2)
+        return recorded;
     std::map<float, pair> lasts;
     for (pair const& place : recorded)
-        lasts.insert_or_assign(along(place), place);
-    Ends sorted = recorded;
-    if (recorded.size == 2 && along(recorded[1]) < along(recorded[0]))
-        std::swap(sorted[0], sorted[1]);
-    if (recorded.size > 2)
-        sorted.clear();
+        lasts.insert_or_assign(weightOf(place, edge + 1), place);
+    Ends sorted;
     for (auto const& [weight, place] : lasts)
-        if (recorded.size > 2)
-            sorted.append(place);
-    EXPECT_EQ(found, sorted);
+        sorted.append(place);
+    return sorted;
 }
 
-TEST(StitchTemplate, keepsCoordinatesAndRecordsEndsInOrder)
+TEST(StitchTemplate, KeepsCoordinatesAndRecordsEndsInOrder)
 {
     for (unsigned int seed = 0; seed != 600; ++seed) {
         SCOPED_TRACE(seed);
@@ -131,41 +108,46 @@ TEST(StitchTemplate, keepsCoordinatesAndRecordsEndsInOrder)
         float const scale = perimeter / static_cast<float>(corners);
         EXPECT_EQ(made.getTol(), 0.02f * scale);
         ASSERT_EQ(made.getStrands().size, offsets.size - 1);
-        ExpectedEnds expected{Orvan::Array<Ends>(corners), {}};
+        StitchTemplate single; // computes coordinates point by point, and collects the expected errors
+        single.setErrors("");
+        single.setPolySize(corners);
+        single.setTol(made.getTol());
+        auto const expectError = [&](char const* error) {
+            Orvan::String errors = single.getErrors();
+            errors += error;
+            single.setErrors(errors);
+        };
+        Orvan::Array<Ends> onEdges(corners);
         for (unsigned int strand = 0; strand + 1 != offsets.size; ++strand) {
-            EXPECT_EQ(made.getStrands()[strand].polySize, corners);
-            unsigned int const count = offsets[strand + 1] - offsets[strand];
-            ASSERT_EQ(made.getStrands()[strand].controlPoints.size, count);
-            for (unsigned int point = 0; point != count; ++point) {
-                StitchTemplate single;
-                single.setErrors("");
-                single.setPolySize(corners);
-                single.setTol(made.getTol());
+            auto const& points = made.getStrands()[strand].controlPoints;
+            ASSERT_EQ(points.size, offsets[strand + 1] - offsets[strand]);
+            for (unsigned int point = 0; point != points.size; ++point) {
                 Weights weights(corners + 1);
                 unsigned int const edge =
                     single.computeMeanValueCoordinates(polygon, positions[offsets[strand] + point], weights, scale);
-                EXPECT_TRUE(haveSameBits(made.getStrands()[strand].controlPoints[point], weights));
-                expected.errors += single.getErrors().c_str();
-                if (point == 0)
-                    expected.add({strand, false}, edge, weights, strict);
-                if (point + 1 == count)
-                    expected.add({strand, true}, edge, weights, strict);
+                ASSERT_EQ(points[point].size, weights.size);
+                EXPECT_EQ(std::memcmp(points[point].data, weights.data, weights.size * sizeof(float)), 0);
+                for (bool const isEnd : {false, true})
+                    if (point != (isEnd ? points.size - 1 : 0))
+                        continue;
+                    else if (edge != 0xFFFFFFFF)
+                        onEdges[edge].append(pair{strand, isEnd});
+                    else if (strict)
+                        expectError(isEnd ? "---strand ending point not on polygon edge---"
+                                          : "---strand starting point not on polygon edge---");
             }
         }
         for (unsigned int edge = 0; edge != corners; ++edge) {
-            Ends const& recorded = expected.onEdges[edge];
-            if (strict && recorded.size != 1 && recorded.size != 2)
-                expected.errors += "---polygon edge contains too few/many strand end points---";
-            if (strict && recorded.size > 2)
-                EXPECT_EQ(made.getEdgeEndpoints()[edge], recorded);
-            else
-                expectInOrder(made.getEdgeEndpoints()[edge], recorded, made, edge);
+            bool const isRefused = strict && onEdges[edge].size != 1 && onEdges[edge].size != 2;
+            if (isRefused)
+                expectError("---polygon edge contains too few/many strand end points---");
+            EXPECT_EQ(made.getEdgeEndpoints()[edge], isRefused ? onEdges[edge] : inOrder(onEdges[edge], made, edge));
         }
-        EXPECT_EQ(made.getErrors(), expected.errors.c_str());
+        EXPECT_EQ(made.getErrors(), single.getErrors());
     }
 }
 
-TEST(StitchTemplate, reportsFaultsOfItsInput)
+TEST(StitchTemplate, ReportsFaultsOfItsInput)
 {
     Points const across{{0.5f, 0, 0}, {0.5f, 0.5f, 0}, {0.5f, 1, 0}};
     Indices const one{0, 3};
@@ -206,7 +188,7 @@ TEST(StitchTemplate, reportsFaultsOfItsInput)
         "polygon---");
 }
 
-TEST(StitchTemplate, takesThePolygonFromTheOnlyFace)
+TEST(StitchTemplate, TakesThePolygonFromTheOnlyFace)
 {
     auto const strands = makeStrands({{0.5f, 0, 0}, {0.5f, 1, 0}}, {0, 2});
     auto const errorsOf = [&](auto const& mesh) { return StitchTemplate(mesh, *strands, false).getErrors(); };
@@ -223,7 +205,7 @@ TEST(StitchTemplate, takesThePolygonFromTheOnlyFace)
     EXPECT_EQ(errorsOf(*mesh), "---input poly missing face_vertices property---");
 }
 
-TEST(StitchTemplate, addsToWhatItHoldsWhenFilled)
+TEST(StitchTemplate, AddsToWhatItHoldsWhenFilled)
 {
     StitchTemplate made;
     EXPECT_EQ(made.getErrors(), "---empty stitch template---");
@@ -247,7 +229,7 @@ TEST(StitchTemplate, addsToWhatItHoldsWhenFilled)
     EXPECT_EQ(made.getEdgeEndpoints()[3], (Ends{{2, true}}));
 }
 
-TEST(StitchTemplate, computesMeanValueCoordinates)
+TEST(StitchTemplate, ComputesMeanValueCoordinates)
 {
     for (unsigned int seed = 0; seed != 400; ++seed) {
         SCOPED_TRACE(seed);
@@ -296,27 +278,22 @@ TEST(StitchTemplate, computesMeanValueCoordinates)
     }
 }
 
-TEST(StitchTemplate, excludesTolerancesAndRightAnglesFromEdges)
+TEST(StitchTemplate, ExcludesTolerancesAndRightAnglesFromEdges)
 {
     StitchTemplate made;
     float3 found{};
     Weights weights(5);
     made.setPolySize(4);
-    made.setTol(0.125f); // the area of the triangle of the point and edge 3
-    EXPECT_EQ(made.computeMeanValueCoordinates(square(), {0.25f, 0.5f, 0}, weights, 1), 0xFFFFFFFF);
-    made.findControlPointPos(square(), weights, 1, false, found);
-    EXPECT_LT(length(found - float3{0.25f, 0.5f, 0}), 1e-6f);
+    made.setTol(0.25f); // times the scale, the area of the triangles of the point and the edges at corner 0
+    EXPECT_EQ(made.computeMeanValueCoordinates(square(), {0.25f, 0.25f, 0}, weights, 0.5f), 0xFFFFFFFF);
+    made.findControlPointPos(square(), weights, 0.5f, false, found);
+    EXPECT_LT(length(found - float3{0.25f, 0.25f, 0}), 1e-6f);
     // A short edge subtends a right angle at the point, in a triangle smaller than the tolerance.
-    EXPECT_EQ(made.computeMeanValueCoordinates({{0.25f, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0.25f, 0}}, {}, weights, 1),
+    EXPECT_EQ(made.computeMeanValueCoordinates({{0.25f, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0.25f, 0}}, {}, weights, 0.5f),
         0xFFFFFFFF);
-
-    Weights noHeight{0.25f, 0.25f, 0.25f, 0.25f, 9};
-    noHeight.resize(4); // the 9 remains in memory behind the end
-    made.findControlPointPos(square(), noHeight, 1, false, found);
-    EXPECT_TRUE(found.x == 0.5f && found.y == 0.5f && found.z == 0);
 }
 
-TEST(StitchTemplate, letsStrandsMeetOnSharedEdges)
+TEST(StitchTemplate, LetsStrandsMeetOnSharedEdges)
 {
     // Mirrored ends on edges 1 and 3; the second quad is bent and shares edge 1 of the first.
     StitchTemplate const made = filled(square(), {{0, 0.25f, 0}, {0.5f, 0.5f, 0.2f}, {1, 0.25f, 0}}, {0, 3}, false);
@@ -327,14 +304,17 @@ TEST(StitchTemplate, letsStrandsMeetOnSharedEdges)
     EXPECT_EQ(std::memcmp(&end, &start, sizeof end), 0);
 
     // Short arrays are read up to their end; without a height or a triangle there is no offset.
-    Weights const quarter{0.25f, 0.25f};
-    made.findControlPointPos(Points{{4, 8, 0}}, quarter, 1, false, end);
-    EXPECT_TRUE(end.x == 1 && end.y == 2 && end.z == 0);
-    made.findControlPointPos(Points{{4, 8, 0}, {4, 8, 4}}, quarter, 1, Points{}, false, end);
-    EXPECT_TRUE(end.x == 2 && end.y == 4 && end.z == 1);
+    Weights quarters{0.25f, 0.25f, 0.25f, 0.25f, 9};
+    quarters.resize(4); // the 9 remains in memory behind the end
+    made.findControlPointPos(square(), quarters, 1, false, end);
+    EXPECT_EQ(end, (float3{0.5f, 0.5f, 0}));
+    made.findControlPointPos(Points{{4, 8, 0}}, quarters, 1, false, end);
+    EXPECT_EQ(end, (float3{1, 2, 0}));
+    made.findControlPointPos(Points{{4, 8, 0}, {4, 8, 4}}, quarters, 1, Points{}, false, end);
+    EXPECT_EQ(end, (float3{2, 4, 1}));
 }
 
-TEST(StitchTemplate, staysUsableWhenMemoryRunsOut)
+TEST(StitchTemplate, StaysUsableWhenMemoryRunsOut)
 {
     Random random(1);
     auto const polygon = shared(randomPolygon(17, true, false, random));

@@ -40,7 +40,7 @@ Edges edgesOf(HalfEdgeDataStructure const& halfEdges, unsigned int pointCount)
 
 }
 
-TEST(HalfEdgeDataStructure, agreesWithAMapForEachPoint)
+TEST(HalfEdgeDataStructure, AgreesWithAMapForEachPoint)
 {
     Random random(1);
     std::map<std::string, PolygonMesh> const meshes{
@@ -71,7 +71,7 @@ TEST(HalfEdgeDataStructure, agreesWithAMapForEachPoint)
     }
 }
 
-TEST(HalfEdgeDataStructure, findsBoundaryEdgesOfTriangles)
+TEST(HalfEdgeDataStructure, FindsBoundaryEdgesOfTriangles)
 {
     EXPECT_FALSE(hasBoundary(MeshBuilder::tetrahedron().polygons()));
     EXPECT_FALSE(hasBoundary({}));
@@ -85,7 +85,7 @@ TEST(HalfEdgeDataStructure, findsBoundaryEdgesOfTriangles)
     }
 }
 
-TEST(HalfEdgeDataStructure, clearsSwapsAndStartsEmpty)
+TEST(HalfEdgeDataStructure, ClearsSwapsAndStartsEmpty)
 {
     HalfEdgeDataStructure edges(4), tetrahedron = halfEdgesOf(MeshBuilder::tetrahedron().polygons());
     EXPECT_EQ(edges.halfEdge(3, 0), (HalfEdge{Tessara::Geometry::kInvalidIndex, 0, 1}));

@@ -1,12 +1,13 @@
 #include <Modeling/subdivide.h>
 
-#include "PlainSubdivision.h"
-
+#include "frame/VectorMath.h"
 #include "subdivision/refineMesh.h"
+#include "support/Testing.h"
 
 #include <Modeling/subdivisionSteps.h>
 #include <OrvanCppOpSDK/Job.h>
 
+using namespace Modeling;
 using namespace Tessara::Math;
 using namespace TestSupport;
 using Geometry::Mesh::subdivide;
@@ -40,18 +41,33 @@ MeshBuilder tipsOneFloatApart()
     return mesh;
 }
 
-std::map<std::string, MeshBuilder> closedMeshes()
+struct ClosedMesh {
+    MeshBuilder builder;
+    std::uint64_t refined, marked; // fingerprints
+};
+
+std::map<std::string, ClosedMesh> closedMeshes()
 {
     return {
-        {"tetrahedron", MeshBuilder::tetrahedron()},
-        {"noise", MeshBuilder::sphere(4).withNoise(0.1f, 3).shuffled(4)},
-        {"graded", MeshBuilder::sphere(6).graded()},
-        {"torus", MeshBuilder::torus(12, 9).withNoise(0.3f, 1).shuffled(9)},
-        {"needles", MeshBuilder::sphere(3).withNeedles(20, 0.02f).shuffled(2)},
-        {"bipyramid", MeshBuilder::bipyramid(60).withNoise(0.01f, 7)},
-        {"tips one float apart", tipsOneFloatApart()},
-        {"two parts", MeshBuilder::icosahedron().joinedWith(MeshBuilder::torus(5, 4), {9, 0, 0})},
+        {"tetrahedron", {MeshBuilder::tetrahedron(), 7500093758956781132u, 1925882433916549395u}},
+        {"noise", {MeshBuilder::sphere(4).withNoise(0.1f, 3).shuffled(4), 8836986909361035247u, 1991688503786063501u}},
+        {"graded", {MeshBuilder::sphere(6).graded(), 97071283589157845u, 9356163269048779337u}},
+        {"torus",
+            {MeshBuilder::torus(12, 9).withNoise(0.3f, 1).shuffled(9), 8982201963558640406u, 6729791774085565844u}},
+        {"needles",
+            {MeshBuilder::sphere(3).withNeedles(20, 0.02f).shuffled(2), 8218371230067981736u, 4139327674431853156u}},
+        {"bipyramid", {MeshBuilder::bipyramid(60).withNoise(0.01f, 7), 10455697412830630882u, 13446342876449610623u}},
+        {"tips one float apart", {tipsOneFloatApart(), 5847461616290469472u, 12612927430442565923u}},
+        {"two parts",
+            {MeshBuilder::icosahedron().joinedWith(MeshBuilder::torus(5, 4), {9, 0, 0}), 5592784212514565019u,
+                10577201515170940087u}},
     };
+}
+
+/// Of the mesh and its property "carried".
+std::uint64_t fingerprintOf(Object const& mesh, Object const& withValues)
+{
+    return fingerprint(mesh) ^ 3 * fingerprint(*makeMesh(*dataOf<float3>(withValues, "carried"), {}, {0}));
 }
 
 /// Runs passes with any marks by calling the steps.
@@ -74,8 +90,9 @@ struct Passes {
         Steps::computePositions(
             halfEdges, numPoints, basePositions, limitPositions, vertexLevels, faceStates, positions);
     }
+    std::uint64_t fingerprint() const { return fingerprintOf(*mesh(), *object); }
     bool isBalanced() const { return Steps::isBalanced(halfEdges, numFaces, faceVertex, faceOffset, faceStates); }
-    auto mesh() const { return makeMesh(positions, faceVertex, faceOffset); }
+    Orvan::MutablePtr<Object> mesh() const { return makeMesh(positions, faceVertex, faceOffset); }
 
     Orvan::MutablePtr<Object> object;
     Orvan::Array<float3> positions = *dataOf<float3>(*object, sPointPosition), basePositions = positions;
@@ -108,51 +125,47 @@ template <class T, class Scalar> void expectMean(Scalar third)
 
 }
 
-TEST(Subdivide, agreesWithThePlainReferenceAndKeepsClosedSurfaces)
+TEST(Subdivide, SplitsLargeFacesAndKeepsClosedSurfaces)
 {
-    for (auto const& [name, builder] : closedMeshes())
+    for (auto const& [name, closed] : closedMeshes()) {
+        std::uint64_t found = 0;
         for (float const tolerance : {0.5f, 0.12f}) {
             SCOPED_TRACE(name + ", tolerance " + std::to_string(tolerance));
-            auto const mesh = refined(builder, tolerance);
-            PlainSubdivision plain(builder);
-            plain.run(tolerance);
-            EXPECT_TRUE(sameContents(*mesh, *meshOf(MeshBuilder::of(plain.positions, plain.faces), plain.values)));
+            auto const mesh = refined(closed.builder, tolerance);
             EXPECT_TRUE(isClosedManifold(*mesh));
-            EXPECT_EQ(eulerCharacteristic(*mesh), eulerCharacteristic(*builder.build()));
-            unsigned int finestLevel = 0;
-            for (std::size_t f = 0; f != plain.faces.size(); ++f) {
-                finestLevel = std::max(finestLevel, plain.level(f));
-                if (largestSide(plain.faces[f], plain.positions) > tolerance + tolerance) {
-                    EXPECT_EQ(plain.level(f), PlainSubdivision::kFinestLevel) << "face " << f << " is large";
-                }
-            }
-            EXPECT_EQ(finestLevel == PlainSubdivision::kFinestLevel, name == "tips one float apart");
+            EXPECT_EQ(countsOf(*mesh).eulerCharacteristic(), countsOf(*closed.builder.build()).eulerCharacteristic());
+            Orvan::Array<bool> large(static_cast<std::uint64_t>(countsOf(*mesh).faces));
+            Steps::markForSubdivision(tolerance, static_cast<unsigned int>(large.size),
+                *dataOf<float3>(*mesh, sPointPosition), *dataOf<unsigned int>(*mesh, sFaceVertex),
+                *dataOf<unsigned int>(*mesh, sFaceOffset), large);
+            EXPECT_EQ(std::count(large.begin(), large.end(), true) != 0, name == "tips one float apart");
+            found = 31 * found + fingerprintOf(*mesh, *mesh);
         }
-}
-
-TEST(Subdivide, agreesWithThePlainReferenceForAnyMarks)
-{
-    for (auto const& [name, builder] : closedMeshes()) {
-        Passes passes(builder);
-        PlainSubdivision plain(builder);
-        Random random(7);
-        for (unsigned int pass = 0; pass != 7; ++pass) {
-            SCOPED_TRACE(name + ", pass " + std::to_string(pass));
-            Orvan::Array<bool> marks;
-            for (unsigned int face = 0; face != passes.numFaces; ++face)
-                marks.append(random.below(pass == 3 ? 1 : 9) == 0);
-            passes.pass(marks);
-            plain.pass(marks);
-            EXPECT_TRUE(sameContents(*passes.mesh(), *MeshBuilder::of(plain.positions, plain.faces).build()));
-            EXPECT_TRUE(std::equal(plain.states.begin(), plain.states.end(), passes.faceStates.begin()));
-            EXPECT_EQ(*dataOf<float3>(*passes.object, "carried"), Orvan::Array<float3>(plain.values));
-            EXPECT_TRUE(passes.isBalanced());
-            EXPECT_TRUE(isClosedManifold(*passes.mesh()));
-        }
+        EXPECT_EQ(found, closed.refined) << name;
     }
 }
 
-TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
+TEST(Subdivide, StaysBalancedForAnyMarks)
+{
+    for (auto const& [name, closed] : closedMeshes()) {
+        Passes passes(closed.builder);
+        Random random(7);
+        std::uint64_t found = 0;
+        for (unsigned int pass = 0; pass != 7; ++pass) {
+            SCOPED_TRACE(name + ", pass " + std::to_string(pass));
+            Orvan::Array<bool> marks(passes.numFaces);
+            for (bool& mark : marks)
+                mark = random.below(pass == 3 ? 1 : 9) == 0;
+            passes.pass(marks);
+            EXPECT_TRUE(passes.isBalanced());
+            EXPECT_TRUE(isClosedManifold(*passes.mesh()));
+            found = 31 * found + passes.fingerprint();
+        }
+        EXPECT_EQ(found, closed.marked) << name;
+    }
+}
+
+TEST(Subdivide, RelaxesStepByStepOnUniformMeshes)
 {
     // By symmetry, a corner of a solid moves along its own direction: to this fraction of its distance from the center
     // in one step, and at the limit.
@@ -179,19 +192,16 @@ TEST(Subdivide, relaxesStepByStepOnUniformMeshes)
     }
 }
 
-TEST(Subdivide, stepsHandleStatesThatDriversNeverProduce)
+TEST(Subdivide, StepsHandleStatesThatDriversNeverProduce)
 {
     // Next to a coarser face nothing is emitted. Balancing does not change such a state if all faces split.
     Passes unbalanced(MeshBuilder::tetrahedron());
     unbalanced.faceStates = {2 << 2 | 2, 2, 2, 2};
     EXPECT_FALSE(unbalanced.isBalanced());
-    PlainSubdivision plain(MeshBuilder::tetrahedron());
-    plain.states = {2 << 2 | 2, 2, 2, 2};
-    for (bool const mark : {false, true}) { // the second pass moves points toward their limits
-        Orvan::Array<bool> const marks(unbalanced.numFaces, mark);
-        unbalanced.pass(marks);
-        plain.pass(marks);
-        EXPECT_TRUE(sameContents(*unbalanced.mesh(), *MeshBuilder::of(plain.positions, plain.faces).build()));
+    for (auto const& [mark, expected] :
+        std::map<bool, std::uint64_t>{{false, 8358639396607655001u}, {true, 10753806013162789402u}}) {
+        unbalanced.pass(Orvan::Array<bool>(unbalanced.numFaces, mark)); // the second pass moves points
+        EXPECT_EQ(unbalanced.fingerprint(), expected);
     }
 
     Passes thirds(MeshBuilder::tetrahedron());
@@ -223,7 +233,7 @@ TEST(Subdivide, stepsHandleStatesThatDriversNeverProduce)
     }
 }
 
-TEST(Subdivide, averagesTypesWithAMeanAndRemovesAllOthers)
+TEST(Subdivide, AveragesTypesWithAMeanAndRemovesAllOthers)
 {
     expectMean<float>(0.33333334f);
     expectMean<float2x3>(0.33333334f);
@@ -262,7 +272,7 @@ TEST(Subdivide, averagesTypesWithAMeanAndRemovesAllOthers)
         << "even if nothing splits";
 }
 
-TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
+TEST(Subdivide, RefusesOpenMeshesAndLeavesSmallFacesAlone)
 {
     auto const quad = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 0}}, {0, 1, 2, 3, 3, 2, 1, 0}, {0, 4, 8});
     auto const open = MeshBuilder::sphere(3).withoutFace(5).build();
@@ -289,9 +299,10 @@ TEST(Subdivide, refusesOpenMeshesAndLeavesSmallFacesAlone)
     EXPECT_TRUE(sameContents(*refined(pointsOnly, 0.1f), *meshOf(pointsOnly)));
 }
 
-TEST(Subdivide, survivesMeshesOutsideOfItsPreconditions)
+TEST(Subdivide, SurvivesMeshesOutsideOfItsPreconditions)
 {
     Random random(1);
+    std::uint64_t found = 0;
     for (unsigned int run = 0; run != 150; ++run) {
         MeshBuilder soup = MeshBuilder::sphere(2).withNoise(1, run);
         for (unsigned int change = 0; change != 3; ++change)
@@ -299,51 +310,20 @@ TEST(Subdivide, survivesMeshesOutsideOfItsPreconditions)
         // Closed, but not manifold: each face again, with opposite orientation.
         for (std::size_t face = 0; face != 32; ++face)
             soup.faces.push_back({soup.faces[face][2], soup.faces[face][1], soup.faces[face][0]});
-        PlainSubdivision plain(soup);
-        plain.run(0.4f);
-        auto const expected = meshOf(MeshBuilder::of(plain.positions, plain.faces), plain.values);
-        EXPECT_TRUE(sameContents(*refined(soup, 0.4f), *expected)) << run;
+        auto const mesh = refined(soup, 0.4f);
+        found = 31 * found + fingerprintOf(*mesh, *mesh);
         soup.points[random.below(18)].x = kNan;
         EXPECT_TRUE(isValid(*refined(soup, 0.4f))) << run;
     }
+    EXPECT_EQ(found, 15706807112424336335u);
     EXPECT_TRUE(isValid(*refined(MeshBuilder::bipyramid(30'000), 0.4f)));
 }
 
-TEST(Subdivide, showsItsProgressInDataOfPoints)
-{
-    class Observed : public Object {
-    public:
-        explicit Observed(Object const& mesh)
-            : Object(mesh)
-        {
-        }
-        void setProperty(Orvan::String const& key, Tessara::PropertyValue&& value) override
-        {
-            Object::setProperty(key, std::move(value));
-            auto const carried = key == "carried" ? dataOf<float3>(*this, "carried") : nullptr;
-            if (carried && carried->size != pointCounts.back())
-                pointCounts.push_back(carried->size);
-        }
-        std::vector<std::uint64_t> pointCounts{0};
-    };
-    auto const builder = MeshBuilder::sphere(6).graded();
-    Observed observed(*meshOf(builder));
-    std::vector<std::uint64_t> expected{0};
-    ASSERT_TRUE(Steps::refineMesh(
-        [&](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
-            expected.push_back(m.positions.size); // of the pass before
-            Steps::markForSubdivision(0.03f, m.faceCount, m.positions, m.faceVertex, m.faceOffset, marks);
-        },
-        observed));
-    EXPECT_GT(expected.size(), 4u);
-    expected.erase(expected.begin() + 1); // the coarse mesh
-    EXPECT_EQ(observed.pointCounts, expected);
-}
-
-TEST(Subdivide, canBeCancelledInEveryPass)
+TEST(Subdivide, CanBeCancelledInEveryPass)
 {
     auto const builder = MeshBuilder::sphere(6).graded();
     auto const before = meshOf(builder), expected = refined(builder, 0.03f);
+    std::uint64_t pointCount = 0; // in the pass that is cancelled
     // \return whether it was cancelled
     auto const isCancelled = [&](Steps::MarkFaces const& mark) {
         auto const mesh = meshOf(builder);
@@ -353,6 +333,7 @@ TEST(Subdivide, canBeCancelledInEveryPass)
             EXPECT_TRUE(sameContents(*mesh, *expected));
         } catch (std::runtime_error const&) {
             hasThrown = true;
+            EXPECT_EQ(dataOf<float3>(*mesh, "carried")->size, pointCount) << "grows with each pass";
             cutToElements("carried", *mesh);
             EXPECT_TRUE(sameContents(*mesh, *before));
         }
@@ -363,6 +344,7 @@ TEST(Subdivide, canBeCancelledInEveryPass)
     auto const markAndCancel = [&](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
         Steps::markForSubdivision(0.03f, m.faceCount, m.positions, m.faceVertex, m.faceOffset, marks);
         Orvan::setJobCancelled(pass++ == last);
+        pointCount = m.positions.size;
     };
     for (; isCancelled(markAndCancel); pass = 0) // in the first sweep of each pass
         ++last;

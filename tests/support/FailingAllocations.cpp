@@ -1,19 +1,20 @@
 #include "FailingAllocations.h"
 
 #include "AllocationHooks.h"
-#include "Compare.h"
 #include "PropertyBag.h"
 
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <atomic>
+#include <cerrno>
 #include <cstdlib>
 #include <cstring>
 #include <limits>
 #include <new>
 
 #include <dlfcn.h>
+#include <pthread.h>
 
 namespace TestSupport {
 
@@ -23,22 +24,15 @@ namespace {
 
     std::atomic<std::int64_t> allocationsLeft = kNever; // until the one that fails
     std::atomic<bool> failsOnce = false;
-    std::atomic<bool> isExhausted = false;
-    std::function<void()> const* atNumber = nullptr; // runs instead of a failure
     std::atomic<std::int64_t> liveBlocks = 0;
 
     bool mustFail()
     {
-        if (isExhausted.load(std::memory_order_relaxed))
+        if (ExhaustedMemory::isAlive.load(std::memory_order_relaxed))
             return true;
         if (allocationsLeft.load(std::memory_order_relaxed) == kNever)
             return false;
         std::int64_t const left = allocationsLeft.fetch_sub(1);
-        if (atNumber) {
-            if (left == 0)
-                (*atNumber)();
-            return false;
-        }
         return failsOnce ? left == 0 : left <= 0;
     }
 
@@ -76,16 +70,13 @@ void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
             std::int64_t const before = liveBlocks;
             hasFailed = false;
             trial([&](std::function<void()> const& action) {
-                bool isCompleted = false;
+                bool isCompleted = true;
                 failsOnce = once;
                 allocationsLeft = number - 1;
                 try {
                     action();
-                    isCompleted = true;
                 } catch (std::bad_alloc const&) {
-                } catch (...) {
-                    allocationsLeft = kNever;
-                    throw;
+                    isCompleted = false;
                 }
                 bool const isFailing = allocationsLeft.exchange(kNever) < 0;
                 hasFailed = hasFailed || isFailing;
@@ -94,32 +85,6 @@ void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
             });
             EXPECT_EQ(liveBlocks, before) << "blocks leaked";
         }
-}
-
-ExhaustedMemory::ExhaustedMemory()
-{
-    isExhausted = true;
-}
-
-ExhaustedMemory::~ExhaustedMemory()
-{
-    isExhausted = false;
-}
-
-bool runDuringAllocation(
-    std::int64_t number, std::function<void()> const& meanwhile, std::function<void()> const& action)
-{
-    atNumber = &meanwhile;
-    allocationsLeft = number - 1;
-    struct Disarm {
-        ~Disarm()
-        {
-            atNumber = nullptr;
-            allocationsLeft = kNever;
-        }
-    } const disarm;
-    action();
-    return allocationsLeft < 0;
 }
 
 void expectAllOrNothing(
@@ -150,14 +115,14 @@ void* dlopen(char const* file, int mode) noexcept
     return file && std::strstr(file, "libtbbmalloc") ? nullptr : open(file, mode);
 }
 
-void* scalable_malloc(std::size_t bytes)
-{
-    return TestSupport::isExhausted ? nullptr : std::malloc(bytes);
-}
-
 void* scalable_aligned_malloc(std::size_t bytes, std::size_t alignment)
 {
-    return TestSupport::isExhausted ? nullptr : TestSupport::systemBlock(bytes, alignment);
+    return TestSupport::ExhaustedMemory::isAlive ? nullptr : TestSupport::systemBlock(bytes, alignment);
+}
+
+void* scalable_malloc(std::size_t bytes)
+{
+    return scalable_aligned_malloc(bytes, alignof(std::max_align_t));
 }
 
 void scalable_free(void* block)
@@ -168,5 +133,12 @@ void scalable_free(void* block)
 void scalable_aligned_free(void* block)
 {
     std::free(block);
+}
+
+int pthread_create(
+    pthread_t* thread, pthread_attr_t const* attributes, void* (*routine)(void*), void* argument) noexcept
+{
+    static auto const create = reinterpret_cast<decltype(&pthread_create)>(dlsym(RTLD_NEXT, "pthread_create"));
+    return TestSupport::NoNewThreads::isAlive ? EAGAIN : create(thread, attributes, routine, argument);
 }
 }

@@ -2,14 +2,15 @@
 
 #include <TessaraObject/Object.h>
 
-#include <cstdint>
+#include <atomic>
 #include <functional>
 
 namespace TestSupport {
 
-// Programs that link this allocate through a replaced `operator new`, which can be made to fail.
+// Programs that link this allocate through a replaced `operator new`, and create threads through a replaced
+// `pthread_create`. Both can be made to fail.
 
-/// Runs an action; false if it ended in `std::bad_alloc`. Other exceptions pass through.
+/// Runs an action, which throws nothing but `std::bad_alloc`; false if it did.
 using Attempt = std::function<bool(std::function<void()> const& action)>;
 
 /// Calls `trial` repeatedly. Inside the action that the trial passes to its attempt, the n-th allocation fails, for
@@ -20,14 +21,17 @@ void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial);
 
 /// While one is alive, all allocations fail on all threads, those of oneTBB too.
 struct ExhaustedMemory {
-    ExhaustedMemory();
-    ~ExhaustedMemory();
+    static inline std::atomic<bool> isAlive = false;
+    ExhaustedMemory() { isAlive = true; }
+    ~ExhaustedMemory() { isAlive = false; }
 };
 
-/// Runs an action, and `meanwhile` during one of its allocations: `number` counts from 1.
-/// \return false if the action makes fewer allocations
-bool runDuringAllocation(
-    std::int64_t number, std::function<void()> const& meanwhile, std::function<void()> const& action);
+/// While one is alive, the thread that made it cannot create threads.
+struct NoNewThreads {
+    static inline thread_local bool isAlive = false;
+    NoNewThreads() { isAlive = true; }
+    ~NoNewThreads() { isAlive = false; }
+};
 
 /// Edits copies of an object while allocations fail: each copy is then either edited completely or unchanged. Some
 /// copies share their contents with the source, which must not change; others own them. If `mayGrow` names a float3

@@ -2,9 +2,12 @@
 
 #include "Random.h"
 
+#include <TessaraGeometry/Makers.h>
+
 #include <algorithm>
 #include <cmath>
 #include <numeric>
+#include <span>
 #include <tuple>
 
 namespace TestSupport {
@@ -17,14 +20,28 @@ namespace {
         return {static_cast<float>(x) / length, static_cast<float>(y) / length, static_cast<float>(z) / length};
     }
 
-}
+    /// Moves every point by up to `amount` along each axis.
+    void addNoise(float amount, unsigned int seed, std::vector<float3>& points)
+    {
+        Random random(seed);
+        for (float3& p : points) {
+            p.x += amount * random.coordinate();
+            p.y += amount * random.coordinate();
+            p.z += amount * random.coordinate();
+        }
+    }
 
-MeshBuilder MeshBuilder::of(std::vector<float3> points, std::vector<Triangle> faces)
-{
-    MeshBuilder mesh;
-    mesh.points = std::move(points);
-    mesh.faces = std::move(faces);
-    return mesh;
+    /// The position at the fraction step / stepCount of the way around the square [-1, 1]² in the plane z = 0. Needs no
+    /// sines.
+    float3 aroundSquare(unsigned int step, unsigned int stepCount)
+    {
+        float const along = 8 * static_cast<float>(step) / static_cast<float>(stepCount);
+        float const side = std::floor(along / 2);
+        float const t = along - 2 * side - 1;
+        float3 const sides[] = {{t, -1, 0}, {1, t, 0}, {-t, 1, 0}, {-1, -t, 0}};
+        return sides[static_cast<int>(side)];
+    }
+
 }
 
 MeshBuilder MeshBuilder::tetrahedron()
@@ -36,7 +53,6 @@ MeshBuilder MeshBuilder::sphere(unsigned int segments)
 {
     // Points of the octahedron |x| + |y| + |z| = n by rings of constant z: a ring of "radius" r has 4 r points, a pole
     // one.
-    constexpr int kCorners[5][2] = {{1, 0}, {0, 1}, {-1, 0}, {0, -1}, {1, 0}};
     MeshBuilder mesh;
     std::vector<unsigned int> ringStart;
     int const n = static_cast<int>(segments);
@@ -44,13 +60,12 @@ MeshBuilder MeshBuilder::sphere(unsigned int segments)
         int const radius = n - std::abs(z);
         ringStart.push_back(static_cast<unsigned int>(mesh.points.size()));
         if (radius == 0)
-            mesh.points.push_back({0, 0, z < 0 ? -1.0f : 1.0f});
+            mesh.points.push_back(onSphere(0, 0, z));
         for (int t = 0; t != 4 * radius; ++t) {
-            int const side = t / radius, step = t % radius;
-            int const* const from = kCorners[side];
-            int const* const to = kCorners[side + 1];
-            mesh.points.push_back(
-                onSphere((radius - step) * from[0] + step * to[0], (radius - step) * from[1] + step * to[1], z));
+            int const step = t % radius, rest = radius - step;
+            int const sides[4][2] = {{rest, step}, {-step, rest}, {-rest, -step}, {step, -rest}};
+            auto const [x, y] = sides[t / radius];
+            mesh.points.push_back(onSphere(x, y, z));
         }
     }
     // The faces between a ring of radius r and the next smaller one.
@@ -74,10 +89,7 @@ MeshBuilder MeshBuilder::sphere(unsigned int segments)
 
 MeshBuilder MeshBuilder::sphereWithFaces(std::size_t atLeast)
 {
-    unsigned int segments = 1;
-    while (8 * std::size_t{segments} * segments < atLeast)
-        ++segments;
-    return sphere(segments);
+    return sphere(std::max(1u, static_cast<unsigned int>(std::ceil(std::sqrt(static_cast<double>(atLeast) / 8)))));
 }
 
 MeshBuilder MeshBuilder::icosahedron()
@@ -93,20 +105,17 @@ MeshBuilder MeshBuilder::icosahedron()
 MeshBuilder MeshBuilder::torus(unsigned int rings, unsigned int sides)
 {
     auto const onCircle = [](unsigned int step, unsigned int stepCount) {
-        auto const [x, y] = aroundSquare(step, stepCount);
+        auto const [x, y, z] = aroundSquare(step, stepCount);
         float const length = std::sqrt(x * x + y * y);
-        return OnSquare{x / length, y / length};
+        return std::pair(x / length, y / length);
     };
+    auto const at = [=](unsigned int ring, unsigned int side) { return ring % rings * sides + side % sides; };
     MeshBuilder mesh;
     for (unsigned int ring = 0; ring != rings; ++ring)
         for (unsigned int side = 0; side != sides; ++side) {
             auto const [cx, cy] = onCircle(ring, rings);
             auto const [dx, dz] = onCircle(side, sides);
             mesh.points.push_back({cx * (3 + dx), cy * (3 + dx), dz});
-        }
-    auto const at = [=](unsigned int ring, unsigned int side) { return ring % rings * sides + side % sides; };
-    for (unsigned int ring = 0; ring != rings; ++ring)
-        for (unsigned int side = 0; side != sides; ++side) {
             mesh.faces.push_back({at(ring, side), at(ring + 1, side), at(ring + 1, side + 1)});
             mesh.faces.push_back({at(ring, side), at(ring + 1, side + 1), at(ring, side + 1)});
         }
@@ -116,10 +125,8 @@ MeshBuilder MeshBuilder::torus(unsigned int rings, unsigned int sides)
 MeshBuilder MeshBuilder::bipyramid(unsigned int rim)
 {
     MeshBuilder mesh;
-    for (unsigned int i = 0; i != rim; ++i) {
-        auto const [x, y] = aroundSquare(i, rim);
-        mesh.points.push_back({x, y, 0});
-    }
+    for (unsigned int i = 0; i != rim; ++i)
+        mesh.points.push_back(aroundSquare(i, rim));
     mesh.points.push_back({0, 0, 1});
     mesh.points.push_back({0, 0, -1});
     for (unsigned int i = 0; i != rim; ++i) {
@@ -138,18 +145,6 @@ MeshBuilder MeshBuilder::wheel(unsigned int rim, std::vector<float> const& radii
     }
     mesh.points[rim].z = 0.001f;
     mesh.points[rim + 1].z = -0.001f;
-    return mesh;
-}
-
-MeshBuilder MeshBuilder::square(unsigned int segments)
-{
-    PolygonMesh const quads = PolygonMesh::quads(segments);
-    MeshBuilder mesh = of(quads.points, {});
-    for (std::size_t c = 0; c != quads.faceVertex.size(); c += 4) {
-        unsigned int const* const corner = quads.faceVertex.data() + c;
-        mesh.faces.push_back({corner[0], corner[1], corner[2]});
-        mesh.faces.push_back({corner[0], corner[2], corner[3]});
-    }
     return mesh;
 }
 
@@ -176,10 +171,9 @@ MeshBuilder MeshBuilder::withNeedles(std::size_t cuts, float fraction) &&
         Triangle const inF = faces[f], inG = faces[g];
         unsigned int const a = inF[cornerF], b = inF[(cornerF + 1) % 3];
         unsigned int const c = inF[(cornerF + 2) % 3], d = inG[(cornerG + 2) % 3];
-        float3 const from = points[a], to = points[b];
         auto const middle = static_cast<unsigned int>(points.size());
-        points.push_back({from.x + (to.x - from.x) * fraction, from.y + (to.y - from.y) * fraction,
-            from.z + (to.z - from.z) * fraction});
+        auto const cut = [=](float from, float to) { return from + (to - from) * fraction; };
+        points.push_back({cut(points[a].x, points[b].x), cut(points[a].y, points[b].y), cut(points[a].z, points[b].z)});
         faces[f] = {a, middle, c};
         faces[g] = {middle, a, d};
         faces.push_back({middle, b, c});
@@ -250,6 +244,90 @@ PolygonMesh MeshBuilder::polygons() const
         mesh.faceOffset.push_back(static_cast<unsigned int>(mesh.faceVertex.size()));
     }
     return mesh;
+}
+
+PolygonMesh PolygonMesh::quads(unsigned int segments)
+{
+    PolygonMesh mesh;
+    for (unsigned int y = 0; y <= segments; ++y)
+        for (unsigned int x = 0; x <= segments; ++x)
+            mesh.points.push_back({static_cast<float>(x), static_cast<float>(y), 0});
+    for (unsigned int y = 0; y != segments; ++y) {
+        for (unsigned int x = 0; x != segments; ++x) {
+            unsigned int const corner = y * (segments + 1) + x;
+            mesh.faceVertex.insert(
+                mesh.faceVertex.end(), {corner, corner + 1, corner + segments + 2, corner + segments + 1});
+            mesh.faceOffset.push_back(static_cast<unsigned int>(mesh.faceVertex.size()));
+        }
+    }
+    return mesh;
+}
+
+PolygonMesh PolygonMesh::stars(std::size_t count, unsigned int minCorners, unsigned int maxCorners, unsigned int seed)
+{
+    Random random(seed);
+    PolygonMesh mesh;
+    for (std::size_t polygon = 0; polygon != count; ++polygon) {
+        unsigned int const cornerCount = minCorners + random.below(maxCorners - minCorners + 1);
+        // Two perpendicular directions of any length span the plane.
+        float3 const u = random.point();
+        float3 const v = std::abs(u.x) > std::abs(u.z) ? float3{-u.y, u.x, 0} : float3{0, -u.z, u.y};
+        std::vector<float3> corners;
+        for (unsigned int i = 0; i != cornerCount; ++i) {
+            auto const [x, y, z] = aroundSquare(i, cornerCount);
+            float const radius = 1.1f + random.coordinate();
+            float const column = static_cast<float>(polygon % 1000);
+            corners.push_back({5 * column + radius * (x * u.x + y * v.x), radius * (x * u.y + y * v.y),
+                radius * (x * u.z + y * v.z)});
+        }
+        mesh.addPolygon(corners);
+    }
+    return mesh;
+}
+
+PolygonMesh PolygonMesh::soup(
+    std::size_t pointCount, std::size_t faceCount, unsigned int minCorners, unsigned int maxCorners, Random& random)
+{
+    PolygonMesh mesh;
+    while (mesh.points.size() != pointCount)
+        mesh.points.push_back(random.point());
+    while (mesh.faceCount() != faceCount) {
+        for (unsigned int corner = minCorners + random.below(maxCorners - minCorners + 1); corner != 0; --corner)
+            mesh.faceVertex.push_back(random.below(pointCount));
+        mesh.faceOffset.push_back(static_cast<unsigned int>(mesh.faceVertex.size()));
+    }
+    return mesh;
+}
+
+PolygonMesh PolygonMesh::withNoise(float amount, unsigned int seed) &&
+{
+    addNoise(amount, seed, points);
+    return std::move(*this);
+}
+
+PolygonMesh PolygonMesh::joinedWith(PolygonMesh const& other) &&
+{
+    for (unsigned int const point : other.faceVertex)
+        faceVertex.push_back(static_cast<unsigned int>(points.size()) + point);
+    for (std::size_t face = 1; face != other.faceOffset.size(); ++face)
+        faceOffset.push_back(faceOffset.back() + other.faceOffset[face] - other.faceOffset[face - 1]);
+    points.insert(points.end(), other.points.begin(), other.points.end());
+    return std::move(*this);
+}
+
+void PolygonMesh::addPolygon(std::vector<float3> const& corners)
+{
+    for (float3 const& corner : corners) {
+        faceVertex.push_back(static_cast<unsigned int>(points.size()));
+        points.push_back(corner);
+    }
+    faceOffset.push_back(static_cast<unsigned int>(faceVertex.size()));
+}
+
+Orvan::MutablePtr<Tessara::Object> PolygonMesh::build() const
+{
+    return Tessara::Geometry::makeMesh(Orvan::Array<float3>(std::span(points)),
+        Orvan::Array<unsigned int>(std::span(faceVertex)), Orvan::Array<unsigned int>(std::span(faceOffset)));
 }
 
 }

@@ -23,9 +23,10 @@ public:
     static MeshBuilder bipyramid(unsigned int rim);
     /// An almost flat bipyramid with radii that repeat along the rim: by default half of the spokes are short.
     static MeshBuilder wheel(unsigned int rim, std::vector<float> const& radii = {0.02f, 1});
-    /// An open square in the plane z = 0 with 2 n² faces.
-    static MeshBuilder square(unsigned int segments);
-    static MeshBuilder of(std::vector<float3> points, std::vector<Triangle> faces);
+    static MeshBuilder of(std::vector<float3> points, std::vector<Triangle> faces)
+    {
+        return {std::move(points), std::move(faces)};
+    }
 
     /// Cuts edges close to one end, spread over the mesh: each cut adds two needles and one point.
     MeshBuilder withNeedles(std::size_t cuts, float fraction = 0.01f) &&;

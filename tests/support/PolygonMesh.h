@@ -11,16 +11,6 @@ namespace TestSupport {
 
 using Tessara::Math::float3;
 
-/// Moves every point by up to `amount` along each axis.
-void addNoise(float amount, unsigned int seed, std::vector<float3>& points);
-
-struct OnSquare {
-    float x, y;
-};
-
-/// The position at the fraction step / stepCount of the way around the square [-1, 1]². Needs no sines.
-OnSquare aroundSquare(unsigned int step, unsigned int stepCount);
-
 /// A mesh whose faces have any number of corners: `PolygonMesh::quads(100).build()`. As with `MeshBuilder`, every
 /// compiler makes the same mesh to the bit.
 struct PolygonMesh {

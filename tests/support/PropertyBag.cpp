@@ -2,17 +2,86 @@
 
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Validators.h>
 
+#include <cstring>
+#include <map>
+#include <span>
 #include <string>
 #include <type_traits>
 
 namespace TestSupport {
 
 using Tessara::Object;
+using Tessara::PropertyValue;
 using namespace Tessara::Geometry;
 
 namespace {
+
+    template <class T> bool sameBits(T const& a, T const& b)
+    {
+        if constexpr (std::is_trivially_copyable_v<T>)
+            return std::memcmp(&a, &b, sizeof(T)) == 0;
+        else
+            return a == b;
+    }
+
+    template <class T> std::string difference(Orvan::Array<T> const& actual, Orvan::Array<T> const& expected)
+    {
+        if (actual.size != expected.size)
+            return " has " + std::to_string(actual.size) + " entries instead of " + std::to_string(expected.size);
+        for (std::uint64_t i = 0; i != actual.size; ++i)
+            if (!sameBits(actual[i], expected[i]))
+                return "[" + std::to_string(i) + "] differs: " + testing::PrintToString(actual[i]) + " instead of "
+                    + testing::PrintToString(expected[i]);
+        return {};
+    }
+
+    std::string difference(Object const& actual, Object const& expected);
+
+    /// Compares what two values of one type point to; null is equal to null only.
+    template <class T> std::string difference(Orvan::Ptr<T> const& actual, Orvan::Ptr<T> const& expected)
+    {
+        if (!actual || !expected)
+            return !actual == !expected ? "" : actual ? " is not null" : " is null";
+        return actual == expected ? "" : difference(*actual, *expected);
+    }
+
+    template <class T> std::string difference(T const& actual, T const& expected)
+    {
+        return sameBits(actual, expected) ? "" : " differs";
+    }
+
+    std::string difference(PropertyValue const& actual, PropertyValue const& expected)
+    {
+        if (actual.type() != expected.type())
+            return std::string(" has type ") + actual.type().name() + " instead of " + expected.type().name();
+        std::string found;
+        auto const compare = [&]<class T>(T const* held) {
+            if (held)
+                found = difference(*held, *expected.get<T>());
+        };
+        compare(actual.get<Orvan::Ptr<Object>>());
+        compare(actual.get<Common::DataInterpolationMode>());
+        forEachElementTypeName([&]<class T>(ElementType<T>) {
+            compare(actual.get<T>());
+            compare(actual.get<Orvan::Ptr<Orvan::Array<T>>>());
+        });
+        return found;
+    }
+
+    std::string difference(Object const& actual, Object const& expected)
+    {
+        if (auto const found = difference(*actual.keys(), *expected.keys()); !found.empty())
+            return " keys" + found;
+        Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = expected.keys();
+        for (Orvan::String const& key : *keys)
+            if (auto const found = difference(actual.getProperty(key), expected.getProperty(key)); !found.empty())
+                return std::string(" ") + key.c_str() + found;
+        return {};
+    }
 
     template <class T> T randomValue(Random& random)
     {
@@ -32,19 +101,13 @@ namespace {
         return value;
     }
 
-    template <class T> Orvan::Array<T> randomValues(std::size_t length, Random& random)
+    template <class T> void addData(Orvan::String const& name, Orvan::String const& target, std::size_t length,
+        bool withDefault, Random& random, Object& object)
     {
         Orvan::Array<T> values(length);
         for (T& value : values)
             value = randomValue<T>(random);
-        return values;
-    }
-
-    template <class T> void addData(
-        Orvan::String const& name, Orvan::String const& target, std::size_t length, Random& random, Object& object)
-    {
-        Orvan::Array<T> values = randomValues<T>(length, random);
-        addDataProperty<T>(name, target, std::move(values), object, randomValue<T>(random));
+        addDataProperty<T>(name, target, std::move(values), object, withDefault ? randomValue<T>(random) : T{});
     }
 
     void addDataOfAnyType(
@@ -53,7 +116,7 @@ namespace {
         unsigned int type = random.below(40); // counts down
         forEachElementTypeName([&]<class T>(ElementType<T>) {
             if (type-- == 0)
-                addData<T>(name, target, length, random, object);
+                addData<T>(name, target, length, true, random, object);
         });
     }
 
@@ -85,7 +148,29 @@ namespace {
 
 }
 
-void replaceIn(Orvan::String const& name, char const* key, Tessara::PropertyValue value, Object& object)
+testing::AssertionResult sameContents(Object const& actual, Object const& expected)
+{
+    std::string const found = difference(actual, expected);
+    return found.empty() ? testing::AssertionSuccess() : testing::AssertionFailure() << "in" << found;
+}
+
+Orvan::MutablePtr<Object> deepCopy(Object const& object)
+{
+    Orvan::MutablePtr<Object> copy = Tessara::createObject();
+    Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = object.keys();
+    for (Orvan::String const& key : *keys) {
+        PropertyValue const value = object.getProperty(key);
+        copy->setProperty(key, PropertyValue(value));
+        if (auto const* const held = value.get<Orvan::Ptr<Object>>(); held && *held)
+            copy->setProperty(key, Orvan::Ptr<Object>(deepCopy(**held)));
+        visitArray(value, [&]<class T>(Orvan::Array<T> const& array, auto) {
+            copy->setProperty(key, Orvan::makePtr<Orvan::Array<T>>(array));
+        });
+    }
+    return copy;
+}
+
+void replaceIn(Orvan::String const& name, char const* key, PropertyValue value, Object& object)
 {
     Object changed = **object.getProperty(name).get<Orvan::Ptr<Object>>();
     changed.setProperty(key, std::move(value));
@@ -111,12 +196,10 @@ void addRandomProperties(Orvan::String const& component, Random& random, Object&
             continue;
         }
         addDataOfAnyType(name, component, lengthNear(count, random), random, object);
-        if (kind == 4)
-            replaceIn(name, sData, Orvan::Ptr<Orvan::Array<float>>(), object);
-        else if (kind == 5)
-            replaceIn(name, sData, {}, object);
-        else if (kind == 6)
-            replaceIn(name, sData, 1.5f, object); // a type that operations do not know
+        PropertyValue const odd[] = {
+            Orvan::Ptr<Orvan::Array<float>>(), {}, 1.5f}; // operations do not know the last type
+        if (kind < 7)
+            replaceIn(name, sData, odd[kind - 4], object);
         else if (kind == 7)
             replaceIn(name, sDefault, {}, object);
         else if (kind == 8)
@@ -129,7 +212,7 @@ void addAllTypes(Orvan::String const& component, Random& random, Object& object)
     forEachElementTypeName([&]<class T>(ElementType<T> type) {
         Orvan::String name = component;
         name += type.name;
-        addDataProperty<T>(name, component, randomValues<T>(getElementCount(object, component), random), object);
+        addData<T>(name, component, getElementCount(object, component), false, random, object);
     });
 }
 
@@ -148,14 +231,76 @@ Object held(Holders holders, Object const& object)
     Object holder;
     Orvan::Ptr<Orvan::Array<Orvan::String>> const keys = object.keys();
     for (Orvan::String const& key : *keys) {
-        Tessara::PropertyValue const value = object.getProperty(key);
-        auto const* const property = value.get<Orvan::Ptr<Object>>();
+        PropertyValue value = object.getProperty(key);
+        auto const property = value.get<Orvan::Ptr<Object>>() ? *value.get<Orvan::Ptr<Object>>() : nullptr;
         if (holders == Holders::Properties)
-            holder.setProperty(key, Tessara::PropertyValue(value));
+            holder.setProperty(key, std::move(value));
         else if (holders == Holders::Arrays && property)
-            holder.setProperty(key, (*property)->getProperty((*property)->hasProperty(sData) ? sData : sIndices));
+            holder.setProperty(key, property->getProperty(property->hasProperty(sData) ? sData : sIndices));
     }
     return holder;
+}
+
+Counts countsOf(Object const& mesh)
+{
+    return {
+        getElementCount(mesh, sPointComp), getElementCount(mesh, sFaceVertexComp), getElementCount(mesh, sFaceComp)};
+}
+
+testing::AssertionResult isClosedManifold(Object const& mesh)
+{
+    if (auto const valid = isValid(mesh); !valid)
+        return valid;
+    auto const corners = dataOf<unsigned int>(mesh, sFaceVertex), offsets = dataOf<unsigned int>(mesh, sFaceOffset);
+    // For each directed edge the point before it in its face: around the start of the edge, each face leads from one
+    // neighbor to the next.
+    std::map<std::pair<unsigned int, unsigned int>, unsigned int> before;
+    std::map<unsigned int, unsigned int> valences;
+    for (std::size_t face = 0; face + 1 < offsets->size; ++face) {
+        std::span const points(corners->data + (*offsets)[face], corners->data + (*offsets)[face + 1]);
+        for (std::size_t k = 0; k != points.size(); ++k) {
+            unsigned int const start = points[k], end = points[(k + 1) % points.size()];
+            if (start == end
+                || !before.try_emplace({start, end}, points[(k + points.size() - 1) % points.size()]).second)
+                return testing::AssertionFailure() << "twice or without length: edge " << start << " to " << end;
+            ++valences[start];
+        }
+    }
+    for (auto const& [edge, previous] : before)
+        if (!before.contains({edge.second, edge.first}))
+            return testing::AssertionFailure() << "boundary from point " << edge.first << " to " << edge.second;
+    for (auto const& [point, valence] : valences) {
+        auto const first = before.lower_bound({point, 0});
+        unsigned int steps = 1;
+        for (unsigned int neighbor = first->second; neighbor != first->first.second; ++steps)
+            neighbor = before.at({point, neighbor});
+        if (steps != valence)
+            return testing::AssertionFailure() << "more than one fan of faces around point " << point;
+    }
+    return testing::AssertionSuccess();
+}
+
+testing::AssertionResult isValid(Object const& geometry)
+{
+    GeoValidator::Status const status = geometry.hasProperty(sFaceComp) ? validateMesh(geometry)
+        : geometry.hasProperty(sStrandComp)                             ? StrandValidator().validate(geometry)
+                                                                        : PointCloudValidator().validate(geometry);
+    if (status)
+        return testing::AssertionSuccess();
+    return testing::AssertionFailure() << status.message().c_str();
+}
+
+std::uint64_t fingerprint(Object const& geometry)
+{
+    std::uint64_t hash = 0xCBF29CE484222325u;
+    for (char const* const name : {sPointPosition, sFaceVertex, sFaceOffset})
+        if (auto const property = getDataGeoProperty(geometry, name))
+            visitArray(property->getProperty(sData), [&](auto const& array, auto) {
+                auto const* const bytes = reinterpret_cast<unsigned char const*>(array.data);
+                for (std::size_t i = 0; i != array.size * sizeof(array[0]); ++i)
+                    hash = (hash ^ bytes[i]) * 0x100000001B3u; // FNV-1a
+            });
+    return hash;
 }
 
 }
