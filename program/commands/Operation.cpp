@@ -234,7 +234,8 @@ void saveGeometry(Tessara::Object const& object, Output const& out, Report& repo
             fmt::format("the result is invalid, so nothing was written: {}", status.message().view()));
     stopIfCancelled();
     std::string const remark = report.reading.origin ? centerOf(report.reading) : std::string();
-    for (std::string const& note : writeGeometryFile(object, out.file, {out.existing(), remark, out.compression}))
+    for (std::string const& note :
+        writeGeometryFile(object, out.file, {out.existing(), remark, out.compression, report.reading.onSize}))
         report.warn(note);
     report.document["output"] = out.file.string();
 }

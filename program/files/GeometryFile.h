@@ -57,6 +57,7 @@ struct WriteOptions {
     Existing existing = Existing::Replace;
     std::string remark = {}; // a line of text without a line end, stored as a comment; empty for none
     unsigned int compression = 0; // of HDF5 files, 1 to 9 as those of gzip; 0 for none
+    std::function<void(std::uint64_t)> onSize = {}; // as in `ReadOptions`, for objects of a file that are kept
 };
 
 /// Writes OBJ, PLY (binary, little-endian), STL (binary), VTP, GLB (binary glTF) and HDF5 files. The file appears under

@@ -177,8 +177,9 @@ void writeHdf5Geometry(Object const& object, Hdf5Location const& location, Write
     takeApart(object, location.file); // refuses what cannot be read again
     Hdf5Object const written{name, Orvan::makePtr<Object>(object), options.remark};
     std::vector<Hdf5Object> objects;
-    if (location.object && options.existing == Existing::Replace && std::filesystem::exists(location.file))
-        objects = readHdf5Objects(location.file, Hdf5Selection::All);
+    std::error_code ignored;
+    if (location.object && options.existing == Existing::Replace && std::filesystem::exists(location.file, ignored))
+        objects = readHdf5Objects(location.file, Hdf5Selection::All, "", options.onSize);
     auto const same =
         std::find_if(objects.begin(), objects.end(), [&](auto const& other) { return other.name == name; });
     if (same == objects.end())

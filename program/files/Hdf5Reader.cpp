@@ -41,11 +41,11 @@ namespace {
     class RawFile {
     public:
         explicit RawFile(std::filesystem::path const& file)
-            : descriptor_(::open(file.c_str(), O_RDONLY | O_CLOEXEC))
+            : descriptor_(::open(file.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK)) // a pipe would block
         {
             struct stat status = {};
             if (descriptor_ < 0 || ::fstat(descriptor_, &status) != 0)
-                fail(file, std::strerror(errno));
+                fail(file, errno == ENOENT ? "there is no such file" : std::strerror(errno));
             if (!S_ISREG(status.st_mode))
                 fail(file, "it is not a regular file");
             size = static_cast<std::uint64_t>(status.st_size);
@@ -519,8 +519,6 @@ namespace {
 std::vector<Hdf5Object> readHdf5Objects(std::filesystem::path const& file, Hdf5Selection selection,
     std::string const& name, std::function<void(std::uint64_t)> const& onSize)
 {
-    if (!std::filesystem::exists(file))
-        throw FileError(file.string() + " cannot be read: there is no such file");
     RawFile const raw(file);
     Place const root{file, ""};
     std::string const outline = outlineOf(file, selection, name, raw.size);

@@ -32,6 +32,7 @@ namespace {
         nested->setProperty("null", Orvan::Ptr<Object>());
         nested->setProperty("empty", Orvan::makePtr<Object>());
         nested->setProperty("mode", static_cast<Common::DataInterpolationMode>(random.below(5)));
+        nested->setProperty(std::string(100000, 'k').c_str(), true);
         nested->setProperty("text", Orvan::String(std::string(70000, 'x')));
         object->setProperty("nested", Orvan::Ptr<Object>(std::move(nested)));
         return object;
