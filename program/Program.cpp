@@ -25,10 +25,10 @@ namespace {
         addRemoveSlivers, addStitch, addRun, addHelp, addCompletion, addManual};
 
     constexpr char kFooter[] =
-        R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz .h5; written: .obj
-.ply .stl .vtp .h5. FILE.h5#NAME is one of several objects in an HDF5 file. An existing file is
-replaced only with --force, even if OUT is IN, and only by a complete file; if anything fails it
-stays unchanged. Results are printed to standard output, messages to standard error.
+        R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz .glb .gltf .h5;
+written: .obj .ply .stl .vtp .glb .h5. FILE.h5#NAME is one of several objects in an HDF5 file. An
+existing file is replaced only with --force, even if OUT is IN, and only by a complete file; if
+anything fails it stays unchanged. Results are printed to standard output, messages to standard error.
 
 Exit codes:
   0  done

@@ -49,8 +49,8 @@ namespace {
     }
 
     /// Cuts one face: `source` receives, for each corner of its triangles, the corner of the mesh that it comes from.
-    void cutFace(
-        MeshArrays const& mesh, unsigned int face, std::span<unsigned int> source, Modeling::Internal::PolygonStorage& storage)
+    void cutFace(MeshArrays const& mesh, unsigned int face, std::span<unsigned int> source,
+        Modeling::Internal::PolygonStorage& storage)
     {
         unsigned int const firstCorner = mesh.faceOffset->data[face];
         unsigned int const cornerCount = cornerCountOf(mesh, face);

@@ -2,8 +2,8 @@
 
 #include "Program.h"
 
+#include "program/TemporaryFolder.h"
 #include "support/Random.h"
-#include "support/TemporaryFolder.h"
 
 #include <gmock/gmock.h>
 

@@ -1,4 +1,4 @@
-#include "support/TemporaryFolder.h"
+#include "program/TemporaryFolder.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

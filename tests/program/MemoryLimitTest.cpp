@@ -5,8 +5,8 @@
 #include "geometry/SurfaceBand.h"
 #include "shell/Failure.h"
 
+#include "program/TemporaryFolder.h"
 #include "support/MeshBuilder.h"
-#include "support/TemporaryFolder.h"
 
 #include <OrvanCppOpSDK/Job.h>
 #include <TessaraGeometry/Makers.h>

@@ -3,7 +3,7 @@
 #include "shell/Failure.h"
 #include "shell/ShellWords.h"
 
-#include "support/TemporaryFolder.h"
+#include "program/TemporaryFolder.h"
 
 #include <gmock/gmock.h>
 

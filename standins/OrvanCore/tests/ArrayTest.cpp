@@ -13,7 +13,7 @@ static_assert(offsetof(Array<float>, data) == 0 && offsetof(Array<float>, size) 
 
 constexpr char kLong[] = "a string that is too long to be stored without an allocation";
 
-TEST(Array, growsByItsCapacityOrByTheAddedCountAndReusesItsStorage)
+TEST(Array, GrowsByItsCapacityOrByTheAddedCountAndReusesItsStorage)
 {
     Array<int> appended;
     std::vector<std::uint64_t> capacities;
@@ -43,7 +43,7 @@ TEST(Array, growsByItsCapacityOrByTheAddedCountAndReusesItsStorage)
     EXPECT_TRUE(appended == Array<int>(5) && appended.data != storage);
 }
 
-TEST(Array, initializesTheElementsThatResizingAdds)
+TEST(Array, InitializesTheElementsThatResizingAdds)
 {
     Array<int> array{1, 2, 3, 4};
     array.resize(1);
@@ -56,7 +56,7 @@ TEST(Array, initializesTheElementsThatResizingAdds)
     EXPECT_EQ(Texts(2, Orvan::kUninitialized), (Texts{"", ""})) << "still constructed";
 }
 
-TEST(Array, constructsAndDestroysEachElementOnce)
+TEST(Array, ConstructsAndDestroysEachElementOnce)
 {
     auto const watched = std::make_shared<int>(5);
     {
@@ -81,7 +81,7 @@ TEST(Array, constructsAndDestroysEachElementOnce)
     EXPECT_EQ(watched.use_count(), 1);
 }
 
-TEST(Array, refusesSizesBeyondTheAddressSpace)
+TEST(Array, RefusesSizesBeyondTheAddressSpace)
 {
     constexpr std::uint64_t kMaxCount = std::numeric_limits<std::uint64_t>::max();
     for (std::uint64_t const count : {kMaxCount, kMaxCount / 4, kMaxCount / 4 + 1, kMaxCount / 8 + 1}) {
@@ -94,7 +94,7 @@ TEST(Array, refusesSizesBeyondTheAddressSpace)
     }
 }
 
-TEST(Array, isUnchangedWhenAnAllocationFails)
+TEST(Array, IsUnchangedWhenAnAllocationFails)
 {
     Texts const source(3, kLong);
     std::vector<std::function<void(Texts&)>> const actions{
@@ -115,7 +115,7 @@ TEST(Array, isUnchangedWhenAnAllocationFails)
             });
 }
 
-TEST(UntypedTypeRep, givesAlignedStorage)
+TEST(UntypedTypeRep, GivesAlignedStorage)
 {
     struct alignas(256) Wide {
         std::byte bytes[256];

@@ -7,7 +7,7 @@
 using Orvan::makePtr, Orvan::MutablePtr, Orvan::Ptr;
 using Ints = Orvan::Array<int>;
 
-TEST(Ptr, countsItsReferences)
+TEST(Ptr, CountsItsReferences)
 {
     auto const watched = std::make_shared<int>(5);
     using Held = std::shared_ptr<int>;
@@ -31,7 +31,7 @@ TEST(Ptr, countsItsReferences)
     EXPECT_EQ(watched.use_count(), 1);
 }
 
-TEST(MakeMutable, movesAnUnsharedValueAndCopiesASharedOne)
+TEST(MakeMutable, MovesAnUnsharedValueAndCopiesASharedOne)
 {
     Ptr<Ints> shared = makePtr<Ints>(Ints{1, 2, 3});
     Ints const* const value = shared.get();
@@ -54,7 +54,7 @@ TEST(MakeMutable, movesAnUnsharedValueAndCopiesASharedOne)
 }
 
 // At most one thread gets the value itself, and all other threads must have finished reading before it writes.
-TEST(Ptr, isCopiedAndReleasedOnManyThreads)
+TEST(Ptr, IsCopiedAndReleasedOnManyThreads)
 {
     constexpr int kThreads = 3;
     for (int round = 0; round < 300; ++round) {

@@ -4,7 +4,7 @@
 
 using Orvan::String;
 
-TEST(String, treatsNullAsTheEmptyString)
+TEST(String, TreatsNullAsTheEmptyString)
 {
     char const* const null = nullptr;
     String text(null);
@@ -18,7 +18,7 @@ TEST(String, treatsNullAsTheEmptyString)
     EXPECT_EQ(text, String());
 }
 
-TEST(String, copiesAppendsAndCompares)
+TEST(String, CopiesAppendsAndCompares)
 {
     for (std::string const& plain : {std::string("short"), std::string(100, 'l')}) {
         String const text(plain.c_str());

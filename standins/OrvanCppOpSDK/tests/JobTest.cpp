@@ -6,7 +6,7 @@
 #include <thread>
 
 // As a host cancels: in a signal handler on another thread than the job's.
-TEST(Job, seesACancellationFromASignalHandler)
+TEST(Job, SeesACancellationFromASignalHandler)
 {
     EXPECT_FALSE(Orvan::isJobCancelled());
     int reason = 0; // not atomic: the flag must publish it

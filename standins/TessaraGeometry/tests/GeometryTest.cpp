@@ -41,7 +41,7 @@ std::vector<std::string> toStrings(Names const& names)
 
 }
 
-TEST(Prototypes, distinguishTheKindsOfGeoProperties)
+TEST(Prototypes, DistinguishTheKindsOfGeoProperties)
 {
     Orvan::MutablePtr<Object> component = Tessara::createObject(), range = Tessara::createObject();
     populateComponentGeoProperty(3, *component);
@@ -63,7 +63,7 @@ TEST(Prototypes, distinguishTheKindsOfGeoProperties)
     EXPECT_EQ(getGeoPropsByPrototype(*cloud, *data).size, 41u) << "and the positions";
 }
 
-TEST(Prototypes, distinguishTheKindsOfGeometry)
+TEST(Prototypes, DistinguishTheKindsOfGeometry)
 {
     auto const populated = [](void (*populate)(Object&)) {
         auto object = Tessara::createObject();
@@ -81,7 +81,7 @@ TEST(Prototypes, distinguishTheKindsOfGeometry)
     EXPECT_EQ(kindsOf(*twoTriangles()) + kindsOf(*makePointCloud({})) + kindsOf(*twoStrands()), "mesh cloud strands ");
 }
 
-TEST(Elements, haveACountThatChangesNoArray)
+TEST(Elements, HaveACountThatChangesNoArray)
 {
     auto const mesh = twoTriangles();
     Object const other = *mesh;
@@ -95,7 +95,7 @@ TEST(Elements, haveACountThatChangesNoArray)
     }
 }
 
-TEST(Elements, areUnchangedWhenAnAllocationFails)
+TEST(Elements, AreUnchangedWhenAnAllocationFails)
 {
     auto const mesh = twoTriangles();
     addRangeProperty("range", sPointComp, {1, 2, 3}, *mesh);
@@ -105,7 +105,7 @@ TEST(Elements, areUnchangedWhenAnAllocationFails)
         expectAllOrNothing(*mesh, edit);
 }
 
-TEST(Lookup, findsGeoPropertiesByKindAndTarget)
+TEST(Lookup, FindsGeoPropertiesByKindAndTarget)
 {
     auto const mesh = twoTriangles();
     addDataProperty<float>("weight", sPointComp, {1, 2, 3, 4}, *mesh);
@@ -136,7 +136,7 @@ TEST(Lookup, findsGeoPropertiesByKindAndTarget)
     EXPECT_FALSE(setRangeGeoPropIndices("weight", Orvan::makePtr<Indices>(), *mesh));
 }
 
-TEST(Lookup, followsTargetsToTheirComponent)
+TEST(Lookup, FollowsTargetsToTheirComponent)
 {
     auto const mesh = twoTriangles();
     addRangeProperty("range", sFaceComp, {0, 1}, *mesh);
@@ -154,7 +154,7 @@ TEST(Lookup, followsTargetsToTheirComponent)
         EXPECT_EQ(getTargetComponent(*mesh, name.c_str()), component) << name;
 }
 
-TEST(Validators, nameTheFirstFailure)
+TEST(Validators, NameTheFirstFailure)
 {
     using Break = std::function<void(Object&)>;
     auto const data = [](auto values, char const* name, char const* target) -> Break {
@@ -198,7 +198,7 @@ TEST(Validators, nameTheFirstFailure)
     EXPECT_EQ(StrandValidator().validate(*strands).message(), "sStrandOffset[2] is 4, but the strand set has 5 points");
 }
 
-TEST(Validators, acceptUnusualButValidGeometry)
+TEST(Validators, AcceptUnusualButValidGeometry)
 {
     auto const odd = twoTriangles();
     addDataProperty<float>("too short", sPointComp, {1}, *odd);
@@ -220,7 +220,7 @@ TEST(Validators, acceptUnusualButValidGeometry)
         EXPECT_EQ(static_cast<bool>(isValid(*geometry)), accepted);
 }
 
-TEST(Validators, reportSuspiciousProperties)
+TEST(Validators, ReportSuspiciousProperties)
 {
     auto const mesh = twoTriangles();
     EXPECT_THAT(toStrings(reportProperties(*mesh)), IsEmpty());

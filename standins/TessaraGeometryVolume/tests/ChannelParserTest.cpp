@@ -24,7 +24,7 @@ std::string accepted(char const* list, std::vector<char const*> const& names)
 
 }
 
-TEST(ChannelParser, selectsNames)
+TEST(ChannelParser, SelectsNames)
 {
     std::vector<char const*> const names{"uv", "uv2", "UV", "weight", "weightTotal", "a-b", "gr\u00f6\u00dfe"};
     for (auto const& [list, expected] : std::map<std::string, std::string>{
@@ -40,7 +40,7 @@ TEST(ChannelParser, selectsNames)
     EXPECT_FALSE(ChannelParser().accepts(""));
 }
 
-TEST(ChannelParser, reportsTheFirstFaultAndKeepsTheOtherEntries)
+TEST(ChannelParser, ReportsTheFirstFaultAndKeepsTheOtherEntries)
 {
     struct Case {
         char const *list, *fault, *accepted;
@@ -61,7 +61,7 @@ TEST(ChannelParser, reportsTheFirstFaultAndKeepsTheOtherEntries)
     }
 }
 
-TEST(ChannelParser, matchesManyWildcardsWithoutBacktrackingExponentially)
+TEST(ChannelParser, MatchesManyWildcardsWithoutBacktrackingExponentially)
 {
     ChannelParser parser;
     parser.parses("*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*a*b"); // would run for years
@@ -69,7 +69,7 @@ TEST(ChannelParser, matchesManyWildcardsWithoutBacktrackingExponentially)
     EXPECT_TRUE(parser.accepts((std::string(5000, 'a') + "b").c_str()));
 }
 
-TEST(Canceller, countsCallsFromAllThreads)
+TEST(Canceller, CountsCallsFromAllThreads)
 {
     TSR::Canceller::resetCallCount();
     auto const call = [] {

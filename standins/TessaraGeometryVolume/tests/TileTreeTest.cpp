@@ -54,7 +54,7 @@ std::vector<Voxel> randomVoxels(std::size_t count, int reach, unsigned int seed)
 
 }
 
-TYPED_TEST(TileTree, holdsWhatItWasBuiltFromAndBackgroundElsewhere)
+TYPED_TEST(TileTree, HoldsWhatItWasBuiltFromAndBackgroundElsewhere)
 {
     std::vector<Voxel> voxels = randomVoxels(3000, 40, 1);
     for (int const far : {INT_MIN, INT_MIN + 3, -1'000'000'007, INT_MAX - 3, INT_MAX})
@@ -80,7 +80,7 @@ TYPED_TEST(TileTree, holdsWhatItWasBuiltFromAndBackgroundElsewhere)
         ASSERT_EQ(valueAt(volume, {std::get<0>(index), std::get<1>(index), std::get<2>(index)}), value);
 }
 
-TYPED_TEST(TileTree, linksTilesWithTheirParents)
+TYPED_TEST(TileTree, LinksTilesWithTheirParents)
 {
     auto const volume = volumeOf<TypeParam>(randomVoxels(500, 3000, 3), sourceOf<TypeParam>());
     std::size_t linked = 0;
@@ -107,7 +107,7 @@ TYPED_TEST(TileTree, linksTilesWithTheirParents)
     EXPECT_FALSE(cursor.tileImpl(0, 0, 0, TypeParam::kDeepest + 1).valid);
 }
 
-TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
+TYPED_TEST(TileTree, KeepsConstantRegionsCoarse)
 {
     // Two wide boxes touch, and neither ends at a tile's side.
     std::vector<ConstantBox> const boxes{{{-64, -64, -64}, {64, 64, 64}, 3},
@@ -142,7 +142,7 @@ TYPED_TEST(TileTree, keepsConstantRegionsCoarse)
     }
 }
 
-TYPED_TEST(TileTree, fineTilesInsideCoarseOnesKeepTheirValues)
+TYPED_TEST(TileTree, FineTilesInsideCoarseOnesKeepTheirValues)
 {
     for (int const variant : {0, 1, 2, 3}) {
         int const levels = 1 + variant % 2;
@@ -166,7 +166,7 @@ TYPED_TEST(TileTree, fineTilesInsideCoarseOnesKeepTheirValues)
     }
 }
 
-TYPED_TEST(TileTree, coarserTilesTakeTheValueOrTheMean)
+TYPED_TEST(TileTree, CoarserTilesTakeTheValueOrTheMean)
 {
     constexpr int kSide = TypeParam::kSide, kChildren = TypeParam::kChildrenPerAxis;
     int const end = 2 * kSide * kChildren;
@@ -191,7 +191,7 @@ TYPED_TEST(TileTree, coarserTilesTakeTheValueOrTheMean)
     }
 }
 
-TYPED_TEST(TileTree, halosContinueNeighborsThenParentsThenTheTile)
+TYPED_TEST(TileTree, HalosContinueNeighborsThenParentsThenTheTile)
 {
     constexpr int kSide = TypeParam::kSide;
     auto const isExact = [&](Volume<TypeParam> const& volume, int tileBegin, auto const& expected) {
@@ -231,7 +231,7 @@ TYPED_TEST(TileTree, halosContinueNeighborsThenParentsThenTheTile)
         [&](int i, int j, int k) { return i == kSide ? 77 : around(i, j, k); });
 }
 
-TYPED_TEST(TileTree, refusesDepthsAndVoxelsThatTheLayoutDoesNotHave)
+TYPED_TEST(TileTree, RefusesDepthsAndVoxelsThatTheLayoutDoesNotHave)
 {
     VolumeSource source = sourceOf<TypeParam>();
     source.depth = TypeParam::kUnitDepth - 1; // 32-bit indices have fewer voxels of this size

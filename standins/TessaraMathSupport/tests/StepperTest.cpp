@@ -30,7 +30,7 @@ template <class Logger> void stepThrough(Stepper stepper, Logger const& logger)
 
 }
 
-TEST(Stepper, splitsTheAmountAtTheLimit)
+TEST(Stepper, SplitsTheAmountAtTheLimit)
 {
     struct Case {
         float amount, limit;
@@ -55,7 +55,7 @@ TEST(Stepper, splitsTheAmountAtTheLimit)
         EXPECT_EQ(incrementsOf(2, noLimit), std::vector<float>{2}) << noLimit;
 }
 
-TEST(Stepper, endsForAnyRoundingOfTheRemainder)
+TEST(Stepper, EndsForAnyRoundingOfTheRemainder)
 {
     unsigned int maxCount = 0;
     for (float const ulps : {0.5f, 0.51f, 0.75f, 1.0f, 1.49f, 1.5f, 2.5f}) { // of amounts just below 2^24
@@ -68,7 +68,7 @@ TEST(Stepper, endsForAnyRoundingOfTheRemainder)
     EXPECT_LT(maxCount, 1u << 25);
 }
 
-TEST(Loggers, writeOneLinePerStep)
+TEST(Loggers, WriteOneLinePerStep)
 {
     std::string const expected = "step 1: 0.5, 0.75 remain\nstep 2: 0.5, 0.25 remain\nstep 3: 0.25, 0 remain\n";
     std::string lines;
@@ -87,7 +87,7 @@ TEST(Loggers, writeOneLinePerStep)
     EXPECT_EQ(lines, expected + "step 4294967295: -1.1754945e-38, -1.1754945e-38 remain\n");
 }
 
-TEST(Loggers, recoverFromASinkThatThrows)
+TEST(Loggers, RecoverFromASinkThatThrows)
 {
     CoreGL::OrvanLogger::setSink([](char const*) { throw std::runtime_error("full"); });
     Stepper stepper(1.0f, 0.75f);
@@ -96,7 +96,7 @@ TEST(Loggers, recoverFromASinkThatThrows)
     CoreGL::OrvanLogger::setSink(nullptr);
 }
 
-TEST(Loggers, shareTheSinkBetweenThreads)
+TEST(Loggers, ShareTheSinkBetweenThreads)
 {
     int lineCount = 0; // not atomic: sink calls are serialized
     std::vector<std::thread> threads;

@@ -30,7 +30,7 @@ Ptr<Object> objectOf(std::vector<std::pair<String, PropertyValue>> properties)
 }
 
 // Compares with a plain list, for key counts below and above the one at which lookups start to hash.
-TEST(Object, behavesLikeAListInInsertionOrder)
+TEST(Object, BehavesLikeAListInInsertionOrder)
 {
     TestSupport::Random random(5);
     for (unsigned int const keyCount : {3u, 6u, 9u, 12u, 40u, 300u, 1500u}) {
@@ -62,7 +62,7 @@ TEST(Object, behavesLikeAListInInsertionOrder)
     }
 }
 
-TEST(Object, clonesShallowly)
+TEST(Object, ClonesShallowly)
 {
     Ptr<Array<int>> const array = Orvan::makePtr<Array<int>>(2u);
     Ptr<Object> original = objectOf({{"array", array}, {"number", 1}});
@@ -77,7 +77,7 @@ TEST(Object, clonesShallowly)
     EXPECT_EQ(Orvan::Internal::getDefaultClass<Object>()->keys()->size, 0u);
 }
 
-TEST(Object, conformsToPrototypesByContent)
+TEST(Object, ConformsToPrototypesByContent)
 {
     auto const excluding = [](Array<String> keys) {
         return PropertyValue(Orvan::makePtr<Array<String>>(std::move(keys)));
@@ -112,7 +112,7 @@ TEST(Object, conformsToPrototypesByContent)
         EXPECT_EQ(Object::isA(*object, *prototype), conforms) << name;
 }
 
-TEST(Object, isUnchangedWhenAnAllocationFails)
+TEST(Object, IsUnchangedWhenAnAllocationFails)
 {
     for (std::size_t const keyCount : {1u, 8u, 15u, 16u, 32u}) // just before a table grows, and in between
         TestSupport::sweepFailingAllocations([&](TestSupport::Attempt const& attempt) {

@@ -37,14 +37,14 @@ static_assert(std::is_nothrow_move_constructible_v<PropertyValue> && std::is_not
 
 }
 
-TEST(PropertyValue, distinguishesTypesExactly)
+TEST(PropertyValue, DistinguishesTypesExactly)
 {
     expectExactTypes(std::type_identity<StoredTypes>());
     EXPECT_TRUE(PropertyValue().empty() && PropertyValue().type() == typeid(void));
     EXPECT_FALSE(PropertyValue(Ptr<Array<int>>()).empty()) << "a null Ptr is a value";
 }
 
-TEST(PropertyValue, copiesReferencesNotArrays)
+TEST(PropertyValue, CopiesReferencesNotArrays)
 {
     Ptr<Array<int>> const array = Orvan::makePtr<Array<int>>(3u);
     PropertyValue value = array;
@@ -61,7 +61,7 @@ TEST(PropertyValue, copiesReferencesNotArrays)
     EXPECT_EQ(array.useCount(), 3u);
 }
 
-TEST(PropertyValue, ownsLargeValues)
+TEST(PropertyValue, OwnsLargeValues)
 {
     auto const watched = std::make_shared<int>(0);
     {

@@ -33,7 +33,7 @@ Answer query(float2 const& p, float2 const& a, float2 const& b, float2 const& c)
 
 }
 
-TEST(PointEdgeOrientation, findsTheTurn)
+TEST(PointEdgeOrientation, FindsTheTurn)
 {
     struct Case {
         char const* name;
@@ -66,7 +66,7 @@ TEST(PointEdgeOrientation, findsTheTurn)
     }
 }
 
-TEST(PointInTriangle, includesEdgesButNotCorners)
+TEST(PointInTriangle, IncludesEdgesButNotCorners)
 {
     float2 const a{0, 0}, b{4, 0}, c{0, 4};
     for (auto const& [p, expected] : std::vector<std::pair<float2, Answer>>{
@@ -93,7 +93,7 @@ TEST(PointInTriangle, includesEdgesButNotCorners)
     }
 }
 
-TEST(PointInTriangle, findsNothingInTrianglesWithoutArea)
+TEST(PointInTriangle, FindsNothingInTrianglesWithoutArea)
 {
     using Triangle = std::array<float2, 3>;
     for (auto const& [a, b, c] :
@@ -110,7 +110,7 @@ TEST(PointInTriangle, findsNothingInTrianglesWithoutArea)
 }
 
 // Each point near the shared edge of two triangles is in at least one of them, even if areas are rounded.
-TEST(PointInTriangle, leavesNoGapAtASharedEdge)
+TEST(PointInTriangle, LeavesNoGapAtASharedEdge)
 {
     Random random(2);
     auto const between0And1 = [&] { return std::abs(random.coordinate()); };

@@ -2,7 +2,7 @@
 
 #include "GeometryFile.h"
 
-#include "support/TemporaryFolder.h"
+#include "program/TemporaryFolder.h"
 #include "support/Testing.h"
 
 #include <TessaraGeometry/Validators.h>
