@@ -566,6 +566,22 @@ TEST_F(Commands, FilesAreReplacedOnlyWithForce)
         EXPECT_FALSE(entry.path().filename().string().starts_with(".")) << entry;
 }
 
+TEST_F(Commands, Hdf5FilesHoldSeveralObjects)
+{
+    copySamples({"cube.ply", "cylinder.obj"});
+    constexpr bool kKeeps = false;
+    EXPECT_EQ(run("merge cube.ply -o scan.h5#cube", "stdout", kKeeps).exitCode, 0);
+    EXPECT_EQ(run("merge cylinder.obj -o scan.h5#round", "stdout", kKeeps).exitCode, 3);
+    EXPECT_EQ(run("merge cylinder.obj -o scan.h5#round --compress 6").exitCode, 0);
+    EXPECT_THAT(run("info scan.h5").messages, HasSubstr("scan.h5, /: there are 2 objects: cube, round"));
+    EXPECT_EQ(run("merge scan.h5#round -o a.ply").exitCode, 0);
+    EXPECT_EQ(run("merge cylinder.obj -o b.ply").exitCode, 0);
+    EXPECT_TRUE(areEqual("a.ply", "b.ply"));
+    EXPECT_EQ(run("merge cube.ply -o a.ply --compress 1").exitCode, 2);
+    EXPECT_EQ(runShell("ulimit -f 2; '" MODELING_PROGRAM "' smooth cylinder.obj large.h5 2>stderr"), 3 << 8);
+    EXPECT_THAT(contentOf(folder / "stderr"), HasSubstr("modeling: large.h5 cannot be written: File too large\n"));
+}
+
 TEST_F(Commands, EmptyGeometryIsAccepted)
 {
     copySamples({"cube.ply", "stitch-quad.obj", "stitch-quad-rings.obj"});
