@@ -16,7 +16,7 @@ namespace {
 
     static_assert(std::endian::native == std::endian::little, "numbers are written with the byte order of memory");
 
-    using Json = nlohmann::ordered_json;
+    using OrderedJson = nlohmann::ordered_json;
     using Indices = Orvan::Array<unsigned int>;
 
     enum : int { kArrayBuffer = 34962, kElementArrayBuffer = 34963 }; // what a buffer view is for
@@ -72,7 +72,7 @@ namespace {
 
     /// Vertices of the file. The first ones are the points in their order; if attributes of corners differ at a point,
     /// further vertices at the same position follow.
-    struct Vertices {
+    struct GlbVertices {
         Indices ofCorners; // one entry per corner; null if the corners have the vertices of their points
         Indices points; // of the vertices beyond the first of each point
         Indices corners; // one entry per vertex: a corner that has its values, or kInvalidIndex; empty without splits
@@ -92,7 +92,7 @@ namespace {
             chooseAttributes();
             splitPoints();
             declare();
-            std::string json = root_.dump(-1, ' ', false, Json::error_handler_t::replace);
+            std::string json = root_.dump(-1, ' ', false, OrderedJson::error_handler_t::replace);
             json.resize((json.size() + 3) / 4 * 4, ' ');
             std::uint64_t const total = 12 + 8 + json.size() + (binaryBytes_ == 0 ? 0 : 8 + binaryBytes_);
             if (total > std::numeric_limits<std::uint32_t>::max())
@@ -396,7 +396,7 @@ namespace {
                 root_["asset"]["extras"] = {{"remark", geometry_.remark}};
             if (geometry_.pointCount() == 0)
                 return; // arrays without elements are not allowed
-            Json primitive = {{"attributes", {{"POSITION", declarePositions()}}}};
+            OrderedJson primitive = {{"attributes", {{"POSITION", declarePositions()}}}};
             for (VertexAttribute const& attribute : attributes_)
                 primitive["attributes"][attribute.semantic] = declareAttribute(attribute);
             primitive["mode"] = kPoints;
@@ -405,14 +405,15 @@ namespace {
             else if (geometry_.kind == WritableGeometry::Kind::Strands)
                 declareLines(primitive);
             root_["scene"] = 0;
-            root_["scenes"][0]["nodes"] = Json::array({0u});
+            root_["scenes"][0]["nodes"] = OrderedJson::array({0u});
             root_["nodes"][0]["mesh"] = 0;
             root_["meshes"][0]["primitives"][0] = std::move(primitive);
             root_["buffers"][0]["byteLength"] = binaryBytes_;
         }
 
         /// \return the number of the accessor
-        std::size_t declareArray(Json accessor, Json view, std::uint64_t bytes, std::function<void(OutputFile&)> write)
+        std::size_t declareArray(
+            OrderedJson accessor, OrderedJson view, std::uint64_t bytes, std::function<void(OutputFile&)> write)
         {
             view["byteOffset"] = binaryBytes_;
             view["byteLength"] = bytes;
@@ -450,12 +451,12 @@ namespace {
             std::string const type = attribute.components == 1 ? "SCALAR"
                 : attribute.isMatrix                           ? (attribute.components == 9 ? "MAT3" : "MAT4")
                                                                : "VEC" + std::to_string(attribute.components);
-            Json accessor = {{"componentType", attribute.scalar}, {"count", vertexCount()}, {"type", type}};
+            OrderedJson accessor = {{"componentType", attribute.scalar}, {"count", vertexCount()}, {"type", type}};
             if (attribute.isNormalized)
                 accessor["normalized"] = true;
             std::size_t const valueBytes =
                 attribute.components * visitGltfScalar(attribute.scalar, [](auto number) { return sizeof(number); });
-            Json view = {{"buffer", 0}, {"target", kArrayBuffer}};
+            OrderedJson view = {{"buffer", 0}, {"target", kArrayBuffer}};
             if (attribute.stride != valueBytes)
                 view["byteStride"] = attribute.stride;
             return declareArray(std::move(accessor), std::move(view), vertexCount() * attribute.stride,
@@ -472,7 +473,7 @@ namespace {
                 });
         }
 
-        void declareTriangles(Json& primitive)
+        void declareTriangles(OrderedJson& primitive)
         {
             primitive["mode"] = kTriangles;
             Indices const& corners = vertices_.ofCorners.empty() ? *geometry_.faceVertex : vertices_.ofCorners;
@@ -483,7 +484,7 @@ namespace {
         }
 
         /// A segment per pair of neighboring points: a strip per strand would need a primitive for each.
-        void declareLines(Json& primitive)
+        void declareLines(OrderedJson& primitive)
         {
             Indices const& offset = *geometry_.offsets;
             std::uint64_t segmentCount = 0, shortCount = 0;
@@ -509,7 +510,8 @@ namespace {
         }
 
         /// \param forEach  Calls its parameter with each index.
-        template <class ForEach> void declareIndices(Json& primitive, std::uint64_t count, ForEach const& forEach)
+        template <class ForEach>
+        void declareIndices(OrderedJson& primitive, std::uint64_t count, ForEach const& forEach)
         {
             bool const isShort = vertexCount() <= std::numeric_limits<std::uint16_t>::max(); // the highest is reserved
             primitive["indices"] = declareArray(
@@ -530,8 +532,8 @@ namespace {
         std::filesystem::path const& file_;
         std::vector<VertexAttribute> attributes_;
         std::set<std::string> semantics_{"POSITION"};
-        Vertices vertices_;
-        Json root_;
+        GlbVertices vertices_;
+        OrderedJson root_;
         std::vector<std::function<void(OutputFile&)>> blocks_; // of the binary chunk
         std::uint64_t binaryBytes_ = 0;
     };

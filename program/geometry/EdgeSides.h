@@ -3,6 +3,7 @@
 #include "MeshArrays.h"
 
 #include "frame/PointCorners.h"
+#include "frame/grains.h"
 
 #include <algorithm>
 #include <span>

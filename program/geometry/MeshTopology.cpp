@@ -19,14 +19,12 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr unsigned int kGrain = 1000;
-
     /// Calls `find(element, partial result)` for all elements in parallel, and adds up the partial results. Sums of counts
     /// and lowest elements do not depend on the order.
     template <class Result, class Find> Result findInAll(unsigned int count, Find const& find)
     {
         return tbb::parallel_reduce(
-            tbb::blocked_range<unsigned int>(0, count, kGrain), Result{},
+            tbb::blocked_range<unsigned int>(0, count, Modeling::kElementGrain), Result{},
             [&](auto const& elements, Result result) {
                 for (unsigned int element = elements.begin(); element != elements.end(); ++element)
                     find(element, result);

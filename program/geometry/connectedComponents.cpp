@@ -13,8 +13,6 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr unsigned int kGrain = 1000;
-
     /// Disjoint sets of indices (union-find without locks); initially each index is its own set. All threads may join
     /// sets at the same time. The lowest index of a set represents it, whatever the order of the joins.
     class DisjointSets {
@@ -56,10 +54,11 @@ namespace {
         template <class Visit> void forEachIndex(Visit const& visit)
         {
             auto const count = static_cast<unsigned int>(parents_.size());
-            tbb::parallel_for(tbb::blocked_range<unsigned int>(0, count, kGrain), [&](auto const& indices) {
-                for (unsigned int index = indices.begin(); index != indices.end(); ++index)
-                    visit(index);
-            });
+            tbb::parallel_for(
+                tbb::blocked_range<unsigned int>(0, count, Modeling::kElementGrain), [&](auto const& indices) {
+                    for (unsigned int index = indices.begin(); index != indices.end(); ++index)
+                        visit(index);
+                });
         }
 
         /// The representative of most of a sample of the indices: that of the largest set, if one is large.
@@ -107,7 +106,7 @@ std::uint64_t countConnectedComponents(MeshArrays const& mesh, EdgeSides const& 
                 joinFace(point, corner);
     });
     return tbb::parallel_reduce(
-        tbb::blocked_range<unsigned int>(0, mesh.pointCount(), kGrain), std::uint64_t{0},
+        tbb::blocked_range<unsigned int>(0, mesh.pointCount(), Modeling::kElementGrain), std::uint64_t{0},
         [&](auto const& points, std::uint64_t count) {
             for (unsigned int point = points.begin(); point != points.end(); ++point)
                 count += !edges.cornersAt(point).empty() && sets.find(point) == point ? 1u : 0u;

@@ -15,7 +15,7 @@
 using namespace Tessara::GeometryAlgorithms;
 using namespace TestSupport;
 using PlainMerge::Inputs, PlainMerge::Kind;
-using Indices = std::vector<unsigned int>;
+using IndexList = std::vector<unsigned int>;
 using IndexArray = Orvan::Array<unsigned int>;
 
 namespace {
@@ -131,16 +131,16 @@ TEST(Merge, GivesResultsWorkedOutByHand)
     Orvan::Ptr<Object> const triangle = makeMesh({{0, 0, 0}, {1, 0, 0}, {0, 1, 0}}, {0, 1, 2}, {0, 3});
     auto const mesh = merged(
         Kind::Meshes, inputsOf(triangle, makeMesh({{5, 5, 5}}, {}, {0}), cloudOf(2), nullptr, deepCopy(*triangle)));
-    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceVertex), (Indices{0, 1, 2, 4, 5, 6}));
-    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, 3, 6}));
+    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceVertex), (IndexList{0, 1, 2, 4, 5, 6}));
+    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceOffset), (IndexList{0, 3, 6}));
     EXPECT_EQ(dataOf<unsigned int>(*mesh, sFaceOffset)->capacity, 3u) << "allocated with its closing entry";
 
     // Points before the first strand belong to no strand, and a result can be merged again.
     auto const strands =
         merged(Kind::Strands, inputsOf(makeStrands({{}, {}}, {0}), makeStrands(Orvan::Array<float3>(6), {0, 2, 6})));
-    EXPECT_EQ(valuesOf<unsigned int>(*strands, sStrandOffset), (Indices{2, 4, 8}));
+    EXPECT_EQ(valuesOf<unsigned int>(*strands, sStrandOffset), (IndexList{2, 4, 8}));
     auto const twice = merged(Kind::Strands, inputsOf(deepCopy(*strands), deepCopy(*strands)));
-    EXPECT_EQ(valuesOf<unsigned int>(*twice, sStrandOffset), (Indices{2, 4, 10, 12, 16}));
+    EXPECT_EQ(valuesOf<unsigned int>(*twice, sStrandOffset), (IndexList{2, 4, 10, 12, 16}));
 }
 
 TEST(Merge, RefusesWithoutChangingTheOutput)
@@ -193,7 +193,7 @@ TEST(Merge, RebasesAnArrayThatHasReplacedTheConnectivity)
     EXPECT_FALSE(finishConnectivity(connectivity, regions, *output)) << "nothing was merged";
     connectivity.merged = Orvan::makePtr<Orvan::Array<unsigned int>>();
     EXPECT_TRUE(finishConnectivity(connectivity, regions, *output));
-    EXPECT_EQ(valuesOf<unsigned int>(*output, "other"), (Indices{1, 2, 13, 104, 1100}));
+    EXPECT_EQ(valuesOf<unsigned int>(*output, "other"), (IndexList{1, 2, 13, 104, 1100}));
     addDataProperty<int>("other", sPointComp, {1, 2, 3, 4}, *output);
     EXPECT_FALSE(finishConnectivity(connectivity, regions, *output));
 
@@ -202,7 +202,7 @@ TEST(Merge, RebasesAnArrayThatHasReplacedTheConnectivity)
     addDataProperty<unsigned int>("other", sPointComp, {1, 2}, *with, 7u);
     Offsets const points{0, 2, 4};
     mergeGeoComponent(planMerge({with.get(), without.get()}, {sPointComp}), sPointComp, points, &connectivity, *target);
-    EXPECT_EQ(valuesOf<unsigned int>(*target, "other"), (Indices{1, 2, 17, 17, 1000}));
+    EXPECT_EQ(valuesOf<unsigned int>(*target, "other"), (IndexList{1, 2, 17, 17, 1000}));
 }
 
 TEST(Merge, IsCompleteOrRefusedIfAnEnclosingGroupIsCancelled)

@@ -29,7 +29,7 @@ template <class Traits> Volume<Traits> volumeOf(float atCenter, float perUnit, f
     return buildVolume<Traits>({.background = background, .depth = Traits::kUnitDepth, .block = field.block()});
 }
 
-template <class Traits> LinearSampler<Traits> samplerOf(Volume<Traits> const& volume, float scale = kScale)
+template <class Traits> LinearSampler<Traits> guideOf(Volume<Traits> const& volume, float scale = kScale)
 {
     return {
         volume.container, volume.channel, volume.topology, {.scale = scale, .background = volume.background}, nullptr};
@@ -55,7 +55,7 @@ TYPED_TEST(SubdivideByVolume, EqualsSubdivideIfTheVolumeIsConstant)
     for (auto const& builder : {MeshBuilder::sphere(6).withNoise(0.05f, 3).shuffled(4), MeshBuilder::torus(9, 7)}) {
         auto const volume = volumeOf<TypeParam>(0.3f, 0, 0.3f);
         auto const guided = builder.build(), plain = builder.build();
-        EXPECT_TRUE(subdivide(samplerOf(volume), *guided, 0.17f));
+        EXPECT_TRUE(subdivide(guideOf(volume), *guided, 0.17f));
         EXPECT_TRUE(subdivide(0.3f * 0.17f, *plain));
         EXPECT_GT(countsOf(*guided).faces, countsOf(*builder.build()).faces);
         EXPECT_TRUE(sameContents(*guided, *plain));
@@ -65,7 +65,7 @@ TYPED_TEST(SubdivideByVolume, EqualsSubdivideIfTheVolumeIsConstant)
 TYPED_TEST(SubdivideByVolume, MarksByTheSecondCornerForAnyNumberOfThreads)
 {
     auto const volume = volumeOf<TypeParam>(0.6f, 0.5f, 1);
-    auto const sampler = samplerOf(volume);
+    auto const sampler = guideOf(volume);
     auto const mesh = MeshBuilder::sphere(40).withNoise(0.02f, 1).shuffled(2);
     float const tolerance = 0.04f;
     std::vector<bool> expected;
@@ -94,20 +94,20 @@ TYPED_TEST(SubdivideByVolume, LeavesFacesAloneWithoutAPositiveTolerance)
     std::vector<bool> const none(sphere.faces.size(), false), all(sphere.faces.size(), true);
     for (float const value : {0.0f, -2.0f, kNan, 1e-7f}) {
         auto const volume = volumeOf<TypeParam>(value, 0, value);
-        EXPECT_EQ(marksOf(samplerOf(volume), *mesh, 1), none) << value;
-        EXPECT_EQ(marksOf(samplerOf(volume), *mesh, 1, all), all) << "no mark is cleared";
+        EXPECT_EQ(marksOf(guideOf(volume), *mesh, 1), none) << value;
+        EXPECT_EQ(marksOf(guideOf(volume), *mesh, 1, all), all) << "no mark is cleared";
     }
     auto const positive = volumeOf<TypeParam>(0.01f, 0, 0.01f), empty = volumeOf<TypeParam>(1, 0, 0);
-    EXPECT_EQ(marksOf(samplerOf(positive), *mesh, 1), all);
-    EXPECT_EQ(marksOf(samplerOf(positive), *mesh, -1), none);
+    EXPECT_EQ(marksOf(guideOf(positive), *mesh, 1), all);
+    EXPECT_EQ(marksOf(guideOf(positive), *mesh, -1), none);
     auto far = sphere;
     for (float3& point : far.points)
         point.x += 50;
-    EXPECT_EQ(marksOf(samplerOf(empty), *far.build(), 1), none) << "background";
+    EXPECT_EQ(marksOf(guideOf(empty), *far.build(), 1), none) << "background";
     far.points[sphere.faces[5][1]].y = kNan;
-    EXPECT_EQ(marksOf(samplerOf(positive), *far.build(), 1)[5], true)
+    EXPECT_EQ(marksOf(guideOf(positive), *far.build(), 1)[5], true)
         << "its other corners are far apart, and the background applies";
-    EXPECT_EQ(marksOf(samplerOf(positive), *MeshBuilder::of({}, {}).build(), 1), std::vector<bool>());
+    EXPECT_EQ(marksOf(guideOf(positive), *MeshBuilder::of({}, {}).build(), 1), std::vector<bool>());
     auto wide = sphere;
     wide.points[sphere.faces[5][1]].x = 2e38f; // the sum of three is infinite, so the mean is too
     LinearSampler<TypeParam> const tiny(
@@ -115,6 +115,6 @@ TYPED_TEST(SubdivideByVolume, LeavesFacesAloneWithoutAPositiveTolerance)
     EXPECT_EQ(marksOf(tiny, *wide.build(), 1)[5], false);
 
     auto const open = MeshBuilder::sphere(3).withoutFace(4).build(), before = deepCopy(*open);
-    EXPECT_FALSE(subdivide(samplerOf(positive), *open, 1));
+    EXPECT_FALSE(subdivide(guideOf(positive), *open, 1));
     EXPECT_TRUE(sameContents(*open, *before));
 }

@@ -7,7 +7,7 @@ using Geometry::Mesh::triangulate;
 
 namespace {
 
-using Indices = std::vector<unsigned int>;
+using IndexList = std::vector<unsigned int>;
 
 /// A quad (cut from corner 1 to 3), a face of two corners, and a triangle.
 Orvan::MutablePtr<Object> quadTwoCornersTriangle()
@@ -33,8 +33,8 @@ TEST(Triangulate, GivesTrianglesTheValuesOfTheirFacesAndCorners)
     Object const other = *mesh;
     triangulate("*", *mesh);
 
-    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceVertex), (Indices{3, 0, 1, 3, 1, 2, 0, 1, 2}));
-    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceOffset), (Indices{0, 3, 6, 9}));
+    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceVertex), (IndexList{3, 0, 1, 3, 1, 2, 0, 1, 2}));
+    EXPECT_EQ(valuesOf<unsigned int>(*mesh, sFaceOffset), (IndexList{0, 3, 6, 9}));
     EXPECT_EQ(countsOf(*mesh), (Counts{4, 9, 3}));
     EXPECT_EQ(valuesOf<Orvan::String>(*mesh, "name"), (std::vector<Orvan::String>{"quad", "quad", "triangle"}));
     EXPECT_EQ(valuesOf<int>(*mesh, "short"), (std::vector<int>{7, 7, 0}));
@@ -43,10 +43,10 @@ TEST(Triangulate, GivesTrianglesTheValuesOfTheirFacesAndCorners)
     EXPECT_EQ(dataOf<Common::GeoLocation>(*mesh, "location"), dataOf<Common::GeoLocation>(other, "location"))
         << "not a core type: is kept as it is";
     auto const material = getRangeGeoPropIndices(*mesh, "material");
-    EXPECT_EQ(Indices(material->begin(), material->end()), (Indices{2, 2, 1}));
+    EXPECT_EQ(IndexList(material->begin(), material->end()), (IndexList{2, 2, 1}));
     EXPECT_EQ(dataOf<int>(*mesh, "color"), dataOf<int>(other, "color"));
     auto const seam = getRangeGeoPropIndices(*mesh, "seam");
-    EXPECT_EQ(Indices(seam->begin(), seam->end()), (Indices{5, 8, 7, 5, 7, 6, 2, 1, 0}));
+    EXPECT_EQ(IndexList(seam->begin(), seam->end()), (IndexList{5, 8, 7, 5, 7, 6, 2, 1, 0}));
 }
 
 TEST(Triangulate, RemovesPropertiesThatTheChannelsExcludeAndTheirDependents)
@@ -78,14 +78,14 @@ TEST(Triangulate, AcceptsOddMeshesAndLeavesIncompleteOnesUnchanged)
     auto const empty = makeMesh({}, {}, {});
     addDataProperty<int>("id", sFaceComp, {}, *empty);
     triangulate("*", *empty);
-    EXPECT_EQ(valuesOf<unsigned int>(*empty, sFaceOffset), Indices{0});
+    EXPECT_EQ(valuesOf<unsigned int>(*empty, sFaceOffset), IndexList{0});
     EXPECT_EQ(countsOf(*empty), (Counts{0, 0, 0}));
     EXPECT_TRUE(dataOf<int>(*empty, "id"));
 
     // Faces without corners or with one, and offsets that decrease or exceed the corners: no triangles.
     auto const odd = makeMesh(points, {0, 1, 2, 0}, {0, 0, 1, 4, 2, 4000000000u, 0, 3});
     triangulate("*", *odd);
-    EXPECT_EQ(valuesOf<unsigned int>(*odd, sFaceVertex), (Indices{1, 2, 0, 0, 1, 2}));
+    EXPECT_EQ(valuesOf<unsigned int>(*odd, sFaceVertex), (IndexList{1, 2, 0, 0, 1, 2}));
 
     std::function<void(Object&)> const edits[] = {
         [](Object& mesh) { mesh.eraseProperty(sFaceVertex); },

@@ -7,7 +7,7 @@ namespace {
     using testing::AllOf, testing::Contains, testing::ElementsAre, testing::HasSubstr, testing::IsEmpty, testing::Not;
     using Indices = std::vector<unsigned int>;
     using Notes = std::vector<std::string>;
-    using Object = Orvan::MutablePtr<Tessara::Object>;
+    using OwnedObject = Orvan::MutablePtr<Tessara::Object>;
 
     template <class... T> std::string bytes(T... numbers)
     {
@@ -304,20 +304,20 @@ namespace {
             EXPECT_THAT(refusalOf(".glb", content), HasSubstr(words));
     }
 
-    struct Written {
+    struct WrittenGlb {
         std::string content;
         Notes notes;
         GeometryFile again;
     };
 
-    Written written(Tessara::Object const& object)
+    WrittenGlb writtenGlb(Tessara::Object const& object)
     {
         TemporaryFolder const folder;
         Notes notes = writeGeometryFile(object, folder / "a.glb", {.remark = "center \"1\""});
         return {contentOf(folder / "a.glb"), std::move(notes), readGeometryFile(folder / "a.glb")};
     }
 
-    Object twoTriangles()
+    OwnedObject twoTriangles()
     {
         return makeMesh(
             {{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {-0.1f, 1, 1e-20f}, {5, 5, 123456.789f}}, {0, 1, 2, 0, 2, 3}, {0, 3, 6});
@@ -325,7 +325,7 @@ namespace {
 
     TEST(WriteGltf, preservesGeometryAndAttributesOfPointsBitwise)
     {
-        Object const mesh = twoTriangles();
+        OwnedObject const mesh = twoTriangles();
         addDataProperty<float3>("normal", sPointComp, Orvan::Array<float3>(5, {0, 0.6f, 0.8f}), *mesh);
         addDataProperty<uchar3>("color", sPointComp, {{1, 2, 3}, {4, 5, 6}, {7, 8, 9}, {0, 0, 0}, {255, 0, 1}}, *mesh);
         addDataProperty<float4>("color1", sPointComp, Orvan::Array<float4>(5, {0.1f, 1, 0, 0.5f}), *mesh);
@@ -334,7 +334,7 @@ namespace {
         addDataProperty<short>("level", sPointComp, {1, -2, 3, -32768, 32767}, *mesh);
         addDataProperty<float3x3>(
             "axes", sPointComp, Orvan::Array<float3x3>(5, {{{1, 2, 3}, {4, 5, 6}, {7, 8, 9}}}), *mesh);
-        Written const file = written(*mesh);
+        WrittenGlb const file = writtenGlb(*mesh);
         EXPECT_THAT(file.notes, IsEmpty());
         EXPECT_THAT(file.again.notes, IsEmpty());
         EXPECT_THAT(file.content,
@@ -343,22 +343,22 @@ namespace {
                 HasSubstr(R"("remark":"center \"1\"")")));
         EXPECT_TRUE(sameContents(*sorted(*file.again.object), *sorted(*mesh)));
 
-        Object const strands = makeStrands({{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {5, 5, 5}, {6, 5, 5}}, {0, 3, 5});
-        EXPECT_TRUE(sameContents(*written(*strands).again.object, *strands));
-        Object const cloud = makePointCloud({{0, 0, 0}, {1, 2, 3}, {0, 0, 0}});
-        EXPECT_TRUE(sameContents(*written(*cloud).again.object, *cloud));
-        EXPECT_TRUE(sameContents(*written(*makePointCloud({})).again.object, *makePointCloud({})));
-        Object const large = makePointCloud(Orvan::Array<float3>(70'000));
-        EXPECT_TRUE(sameContents(*written(*large).again.object, *large));
+        OwnedObject const strands = makeStrands({{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {5, 5, 5}, {6, 5, 5}}, {0, 3, 5});
+        EXPECT_TRUE(sameContents(*writtenGlb(*strands).again.object, *strands));
+        OwnedObject const cloud = makePointCloud({{0, 0, 0}, {1, 2, 3}, {0, 0, 0}});
+        EXPECT_TRUE(sameContents(*writtenGlb(*cloud).again.object, *cloud));
+        EXPECT_TRUE(sameContents(*writtenGlb(*makePointCloud({})).again.object, *makePointCloud({})));
+        OwnedObject const large = makePointCloud(Orvan::Array<float3>(70'000));
+        EXPECT_TRUE(sameContents(*writtenGlb(*large).again.object, *large));
     }
 
     TEST(WriteGltf, splitsPointsWhoseCornersDiffer)
     {
-        Object const mesh = twoTriangles();
+        OwnedObject const mesh = twoTriangles();
         addDataProperty<float2>("uv", sFaceVertexComp, {{0, 0}, {1, 0}, {1, 1}, {0.5f, 0}, {1, 1}, {0, 1}}, *mesh);
         addDataProperty<short>("part", sFaceVertexComp, {1, 1, 1, 2, 2, 2}, *mesh);
         addDataProperty<float>("heat", sPointComp, {1, 2, 3, 4, 5}, *mesh);
-        Written const file = written(*mesh);
+        WrittenGlb const file = writtenGlb(*mesh);
         EXPECT_THAT(file.notes, ElementsAre(HasSubstr("2 vertices are added")));
         EXPECT_THAT(file.again.notes, ElementsAre(HasSubstr("2 vertices become one point")));
         EXPECT_TRUE(sameContents(*sorted(*file.again.object), *sorted(*mesh)));
@@ -366,7 +366,7 @@ namespace {
 
     TEST(WriteGltf, tellsWhatItConvertsAndLeavesOut)
     {
-        Object const mesh = twoTriangles();
+        OwnedObject const mesh = twoTriangles();
         addDataProperty<int>("count", sPointComp, {1, 2, 3, 4, -16777216}, *mesh);
         addDataProperty<int>("id", sPointComp, {1, 2, 3, 4, 16777217}, *mesh);
         addDataProperty<bool>("chosen", sPointComp, {true, false, true, true, false}, *mesh);
@@ -377,7 +377,7 @@ namespace {
         addDataProperty<float2>("uv1", sPointComp, Orvan::Array<float2>(5), *mesh);
         addDataProperty<float2x2>("square", sPointComp, Orvan::Array<float2x2>(5), *mesh);
         addDataProperty<int>("part", sFaceComp, {1, 2}, *mesh);
-        Written const file = written(*mesh);
+        WrittenGlb const file = writtenGlb(*mesh);
         EXPECT_THAT(file.notes,
             ElementsAre(HasSubstr("\"count\" is written as floats: GLB files have no int"),
                 HasSubstr("\"id\" (int, points) is left out"), HasSubstr("\"chosen\" is written as bytes"),

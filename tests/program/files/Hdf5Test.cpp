@@ -128,7 +128,7 @@ namespace {
     }
 
     /// What is said of a file, after its name.
-    std::string refusalOf(std::filesystem::path const& file, ReadOptions const& options = {})
+    std::string refusalOfFile(std::filesystem::path const& file, ReadOptions const& options = {})
     {
         try {
             readGeometryFile(file, options);
@@ -154,8 +154,8 @@ namespace {
         EXPECT_EQ(objects[0].remark, "moved");
         EXPECT_TRUE(sameContents(*objects[0].object, *cloud));
         EXPECT_TRUE(sameContents(*objects[1].object, *cloud));
-        EXPECT_THAT(refusalOf(folder / "a.h5"), testing::HasSubstr("2 objects: left, right arm.obj"));
-        EXPECT_THAT(refusalOf(folder / "a.h5#up"), testing::HasSubstr("no object \"up\""));
+        EXPECT_THAT(refusalOfFile(folder / "a.h5"), testing::HasSubstr("2 objects: left, right arm.obj"));
+        EXPECT_THAT(refusalOfFile(folder / "a.h5#up"), testing::HasSubstr("no object \"up\""));
         EXPECT_THROW(writeGeometryFile(*mesh, folder / "a.h5#up", {.existing = Existing::Keep}), FileError);
         EXPECT_THROW(writeGeometryFile(*mesh, folder / "b.h5#50%"), FileError);
         writeGeometryFile(*mesh, folder / "a.h5");
@@ -170,7 +170,7 @@ namespace {
         };
         // The first point belongs to no strand.
         store(makeStrands({{9, 9, 9}, {kNan, 0, 0}, {1, 0, 0}, {2, 0, 0}, {4, 0, 0}}, {1, 3, 5}));
-        EXPECT_THAT(refusalOf(folder / "a.h5"),
+        EXPECT_THAT(refusalOfFile(folder / "a.h5"),
             testing::StartsWith(", /object/sPointPosition/sData: a coordinate of element 1 "));
         GeometryFile const strands = readGeometryFile(folder / "a.h5", {.isLenient = true, .origin = double3{1, 0, 0}});
         EXPECT_TRUE(isValid(*strands.object));
@@ -178,7 +178,7 @@ namespace {
             *dataOf<float3>(*strands.object, sPointPosition), (Orvan::Array<float3>{{8, 9, 9}, {1, 0, 0}, {3, 0, 0}}));
         EXPECT_EQ(*dataOf<unsigned int>(*strands.object, sStrandOffset), (Orvan::Array<unsigned int>{1, 3}));
         store(makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}}, {0, 1, 0, 1, 2}, {0, 2, 5}));
-        EXPECT_THAT(refusalOf(folder / "a.h5"), testing::HasSubstr("face 0 has fewer than three corners"));
+        EXPECT_THAT(refusalOfFile(folder / "a.h5"), testing::HasSubstr("face 0 has fewer than three corners"));
         EXPECT_EQ(getElementCount(*readGeometryFile(folder / "a.h5", {.isLenient = true}).object, sFaceComp), 1u);
     }
 
@@ -294,7 +294,7 @@ namespace {
             hid_t const handle = H5Fopen(file.c_str(), H5F_ACC_RDWR, access);
             fault.make(handle);
             ASSERT_GE(H5Fclose(handle), 0);
-            std::string const refusal = refusalOf(file);
+            std::string const refusal = refusalOfFile(file);
             EXPECT_TRUE(refusal.starts_with(", " + fault.refusal) || refusal == fault.refusal) << refusal;
         }
         EXPECT_EQ(testing::internal::GetCapturedStderr(), "");

@@ -12,16 +12,16 @@ namespace {
     using testing::AllOf;
     using testing::ElementsAre;
     using testing::HasSubstr;
-    using Object = Orvan::MutablePtr<Tessara::Object>;
+    using OwnedObject = Orvan::MutablePtr<Tessara::Object>;
 
     /// A triangle and a quad that share an edge.
-    Object twoFaces()
+    OwnedObject twoFaces()
     {
         return makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {0, 1, 1e-20f}, {1.0f / 3, 2, 123456.789f}},
             {0, 1, 2, 0, 2, 4, 3}, {0, 3, 7});
     }
 
-    Object triangle()
+    OwnedObject triangle()
     {
         return makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}}, {0, 1, 2}, {0, 3});
     }
@@ -39,7 +39,7 @@ namespace {
     struct Written {
         std::string content;
         std::vector<std::string> notes;
-        Object object; // read back, if the format can be read
+        OwnedObject object; // read back, if the format can be read
     };
 
     Written written(Tessara::Object const& object, std::string const& extension)
@@ -52,7 +52,7 @@ namespace {
 
     TEST(WritePly, preservesPropertiesOfAllTypes)
     {
-        Object const mesh = twoFaces();
+        OwnedObject const mesh = twoFaces();
         Random random(1);
         for (char const* const component : {sPointComp, sFaceComp}) {
             addAllTypes(component, random, *mesh);
@@ -102,7 +102,7 @@ namespace {
             Orvan::Array<unsigned int> corners(count);
             for (unsigned int corner = 0; corner < count; ++corner)
                 corners[corner] = corner % 5;
-            Object const mesh = makeMesh(Orvan::Array<float3>(5), corners, {0, count});
+            OwnedObject const mesh = makeMesh(Orvan::Array<float3>(5), corners, {0, count});
             addDataProperty<bool>("chosen", sFaceComp, {true}, *mesh);
             addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(count), *mesh);
             addDataProperty<int>("two words", sFaceComp, {1}, *mesh);
@@ -119,22 +119,22 @@ namespace {
 
     TEST(WriteObj, preservesGeometryBitwise)
     {
-        Object const mesh = twoFaces();
+        OwnedObject const mesh = twoFaces();
         addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(7), *mesh);
         addDataProperty<float3>("normal", sFaceVertexComp, Orvan::Array<float3>(7, {0, 0.1f, 1}), *mesh);
         addDataProperty<float3>("color", sPointComp, someValues<float3>(5), *mesh);
         EXPECT_TRUE(sameContents(*written(*mesh, ".obj").object, *mesh));
 
-        Object const strands = makeStrands({{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {5, 5, 5}}, {0, 3, 4});
+        OwnedObject const strands = makeStrands({{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {5, 5, 5}}, {0, 3, 4});
         addDataProperty<float3>("normal", sPointComp, someValues<float3>(4), *strands);
         EXPECT_TRUE(sameContents(*written(*strands, ".obj").object, *strands));
-        Object const cloud = makePointCloud({{0, 0, 0}, {1, 2, 3}});
+        OwnedObject const cloud = makePointCloud({{0, 0, 0}, {1, 2, 3}});
         EXPECT_TRUE(sameContents(*written(*cloud, ".obj").object, *cloud));
     }
 
     TEST(WriteObj, sharesEqualCornerValuesAndWritesThoseOfPoints)
     {
-        Object const mesh = twoFaces();
+        OwnedObject const mesh = twoFaces();
         addDataProperty<double2>("uv", sFaceVertexComp, Orvan::Array<double2>(7, {0, 0.1}), *mesh);
         addDataProperty<float3>("normal", sPointComp, Orvan::Array<float3>(5, {0, 0, 1}), *mesh);
         addDataProperty<uchar4>("color", sPointComp, Orvan::Array<uchar4>(5, {255, 0, 51, 9}), *mesh);
@@ -170,7 +170,7 @@ namespace {
         EXPECT_EQ(valuesOf<unsigned int>(*written(*file.object, ".ply").object, "smoothing_group")[1], 4294967295u);
 
         // The merged range repeats names and libraries, and has entries beyond the names.
-        Object const merged = triangle();
+        OwnedObject const merged = triangle();
         addRangeProperty("material_library", sFaceComp, {7}, *merged);
         addDataProperty<Orvan::String>("material_library_name", "material_library", {"a\nb", "b"}, *merged);
         addRangeProperty("material", sFaceComp, {1}, *merged);
@@ -181,12 +181,12 @@ namespace {
 
     TEST(WriteStl, preservesTriangles)
     {
-        Object const mesh = triangle();
+        OwnedObject const mesh = triangle();
         addDataProperty<unsigned short>("attribute", sFaceComp, {7}, *mesh);
         Written const file = written(*mesh, ".stl");
         EXPECT_TRUE(sameContents(*file.object, *mesh));
         EXPECT_EQ(file.content.substr(84, 12), bytesOf(std::endian::little, 0.0f, 0.0f, 1.0f));
-        Object const withLoosePoint = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {2, 2, 2}}, {0, 1, 2}, {0, 3});
+        OwnedObject const withLoosePoint = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {2, 2, 2}}, {0, 1, 2}, {0, 3});
         EXPECT_THAT(written(*withLoosePoint, ".stl").notes, ElementsAre(HasSubstr("1 points of no face")));
     }
 
@@ -228,9 +228,9 @@ namespace {
     {
         using Arrays = std::map<std::string, std::string>;
         auto const longs = [](auto... numbers) { return bytesOf(std::endian::little, std::int64_t{numbers}...); };
-        auto const arraysIn = [](Object const& object) { return arraysOf(written(*object, ".vtp").content); };
+        auto const arraysIn = [](OwnedObject const& object) { return arraysOf(written(*object, ".vtp").content); };
 
-        Object const mesh = twoFaces();
+        OwnedObject const mesh = twoFaces();
         addDataProperty<float3>("a<\"b\">&\x01", sPointComp, someValues<float3>(5), *mesh);
         addDataProperty<unsigned long long>("id", sFaceComp, someValues<unsigned long long>(2), *mesh);
         addDataProperty<float3x3>("face:id", sFaceComp, someValues<float3x3>(2), *mesh);
@@ -248,7 +248,7 @@ namespace {
                 {"<Polys> connectivity Int64x1", longs(0, 1, 2, 0, 2, 4, 3)},
                 {"<Polys> offsets Int64x1", longs(3, 7)}}));
 
-        Object const strands =
+        OwnedObject const strands =
             makeStrands({{9, 9, 9}, {0, 0, 0}, {1, 0, 0}, {2, 0, 0}}, {1, 3, 4}); // one point is in no strand
         addDataProperty<int>("part", sStrandComp, {4, 5}, *strands);
         EXPECT_THAT(written(*strands, ".obj").content, HasSubstr("\nl 2 3\nl 4\n"));
@@ -257,7 +257,7 @@ namespace {
                 {"<Points> Points Float32x3", bytesOfArray<float3>(*strands, sPointPosition)},
                 {"<Lines> connectivity Int64x1", longs(1, 2, 3)}, {"<Lines> offsets Int64x1", longs(2, 3)}}));
 
-        Object const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
+        OwnedObject const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
         EXPECT_EQ(arraysIn(cloud),
             (Arrays{{"<Points> Points Float32x3", bytesOfArray<float3>(*cloud, sPointPosition)},
                 {"<Verts> connectivity Int64x1", longs(0, 1)}, {"<Verts> offsets Int64x1", longs(1, 2)}}));
@@ -266,7 +266,7 @@ namespace {
     TEST(WriteGeometryFile, refusesWhatAFormatCannotHold)
     {
         struct Case {
-            Object object;
+            OwnedObject object;
             char const* name;
             char const* refusal;
         } const cases[] = {
@@ -306,7 +306,7 @@ namespace {
 
         // A limit on the size of files has the same effect as a disk that becomes full in the middle.
         store(folder / "a.ply", "old");
-        Object const large = makePointCloud(Orvan::Array<float3>(100'000));
+        OwnedObject const large = makePointCloud(Orvan::Array<float3>(100'000));
         rlimit limit{};
         ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &limit), 0);
         rlimit const small{600'000, limit.rlim_max};
