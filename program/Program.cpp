@@ -28,7 +28,8 @@ namespace {
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz .glb .gltf .h5;
 written: .obj .ply .stl .vtp .glb .h5. FILE.h5#NAME is one of several objects in an HDF5 file. An
 existing file is replaced only with --force, even if OUT is IN, and only by a complete file; if
-anything fails it stays unchanged. Results are printed to standard output, messages to standard error.
+anything fails it stays unchanged. Results are printed to standard output, messages to standard
+error.
 
 Exit codes:
   0  done

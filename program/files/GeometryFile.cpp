@@ -68,7 +68,7 @@ std::vector<std::string> writeGeometryFile(
     geometry.remark = options.remark;
     if (format.write != writeObj)
         for (FaceNames const& names : geometry.faceNames)
-            leaveOut(names.data, "only OBJ files can hold names of faces", geometry.leftOut);
+            leaveOut(names.data, "only OBJ and HDF5 files can hold names of faces", geometry.leftOut);
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }

@@ -263,7 +263,7 @@ TEST_F(Commands, ConvertKeepsWhatBothFormatsHold)
     json const done = runForJson("convert spider.obj out.ply --threads 1");
     EXPECT_EQ(done["counts"], runForJson("info out.ply")["counts"]);
     EXPECT_EQ(done["counts"], runForJson("info spider.obj")["counts"]);
-    EXPECT_THAT(done["warnings"].dump(), HasSubstr("spider.obj: materials are left out"));
+    EXPECT_THAT(done["warnings"].dump(), HasSubstr("(string, material) is left out: only OBJ and HDF5"));
     EXPECT_THAT(runForJson("convert cloud.ply out.obj")["warnings"].dump(), HasSubstr("label"));
     EXPECT_EQ(run("convert cloud.ply out.ply").exitCode, 0);
     EXPECT_EQ(runForJson("info out.ply")["properties"], runForJson("info cloud.ply")["properties"]);
@@ -481,9 +481,9 @@ TEST_F(Commands, FailuresSayWhyAndLeaveFilesUnchanged)
 
 TEST_F(Commands, StrictAndRequireHaveTheirExitCodes)
 {
-    copySamples({"cube.ply", "cylinder.obj", "sphere-with-hole.stl", "bunny.obj", "spider.obj"});
+    copySamples({"cube.ply", "cylinder.obj", "sphere-with-hole.stl", "bunny.obj"});
     store(folder / "cloud.ply", kCloud);
-    store(folder / "isolated.obj", "v 0 0 0\nv 1 0 0\nv 0 1 0\nv 9 9 9\nf 1 2 3\n");
+    store(folder / "isolated.obj", "v 0 0 0\nv 1 0 0\nv 0 1 0\nv 9 9 9\nvt 0 0\nf 1 2 3\n");
     struct Case {
         char const* arguments;
         int exitCode;
@@ -493,7 +493,7 @@ TEST_F(Commands, StrictAndRequireHaveTheirExitCodes)
         {"remove-slivers cylinder.obj out.obj --ratio 0.1 --strict", 8, "the shape changed"},
         {"run cylinder.obj out.obj --do 'remove-slivers --ratio 0.1; smooth --amount 0' --strict", 8, "step 1"},
         {"convert cloud.ply out.obj --strict", 8, "label"}, // the format drops it
-        {"convert spider.obj out.obj --strict", 0, "materials"}, // only the input has them
+        {"convert isolated.obj out.obj --strict", 0, "texture coordinates"}, // only the input has them
         {"smooth bunny.obj out.obj --strict --require closed,manifold,oriented,triangles,no-isolated-points", 0, ""},
         {"smooth cube.ply out.obj --require closed,triangles", 5, "cube.ply does not meet --require closed,triangles"},
         {"run sphere-with-hole.stl out.obj --do smooth --require closed", 5, "9 of 432 edges are boundary edges"},

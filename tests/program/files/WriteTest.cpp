@@ -165,7 +165,7 @@ namespace {
         EXPECT_THAT(again.notes, testing::IsEmpty());
         EXPECT_TRUE(sameContents(*again.object, *file.object));
         EXPECT_THAT(written(*file.object, ".ply").notes,
-            ElementsAre("\"object_name\" (string, object) is left out: only OBJ files can hold names of faces",
+            ElementsAre("\"object_name\" (string, object) is left out: only OBJ and HDF5 files can hold names of faces",
                 HasSubstr("\"group_name\""), HasSubstr("\"material_name\""), HasSubstr("\"material_library_name\"")));
         EXPECT_EQ(valuesOf<unsigned int>(*written(*file.object, ".ply").object, "smoothing_group")[1], 4294967295u);
 
