@@ -13,8 +13,8 @@ target_compile_options(modeling_flags INTERFACE
 if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
     target_compile_options(modeling_flags INTERFACE -Wno-restrict) # g++ 12 reports false overlaps in std::string
 endif()
-if(CMAKE_UNITY_BUILD AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
-    # Unnamed namespaces of sources that another source includes are taken for those of a header.
+if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
+    # If sources are compiled together, their unnamed namespaces are taken for those of a header.
     target_compile_options(modeling_flags INTERFACE -Wno-subobject-linkage)
 endif()
 if(MODELING_WARNINGS_AS_ERRORS)
@@ -51,6 +51,7 @@ function(modeling_add_test name)
     add_executable(${name} ${arg_SOURCES})
     modeling_use_flags(${name})
     modeling_compile_quickly(${name})
+    set_target_properties(${name} PROPERTIES UNITY_BUILD ON) # in all presets: they take longest to compile
     target_link_libraries(${name} PRIVATE ${arg_LIBRARIES} GTest::gmock GTest::gtest_main)
     if(NOT TARGET tests_${arg_LABEL})
         add_custom_target(tests_${arg_LABEL})

@@ -114,7 +114,11 @@ private:
         }
     };
 
-    std::size_t voxelCount() const noexcept { return static_cast<std::size_t>(side_) * side_ * side_; }
+    std::size_t voxelCount() const noexcept
+    {
+        auto const side = static_cast<std::size_t>(side_);
+        return side * side * side;
+    }
 
     int side_;
     std::array<Level, Traits::kDepthCount> levels_;
