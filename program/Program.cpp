@@ -12,9 +12,12 @@
 #include <tbb/global_control.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <new>
 #include <optional>
+
+#include <fcntl.h>
 
 namespace ModelingProgram {
 
@@ -140,6 +143,15 @@ Exit codes:
         return parsed.help.empty() ? runCommand(invocation) : printHelp(parsed.help);
     }
 
+    /// Otherwise a file gets the number of a standard stream that is closed, and messages end up in it. Writing to the
+    /// stream still fails.
+    void openStandardStreams()
+    {
+        for (int stream = 0; stream <= 2; ++stream)
+            if (::fcntl(stream, F_GETFD) < 0 && errno == EBADF)
+                static_cast<void>(::open("/dev/null", O_RDONLY));
+    }
+
 }
 
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation)
@@ -216,6 +228,7 @@ void onSelected(Command& command, Invocation& invocation, std::function<void(Rep
 
 int runProgram(int argumentCount, char const* const* arguments)
 {
+    openStandardStreams();
     try {
         return parseAndRun(argumentCount, arguments);
     } catch (std::bad_alloc const&) {

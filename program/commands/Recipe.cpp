@@ -25,8 +25,11 @@ namespace {
     /// Refuses a key that occurs twice in an object, of which the parser would drop one.
     Json parseJson(std::string_view text, std::filesystem::path const& file)
     {
+        constexpr int kMostLevels = 100; // values are copied recursively
         std::vector<std::set<std::string>> keys;
-        auto const check = [&](int, Json::parse_event_t event, Json& value) {
+        auto const check = [&](int level, Json::parse_event_t event, Json& value) {
+            if (level > kMostLevels)
+                throw FileError(fmt::format("{} cannot be read: its values are nested too deeply", file.string()));
             if (event == Json::parse_event_t::object_start)
                 keys.emplace_back();
             else if (event == Json::parse_event_t::object_end)
@@ -169,8 +172,15 @@ namespace {
             return true;
         bool const isNumber = kind == ValueKind::Integer || kind == ValueKind::Number
             || (kind == ValueKind::Size && word.find_first_not_of("0123456789") == std::string::npos);
-        if (!isNumber)
+        if (!isNumber) {
+            try {
+                static_cast<void>(Json(word).dump());
+            } catch (Json::type_error const&) {
+                throw Failure(ExitCode::CommandLine,
+                    fmt::format("{} is not UTF-8, which recipes are", TextScanner::quoted(word)));
+            }
             return word;
+        }
         return Json::accept(word) ? Json::parse(word) : Json(std::strtod(word.c_str(), nullptr));
     }
 

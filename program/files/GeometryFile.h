@@ -30,7 +30,8 @@ struct ReadOptions {
     bool isCentered = false;
     /// Subtracts this point instead, such as the center of a file read before.
     std::optional<Tessara::Math::double3> origin = {};
-    /// Called with the number of bytes before larger arrays of an HDF5 file are allocated; may throw to refuse them.
+    /// Called with the number of bytes before larger arrays of HDF5 and glTF files are allocated; may throw to refuse
+    /// them. Other formats do not need more memory than the size of the file suggests.
     std::function<void(std::uint64_t)> onSize = {};
 };
 

@@ -2,6 +2,7 @@
 
 #include "GeometryBuilder.h"
 
+#include <algorithm>
 #include <bit>
 
 namespace ModelingProgram {
@@ -155,6 +156,8 @@ void GltfDocument::parse(std::string_view json)
     place_ = "JSON";
     try {
         root_ = Json::parse(json);
+    } catch (Json::parse_error const& error) { // whose text repeats what was read last, which may be long
+        refuse("it is malformed at byte " + std::to_string(error.byte));
     } catch (Json::exception const& error) {
         refuse(std::string("it is malformed: ") + error.what());
     }
@@ -251,12 +254,14 @@ GltfDocument::Bytes GltfDocument::loadBuffer(Json const& json, std::uint64_t ind
     std::string const uri = text(json, "uri");
     if (!uri.starts_with("data:")) {
         std::filesystem::path const path = fileBeside(uri);
+        auto file = std::find_if(files_.begin(), files_.end(), [&](auto const& known) { return known->path == path; });
         try {
-            files_.push_back(std::make_unique<InputFile>(path));
+            if (file == files_.end())
+                file = files_.insert(file, std::make_unique<InputFile>(path));
         } catch (FileError const& error) {
             refuse("buffer " + std::to_string(index) + ": " + error.what());
         }
-        return {reinterpret_cast<std::byte const*>(files_.back()->bytes.get()), files_.back()->size};
+        return {reinterpret_cast<std::byte const*>((*file)->bytes.get()), (*file)->size};
     }
     std::size_t const comma = uri.find(',');
     std::optional<std::vector<std::byte>> decoded;

@@ -103,6 +103,7 @@ namespace {
             chooseKind(instances);
             for (GltfInstance const& instance : instances)
                 readInstance(instance);
+            requireMemory(strandPoints_.size * sizeof(float3));
             if (kind_ == Mode::Lines)
                 addStrands();
             for (Column& column : columns_)
@@ -161,7 +162,8 @@ namespace {
         {
             std::string key;
             for (auto const& [semantic, accessor] : attributes.items())
-                key += std::to_string(document_.number(attributes, semantic.c_str())) + " " + semantic + "\n";
+                key += std::to_string(document_.number(attributes, semantic.c_str())) + " "
+                    + std::to_string(semantic.size()) + " " + semantic;
             return key;
         }
 
@@ -213,10 +215,21 @@ namespace {
                 if (std::max(total.vertices, total.corners) >= GeometryBuilder::kMostElements)
                     document_.refuse("the scene has more points or face corners than a mesh can hold");
             }
+            constexpr std::uint64_t kVertexBytes = sizeof(float3) + 4 * sizeof(unsigned int);
+            constexpr std::uint64_t kCornerBytes = 4 * sizeof(unsigned int);
+            requireMemory(total.vertices * kVertexBytes + total.corners * kCornerBytes);
             pointOf_.reserve(total.vertices);
             builder_.expectFaces(total.corners / 3);
             builder_.expectCorners(total.corners);
             vertexOfCorner_.reserve(hasAttributes_ ? total.corners : 0);
+        }
+
+        /// Instances and attributes without data may demand much more memory than the file has bytes.
+        void requireMemory(std::uint64_t bytes) const
+        {
+            constexpr std::uint64_t kNoticedBytes = 1 << 20;
+            if (bytes >= kNoticedBytes && builder_.options().onSize)
+                builder_.options().onSize(bytes);
         }
 
         void readInstance(GltfInstance const& instance)
@@ -345,7 +358,10 @@ namespace {
                 otherTypes_.add(semantic);
                 return;
             }
-            column.bytes.resize((vertices.first + vertices.count) * column.elementBytes);
+            std::uint64_t const end = (vertices.first + vertices.count) * column.elementBytes;
+            if (end > column.bytes.capacity)
+                requireMemory(std::max(column.bytes.capacity, end - column.bytes.capacity)); // how arrays grow
+            column.bytes.resize(end);
             column.filledCount += vertices.count;
             unsigned char* const target = column.bytes.data + vertices.first * column.elementBytes;
             if (isNormal && !transform.isIdentity())
@@ -446,6 +462,7 @@ namespace {
                 return;
             }
             GltfArray const array = indices(*accessor, run.count);
+            requireMemory((strandPoints_.capacity + array.count) * sizeof(unsigned int));
             if (array.data && array.replacedCount == 0) {
                 read(array.count,
                     [=](std::uint64_t i) { return first + indexAt(array.data + i * array.stride, array.scalar); });
@@ -574,6 +591,7 @@ namespace {
 
         void gather(Column const& column, char const* component, Indices const& vertices)
         {
+            requireMemory(vertices.size * column.elementBytes);
             visitGltfScalar(column.scalar, [&]<class Number>(Number) {
                 auto const target =
                     builder_.addProperty<Number>(column.name, component, column.components, vertices.size);

@@ -48,6 +48,8 @@ namespace {
                     result.linear[row][column] = (*matrix)[4 * column + row];
                 result.translation[row] = (*matrix)[12 + row];
             }
+            if ((*matrix)[3] != 0 || (*matrix)[7] != 0 || (*matrix)[11] != 0 || (*matrix)[15] != 1)
+                document.refuse("the last row of matrix is not 0 0 0 1");
             return result;
         }
         if (auto const rotation = findNumbers<4>(document, node, "rotation"))
@@ -89,6 +91,8 @@ namespace {
         for (std::uint64_t node = 0; node < isChild.size(); ++node)
             if (!isChild[node])
                 roots.push_back(node);
+        if (roots.empty() && !isChild.empty())
+            document.refuse("every node is the child of a node, but nodes have to be trees");
         return roots;
     }
 

@@ -220,7 +220,7 @@ namespace {
             };
             using Stored =
                 std::conditional_t<storageOf<T>() == Storage::Float, float, typename ElementLayout<T>::Scalar>;
-            return [scalars](std::uint64_t element, OutputFile& out) {
+            return [=](std::uint64_t element, OutputFile& out) {
                 Stored stored[n];
                 for (unsigned int i = 0; i < n; ++i)
                     stored[i] = static_cast<Stored>(scalars[element * n + (isMatrix ? i % side * side + i / side : i)]);
@@ -233,7 +233,7 @@ namespace {
         {
             using Scalar = typename ElementLayout<T>::Scalar;
             constexpr unsigned int n = ElementLayout<T>::components;
-            std::string const& name = attribute.name;
+            std::string const name = validUtf8(attribute.name);
             std::string semantic;
             if constexpr (std::is_floating_point_v<Scalar> && n == 3) {
                 if (name == "normal" && std::all_of(values.begin(), values.end(), isUnit<T>))
@@ -300,7 +300,7 @@ namespace {
                 if (!attribute.semantic.starts_with(prefix)
                     || static_cast<unsigned int>(std::stoul(attribute.semantic.substr(prefix.size()))) < next)
                     continue;
-                attribute.semantic = "_" + attribute.source->name;
+                attribute.semantic = "_" + validUtf8(attribute.source->name);
                 while (!semantics_.insert(attribute.semantic).second)
                     attribute.semantic.insert(0, "_");
                 attribute.isNormalized = false;

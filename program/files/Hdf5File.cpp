@@ -137,6 +137,8 @@ GeometryFile readHdf5Geometry(Hdf5Location const& location, ReadOptions const& o
 {
     std::vector<Hdf5Object> objects = readHdf5Objects(location.file,
         location.object ? Hdf5Selection::Named : Hdf5Selection::Only, location.object.value_or(""), options.onSize);
+    if (objects.empty())
+        throw FileError(location.file.string() + " cannot be read: the HDF5 library reports no object");
     auto& [name, object, remark] = objects.front();
     GeometryFile file;
     file.format = "HDF5, object \"" + name + "\"";
@@ -158,7 +160,7 @@ void writeHdf5Objects(
     std::vector<Hdf5Object> const& objects, std::filesystem::path const& file, WriteOptions const& options)
 {
     OutputFile out(file, options.existing);
-    std::filesystem::path const& temporary = out.temporaryFile();
+    std::filesystem::path const temporary = out.temporaryFile();
     try {
         writeHdf5With(objects, temporary, options.compression);
     } catch (std::runtime_error const& error) {

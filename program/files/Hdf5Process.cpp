@@ -10,6 +10,7 @@
 #include <new>
 #include <optional>
 #include <stdexcept>
+#include <utility>
 
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -86,9 +87,13 @@ namespace {
     /// A new process ends with its parent, which decides what an interrupt means, and prints nothing.
     void settleIn()
     {
-        constexpr int kSignals[] = {SIGSEGV, SIGBUS, SIGABRT, SIGFPE, SIGILL, SIGXCPU, SIGPIPE, SIGHUP, SIGQUIT};
-        for (int const signal : kSignals)
+        for (int const signal : {SIGSEGV, SIGBUS, SIGABRT, SIGFPE, SIGILL, SIGXCPU, SIGPIPE})
             ::signal(signal, SIG_DFL);
+        for (int const signal : {SIGHUP, SIGQUIT}) { // nohup ignores them
+            struct sigaction old = {};
+            if (::sigaction(signal, nullptr, &old) == 0 && old.sa_handler != SIG_IGN)
+                ::signal(signal, SIG_DFL);
+        }
         ::signal(SIGINT, SIG_IGN);
         ::signal(SIGTERM, SIG_IGN);
         ::prctl(PR_SET_PDEATHSIG, SIGKILL);
@@ -127,15 +132,13 @@ namespace {
         {
             if (id > 0) {
                 ::kill(id, SIGKILL);
-                wait();
+                waitForEnd();
             }
         }
         /// Returns whether it ended as it should.
         bool wait()
         {
-            int status = 0;
-            while (::waitpid(id, &status, 0) < 0 && errno == EINTR) { }
-            id = -1;
+            int const status = waitForEnd();
             if (WIFEXITED(status) && WEXITSTATUS(status) == kOutOfMemory)
                 throw std::bad_alloc();
             return WIFEXITED(status) && WEXITSTATUS(status) == 0;
@@ -143,6 +146,17 @@ namespace {
 
         static constexpr int kFailed = 1, kOutOfMemory = 2;
         pid_t id;
+
+    private:
+        /// Returns the status of the process; that of a killed one if the system does not know.
+        int waitForEnd()
+        {
+            int status = 0;
+            pid_t ended = 0;
+            while ((ended = ::waitpid(id, &status, 0)) < 0 && errno == EINTR) { }
+            bool const isKnown = ended == std::exchange(id, -1);
+            return isKnown ? status : SIGKILL;
+        }
     };
 
     /// Calls `work` with a pipe in a new process. \return what it writes; nullopt if it crashes, or writes more than `most`
@@ -150,6 +164,8 @@ namespace {
     template <class Work>
     std::optional<std::string> runInProcess(std::filesystem::path const& file, std::uint64_t most, Work const& work)
     {
+        ::signal(SIGCHLD, SIG_DFL); // if it is ignored, the system forgets how a process ended
+        pid_t const parent = ::getpid();
         Descriptor reading, writing;
         int ends[2];
         pid_t process = -1;
@@ -163,6 +179,8 @@ namespace {
         if (process == 0) {
             try {
                 settleIn();
+                if (::getppid() != parent) // which ended before it was watched
+                    ::_exit(Child::kFailed);
                 work(writing.number);
             } catch (std::bad_alloc const&) {
                 ::_exit(Child::kOutOfMemory);

@@ -109,6 +109,7 @@ namespace {
                 requireObjStatements();
             for (; !in_.atEnd(); in_.nextLine())
                 readStatement();
+            requireTotals();
             addCornerValues("uv", textureOf_, textures_);
             addCornerValues("normal", normalOf_, normals_);
             noteUnused("texture coordinates (vt)", textureOf_, textures_.size);
@@ -131,11 +132,13 @@ namespace {
         {
             TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
             for (; !scanner.atEnd(); scanner.nextLine()) {
-                std::string_view const keyword = scanner.peekWord();
+                std::string_view const keyword = scanner.word();
                 total_.points += keyword == "v";
                 total_.textures += keyword == "vt";
                 total_.normals += keyword == "vn";
                 total_.faces += keyword == "f";
+                if (!isGeometry(keyword) && isName(keyword))
+                    textOfName(keyword, scanner); // which may end in a later line
             }
             if (std::max({total_.textures, total_.normals, total_.faces}) >= GeometryBuilder::kMostElements)
                 in_.refuse("there are more elements than a mesh can hold");
@@ -145,13 +148,21 @@ namespace {
             normals_.reserve(total_.normals);
         }
 
+        /// Indices have been checked against what was counted.
+        void requireTotals()
+        {
+            if (builder_.pointCount() != total_.points || textures_.size != total_.textures
+                || normals_.size != total_.normals)
+                in_.refuse("the file has other numbers of v, vt and vn than were counted first");
+        }
+
         /// A file without points is empty geometry, unless it is not an OBJ file at all.
         void requireObjStatements()
         {
             TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
             scanner.skipEmptyLines();
             std::string_view const keyword = scanner.atEnd() ? std::string_view() : scanner.peekWord();
-            if (!keyword.empty() && !isGeometry(keyword) && !namesOf(keyword) && keyword != "mtllib" && keyword != "p")
+            if (!keyword.empty() && !isGeometry(keyword) && !isName(keyword) && keyword != "p")
                 scanner.refuse(TextScanner::quoted(keyword) + " is not a keyword of OBJ files");
         }
 
@@ -189,26 +200,33 @@ namespace {
             return known == std::end(names_) ? nullptr : known;
         }
 
-        /// Reads a name of the faces that follow. A face can be in several groups, which are kept as one name.
+        bool isName(std::string_view keyword) { return keyword == "mtllib" || namesOf(keyword); }
+
+        /// What a statement names. A face can be in several groups, which are kept as one name; other names may contain
+        /// blanks and #.
+        std::string_view textOfName(std::string_view keyword, TextScanner& in)
+        {
+            if (keyword != "g")
+                return in.restOfLine(TextScanner::Rest::WithHashes);
+            groups_.clear();
+            for (std::string_view group = in.word(); !group.empty(); group = in.word())
+                groups_.append(groups_.empty() ? "" : " ").append(group);
+            return groups_;
+        }
+
+        /// Reads a name of the faces that follow.
         bool readName(std::string_view keyword)
         {
+            if (!isName(keyword))
+                return false;
+            std::string_view const name = textOfName(keyword, in_);
             if (keyword == "mtllib") {
-                if (std::string_view const library = in_.restOfLine(); !library.empty())
-                    libraries_.add(library);
+                if (!name.empty())
+                    libraries_.add(name);
                 return true;
             }
-            NameRuns* const known = namesOf(keyword);
-            if (!known)
-                return false;
-            std::string_view name = in_.restOfLine();
-            if (keyword == "g") {
-                groups_.clear();
-                for (std::string_view group = in_.word(); !group.empty(); group = in_.word())
-                    groups_.append(groups_.empty() ? "" : " ").append(group);
-                name = groups_;
-            }
             bool const isNone = keyword == "s" && (name == "0" || name == "off");
-            known->begin(isNone ? std::string_view() : name, builder_.faceCount());
+            namesOf(keyword)->begin(isNone ? std::string_view() : name, builder_.faceCount());
             return true;
         }
 

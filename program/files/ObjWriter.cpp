@@ -32,15 +32,26 @@ namespace {
         std::string_view text = {}; // its name; empty for none, as at the start of the file
     };
 
-    /// A name as one line of the file: nothing in it ends the line, continues it, or begins a comment.
-    std::string inOneLine(std::string_view text)
+    bool isBlank(char c)
+    {
+        return c == ' ' || (c >= '\t' && c <= '\r');
+    }
+
+    /// A name as one line of the file that reads back as a single name: nothing in it ends the line, continues it, or
+    /// begins a comment.
+    std::string inOneLine(std::string_view text, bool keepsHashes)
     {
         std::string line(text);
         std::replace_if(
-            line.begin(), line.end(), [](char c) { return c == '\n' || c == '\r' || c == '#'; }, '_');
+            line.begin(), line.end(),
+            [=](char c) { return c == '\n' || c == '\r' || c == '\0' || (c == '#' && !keepsHashes); }, '_');
+        line.erase(std::find_if_not(line.rbegin(), line.rend(), isBlank).base(), line.end());
+        line.erase(line.begin(), std::find_if_not(line.begin(), line.end(), isBlank));
+        if (line.starts_with('#'))
+            line.front() = '_';
         if (line.ends_with('\\'))
             line.back() = '_';
-        return line;
+        return line.empty() && !text.empty() ? "_" : line;
     }
 
     template <class T> OutputFile& writeComponents(T const& vector, OutputFile& out)
@@ -72,10 +83,20 @@ namespace {
                 writeFaces(out);
             else if (geometry_.kind == WritableGeometry::Kind::Strands)
                 writePolylines(out);
+            if (!changedNames_.empty())
+                geometry_.leftOut.push_back(countOf(changedNames_.size())
+                    + " written with other characters or blanks, "
+                      "because OBJ files cannot hold "
+                    + TextScanner::quoted(*changedNames_.begin()));
             out.commit();
         }
 
     private:
+        static std::string countOf(std::size_t names)
+        {
+            return names == 1 ? "1 name of faces is" : std::to_string(names) + " names of faces are";
+        }
+
         /// Values of corners take precedence over those of points, because the format is designed for them.
         void chooseAttributes()
         {
@@ -182,7 +203,7 @@ namespace {
                     std::string_view const library = rest.substr(0, rest.find('\n'));
                     rest.remove_prefix(std::min(rest.size(), library.size() + 1));
                     if (!library.empty() && written.insert(library).second)
-                        out << "mtllib " << inOneLine(library) << "\n";
+                        out << "mtllib " << inOneLine(library, true) << "\n";
                 }
             }
         }
@@ -233,7 +254,10 @@ namespace {
                 if (text == statement.text)
                     continue;
                 statement.text = text;
-                out << statement.keyword << (text.empty() ? "" : " ") << inOneLine(text) << "\n";
+                std::string const line = inOneLine(text, statement.keyword != std::string_view("g"));
+                if (line != text)
+                    changedNames_.emplace(text);
+                out << statement.keyword << (text.empty() ? "" : " ") << line << "\n";
             }
             if (smoothingGroups_ && (*smoothingGroups_)[face] != smoothingGroup_) {
                 smoothingGroup_ = (*smoothingGroups_)[face];
@@ -285,6 +309,7 @@ namespace {
         Vectors normals_;
         FaceNames const* libraries_ = nullptr;
         std::vector<NameStatement> statements_;
+        std::set<std::string_view> changedNames_; // that are not written as they are
         Orvan::Ptr<Orvan::Array<unsigned int>> smoothingGroups_; // null if there are none
         unsigned int smoothingGroup_ = 0; // of the last face
     };

@@ -138,11 +138,11 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
     }
 }
 
-std::filesystem::path const& OutputFile::temporaryFile() const
+std::filesystem::path OutputFile::temporaryFile() const
 {
     if (temporary_.empty())
         fail("this format needs a regular file, not a device or a pipe");
-    return temporary_;
+    return "/proc/self/fd/" + std::to_string(descriptor_);
 }
 
 void OutputFile::commit()

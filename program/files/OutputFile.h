@@ -55,9 +55,10 @@ public:
     /// Writes the bytes of a number as in memory.
     template <class T> void writeBinary(T number) { write(&number, sizeof(T)); }
 
-    /// The temporary file, for a library that writes a file by its name.
+    /// A name of the temporary file, for a library that opens files by their names, in this process or a forked one. It
+    /// leads to the open file, so that nothing is created again after a signal has removed it.
     /// \throws FileError  if the file is not a regular one
-    std::filesystem::path const& temporaryFile() const;
+    std::filesystem::path temporaryFile() const;
 
     /// Completes the file and renames it.
     /// \throws FileError  also if a file that is to be kept has been created in the meantime

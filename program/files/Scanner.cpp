@@ -88,10 +88,12 @@ Coordinate TextScanner::decimalCoordinate(std::string_view digits, double value)
     return {value, std::abs(value - static_cast<double>(rounded)) > leastReportedLoss(digits)};
 }
 
-std::string_view TextScanner::restOfLine()
+std::string_view TextScanner::restOfLine(Rest kind)
 {
-    skipBlanks();
-    char const* end = std::find_if(at_, end_, [&](char c) { return c == '\n' || (comments_ && c == '#'); });
+    if (atLineEnd())
+        return {};
+    bool const endsAtHash = comments_ && kind == Rest::WithoutComments;
+    char const* end = std::find_if(at_, end_, [&](char c) { return c == '\n' || (endsAtHash && c == '#'); });
     while (end != at_ && isBlank(end[-1]))
         --end;
     return {at_, static_cast<std::size_t>(end - at_)};

@@ -248,8 +248,12 @@ public:
         refuse(quoted(peekWord()) + " is not a valid number for " + what);
     }
 
-    /// The rest of the line without comments and without blanks at both ends; does not advance.
-    std::string_view restOfLine();
+    enum class Rest {
+        WithoutComments,
+        WithHashes // a # begins a comment only if nothing precedes it
+    };
+    /// The rest of the line without comments and without blanks at both ends. Advances past the blanks before it.
+    std::string_view restOfLine(Rest kind = Rest::WithoutComments);
     /// The same, split at commas, semicolons and tabs if there are any, otherwise at blanks.
     std::vector<std::string_view> fieldsOfLine();
 

@@ -25,7 +25,7 @@ namespace {
     std::string escaped(std::string_view text)
     {
         std::string result;
-        for (char const c : text) {
+        for (char const c : validUtf8(text)) {
             bool const isControl = static_cast<unsigned char>(c) < ' ';
             if (isControl && c != '\t' && c != '\n' && c != '\r')
                 result += '?'; // XML cannot represent it

@@ -18,7 +18,9 @@ public:
             grow();
         std::uint64_t slot = slotOf(value);
         for (; slots_[slot] != 0; slot = (slot + 1) & (slots_.size - 1)) {
-            if (values_[slots_[slot] - 1] == value)
+            // Equal bits too: NaN differs from itself, and many of them would all be compared with one another.
+            T const& known = values_[slots_[slot] - 1];
+            if (known == value || std::memcmp(&known, &value, sizeof(T)) == 0)
                 return slots_[slot] - 1;
         }
         values_.append(value);

@@ -1,5 +1,7 @@
 #include "Writers.h"
 
+#include <nlohmann/json.hpp>
+
 #include "GeometryBuilder.h"
 
 #include <TessaraGeometry/Elements.h>
@@ -136,6 +138,14 @@ WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path 
             addAttribute(object, name, geometry);
     }
     return geometry;
+}
+
+std::string validUtf8(std::string_view text)
+{
+    using Json = nlohmann::json;
+    // Written and read again, because only writing can replace bytes.
+    std::string const json = Json(std::string(text)).dump(-1, ' ', false, Json::error_handler_t::replace);
+    return Json::parse(json).get<std::string>();
 }
 
 }

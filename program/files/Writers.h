@@ -65,6 +65,9 @@ Tessara::Geometry::GeoValidator::Status validateGeometry(Tessara::Object const& 
 /// \throws FileError, which names the file
 WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file);
 
+/// The text with U+FFFD in place of bytes that are not UTF-8, for formats that have to be.
+std::string validUtf8(std::string_view text);
+
 // One writer per format. They add to `leftOut`, and throw `FileError` if the format cannot hold the type of geometry.
 
 void writeGltf(WritableGeometry& geometry, std::filesystem::path const& file);

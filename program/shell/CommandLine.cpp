@@ -69,6 +69,9 @@ namespace {
                 return text + " is too large";
             if (error != std::errc{} || end != text.data() + text.size())
                 return text + (std::is_signed_v<T> ? " is not a whole number" : " is not a whole number of 0 or more");
+            std::size_t const first = text[0] == '-' ? 1 : 0;
+            if (text[first] == '0' && text.size() > first + 1) // the parser would take it for an octal number
+                return text + " begins with a zero";
         } else if constexpr (std::is_floating_point_v<T>) {
             if (!std::isfinite(static_cast<T>(numberIn(text))))
                 return text + " is not a number";
@@ -166,6 +169,8 @@ namespace {
     {
         for (CLI::Option const* option : optionsOf(command)) {
             auto const count = static_cast<int>(option->count());
+            if (option->get_items_expected_max() == 0) // a flag
+                continue;
             if (count > option->get_items_expected_max())
                 return fmt::format(
                     "{} is given more than once, or with too many values", option->get_name(false, false));
@@ -177,6 +182,8 @@ namespace {
             std::string const name = option->get_name(false, false);
             if (fallback.starts_with(name + ":"))
                 return name + " needs a value";
+            if (fallback.starts_with(option->get_single_name() + " was given a disallowed"))
+                return name + " takes no value";
         }
         return fallback;
     }
@@ -227,7 +234,7 @@ namespace {
         int position = 0;
         for (std::string& argument : arguments) {
             ++position;
-            if (argument.empty() || (argument.starts_with("--") && argument.ends_with('='))) {
+            if (argument.empty() || (argument.starts_with("--") && argument.find('=') == argument.size() - 1)) {
                 argument += kEmpty;
                 result.firstEmpty = result.firstEmpty == 0 ? position : result.firstEmpty;
             }
@@ -465,6 +472,7 @@ template Option Command::addOption(char const*, std::vector<std::filesystem::pat
 Option Command::addFlag(char const* names, bool& isSet, char const* description)
 {
     CLI::Option& option = *app_->add_flag(names, isSet, description);
+    option.disable_flag_override(); // --flag=false
     return Option(option, (*declarations_)[&option]);
 }
 

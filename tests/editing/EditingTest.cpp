@@ -11,7 +11,7 @@
 using namespace Tessara::GeometryAlgorithms;
 using namespace TestSupport;
 using Flags = Orvan::Array<bool>;
-using Indices = Orvan::Array<unsigned int>;
+using IndexList = Orvan::Array<unsigned int>;
 using Positions = Orvan::Array<float3>;
 
 namespace {
@@ -20,9 +20,9 @@ namespace {
 /// element.
 namespace Plain {
 
-    Indices mapping(Flags const& deleted)
+    IndexList mapping(Flags const& deleted)
     {
-        Indices remap;
+        IndexList remap;
         unsigned int next = 0;
         for (bool const isDeleted : deleted)
             remap.append(isDeleted ? kDeletedElement : next++);
@@ -35,7 +35,7 @@ namespace Plain {
         replaceIn(name, key, Orvan::makePtr<Orvan::Array<T>>(std::move(array)), object);
     }
 
-    template <class T> Orvan::Array<T> compacted(Orvan::Array<T> const& array, Indices const& remap)
+    template <class T> Orvan::Array<T> compacted(Orvan::Array<T> const& array, IndexList const& remap)
     {
         Orvan::Array<T> kept;
         for (std::uint64_t i = 0; i != remap.size; ++i)
@@ -45,7 +45,7 @@ namespace Plain {
     }
 
     /// Returns false if the array is missing or too short.
-    bool compactData(Orvan::String const& name, Indices const& remap, Object& object)
+    bool compactData(Orvan::String const& name, IndexList const& remap, Object& object)
     {
         bool isDone = false;
         visitArray(getDataGeoProperty(object, name)->getProperty(sData), [&](auto const& array, auto) {
@@ -56,14 +56,14 @@ namespace Plain {
         return isDone;
     }
 
-    bool deleteRange(Orvan::String const& name, Indices const& remap, Object& object)
+    bool deleteRange(Orvan::String const& name, IndexList const& remap, Object& object)
     {
         auto const held = getRangeGeoPropIndices(object, name);
         bool const hasIndices = held && !held->empty();
         if (hasIndices && held->size < remap.size)
             return true;
-        Indices indices = hasIndices ? compacted(*held, remap) : Indices();
-        Indices dataRemap;
+        IndexList indices = hasIndices ? compacted(*held, remap) : IndexList();
+        IndexList dataRemap;
         for (Orvan::String const& data : getGeoPropNamesByTarget(object, name)) {
             if (!getDataGeoProperty(object, data))
                 continue;
@@ -127,7 +127,7 @@ namespace Plain {
         return true;
     }
 
-    bool deleteComponents(Indices const& remap, Orvan::String const& component, Object& object)
+    bool deleteComponents(IndexList const& remap, Orvan::String const& component, Object& object)
     {
         unsigned int const count = getElementCount(object, component);
         if (count != remap.size || count == 0)
@@ -144,23 +144,23 @@ namespace Plain {
 
     bool deleteFaces(Flags const& deleted, Object& mesh)
     {
-        Indices const offsets = *dataOf<unsigned int>(mesh, sFaceOffset),
-                      corners = *dataOf<unsigned int>(mesh, sFaceVertex);
+        IndexList const offsets = *dataOf<unsigned int>(mesh, sFaceOffset),
+                        corners = *dataOf<unsigned int>(mesh, sFaceVertex);
         Flags pointDeleted(getElementCount(mesh, sPointComp), true), cornerDeleted(corners.size, true);
         for (unsigned int face = 0; face != deleted.size; ++face)
             for (unsigned int corner = offsets[face]; !deleted[face] && corner < offsets[face + 1]; ++corner)
                 cornerDeleted[corner] = pointDeleted[corners[corner]] = false;
-        Indices const pointRemap = mapping(pointDeleted);
-        Indices cornerRemap = mapping(cornerDeleted);
+        IndexList const pointRemap = mapping(pointDeleted);
+        IndexList cornerRemap = mapping(cornerDeleted);
         if (!deleteComponents(pointRemap, sPointComp, mesh) || !deleteComponents(cornerRemap, sFaceVertexComp, mesh))
             return false;
-        Indices faceVertex = *dataOf<unsigned int>(mesh, sFaceVertex);
+        IndexList faceVertex = *dataOf<unsigned int>(mesh, sFaceVertex);
         for (unsigned int& entry : faceVertex)
             entry = pointRemap[entry];
         replaceArray(sFaceVertex, sData, faceVertex, mesh);
         if (!deleteComponents(mapping(deleted), sFaceComp, mesh))
             return false;
-        Indices faceOffset = *dataOf<unsigned int>(mesh, sFaceOffset);
+        IndexList faceOffset = *dataOf<unsigned int>(mesh, sFaceOffset);
         cornerRemap.append(getElementCount(mesh, sFaceVertexComp)); // for a face without corners at the end
         for (unsigned int& entry : faceOffset)
             entry = cornerRemap[entry];
@@ -213,11 +213,11 @@ Orvan::MutablePtr<Object> randomCase(Random& random, Edit& edit, Edit& plainEdit
         return cloud;
     }
     Flags const flags = randomFlags(size, random);
-    Indices const remap = Plain::mapping(flags);
+    IndexList const remap = Plain::mapping(flags);
     edit = [=](Object& o) { return deleteComponents(remap, sPointComp, o); };
     plainEdit = [=](Object& o) { return Plain::deleteComponents(remap, sPointComp, o); };
     if (kind == 2) {
-        Indices indices{static_cast<unsigned int>(size)}; // out of range, the others twice
+        IndexList indices{static_cast<unsigned int>(size)}; // out of range, the others twice
         for (unsigned int i = 0; i != 2 * size; ++i)
             if (flags[i / 2])
                 indices.append(i / 2);
@@ -259,7 +259,7 @@ TEST(Editing, EditsInPlaceAndReadsArgumentsStoredInTheObject)
             getRangeGeoPropIndices(*own, "range")->data, dataOf<int>(*own, "of range")->data};
     };
     auto const before = places();
-    ASSERT_TRUE(deletePointsInPointCloud(Indices{0}, *own, nullptr));
+    ASSERT_TRUE(deletePointsInPointCloud(IndexList{0}, *own, nullptr));
     EXPECT_EQ(places(), before);
 
     auto const cloud = makePointCloud({{0, 0, 0}, {1, 0, 0}});
@@ -269,9 +269,9 @@ TEST(Editing, EditsInPlaceAndReadsArgumentsStoredInTheObject)
     ASSERT_TRUE(addPointsToPointCloud(positions, "isNew", *cloud, nullptr));
     EXPECT_EQ(*dataOf<float3>(*cloud, sPointPosition), (Positions{{0, 0, 0}, {1, 0, 0}, {0, 0, 0}, {1, 0, 0}}));
     EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->capacity, 4u) << "doubles";
-    Indices const& chosen = *dataOf<unsigned int>(*cloud, "chosen");
+    IndexList const& chosen = *dataOf<unsigned int>(*cloud, "chosen");
     ASSERT_TRUE(deletePointsInPointCloud(chosen, *cloud, nullptr));
-    EXPECT_EQ(*dataOf<unsigned int>(*cloud, "chosen"), (Indices{0, 1}));
+    EXPECT_EQ(*dataOf<unsigned int>(*cloud, "chosen"), (IndexList{0, 1}));
 
     auto const mesh = MeshBuilder::tetrahedron().build();
     addDataProperty<bool>("deleted", sFaceComp, {true, false, true, true}, *mesh);
@@ -294,7 +294,7 @@ TEST(Editing, RefusesBeforeTheFirstChange)
     auto const mesh = MeshBuilder::tetrahedron().build(), shortOffsets = MeshBuilder::tetrahedron().build();
     addDataProperty<unsigned int>(sFaceOffset, sFaceComp, {0, 3, 6, 9}, *shortOffsets);
     auto const shortCorners = deepCopy(*mesh), otherOffsets = deepCopy(*mesh);
-    addDataProperty<unsigned int>(sFaceVertex, sFaceVertexComp, Indices(11), *shortCorners);
+    addDataProperty<unsigned int>(sFaceVertex, sFaceVertexComp, IndexList(11), *shortCorners);
     addDataProperty<unsigned int>(sFaceOffset, sPointComp, {0, 3, 6, 9, 12}, *otherOffsets);
     auto const noPoints = makeMesh({}, {}, {});
     Positions one(1), tooMany(1);
@@ -302,7 +302,7 @@ TEST(Editing, RefusesBeforeTheFirstChange)
     auto const add = [](Positions const& p) {
         return [&](Object& o) { return addPointsToPointCloud(p, "t", o, nullptr); };
     };
-    Indices const none, first{0};
+    IndexList const none, first{0};
     auto const deletePoint = [&](Object& o) { return deletePointsInPointCloud(first, o, nullptr); };
     auto const deleteNone = [](Object& o) { return deleteFaces(Flags(getElementCount(o, sFaceComp)), o); };
     std::map<std::string, std::pair<Object*, std::function<bool(Object&)>>> const cases{
@@ -337,12 +337,12 @@ TEST(Editing, GivesResultsWorkedOutByHand)
     addRangeProperty("seam", sPointComp, {3, kInvalidIndex, 1}, *cloud);
     addDataProperty<int>("of seam", "seam", {5, 6, 7, 8}, *cloud);
     ASSERT_TRUE(deletePointsInPointCloud(Orvan::Array<long long>{-1, 3, 1LL << 40, -(1LL << 40)}, *cloud, nullptr));
-    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{1, kInvalidIndex, 0}));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (IndexList{1, kInvalidIndex, 0}));
     EXPECT_EQ(*dataOf<int>(*cloud, "of seam"), (Orvan::Array<int>{6, 8}))
         << "unused values are removed even if no point is";
     ASSERT_TRUE(deletePointsInPointCloud(Orvan::Array<long long>{0, 0, 2}, *cloud, nullptr));
-    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (Indices{kInvalidIndex}));
-    EXPECT_EQ(computeDeletedComponentMapping({false, true, false}), (Indices{0, kDeletedElement, 1}));
+    EXPECT_EQ(*getRangeGeoPropIndices(*cloud, "seam"), (IndexList{kInvalidIndex}));
+    EXPECT_EQ(computeDeletedComponentMapping({false, true, false}), (IndexList{0, kDeletedElement, 1}));
 
     auto const lacking = makePointCloud({{0, 0, 0}, {1, 0, 0}, {2, 0, 0}});
     addDataProperty<float3>(sPointPosition, sPointComp, {{5, 5, 5}}, *lacking, float3{7, 7, 7});
@@ -360,13 +360,13 @@ TEST(Editing, StaysInsideArraysWhateverTheyHold)
         auto const mesh = randomMesh(1 + random.below(9), 1 + random.below(9), false, random);
         std::size_t const faceCount = getElementCount(*mesh, sFaceComp);
         for (char const* const name : {sFaceVertex, sFaceOffset}) {
-            Indices values = *dataOf<unsigned int>(*mesh, name);
+            IndexList values = *dataOf<unsigned int>(*mesh, name);
             for (unsigned int& value : values)
                 value = random.below(3) == 0 ? 0u - random.below(4) : random.below(3) == 0 ? random.below(40) : value;
             addDataProperty<unsigned int>(name, getGeoPropTargetName(*mesh, name), values, *mesh);
         }
         deleteFaces(randomFlags(faceCount, random), *mesh);
-        Indices remap(getElementCount(*mesh, sPointComp), Orvan::kUninitialized);
+        IndexList remap(getElementCount(*mesh, sPointComp), Orvan::kUninitialized);
         for (unsigned int& entry : remap)
             entry = random.below(2) == 0 ? 0u - random.below(4) : random.below(40);
         deleteComponents(remap, sPointComp, *mesh);

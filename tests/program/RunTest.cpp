@@ -182,6 +182,7 @@ TEST_F(Run, RefusesRecipesAndSaysWhere)
         {"{\"modeling\": 1,}", 3, "recipe.json cannot be read: parse error at line 1, column 16"},
         {"{\"modeling\": 1e999}", 3, "recipe.json cannot be read: number overflow"},
         {step("{\"do\": \"smooth\", \"do\": \"merge\"}"), 3, "the key \"do\" occurs twice"},
+        {std::string(1000, '[') + std::string(1000, ']'), 3, "its values are nested too deeply"},
         {"[]", 2, "recipe.json: it is no recipe of version 1"},
         {R"({"modeling": 2, "steps": []})", 2, "it is no recipe of version 1"},
         {R"({"modeling": 1, "steps": []})", 2, "\"steps\" has to be a list of at least one step"},

@@ -58,7 +58,7 @@ namespace {
         return files;
     }
 
-    TEST(BrokenFiles, cutOffAnywhereAreReadOrRefused)
+    TEST(BrokenFiles, CutOffAnywhereAreReadOrRefused)
     {
         TemporaryFolder const folder;
         for (auto const& [ending, content] : wholeFiles())
@@ -70,7 +70,7 @@ namespace {
             }
     }
 
-    TEST(BrokenFiles, withOtherBytesAreReadOrRefused)
+    TEST(BrokenFiles, WithOtherBytesAreReadOrRefused)
     {
         constexpr char kBytes[] = {'\0', '\n', ' ', ',', ';', '-', '0', '9', '.', 'e', '\\', '/', '#', '\x7f', '\xff'};
         Random random(1);

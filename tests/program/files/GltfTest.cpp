@@ -66,7 +66,7 @@ namespace {
         return result;
     }
 
-    TEST(ReadGltf, readsAllModesAndIndexTypes)
+    TEST(ReadGltf, ReadsAllModesAndIndexTypes)
     {
         struct Case {
             Gltf file;
@@ -106,7 +106,7 @@ namespace {
         }
     }
 
-    TEST(ReadGltf, convertsTypesAndFollowsStridesAndSparseValues)
+    TEST(ReadGltf, ConvertsTypesAndFollowsStridesAndSparseValues)
     {
         // Interleaved from byte 0 of the view: two normalized shorts, four bytes; stride 8.
         std::string more;
@@ -143,7 +143,7 @@ namespace {
             ElementsAre("attributes are left out: 2 (\"JOINTS_0\", \"WEIGHTS_0\")", "2 materials are left out"));
     }
 
-    TEST(ReadGltf, placesMeshesByTheNodesOfTheScene)
+    TEST(ReadGltf, PlacesMeshesByTheNodesOfTheScene)
     {
         // Node 1 mirrors and node 2 moves its child: (x, y, z) becomes (10 - 2x, -z, y) below both.
         std::string const nodes =
@@ -164,10 +164,10 @@ namespace {
         // (0.6, 0, 0.8) becomes (-0.6 / 2, -0.8, 0), normalized.
         float const length = std::sqrt(0.09f + 0.64f);
         float const expected[] = {-0.3f / length, -0.8f / length, 0, 0, 0, 1, 0, -1, 0, 0, 0, 0};
-        for (int i = 0; i < 12; ++i)
+        for (std::size_t i = 0; i < 12; ++i)
             EXPECT_FLOAT_EQ(normal[i], expected[i]) << i;
         float const rotated[] = {0, 0, 0, 0, 2, 0, -1, 2, 0, -1, 0, 0};
-        for (int i = 0; i < 12; ++i)
+        for (std::size_t i = 0; i < 12; ++i)
             EXPECT_NEAR(positions[12 + i], rotated[i], 1e-6) << i;
 
         gltf.rest = R"(,"nodes":[{"mesh":0,"translation":[10000000.3,0,0]}])";
@@ -179,7 +179,7 @@ namespace {
         EXPECT_THAT(empty.notes, ElementsAre("1 meshes outside the scene are left out"));
     }
 
-    TEST(ReadGltf, joinsVerticesAtEqualPositionsOfOneMesh)
+    TEST(ReadGltf, JoinsVerticesAtEqualPositionsOfOneMesh)
     {
         // Two triangles without common vertices; the vertices of the diagonal have equal "same", but not "uv".
         std::string const more = bytes(0.0f, 0.0f, 0.0f, 1.0f, 0.0f, 0.0f, 1.0f, 1.0f, 0.0f, 1.0f, 1.0f, 0.0f, 0.0f,
@@ -198,7 +198,7 @@ namespace {
         EXPECT_THAT(file.notes, ElementsAre(HasSubstr("4 vertices become one point")));
     }
 
-    TEST(ReadGltf, sharesVerticesOfPrimitivesAndFillsMissingValues)
+    TEST(ReadGltf, SharesVerticesOfPrimitivesAndFillsMissingValues)
     {
         std::string const heat = bytes(1.0f, 2.0f, 3.0f, 4.0f);
         Gltf const gltf{primitive(4, R"(,"indices":1)") + "," + primitive(4, R"(,"indices":2)") + ","
@@ -217,7 +217,7 @@ namespace {
                 "1 primitives without positions are left out"));
     }
 
-    TEST(ReadGltf, readsTextWithDataInsideOrBeside)
+    TEST(ReadGltf, ReadsTextWithDataInsideOrBeside)
     {
         TemporaryFolder const folder;
         Gltf const gltf{primitive(6, "")};
@@ -246,7 +246,7 @@ namespace {
         }
     }
 
-    TEST(ReadGltf, refusesWhatIsMalformedOrNotSupported)
+    TEST(ReadGltf, RefusesWhatIsMalformedOrNotSupported)
     {
         auto const with = [](std::string const& accessors, std::string const& views = {},
                               std::string const& rest = {}) {
@@ -265,8 +265,12 @@ namespace {
             {whole.substr(0, 200), "the file is cut off: it declares"},
             {versionOne, "version 1 of the format"},
             {longChunk, "chunk at byte 12: it declares"},
-            {glbOf("{", ""), "JSON: it is malformed"},
+            {glbOf("{", ""), "JSON: it is malformed at byte 5"},
             {glbOf("[]", ""), "JSON: it is not an object"},
+            {glbOf(R"({"asset":{"version":"2.0"},"nodes":[{"children":[1]},{"children":[0]}]})", ""),
+                "every node is the child of a node"},
+            {glbOf(R"({"asset":{"version":"2.0"},"nodes":[{"matrix":[1,0,0,0,0,1,0,0,0,0,1,0,0,0,0,2]}]})", ""),
+                "node 0: the last row of matrix is not 0 0 0 1"},
             {glbOf(R"({"asset":{"version":"1.0"}})", ""), "asset.version is \"1.0\""},
             {withRest(R"(,"extensionsRequired":["KHR_draco_mesh_compression"])"), "the geometry is compressed"},
             {withRest(R"(,"extensionsRequired":["X_y"])"), "requires the extension \"X_y\""},
@@ -323,7 +327,7 @@ namespace {
             {{0, 0, 0}, {1, 0, 0}, {1, 1, 0}, {-0.1f, 1, 1e-20f}, {5, 5, 123456.789f}}, {0, 1, 2, 0, 2, 3}, {0, 3, 6});
     }
 
-    TEST(WriteGltf, preservesGeometryAndAttributesOfPointsBitwise)
+    TEST(WriteGltf, PreservesGeometryAndAttributesOfPointsBitwise)
     {
         OwnedObject const mesh = twoTriangles();
         addDataProperty<float3>("normal", sPointComp, Orvan::Array<float3>(5, {0, 0.6f, 0.8f}), *mesh);
@@ -352,7 +356,7 @@ namespace {
         EXPECT_TRUE(sameContents(*writtenGlb(*large).again.object, *large));
     }
 
-    TEST(WriteGltf, splitsPointsWhoseCornersDiffer)
+    TEST(WriteGltf, SplitsPointsWhoseCornersDiffer)
     {
         OwnedObject const mesh = twoTriangles();
         addDataProperty<float2>("uv", sFaceVertexComp, {{0, 0}, {1, 0}, {1, 1}, {0.5f, 0}, {1, 1}, {0, 1}}, *mesh);
@@ -364,7 +368,7 @@ namespace {
         EXPECT_TRUE(sameContents(*sorted(*file.again.object), *sorted(*mesh)));
     }
 
-    TEST(WriteGltf, tellsWhatItConvertsAndLeavesOut)
+    TEST(WriteGltf, TellsWhatItConvertsAndLeavesOut)
     {
         OwnedObject const mesh = twoTriangles();
         addDataProperty<int>("count", sPointComp, {1, 2, 3, 4, -16777216}, *mesh);

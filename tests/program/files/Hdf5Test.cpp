@@ -45,7 +45,7 @@ namespace {
         return readHdf5Objects(folder / "a.h5", Hdf5Selection::Only).front().object;
     }
 
-    TEST(Hdf5, keepsRandomObjectsToTheBit)
+    TEST(Hdf5, KeepsRandomObjectsToTheBit)
     {
         for (unsigned int seed = 0; seed != 20; ++seed) {
             SCOPED_TRACE(seed);
@@ -55,9 +55,9 @@ namespace {
         }
     }
 
-    TEST(Hdf5, compressesArraysOfAllTypes)
+    TEST(Hdf5, CompressesArraysOfAllTypes)
     {
-        for (std::size_t const count : {200, 20000}) { // less than a chunk of some types, and several chunks
+        for (unsigned int const count : {200u, 20'000u}) { // less than a chunk of some types, and several chunks
             Random random(1);
             auto points = makePointCloud(randomPositions(count, random));
             addAllTypes(sPointComp, random, *points);
@@ -66,7 +66,7 @@ namespace {
         }
     }
 
-    TEST(Hdf5, keepsWhatIsShared)
+    TEST(Hdf5, KeepsWhatIsShared)
     {
         auto const array = Orvan::makePtr<Orvan::Array<double>>(std::uint64_t{10000}, 0.5);
         auto inner = Tessara::createObject();
@@ -87,7 +87,7 @@ namespace {
         EXPECT_TRUE(*at(*first, "values").get<Doubles>() == *at(*read, "c").get<Doubles>());
     }
 
-    TEST(Hdf5, refusesWhatFilesCannotHold)
+    TEST(Hdf5, RefusesWhatFilesCannotHold)
     {
         TemporaryFolder const folder;
         auto const refusal = [&](Orvan::MutablePtr<Object> object) -> std::string {
@@ -111,7 +111,7 @@ namespace {
         EXPECT_THAT(refusal(std::move(outer)), testing::HasSubstr("levels deep"));
     }
 
-    TEST(Hdf5, failsOnAFullDiskWithoutATrace)
+    TEST(Hdf5, FailsOnAFullDiskWithoutATrace)
     {
         TemporaryFolder const folder;
         rlimit limit{};
@@ -140,7 +140,7 @@ namespace {
         return {};
     }
 
-    TEST(Hdf5, holdsSeveralObjects)
+    TEST(Hdf5, HoldsSeveralObjects)
     {
         TemporaryFolder const folder;
         auto const mesh = makeMesh({{0, 0, 0}, {1, 0, 0}, {1, 1, 0}}, {0, 1, 2}, {0, 3});
@@ -162,7 +162,7 @@ namespace {
         EXPECT_TRUE(sameContents(*readGeometryFile(folder / "a.h5").object, *mesh));
     }
 
-    TEST(Hdf5, treatsGeometryAsOtherFormatsDo)
+    TEST(Hdf5, TreatsGeometryAsOtherFormatsDo)
     {
         TemporaryFolder const folder;
         auto const store = [&](Orvan::Ptr<Object> const& object) {
@@ -182,7 +182,7 @@ namespace {
         EXPECT_EQ(getElementCount(*readGeometryFile(folder / "a.h5", {.isLenient = true}).object, sFaceComp), 1u);
     }
 
-    TEST(Hdf5, asksBeforeItInflates)
+    TEST(Hdf5, AsksBeforeItInflates)
     {
         TemporaryFolder const folder;
         constexpr std::uint64_t kBytes = 50'000'000;
@@ -277,7 +277,7 @@ namespace {
             "/object/flags: element 1 is 2, neither true nor false"},
     };
 
-    TEST(Hdf5, namesTheFault)
+    TEST(Hdf5, NamesTheFault)
     {
         auto object = Tessara::createObject();
         object->setProperty(
@@ -312,11 +312,11 @@ namespace {
         }
     }
 
-    TEST(Hdf5, readsOrRefusesBrokenFiles)
+    TEST(Hdf5, ReadsOrRefusesBrokenFiles)
     {
         TemporaryFolder const folder;
         std::filesystem::path const file = folder / "a.h5";
-        for (unsigned int const compression : {0, 1}) {
+        for (unsigned int const compression : {0u, 1u}) {
             Random random(compression);
             auto points = makePointCloud(randomPositions(compression == 0 ? 3 : 400, random));
             addAllTypes(sPointComp, random, *points);

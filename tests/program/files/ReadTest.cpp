@@ -7,7 +7,7 @@ namespace {
     using testing::AllOf, testing::ElementsAre, testing::HasSubstr, testing::IsEmpty, testing::StartsWith;
     using Indices = std::vector<unsigned int>;
 
-    TEST(ReadGeometryFile, acceptsWhatFormatsAllow)
+    TEST(ReadGeometryFile, AcceptsWhatFormatsAllow)
     {
         struct Case {
             char const* extension;
@@ -108,7 +108,7 @@ namespace {
         }
     }
 
-    TEST(ReadGeometryFile, refusesMalformedFiles)
+    TEST(ReadGeometryFile, RefusesMalformedFiles)
     {
         struct Case {
             char const* extension;
@@ -189,7 +189,7 @@ namespace {
         EXPECT_THROW(readGeometryFile(folder / "folder.obj"), FileError);
     }
 
-    TEST(ReadXyz, findsColumnsByHeadingsOrValues)
+    TEST(ReadXyz, FindsColumnsByHeadingsOrValues)
     {
         struct Case {
             std::string content;
@@ -238,7 +238,7 @@ namespace {
             std::vector<double>{123456789.125});
     }
 
-    TEST(ReadGeometryFile, leavesOutBrokenElementsIfLenient)
+    TEST(ReadGeometryFile, LeavesOutBrokenElementsIfLenient)
     {
         struct Case {
             char const* extension;
@@ -294,7 +294,7 @@ namespace {
         EXPECT_THROW(readContent(".obj", "v nan 0 0\n", {.isLenient = true}), FileError);
     }
 
-    TEST(ReadGeometryFile, subtractsACenterInDoublePrecision)
+    TEST(ReadGeometryFile, SubtractsACenterInDoublePrecision)
     {
         using Tessara::Math::double3;
         double3 const center{500000, -4100000, 0};
@@ -325,7 +325,7 @@ namespace {
     }
 
     /// The float nearest to a decimal number, even if the nearest double is halfway between two floats.
-    TEST(ReadGeometryFile, roundsDecimalsOnce)
+    TEST(ReadGeometryFile, RoundsDecimalsOnce)
     {
         EXPECT_EQ(valuesOf<float3>(*readContent(".obj",
                                        "v 1.000000059604644775390625000001 1.00000005960464477539062499999 "
@@ -346,7 +346,7 @@ namespace {
         return names;
     }
 
-    TEST(ReadObj, keepsTheNamesOfFaces)
+    TEST(ReadObj, KeepsTheNamesOfFaces)
     {
         std::string const triangle = "v 0 0 0\nv 1 0 0\nv 1 1 0\nf 1 2 3\n";
         std::string const content = "mtllib a.mtl\nv 0 0 0\nv 1 0 0\nv 1 1 0\nv nan 1 0\nf 1 2 3\no one\ng b  c # d\n"
@@ -367,7 +367,16 @@ namespace {
         EXPECT_FALSE(unnamed.object->hasProperty("material") || unnamed.object->hasProperty("smoothing_group"));
     }
 
-    TEST(ReadObj, keepsPointsSharedAcrossSeamsAndValuesOfStrandPoints)
+    TEST(ReadObj, TakesStatementsOnJoinedLinesForNames)
+    {
+        constexpr char kTriangle[] = "v 0 0 0\nv 1 0 0\nv 0 1 0\nvt 0 0\n";
+        for (char const* const keyword : {"g", "usemtl", "mtllib", "s", "o"})
+            EXPECT_THAT(refusalOf(".obj", kTriangle + std::string(keyword) + " \\\nvt\nf 1/1 2/1 3/2\n"),
+                HasSubstr("the texture coordinate 2 does not exist: the file has 1"))
+                << keyword;
+    }
+
+    TEST(ReadObj, KeepsPointsSharedAcrossSeamsAndValuesOfStrandPoints)
     {
         GeometryFile const file = readContent(".obj",
             "v 0 0 0 1 0 0\nv 1 0 0\nv 1 1 0\nv 0 1 0 0 0 1\nvt 0 0\nvt 1 0.5\nvt 0.25 1 0\nvn 0 0 1\n"
@@ -414,7 +423,7 @@ namespace {
         return content;
     }
 
-    TEST(ReadPly, givesTheSameResultInAllEncodings)
+    TEST(ReadPly, GivesTheSameResultInAllEncodings)
     {
         std::string const text = "ply\nformat ascii 1.0\n" + kPlyProperties
             + "0.5 0 0 0 0.5 1 0 1 255 0 0 -0.25 2 0 1 4000000000\n"
@@ -452,7 +461,7 @@ namespace {
             ElementsAre(HasSubstr("\"neighbors\""), HasSubstr("\"three\"")));
     }
 
-    TEST(ReadOff, distinguishesBytesFromFractions)
+    TEST(ReadOff, DistinguishesBytesFromFractions)
     {
         auto const colored = [](std::string const& colors) {
             return readContent(".off",
@@ -471,7 +480,7 @@ namespace {
             valuesOf<float4>(*fractions, "color"), (std::vector<float4>{{1, 0, 0, 0.5f}, {1, 1, 1, 1}, {0, 0, 1, 1}}));
     }
 
-    TEST(ReadStl, isBinaryIfItsLengthMatches)
+    TEST(ReadStl, IsBinaryIfItsLengthMatches)
     {
         std::string content =
             "solid, but not as a text is" + std::string(53, ' ') + bytesOf(std::endian::little, std::uint32_t{2});

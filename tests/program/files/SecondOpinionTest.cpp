@@ -49,7 +49,7 @@ namespace {
         EXPECT_EQ(corners, theirCorners);
     }
 
-    TEST(ReadObj, agreesWithTinyObjOnTheSamples)
+    TEST(ReadObj, AgreesWithTinyObjOnTheSamples)
     {
         int count = 0;
         for (auto const& entry : std::filesystem::directory_iterator(MODELING_SAMPLES_DIR)) {

@@ -93,7 +93,7 @@ namespace {
         return {};
     }
 
-    TEST(VdbFile, readsWhatOpenVdbWrites)
+    TEST(VdbFile, ReadsWhatOpenVdbWrites)
     {
         TemporaryFolder const folder;
         std::filesystem::path const file = folder / "a.vdb";
@@ -120,7 +120,7 @@ namespace {
             }
     }
 
-    TEST(VdbFile, isReadByOpenVdb)
+    TEST(VdbFile, IsReadByOpenVdb)
     {
         TemporaryFolder const folder;
         write(folder / "a.vdb", {makeVariedGrid("guide")});
@@ -142,7 +142,7 @@ namespace {
         EXPECT_EQ(folder.entryCount(), 3); // no temporary file is left
     }
 
-    TEST(VdbFile, saysWhyAGridIsRefused)
+    TEST(VdbFile, SaysWhyAGridIsRefused)
     {
         TemporaryFolder const folder;
         std::filesystem::path const file = folder / "a.vdb";
@@ -182,7 +182,7 @@ namespace {
         EXPECT_THAT(refusalOfGrid(folder / "missing.vdb"), HasSubstr("no such file"));
     }
 
-    TEST(VdbFile, isRefusedIfItIsCutOff)
+    TEST(VdbFile, IsRefusedIfItIsCutOff)
     {
         TemporaryFolder const folder;
         write(folder / "a.vdb", {makeVariedGrid("a")});
@@ -193,7 +193,7 @@ namespace {
         }
     }
 
-    TEST(VdbFile, withOtherBytesIsReadOrRefused)
+    TEST(VdbFile, WithOtherBytesIsReadOrRefused)
     {
         constexpr int kFilesEach = 600;
         TemporaryFolder const folder;

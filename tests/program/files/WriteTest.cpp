@@ -50,7 +50,7 @@ namespace {
         return {contentOf(file), std::move(notes), extension == ".vtp" ? nullptr : readGeometryFile(file).object};
     }
 
-    TEST(WritePly, preservesPropertiesOfAllTypes)
+    TEST(WritePly, PreservesPropertiesOfAllTypes)
     {
         OwnedObject const mesh = twoFaces();
         Random random(1);
@@ -75,7 +75,7 @@ namespace {
         EXPECT_TRUE(sameContents(*sorted(*file.object), *sorted(*mesh)));
     }
 
-    TEST(WritePly, preservesTheNamesOfColumns)
+    TEST(WritePly, PreservesTheNamesOfColumns)
     {
         for (std::string const columns : {"s t", "u v", "texture_u texture_v"}) {
             std::string header = "element vertex 1\nproperty float x\nproperty float y\nproperty float z\n"
@@ -96,7 +96,7 @@ namespace {
         }
     }
 
-    TEST(WritePly, writesBoolsAsBytesAndLongFaces)
+    TEST(WritePly, WritesBoolsAsBytesAndLongFaces)
     {
         for (unsigned int const count : {127u, 200u, 300u}) { // lengths of two lists in bytes, of one, of none
             Orvan::Array<unsigned int> corners(count);
@@ -117,7 +117,7 @@ namespace {
         }
     }
 
-    TEST(WriteObj, preservesGeometryBitwise)
+    TEST(WriteObj, PreservesGeometryBitwise)
     {
         OwnedObject const mesh = twoFaces();
         addDataProperty<float2>("uv", sFaceVertexComp, someValues<float2>(7), *mesh);
@@ -132,7 +132,7 @@ namespace {
         EXPECT_TRUE(sameContents(*written(*cloud, ".obj").object, *cloud));
     }
 
-    TEST(WriteObj, sharesEqualCornerValuesAndWritesThoseOfPoints)
+    TEST(WriteObj, SharesEqualCornerValuesAndWritesThoseOfPoints)
     {
         OwnedObject const mesh = twoFaces();
         addDataProperty<double2>("uv", sFaceVertexComp, Orvan::Array<double2>(7, {0, 0.1}), *mesh);
@@ -153,7 +153,7 @@ namespace {
                 HasSubstr("f 1/1/1 2/1/2 3/1/3\nf 1/1/1 3/1/3 5/1/5 4/1/4\n")));
     }
 
-    TEST(WriteObj, preservesTheNamesOfFaces)
+    TEST(WriteObj, PreservesTheNamesOfFaces)
     {
         std::string const faces = "mtllib a b.mtl\nmtllib c.mtl\nv 0 0 0\nv 1 0 0\nv 1 1 0\no one two\nf 1 2 3\ng x y\n"
                                   "usemtl red\ns 4294967295\nf 1 2 3\no two\nusemtl blue\nf 1 3 2\nusemtl red\ns 0\n"
@@ -179,7 +179,7 @@ namespace {
             AllOf(testing::StartsWith("v 0"), HasSubstr("\nusemtl _b_v 1_\nf 1 2 3\n")));
     }
 
-    TEST(WriteStl, preservesTriangles)
+    TEST(WriteStl, PreservesTriangles)
     {
         OwnedObject const mesh = triangle();
         addDataProperty<unsigned short>("attribute", sFaceComp, {7}, *mesh);
@@ -224,7 +224,7 @@ namespace {
         return {reinterpret_cast<char const*>(array->data), array->size * sizeof(T)};
     }
 
-    TEST(WriteVtp, containsNamedArraysOfPointsAndCells)
+    TEST(WriteVtp, ContainsNamedArraysOfPointsAndCells)
     {
         using Arrays = std::map<std::string, std::string>;
         auto const longs = [](auto... numbers) { return bytesOf(std::endian::little, std::int64_t{numbers}...); };
@@ -263,7 +263,7 @@ namespace {
                 {"<Verts> connectivity Int64x1", longs(0, 1)}, {"<Verts> offsets Int64x1", longs(1, 2)}}));
     }
 
-    TEST(WriteGeometryFile, refusesWhatAFormatCannotHold)
+    TEST(WriteGeometryFile, RefusesWhatAFormatCannotHold)
     {
         struct Case {
             OwnedObject object;
@@ -296,7 +296,7 @@ namespace {
         EXPECT_FALSE(isWritableFormat("x.off"));
     }
 
-    TEST(WriteGeometryFile, leavesTheOldFileUnchangedIfTheDiskIsFull)
+    TEST(WriteGeometryFile, LeavesTheOldFileUnchangedIfTheDiskIsFull)
     {
         TemporaryFolder const folder;
         EXPECT_THROW(writeGeometryFile(*triangle(), folder / "none/a.obj"), FileError);
@@ -319,7 +319,7 @@ namespace {
         EXPECT_EQ(folder.entryCount(), 2);
     }
 
-    TEST(WriteGeometryFile, replacesTheTargetOfALinkAndKeepsItsPermissions)
+    TEST(WriteGeometryFile, ReplacesTheTargetOfALinkAndKeepsItsPermissions)
     {
         using std::filesystem::perms;
         TemporaryFolder const folder;
