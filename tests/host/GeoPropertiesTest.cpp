@@ -5,7 +5,7 @@
 
 using namespace Modeling;
 using namespace TestSupport;
-using Indices = IndexArray;
+using IndexList = IndexArray;
 
 namespace {
 
@@ -28,7 +28,7 @@ TEST(GeoProperties, AreReadAndWrittenOnlyIfTheyHoldTheType)
     EXPECT_FALSE(readGeoPropData<int>(*cloud, "values"));
     for (char const* const key : {"absent", "text", "null", sPointComp}) {
         EXPECT_FALSE(readGeoPropData<unsigned int>(*cloud, key)) << key;
-        EXPECT_FALSE(writeGeoPropData(key, Orvan::makePtr<Indices>(), *cloud)) << key;
+        EXPECT_FALSE(writeGeoPropData(key, Orvan::makePtr<IndexList>(), *cloud)) << key;
     }
     EXPECT_FALSE(editGeoPropData<int>("values", *cloud, [](Orvan::Array<int>&) { FAIL(); }));
     EXPECT_TRUE(sameContents(*cloud, *before));
@@ -37,17 +37,17 @@ TEST(GeoProperties, AreReadAndWrittenOnlyIfTheyHoldTheType)
 TEST(GeoProperties, AreEditedInPlaceUnlessTheArrayIsShared)
 {
     struct Unexpected { };
-    auto const increment = [](Indices& values) { ++values[0]; };
+    auto const increment = [](IndexList& values) { ++values[0]; };
     auto const cloud = makeCloud();
-    Indices const* const array = readGeoPropData<unsigned int>(*cloud, "values").get();
+    IndexList const* const array = readGeoPropData<unsigned int>(*cloud, "values").get();
     EXPECT_TRUE(editGeoPropData<unsigned int>("values", *cloud, increment));
     EXPECT_EQ(readGeoPropData<unsigned int>(*cloud, "values").get(), array);
 
     auto const held = readGeoPropData<unsigned int>(*cloud, "values");
     EXPECT_TRUE(editGeoPropData<unsigned int>("values", *cloud, increment));
-    EXPECT_THROW(editGeoPropData<unsigned int>("values", *cloud, [](Indices&) { throw Unexpected(); }), Unexpected);
-    EXPECT_EQ(*readGeoPropData<unsigned int>(*cloud, "values"), (Indices{9, 8, 9}));
-    EXPECT_EQ(*held, (Indices{8, 8, 9}));
+    EXPECT_THROW(editGeoPropData<unsigned int>("values", *cloud, [](IndexList&) { throw Unexpected(); }), Unexpected);
+    EXPECT_EQ(*readGeoPropData<unsigned int>(*cloud, "values"), (IndexList{9, 8, 9}));
+    EXPECT_EQ(*held, (IndexList{8, 8, 9}));
 }
 
 TEST(GeoProperties, AreAllWrittenOrNoneIfMemoryRunsOut)
@@ -57,8 +57,8 @@ TEST(GeoProperties, AreAllWrittenOrNoneIfMemoryRunsOut)
         writes.setElementCount(sPointComp, 1);
         writes.setElementCount("absent", 1);
         writes.writeGeoPropData(sPointPosition, Orvan::makePtr<Orvan::Array<float3>>(1u));
-        writes.writeGeoPropData("values", Orvan::makePtr<Indices>(1u));
-        writes.writeGeoPropData("absent", Orvan::makePtr<Indices>(1u));
+        writes.writeGeoPropData("values", Orvan::makePtr<IndexList>(1u));
+        writes.writeGeoPropData("absent", Orvan::makePtr<IndexList>(1u));
         writes.setProperty("", 0);
         writes.setProperty("new", 1);
         writes.setProperty("new and too long for the text itself", 2);
@@ -67,7 +67,7 @@ TEST(GeoProperties, AreAllWrittenOrNoneIfMemoryRunsOut)
     auto const cloud = makeCloud();
     expectAllOrNothing(*cloud, prepare);
     expectAllOrNothing(*cloud, [](Object& object) {
-        editGeoPropData<unsigned int>("values", object, [](Indices& values) { values.append(1); });
+        editGeoPropData<unsigned int>("values", object, [](IndexList& values) { values.append(1); });
     });
     prepare(*cloud);
     EXPECT_EQ(getElementCount(*cloud, sPointComp), 1u);
