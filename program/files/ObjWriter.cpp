@@ -1,3 +1,4 @@
+#include "Scanner.h"
 #include "Welder.h"
 #include "Writers.h"
 
