@@ -1,5 +1,6 @@
 #include "Hdf5Process.h"
 
+#include "CodecModule.h"
 #include "Hdf5Codec.h"
 
 #include <array>
@@ -12,7 +13,6 @@
 #include <stdexcept>
 #include <utility>
 
-#include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
@@ -23,26 +23,10 @@ namespace ModelingProgram {
 
 namespace {
 
-    /// Remains loaded until the program ends.
-    struct Codec {
-        Codec()
-            : library(::dlopen(kHdf5Codec, RTLD_NOW | RTLD_LOCAL))
-        {
-            if (!library)
-                problem = ::dlerror();
-        }
-
-        void* library;
-        std::string problem;
-    };
-
-    template <class Function> Function* codec(char const* name)
+    template <class Function> Function* hdf5Function(char const* name)
     {
-        static Codec const codec;
-        void* const symbol = codec.library ? ::dlsym(codec.library, name) : nullptr;
-        if (!symbol)
-            throw FileError("HDF5 files can be neither read nor written: " + codec.problem);
-        return reinterpret_cast<Function*>(symbol);
+        static CodecModule const module(kHdf5Codec, "HDF5");
+        return module.function<Function>(name);
     }
 
     struct Descriptor {
@@ -204,7 +188,8 @@ std::string outlineOf(
 {
     // The outline repeats parts of the file: names, small values, and places.
     constexpr std::uint64_t kLeastBytes = 1 << 20;
-    auto* const describe = codec<decltype(modelingDescribeHdf5)>("modelingDescribeHdf5"); // before the process starts
+    auto* const describe =
+        hdf5Function<decltype(modelingDescribeHdf5)>("modelingDescribeHdf5"); // before the process starts
     std::optional<std::string> outline;
     try {
         outline = runInProcess(file, 2 * fileBytes + kLeastBytes, [&](int pipe) {
@@ -221,7 +206,7 @@ std::string outlineOf(
 
 void writeHdf5With(std::vector<Hdf5Object> const& objects, std::filesystem::path const& file, unsigned int compression)
 {
-    auto* const write = codec<decltype(modelingWriteHdf5)>("modelingWriteHdf5");
+    auto* const write = hdf5Function<decltype(modelingWriteHdf5)>("modelingWriteHdf5");
     constexpr std::uint64_t kMostBytes = 1 << 20;
     std::optional<std::string> const failure = runInProcess(file, kMostBytes, [&](int pipe) {
         try {

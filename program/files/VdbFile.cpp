@@ -1,35 +1,18 @@
 #include "VdbFile.h"
 
+#include "CodecModule.h"
 #include "OutputFile.h"
 #include "VdbCodec.h"
 #include "VdbOutline.h"
-
-#include <dlfcn.h>
 
 namespace ModelingProgram {
 
 namespace {
 
-    /// Remains loaded until the program ends.
-    struct Codec {
-        Codec()
-            : library(::dlopen(kVdbCodec, RTLD_NOW | RTLD_LOCAL))
-        {
-            if (!library)
-                problem = ::dlerror();
-        }
-
-        void* library;
-        std::string problem;
-    };
-
-    template <class Function> Function* codec(char const* name)
+    template <class Function> Function* vdbFunction(char const* name)
     {
-        static Codec const codec;
-        void* const symbol = codec.library ? ::dlsym(codec.library, name) : nullptr;
-        if (!symbol)
-            throw FileError("OpenVDB files can be neither read nor written: " + codec.problem);
-        return reinterpret_cast<Function*>(symbol);
+        static CodecModule const module(kVdbCodec, "OpenVDB");
+        return module.function<Function>(name);
     }
 
 }
@@ -61,7 +44,7 @@ SparseVolume readVdbGrid(
         throw FileError(file.string() + " cannot be read: there is no such float grid");
     onSize(checkVdbFloatGrid(input, entries[grid], entries));
     SparseVolume volume;
-    codec<decltype(modelingReadVdb)>("modelingReadVdb")(input, entries[grid], entries, volume);
+    vdbFunction<decltype(modelingReadVdb)>("modelingReadVdb")(input, entries[grid], entries, volume);
     return volume;
 }
 
@@ -70,7 +53,7 @@ void writeVdbFile(SparseVolume const& volume, std::filesystem::path const& file,
     OutputFile out(file, existing);
     std::string bytes;
     try {
-        codec<decltype(modelingWriteVdb)>("modelingWriteVdb")(volume, bytes);
+        vdbFunction<decltype(modelingWriteVdb)>("modelingWriteVdb")(volume, bytes);
     } catch (FileError const& error) {
         throw FileError(file.string() + " cannot be written: " + error.what());
     }
