@@ -166,6 +166,38 @@ TYPED_TEST(TileTree, FineTilesInsideCoarseOnesKeepTheirValues)
     }
 }
 
+// Whatever the order of the lists, a tile begins with the values of the coarser tile around it.
+TYPED_TEST(TileTree, TilesOfListsBeginWithTheNextCoarserValues)
+{
+    std::vector<Voxel> const coarse{{-1, 0, 0, 8}}, fine{{-1, 0, 0, 5}};
+    VoxelList const lists[] = {{TypeParam::kUnitDepth - 1, fine}, {TypeParam::kUnitDepth - 2, coarse}};
+    VolumeSource source = sourceOf<TypeParam>();
+    source.lists = lists;
+    auto const volume = buildVolume<TypeParam>(source);
+    int const ratio = TypeParam::kChildrenPerAxis;
+    EXPECT_EQ(valueAt(volume, {-1, 0, 0}, TypeParam::kUnitDepth - 1), 5);
+    EXPECT_EQ(valueAt(volume, {-ratio - 1, 0, 0}, TypeParam::kUnitDepth - 1), 8);
+}
+
+TYPED_TEST(TileTree, HalosOfWideBoxesEndWithTheNextBox)
+{
+    int const wide = static_cast<int>(TypeParam::tileWidth(0)); // each box is a tile of its own
+    std::vector<ConstantBox> const boxes{{{-wide, 0, 0}, {0, wide, wide}, 3}, {{0, 0, 0}, {wide, wide, wide}, 6}};
+    VolumeSource source = sourceOf<TypeParam>();
+    source.boxes = boxes;
+    auto const volume = buildVolume<TypeParam>(source);
+    auto const padded = makeHaloChannel(volume);
+    typename Container<TypeParam>::ConstTileAccessor cursor(volume.container);
+    constexpr int kSide = TypeParam::kSide;
+    for (int const begin : {-wide, -kSide, 0}) {
+        auto const halo =
+            padded.template tileData<kSide + 1>(cursor.tileImpl(begin, 0, 0, TypeParam::kUnitDepth).treeIndex());
+        ASSERT_TRUE(halo);
+        EXPECT_EQ(halo(kSide - 1, 0, 0), begin == 0 ? 6 : 3);
+        EXPECT_EQ(halo(kSide, 0, 0), begin == -wide ? 3 : 6);
+    }
+}
+
 TYPED_TEST(TileTree, CoarserTilesTakeTheValueOrTheMean)
 {
     constexpr int kSide = TypeParam::kSide, kChildren = TypeParam::kChildrenPerAxis;

@@ -123,3 +123,11 @@ TEST(PointInTriangle, LeavesNoGapAtASharedEdge)
         ASSERT_EQ(query(p, a, b, left).isInside(), query(p, left, b, a).isInside());
     }
 }
+
+// The coordinates are of such different magnitudes that all three areas at the point are rounded to 0.
+TEST(PointInTriangle, FindsNothingPastTheTipOfANeedle)
+{
+    float const past = std::nextafter(1.0f, 2.0f);
+    float2 const b{0x1.94fdfap-30f, 0x1.94fdf6p-30f}, c{0x1.3b22d8p-30f, 0x1.3b22d8p-30f};
+    EXPECT_EQ(query({past, past}, {1, 1}, b, c).place, kOutsideTriangle);
+}
