@@ -12,11 +12,6 @@ using Tessara::Math::float3;
 
 namespace {
 
-    double lossOf(double value)
-    {
-        return std::abs(value - static_cast<double>(static_cast<float>(value)));
-    }
-
     struct Box {
         double3 min{HUGE_VAL, HUGE_VAL, HUGE_VAL};
         double3 max{-HUGE_VAL, -HUGE_VAL, -HUGE_VAL};
@@ -102,6 +97,32 @@ void GeometryBuilder::expectPoints(std::uint64_t count)
     raw_.positions.reserve(count);
     if (movesPositions())
         widePositions_.reserve(count);
+}
+
+void GeometryBuilder::setPoints(Orvan::Array<float3> positions, Orvan::Array<double3> widePositions, double largestLoss)
+{
+    pointCount_ = positions.size;
+    raw_.positions = std::move(positions);
+    widePositions_ = std::move(widePositions);
+    largestLoss_ = largestLoss;
+}
+
+void GeometryBuilder::setFaces(Orvan::Array<unsigned int> faceVertex, Orvan::Array<unsigned int> faceOffset)
+{
+    raw_.faceVertex = std::move(faceVertex);
+    raw_.faceOffset = std::move(faceOffset);
+}
+
+void GeometryBuilder::append(GeometryBuilder&& next)
+{
+    if (raw_.faceVertex.size + next.raw_.faceVertex.size >= kMostElements)
+        scanner_.refuse("there are more face corners than a mesh can hold");
+    appendAll(next.raw_.positions, raw_.positions);
+    appendAll(next.widePositions_, widePositions_);
+    appendAll(next.raw_.faceVertex, raw_.faceVertex);
+    appendOffsets(next.raw_.faceOffset, raw_.faceOffset);
+    largestLoss_ = std::max(largestLoss_, next.largestLoss_);
+    hasUnusableElements_ = hasUnusableElements_ || next.hasUnusableElements_;
 }
 
 void GeometryBuilder::makeStrands(Orvan::Array<unsigned int> offsets, Orvan::Array<unsigned int> const& points)

@@ -30,6 +30,12 @@ inline constexpr char const* sColumnNames = "columnNames";
 /// What the name of a range of faces is extended by to name its data, the names of the faces.
 inline constexpr char const* kNameSuffix = "_name";
 
+/// What a coordinate loses in single precision.
+inline double lossOf(double value)
+{
+    return std::abs(value - static_cast<double>(static_cast<float>(value)));
+}
+
 /// A point near the middle of the positions with few digits, so that it can be read, typed and added back: its
 /// coordinates are multiples of a power of ten about as large as the box of the positions. `wide` has the same positions
 /// in double precision; those that are not finite in single precision do not count.
@@ -43,6 +49,23 @@ template <class T> Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan
     std::transform(indices.begin(), indices.end(), result.begin(),
         [&](unsigned int index) { return index == Tessara::Geometry::kInvalidIndex ? T{} : values[index]; });
     return result;
+}
+
+template <class T> void appendAll(Orvan::Array<T> const& added, Orvan::Array<T>& values)
+{
+    std::uint64_t const size = values.size;
+    values.resize(size + added.size, Orvan::kUninitialized);
+    std::copy(added.begin(), added.end(), values.begin() + size);
+}
+
+/// Appends the offsets of further runs of elements, which begin at 0, as they follow the runs before.
+inline void appendOffsets(Orvan::Array<unsigned int> const& added, Orvan::Array<unsigned int>& offsets)
+{
+    unsigned int const base = offsets[offsets.size - 1];
+    std::uint64_t const size = offsets.size;
+    offsets.resize(size + added.size - 1, Orvan::kUninitialized);
+    std::transform(
+        added.begin() + 1, added.end(), offsets.begin() + size, [=](unsigned int offset) { return base + offset; });
 }
 
 /// The memory for the values of a new property, to be filled in.
@@ -70,6 +93,8 @@ public:
     /// For counts that are known and checked against the size of the file. Corners may then refer to points that come
     /// later.
     void expectPoints(std::uint64_t count);
+    /// The same without room for them, if other builders read the rest of the file.
+    void expectOtherPoints(std::uint64_t count) { pointCount_ = count; }
     void expectFaces(std::uint64_t count) { raw_.faceOffset.reserve(count + 1); }
     void expectCorners(std::uint64_t count) { raw_.faceVertex.reserve(count); }
 
@@ -102,6 +127,20 @@ public:
             scanner_.refuse("there are more face corners than a mesh can hold");
         raw_.faceOffset.append(static_cast<unsigned int>(raw_.faceVertex.size));
     }
+
+    /// Adds all points at once instead.
+    /// \param widePositions  the same in double precision; only if positions are moved
+    /// \param largestLoss    of a coordinate that is not a float, and 0 if there is none
+    /// \pre  all are finite in single precision
+    void setPoints(
+        Orvan::Array<float3> positions, Orvan::Array<Tessara::Math::double3> widePositions, double largestLoss);
+    /// Adds all faces at once instead.
+    /// \pre  the faces have at least three corners each, fewer than `kMostElements` in total, and refer to points
+    void setFaces(Orvan::Array<unsigned int> faceVertex, Orvan::Array<unsigned int> faceOffset);
+    /// Adds the points and faces of a builder that has read the next part of the file. Properties are not moved.
+    void append(GeometryBuilder&& next);
+    /// The number of points that corners may refer to.
+    std::uint64_t expectedPointCount() const { return pointCount_; }
 
     /// Makes a strand set of these points, in this order. The offsets are the starts of the strands and the end of the
     /// last. Properties of points that are added later refer to the new points.

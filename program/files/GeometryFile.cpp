@@ -46,8 +46,10 @@ GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions con
     if (!format.read)
         throw FileError(file.string()
             + " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .glb, .gltf, .h5 and .hdf5");
-    InputFile const input(file);
-    if (input.size == 0 && format.read != readObj && format.read != readXyz) // the others have headers
+    bool const readsParts = format.read == static_cast<decltype(format.read)>(readPly) || format.read == readStl;
+    InputFile const input(file, readsParts ? InputFile::Loading::Beginning : InputFile::Loading::Whole);
+    if (input.size == 0 && format.read != static_cast<decltype(format.read)>(readObj)
+        && format.read != readXyz) // the others have headers
         throw FileError(file.string() + " cannot be read: it is empty");
     return format.read(input, options);
 }

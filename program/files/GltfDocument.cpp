@@ -334,6 +334,8 @@ GltfArray GltfDocument::array(std::uint64_t accessor)
     if (type == std::end(kTypes))
         refuse("type " + TextScanner::quoted(name) + " of accessor " + std::to_string(accessor) + " does not exist");
 
+    // Without data all elements are 0 before some are replaced, so that a few bytes could demand any amount of memory.
+    constexpr std::uint64_t kMostWithoutData = 1 << 24;
     GltfArray array;
     array.count = number(json, "count");
     array.scalar = scalarOf(json);
@@ -354,10 +356,9 @@ GltfArray GltfDocument::array(std::uint64_t accessor)
             || (array.count != 0 && (array.count - 1) * array.stride + array.elementBytes() > bytes.size))
             refuse("accessor " + std::to_string(accessor) + " ends after its buffer view");
         array.data = bytes.data;
-    } else if (array.count > file_.size) {
-        // Without data all elements are 0, so that a few bytes could demand any amount of memory.
+    } else if (array.count > std::max<std::uint64_t>(file_.size, kMostWithoutData)) {
         refuse("accessor " + std::to_string(accessor) + " has " + std::to_string(array.count)
-            + " elements without data, more than the file has bytes");
+            + " elements without data, more than " + std::to_string(kMostWithoutData) + " and than the file has bytes");
     }
     if (auto const sparse = json.find("sparse"); sparse != json.end())
         readReplacements(*sparse, array);

@@ -80,9 +80,10 @@ namespace {
 
     class GltfWriter {
     public:
-        GltfWriter(WritableGeometry& geometry, std::filesystem::path const& file)
+        GltfWriter(WritableGeometry& geometry, std::filesystem::path const& file, std::uint64_t mostBytes)
             : geometry_(geometry)
             , file_(file)
+            , mostBytes_(mostBytes)
         {
         }
 
@@ -95,7 +96,7 @@ namespace {
             std::string json = root_.dump(-1, ' ', false, OrderedJson::error_handler_t::replace);
             json.resize((json.size() + 3) / 4 * 4, ' ');
             std::uint64_t const total = 12 + 8 + json.size() + (binaryBytes_ == 0 ? 0 : 8 + binaryBytes_);
-            if (total > std::numeric_limits<std::uint32_t>::max())
+            if (total > mostBytes_)
                 refuse("it would have " + std::to_string(total)
                     + " bytes, but GLB files cannot be larger than 4 GiB; PLY files can");
 
@@ -530,6 +531,7 @@ namespace {
 
         WritableGeometry& geometry_;
         std::filesystem::path const& file_;
+        std::uint64_t mostBytes_;
         std::vector<VertexAttribute> attributes_;
         std::set<std::string> semantics_{"POSITION"};
         GlbVertices vertices_;
@@ -542,7 +544,12 @@ namespace {
 
 void writeGltf(WritableGeometry& geometry, std::filesystem::path const& file)
 {
-    GltfWriter(geometry, file).write();
+    writeGltf(geometry, file, std::numeric_limits<std::uint32_t>::max()); // the header has 32 bits for the size
+}
+
+void writeGltf(WritableGeometry& geometry, std::filesystem::path const& file, std::uint64_t mostBytes)
+{
+    GltfWriter(geometry, file, mostBytes).write();
 }
 
 }

@@ -1,8 +1,11 @@
 #include "Readers.h"
 #include "Texts.h"
 
+#include "frame/ParallelFor.h"
+
 #include <TessaraGeometry/Names.h>
 
+#include <exception>
 #include <unordered_map>
 
 namespace ModelingProgram {
@@ -93,79 +96,128 @@ namespace {
         std::vector<Run> runs_; // ends where the next one begins
     };
 
-    class ObjReader {
+    constexpr NameRuns::Kind kNames[] = {{"o", "object", "objects"}, {"g", "group", "groups"},
+        {"s", "smoothing_group", "smoothing groups"}, {"usemtl", "material", "materials"}};
+
+    bool isGeometry(std::string_view keyword)
+    {
+        return keyword == "v" || keyword == "f" || keyword == "vt" || keyword == "vn" || keyword == "l";
+    }
+
+    /// The number of the names that the keyword gives; nullopt if it gives none.
+    std::optional<std::size_t> namesOf(std::string_view keyword)
+    {
+        auto const* const known = std::find_if(std::begin(kNames), std::end(kNames),
+            [=](NameRuns::Kind const& names) { return names.keyword == keyword; });
+        return known == std::end(kNames) ? std::nullopt
+                                         : std::optional(static_cast<std::size_t>(known - std::begin(kNames)));
+    }
+
+    bool isName(std::string_view keyword)
+    {
+        return keyword == "mtllib" || namesOf(keyword);
+    }
+
+    /// What a statement names. A face can be in several groups, which are kept as one name; other names may contain
+    /// blanks and #.
+    std::string textOfName(std::string_view keyword, TextScanner& in)
+    {
+        if (keyword != "g")
+            return std::string(in.restOfLine(TextScanner::Rest::WithHashes));
+        std::string groups;
+        for (std::string_view group = in.word(); !group.empty(); group = in.word())
+            groups.append(groups.empty() ? "" : " ").append(group);
+        return groups;
+    }
+
+    /// Numbers of statements.
+    struct ObjCounts {
+        std::uint64_t points = 0;
+        std::uint64_t textures = 0;
+        std::uint64_t normals = 0;
+        std::uint64_t faces = 0;
+
+        ObjCounts& operator+=(ObjCounts const& other)
+        {
+            points += other.points;
+            textures += other.textures;
+            normals += other.normals;
+            faces += other.faces;
+            return *this;
+        }
+    };
+
+    /// Some lines of the file and what they contain. Indices are those of the whole file, counted from 0.
+    class ObjPart {
     public:
-        ObjReader(InputFile const& file, ReadOptions const& options)
-            : file_(file)
-            , in_(file, 0, TextScanner::Syntax::CommentsAndJoinedLines)
-            , builder_(in_, options)
+        ObjPart(InputFile const& file, std::size_t begin, std::size_t end, ReadOptions const& options)
+            : in_(file, begin, end, TextScanner::Syntax::CommentsAndJoinedLines)
+            , counter_(file, begin, end, TextScanner::Syntax::CommentsAndJoinedLines)
+            , builder(in_, options)
         {
         }
-
-        GeometryFile read()
-        {
-            countStatements();
-            if (total_.points == 0)
-                requireObjStatements();
-            for (; !in_.atEnd(); in_.nextLine())
-                readStatement();
-            requireTotals();
-            addCornerValues("uv", textureOf_, textures_);
-            addCornerValues("normal", normalOf_, normals_);
-            noteUnused("texture coordinates (vt)", textureOf_, textures_.size);
-            addPointValues();
-            addFaceNames();
-            noteLeftOut();
-            return std::move(builder_).finish("OBJ");
-        }
-
-    private:
-        struct Counts {
-            std::uint64_t points = 0;
-            std::uint64_t textures = 0;
-            std::uint64_t normals = 0;
-            std::uint64_t faces = 0;
-        };
 
         /// Counts first, so that each index, which may refer forwards, can be checked when it is read.
-        void countStatements()
+        void count()
         {
-            TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
-            for (; !scanner.atEnd(); scanner.nextLine()) {
-                std::string_view const keyword = scanner.word();
-                total_.points += keyword == "v";
-                total_.textures += keyword == "vt";
-                total_.normals += keyword == "vn";
-                total_.faces += keyword == "f";
+            for (; !counter_.atEnd(); counter_.nextLine()) {
+                std::string_view const keyword = counter_.word();
+                counts.points += keyword == "v";
+                counts.textures += keyword == "vt";
+                counts.normals += keyword == "vn";
+                counts.faces += keyword == "f";
                 if (!isGeometry(keyword) && isName(keyword))
-                    textOfName(keyword, scanner); // which may end in a later line
+                    textOfName(keyword, counter_); // which may end in a later line
             }
-            if (std::max({total_.textures, total_.normals, total_.faces}) >= GeometryBuilder::kMostElements)
-                in_.refuse("there are more elements than a mesh can hold");
-            builder_.expectPoints(total_.points);
-            builder_.expectFaces(total_.faces);
-            textures_.reserve(total_.textures);
-            normals_.reserve(total_.normals);
         }
 
-        /// Indices have been checked against what was counted.
-        void requireTotals()
+        /// \param before  what precedes this part
+        void read(ObjCounts const& before, ObjCounts const& total)
         {
-            if (builder_.pointCount() != total_.points || textures_.size != total_.textures
-                || normals_.size != total_.normals)
+            before_ = before;
+            total_ = total;
+            builder.expectOtherPoints(total.points);
+            builder.expectFaces(counts.faces);
+            textures.reserve(counts.textures);
+            normals.reserve(counts.normals);
+            for (; !in_.atEnd(); in_.nextLine())
+                readStatement();
+            // Indices have been checked against what was counted.
+            if (builder.pointCount() != counts.points || textures.size != counts.textures
+                || normals.size != counts.normals)
                 in_.refuse("the file has other numbers of v, vt and vn than were counted first");
         }
 
-        /// A file without points is empty geometry, unless it is not an OBJ file at all.
-        void requireObjStatements()
-        {
-            TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
-            scanner.skipEmptyLines();
-            std::string_view const keyword = scanner.atEnd() ? std::string_view() : scanner.peekWord();
-            if (!keyword.empty() && !isGeometry(keyword) && !isName(keyword) && keyword != "p")
-                scanner.refuse(TextScanner::quoted(keyword) + " is not a keyword of OBJ files");
-        }
+        struct Naming {
+            std::size_t names; // which of `kNames`
+            std::string text;
+            std::uint64_t face; // the first one, of this part
+        };
 
+    private:
+        // Declared first, because the builder refers to it.
+        TextScanner in_;
+        TextScanner counter_;
+
+    public:
+        ObjCounts counts;
+        GeometryBuilder builder;
+        Orvan::Array<float2> textures;
+        Orvan::Array<float3> normals;
+        Orvan::Array<float3> colors; // up to the last point that has one
+        Orvan::Array<unsigned int> textureOf; // one entry per corner, if the file has texture coordinates
+        Orvan::Array<unsigned int> normalOf;
+        Orvan::Array<unsigned int> linePoints;
+        Orvan::Array<unsigned int> lineOffset{0u};
+        std::uint64_t uncoloredPoints = 0; // among `colors`
+        std::uint64_t pointElements = 0;
+        std::uint64_t weightedPoints = 0;
+        std::uint64_t deepTextures = 0;
+        std::vector<Naming> namings;
+        Texts libraries;
+        Texts unknownKeywords;
+
+    private:
         void readStatement()
         {
             std::string_view const keyword = in_.word();
@@ -176,42 +228,15 @@ namespace {
             else if (keyword == "vt")
                 readTexture();
             else if (keyword == "vn")
-                normals_.append(readFloat3("a component of the normal"));
+                normals.append(readFloat3("a component of the normal"));
             else if (keyword == "l")
                 readPolyline();
             else if (keyword == "p")
-                ++pointElements_;
+                ++pointElements;
             else if (!keyword.empty() && !readName(keyword))
-                unknownKeywords_.add(keyword);
+                unknownKeywords.add(keyword);
             if (isGeometry(keyword) && !in_.atLineEnd())
                 in_.refuse(TextScanner::quoted(in_.peekWord()) + " is unexpected at the end of the line");
-        }
-
-        static bool isGeometry(std::string_view keyword)
-        {
-            return keyword == "v" || keyword == "f" || keyword == "vt" || keyword == "vn" || keyword == "l";
-        }
-
-        /// Null if the keyword does not name parts of the geometry.
-        NameRuns* namesOf(std::string_view keyword)
-        {
-            auto const known = std::find_if(std::begin(names_), std::end(names_),
-                [=](NameRuns const& names) { return names.kind.keyword == keyword; });
-            return known == std::end(names_) ? nullptr : known;
-        }
-
-        bool isName(std::string_view keyword) { return keyword == "mtllib" || namesOf(keyword); }
-
-        /// What a statement names. A face can be in several groups, which are kept as one name; other names may contain
-        /// blanks and #.
-        std::string_view textOfName(std::string_view keyword, TextScanner& in)
-        {
-            if (keyword != "g")
-                return in.restOfLine(TextScanner::Rest::WithHashes);
-            groups_.clear();
-            for (std::string_view group = in.word(); !group.empty(); group = in.word())
-                groups_.append(groups_.empty() ? "" : " ").append(group);
-            return groups_;
         }
 
         /// Reads a name of the faces that follow.
@@ -219,14 +244,14 @@ namespace {
         {
             if (!isName(keyword))
                 return false;
-            std::string_view const name = textOfName(keyword, in_);
+            std::string name = textOfName(keyword, in_);
             if (keyword == "mtllib") {
                 if (!name.empty())
-                    libraries_.add(name);
+                    libraries.add(name);
                 return true;
             }
             bool const isNone = keyword == "s" && (name == "0" || name == "off");
-            namesOf(keyword)->begin(isNone ? std::string_view() : name, builder_.faceCount());
+            namings.push_back({*namesOf(keyword), isNone ? std::string() : std::move(name), builder.faceCount()});
             return true;
         }
 
@@ -241,25 +266,25 @@ namespace {
         void readPoint()
         {
             Coordinate const x = in_.coordinate(), y = in_.coordinate();
-            builder_.addPoint(x, y, in_.coordinate());
+            builder.addPoint(x, y, in_.coordinate());
             if (in_.atLineEnd())
                 return;
             float const first = in_.number<float>("a weight or a color");
             if (in_.atLineEnd()) {
-                weightedPoints_ += first != 1;
+                weightedPoints += first != 1;
                 return;
             }
             float const green = in_.number<float>("a color");
             float3 const color{first, green, in_.number<float>("a color")};
-            fillColors(builder_.pointCount() - 1);
-            colors_.append(color);
+            fillColors(builder.pointCount() - 1);
+            colors.append(color);
         }
 
         void fillColors(std::uint64_t count)
         {
-            while (colors_.size < count) {
-                colors_.append(kWhite);
-                ++uncoloredPoints_;
+            while (colors.size < count) {
+                colors.append(kWhite);
+                ++uncoloredPoints;
             }
         }
 
@@ -268,44 +293,45 @@ namespace {
             float const u = in_.number<float>("a texture coordinate");
             float const v = in_.atLineEnd() ? 0 : in_.number<float>("a texture coordinate");
             if (!in_.atLineEnd())
-                deepTextures_ += in_.number<float>("a texture coordinate") != 0;
-            textures_.append({u, v});
+                deepTextures += in_.number<float>("a texture coordinate") != 0;
+            textures.append({u, v});
         }
 
         void readFace()
         {
             while (!in_.atLineEnd()) {
-                builder_.addCorner(readIndex("point", builder_.pointCount(), total_.points));
+                builder.addCorner(readIndex("point", before_.points + builder.pointCount(), total_.points));
                 unsigned int texture = kInvalidIndex;
                 unsigned int normal = kInvalidIndex;
                 if (in_.accept('/')) { // v/vt, v/vt/vn, v//vn, each optionally with an empty end
                     if (!in_.atTokenEnd() && !in_.isAt('/'))
-                        texture = readIndex("texture coordinate", textures_.size, total_.textures);
+                        texture = readIndex("texture coordinate", before_.textures + textures.size, total_.textures);
                     if (in_.accept('/') && !in_.atTokenEnd())
-                        normal = readIndex("normal", normals_.size, total_.normals);
+                        normal = readIndex("normal", before_.normals + normals.size, total_.normals);
                 }
                 expectTokenEnd();
                 if (total_.textures != 0)
-                    textureOf_.append(texture);
+                    textureOf.append(texture);
                 if (total_.normals != 0)
-                    normalOf_.append(normal);
+                    normalOf.append(normal);
             }
-            builder_.endFace();
+            builder.endFace();
         }
 
         void readPolyline()
         {
             while (!in_.atLineEnd()) {
-                linePoints_.append(readIndex("point", builder_.pointCount(), total_.points));
+                linePoints.append(readIndex("point", before_.points + builder.pointCount(), total_.points));
                 if (in_.accept('/') && !in_.atTokenEnd())
-                    static_cast<void>(readIndex("texture coordinate", textures_.size, total_.textures));
+                    static_cast<void>(
+                        readIndex("texture coordinate", before_.textures + textures.size, total_.textures));
                 expectTokenEnd();
             }
-            if (linePoints_.size == lineOffset_[lineOffset_.size - 1])
+            if (linePoints.size == lineOffset[lineOffset.size - 1])
                 in_.refuse("a polyline has no points");
-            if (linePoints_.size >= GeometryBuilder::kMostElements)
+            if (linePoints.size >= GeometryBuilder::kMostElements)
                 in_.refuse("the polylines have more points than a strand set can hold");
-            lineOffset_.append(static_cast<unsigned int>(linePoints_.size));
+            lineOffset.append(static_cast<unsigned int>(linePoints.size));
         }
 
         /// Indices count from 1; negative ones count backwards from the last element read.
@@ -325,6 +351,142 @@ namespace {
         {
             if (!in_.atTokenEnd())
                 in_.refuse(TextScanner::quoted(in_.peekWord()) + " follows an index, but is not one");
+        }
+
+        ObjCounts before_;
+        ObjCounts total_;
+    };
+
+    /// Reads parts of the file in parallel and joins them.
+    class ObjReader {
+    public:
+        ObjReader(InputFile const& file, ReadOptions const& options, std::size_t partBytes)
+            : file_(file)
+            , in_(file, 0, TextScanner::Syntax::CommentsAndJoinedLines)
+            , builder_(in_, options)
+        {
+            std::vector<std::size_t> const ends = TextScanner::partsOf(file, partBytes);
+            for (std::size_t part = 0; part + 1 < ends.size(); ++part)
+                parts_.push_back(std::make_unique<ObjPart>(file, ends[part], ends[part + 1], options));
+        }
+
+        GeometryFile read()
+        {
+            countStatements();
+            if (total_.points == 0)
+                requireObjStatements();
+            readParts();
+            joinParts();
+            in_.skipAll();
+            addCornerValues("uv", textureOf_, textures_);
+            addCornerValues("normal", normalOf_, normals_);
+            noteUnused("texture coordinates (vt)", textureOf_, textures_.size);
+            addPointValues();
+            addFaceNames();
+            noteLeftOut();
+            return std::move(builder_).finish("OBJ");
+        }
+
+    private:
+        template <class Visit> void forEachPart(Visit const& visit)
+        {
+            // Each part has its own results.
+            Modeling::parallelFor(tbb::blocked_range<std::size_t>(0, parts_.size(), Modeling::kCoarseGrain),
+                [&](tbb::blocked_range<std::size_t> const& parts) {
+                    for (std::size_t part = parts.begin(); part != parts.end(); ++part)
+                        visit(part);
+                });
+        }
+
+        void countStatements()
+        {
+            forEachPart([&](std::size_t part) { parts_[part]->count(); });
+            for (auto const& part : parts_)
+                total_ += part->counts;
+            if (std::max({total_.textures, total_.normals, total_.faces}) >= GeometryBuilder::kMostElements)
+                in_.refuse("there are more elements than a mesh can hold");
+            builder_.expectPoints(total_.points);
+            builder_.expectFaces(total_.faces);
+            textures_.reserve(total_.textures);
+            normals_.reserve(total_.normals);
+        }
+
+        /// A file without points is empty geometry, unless it is not an OBJ file at all.
+        void requireObjStatements()
+        {
+            TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
+            scanner.skipEmptyLines();
+            std::string_view const keyword = scanner.atEnd() ? std::string_view() : scanner.peekWord();
+            if (!keyword.empty() && !isGeometry(keyword) && !isName(keyword) && keyword != "p")
+                scanner.refuse(TextScanner::quoted(keyword) + " is not a keyword of OBJ files");
+        }
+
+        /// If several parts fail, the first one tells what is wrong.
+        void readParts()
+        {
+            std::vector<ObjCounts> before(parts_.size());
+            for (std::size_t part = 1; part < parts_.size(); ++part)
+                (before[part] = before[part - 1]) += parts_[part - 1]->counts;
+            std::vector<std::exception_ptr> failures(parts_.size());
+            forEachPart([&](std::size_t part) {
+                try {
+                    parts_[part]->read(before[part], total_);
+                } catch (...) {
+                    failures[part] = std::current_exception();
+                }
+            });
+            for (std::exception_ptr const& failure : failures)
+                if (failure)
+                    std::rethrow_exception(failure);
+        }
+
+        void joinParts()
+        {
+            std::uint64_t cornerCount = 0, linePointCount = 0;
+            for (auto const& part : parts_) {
+                cornerCount += part->builder.cornerCount();
+                linePointCount += part->linePoints.size;
+            }
+            if (linePointCount >= GeometryBuilder::kMostElements)
+                in_.refuse("the polylines have more points than a strand set can hold");
+            builder_.expectCorners(cornerCount);
+            textureOf_.reserve(total_.textures != 0 ? cornerCount : 0);
+            normalOf_.reserve(total_.normals != 0 ? cornerCount : 0);
+            for (std::unique_ptr<ObjPart>& part : parts_) {
+                join(*part);
+                part.reset();
+            }
+        }
+
+        void join(ObjPart& part)
+        {
+            for (ObjPart::Naming const& naming : part.namings)
+                names_[naming.names].begin(naming.text, builder_.faceCount() + naming.face);
+            if (!part.colors.empty()) {
+                fillColors(builder_.pointCount());
+                appendAll(part.colors, colors_);
+            }
+            builder_.append(std::move(part.builder));
+            appendAll(part.textures, textures_);
+            appendAll(part.normals, normals_);
+            appendAll(part.textureOf, textureOf_);
+            appendAll(part.normalOf, normalOf_);
+            appendAll(part.linePoints, linePoints_);
+            appendOffsets(part.lineOffset, lineOffset_);
+            uncoloredPoints_ += part.uncoloredPoints;
+            pointElements_ += part.pointElements;
+            weightedPoints_ += part.weightedPoints;
+            deepTextures_ += part.deepTextures;
+            libraries_.add(part.libraries);
+            unknownKeywords_.add(part.unknownKeywords);
+        }
+
+        void fillColors(std::uint64_t count)
+        {
+            while (colors_.size < count) {
+                colors_.append(kWhite);
+                ++uncoloredPoints_;
+            }
         }
 
         template <class T>
@@ -458,7 +620,8 @@ namespace {
         InputFile const& file_;
         TextScanner in_;
         GeometryBuilder builder_;
-        Counts total_;
+        std::vector<std::unique_ptr<ObjPart>> parts_;
+        ObjCounts total_;
         Orvan::Array<float2> textures_;
         Orvan::Array<float3> normals_;
         Orvan::Array<float3> colors_;
@@ -470,9 +633,8 @@ namespace {
         std::uint64_t pointElements_ = 0;
         std::uint64_t weightedPoints_ = 0;
         std::uint64_t deepTextures_ = 0;
-        NameRuns names_[4] = {NameRuns({"o", "object", "objects"}), NameRuns({"g", "group", "groups"}),
-            NameRuns({"s", "smoothing_group", "smoothing groups"}), NameRuns({"usemtl", "material", "materials"})};
-        std::string groups_; // of a statement
+        NameRuns names_[std::size(kNames)] = {
+            NameRuns(kNames[0]), NameRuns(kNames[1]), NameRuns(kNames[2]), NameRuns(kNames[3])};
         Texts libraries_;
         Texts unknownKeywords_;
     };
@@ -481,7 +643,13 @@ namespace {
 
 GeometryFile readObj(InputFile const& file, ReadOptions const& options)
 {
-    return ObjReader(file, options).read();
+    constexpr std::size_t kPartBytes = std::size_t{1} << 21; // milliseconds of work
+    return readObj(file, options, kPartBytes);
+}
+
+GeometryFile readObj(InputFile const& file, ReadOptions const& options, std::size_t partBytes)
+{
+    return ObjReader(file, options, partBytes).read();
 }
 
 }

@@ -1,7 +1,9 @@
+#include "OutputBlocks.h"
 #include "Scanner.h"
 #include "Welder.h"
 #include "Writers.h"
 
+#include <mutex>
 #include <set>
 
 namespace ModelingProgram {
@@ -55,13 +57,17 @@ namespace {
         return line.empty() && !text.empty() ? "_" : line;
     }
 
-    template <class T> OutputFile& writeComponents(T const& vector, OutputFile& out)
+    template <class T> OutputBuffer& writeComponents(T const& vector, OutputBuffer& out)
     {
         if constexpr (sizeof(vector) > 2 * sizeof(vector.x))
             return out << " " << vector.x << " " << vector.y << " " << vector.z;
         else
             return out << " " << vector.x << " " << vector.y;
     }
+
+    // About how many bytes of text they take up.
+    constexpr std::size_t kBytesPerVector = 36;
+    constexpr std::size_t kBytesPerFace = 40;
 
     class ObjWriter {
     public:
@@ -213,40 +219,62 @@ namespace {
         {
             Orvan::Array<float3> const& positions = *geometry_.positions;
             auto const writeAll = [&](auto const& writeColor) {
-                for (std::uint64_t point = 0; point < positions.size; ++point) {
-                    out << "v";
-                    writeComponents(positions[point], out);
-                    writeColor(point);
-                    out << "\n";
-                }
+                writeInBlocks(
+                    positions.size, kBytesPerVector,
+                    [&](std::uint64_t first, std::uint64_t end, OutputBuffer& block) {
+                        for (std::uint64_t point = first; point != end; ++point) {
+                            writeComponents(positions[point], block << "v");
+                            writeColor(point, block);
+                            block << "\n";
+                        }
+                    },
+                    out);
             };
             auto const writeAs = [&]<class T>(std::type_identity<T>, float most) {
                 return visitAs<T>(colors_, [&](Orvan::Array<T> const& colors) {
-                    writeAll([&](std::uint64_t point) {
+                    writeAll([&](std::uint64_t point, OutputBuffer& block) {
                         T const& c = colors[point];
-                        out << " " << static_cast<float>(c.x) / most << " " << static_cast<float>(c.y) / most << " "
-                            << static_cast<float>(c.z) / most;
+                        block << " " << static_cast<float>(c.x) / most << " " << static_cast<float>(c.y) / most << " "
+                              << static_cast<float>(c.z) / most;
                     });
                 });
             };
             bool const areColored = writeAs(std::type_identity<float3>(), 1) || writeAs(std::type_identity<float4>(), 1)
                 || writeAs(std::type_identity<uchar3>(), 255) || writeAs(std::type_identity<uchar4>(), 255);
             if (!areColored)
-                writeAll([](std::uint64_t) {});
+                writeAll([](std::uint64_t, OutputBuffer&) {});
         }
 
         template <class... T> static void writeVectors(char const* keyword, Vectors const& vectors, OutputFile& out)
         {
             auto const writeAll = [&](auto const& list) {
-                for (auto const& vector : list)
-                    writeComponents(vector, out << keyword) << "\n";
+                writeInBlocks(
+                    list.size, kBytesPerVector,
+                    [&](std::uint64_t first, std::uint64_t end, OutputBuffer& block) {
+                        for (std::uint64_t i = first; i != end; ++i)
+                            writeComponents(list[i], block << keyword) << "\n";
+                    },
+                    out);
             };
             static_cast<void>((visitAs<T>(vectors.list, writeAll) || ...));
         }
 
-        void writeNames(std::uint64_t face, OutputFile& out)
+        /// The statements that are in force before a face.
+        std::vector<NameStatement> statementsBefore(std::uint64_t face) const
         {
-            for (NameStatement& statement : statements_) {
+            std::vector<NameStatement> result = statements_;
+            for (NameStatement& statement : result) {
+                if (face == 0)
+                    continue;
+                statement.number = (*statement.names->numbers)[face - 1];
+                statement.text = statement.names->textAt(statement.number);
+            }
+            return result;
+        }
+
+        void writeNames(std::uint64_t face, std::vector<NameStatement>& statements, OutputBuffer& out)
+        {
+            for (NameStatement& statement : statements) {
                 unsigned int const number = (*statement.names->numbers)[face];
                 if (number == statement.number)
                     continue;
@@ -256,32 +284,46 @@ namespace {
                     continue;
                 statement.text = text;
                 std::string const line = inOneLine(text, statement.keyword != std::string_view("g"));
-                if (line != text)
+                if (line != text) {
+                    std::lock_guard const lock(changedNamesMutex_);
                     changedNames_.emplace(text);
+                }
                 out << statement.keyword << (text.empty() ? "" : " ") << line << "\n";
             }
-            if (smoothingGroups_ && (*smoothingGroups_)[face] != smoothingGroup_) {
-                smoothingGroup_ = (*smoothingGroups_)[face];
-                out << "s " << smoothingGroup_ << "\n"; // 0 is off
-            }
+            if (!smoothingGroups_)
+                return;
+            unsigned int const group = (*smoothingGroups_)[face];
+            if (group != (face == 0 ? 0 : (*smoothingGroups_)[face - 1]))
+                out << "s " << group << "\n"; // 0 is off
         }
 
         void writeFaces(OutputFile& out)
         {
+            writeInBlocks(
+                geometry_.cellCount(), kBytesPerFace,
+                [&](std::uint64_t first, std::uint64_t end, OutputBuffer& block) {
+                    std::vector<NameStatement> statements = statementsBefore(first);
+                    for (std::uint64_t face = first; face != end; ++face) {
+                        writeNames(face, statements, block);
+                        writeFace(face, block);
+                    }
+                },
+                out);
+        }
+
+        void writeFace(std::uint64_t face, OutputBuffer& out) const
+        {
             Orvan::Array<unsigned int> const& point = *geometry_.faceVertex;
             Orvan::Array<unsigned int> const& offset = *geometry_.offsets;
-            for (std::uint64_t face = 0; face + 1 < offset.size; ++face) {
-                writeNames(face, out);
-                out << "f";
-                for (std::uint64_t corner = offset[face]; corner < offset[face + 1]; ++corner) {
-                    out << " " << oneBased(point[corner]);
-                    if (textures_)
-                        out << "/" << oneBased(textures_.numberOf(corner, point[corner]));
-                    if (normals_)
-                        out << (textures_ ? "/" : "//") << oneBased(normals_.numberOf(corner, point[corner]));
-                }
-                out << "\n";
+            out << "f";
+            for (std::uint64_t corner = offset[face]; corner < offset[face + 1]; ++corner) {
+                out << " " << oneBased(point[corner]);
+                if (textures_)
+                    out << "/" << oneBased(textures_.numberOf(corner, point[corner]));
+                if (normals_)
+                    out << (textures_ ? "/" : "//") << oneBased(normals_.numberOf(corner, point[corner]));
             }
+            out << "\n";
         }
 
         void writePolylines(OutputFile& out)
@@ -310,9 +352,9 @@ namespace {
         Vectors normals_;
         FaceNames const* libraries_ = nullptr;
         std::vector<NameStatement> statements_;
+        std::mutex changedNamesMutex_;
         std::set<std::string_view> changedNames_; // that are not written as they are
         Orvan::Ptr<Orvan::Array<unsigned int>> smoothingGroups_; // null if there are none
-        unsigned int smoothingGroup_ = 0; // of the last face
     };
 
 }

@@ -1,5 +1,7 @@
+#include "OutputBlocks.h"
 #include "PlyColumns.h"
 #include "Writers.h"
+#include "copyStrided.h"
 
 #include <algorithm>
 #include <bit>
@@ -12,6 +14,7 @@
 namespace ModelingProgram {
 
 using namespace Tessara::Geometry;
+using Tessara::Math::float3;
 
 namespace {
 
@@ -95,14 +98,8 @@ namespace {
 
             OutputFile out(file_, geometry_.existing);
             out << header.str();
-            for (std::uint64_t point = 0; point < geometry_.pointCount(); ++point) {
-                out.writeBinary((*geometry_.positions)[point]);
-                writeColumns(pointColumns, point, out);
-            }
-            for (std::uint64_t face = 0; face < geometry_.cellCount(); ++face) {
-                writeCorners(face, out);
-                writeColumns(faceColumns, face, out);
-            }
+            writePoints(pointColumns, out);
+            writeFaces(faceColumns, out);
             out.commit();
         }
 
@@ -131,14 +128,6 @@ namespace {
         }
 
         static char const* lengthType(unsigned int most) { return most > 255 ? "uint" : "uchar"; }
-
-        static void writeLength(unsigned int length, unsigned int most, OutputFile& out)
-        {
-            if (most > 255)
-                out.writeBinary(length);
-            else
-                out.writeBinary(static_cast<unsigned char>(length));
-        }
 
         std::vector<Column> chooseColumns(
             char const* component, std::set<std::string> taken, std::ostringstream& header)
@@ -196,25 +185,105 @@ namespace {
                     attribute, "PLY files can hold only texture coordinates (uv) of face corners", geometry_.leftOut);
         }
 
-        void writeCorners(std::uint64_t face, OutputFile& out) const
+        static std::size_t lengthBytes(unsigned int most) { return most > 255 ? sizeof(unsigned int) : 1; }
+
+        static std::size_t bytesOf(std::vector<Column> const& columns)
         {
-            unsigned int const first = (*geometry_.offsets)[face];
-            unsigned int const count = (*geometry_.offsets)[face + 1] - first;
-            writeLength(count, mostCorners_, out);
-            out.write(geometry_.faceVertex->data + first, count * sizeof(unsigned int));
-            if (!cornerTextures_)
-                return;
-            writeLength(2 * count, 2 * mostCorners_, out);
-            out.write(cornerTextures_->data + first * cornerTextures_->bytes, count * cornerTextures_->bytes);
+            std::size_t bytes = 0;
+            for (Column const& column : columns)
+                bytes += column.values.bytes + (column.isList ? 1 : 0);
+            return bytes;
         }
 
-        static void writeColumns(std::vector<Column> const& columns, std::uint64_t element, OutputFile& out)
+        void writePoints(std::vector<Column> const& columns, OutputFile& out) const
+        {
+            float3 const* const positions = geometry_.positions->data;
+            std::size_t const bytes = sizeof(float3) + bytesOf(columns);
+            writeInBlocks(
+                geometry_.pointCount(), bytes,
+                [&](std::uint64_t first, std::uint64_t end, OutputBuffer& block) {
+                    char* const records = block.extend((end - first) * bytes);
+                    copyStrided(positions + first, sizeof(float3), sizeof(float3), records, bytes, end - first);
+                    fillColumns(columns, first, end, records + sizeof(float3), bytes);
+                },
+                out);
+        }
+
+        void writeFaces(std::vector<Column> const& columns, OutputFile& out) const
+        {
+            std::uint64_t const count = geometry_.cellCount();
+            if (count == 0)
+                return;
+            unsigned int const* const offset = geometry_.offsets->data;
+            std::size_t const fixed =
+                lengthBytes(mostCorners_) + (cornerTextures_ ? lengthBytes(2 * mostCorners_) : 0) + bytesOf(columns);
+            std::size_t const cornerBytes = sizeof(unsigned int) + (cornerTextures_ ? cornerTextures_->bytes : 0);
+            bool const areEqual = std::uint64_t{mostCorners_} * count == offset[count];
+            writeInBlocks(
+                count, fixed + cornerBytes * offset[count] / count,
+                [&](std::uint64_t first, std::uint64_t end, OutputBuffer& block) {
+                    char* const records =
+                        block.extend((end - first) * fixed + (offset[end] - offset[first]) * cornerBytes);
+                    if (areEqual)
+                        fillEqualFaces(columns, first, end, records, fixed + mostCorners_ * cornerBytes);
+                    else
+                        fillFaces(columns, first, end, records);
+                },
+                out);
+        }
+
+        /// Fills records of faces that all have the same number of corners.
+        void fillEqualFaces(std::vector<Column> const& columns, std::uint64_t first, std::uint64_t end, char* records,
+            std::size_t bytes) const
+        {
+            unsigned int const corners = mostCorners_;
+            char* const at = fillLists(geometry_.faceVertex->data + first * corners, sizeof(unsigned int), corners,
+                lengthBytes(corners), end - first, records, bytes);
+            char* const next = !cornerTextures_
+                ? at
+                : fillLists(cornerTextures_->data + first * corners * cornerTextures_->bytes,
+                    cornerTextures_->bytes / 2, 2 * corners, lengthBytes(2 * corners), end - first, at, bytes);
+            fillColumns(columns, first, end, next, bytes);
+        }
+
+        /// Fills a list of the same length in each record. \return the end of the first one
+        static char* fillLists(void const* values, std::size_t scalarBytes, unsigned int length,
+            std::size_t lengthBytes, std::uint64_t count, char* at, std::size_t recordBytes)
+        {
+            copyStrided(&length, 0, lengthBytes, at, recordBytes, count); // little-endian: also its first byte
+            std::size_t const listBytes = length * scalarBytes;
+            copyStrided(values, listBytes, listBytes, at + lengthBytes, recordBytes, count);
+            return at + lengthBytes + listBytes;
+        }
+
+        void fillFaces(std::vector<Column> const& columns, std::uint64_t first, std::uint64_t end, char* at) const
+        {
+            for (std::uint64_t face = first; face != end; ++face) {
+                unsigned int const corner = (*geometry_.offsets)[face];
+                unsigned int const count = (*geometry_.offsets)[face + 1] - corner;
+                at = fillLists(geometry_.faceVertex->data + corner, sizeof(unsigned int), count,
+                    lengthBytes(mostCorners_), 1, at, 0);
+                if (cornerTextures_)
+                    at = fillLists(cornerTextures_->data + corner * cornerTextures_->bytes, cornerTextures_->bytes / 2,
+                        2 * count, lengthBytes(2 * mostCorners_), 1, at, 0);
+                at = fillColumns(columns, face, face + 1, at, 0);
+            }
+        }
+
+        /// \return the end of the columns in the first record
+        static char* fillColumns(std::vector<Column> const& columns, std::uint64_t first, std::uint64_t end, char* at,
+            std::size_t recordBytes)
         {
             for (Column const& column : columns) {
-                if (column.isList)
-                    out.writeBinary(static_cast<unsigned char>(column.values.components));
-                out.write(column.values.data + element * column.values.bytes, column.values.bytes);
+                if (column.isList) {
+                    auto const length = static_cast<unsigned char>(column.values.components);
+                    copyStrided(&length, 0, 1, at++, recordBytes, end - first);
+                }
+                std::size_t const bytes = column.values.bytes;
+                copyStrided(column.values.data + first * bytes, bytes, bytes, at, recordBytes, end - first);
+                at += bytes;
             }
+            return at;
         }
 
         WritableGeometry& geometry_;

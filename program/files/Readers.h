@@ -12,10 +12,17 @@ namespace ModelingProgram {
 /// "material_library"), smoothing groups numbers of the faces ("smoothing_group", 0 for none).
 GeometryFile readObj(InputFile const& file, ReadOptions const& options);
 
+/// The same with a choice, for tests: about how many bytes each thread reads at a time. The result does not depend on it.
+GeometryFile readObj(InputFile const& file, ReadOptions const& options, std::size_t partBytes);
+
 /// All three encodings. Groups of columns become one property: nx ny nz "normal", red green blue alpha "color", u v or
 /// s t or texture_u texture_v "uv"; other columns keep their names and types, and lists of equal length become vectors
 /// or matrices. Lists "texcoord" of the faces become "uv" of their corners.
 GeometryFile readPly(InputFile const& file, ReadOptions const& options);
+
+/// The same with a choice, for tests: `General` reads element by element even if the layout of the file allows more.
+enum class PlyPath { Fastest, General };
+GeometryFile readPly(InputFile const& file, ReadOptions const& options, PlyPath path);
 
 /// Binary if the file is exactly as long as its count requires, or, if read leniently, longer with a zero byte
 /// somewhere. Corners at equal positions become one point; 0 and -0 are equal. Normals are ignored, because the corners

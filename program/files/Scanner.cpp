@@ -1,8 +1,12 @@
 #include "Scanner.h"
 
+#include "frame/ParallelFor.h"
+
 #include <bit>
 #include <cerrno>
-#include <cstdio>
+
+#include <fcntl.h>
+#include <unistd.h>
 
 namespace ModelingProgram {
 
@@ -49,7 +53,7 @@ std::string lowerCase(std::string_view text)
     return result;
 }
 
-InputFile::InputFile(std::filesystem::path const& file)
+InputFile::InputFile(std::filesystem::path const& file, Loading loading)
     : path(file)
 {
     std::error_code error;
@@ -61,16 +65,56 @@ InputFile::InputFile(std::filesystem::path const& file)
     if (!std::filesystem::is_regular_file(status))
         refuseFile(file, "it is not a regular file");
 
-    std::unique_ptr<std::FILE, int (*)(std::FILE*)> const stream(std::fopen(file.c_str(), "rb"), &std::fclose);
-    if (!stream)
+    descriptor_.number = ::open(file.c_str(), O_RDONLY | O_CLOEXEC);
+    if (descriptor_.number < 0)
         refuseFile(file, std::strerror(errno));
     std::uintmax_t const fileSize = std::filesystem::file_size(file, error);
     if (error)
         refuseFile(file, error.message());
-    bytes = std::make_unique_for_overwrite<char[]>(fileSize);
-    size = std::fread(bytes.get(), 1, fileSize, stream.get());
-    if (size != fileSize)
-        refuseFile(file, std::ferror(stream.get()) ? std::strerror(errno) : "it changed while it was read");
+    size = fileSize;
+    bytes = std::make_unique_for_overwrite<char[]>(size);
+    loadTo(loading == Loading::Whole ? size : std::min(size, kBeginningBytes));
+}
+
+InputFile::Descriptor::~Descriptor()
+{
+    if (number >= 0)
+        ::close(number);
+}
+
+void InputFile::load() const
+{
+    loadTo(size);
+}
+
+void InputFile::loadTo(std::size_t end) const
+{
+    constexpr std::size_t kPartBytes = std::size_t{1} << 22;
+    std::size_t const begin = loadedSize_, partCount = (end - begin + kPartBytes - 1) / kPartBytes;
+    // Each part has its own bytes.
+    Modeling::parallelFor(
+        tbb::blocked_range<std::size_t>(0, partCount, Modeling::kCoarseGrain), [&](auto const& parts) {
+            for (std::size_t part = parts.begin(); part != parts.end(); ++part) {
+                std::size_t const first = begin + part * kPartBytes;
+                read(first, std::min(kPartBytes, end - first), bytes.get() + first);
+            }
+        });
+    loadedSize_ = end;
+}
+
+void InputFile::read(std::size_t offset, std::size_t count, void* target) const
+{
+    auto* to = static_cast<char*>(target);
+    while (count != 0) {
+        ssize_t const done = ::pread(descriptor_.number, to, count, static_cast<off_t>(offset));
+        if (done < 0 && errno == EINTR)
+            continue;
+        if (done <= 0)
+            refuseFile(path, done < 0 ? std::strerror(errno) : "it changed while it was read");
+        to += done;
+        offset += static_cast<std::size_t>(done);
+        count -= static_cast<std::size_t>(done);
+    }
 }
 
 /// Double rounding, first to double and then to single precision, can miss the nearest float if the double is halfway
@@ -86,6 +130,27 @@ Coordinate TextScanner::decimalCoordinate(std::string_view digits, double value)
         value = static_cast<float>(value) == rounded ? value : std::nextafter(value, static_cast<double>(rounded));
     }
     return {value, std::abs(value - static_cast<double>(rounded)) > leastReportedLoss(digits)};
+}
+
+std::vector<std::size_t> TextScanner::partsOf(InputFile const& file, std::size_t partBytes)
+{
+    std::string_view const text(file.bytes.get(), file.size);
+    std::vector<std::size_t> parts{0};
+    for (std::size_t at = partBytes; at < text.size();) {
+        std::size_t const newline = text.find('\n', at);
+        if (newline == std::string_view::npos)
+            break;
+        std::size_t last = newline;
+        while (last != 0 && isBlank(text[last - 1]))
+            --last;
+        bool const mayBeJoined = last != 0 && text[last - 1] == '\\';
+        if (!mayBeJoined)
+            parts.push_back(newline + 1);
+        at = newline + (mayBeJoined ? 1 : partBytes);
+    }
+    if (parts.back() != text.size() || parts.size() == 1)
+        parts.push_back(text.size());
+    return parts;
 }
 
 std::string_view TextScanner::restOfLine(Rest kind)

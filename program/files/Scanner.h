@@ -21,13 +21,43 @@ inline char lowerCase(char c)
 }
 std::string lowerCase(std::string_view text);
 
-/// The bytes of a file, read at once.
+/// The bytes of a file, read at once, or at first only the beginning: readers that know where everything is in the file
+/// then read it straight to its place.
 struct InputFile {
-    explicit InputFile(std::filesystem::path const& file);
+    enum class Loading { Whole, Beginning };
+    static constexpr std::size_t kBeginningBytes = std::size_t{1} << 20;
+
+    explicit InputFile(std::filesystem::path const& file, Loading loading = Loading::Whole);
+    /// Reads the rest of the file, if only its beginning has been read. Scanners need the whole file.
+    void load() const;
+
+    /// Null if they have not been loaded.
+    char const* loadedBytes(std::size_t offset, std::size_t count) const
+    {
+        return offset <= loadedSize_ && count <= loadedSize_ - offset ? bytes.get() + offset : nullptr;
+    }
+
+    /// Copies bytes of the file. Threads may do so concurrently.
+    /// \pre  they are inside the file
+    void read(std::size_t offset, std::size_t count, void* target) const;
 
     std::filesystem::path path;
     std::size_t size = 0;
-    std::unique_ptr<char[]> bytes;
+    std::unique_ptr<char[]> bytes; // memory for all of them, which takes up space only when they are loaded
+
+private:
+    struct Descriptor {
+        int number = -1;
+        Descriptor() = default;
+        Descriptor(Descriptor const&) = delete;
+        Descriptor& operator=(Descriptor const&) = delete;
+        ~Descriptor();
+    };
+
+    void loadTo(std::size_t end) const;
+
+    Descriptor descriptor_;
+    mutable std::size_t loadedSize_ = 0;
 };
 
 /// A coordinate in double precision. Rounded to single precision, it is the float nearest to the number in the file.
@@ -48,9 +78,14 @@ template <class T> Coordinate coordinateOf(T value)
 class Scanner {
 public:
     Scanner(InputFile const& file, std::size_t start)
+        : Scanner(file, start, file.size)
+    {
+    }
+    /// For the part of a file up to `end`.
+    Scanner(InputFile const& file, std::size_t start, std::size_t end)
         : file_(file)
         , at_(file.bytes.get() + start)
-        , end_(file.bytes.get() + file.size)
+        , end_(file.bytes.get() + end)
     {
     }
     Scanner(Scanner const&) = delete;
@@ -113,6 +148,7 @@ public:
         return value;
     }
 
+    bool swapsBytes() const { return swapsBytes_; }
     void skip(std::size_t bytes) { at_ += std::min(bytes, remaining()); }
 
 protected:
@@ -135,7 +171,12 @@ public:
     };
 
     TextScanner(InputFile const& file, std::size_t start, Syntax syntax)
-        : Scanner(file, start)
+        : TextScanner(file, start, file.size, syntax)
+    {
+    }
+    /// For lines of a file from `start` up to `end`.
+    TextScanner(InputFile const& file, std::size_t start, std::size_t end, Syntax syntax)
+        : Scanner(file, start, end)
         , comments_(syntax != Syntax::Plain)
         , hasMarks_(syntax == Syntax::CommentsAndMarks)
         , joinsLines_(syntax == Syntax::CommentsAndJoinedLines)
@@ -150,6 +191,8 @@ public:
         skipBlanks();
         return at_ == end_ || *at_ == '\n' || (comments_ && *at_ == '#');
     }
+
+    void skipAll() { at_ = end_; }
 
     void nextLine()
     {
@@ -266,6 +309,10 @@ public:
     };
     /// Advances past the separator.
     Separator separator();
+
+    /// Cuts a file into parts of about `partBytes` bytes, so that no line, and no line joined to the next one, is in two of
+    /// them. \return where each part begins, and the end of the file
+    static std::vector<std::size_t> partsOf(InputFile const& file, std::size_t partBytes);
 
     bool atTokenEnd() const { return isTokenEnd(at_); }
 

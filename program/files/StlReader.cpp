@@ -1,5 +1,8 @@
 #include "Readers.h"
 #include "Welder.h"
+#include "weldRecords.h"
+
+#include "frame/Arrays.h"
 
 #include <TessaraGeometry/Names.h>
 
@@ -33,7 +36,10 @@ namespace {
         if (file.size < kBytesBeforeTriangles)
             return false;
         std::uint64_t const declaredSize = kBytesBeforeTriangles + kTriangleBytes * declaredTriangles(file);
-        return file.size == declaredSize || (mayBeLonger && file.size > declaredSize && hasZeroByte(file));
+        if (file.size == declaredSize)
+            return true;
+        file.load();
+        return mayBeLonger && file.size > declaredSize && hasZeroByte(file);
     }
 
     /// Whether the file is text at least up to the first facet. The header of a binary file may begin with "solid" too,
@@ -68,19 +74,12 @@ namespace {
         {
             std::uint32_t const triangleCount = declaredTriangles(file_);
             Orvan::Array<unsigned short> attributes(triangleCount);
-            builder_.expectFaces(triangleCount);
-            bool hasAttributes = false;
-            for (std::uint32_t triangle = 0; triangle < triangleCount; ++triangle) {
-                in.beginElement("triangle", triangle);
-                in.skip(sizeof(float3)); // the normal
-                for (int corner = 0; corner < 3; ++corner)
-                    addCorner(in);
-                builder_.endFace();
-                attributes[triangle] = in.number<unsigned short>("the attribute of a triangle");
-                hasAttributes = hasAttributes || attributes[triangle] != 0;
-            }
+            if (readTriangles(triangleCount, attributes))
+                in.skip(triangleCount * kTriangleBytes);
+            else
+                readTrianglesInOrder(in, triangleCount, attributes);
             builder_.noteBytesLeft();
-            if (hasAttributes)
+            if (std::any_of(attributes.begin(), attributes.end(), [](unsigned short value) { return value != 0; }))
                 builder_.addProperty<unsigned short>("attribute", Tessara::Geometry::sFaceComp, std::move(attributes));
             return std::move(builder_).finish("STL (binary)");
         }
@@ -109,6 +108,44 @@ namespace {
         }
 
     private:
+        /// Reads all triangles at once, in parallel. \return false if something may be wrong with them; nothing has been
+        /// added to the builder then
+        bool readTriangles(std::uint32_t triangleCount, Orvan::Array<unsigned short>& attributes)
+        {
+            constexpr std::size_t kAttributeOffset = kTriangleBytes - sizeof(unsigned short);
+            if (std::uint64_t{triangleCount} * 3 >= GeometryBuilder::kMostElements || builder_.movesPositions())
+                return false;
+            BinaryRecords const records{kBytesBeforeTriangles, triangleCount, kTriangleBytes, nullptr, 0, kSwapsBytes};
+            auto points = weldRecords(records, sizeof(float3), file_);
+            if (!points)
+                return false;
+            RecordField const field{kAttributeOffset, false, sizeof(unsigned short), 1,
+                reinterpret_cast<std::byte*>(attributes.data), sizeof(unsigned short)};
+            forEachBlock(records, file_, [&](RecordBlock const& block) {
+                copyField(field, block);
+                return true;
+            });
+            builder_.setPoints(std::move(points->positions), {}, 0);
+            builder_.setFaces(
+                std::move(points->numbers), Modeling::offsetsFromCounts(triangleCount, [](std::size_t) { return 3u; }));
+            return true;
+        }
+
+        void readTrianglesInOrder(
+            BinaryScanner& in, std::uint32_t triangleCount, Orvan::Array<unsigned short>& attributes)
+        {
+            file_.load();
+            builder_.expectFaces(triangleCount);
+            for (std::uint32_t triangle = 0; triangle < triangleCount; ++triangle) {
+                in.beginElement("triangle", triangle);
+                in.skip(sizeof(float3)); // the normal
+                for (int corner = 0; corner < 3; ++corner)
+                    addCorner(in);
+                builder_.endFace();
+                attributes[triangle] = in.number<unsigned short>("the attribute of a triangle");
+            }
+        }
+
         void noteSolid(std::string_view name)
         {
             constexpr std::uint64_t kNamed = 5;

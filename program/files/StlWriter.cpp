@@ -1,5 +1,10 @@
+#include "OutputBlocks.h"
 #include "Writers.h"
 
+#include "frame/ParallelFor.h"
+
+#include <algorithm>
+#include <atomic>
 #include <bit>
 #include <cmath>
 
@@ -11,6 +16,8 @@ using Tessara::Math::float3;
 namespace {
 
     static_assert(std::endian::native == std::endian::little, "numbers are written with the byte order of memory");
+
+    constexpr std::size_t kTriangleBytes = 50;
 
     void checkTriangles(WritableGeometry const& geometry, std::filesystem::path const& file)
     {
@@ -40,11 +47,26 @@ namespace {
             static_cast<float>(n[0] / length), static_cast<float>(n[1] / length), static_cast<float>(n[2] / length)};
     }
 
+    void fillTriangle(WritableGeometry const& geometry, std::uint64_t face, unsigned short attribute, char* target)
+    {
+        float3 vectors[4]; // the normal and the corners
+        for (std::size_t i = 0; i < 3; ++i)
+            vectors[i + 1] = (*geometry.positions)[(*geometry.faceVertex)[3 * face + i]];
+        vectors[0] = normalOf(vectors[1], vectors[2], vectors[3]);
+        std::memcpy(target, vectors, sizeof(vectors));
+        std::memcpy(target + sizeof(vectors), &attribute, sizeof(attribute));
+    }
+
     void noteUnusedPoints(WritableGeometry& geometry)
     {
-        std::vector<bool> isUsed(geometry.pointCount());
-        for (unsigned int const point : *geometry.faceVertex)
-            isUsed[point] = true;
+        Orvan::Array<bool> isUsed(geometry.pointCount());
+        unsigned int const* const point = geometry.faceVertex->data;
+        // Several threads may set the same flag, all to the same value.
+        Modeling::parallelFor(tbb::blocked_range<std::uint64_t>(0, geometry.faceVertex->size, Modeling::kScatterGrain),
+            [&](tbb::blocked_range<std::uint64_t> const& corners) {
+                for (std::uint64_t corner = corners.begin(); corner != corners.end(); ++corner)
+                    std::atomic_ref(isUsed[point[corner]]).store(true, std::memory_order_relaxed);
+            });
         auto const unused = std::count(isUsed.begin(), isUsed.end(), false);
         if (unused != 0)
             geometry.leftOut.push_back(
@@ -72,15 +94,14 @@ void writeStl(WritableGeometry& geometry, std::filesystem::path const& file)
     header.resize(80);
     out.write(header.data(), header.size());
     out.writeBinary(static_cast<std::uint32_t>(geometry.cellCount()));
-    for (std::uint64_t face = 0; face < geometry.cellCount(); ++face) {
-        unsigned int const* const points = geometry.faceVertex->data + 3 * face;
-        float3 corners[3];
-        for (int i = 0; i < 3; ++i)
-            corners[i] = (*geometry.positions)[points[i]];
-        out.writeBinary(normalOf(corners[0], corners[1], corners[2]));
-        out.write(corners, sizeof(corners));
-        out.writeBinary<unsigned short>(attributes ? (*attributes)[face] : 0);
-    }
+    writeInBlocks(
+        geometry.cellCount(), kTriangleBytes,
+        [&](std::uint64_t first, std::uint64_t end, OutputBuffer& block) {
+            char* triangle = block.extend((end - first) * kTriangleBytes);
+            for (std::uint64_t face = first; face != end; ++face, triangle += kTriangleBytes)
+                fillTriangle(geometry, face, attributes ? (*attributes)[face] : 0, triangle);
+        },
+        out);
     out.commit();
 }
 

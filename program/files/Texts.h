@@ -17,6 +17,15 @@ public:
         if (known_.size() <= kShown)
             shown_ += (shown_.empty() ? "" : ", ") + TextScanner::quoted(text);
     }
+    /// Adds those of other texts, which have one line each.
+    void add(Texts const& others)
+    {
+        for (std::string_view rest = others.lines_; !rest.empty();) {
+            std::string_view const line = rest.substr(0, rest.find('\n'));
+            add(line);
+            rest.remove_prefix(std::min(rest.size(), line.size() + 1));
+        }
+    }
     bool empty() const { return known_.empty(); }
     std::string list() const
     {

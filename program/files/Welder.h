@@ -9,6 +9,21 @@
 
 namespace ModelingProgram {
 
+/// Equal vectors have equal hashes, also 0 and -0.
+template <class T> std::uint64_t hashOf(T const& value)
+{
+    using Scalar = typename ElementLayout<T>::Scalar;
+    using Bits = std::conditional_t<sizeof(Scalar) == 4, std::uint32_t, std::uint64_t>;
+    Scalar scalars[ElementLayout<T>::components];
+    std::memcpy(scalars, &value, sizeof(T));
+    std::uint64_t hash = 0;
+    for (Scalar const scalar : scalars) {
+        hash = (hash ^ std::bit_cast<Bits>(scalar + Scalar(0))) * 0x9E3779B97F4A7C15u; // -0 + 0 is 0
+        hash ^= hash >> 32;
+    }
+    return hash;
+}
+
 /// Numbers distinct vectors in order of first appearance. 0 and -0 are equal.
 template <class T> class Welder {
 public:
@@ -31,19 +46,7 @@ public:
     Orvan::Array<T> const& values() const { return values_; }
 
 private:
-    std::uint64_t slotOf(T const& value) const
-    {
-        using Scalar = typename ElementLayout<T>::Scalar;
-        using Bits = std::conditional_t<sizeof(Scalar) == 4, std::uint32_t, std::uint64_t>;
-        Scalar scalars[ElementLayout<T>::components];
-        std::memcpy(scalars, &value, sizeof(T));
-        std::uint64_t hash = 0;
-        for (Scalar const scalar : scalars) {
-            hash = (hash ^ std::bit_cast<Bits>(scalar + Scalar(0))) * 0x9E3779B97F4A7C15u; // -0 + 0 is 0
-            hash ^= hash >> 32;
-        }
-        return hash & (slots_.size - 1);
-    }
+    std::uint64_t slotOf(T const& value) const { return hashOf(value) & (slots_.size - 1); }
 
     void grow()
     {

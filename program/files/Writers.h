@@ -71,6 +71,8 @@ std::string validUtf8(std::string_view text);
 // One writer per format. They add to `leftOut`, and throw `FileError` if the format cannot hold the type of geometry.
 
 void writeGltf(WritableGeometry& geometry, std::filesystem::path const& file);
+/// The same with another limit than 4 GiB, for tests.
+void writeGltf(WritableGeometry& geometry, std::filesystem::path const& file, std::uint64_t mostBytes);
 void writeObj(WritableGeometry& geometry, std::filesystem::path const& file);
 void writePly(WritableGeometry& geometry, std::filesystem::path const& file);
 void writeStl(WritableGeometry& geometry, std::filesystem::path const& file);

@@ -14,7 +14,7 @@ set(program_top commands files geometry shell)
 set(program_commands top files geometry shell)
 set(program_geometry shell frame) # the library's frame, for its lists of the corners at each point
 set(program_shell files)
-set(program_files "")
+set(program_files frame) # parallel loops and copies of arrays
 
 # Headers at the top of a tree that every folder may include.
 set(common_headers Vectors.h)

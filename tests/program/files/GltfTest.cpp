@@ -1,4 +1,5 @@
 #include "FileSupport.h"
+#include "Writers.h"
 
 namespace ModelingProgram {
 
@@ -393,6 +394,33 @@ namespace {
         EXPECT_EQ(valuesOf<float>(*file.again.object, "count"), (std::vector<float>{1, 2, 3, 4, -16777216}));
         EXPECT_EQ(valuesOf<unsigned char>(*file.again.object, "chosen"), (std::vector<unsigned char>{1, 0, 1, 1, 0}));
         EXPECT_EQ(valuesOf<float3>(*file.again.object, "normal")[0], (float3{0, 0, 2}));
+    }
+
+    TEST(ReadGltf, FillsLargeSparseAccessorsOfSmallFiles)
+    {
+        std::string const content =
+            R"({"asset":{"version":"2.0"},"buffers":[{"byteLength":16,"uri":"data:;base64,n4YBAAAAgD8AAABAAABAQA=="}],)"
+            R"("bufferViews":[{"buffer":0,"byteLength":4},{"buffer":0,"byteOffset":4,"byteLength":12}],"accessors":[{)"
+            R"("componentType":5126,"count":100000,"type":"VEC3","sparse":{"count":1,"indices":{"bufferView":0,)"
+            R"("componentType":5125},"values":{"bufferView":1}}}],"meshes":[{"primitives":[{"attributes":{)"
+            R"("POSITION":0},"mode":0}]}],"scenes":[{"nodes":[0]}],"nodes":[{"mesh":0}]})";
+        auto const positions = valuesOf<float3>(*readContent(".gltf", content).object, sPointPosition);
+        ASSERT_EQ(positions.size(), 100'000u);
+        EXPECT_EQ(positions[99'998], (float3{0, 0, 0}));
+        EXPECT_EQ(positions[99'999], (float3{1, 2, 3}));
+    }
+
+    TEST(WriteGltf, RefusesFilesBeyondTheLimit)
+    {
+        auto const mesh = makeMesh({{0, 0, 0}, {1, 0, 0}, {0, 1, 0}}, {0, 1, 2}, {0, 3});
+        TemporaryFolder const folder;
+        WritableGeometry geometry = takeApart(*mesh, folder / "a.glb");
+        writeGltf(geometry, folder / "a.glb");
+        std::uint64_t const size = std::filesystem::file_size(folder / "a.glb");
+        EXPECT_THROW(writeGltf(geometry, folder / "b.glb", size - 1), FileError);
+        EXPECT_FALSE(std::filesystem::exists(folder / "b.glb"));
+        writeGltf(geometry, folder / "b.glb", size);
+        EXPECT_EQ(contentOf(folder / "b.glb"), contentOf(folder / "a.glb"));
     }
 
 }
