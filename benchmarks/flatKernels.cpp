@@ -6,6 +6,8 @@
 #include "frame/PointCorners.h"
 #include "frame/VectorMath.h"
 
+#include <TessaraGeometry/Names.h>
+
 #include <algorithm>
 #include <cmath>
 #include <cstring>
@@ -23,19 +25,17 @@ template <class Work> void forEachIndex(unsigned int count, Work const& work)
     });
 }
 
-unsigned int pointBefore(unsigned int const* corners, unsigned int corner)
+/// The face across edge k of a face.
+unsigned int twinOf(PointCorners const& around, unsigned int const* corner, unsigned int face, unsigned int k)
 {
-    return corners[corner % 3 == 0 ? corner + 2 : corner - 1];
-}
-
-/// The face across edge k of a face of a closed mesh.
-unsigned int twinOf(PointCorners const& around, unsigned int const* corners, unsigned int face, unsigned int k)
-{
-    unsigned int const* const c = corners + std::size_t{3} * face;
-    unsigned int i = around.offsets[c[k]];
-    while (pointBefore(corners, around.corners[i]) != c[k == 2 ? 0 : k + 1])
-        ++i;
-    return around.corners[i] / 3;
+    unsigned int const* const c = corner + std::size_t{3} * face;
+    unsigned int const end = c[k == 2 ? 0 : k + 1];
+    for (unsigned int i = around.offsets[end]; i != around.offsets[end + 1]; ++i) {
+        unsigned int const other = around.corners[i];
+        if (corner[other % 3 == 2 ? other - 2 : other + 1] == c[k])
+            return other / 3;
+    }
+    return Tessara::Geometry::kInvalidIndex;
 }
 
 // What any method needs: adjacency, normals and one measuring sweep.
@@ -149,15 +149,21 @@ void subdivideOnce(Points& points, Indices& corners)
     auto const pointCount = static_cast<unsigned int>(points.size);
     auto const faceCount = static_cast<unsigned int>(corners.size / 3);
     PointCorners const around = cornersByPoint(pointCount, corners.data, corners.size);
+    auto const before = [&](unsigned int i) { // the point before a corner in its face
+        return corners[around.corners[i] % 3 == 0 ? around.corners[i] + 2 : around.corners[i] - 1];
+    };
     auto newPoints = uninitializedArray<float3>(std::uint64_t{pointCount} + faceCount);
     auto newCorners = uninitializedArray<unsigned int>(3 * corners.size);
     forEachIndex(faceCount, [&](unsigned int face) {
         unsigned int const* const c = corners.data + std::size_t{3} * face;
         newPoints[pointCount + face] = (points[c[0]] + points[c[1]] + points[c[2]]) * (1.0f / 3);
         for (unsigned int k = 0; k != 3; ++k) {
+            unsigned int i = around.offsets[c[k]];
+            while (before(i) != c[k == 2 ? 0 : k + 1])
+                ++i;
             unsigned int* const target = newCorners.data + 3 * (std::size_t{3} * face + k);
             target[0] = c[k];
-            target[1] = pointCount + twinOf(around, corners.data, face, k);
+            target[1] = pointCount + around.corners[i] / 3;
             target[2] = pointCount + face;
         }
     });
@@ -165,7 +171,7 @@ void subdivideOnce(Points& points, Indices& corners)
         unsigned int const first = around.offsets[point], last = around.offsets[point + 1];
         float3 sum{0, 0, 0};
         for (unsigned int i = first; i != last; ++i)
-            sum = sum + points[pointBefore(corners.data, around.corners[i])];
+            sum = sum + points[before(i)];
         auto const valence = static_cast<float>(last - first);
         float const weight = (4 - 2 * std::cos(6.2831855f / valence)) / 9;
         newPoints[point] = points[point] * (1 - weight) + sum * (weight / valence);
