@@ -3,7 +3,6 @@
 #include "support/AllocationHooks.h"
 
 #include <atomic>
-#include <cmath>
 #include <cstdlib>
 #include <cstring>
 #include <new>
@@ -11,6 +10,8 @@
 #include <malloc.h>
 
 namespace {
+
+constexpr char kCopySuffix[] = ":memcpy";
 
 std::atomic<bool> isCounting = false; // off while time is measured
 std::atomic<std::int64_t> allocated = 0;
@@ -20,51 +21,44 @@ std::atomic<std::int64_t> mostAllocated = 0;
 
 namespace Benchmarks {
 
-Row::Row(std::string const& name, Sizes const& sizes, std::function<void(State&)> const& run)
+Row::Row(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure)
 {
-    auto* const row = benchmark::RegisterBenchmark(name.c_str(), run);
+    auto* const row = benchmark::RegisterBenchmark(name.c_str(), [=](benchmark::State& state) {
+        Run run{state, name.ends_with(kCopySuffix)};
+        measure(run);
+    });
     for (auto const& arguments : sizes)
         row->Args(arguments);
     row->UseRealTime();
 }
 
-CopyRow::CopyRow(std::string const& name, Sizes const& sizes, std::function<Input(State const&)> const& inputOf)
-    : Row(name + ":memcpy", sizes, [=](State& state) {
-        auto const [bytes, elements] = inputOf(state);
-        Orvan::Array<unsigned char> const source(bytes);
-        for (auto _ : state) {
-            Orvan::Array<unsigned char> target(bytes, Orvan::kUninitialized);
-            std::memcpy(target.data, source.data, bytes);
-            benchmark::DoNotOptimize(target.data);
-            benchmark::ClobberMemory();
-        }
-        state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
-        if (elements != 0)
-            countElements(state, elements);
-    })
+RowBesideCopy::RowBesideCopy(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure)
 {
+    Row(name, sizes, measure);
+    Row(name + kCopySuffix, sizes, measure);
 }
 
-MeshBuilder const& sphereOf(std::size_t faces)
-{
-    return madeOnce(faces, [](std::size_t count) { return MeshBuilder::sphereWithFaces(count); });
-}
-
-MeshBuilder const& shuffledSphereOf(std::size_t faces)
-{
-    return madeOnce(faces, [](std::size_t count) { return MeshBuilder::sphereWithFaces(count).shuffled(1); });
-}
-
-PolygonMesh bentQuads(std::size_t faces)
-{
-    auto const segments = static_cast<unsigned int>(std::sqrt(static_cast<double>(faces)));
-    return PolygonMesh::quads(segments).withNoise(0.2f, 1);
-}
-
-void countElements(State& state, std::size_t elements)
+void Run::reportTimePerElement(std::size_t elements) const
 {
     auto const all = static_cast<double>(state.iterations()) * static_cast<double>(elements);
     state.counters["time/element"] = benchmark::Counter(all, benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
+}
+
+bool Run::copies(std::size_t bytes, std::size_t elements) const
+{
+    if (!isCopy)
+        return false;
+    Orvan::Array<unsigned char> const source(bytes);
+    for (auto _ : state) {
+        Orvan::Array<unsigned char> target(bytes, Orvan::kUninitialized); // by the allocator of the library's arrays
+        std::memcpy(target.data, source.data, bytes);
+        DoNotOptimize(target.data);
+        benchmark::ClobberMemory();
+    }
+    state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
+    if (elements != 0)
+        reportTimePerElement(elements);
+    return true;
 }
 
 Memory memoryOf(std::function<void()> const& work)
@@ -73,13 +67,7 @@ Memory memoryOf(std::function<void()> const& work)
     isCounting = true;
     work();
     isCounting = false;
-    return {mostAllocated, allocated};
-}
-
-void countWorkingBytes(State& state, std::size_t elements, std::size_t resultBytes, std::function<void()> const& work)
-{
-    auto const bytes = static_cast<double>(memoryOf(work).peak) - static_cast<double>(resultBytes);
-    state.counters["working bytes/element"] = bytes / static_cast<double>(elements);
+    return {static_cast<double>(mostAllocated), static_cast<double>(allocated)};
 }
 
 }

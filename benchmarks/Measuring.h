@@ -1,15 +1,12 @@
 #pragma once
 
-#include "support/MeshBuilder.h"
-
 #include <OrvanCore/Array.h>
+#include <TessaraObject/Object.h>
 
 #include <benchmark/benchmark.h>
 
-#include <array>
 #include <cstdint>
 #include <functional>
-#include <map>
 #include <string>
 #include <vector>
 
@@ -18,115 +15,87 @@
 
 namespace Benchmarks {
 
-using benchmark::State;
+using benchmark::DoNotOptimize;
 using Tessara::Object;
-using TestSupport::float3, TestSupport::MeshBuilder, TestSupport::PolygonMesh;
-using Indices = Orvan::Array<unsigned int>;
 
 /// The arguments of each run of a row; most rows have one, the number of elements.
 using Sizes = std::vector<std::vector<std::int64_t>>;
 
-inline std::size_t sizeOf(State const& state, std::size_t argument = 0)
-{
-    return static_cast<std::size_t>(state.range(argument));
-}
+/// A run of a row for one of its sizes.
+struct Run {
+    benchmark::State& state;
+    bool const isCopy = false;
+
+    std::size_t size(std::size_t argument = 0) const { return static_cast<std::size_t>(state.range(argument)); }
+    void report(char const* counter, double value) const { state.counters[counter] = value; }
+    void reportTimePerElement(std::size_t elements) const;
+    void reportWorkingBytes(std::size_t elements, double bytes) const
+    {
+        report("working bytes/element", bytes / static_cast<double>(elements));
+    }
+    /// False, unless this is a run of the row `:memcpy`: then copies that much, and reports no time per element if there are none.
+    bool copies(std::size_t bytes, std::size_t elements = 0) const;
+};
 
 /// Registers a row that is measured in wall time.
 struct Row {
-    Row(std::string const& name, Sizes const& sizes, std::function<void(State&)> const& run);
+    Row(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure);
 };
 
-/// Registers the row `<name>:memcpy`, which copies into fresh memory from the allocator of the library's arrays.
-struct CopyRow : Row {
-    /// Bytes and elements; 0 elements if the row reports no time per element.
-    using Input = std::array<std::size_t, 2>;
-    CopyRow(std::string const& name, Sizes const& sizes, std::function<Input(State const&)> const& inputOf);
+/// Also registers the row `<name>:memcpy`, for which `measure` returns if `run.copies()`.
+struct RowBesideCopy {
+    RowBesideCopy(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure);
 };
 
-/// What `make(key)` returned first: meshes take longer to make than what is measured.
-template <class Key, class Make> auto const& madeOnce(Key const& key, Make const& make)
-{
-    static std::map<Key, decltype(make(key))> made;
-    auto const found = made.find(key);
-    return found != made.end() ? found->second : made.emplace(key, make(key)).first->second;
-}
-
-/// A unit sphere, made once, with at least that many faces.
-MeshBuilder const& sphereOf(std::size_t faces);
-MeshBuilder const& shuffledSphereOf(std::size_t faces);
-/// About that many quads, none of them planar.
-PolygonMesh bentQuads(std::size_t faces);
-
-/// A mesh in the library's arrays.
-struct FlatMesh {
-    Orvan::Array<float3> points;
-    Indices faceVertex, faceOffset;
-
-    explicit FlatMesh(PolygonMesh const& mesh)
-        : points(mesh.points)
-        , faceVertex(mesh.faceVertex)
-        , faceOffset(mesh.faceOffset)
-    {
-    }
-    unsigned int pointCount() const { return static_cast<unsigned int>(points.size); }
-    unsigned int faceCount() const { return static_cast<unsigned int>(faceOffset.size - 1); }
-};
-
-/// Reports the wall time per element.
-void countElements(State& state, std::size_t elements);
-
-/// What the work allocates through `operator new`: the most at one time, and what is left when it ends.
+/// Bytes that work allocates through `operator new`: the most at one time, and what is left when it ends.
 struct Memory {
-    std::int64_t peak;
-    std::int64_t kept;
+    double peak, kept;
 };
 Memory memoryOf(std::function<void()> const& work);
 
-/// Reports what the work allocates at one time beyond the bytes of its result.
-void countWorkingBytes(State& state, std::size_t elements, std::size_t resultBytes, std::function<void()> const& work);
-
-/// Times `run()`, and reports the wall time per element as all of these do.
-template <class Run> void timeRuns(State& state, std::size_t elements, Run const& run)
+/// Times `work()`, and reports the wall time per element as all of these do.
+template <class Work> void timeRuns(Run& run, std::size_t elements, Work const& work)
 {
-    for (auto _ : state) {
-        run();
+    for (auto _ : run.state) {
+        work();
         benchmark::ClobberMemory();
     }
-    countElements(state, elements);
+    run.reportTimePerElement(elements);
 }
 
-/// Times `run(made)`. Making and releasing what it runs on is not timed.
-template <class Make, class Run> void timeOnEach(State& state, std::size_t elements, Make const& make, Run const& run)
+/// Times `work(made)`. Making and releasing what it works on is not timed.
+template <class Make, class Work> void timeOnEach(Run& run, std::size_t elements, Make const& make, Work const& work)
 {
-    for (auto _ : state) {
-        state.PauseTiming();
+    for (auto _ : run.state) {
+        run.state.PauseTiming();
         {
             auto made = make();
-            state.ResumeTiming();
-            run(made);
+            run.state.ResumeTiming();
+            work(made);
             benchmark::ClobberMemory();
-            state.PauseTiming();
+            run.state.PauseTiming();
         }
-        state.ResumeTiming();
+        run.state.ResumeTiming();
     }
-    countElements(state, elements);
+    run.reportTimePerElement(elements);
 }
 
-/// Times `run(copy)` on copies of the source. Copies of an object share its arrays, as those of a host's document do.
-template <class Source, class Run>
-void timeOnCopies(State& state, std::size_t elements, Source const& source, Run const& run)
+/// Times `work(copy)` on copies of the source. Copies of an object share its arrays, as those of a host's document do.
+template <class Source, class Work>
+void timeOnCopies(Run& run, std::size_t elements, Source const& source, Work const& work)
 {
-    auto const copy = [&] { return source; };
-    timeOnEach(state, elements, copy, run);
+    timeOnEach(
+        run, elements, [&] { return source; }, work);
 }
 
 /// Times `edit(copy)` on copies of the source, and reports what it allocates beyond the bytes of the result.
 template <class Edit>
-void measureEdit(State& state, std::size_t elements, std::size_t resultBytes, Object const& source, Edit const& edit)
+void measureEdit(Run& run, std::size_t elements, std::size_t resultBytes, Object const& source, Edit const& edit)
 {
-    timeOnCopies(state, elements, source, edit);
+    timeOnCopies(run, elements, source, edit);
     Object object = source;
-    countWorkingBytes(state, elements, resultBytes, [&] { edit(object); });
+    double const bytes = memoryOf([&] { edit(object); }).peak - static_cast<double>(resultBytes);
+    run.reportWorkingBytes(elements, bytes);
 }
 
 }

@@ -1,7 +1,6 @@
 #include "shell/CommandLine.h"
 
-#include "Program.h"
-
+#include "program/RunProgram.h"
 #include "program/TemporaryFolder.h"
 #include "support/Random.h"
 
@@ -19,23 +18,7 @@ namespace ModelingProgram {
 namespace {
 
     using testing::HasSubstr;
-
-    struct Result {
-        int exitCode;
-        std::string output;
-        std::string messages;
-    };
-
-    Result run(std::vector<std::string> const& arguments)
-    {
-        std::vector<char const*> line{"modeling"};
-        for (std::string const& argument : arguments)
-            line.push_back(argument.c_str());
-        testing::internal::CaptureStdout();
-        testing::internal::CaptureStderr();
-        int const exitCode = runProgram(static_cast<int>(line.size()), line.data());
-        return {exitCode, testing::internal::GetCapturedStdout(), testing::internal::GetCapturedStderr()};
-    }
+    using TestSupport::Result, TestSupport::run;
 
     std::vector<std::string> wordsOf(std::string const& text)
     {

@@ -1,8 +1,8 @@
-#include "Program.h"
 #include "commands/Recipe.h"
 #include "shell/Failure.h"
 #include "shell/ShellWords.h"
 
+#include "program/RunProgram.h"
 #include "program/TemporaryFolder.h"
 
 #include <gmock/gmock.h>
@@ -17,23 +17,6 @@ namespace {
 
     class Run : public testing::Test {
     protected:
-        struct Result {
-            int exitCode;
-            std::string output;
-            std::string messages;
-        };
-
-        static Result run(std::vector<std::string> const& arguments)
-        {
-            std::vector<char const*> line{"modeling"};
-            for (std::string const& argument : arguments)
-                line.push_back(argument.c_str());
-            testing::internal::CaptureStdout();
-            testing::internal::CaptureStderr();
-            int const exitCode = runProgram(static_cast<int>(line.size()), line.data());
-            return {exitCode, testing::internal::GetCapturedStdout(), testing::internal::GetCapturedStderr()};
-        }
-
         std::string at(char const* name) const { return (folder / name).string(); }
         static std::string sample(std::string const& name) { return MODELING_SAMPLES "/" + name; }
 

@@ -1,8 +1,6 @@
-#include "Measuring.h"
-#include "peers/meanValues.h"
+#include "Inputs.h"
 
 #include "frame/ParallelFor.h"
-#include "support/Random.h"
 
 #include <Modeling/StitchTemplate.h>
 
@@ -10,62 +8,29 @@
 #include <tbb/task_arena.h>
 
 #include <algorithm>
-#include <cmath>
 
 using namespace Benchmarks;
 using Tessara::Modeling::StitchTemplate;
-using Points = Orvan::Array<float3>;
 using Weights = Orvan::Array<float>;
 
 namespace {
 
-float3 onCircle(float turn, float radius)
-{
-    return {radius * std::cos(turn * 6.2831853f), radius * std::sin(turn * 6.2831853f), 0};
-}
-
-/// Polygons of 4 to 8 corners, mostly concave, each with a hundred points inside that are not on edges.
-std::vector<DrawnPolygon> drawnPolygons(std::size_t pointCount)
-{
-    TestSupport::Random random(1);
-    std::vector<DrawnPolygon> polygons(pointCount / 100);
-    for (DrawnPolygon& polygon : polygons) {
-        unsigned int const corners = 4 + random.below(5);
-        for (unsigned int i = 0; i != corners; ++i)
-            polygon.corners.append(
-                onCircle(static_cast<float>(i) / static_cast<float>(corners), 0.8f + 0.2f * random.coordinate()));
-        while (polygon.points.size != 100)
-            polygon.points.append(onCircle(random.coordinate(), 0.15f + 0.14f * random.coordinate()));
-    }
-    return polygons;
-}
-
-Row const coordinates("stitch coordinates", {{200'000}}, [](State& state) {
+Row const coordinates("stitch coordinates", {{200'000}}, [](Run& run) {
     StitchTemplate made;
     made.setErrors("");
     Weights weights(9);
-    timeRuns(state, sizeOf(state), [&, polygons = drawnPolygons(sizeOf(state))] {
+    timeRuns(run, run.size(), [&, polygons = drawnPolygons(run.size())] {
         for (DrawnPolygon const& polygon : polygons) {
             made.setPolySize(static_cast<unsigned int>(polygon.corners.size));
             for (float3 const& point : polygon.points) {
                 std::fill(weights.begin(), weights.end(), 0.0f);
-                benchmark::DoNotOptimize(made.computeMeanValueCoordinates(polygon.corners, point, weights, 1));
+                DoNotOptimize(made.computeMeanValueCoordinates(polygon.corners, point, weights, 1));
             }
         }
     });
     if (!made.getErrors().empty())
-        state.SkipWithError("a point is outside its polygon");
+        run.state.SkipWithError("a point is outside its polygon");
 });
-
-[[maybe_unused]] Row coordinatesByCgal(char const* name, decltype(&cgalMeanValuesInFloat) makeRun)
-{
-    return {name, {{200'000}},
-        [=](State& state) { timeRuns(state, sizeOf(state), makeRun(drawnPolygons(sizeOf(state)))); }};
-}
-#ifdef MODELING_HAS_CGAL
-Row const inFloat = coordinatesByCgal("stitch coordinates:CGAL in float", cgalMeanValuesInFloat);
-Row const inDouble = coordinatesByCgal("stitch coordinates:CGAL in double", cgalMeanValuesInDouble);
-#endif
 
 Orvan::Ptr<Points> square()
 {
@@ -85,38 +50,38 @@ StitchTemplate crossing()
 }
 
 /// One control point after the other in a quad that stays in the nearest cache.
-Row const controlPoints("stitch findControlPointPos", {}, [](State& state) {
+Row const controlPoints("stitch findControlPointPos", {}, [](Run& run) {
     StitchTemplate const made = crossing();
     Points const quad{{0, 0, 0}, {1, 0, 0.5f}, {1, 1, 0}, {0, 1, 0.2f}};
     auto const& strand = made.getStrands()[0].controlPoints;
     float3 position{};
-    timeRuns(state, strand.size, [&] {
+    timeRuns(run, strand.size, [&] {
         for (Weights const& weights : strand) {
             made.findControlPointPos(quad, weights, 1, false, position);
-            benchmark::DoNotOptimize(position);
+            DoNotOptimize(position);
         }
     });
 });
 
 /// That many strands of eight control points from one edge of a square to the opposite one.
-Row const fill("stitch fill", {{1'000}, {10'000}, {100'000}}, [](State& state) {
+Row const fill("stitch fill", {{1'000}, {10'000}, {100'000}}, [](Run& run) {
     Points positions;
     Indices offsets{0};
-    for (std::size_t strand = 0; strand != sizeOf(state); ++strand) {
-        auto const place = static_cast<float>((strand * 7919) % sizeOf(state)) / static_cast<float>(sizeOf(state));
+    for (std::size_t strand = 0; strand != run.size(); ++strand) {
+        auto const place = static_cast<float>((strand * 7919) % run.size()) / static_cast<float>(run.size());
         for (int point = 0; point != 8; ++point)
             positions.append({0.1f + 0.8f * place, static_cast<float>(point) / 7, 0});
         offsets.append(static_cast<unsigned int>(positions.size));
     }
     auto const polygon = square(), points = Orvan::makePtr<Points>(positions);
     auto const starts = Orvan::makePtr<Indices>(offsets);
-    timeRuns(state, positions.size, [&] { benchmark::DoNotOptimize(StitchTemplate(polygon, points, starts, false)); });
+    timeRuns(run, positions.size, [&] { DoNotOptimize(StitchTemplate(polygon, points, starts, false)); });
 });
 
 /// Lays a template on each quad of a bent mesh, with as many threads as the argument says.
-Row const lay("stitch lay on a million quads, threads", {{1}, {2}}, [](State& state) {
+Row const lay("stitch lay on a million quads, threads", {{1}, {2}}, [](Run& run) {
     StitchTemplate const made = crossing();
-    PolygonMesh const mesh = bentQuads(1'000'000);
+    PolygonMesh const mesh = Meshes::bentQuads(1'000'000);
     std::size_t const perQuad = 2 * made.getStrands()[0].controlPoints.size;
     Points laid(mesh.faceCount() * perQuad);
     auto const layOnRange = [&](tbb::blocked_range<std::size_t> const& quads) {
@@ -130,10 +95,10 @@ Row const lay("stitch lay on a million quads, threads", {{1}, {2}}, [](State& st
                     made.findControlPointPos(corners, weights, 0.001f, false, *position++);
         }
     };
-    tbb::global_control const allowed(tbb::global_control::max_allowed_parallelism, sizeOf(state));
-    tbb::task_arena arena(static_cast<int>(state.range(0)));
+    tbb::global_control const allowed(tbb::global_control::max_allowed_parallelism, run.size());
+    tbb::task_arena arena(static_cast<int>(run.size()));
     tbb::blocked_range<std::size_t> const quads(0, mesh.faceCount(), Modeling::kElementGrain);
-    timeRuns(state, laid.size, [&] { // each quad writes its own stretch
+    timeRuns(run, laid.size, [&] { // each quad writes its own stretch
         arena.execute([&] { Modeling::parallelFor(quads, layOnRange); });
     });
 });

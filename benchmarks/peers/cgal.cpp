@@ -1,0 +1,134 @@
+#include "refinement.h"
+
+#include <CGAL/Barycentric_coordinates_2/Mean_value_coordinates_2.h>
+#include <CGAL/Exact_predicates_inexact_constructions_kernel.h>
+#include <CGAL/Polygon_mesh_processing/polygon_soup_to_polygon_mesh.h>
+#include <CGAL/Polygon_mesh_processing/repair_degeneracies.h>
+#include <CGAL/Polygon_mesh_processing/triangulate_faces.h>
+#include <CGAL/Simple_cartesian.h>
+#include <CGAL/Surface_mesh.h>
+#include <CGAL/boost/graph/Euler_operations.h>
+#include <CGAL/subdivision_method_3.h>
+
+using namespace Benchmarks;
+namespace Processing = CGAL::Polygon_mesh_processing;
+
+namespace {
+
+template <class Kernel> using Surface = CGAL::Surface_mesh<typename Kernel::Point_3>;
+using InFloat = CGAL::Simple_cartesian<float>;
+using InDouble = CGAL::Simple_cartesian<double>;
+
+template <class Kernel> Surface<Kernel> surfaceOf(PolygonMesh const& mesh)
+{
+    Surface<Kernel> surface;
+    for (auto const& p : mesh.points)
+        surface.add_vertex({p.x, p.y, p.z});
+    for (std::size_t face = 0; face != mesh.faceCount(); ++face) {
+        std::vector<typename Surface<Kernel>::Vertex_index> corners;
+        for (unsigned int corner = mesh.faceOffset[face]; corner != mesh.faceOffset[face + 1]; ++corner)
+            corners.emplace_back(mesh.faceVertex[corner]);
+        surface.add_face(corners);
+    }
+    return surface;
+}
+
+/// Collapses the needles that CGAL finds when the shortest edge is less than that ratio times the longest, as often as that
+/// gives new ones.
+Row const needles("removeSlivers:CGAL", kTriangles, [](Run& run) {
+    constexpr double noCaps = -1; // a cosine that no angle is below
+    timeOnCopies(run, run.size(), surfaceOf<InDouble>(made(Meshes::needled, run.size())), [](auto& mesh) {
+        Processing::experimental::remove_almost_degenerate_faces(mesh, noCaps, 1 / kSliverRatio, 0.0);
+        mesh.collect_garbage();
+    });
+});
+
+Row const deletion("deleteFaces:CGAL", kFaces, [](Run& run) {
+    using Mesh = Surface<InFloat>;
+    PatchedSphere const sphere(run.size());
+    Mesh source = surfaceOf<InFloat>(made(Meshes::sphere, run.size()));
+    source.add_property_map<Mesh::Vertex_index, InFloat::Vector_3>("v:normal");
+    source.add_property_map<Mesh::Halfedge_index, InFloat::Vector_2>("h:uv");
+    source.add_property_map<Mesh::Face_index, int>("f:material");
+    std::size_t remaining = 0;
+    timeOnCopies(run, sphere.faceCount(), source, [&](Mesh& mesh) {
+        for (unsigned int face = 0; face != sphere.faceCount(); ++face)
+            if (sphere.deleted[face])
+                CGAL::Euler::remove_face(halfedge(Mesh::Face_index(face), mesh), mesh);
+        mesh.collect_garbage();
+        remaining = mesh.number_of_faces();
+    });
+    run.report("remaining", static_cast<double>(remaining));
+});
+
+template <auto make> void measureTriangulation(Run& run)
+{
+    PolygonMesh const& mesh = made(make, run.size());
+    timeOnCopies(run, mesh.faceVertex.size() - 2 * mesh.faceCount(),
+        surfaceOf<CGAL::Exact_predicates_inexact_constructions_kernel>(mesh),
+        [](auto& surface) { Processing::triangulate_faces(surface); });
+}
+Row const quads("triangulate quads:CGAL", kQuads, measureTriangulation<Meshes::bentQuads>);
+Row const polygons("triangulate polygons:CGAL", kPolygons, measureTriangulation<Meshes::concave>);
+
+/// Takes the mesh from arrays in the time that is measured. `refine(surface)` returns the number of faces.
+template <class Refine> void measureRefinement(Run& run, PolygonMesh const& mesh, Refine const& refine)
+{
+    std::vector<InFloat::Point_3> points;
+    for (auto const& p : mesh.points)
+        points.emplace_back(p.x, p.y, p.z);
+    std::vector<std::array<std::size_t, 3>> faces;
+    for (std::size_t corner = 0; corner != mesh.faceVertex.size(); corner += 3)
+        faces.push_back({mesh.faceVertex[corner], mesh.faceVertex[corner + 1], mesh.faceVertex[corner + 2]});
+    measurePeerRefinement(run, [&] {
+        Surface<InFloat> surface;
+        Processing::polygon_soup_to_polygon_mesh(points, faces, surface);
+        return refine(surface);
+    });
+}
+
+template <auto make> void measureHalfEdges(Run& run)
+{
+    measureRefinement(run, made(make, run.size()), [](auto& surface) { return surface.number_of_halfedges() / 3; });
+}
+Row const halfEdges("halfEdges:CGAL", withoutLargest(kHalfEdges), measureHalfEdges<Meshes::sphere>);
+Row const shuffled("halfEdges shuffled:CGAL", withoutLargest(kHalfEdges), measureHalfEdges<Meshes::shuffled>);
+
+Row const uniform("subdivide uniform:CGAL", withoutLargest(kUniform), [](Run& run) {
+    measureRefinement(run, made(Meshes::icosphere, run.size()), [](auto& surface) {
+        CGAL::Subdivision_method_3::Sqrt3_subdivision(surface, CGAL::parameters::number_of_iterations(kUniformSteps));
+        return surface.number_of_faces();
+    });
+});
+
+/// Computes the coordinates of all points, with storage that is kept from run to run.
+template <class Kernel> void measureCoordinates(Run& run)
+{
+    using Corners = std::vector<typename Kernel::Point_2>;
+    using Coordinates = CGAL::Barycentric_coordinates::Mean_value_coordinates_2<Corners, Kernel>;
+    struct Polygon {
+        Corners corners, points;
+        std::unique_ptr<Coordinates> coordinates; // refers to the corners
+    };
+    std::vector<DrawnPolygon> const drawn = drawnPolygons(run.size());
+    std::vector<Polygon> polygons(drawn.size());
+    for (std::size_t i = 0; i != drawn.size(); ++i) {
+        for (auto const& corner : drawn[i].corners)
+            polygons[i].corners.emplace_back(corner.x, corner.y);
+        for (auto const& point : drawn[i].points)
+            polygons[i].points.emplace_back(point.x, point.y);
+        // Without a look for points on edges, which the library has.
+        polygons[i].coordinates = std::make_unique<Coordinates>(
+            polygons[i].corners, CGAL::Barycentric_coordinates::Computation_policy_2::FAST);
+    }
+    std::vector<typename Kernel::FT> weights(64);
+    timeRuns(run, run.size(), [&] {
+        for (Polygon& polygon : polygons)
+            for (auto const& point : polygon.points)
+                (*polygon.coordinates)(point, weights.begin());
+    });
+}
+Row const inFloat("stitch coordinates:CGAL in float", {{200'000}}, measureCoordinates<InFloat>);
+Row const inDouble("stitch coordinates:CGAL in double", {{200'000}}, measureCoordinates<InDouble>);
+
+}

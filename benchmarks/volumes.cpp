@@ -1,0 +1,98 @@
+#include "Inputs.h"
+
+#include <Modeling/subdivideByVolume.h>
+#include <Modeling/subdivisionSteps.h>
+
+#include <algorithm>
+#include <random>
+
+using namespace Benchmarks;
+using namespace TSR::TileTree3D;
+
+namespace {
+
+constexpr float kTolerance = 0.01f;
+
+template <class Traits> Volume<Traits> volumeOf(std::vector<Voxel> const& voxels, unsigned int offsetType = 7)
+{
+    VoxelList const list{Traits::kUnitDepth, voxels};
+    return buildVolume<Traits>(
+        {.background = 1, .offsetType = offsetType, .depth = Traits::kUnitDepth, .lists = {&list, 1}});
+}
+
+/// Where samples find the values across the border of a tile: in a padded channel, in a layer on the upper sides, or in one
+/// all around, because values are at the centers of their voxels.
+enum class Layers { padded, positive, full };
+
+template <class Traits, Layers layers> LinearSampler<Traits> samplerWith()
+{
+    constexpr bool isFull = layers == Layers::full;
+    static auto const volume = volumeOf<Traits>(bandOfVoxels(kRadius), isFull ? 0 : 7);
+    static auto const padded = layers == Layers::padded ? makeHaloChannel(volume) : Channel<Traits, float>();
+    float const offset = isFull ? 0.5f : 0;
+    return {volume.container, volume.channel, volume.topology,
+        {.scale = kRadius, .voxelOffset = {offset, offset, offset}, .background = volume.background},
+        layers == Layers::padded ? &padded : nullptr};
+}
+
+template <class Traits, Layers layers> void addMarking(std::string const& name)
+{
+    for (bool const isByVolume : {true, false})
+        Row(name + (isByVolume ? "" : ":length"), kSampled, [=](Run& run) {
+            using Geometry::Mesh::Internal::markForSubdivision;
+            auto const sampler = samplerWith<Traits, layers>();
+            FlatMesh const mesh(Meshes::sphere, run.size());
+            auto const& [points, faceVertex, faceOffset] = mesh;
+            Orvan::Array<bool> marks(mesh.faceCount());
+            timeRuns(run, mesh.faceCount(), [&] {
+                if (isByVolume)
+                    markForSubdivision(sampler, mesh.faceCount(), points, faceVertex, faceOffset, marks, kTolerance);
+                else
+                    markForSubdivision(kTolerance, mesh.faceCount(), points, faceVertex, faceOffset, marks);
+                DoNotOptimize(marks.data);
+            });
+        });
+}
+
+/// Points along the mesh or in random order, in rows or one by one.
+template <class Traits, Layers layers> void addSampling(std::string const& name)
+{
+    for (bool const isShuffled : {false, true})
+        for (bool const inRows : {true, false})
+            Row(name + (isShuffled ? "AtRandom" : "") + (inRows ? "" : ":single"), kSampled, [=](Run& run) {
+                std::vector<float3> points = pointsInBand(run.size(), 1);
+                if (isShuffled)
+                    std::shuffle(points.begin(), points.end(), std::mt19937(1));
+                auto sampler = samplerWith<Traits, layers>();
+                std::vector<float> values(points.size());
+                timeRuns(run, points.size(), [&] {
+                    if (inRows)
+                        sampler.sampleAll(points.data(), points.size(), Traits::kUnitDepth, kWorldSpace, values.data());
+                    else
+                        for (std::size_t n = 0; n < points.size(); ++n)
+                            values[n] = sampler.sample(points[n], Traits::kUnitDepth, kWorldSpace);
+                    DoNotOptimize(values.data());
+                });
+            });
+}
+
+template <class Traits> bool addRows(std::string const& suffix)
+{
+    addMarking<Traits, Layers::padded>("markByPaddedVolume" + suffix);
+    addMarking<Traits, Layers::positive>("markByVolume" + suffix);
+    addSampling<Traits, Layers::padded>("samplePaddedVolume" + suffix);
+    addSampling<Traits, Layers::positive>("sampleVolume" + suffix);
+    addSampling<Traits, Layers::full>("sampleCenteredVolume" + suffix);
+    Row("buildVolume" + suffix, kRadii, [](Run& run) {
+        std::vector<Voxel> const voxels = bandOfVoxels(run.size());
+        timeRuns(run, voxels.size(), [&] { DoNotOptimize(volumeOf<Traits>(voxels)); });
+        run.report("voxels", static_cast<double>(voxels.size()));
+    });
+    return true;
+}
+[[maybe_unused]] bool const areRowsAdded = addRows<Traits2>("") && addRows<Traits5>("5");
+
+Row const copying(
+    "buildVolume:memcpy", kRadii, [](Run& run) { run.copies(bandOfVoxels(run.size()).size() * sizeof(Voxel)); });
+
+}
