@@ -56,6 +56,7 @@ void addDeleteFaces(CommandLine& program, Invocation& invocation);
 void addMakeVolume(CommandLine& program, Invocation& invocation);
 void addMerge(CommandLine& program, Invocation& invocation);
 void addRemoveSlivers(CommandLine& program, Invocation& invocation);
+void addRepair(CommandLine& program, Invocation& invocation);
 void addRun(CommandLine& program, Invocation& invocation);
 void addSmooth(CommandLine& program, Invocation& invocation);
 void addStitch(CommandLine& program, Invocation& invocation);

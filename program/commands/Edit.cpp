@@ -19,7 +19,7 @@ namespace {
 std::span<EditKind const* const> editKinds()
 {
     static constexpr EditKind const* kAll[] = {&kAddPoints, &kDeletePoints, &kDeleteFaces, &kMerge, &kTriangulate,
-        &kSubdivide, &kSmooth, &kRemoveSlivers, &kStitch};
+        &kSubdivide, &kSmooth, &kRemoveSlivers, &kRepair, &kStitch};
     return kAll;
 }
 

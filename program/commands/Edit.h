@@ -75,7 +75,7 @@ template <class T> std::unique_ptr<Edit> createEdit()
 
 // Each edit is in the source of its command.
 extern EditKind const kAddPoints, kDeletePoints, kDeleteFaces, kMerge, kTriangulate, kSubdivide, kSmooth,
-    kRemoveSlivers, kStitch;
+    kRemoveSlivers, kRepair, kStitch;
 
 /// All of them.
 std::span<EditKind const* const> editKinds();

@@ -41,9 +41,9 @@ namespace {
             count == 1 ? "it belongs" : "they belong", describeEdge(mesh, topology.boundaryEdges.first));
         std::uint64_t const coincident = countCoincidentPoints(mesh);
         return sentence
-            + (coincident == 0 ? std::string(" Fill the holes first.")
+            + (coincident == 0 ? std::string(" Fill the holes first (modeling repair --only fill).")
                                : fmt::format(" {} at the same position as another point: merge equal points first, and "
-                                             "fill the remaining holes.",
+                                             "fill the remaining holes (modeling repair --only weld,fill).",
                                    coincident == 1 ? "1 point is" : groupDigits(coincident) + " points are"));
     }
 
@@ -60,7 +60,7 @@ namespace {
         if (!edges)
             return {};
         return {fmt::format("More than two faces meet at {}. The first is the {}. Separate the sheets or solids "
-                            "that meet there.",
+                            "that meet there (modeling repair --only split).",
             countOf(edges.count, "edge"), describeEdge(mesh, edges.first))};
     }
 
@@ -70,7 +70,7 @@ namespace {
         if (!edges)
             return {};
         return {fmt::format("At {} neighboring faces have opposite orientations. The first is the {}. Flip faces "
-                            "until all normals point outward.",
+                            "until all normals point outward (modeling repair --only orient).",
             countOf(edges.count, "edge"), describeEdge(mesh, edges.first))};
     }
 
@@ -80,7 +80,7 @@ namespace {
         if (!points)
             return {};
         return {fmt::format("The surface is non-manifold at {}: some faces there share only the point. The first "
-                            "is {}. Give each sheet its own point.",
+                            "is {}. Give each sheet its own point (modeling repair --only split).",
             countOf(points.count, "point"), describePoint(mesh, points.first))};
     }
 
@@ -192,11 +192,13 @@ std::vector<std::string> faultsOfTriangles(MeshArrays const& mesh, MeshTopology 
             countOf(count, "face has", "faces have"), first, groupDigits(mesh.corners(first).size())));
     }
     if (Finding const& faces = topology.facesBelowThreeCorners)
-        faults.push_back(fmt::format("{} fewer than three corners. The first is face {}. Remove such faces first.",
+        faults.push_back(fmt::format("{} fewer than three corners. The first is face {}. Remove such faces first "
+                                     "(modeling repair --only degenerate).",
             countOf(faces.count, "face has", "faces have"), faces.first));
     // Not reported for meshes with polygons: triangulation may resolve it.
     if (Finding const& faces = topology.facesWithRepeatedPoints; faces && !topology.quads && !topology.polygons)
-        faults.push_back(fmt::format("{} a point more than once. The first is face {}. Remove such faces first.",
+        faults.push_back(fmt::format("{} a point more than once. The first is face {}. Remove such faces first "
+                                     "(modeling repair --only degenerate).",
             countOf(faces.count, "face visits", "faces visit"), faces.first));
     return faults;
 }
@@ -205,7 +207,8 @@ std::vector<std::string> faultsOfIsolatedPoints(MeshArrays const& mesh, MeshTopo
 {
     std::vector<std::string> faults;
     if (Finding const& points = topology.isolatedPoints)
-        faults.push_back(fmt::format("{} to no face. The first is {}. Remove such points first.",
+        faults.push_back(fmt::format("{} to no face. The first is {}. Remove such points first (modeling repair --only "
+                                     "unused).",
             countOf(points.count, "point belongs", "points belong"), describePoint(mesh, points.first)));
     return faults;
 }

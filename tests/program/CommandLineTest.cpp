@@ -27,8 +27,8 @@ namespace {
     }
 
     std::vector<std::string> const kCommands = {"info", "validate", "convert", "add-points", "delete-points",
-        "delete-faces", "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "stitch",
-        "run"};
+        "delete-faces", "merge", "triangulate", "subdivide", "make-volume", "smooth", "remove-slivers", "repair",
+        "stitch", "run"};
     // They read no files.
     std::vector<std::string> const kHelpers = {"help", "completion", "man"};
 
@@ -199,7 +199,7 @@ TEST(CommandLine, CompletesInBash)
         EXPECT_EQ(std::system(("bash '" + (folder / "script").string() + "'").c_str()), 0);
         return contentOf(folder / "words");
     };
-    EXPECT_EQ(completionsOf("modeling re", 1), "remove-slivers\n");
+    EXPECT_EQ(completionsOf("modeling re", 1), "remove-slivers repair\n");
     EXPECT_EQ(completionsOf("modeling smooth a.obj --pin-", 3), "--pin-attribute --pin-boundary --pin-sharp\n");
     EXPECT_EQ(completionsOf("modeling stitch --normals f", 3), "faces\n");
     EXPECT_EQ(completionsOf("modeling completion ''", 2), "bash zsh fish\n");

@@ -98,6 +98,31 @@ TEST_F(Commands, RemoveSliversKeepsClosedManifolds)
     EXPECT_EQ(runForJson("info cylinder.obj")["counts"], info["counts"]);
 }
 
+TEST_F(Commands, RepairMakesWhatOthersAccept)
+{
+    copySamples({"bunny.obj", "sphere-with-hole.stl"});
+    EXPECT_THAT(run("subdivide sphere-with-hole.stl out.ply --relative 0.1").messages,
+        AllOf(HasSubstr("(modeling repair --only fill)"), HasSubstr("(modeling repair --only split)")));
+    json const done = runForJson("repair sphere-with-hole.stl closed.ply");
+    EXPECT_EQ(at(done, {"exitCode", "repairs/filledHoles", "repairs/splitPoints", "after/openEdges", "after/genus"}),
+        json({0, 3, 0, 0, 0}));
+    EXPECT_EQ(run("subdivide closed.ply out.ply --relative 0.1").exitCode, 0);
+    EXPECT_EQ(run("run sphere-with-hole.stl chain.ply --do 'repair; subdivide --relative 0.1'").exitCode, 0);
+    EXPECT_TRUE(areEqual("chain.ply", "out.ply"));
+
+    json const none = runForJson("repair bunny.obj out.obj --strict");
+    EXPECT_EQ(at(none, {"exitCode", "warnings", "droppedProperties"}), json({0, json::array(), json::array()}));
+    for (auto const& [name, count] : none["repairs"].items())
+        EXPECT_EQ(count, 0) << name;
+
+    Result const left = run("repair sphere-with-hole.stl out.ply --max-hole 2 --strict");
+    EXPECT_EQ(left.exitCode, 8);
+    EXPECT_THAT(left.messages, HasSubstr("the result is not a closed manifold: 9 open edges. 3 holes have more edges"));
+    EXPECT_EQ(run("repair sphere-with-hole.stl out.ply --only weld,orient --strict").exitCode, 0);
+    EXPECT_THAT(run("repair bunny.obj out.ply --skip fil").messages,
+        HasSubstr("--skip: there is no step \"fil\"; did you mean fill?"));
+}
+
 TEST_F(Commands, SmoothMovesPointsAndPinsThem)
 {
     copySamples({"bunny.obj", "cylinder.obj"});
@@ -598,7 +623,7 @@ TEST_F(Commands, EmptyGeometryIsAccepted)
             ASSERT_EQ(run("delete-faces cube.ply --indices all --invert empty." + extension).exitCode, 0);
         std::string const file = "empty." + extension;
         for (std::string arguments : {"info @", "validate @", "convert @ o.ply", "triangulate @ o.ply",
-                 "smooth @ o.ply", "remove-slivers @ o.ply", "subdivide @ o.ply --relative 0.1",
+                 "smooth @ o.ply", "remove-slivers @ o.ply", "repair @ o.ply", "subdivide @ o.ply --relative 0.1",
                  "subdivide @ o.ply --tolerance 1", "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2",
                  "delete-faces @ o.ply --indices all", "delete-points @ o.ply --indices all", "add-points @ @ o.ply",
                  "merge @ cube.ply -o o.ply", "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj",
@@ -629,7 +654,7 @@ TEST_F(Commands, InfoAndValidateDescribeFiles)
     EXPECT_EQ(run("validate lines.obj").output, "lines.obj contains a valid strand set: 2 points, 1 strand\n");
     EXPECT_EQ(runForJson("validate lines.obj")["valid"], true);
     for (char const* const command : {"", "info ", "validate ", "merge ", "triangulate ", "subdivide ", "make-volume ",
-             "smooth ", "remove-slivers ", "stitch "})
+             "smooth ", "remove-slivers ", "repair ", "stitch "})
         EXPECT_EQ(run(command + std::string("--help")).exitCode, 0) << command;
     EXPECT_EQ(run("--version").exitCode, 0);
 }

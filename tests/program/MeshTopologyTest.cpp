@@ -123,7 +123,8 @@ TEST(MeshRequirements, NamesFaultsWithTheirFirstOccurrence)
         ElementsAre(HasSubstr("1 face has fewer than three corners. The first is face 1."),
             HasSubstr(
                 "3 of 6 edges are boundary edges: they belong to one face only. The first is the edge of face 0 from "
-                "point 1 at (1, 0.5, 0) to point 0 at (0, 0.5, 0). Fill the holes first.")));
+                "point 1 at (1, 0.5, 0) to point 0 at (0, 0.5, 0). Fill the holes first (modeling repair --only "
+                "fill).")));
     EXPECT_THAT(faultsOf(meshOf(3, {{0, 1, 2}, {0, 1, 2}})),
         ElementsAre(
             HasSubstr("At 3 edges neighboring faces have opposite orientations. The first is the edge of face 0 "
