@@ -100,6 +100,7 @@ namespace {
             , in_(file, 0, TextScanner::Syntax::CommentsAndJoinedLines)
             , builder_(in_, options)
         {
+            in_.setWorkShare(4);
         }
 
         GeometryFile read()
@@ -131,6 +132,7 @@ namespace {
         void countStatements()
         {
             TextScanner scanner(file_, 0, TextScanner::Syntax::CommentsAndJoinedLines);
+            scanner.setWorkShare(4);
             for (; !scanner.atEnd(); scanner.nextLine()) {
                 std::string_view const keyword = scanner.word();
                 total_.points += keyword == "v";

@@ -1,5 +1,7 @@
 #include "Scanner.h"
 
+#include "WorkMeter.h"
+
 #include <bit>
 #include <cerrno>
 #include <cstdio>
@@ -68,9 +70,19 @@ InputFile::InputFile(std::filesystem::path const& file)
     if (error)
         refuseFile(file, error.message());
     bytes = std::make_unique_for_overwrite<char[]>(fileSize);
-    size = std::fread(bytes.get(), 1, fileSize, stream.get());
+    constexpr std::size_t kChunk = std::size_t{1} << 24;
+    for (std::size_t count = 1; count != 0 && size != fileSize; size += count) {
+        count = std::fread(bytes.get() + size, 1, std::min(kChunk, fileSize - size), stream.get());
+        workMeter.add(count / 2); // the other half of the work is to scan them
+    }
     if (size != fileSize)
         refuseFile(file, std::ferror(stream.get()) ? std::strerror(errno) : "it changed while it was read");
+}
+
+void Scanner::countChunk()
+{
+    workMeter.add((position() - counted_) / workShare_);
+    counted_ = position();
 }
 
 /// Double rounding, first to double and then to single precision, can miss the nearest float if the double is halfway
