@@ -7,6 +7,7 @@
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 #include "shell/MemoryLimit.h"
+#include "shell/Progress.h"
 
 #include <fmt/format.h>
 #include <tbb/global_control.h>
@@ -67,10 +68,9 @@ Exit codes:
 
     int reportFailure(Failure const& failure, bool asJson, Report& report)
     {
-        std::string message = fmt::format("modeling: {}\n", failure.what());
+        printMessage(fmt::format("modeling: {}", failure.what()));
         for (std::string const& reason : failure.reasons)
-            message += fmt::format("  - {}\n", reason);
-        std::fputs(message.c_str(), stderr);
+            printMessage(fmt::format("  - {}", reason));
         if (asJson) {
             report.document["exitCode"] = static_cast<int>(failure.code);
             report.document["error"] = {{"message", failure.what()}, {"reasons", failure.reasons}};
@@ -96,22 +96,29 @@ Exit codes:
             threadLimit.emplace(tbb::global_control::max_allowed_parallelism, invocation.threads);
         Report report(invocation.command);
         report.isJson = invocation.asJson;
+        report.isQuiet = invocation.isQuiet;
+        report.isStrict = invocation.isStrict;
         report.reading = invocation.reading;
         report.reading.onSize = [](std::uint64_t bytes) { requireMemory(bytes, "an array of the file"); };
         if (std::vector<double> const& center = invocation.center; !center.empty())
             report.reading.origin = {center[0], center[1], center[2]};
+        std::optional<Progress> progress(
+            std::in_place, invocation.isQuiet ? ProgressStyle::None : progressStyleOf(invocation.progress));
         try {
             report.requirements = parseRequirements(invocation.requirements);
             invocation.run(report);
+            progress.reset(); // before the results are printed
             if (invocation.isStrict && report.hasWarned && report.exitCode == 0)
                 report.exitCode = static_cast<int>(ExitCode::Warned);
             report.document["exitCode"] = report.exitCode;
             if (report.document.contains("center"))
                 report.text += centerOf(report.reading) + "\n";
-            if (!writeToStandardOutput(invocation.asJson ? jsonOf(report) : report.text))
+            std::string const results = invocation.asJson ? jsonOf(report) : invocation.isQuiet ? "" : report.text;
+            if (!writeToStandardOutput(results))
                 throw Failure(ExitCode::File, kCannotWriteOutput);
             return report.exitCode;
         } catch (...) {
+            progress.reset();
             return reportFailure(currentFailure(), invocation.asJson, report);
         }
     }
@@ -134,10 +141,9 @@ Exit codes:
         CommandLine::Parsed const parsed =
             program.parse({arguments + std::min(1, argumentCount), arguments + argumentCount});
         if (!parsed.mistake.empty()) {
-            std::fputs(fmt::format("modeling: {}\nRun \"modeling{}{} --help\" for more information.\n", parsed.mistake,
-                           parsed.command.empty() ? "" : " ", parsed.command)
-                           .c_str(),
-                stderr);
+            printMessage(fmt::format("modeling: {}", parsed.mistake));
+            printMessage(fmt::format("Run \"modeling{}{} --help\" for more information.",
+                parsed.command.empty() ? "" : " ", parsed.command));
             return static_cast<int>(ExitCode::CommandLine);
         }
         return parsed.help.empty() ? runCommand(invocation) : printHelp(parsed.help);
@@ -158,6 +164,17 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
 {
     Command command = program.addCommand(help);
     command.addFlag("--json", invocation.asJson, "Print one JSON document instead of text, also on failure").common();
+    command
+        .addFlag("-q,--quiet", invocation.isQuiet,
+            "Print only warnings and errors. Facts that only the results show are not computed, so a changed shape is "
+            "only noticed with --strict or --json")
+        .common();
+    command
+        .addOption("--progress", invocation.progress,
+            "Progress of long work on standard error: a bar on a terminal (auto), lines (plain), or none")
+        .oneOf({"auto", "plain", "none"})
+        .showDefault()
+        .common();
     command.addOption("--threads", invocation.threads, "Use at most N threads")
         .valueName("N")
         .between(1, 1024)

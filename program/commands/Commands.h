@@ -16,6 +16,8 @@ struct Output;
 struct Invocation {
     std::string command;
     bool asJson = false;
+    bool isQuiet = false; // no results as text, and no progress
+    std::string progress = "auto";
     bool isStrict = false; // warnings about the result have an exit code of their own
     std::string requirements; // of inputs, as a list
     unsigned int threads = 0; // upper limit; 0 for all

@@ -16,7 +16,7 @@ namespace {
     void convert(Options const& options, Report& report)
     {
         requireWritable(options.out, GeometryType::None);
-        Orvan::MutablePtr<Tessara::Object> const object = loadInput(options.in, report);
+        Orvan::MutablePtr<Tessara::Object> const object = loadInput(options.in, report).object;
         requireHolds(options.out, *object);
         saveGeometry(*object, options.out, report);
         Json const counts = countsOf(*object);

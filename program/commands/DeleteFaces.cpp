@@ -40,12 +40,15 @@ namespace {
     {
         requireFacesWithCorners(subject);
         Tessara::Object& mesh = *subject.object;
-        before_ = countsAndShape(mesh);
+        if (report.needsFacts())
+            before_ = countsAndShape(mesh, subject.know().shape);
         Orvan::Array<bool> const picked = pickElements(selection_, kFaces, mesh, report);
         runOperation(report, [&] {
             requireDone("delete-faces", picked.empty() || Tessara::GeometryAlgorithms::deleteFaces(picked, mesh));
         });
-        after_ = countsAndShape(mesh);
+        subject.setKnown();
+        if (report.needsFacts())
+            after_ = countsAndShape(mesh, subject.know().shape);
     }
 
 }

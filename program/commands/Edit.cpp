@@ -2,6 +2,7 @@
 
 #include "geometry/MeshRequirements.h"
 #include "shell/Failure.h"
+#include "shell/Phase.h"
 
 namespace ModelingProgram {
 
@@ -23,9 +24,33 @@ std::span<EditKind const* const> editKinds()
     return kAll;
 }
 
+MeshTopology const& Subject::knowTopology()
+{
+    if (!topology)
+        topology = analyzeTopology(arraysOf(*object));
+    return *topology;
+}
+
+ExaminedMesh Subject::know()
+{
+    MeshArrays const mesh = arraysOf(*object);
+    if (!topology)
+        setKnown(examine(mesh));
+    else if (!shape)
+        shape = shapeOf(mesh, EdgeSides(mesh), topology->isClosedManifold());
+    return {*topology, *shape};
+}
+
+void Subject::setKnown(std::optional<ExaminedMesh> const& facts)
+{
+    topology = facts ? std::optional(facts->topology) : std::nullopt;
+    shape = facts ? std::optional(facts->shape) : std::nullopt;
+}
+
 Subject Edit::readSubject(std::vector<std::filesystem::path> const& files, Report& report)
 {
-    return {files[0].string(), loadInput(files[0], report)};
+    Input input = loadInput(files[0], report);
+    return {files[0].string(), std::move(input.object), std::move(input.topology), {}};
 }
 
 void addEditCommand(EditKind const& kind, CommandLine& program, Invocation& invocation)
@@ -54,12 +79,16 @@ void runOnFiles(EditKind const& kind, Edit& edit, std::vector<std::filesystem::p
         requireAttribute(edit.newAttribute(), out);
         edit.readFiles(report);
         Subject subject = edit.readSubject(files, report);
-        requireSubject(kind, subject);
-        if (kind.gives == GeometryType::None || kind.keepsFaces)
+        {
+            Phase const phase(report, &Times::report, kReportTitle);
+            requireSubject(kind, subject);
+            if (kind.gives == GeometryType::None || kind.keepsFaces)
+                requireHolds(out, *subject.object);
+            edit.run(subject, report);
             requireHolds(out, *subject.object);
-        edit.run(subject, report);
-        requireHolds(out, *subject.object);
+        }
         saveGeometry(*subject.object, out, report);
+        Phase const phase(report, &Times::report, kReportTitle);
         edit.report(report);
     });
 }

@@ -3,10 +3,12 @@
 #include "Commands.h"
 #include "Operation.h"
 #include "geometry/Geometry.h"
+#include "geometry/Shape.h"
 
 #include <filesystem>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <utility>
@@ -14,10 +16,19 @@
 
 namespace ModelingProgram {
 
-/// The geometry that an edit works on.
+/// The geometry that an edit works on, and what is already known of it if it is a mesh.
 struct Subject {
     std::string name; // in messages: its file, or "the result of step 2"
     Orvan::MutablePtr<Tessara::Object> object;
+    std::optional<MeshTopology> topology = {};
+    std::optional<Shape> shape = {};
+
+    /// The topology, computed only if it is not known.
+    MeshTopology const& knowTopology();
+    /// The same for topology and shape.
+    ExaminedMesh know();
+    /// After the mesh has changed. By default nothing is known of the new one.
+    void setKnown(std::optional<ExaminedMesh> const& facts = {});
 };
 
 /// An operation on geometry in memory, with its options. It is what a subcommand does between reading IN and writing OUT,
@@ -50,7 +61,8 @@ public:
     /// Reads and validates the geometry. By default this is one file.
     virtual Subject readSubject(std::vector<std::filesystem::path> const& files, Report& report);
 
-    /// Refuses the geometry if the operation cannot handle it, otherwise edits it.
+    /// Refuses the geometry if the operation cannot handle it, otherwise edits it, and what is known of it. Facts that
+    /// only the report needs are omitted unless `report.needsFacts()`.
     /// \pre  it is valid and has the type that `EditKind` requires
     virtual void run(Subject& subject, Report& report) = 0;
 

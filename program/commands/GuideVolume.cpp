@@ -7,6 +7,7 @@
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 #include "shell/MemoryLimit.h"
+#include "shell/Phase.h"
 
 #include <Modeling/subdivideByVolume.h>
 #include <TessaraGeometry/Elements.h>
@@ -121,6 +122,7 @@ namespace {
 
 GuideVolume::GuideVolume(GuideOptions const& options, Report& report, MemoryLimit const* limit)
 {
+    Phase const phase(report, &Times::reading, fmt::format("reading {}", options.file.filename().string()));
     std::size_t const grid = chooseGrid(options, listVdbGrids(options.file));
     SparseVolume volume = readVdbGrid(options.file, grid, [&](VdbGridSize const& size) {
         if (limit)

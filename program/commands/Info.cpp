@@ -4,19 +4,19 @@
 #include "geometry/Geometry.h"
 #include "geometry/MeshTopology.h"
 #include "shell/Failure.h"
+#include "shell/Phase.h"
+#include "shell/Progress.h"
 
 #include <fmt/format.h>
 
-#include <cstdio>
 #include <memory>
 
 namespace ModelingProgram {
 
 namespace {
 
-    Json describeTopology(MeshArrays const& mesh)
+    Json describeTopology(MeshArrays const& mesh, MeshTopology const& topology)
     {
-        MeshTopology const topology = analyzeTopology(mesh);
         Json values;
         values["triangles"] = topology.triangleCount;
         values["quads"] = topology.quads.count;
@@ -75,35 +75,41 @@ namespace {
         return formatTable({{"property"}, {"type"}, {"of"}, {"length", true}}, rows);
     }
 
-    Json countAndDescribe(Tessara::Object const& object, Report& report)
+    Json countAndDescribe(Input const& input, Report& report)
     {
+        Phase const phase(report, &Times::report, kReportTitle);
+        Tessara::Object const& object = *input.object;
         Json const counts = countsOf(object);
         report.document["counts"] = counts;
         report.document["boundingBox"] = describeBox(boundingBoxOf(object));
-        if (typeOf(object) == GeometryType::Mesh)
-            report.document["topology"] = describeTopology(arraysOf(object));
+        if (typeOf(object) == GeometryType::Mesh && report.needsFacts()) {
+            MeshArrays const mesh = arraysOf(object);
+            report.document["topology"] =
+                describeTopology(mesh, input.topology ? *input.topology : analyzeTopology(mesh));
+        }
         report.document["properties"] = describeProperties(propertiesOf(object));
         return counts;
     }
 
     void describeFile(std::filesystem::path const& file, Report& report)
     {
-        Orvan::MutablePtr<Tessara::Object> const object = loadInput(file, report);
-        Json const counts = countAndDescribe(*object, report);
+        Input const loaded = loadInput(file, report);
+        Json const counts = countAndDescribe(loaded, report);
         Json const& input = report.document["inputs"][0];
-        report.text = fmt::format("{}: {}, {}\n\n{}bounding box {}\n", file.string(), input["kind"].get<std::string>(),
-            input["format"].get<std::string>(), formatValues({{"", counts}}), formatBox(boundingBoxOf(*object)));
+        report.text = fmt::format("{}: {}, {}\n\n{}bounding box {}\n", printable(file.string()),
+            input["kind"].get<std::string>(), input["format"].get<std::string>(), formatValues({{"", counts}}),
+            formatBox(boundingBoxOf(*loaded.object)));
         if (report.document.contains("topology"))
             report.text += "\n" + formatValues({{"", report.document["topology"]}});
-        report.text += "\n" + formatProperties(propertiesOf(*object));
+        report.text += "\n" + formatProperties(propertiesOf(*loaded.object));
     }
 
     /// What is most important, in one line.
     std::string lineOf(std::filesystem::path const& file, Json const& document)
     {
         Json const& input = document["inputs"][0];
-        std::string line = fmt::format(
-            "{}: {}, {}", file.string(), input["kind"].get<std::string>(), input["format"].get<std::string>());
+        std::string line = fmt::format("{}: {}, {}", printable(file.string()), input["kind"].get<std::string>(),
+            input["format"].get<std::string>());
         for (auto const& [name, count] : document["counts"].items())
             line += ", " + countOf(count.get<std::uint64_t>(), name.substr(0, name.size() - 1));
         if (document.contains("topology"))
@@ -114,7 +120,7 @@ namespace {
 
     void addFailure(ExitCode code, std::string const& message, std::vector<std::string> const& reasons, Report& report)
     {
-        std::fputs(fmt::format("modeling: {}\n", message).c_str(), stderr);
+        printMessage("modeling: " + message);
         report.document["error"] = {{"message", message}, {"reasons", reasons}};
         report.exitCode = static_cast<int>(code);
     }
@@ -124,8 +130,11 @@ namespace {
         Report report("info");
         report.reading = all.reading;
         report.requirements = all.requirements;
+        report.isJson = all.isJson;
+        report.isQuiet = all.isQuiet;
+        report.isStrict = all.isStrict;
         try {
-            countAndDescribe(*loadInput(file, report), report);
+            countAndDescribe(loadInput(file, report), report);
             report.text = lineOf(file, report.document);
         } catch (FileError const& error) {
             addFailure(ExitCode::File, error.what(), {}, report);

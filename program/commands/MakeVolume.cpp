@@ -9,6 +9,7 @@
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 #include "shell/MemoryLimit.h"
+#include "shell/Phase.h"
 
 #include <fmt/format.h>
 
@@ -124,12 +125,13 @@ namespace {
     void makeVolume(Options const& options, MemoryLimit const& limit, Report& report)
     {
         requireVdb(options.out);
-        Orvan::MutablePtr<Object> const mesh = loadInput(options.in, report);
+        Orvan::MutablePtr<Object> const mesh = loadInput(options.in, report).object;
         requireType(GeometryType::Mesh, *mesh, "make-volume", options.in);
         MeshArrays const arrays = arraysOf(*mesh);
         requireFiniteSurface(arrays, options.in);
         SurfaceValue const value = surfaceValueOf(options, *mesh);
 
+        std::optional<Phase> phase(std::in_place, report, &Times::report, kReportTitle);
         SparseVolume volume;
         volume.name = options.grid;
         volume.voxelSize = voxelSizeOf(options, *mesh);
@@ -144,7 +146,9 @@ namespace {
         auto const [least, most] = rangeOf(volume.voxels);
         reportVolume(volume, least, most, report);
         stopIfCancelled();
+        phase.emplace(report, &Times::writing, fmt::format("writing {}", options.out.file.filename().string()));
         writeVdbFile(volume, options.out.file, options.out.existing());
+        phase.reset();
         report.document["output"] = options.out.file.string();
         reportRun(report);
     }

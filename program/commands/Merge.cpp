@@ -1,8 +1,11 @@
 #include "Edit.h"
 #include "files/GeometryBuilder.h"
+#include "files/WorkMeter.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
 #include "shell/Failure.h"
+#include "shell/Phase.h"
+#include "shell/Progress.h"
 
 #include <Modeling/mergeMeshes.h>
 #include <Modeling/mergePointClouds.h>
@@ -66,8 +69,11 @@ namespace {
     {
         Sources sources;
         report.document["skipped"] = Json::array();
+        Phase const phase(report, &Times::reading, {}, WorkMeter::kBytes, bytesOf(files));
+        std::size_t number = 0;
         for (std::filesystem::path const& path : files) {
             std::string const file = path.string();
+            renamePhase(report.titleOf(fmt::format("reading {} of {}", ++number, countOf(files.size(), "file"))));
             Orvan::Ptr<Object> object = readGeometry(path, report);
             if (auto const status = validate(*object); !status) {
                 report.warn(fmt::format("{} is skipped: {}", file, status.message().view()));

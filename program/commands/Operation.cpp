@@ -2,11 +2,14 @@
 
 #include "files/OutputFile.h"
 #include "files/Scanner.h"
+#include "files/WorkMeter.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshArrays.h"
 #include "geometry/MeshRequirements.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
+#include "shell/Phase.h"
+#include "shell/Progress.h"
 
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Names.h>
@@ -38,12 +41,38 @@ namespace {
         return static_cast<std::uint64_t>(usage.ru_maxrss) * 1024;
     }
 
+    /// Adds where the time went to the document, and to the rows. A step writes nothing, and its total is the sum.
+    void addTimes(bool isStep, Report& report, std::vector<std::vector<std::string>>& rows)
+    {
+        struct Part {
+            char const* name;
+            double seconds;
+        };
+        Times const times = timesOf(report);
+        std::vector<Part> parts{{"reading", times.reading}, {"operation", times.operation}, {"report", times.report}};
+        if (!isStep)
+            parts.push_back({"writing", times.writing});
+        Json& document = report.document["phaseSeconds"];
+        double total = 0;
+        std::vector<std::string> texts;
+        for (Part const& part : parts) {
+            document[part.name] = part.seconds;
+            total += part.seconds;
+            if (part.seconds != 0)
+                texts.push_back(fmt::format("{} {}", part.name, formatSeconds(part.seconds)));
+        }
+        if (!isStep) {
+            total = std::chrono::duration<double>(std::chrono::steady_clock::now() - report.start).count();
+            document["total"] = total;
+        }
+        rows.push_back({"time", fmt::format("{} ({})", formatSeconds(total), fmt::join(texts, ", "))});
+    }
+
     /// Ends the report with a table of these rows and those of every command, as far as they apply.
     void addLastRows(std::vector<std::vector<std::string>> rows, Report& report)
     {
         Json& document = report.document;
-        if (document.contains("seconds"))
-            rows.push_back({"time", formatSeconds(document["seconds"].get<double>())});
+        addTimes(document.contains("step"), report, rows);
         if (document.contains("output")) {
             document["peakMemoryBytes"] = peakMemory();
             rows.push_back({"peak memory", formatBytes(document["peakMemoryBytes"].get<std::uint64_t>())});
@@ -83,7 +112,7 @@ namespace {
 void chooseOutput(char const* command, FileList& files)
 {
     Output& out = files.out;
-    if (!out.file.empty())
+    if (!out.file.empty() && !files.in.empty())
         return;
     if (files.in.size() < 2)
         throw Failure(ExitCode::CommandLine,
@@ -157,7 +186,12 @@ void requireAttribute(Output const& out, char const* option, std::string const& 
 
 Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& report)
 {
+    std::uint64_t const bytes = bytesOf({file});
+    Phase const phase(
+        report, &Times::reading, fmt::format("reading {}", fileOf(file).filename().string()), WorkMeter::kBytes, bytes);
+    std::uint64_t const done = workMeter.done();
     GeometryFile geometry = readGeometryFile(file, report.reading);
+    workMeter.set(done + bytes); // also if not all of the file was used
     stopIfCancelled();
     if (geometry.origin) {
         report.reading.origin = geometry.origin;
@@ -170,6 +204,17 @@ Orvan::MutablePtr<Tessara::Object> readGeometry(fs::path const& file, Report& re
     return std::move(geometry.object);
 }
 
+std::uint64_t bytesOf(std::vector<fs::path> const& files)
+{
+    std::uint64_t bytes = 0;
+    for (fs::path const& file : files) {
+        std::error_code error;
+        std::uintmax_t const size = fs::file_size(fileOf(file), error);
+        bytes += error ? 0 : size;
+    }
+    return bytes;
+}
+
 std::string centerOf(ReadOptions const& reading)
 {
     return fmt::format(
@@ -178,16 +223,19 @@ std::string centerOf(ReadOptions const& reading)
 
 Orvan::MutablePtr<Tessara::Object> loadGeometry(fs::path const& file, Report& report)
 {
+    Phase const phase(report, &Times::reading, fmt::format("reading {}", fileOf(file).filename().string()),
+        WorkMeter::kBytes, bytesOf({file}));
     Orvan::MutablePtr<Tessara::Object> object = readGeometry(file, report);
     requireValid(*object, file);
     return object;
 }
 
-Orvan::MutablePtr<Tessara::Object> loadInput(fs::path const& file, Report& report)
+Input loadInput(fs::path const& file, Report& report)
 {
-    Orvan::MutablePtr<Tessara::Object> object = loadGeometry(file, report);
-    requireProperties(report.requirements, *object, file);
-    return object;
+    Input input{loadGeometry(file, report), {}};
+    Phase const phase(report, &Times::report, "checking requirements");
+    input.topology = requireProperties(report.requirements, *input.object, file);
+    return input;
 }
 
 void requireValid(Tessara::Object const& object, fs::path const& file)
@@ -210,6 +258,7 @@ void requireDone(char const* command, bool isDone)
 
 void runOperation(Report& report, std::function<void()> const& operation)
 {
+    Phase const phase(report, &Times::operation);
     auto const start = std::chrono::steady_clock::now();
     try {
         operation();
@@ -228,6 +277,7 @@ void runOperation(Report& report, std::function<void()> const& operation)
 
 void saveGeometry(Tessara::Object const& object, Output const& out, Report& report)
 {
+    Phase const phase(report, &Times::writing, fmt::format("writing {}", fileOf(out.file).filename().string()));
     auto const status = validate(object);
     if (!status)
         throw Failure(ExitCode::Unexpected,

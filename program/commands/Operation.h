@@ -2,12 +2,14 @@
 
 #include "files/GeometryFile.h"
 #include "geometry/Geometry.h"
+#include "geometry/MeshTopology.h"
 #include "shell/Report.h"
 
 #include <TessaraObject/Object.h>
 
 #include <filesystem>
 #include <functional>
+#include <optional>
 #include <vector>
 
 namespace ModelingProgram {
@@ -61,11 +63,23 @@ Orvan::MutablePtr<Tessara::Object> readGeometry(std::filesystem::path const& fil
 /// \pre  there is an origin
 std::string centerOf(ReadOptions const& reading);
 
+/// The title of the phase in which requirements of an operation are checked, and the facts for the report are computed.
+inline constexpr char kReportTitle[] = "checking and measuring";
+
+/// The bytes of files that can be read, for `workMeter`.
+std::uint64_t bytesOf(std::vector<std::filesystem::path> const& files);
+
 /// Reads and validates a file.
 Orvan::MutablePtr<Tessara::Object> loadGeometry(std::filesystem::path const& file, Report& report);
 
-/// The same for an input of the command, which has to have the properties that --require lists.
-Orvan::MutablePtr<Tessara::Object> loadInput(std::filesystem::path const& file, Report& report);
+/// An input of the command, and what is known of it.
+struct Input {
+    Orvan::MutablePtr<Tessara::Object> object;
+    std::optional<MeshTopology> topology; // if a requirement needed it
+};
+
+/// Reads and validates an input, which has to have the properties that --require lists.
+Input loadInput(std::filesystem::path const& file, Report& report);
 
 /// Refuses an invalid object, which was read from `file`.
 void requireValid(Tessara::Object const& object, std::filesystem::path const& file);
@@ -74,17 +88,18 @@ void requireValid(Tessara::Object const& object, std::filesystem::path const& fi
 void requireDone(char const* command, bool isDone);
 
 /// Runs and times an operation of the library.
+/// \throws Failure  if the job is cancelled
 void runOperation(Report& report, std::function<void()> const& operation);
 
 /// Validates the result and writes it.
 void saveGeometry(Tessara::Object const& object, Output const& out, Report& report);
 
 /// Ends the report with a table of the values before and after, the kept properties (if the document has
-/// "keptProperties"), the dropped properties, time, and peak memory and the written file if there is one.
+/// "keptProperties"), the dropped properties, times, and peak memory and the written file if there is one.
 void reportOperation(
     Json const& before, Json const& after, std::vector<std::string> const& droppedProperties, Report& report);
 
-/// Ends the report with time, peak memory and the written file, as far as they apply: for commands without such a table.
+/// Ends the report with times, peak memory and the written file, as far as they apply: for commands without such a table.
 void reportRun(Report& report);
 
 }

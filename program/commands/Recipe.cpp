@@ -7,6 +7,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdlib>
 #include <map>
 #include <set>
@@ -66,17 +67,27 @@ namespace {
         return "a string";
     }
 
+    /// Programs that know only one type of number write whole numbers as 10.0.
+    bool isWhole(Json const& value)
+    {
+        constexpr double kMost = 9007199254740992; // larger ones may be rounded
+        if (!value.is_number_float())
+            return value.is_number_integer();
+        auto const number = value.get<double>();
+        return std::abs(number) <= kMost && number == std::trunc(number);
+    }
+
     bool hasKind(Json const& value, ValueKind kind)
     {
         switch (kind) {
         case ValueKind::Flag:
             return value.is_boolean();
         case ValueKind::Integer:
-            return value.is_number_integer();
+            return isWhole(value);
         case ValueKind::Number:
             return value.is_number();
         case ValueKind::Size:
-            return value.is_number_integer() || value.is_string();
+            return isWhole(value) || value.is_string();
         case ValueKind::Text:
         case ValueKind::File:
             break;
@@ -86,7 +97,10 @@ namespace {
 
     std::string wordOf(Json const& value, OptionDescription const& option)
     {
-        std::string word = value.is_string() ? value.get<std::string>() : value.dump();
+        bool const isInteger = option.kind == ValueKind::Integer || option.kind == ValueKind::Size;
+        std::string word = value.is_string()       ? value.get<std::string>()
+            : isInteger && value.is_number_float() ? std::to_string(value.get<std::int64_t>())
+                                                   : value.dump();
         if (option.kind == ValueKind::File && word.starts_with('-'))
             word.insert(0, "./"); // otherwise it would be an option
         return word;

@@ -45,9 +45,10 @@ namespace {
     void RemoveSlivers::run(Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
-        auto const [topology, shape] = examine(arraysOf(mesh));
+        if (report.needsFacts())
+            subject.know(); // together with the topology, the shape takes half the time
+        MeshTopology const topology = subject.knowTopology();
         requireClosedTriangleMesh(arraysOf(mesh), topology, {}, "remove-slivers", subject.name);
-        before_ = describeMesh(mesh, topology, ratio_);
 
         // The operation keeps only the standard properties up to date; the others are dropped if elements were
         // renumbered.
@@ -59,11 +60,16 @@ namespace {
             dropped_.clear();
         }
 
-        auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
-        change_ = {shape, shapeAfter, largestDistance(arraysOf(mesh), arraysOf(result))};
-        after_ = describeMesh(result, topologyAfter, ratio_);
-        addShape(change_, before_, after_);
+        std::optional<ExaminedMesh> after;
+        if (report.needsFacts()) {
+            after = examine(arraysOf(result));
+            change_ = {subject.know().shape, after->shape, largestDistance(arraysOf(mesh), arraysOf(result))};
+            before_ = describeMesh(mesh, topology, ratio_);
+            after_ = describeMesh(result, after->topology, ratio_);
+            addShape(change_, before_, after_);
+        }
         mesh = std::move(result);
+        subject.setKnown(after);
     }
 
     void RemoveSlivers::report(Report& report)

@@ -1,8 +1,10 @@
 #include "Edit.h"
+#include "files/WorkMeter.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
 #include "geometry/Shape.h"
+#include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
 #include <Modeling/deleteFaces.h>
@@ -10,6 +12,7 @@
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Makers.h>
+#include <TessaraMathSupport/Stepper.h>
 
 #include <fmt/format.h>
 
@@ -17,8 +20,6 @@
 #include <cmath>
 #include <memory>
 #include <optional>
-
-#include <unistd.h>
 
 namespace ModelingProgram {
 
@@ -35,6 +36,28 @@ namespace {
         bool pinsBoundary = false;
         std::optional<float> sharpDegrees; // points at sharper edges are pinned
         bool dropsIsolated = false;
+    };
+
+    /// During its lifetime, the steps of smoothing count as work done, and a cancelled job ends after one of them.
+    class StepCounter {
+    public:
+        explicit StepCounter(float amount)
+        {
+            unsigned int steps = 0;
+            for (Tessara::Math::Stepper stepper(amount, kLargestStep); stepper; stepper.step(CoreGL::NOPLogger()))
+                ++steps;
+            workMeter.begin("steps", steps);
+            CoreGL::OrvanLogger::setSink([](char const*) {
+                workMeter.add(1);
+                stopIfCancelled();
+            });
+        }
+        StepCounter(StepCounter const&) = delete;
+        StepCounter& operator=(StepCounter const&) = delete;
+        ~StepCounter() { CoreGL::OrvanLogger::setSink({}); }
+
+    private:
+        static constexpr float kLargestStep = 0.9f; // of the library
     };
 
     /// How far points moved.
@@ -75,7 +98,7 @@ namespace {
 
     /// Null if no point is weighted or pinned.
     std::unique_ptr<Orvan::Array<float>> weightsOf(
-        Options const& options, Subject const& subject, EdgeSides const& edges, Report& report)
+        Options const& options, Subject const& subject, std::optional<EdgeSides> const& edges, Report& report)
     {
         if (options.weights.empty() && options.pins.empty() && !options.pinsBoundary && !options.sharpDegrees)
             return nullptr;
@@ -95,10 +118,10 @@ namespace {
                     (*weights)[point] = 0;
         }
         if (options.pinsBoundary)
-            for (unsigned int const point : edges.boundaryPoints())
+            for (unsigned int const point : edges->boundaryPoints())
                 (*weights)[point] = 0;
         if (options.sharpDegrees)
-            for (unsigned int const point : sharpPoints(arrays, edges, *options.sharpDegrees))
+            for (unsigned int const point : sharpPoints(arrays, *edges, *options.sharpDegrees))
                 (*weights)[point] = 0;
         report.document["pinnedPoints"] =
             std::count_if(weights->begin(), weights->end(), [](float weight) { return weight <= 0; });
@@ -123,6 +146,7 @@ namespace {
         if (!Tessara::GeometryAlgorithms::deleteFaces(noFace, mesh))
             throw Failure(
                 ExitCode::Refused, "the isolated points cannot be removed: a range of the points has several data");
+        subject.setKnown();
     }
 
     struct EdgeLengths {
@@ -188,25 +212,34 @@ namespace {
         Object& mesh = *subject.object;
         handleIsolatedPoints(options_, subject, report);
         MeshArrays const arrays = arraysOf(mesh);
-        EdgeSides const edges(arrays);
+        std::optional<EdgeSides> edges;
+        if (report.needsFacts() || options_.pinsBoundary || options_.sharpDegrees)
+            edges.emplace(arrays);
         auto const weights = weightsOf(options_, subject, edges, report);
-        before_ = describeMesh(mesh);
         Positions positions = *arrays.positions;
-        auto const run = [&](auto const& logger) {
+        runOperation(report, [&] {
+            StepCounter const counter(options_.amount);
             Geometry::Mesh::smooth(options_.amount, arrays.pointCount(), arrays.faceCount(), *arrays.faceVertex,
-                *arrays.faceOffset, weights.get(), positions, logger);
-        };
-        bool const showsSteps = !report.isJson && ::isatty(STDOUT_FILENO) == 1;
-        runOperation(report, [&] { showsSteps ? run(CoreGL::ConsoleLogger()) : run(CoreGL::NOPLogger()); });
+                *arrays.faceOffset, weights.get(), positions, CoreGL::OrvanLogger());
+        });
 
         if (!std::all_of(positions.begin(), positions.end(), [](float3 const& p) { return isFinite(p); }))
             throw Failure(ExitCode::Refused, "the coordinates are too large to be smoothed in single precision");
         moved_ = displacementOf(*arrays.positions, positions);
         dropped_ = moved_.largest != 0 ? dropNormals(mesh) : std::vector<std::string>();
+        if (report.needsFacts())
+            before_ = describeMesh(mesh);
         addDataProperty(sPointPosition, sPointComp, std::move(positions), mesh);
-        bool const isClosed = analyzeTopology(arrays, edges).isClosedManifold();
-        change_ = {shapeOf(arrays, edges, isClosed), shapeOf(arraysOf(mesh), edges, isClosed),
-            largestMove(arrays, arraysOf(mesh))};
+        if (!report.needsFacts()) {
+            subject.shape.reset(); // the topology stays
+            return;
+        }
+        if (!subject.topology)
+            subject.topology = analyzeTopology(arrays, *edges);
+        bool const isClosed = subject.topology->isClosedManifold();
+        change_ = {subject.shape ? *subject.shape : shapeOf(arrays, *edges, isClosed),
+            shapeOf(arraysOf(mesh), *edges, isClosed), largestMove(arrays, arraysOf(mesh))};
+        subject.shape = change_.after;
         after_ = describeMesh(mesh);
         addShape(change_, before_, after_);
     }

@@ -2,6 +2,7 @@
 
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
+#include "shell/Phase.h"
 #include "shell/ShellWords.h"
 #include "shell/Suggestion.h"
 
@@ -72,9 +73,24 @@ namespace {
             for (std::size_t i = 0; i != steps_.size(); ++i)
                 inStep(i + 1, steps_[i], [&] { steps_[i].edit->checkOptions(); });
             requireWritable(out, resultOf(steps_));
-            inStep(steps_.size(), steps_.back(), [&] { requireAttribute(steps_.back().edit->newAttribute(), out); });
+            for (std::size_t i = 0; i != steps_.size(); ++i)
+                if (Edit::NewAttribute const attribute = steps_[i].edit->newAttribute();
+                    !isUsedAfter(i, attribute.name))
+                    inStep(i + 1, steps_[i], [&] { requireAttribute(attribute, out); });
             for (std::size_t i = 0; i != steps_.size(); ++i)
                 runPart(i, [&] { steps_[i].edit->readFiles(reports_[i]); });
+        }
+
+        Subject read(std::vector<std::filesystem::path> const& files)
+        {
+            Edit& first = *steps_[0].edit;
+            Subject subject;
+            auto const readFiles = [&] { subject = first.readSubject(files, report_); };
+            if (steps_[0].kind->takesManyFiles)
+                guard(0, readFiles);
+            else
+                readFiles();
+            return subject;
         }
 
         void run(Subject& subject)
@@ -87,10 +103,19 @@ namespace {
         }
 
     private:
-        /// Runs a part of a step that may read files or fail.
-        template <class Part> void runPart(std::size_t i, Part const& part)
+        /// Whether an option of a later step names the attribute, which then need not be written.
+        bool isUsedAfter(std::size_t i, std::string const& attribute) const
         {
-            reports_[i].reading = report_.reading;
+            for (std::size_t later = i + 1; later < steps_.size(); ++later)
+                for (OptionDescription const& option : steps_[later].options.options)
+                    if (std::find(option.given.begin(), option.given.end(), attribute) != option.given.end())
+                        return true;
+            return false;
+        }
+
+        /// Runs a part of a step that may fail.
+        template <class Part> void guard(std::size_t i, Part const& part)
+        {
             try {
                 inStep(i + 1, steps_[i], part);
             } catch (...) {
@@ -98,6 +123,13 @@ namespace {
                 report_.document["failedStep"] = i + 1;
                 throw;
             }
+        }
+
+        /// The same for a part that may also read files.
+        template <class Part> void runPart(std::size_t i, Part const& part)
+        {
+            reports_[i].reading = report_.reading;
+            guard(i, part);
             report_.reading = reports_[i].reading;
             report_.hasWarned = report_.hasWarned || reports_[i].hasWarned;
         }
@@ -106,6 +138,7 @@ namespace {
         {
             Edit& edit = *steps_[i].edit;
             Report& report = reports_[i];
+            Phase phase(report, &Times::report, kReportTitle);
             edit.runLimited([&] {
                 requireSubject(*steps_[i].kind, subject);
                 edit.run(subject, report);
@@ -114,6 +147,7 @@ namespace {
                 stopIfCancelled();
             });
             edit.report(report);
+            report_.times += timesOf(report);
             report_.document["steps"].push_back(report.document);
             report_.text += fmt::format("{}\n\n{}\n", titleOf(i + 1, steps_[i].kind->help.name), report.text);
             Json& seconds = report_.document["seconds"];
@@ -181,6 +215,8 @@ void requireChain(std::vector<Step> const& steps, std::size_t fileCount)
     auto const refuse = [&](std::size_t i, std::string const& why) {
         throw Failure(ExitCode::CommandLine, fmt::format("{}: {}", titleOf(i + 1, steps[i].kind->help.name), why));
     };
+    if (fileCount == 0)
+        throw Failure(ExitCode::CommandLine, "run needs at least one input file: modeling run IN... -o OUT");
     GeometryType type = GeometryType::None;
     for (std::size_t i = 0; i != steps.size(); ++i) {
         EditKind const& kind = *steps[i].kind;
@@ -203,7 +239,7 @@ void runSteps(
     requireChain(steps, files.size());
     Chain chain(steps, report);
     chain.checkBefore(out);
-    Subject subject = steps[0].edit->readSubject(files, report);
+    Subject subject = chain.read(files);
     if (std::all_of(steps.begin(), steps.end(), [](Step const& step) { return step.kind->keepsFaces; }))
         requireHolds(out, *subject.object);
     chain.run(subject);

@@ -362,6 +362,7 @@ namespace {
         Json const from = countsOf(mesh);
         subject.object =
             Tessara::Geometry::makeStrands(std::move(laid.positions), repeatOffsets(*template_, coveredCount_));
+        subject.setKnown();
         Json const to = countsOf(*subject.object);
         before_ = {{"faces", from["faces"]}, {"points", from["points"]}, {"strands", Json()}};
         after_ = {{"faces", Json()}, {"points", to["points"]}, {"strands", to["strands"]}};

@@ -1,5 +1,6 @@
 #include "Edit.h"
 #include "GuideVolume.h"
+#include "files/WorkMeter.h"
 #include "geometry/Geometry.h"
 #include "geometry/LargeFaces.h"
 #include "geometry/MeshRequirements.h"
@@ -8,6 +9,8 @@
 #include "geometry/Triangulation.h"
 #include "shell/Failure.h"
 #include "shell/MemoryLimit.h"
+#include "shell/Phase.h"
+#include "shell/Progress.h"
 
 #include <Modeling/subdivide.h>
 #include <Modeling/subdivisionSteps.h>
@@ -19,13 +22,10 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdio>
 #include <limits>
 #include <map>
 #include <memory>
 #include <optional>
-
-#include <unistd.h>
 
 namespace ModelingProgram {
 
@@ -41,9 +41,9 @@ namespace {
         GuideOptions guide;
     };
 
-    /// A mesh that prints its number of faces to standard error after each pass of a refinement. The library has no
-    /// progress callback, but it extends the data of points once per pass. So this class adds such a property and
-    /// observes writes to it; on a closed mesh each new point adds two faces.
+    /// A mesh that counts its faces as work done after each pass of a refinement. The library has no progress callback,
+    /// but it extends the data of points once per pass. So this class adds such a property and observes writes to it; on
+    /// a closed mesh each new point adds two faces.
     class ProgressMesh : public Object {
     public:
         explicit ProgressMesh(Object const& mesh)
@@ -53,6 +53,7 @@ namespace {
         {
             using namespace Tessara::Geometry;
             addDataProperty<float>(kWatched, sPointComp, Orvan::Array<float>(pointCount_), *this);
+            workMeter.begin("faces");
         }
 
         void setProperty(Orvan::String const& key, Tessara::PropertyValue&& value) override
@@ -80,12 +81,11 @@ namespace {
                 return;
             faceCount_ += 2 * (watched->size - pointCount_);
             pointCount_ = watched->size;
-            std::fprintf(stderr, "modeling: pass %u: %s\n", ++pass_, countOf(faceCount_, "face").c_str());
+            workMeter.set(faceCount_);
         }
 
         std::uint64_t pointCount_;
         std::uint64_t faceCount_;
-        unsigned int pass_ = 0;
     };
 
     /// \return how many faces are still too large
@@ -100,10 +100,10 @@ namespace {
         });
     }
 
-    /// Does the same, and prints the number of faces after each pass if standard error is a terminal.
+    /// Does the same, and counts the faces if progress is shown.
     std::uint64_t refine(std::optional<GuideVolume> const& guide, float tolerance, Object& mesh)
     {
-        if (!::isatty(STDERR_FILENO))
+        if (!isProgressShown())
             return refineBy(guide, tolerance, mesh);
         ProgressMesh telling(mesh);
         std::uint64_t const largeFaces = refineBy(guide, tolerance, telling);
@@ -237,9 +237,14 @@ namespace {
     void Subdivide::run(Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
-        if (options_.triangulates)
+        if (options_.triangulates) {
+            Phase const phase(report, &Times::operation, "triangulating");
             mesh = triangulatedAs(inFineUnits(mesh), "*", mesh);
-        auto const [topology, shape] = examine(arraysOf(mesh));
+            subject.setKnown();
+        }
+        if (report.needsFacts())
+            subject.know(); // together with the topology, the shape takes half the time
+        MeshTopology const topology = subject.knowTopology();
         requireClosedTriangleMesh(
             arraysOf(mesh), topology, faultsOfIsolatedPoints(arraysOf(mesh), topology), "subdivide", subject.name);
 
@@ -251,14 +256,18 @@ namespace {
 
         reportLargeFaces(largeFaces, guide.has_value(), report);
         dropped_ = explainDropped(mesh, result, report);
-        auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
-        change_ = {shape, shapeAfter, largestMove(arraysOf(mesh), arraysOf(result))};
         before_ = countsOf(mesh);
         after_ = countsOf(result);
-        addPartsAndGenus(topology, before_);
-        addPartsAndGenus(topologyAfter, after_);
-        addShape(change_, before_, after_);
+        std::optional<ExaminedMesh> after;
+        if (report.needsFacts()) {
+            after = examine(arraysOf(result));
+            change_ = {subject.know().shape, after->shape, largestMove(arraysOf(mesh), arraysOf(result))};
+            addPartsAndGenus(topology, before_);
+            addPartsAndGenus(after->topology, after_);
+            addShape(change_, before_, after_);
+        }
         mesh = std::move(result);
+        subject.setKnown(after);
     }
 
     void Subdivide::report(Report& report)

@@ -138,16 +138,20 @@ namespace {
         }
         report.document["keptProperties"] = namesOfOtherProperties(result);
         report.document["channels"] = channels_;
-        MeshArrays const arrays = arraysOf(mesh), triangles = arraysOf(result);
-        auto const [topology, shape] = examine(arrays);
-        auto const [topologyAfter, shapeAfter] = examine(triangles);
-        change_ = {shape, shapeAfter, largestMove(arrays, triangles)};
-        before_ = describeMesh(mesh, topology);
-        after_ = describeMesh(result, topologyAfter);
-        addShape(change_, before_, after_);
-        if (checksAreas_)
-            check_ = checkTriangulation(arraysOf(measured), triangles);
+        std::optional<ExaminedMesh> after;
+        if (report.needsFacts()) {
+            MeshArrays const arrays = arraysOf(mesh), triangles = arraysOf(result);
+            auto const [topology, shape] = subject.know();
+            after = examine(triangles);
+            change_ = {shape, after->shape, largestMove(arrays, triangles)};
+            before_ = describeMesh(mesh, topology);
+            after_ = describeMesh(result, after->topology);
+            addShape(change_, before_, after_);
+            if (checksAreas_)
+                check_ = checkTriangulation(arraysOf(measured), triangles);
+        }
         mesh = std::move(result);
+        subject.setKnown(after);
     }
 
     void Triangulate::report(Report& report)

@@ -1,6 +1,7 @@
 #include "Commands.h"
 #include "Operation.h"
 #include "geometry/Geometry.h"
+#include "shell/Progress.h"
 
 #include <fmt/format.h>
 
@@ -19,14 +20,14 @@ namespace {
     void validateFile(std::filesystem::path const& file, Report& report)
     {
         // Loading throws if the object is invalid.
-        Orvan::MutablePtr<Tessara::Object> const object = loadInput(file, report);
+        Orvan::MutablePtr<Tessara::Object> const object = loadInput(file, report).object;
         for (Orvan::String const& sentence : Tessara::Geometry::reportProperties(*object))
             report.warn(std::string(sentence.view()));
         Json const counts = countsOf(*object);
         report.document["valid"] = true;
         report.document["counts"] = counts;
-        report.text =
-            fmt::format("{} contains a valid {}: {}\n", file.string(), nameOf(typeOf(*object)), describeCounts(counts));
+        report.text = fmt::format(
+            "{} contains a valid {}: {}\n", printable(file.string()), nameOf(typeOf(*object)), describeCounts(counts));
     }
 
 }

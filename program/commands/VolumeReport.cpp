@@ -1,5 +1,7 @@
 #include "VolumeReport.h"
 
+#include "shell/Progress.h"
+
 #include <fmt/format.h>
 
 namespace ModelingProgram {
@@ -10,7 +12,7 @@ void reportVolume(SparseVolume const& volume, float least, float most, Report& r
     report.document["volume"] = {{"grid", volume.name}, {"activeVoxels", volume.activeCount()},
         {"voxelSize", numberOf(voxelSize)}, {"smallestValue", numberOf(least)}, {"largestValue", numberOf(most)},
         {"background", numberOf(volume.background)}};
-    report.text += fmt::format("grid \"{}\": {} of size {}, {}background {}\n", volume.name,
+    report.text += fmt::format("grid \"{}\": {} of size {}, {}background {}\n", printable(volume.name),
         countOf(volume.activeCount(), "active voxel"), voxelSize,
         volume.activeCount() == 0 ? "" : fmt::format("values from {} to {}, ", least, most), volume.background);
 }

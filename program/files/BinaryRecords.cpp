@@ -1,5 +1,6 @@
 #include "BinaryRecords.h"
 
+#include "WorkMeter.h"
 #include "copyStrided.h"
 
 #include "frame/ParallelFor.h"
@@ -52,6 +53,7 @@ bool forEachBlock(
             std::uint64_t const first = block * blockSize, end = std::min(records.count, first + blockSize);
             std::size_t const start = records.startOf(first), bytes = records.startOf(end) - start;
             char const* loaded = file.loadedBytes(start, bytes);
+            workMeter.add(loaded ? bytes / 2 : bytes); // loading counted the other half
             if (!loaded) {
                 if (bytes > capacity)
                     buffer = std::make_unique_for_overwrite<char[]>(capacity = bytes);

@@ -2,6 +2,7 @@
 
 #include "Hdf5File.h"
 #include "Readers.h"
+#include "WorkMeter.h"
 #include "Writers.h"
 
 #include <map>
@@ -71,6 +72,7 @@ std::vector<std::string> writeGeometryFile(
     if (format.write != writeObj)
         for (FaceNames const& names : geometry.faceNames)
             leaveOut(names.data, "only OBJ and HDF5 files can hold names of faces", geometry.leftOut);
+    workMeter.begin(WorkMeter::kBytes, estimateFileBytes(geometry, extensionOf(file)));
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }

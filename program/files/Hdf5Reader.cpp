@@ -2,6 +2,7 @@
 #include "Hdf5Names.h"
 #include "Hdf5Outline.h"
 #include "Hdf5Process.h"
+#include "WorkMeter.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -67,6 +68,7 @@ namespace {
                 to += count;
                 address += static_cast<std::uint64_t>(count);
                 bytes -= static_cast<std::uint64_t>(count);
+                workMeter.add(static_cast<std::uint64_t>(count));
             }
         }
 

@@ -155,6 +155,8 @@ namespace {
             , counter_(file, begin, end, TextScanner::Syntax::CommentsAndJoinedLines)
             , builder(in_, options)
         {
+            counter_.setWorkShare(4);
+            in_.setWorkShare(4);
         }
 
         /// Counts first, so that each index, which may refer forwards, can be checked when it is read.

@@ -1,5 +1,7 @@
 #include "OutputFile.h"
 
+#include "WorkMeter.h"
+
 #include <atomic>
 #include <cerrno>
 #include <cstdio>
@@ -135,6 +137,7 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
             fail(errno);
         data += written;
         bytes -= static_cast<std::size_t>(written);
+        workMeter.add(static_cast<std::uint64_t>(written));
     }
 }
 

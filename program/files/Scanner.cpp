@@ -1,5 +1,7 @@
 #include "Scanner.h"
 
+#include "WorkMeter.h"
+
 #include "frame/ParallelFor.h"
 
 #include <bit>
@@ -96,7 +98,9 @@ void InputFile::loadTo(std::size_t end) const
         tbb::blocked_range<std::size_t>(0, partCount, Modeling::kCoarseGrain), [&](auto const& parts) {
             for (std::size_t part = parts.begin(); part != parts.end(); ++part) {
                 std::size_t const first = begin + part * kPartBytes;
-                read(first, std::min(kPartBytes, end - first), bytes.get() + first);
+                std::size_t const count = std::min(kPartBytes, end - first);
+                read(first, count, bytes.get() + first);
+                workMeter.add(count / 2); // the other half of the work is to scan them
             }
         });
     loadedSize_ = end;
@@ -115,6 +119,12 @@ void InputFile::read(std::size_t offset, std::size_t count, void* target) const
         offset += static_cast<std::size_t>(done);
         count -= static_cast<std::size_t>(done);
     }
+}
+
+void Scanner::countChunk()
+{
+    workMeter.add((position() - counted_) / workShare_);
+    counted_ = position();
 }
 
 /// Double rounding, first to double and then to single precision, can miss the nearest float if the double is halfway

@@ -86,6 +86,7 @@ public:
         : file_(file)
         , at_(file.bytes.get() + start)
         , end_(file.bytes.get() + end)
+        , counted_(start)
     {
     }
     Scanner(Scanner const&) = delete;
@@ -106,6 +107,10 @@ public:
                 + std::to_string(remaining()) + " bytes follow");
     }
 
+    /// Reading a file counts as its bytes in `workMeter`: half of them when they are loaded, and half when they are
+    /// scanned. A reader that scans them twice sets 4 for both scanners.
+    void setWorkShare(std::size_t divisor) { workShare_ = divisor; }
+
     std::size_t position() const { return static_cast<std::size_t>(at_ - file_.bytes.get()); }
     std::size_t remaining() const { return static_cast<std::size_t>(end_ - at_); }
     bool atEnd() const { return at_ == end_; }
@@ -113,9 +118,23 @@ public:
 protected:
     virtual std::string location() const = 0;
 
+    /// Counts what has been scanned, in chunks.
+    void countWork()
+    {
+        constexpr std::size_t kChunk = std::size_t{1} << 20;
+        if (position() - counted_ >= kChunk)
+            countChunk();
+    }
+
     InputFile const& file_;
     char const* at_;
     char const* end_;
+
+private:
+    void countChunk();
+
+    std::size_t counted_;
+    std::size_t workShare_ = 2;
 };
 
 /// Reads binary numbers, optionally with swapped bytes. Positions are reported as elements, counted from 0.
@@ -131,6 +150,7 @@ public:
     {
         kind_ = kind;
         index_ = index;
+        countWork();
     }
     void endElement() { }
 
@@ -198,6 +218,7 @@ public:
     {
         auto const* const newline = static_cast<char const*>(std::memchr(at_, '\n', remaining()));
         at_ = newline ? newline + 1 : end_;
+        countWork();
     }
 
     void skipEmptyLines()

@@ -99,6 +99,24 @@ namespace {
 
 }
 
+std::uint64_t estimateFileBytes(WritableGeometry const& geometry, std::string_view extension)
+{
+    std::uint64_t const points = geometry.pointCount(), cells = geometry.cellCount();
+    std::uint64_t const corners = geometry.faceVertex ? geometry.faceVertex->size : cells != 0 ? points : 0;
+    if (extension == ".stl")
+        return 50 * cells;
+    std::uint64_t values = 0;
+    for (Attribute const& attribute : geometry.attributes)
+        visitArray(attribute.values, [&](auto const& array, auto) { values += array.size * sizeof(*array.data); });
+    if (extension == ".vtp")
+        return sizeof(float3) * points + sizeof(std::int64_t) * (corners + cells) + values;
+    if (extension != ".obj")
+        return sizeof(float3) * points + sizeof(std::int32_t) * corners + cells + values;
+    // Measured: about 10 characters per number and its blank.
+    std::uint64_t const indexCharacters = std::to_string(points).size() + 1;
+    return 32 * points + indexCharacters * corners + 2 * cells + values / sizeof(float) * 10;
+}
+
 GeoValidator::Status validateGeometry(Tessara::Object const& object)
 {
     switch (kindOf(object)) {

@@ -61,6 +61,9 @@ void leaveOut(Attribute const& attribute, std::string const& why, std::vector<st
 /// Validates an object with faces as a mesh, one with strands as a strand set, any other as a point cloud.
 Tessara::Geometry::GeoValidator::Status validateGeometry(Tessara::Object const& object);
 
+/// About how large the file will be.
+std::uint64_t estimateFileBytes(WritableGeometry const& geometry, std::string_view extension);
+
 /// Checks what all formats require: a valid object, finite positions, at least three corners per face.
 /// \throws FileError, which names the file
 WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file);

@@ -1,5 +1,6 @@
 #include "weldRecords.h"
 
+#include "WorkMeter.h"
 #include "Vectors.h"
 #include "Welder.h"
 
@@ -78,6 +79,7 @@ namespace {
                 std::uint64_t const count = std::min(kRecordsAtOnce, end - first);
                 std::size_t const start = records_.startOf(first), bytes = count * records_.recordBytes;
                 char const* at = file_.loadedBytes(start, bytes);
+                workMeter.add(bytes / 2); // the records are visited twice
                 if (!at) {
                     file_.read(start, bytes, buffer.get());
                     at = buffer.get();

@@ -143,11 +143,11 @@ std::vector<std::string> parseRequirements(std::string const& list)
     return names;
 }
 
-void requireProperties(
+std::optional<MeshTopology> requireProperties(
     std::vector<std::string> const& requirements, Tessara::Object const& object, std::string const& source)
 {
     if (requirements.empty() || Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
-        return;
+        return std::nullopt;
     std::optional<MeshTopology> topology;
     std::vector<std::string> missing;
     Faults reasons;
@@ -174,6 +174,7 @@ void requireProperties(
             fmt::format("{} does not meet --require {} (points and faces are counted from 0):", source,
                 fmt::join(missing, ",")),
             std::move(reasons));
+    return topology;
 }
 
 std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopology const& topology)

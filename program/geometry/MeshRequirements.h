@@ -3,6 +3,7 @@
 #include "Geometry.h"
 #include "MeshTopology.h"
 
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -26,7 +27,8 @@ std::vector<std::string> requirementNames();
 /// \throws Failure  if a name is unknown
 std::vector<std::string> parseRequirements(std::string const& list);
 /// Refuses geometry that does not meet all of these. Without points it meets any.
-void requireProperties(
+/// \return the topology of a mesh, if it was needed
+std::optional<MeshTopology> requireProperties(
     std::vector<std::string> const& requirements, Tessara::Object const& object, std::string const& source);
 
 /// Refuses an object of another type, on behalf of `command`. An object without points becomes an empty one of this type.

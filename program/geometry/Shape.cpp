@@ -279,11 +279,10 @@ double largestDistance(MeshArrays const& before, MeshArrays const& after)
     }).value);
 }
 
-Json countsAndShape(Tessara::Object const& object)
+Json countsAndShape(Tessara::Object const& mesh, Shape const& shape)
 {
-    Json values = countsOf(object);
-    if (typeOf(object) == GeometryType::Mesh)
-        addMeasures(examine(arraysOf(object)).shape, values);
+    Json values = countsOf(mesh);
+    addMeasures(shape, values);
     return values;
 }
 

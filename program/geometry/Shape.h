@@ -36,8 +36,8 @@ struct ExaminedMesh {
 /// Both at once, because finding the edges takes longer than either.
 ExaminedMesh examine(MeshArrays const& mesh);
 
-/// The numbers of elements, and the shape if the object is a mesh: for operations that do not move points.
-Json countsAndShape(Tessara::Object const& object);
+/// The numbers of elements, and the shape: for operations that do not move points.
+Json countsAndShape(Tessara::Object const& mesh, Shape const& shape);
 
 /// The points at edges whose two faces have normals that differ by more than `degrees`, or that have more than two
 /// faces, in ascending order. Faces without area have no normal and are ignored.

@@ -2,6 +2,7 @@
 
 #include "NearestPoint.h"
 #include "shell/Cancellation.h"
+#include "files/WorkMeter.h"
 #include "shell/Failure.h"
 
 #include <algorithm>
@@ -247,9 +248,12 @@ std::vector<Voxel> voxelsAround(MeshArrays const& mesh, SurfaceValue const& valu
         return Corner{inVoxels((*mesh.positions)[point], voxelSize),
             value.pointNumbers.empty() ? 0 : double{value.pointNumbers[point]}};
     };
+    workMeter.begin("faces", mesh.faceCount());
     for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
-        if (face % kFacesBetweenChecks == 0)
+        if (face % kFacesBetweenChecks == 0) {
             stopIfCancelled();
+            workMeter.set(face);
+        }
         auto const corners = mesh.corners(face);
         for (std::size_t i = 2; i < corners.size(); ++i)
             band.add({cornerAt(corners[0]), cornerAt(corners[i - 1]), cornerAt(corners[i])});

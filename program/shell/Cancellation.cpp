@@ -1,6 +1,7 @@
 #include "Cancellation.h"
 
 #include "Failure.h"
+#include "Progress.h"
 #include "files/OutputFile.h"
 
 #include <OrvanCppOpSDK/Job.h>
@@ -24,6 +25,7 @@ namespace {
     void endProgram(int signal)
     {
         OutputFile::removeUnfinished();
+        removeProgressBar();
         struct sigaction action = {};
         action.sa_handler = SIG_DFL;
         ::sigaction(signal, &action, nullptr);
@@ -39,6 +41,7 @@ namespace {
         }
         int const oldError = errno;
         Orvan::setJobCancelled(true);
+        removeProgressBar();
         // A failure to write cannot be reported anywhere.
         [[maybe_unused]] auto const written = ::write(STDERR_FILENO, kText, sizeof kText - 1);
         errno = oldError;

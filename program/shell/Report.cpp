@@ -1,5 +1,7 @@
 #include "Report.h"
 
+#include "Progress.h"
+
 #include <fmt/format.h>
 
 #include <algorithm>
@@ -59,6 +61,7 @@ namespace {
 }
 
 Report::Report(std::string const& command)
+    : name_(command)
 {
     document["command"] = command;
     document["warnings"] = Json::array();
@@ -69,7 +72,10 @@ Report Report::ofStep(std::size_t number, std::string const& name) const
     Report report;
     report.document = {{"step", number}, {"do", name}, {"warnings", Json::array()}};
     report.isJson = isJson;
-    report.prefix_ = fmt::format("step {} ({}): ", number, name);
+    report.isQuiet = isQuiet;
+    report.isStrict = isStrict;
+    report.name_ = fmt::format("step {} ({})", number, name);
+    report.isOfStep_ = true;
     return report;
 }
 
@@ -82,7 +88,14 @@ void Report::warn(std::string const& sentence)
 void Report::warnOfInput(std::string const& sentence)
 {
     document["warnings"].push_back(sentence);
-    std::fputs(fmt::format("modeling: warning: {}{}\n", prefix_, sentence).c_str(), stderr);
+    printMessage(fmt::format("modeling: warning: {}", isOfStep_ ? titleOf(sentence) : sentence));
+}
+
+std::string Report::titleOf(std::string const& what) const
+{
+    if (what.empty())
+        return name_;
+    return isOfStep_ ? fmt::format("{}: {}", name_, what) : what;
 }
 
 std::string toText(Json const& document)
@@ -148,26 +161,32 @@ std::string formatTable(std::vector<Column> const& columns, std::vector<std::vec
 {
     std::vector<std::string> titles;
     std::vector<std::size_t> widths;
+    std::vector<std::vector<std::string>> cells;
+    for (auto const& row : rows) {
+        cells.emplace_back();
+        for (std::string const& text : row)
+            cells.back().push_back(printable(text)); // names in files may contain anything
+    }
     for (std::size_t c = 0; c != columns.size(); ++c) {
         titles.push_back(columns[c].title);
         widths.push_back(widthOf(columns[c].title));
-        for (auto const& row : rows)
+        for (auto const& row : cells)
             widths[c] = std::max(widths[c], widthOf(row[c]));
     }
 
     std::string table;
-    auto const addLine = [&](std::vector<std::string> const& cells) {
+    auto const addLine = [&](std::vector<std::string> const& texts) {
         std::string line;
         for (std::size_t c = 0; c != columns.size(); ++c) {
-            std::string const padding(widths[c] - widthOf(cells[c]), ' ');
+            std::string const padding(widths[c] - widthOf(texts[c]), ' ');
             line += c == 0 ? "" : "   ";
-            line += columns[c].isNumber ? padding + cells[c] : cells[c] + padding;
+            line += columns[c].isNumber ? padding + texts[c] : texts[c] + padding;
         }
         table += line.substr(0, line.find_last_not_of(' ') + 1) + "\n";
     };
     if (std::any_of(titles.begin(), titles.end(), [](std::string const& title) { return !title.empty(); }))
         addLine(titles);
-    for (auto const& row : rows)
+    for (auto const& row : cells)
         addLine(row);
     return table;
 }

@@ -4,6 +4,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include <chrono>
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -12,6 +13,25 @@
 namespace ModelingProgram {
 
 using Json = nlohmann::ordered_json;
+
+class Phase;
+
+/// Where the time of a command went, in seconds.
+struct Times {
+    double reading = 0; // files, until the geometry has been validated
+    double operation = 0; // of the library
+    double report = 0; // checks of requirements, and facts such as topology and shape before and after
+    double writing = 0;
+
+    Times& operator+=(Times const& other)
+    {
+        reading += other.reading;
+        operation += other.operation;
+        report += other.report;
+        writing += other.writing;
+        return *this;
+    }
+};
 
 /// The output of a command. Results are printed to standard output when it ends, as text or as one JSON document;
 /// warnings are printed to standard error immediately and also added to the document.
@@ -26,19 +46,31 @@ public:
     /// A warning that is about an input file only, which --strict accepts.
     void warnOfInput(std::string const& sentence);
 
+    /// Whether facts that only the results and the warnings of the result show are worth their time.
+    bool needsFacts() const { return !isQuiet || isJson || isStrict; }
+
+    /// The title of a phase: "step 2 (smooth): reading a.txt". Without a text, the name of the command or step.
+    std::string titleOf(std::string const& text) const;
+
     Json document; // what --json prints
     std::vector<Json> lines; // if there are any, --json prints these documents instead, one per line
     std::string text; // what is printed without --json
     bool isJson = false; // standard output is reserved for the document
+    bool isQuiet = false; // the text is not printed
+    bool isStrict = false; // warnings about the result have an exit code of their own
     bool hasWarned = false; // about the result
     int exitCode = 0; // if the command does not fail
     std::vector<std::string> requirements; // what inputs have to be, as `parseRequirements` returns it
     ReadOptions reading; // of all files; the first file read determines the center to subtract
+    Times times; // of the phases that have ended
+    Phase* phase = nullptr; // the innermost one
+    std::chrono::steady_clock::time_point start = std::chrono::steady_clock::now();
 
 private:
     Report() = default;
 
-    std::string prefix_; // of warnings
+    std::string name_; // of the command, or "step 2 (smooth)"
+    bool isOfStep_ = false;
 };
 
 /// The document as it is printed. Invalid UTF-8, which names in files may contain, becomes replacement characters.

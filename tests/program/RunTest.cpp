@@ -74,6 +74,19 @@ TEST_F(Run, ReportsEachStepAndMergesFirst)
     EXPECT_EQ(report["steps"][1]["after"]["faces"], 1368);
     EXPECT_EQ(report["steps"][2]["do"], "triangulate");
     EXPECT_GE(report["seconds"].get<double>(), report["steps"][0]["seconds"].get<double>());
+    double operations = 0, sum = 0;
+    for (Json const& step : report["steps"]) {
+        operations += step["phaseSeconds"]["operation"].get<double>();
+        EXPECT_GE(step["phaseSeconds"]["operation"], step["seconds"]);
+        EXPECT_GT(step["phaseSeconds"]["report"], 0);
+    }
+    Json const& times = report["phaseSeconds"];
+    EXPECT_DOUBLE_EQ(times["operation"].get<double>(), operations);
+    for (char const* const part : {"reading", "operation", "report", "writing"}) {
+        EXPECT_GT(times[part], 0) << part;
+        sum += times[part].get<double>();
+    }
+    EXPECT_GE(times["total"], sum);
     EXPECT_EQ(report["output"], at("out.vtp"));
 
     // A template is laid on the current mesh, and the strands go on as the geometry.
@@ -119,6 +132,16 @@ TEST_F(Run, RefusesStepsThatCannotBe)
     EXPECT_THAT(
         run({"run", "a", "b", "c", "--do", "smooth"}).messages, HasSubstr("it takes one file, but 2 are given"));
     EXPECT_EQ(run({"run", "none.ply", at("out.stl"), "--do", "add-points none.ply"}).exitCode, 3);
+    EXPECT_THAT(run({"run", "-o", at("out.ply"), "--do", "merge"}).messages, HasSubstr("run needs input files"));
+    Result const unread = run({"run", sample("cube.ply"), "none.ply", at("out.ply"), "--json", "--do", "merge"});
+    EXPECT_THAT(unread.messages, HasSubstr("modeling: step 1 (merge): none.ply cannot be read"));
+    EXPECT_EQ(Json::parse(unread.output)["failedStep"], 1);
+    for (auto const& [last, exitCode] : {std::pair{"triangulate", 5}, {"delete-faces --attribute file", 0}}) {
+        Result const tagged = run({"run", sample("cube.ply"), sample("spider.obj"), at("out.obj"), "--do",
+            std::string("merge --source-attribute file;") + last});
+        EXPECT_EQ(tagged.exitCode, exitCode) << tagged.messages;
+        EXPECT_EQ(tagged.messages.find("step 1 (merge): --source-attribute: ") != std::string::npos, exitCode == 5);
+    }
     Result const failed = run(
         {"run", sample("cube.ply"), at("out.ply"), "--json", "--do", "triangulate; smooth; subdivide --relative 0.1"});
     Json const report = Json::parse(failed.output);
@@ -141,6 +164,11 @@ TEST_F(Run, ReadsTheRecipeThatItPrints)
     Json const printed = Json::parse(run({"run", "--do", steps, "--print-recipe"}).output);
     EXPECT_EQ(nlohmann::json(printed), nlohmann::json(expected));
     store(folder / "recipe.json", toText(expected));
+    EXPECT_EQ(Json::parse(run({"run", "--recipe", at("recipe.json"), "--print-recipe"}).output), printed);
+    Json floats = expected; // of programs that know no integers
+    floats["steps"][3]["max-memory"] = 1.5e9;
+    floats["steps"][4]["rotate"] = 3.0;
+    store(folder / "recipe.json", toText(floats));
     EXPECT_EQ(Json::parse(run({"run", "--recipe", at("recipe.json"), "--print-recipe"}).output), printed);
 
     store(
@@ -184,6 +212,7 @@ TEST_F(Run, RefusesRecipesAndSaysWhere)
         {step(R"({"do": "delete-faces", "box": [1, 2]})"), 2, "\"box\" has to be a list of 6 values, each a number"},
         {step(R"({"do": "delete-faces", "box": 1})"), 2, "\"box\" has to be a list of 6 values"},
         {step(R"({"do": "stitch", "template": ["a", "b"], "rotate": 1.5})"), 2, "\"rotate\" has to be a whole number"},
+        {step(R"({"do": "stitch", "template": ["a", "b"], "rotate": 1e300})"), 2, "has to be a whole number"},
         {step(R"({"do": "subdivide"})"), 2, "step 2 (subdivide): subdivide needs one of --tolerance, --relative"},
         {step(R"({"do": "subdivide", "relative": 1, "max-memory": []})"), 2, "has to be a number of bytes or a string"},
     };
