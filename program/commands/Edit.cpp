@@ -49,8 +49,14 @@ void Subject::setKnown(std::optional<ExaminedMesh> const& facts)
 
 Subject Edit::readSubject(std::vector<std::filesystem::path> const& files, Report& report)
 {
-    Input input = loadInput(files[0], report);
-    return {files[0].string(), std::move(input.object), std::move(input.topology), {}};
+    Subject subject{files[0].string(), loadGeometry(files[0], report)};
+    Phase const phase(report, &Times::report, kReportTitle);
+    requireProperties(report.requirements, *subject.object, subject.name, [&]() -> MeshTopology const& {
+        if (report.needsFacts())
+            subject.know();
+        return subject.knowTopology();
+    });
+    return subject;
 }
 
 void addEditCommand(EditKind const& kind, CommandLine& program, Invocation& invocation)

@@ -80,7 +80,9 @@ namespace {
                 report.document["skipped"].push_back({{"file", file}, {"reason", status.message().c_str()}});
                 continue;
             }
-            requireProperties(report.requirements, *object, file);
+            std::optional<MeshTopology> topology;
+            requireProperties(report.requirements, *object, file,
+                [&]() -> MeshTopology const& { return topology.emplace(analyzeTopology(arraysOf(*object))); });
             sources.objects.append(std::move(object));
             sources.files.push_back(file);
         }

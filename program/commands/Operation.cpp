@@ -234,7 +234,8 @@ Input loadInput(fs::path const& file, Report& report)
 {
     Input input{loadGeometry(file, report), {}};
     Phase const phase(report, &Times::report, "checking requirements");
-    input.topology = requireProperties(report.requirements, *input.object, file);
+    requireProperties(report.requirements, *input.object, file,
+        [&]() -> MeshTopology const& { return input.topology.emplace(analyzeTopology(arraysOf(*input.object))); });
     return input;
 }
 

@@ -143,12 +143,12 @@ std::vector<std::string> parseRequirements(std::string const& list)
     return names;
 }
 
-std::optional<MeshTopology> requireProperties(
-    std::vector<std::string> const& requirements, Tessara::Object const& object, std::string const& source)
+void requireProperties(std::vector<std::string> const& requirements, Tessara::Object const& object,
+    std::string const& source, std::function<MeshTopology const&()> const& findTopology)
 {
     if (requirements.empty() || Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0)
-        return std::nullopt;
-    std::optional<MeshTopology> topology;
+        return;
+    MeshTopology const* topology = nullptr;
     std::vector<std::string> missing;
     Faults reasons;
     for (Requirement const& requirement : kRequirements) {
@@ -160,7 +160,7 @@ std::optional<MeshTopology> requireProperties(
         else if (requirement.faults) {
             MeshArrays const mesh = arraysOf(object);
             if (!topology)
-                topology = analyzeTopology(mesh);
+                topology = &findTopology();
             faults = requirement.faults(mesh, *topology);
         }
         if (!faults.empty())
@@ -174,7 +174,6 @@ std::optional<MeshTopology> requireProperties(
             fmt::format("{} does not meet --require {} (points and faces are counted from 0):", source,
                 fmt::join(missing, ",")),
             std::move(reasons));
-    return topology;
 }
 
 std::vector<std::string> faultsOfClosedManifold(MeshArrays const& mesh, MeshTopology const& topology)

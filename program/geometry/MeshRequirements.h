@@ -3,7 +3,7 @@
 #include "Geometry.h"
 #include "MeshTopology.h"
 
-#include <optional>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -27,9 +27,9 @@ std::vector<std::string> requirementNames();
 /// \throws Failure  if a name is unknown
 std::vector<std::string> parseRequirements(std::string const& list);
 /// Refuses geometry that does not meet all of these. Without points it meets any.
-/// \return the topology of a mesh, if it was needed
-std::optional<MeshTopology> requireProperties(
-    std::vector<std::string> const& requirements, Tessara::Object const& object, std::string const& source);
+/// \param findTopology  called at most once, if a requirement needs the topology of a mesh
+void requireProperties(std::vector<std::string> const& requirements, Tessara::Object const& object,
+    std::string const& source, std::function<MeshTopology const&()> const& findTopology);
 
 /// Refuses an object of another type, on behalf of `command`. An object without points becomes an empty one of this type.
 /// \param source  where the object comes from, here and below: a file in most cases

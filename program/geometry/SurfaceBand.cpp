@@ -1,8 +1,8 @@
 #include "SurfaceBand.h"
 
 #include "NearestPoint.h"
-#include "shell/Cancellation.h"
 #include "files/WorkMeter.h"
+#include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
 #include <algorithm>
