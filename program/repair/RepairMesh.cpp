@@ -7,8 +7,10 @@
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Names.h>
 
-#include <array>
+#include <algorithm>
+#include <cstring>
 #include <numeric>
+#include <type_traits>
 
 namespace ModelingProgram {
 
@@ -102,7 +104,7 @@ namespace {
         Indices remap(count, Orvan::kUninitialized);
         Indices kept;
         for (unsigned int point = 0; point != count; ++point) {
-            bool const isWelded = point < mesh.isWelded.size && mesh.isWelded[point];
+            bool const isWelded = point < mesh.keptPoint.size && mesh.keptPoint[point] != point;
             if (!isKept[point] && !isWelded)
                 ++unusedCount;
             remap[point] = static_cast<unsigned int>(kept.size);
@@ -120,6 +122,35 @@ namespace {
         return unusedCount;
     }
 
+}
+
+std::vector<std::string> propertiesWithLosses(Indices const& keptPoint, Object const& original)
+{
+    std::vector<std::string> names;
+    auto const addIfDifferent = [&](Orvan::String const& name, auto const& values) {
+        using Element = std::remove_cvref_t<decltype(values[0])>;
+        for (std::size_t point = 0; point < std::min(keptPoint.size, values.size); ++point) {
+            Element const &value = values[point], &kept = values[keptPoint[point]];
+            bool isEqual = false;
+            if constexpr (std::is_trivially_copyable_v<Element>)
+                isEqual = std::memcmp(&value, &kept, sizeof(Element)) == 0; // NaN equals itself
+            else
+                isEqual = value == kept;
+            if (!isEqual) {
+                names.emplace_back(name.view());
+                return;
+            }
+        }
+    };
+    for (Orvan::String const& name : getGeoPropNamesByTarget(original, sPointComp)) {
+        if (name == sPointPosition)
+            continue;
+        if (auto const indices = getRangeGeoPropIndices(original, name))
+            addIfDifferent(name, *indices);
+        else if (auto const property = getDataGeoProperty(original, name))
+            visitArray(property->getProperty(sData), [&](auto const& values, auto) { addIfDifferent(name, values); });
+    }
+    return names;
 }
 
 RepairMesh::RepairMesh(Object const& mesh)

@@ -92,23 +92,23 @@ unsigned int weldPoints(double distance, RepairMesh& mesh)
 {
     unsigned int const count = mesh.arrays.pointCount();
     WeldGrid grid(distance, *mesh.arrays.positions);
-    std::vector<unsigned int> keptPoint(count);
-    mesh.isWelded = Orvan::Array<bool>(count, false);
+    Orvan::Array<unsigned int> keptPoint(count, Orvan::kUninitialized);
     unsigned int weldedCount = 0;
     for (unsigned int point = 0; point != count; ++point) {
         keptPoint[point] = grid.findOrKeep(point);
-        mesh.isWelded[point] = keptPoint[point] != point;
-        weldedCount += mesh.isWelded[point] ? 1u : 0u;
+        weldedCount += keptPoint[point] != point ? 1u : 0u;
     }
-    if (weldedCount != 0)
-        editArray(mesh.arrays.faceVertex, [&](Orvan::Array<unsigned int>& points) {
-            // Each corner writes its own entry.
-            Modeling::parallelFor(
-                tbb::blocked_range<std::size_t>(0, points.size, Modeling::kElementGrain), [&](auto const& corners) {
-                    for (std::size_t corner = corners.begin(); corner != corners.end(); ++corner)
-                        points[corner] = keptPoint[points[corner]];
-                });
-        });
+    if (weldedCount == 0)
+        return 0;
+    editArray(mesh.arrays.faceVertex, [&](Orvan::Array<unsigned int>& points) {
+        // Each corner writes its own entry.
+        Modeling::parallelFor(
+            tbb::blocked_range<std::size_t>(0, points.size, Modeling::kElementGrain), [&](auto const& corners) {
+                for (std::size_t corner = corners.begin(); corner != corners.end(); ++corner)
+                    points[corner] = keptPoint[points[corner]];
+            });
+    });
+    mesh.keptPoint = std::move(keptPoint);
     return weldedCount;
 }
 
