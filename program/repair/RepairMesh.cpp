@@ -15,7 +15,6 @@
 namespace ModelingProgram {
 
 using namespace Tessara::Geometry;
-using Modeling::parallelFor;
 using Tessara::Object;
 
 namespace {
@@ -44,7 +43,7 @@ namespace {
         auto result = Orvan::makePtr<Orvan::Array<T>>(Orvan::Array<T>(sources.size, Orvan::kUninitialized));
         auto own = makeMutable(std::move(result));
         // Each element writes its own value.
-        parallelFor(
+        Modeling::parallelFor(
             tbb::blocked_range<std::size_t>(0, sources.size, Modeling::kElementGrain), [&](auto const& elements) {
                 for (std::size_t element = elements.begin(); element != elements.end(); ++element)
                     own->data[element] = values[sources[element]];
