@@ -182,6 +182,9 @@ namespace {
                 shown[name] = count;
         }
         report.document["repairs"] = done;
+        if (!counts_.lossyProperties.empty())
+            report.warn(fmt::format("points that were merged had different values of {}; those of the lowest are kept",
+                listOf(counts_.lossyProperties)));
         if (counts_.conflictingEdges != 0)
             report.warn(fmt::format(
                 "the surface is not orientable, and was cut at {}", countOf(counts_.conflictingEdges, "edge")));

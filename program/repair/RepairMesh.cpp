@@ -7,13 +7,14 @@
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Names.h>
 
-#include <array>
+#include <algorithm>
+#include <cstring>
 #include <numeric>
+#include <type_traits>
 
 namespace ModelingProgram {
 
 using namespace Tessara::Geometry;
-using Modeling::parallelFor;
 using Tessara::Object;
 
 namespace {
@@ -42,7 +43,7 @@ namespace {
         auto result = Orvan::makePtr<Orvan::Array<T>>(Orvan::Array<T>(sources.size, Orvan::kUninitialized));
         auto own = makeMutable(std::move(result));
         // Each element writes its own value.
-        parallelFor(
+        Modeling::parallelFor(
             tbb::blocked_range<std::size_t>(0, sources.size, Modeling::kElementGrain), [&](auto const& elements) {
                 for (std::size_t element = elements.begin(); element != elements.end(); ++element)
                     own->data[element] = values[sources[element]];
@@ -102,7 +103,7 @@ namespace {
         Indices remap(count, Orvan::kUninitialized);
         Indices kept;
         for (unsigned int point = 0; point != count; ++point) {
-            bool const isWelded = point < mesh.isWelded.size && mesh.isWelded[point];
+            bool const isWelded = point < mesh.keptPoint.size && mesh.keptPoint[point] != point;
             if (!isKept[point] && !isWelded)
                 ++unusedCount;
             remap[point] = static_cast<unsigned int>(kept.size);
@@ -120,6 +121,35 @@ namespace {
         return unusedCount;
     }
 
+}
+
+std::vector<std::string> propertiesWithLosses(Indices const& keptPoint, Object const& original)
+{
+    std::vector<std::string> names;
+    auto const addIfDifferent = [&](Orvan::String const& name, auto const& values) {
+        using Element = std::remove_cvref_t<decltype(values[0])>;
+        for (std::size_t point = 0; point < std::min(keptPoint.size, values.size); ++point) {
+            Element const &value = values[point], &kept = values[keptPoint[point]];
+            bool isEqual = false;
+            if constexpr (std::is_trivially_copyable_v<Element>)
+                isEqual = std::memcmp(&value, &kept, sizeof(Element)) == 0; // NaN equals itself
+            else
+                isEqual = value == kept;
+            if (!isEqual) {
+                names.emplace_back(name.view());
+                return;
+            }
+        }
+    };
+    for (Orvan::String const& name : getGeoPropNamesByTarget(original, sPointComp)) {
+        if (name == sPointPosition)
+            continue;
+        if (auto const indices = getRangeGeoPropIndices(original, name))
+            addIfDifferent(name, *indices);
+        else if (auto const property = getDataGeoProperty(original, name))
+            visitArray(property->getProperty(sData), [&](auto const& values, auto) { addIfDifferent(name, values); });
+    }
+    return names;
 }
 
 RepairMesh::RepairMesh(Object const& mesh)

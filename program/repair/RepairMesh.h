@@ -5,7 +5,9 @@
 #include <OrvanCore/Array.h>
 #include <TessaraObject/Object.h>
 
+#include <string>
 #include <utility>
+#include <vector>
 
 namespace ModelingProgram {
 
@@ -19,7 +21,8 @@ struct RepairMesh {
     Orvan::Array<unsigned int> cornerSource;
     Orvan::Array<unsigned int> faceSource;
     Orvan::Array<bool> isFlipped; // for each face but those added; relative to the original mesh
-    Orvan::Array<bool> isWelded; // for each point: it was merged into another one; shorter than the points
+    Orvan::Array<unsigned int>
+        keptPoint; // for each point: the one that it was merged into, or itself; empty without merges
 
     /// Keeps the faces whose entry is false, in their order.
     void dropFaces(Orvan::Array<bool> const& isDropped);
@@ -32,6 +35,10 @@ template <class T, class Edit> void editArray(Orvan::Ptr<Orvan::Array<T>>& share
     edit(*own);
     shared = std::move(own);
 }
+
+/// The properties of points of which some point and the one that it was merged into have different values.
+std::vector<std::string> propertiesWithLosses(
+    Orvan::Array<unsigned int> const& keptPoint, Tessara::Object const& original);
 
 /// Drops points that were welded and, if `dropsUnused`, those that no face uses, and gives the object the arrays of the
 /// mesh and the properties of its elements: data of all element types, and ranges.

@@ -1,11 +1,13 @@
 #include "dropFaces.h"
 
+#include "frame/ParallelFor.h"
 #include "geometry/EdgeSides.h"
 
 #include <tbb/blocked_range.h>
 #include <tbb/parallel_reduce.h>
 
 #include <algorithm>
+#include <atomic>
 #include <cstdint>
 
 namespace ModelingProgram {
@@ -67,6 +69,18 @@ namespace {
             isClean = points[i] != points[after] && points[i] != points[after + 1 == count ? 0 : after + 1];
         }
         return isClean;
+    }
+
+    bool areClean(MeshArrays const& mesh)
+    {
+        std::atomic<bool> result = true;
+        // Only reads.
+        Modeling::parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount(), 10'000), [&](auto const& faces) {
+            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
+                if (!isClean(mesh, face))
+                    result.store(false, std::memory_order_relaxed);
+        });
+        return result;
     }
 
     /// A face as listed at its lowest point, the start of a form that does not depend on its first corner or direction.
@@ -204,11 +218,8 @@ namespace {
 DegenerateFaces dropDegenerateFaces(RepairMesh& mesh)
 {
     unsigned int const faceCount = mesh.arrays.faceCount();
-    unsigned int face = 0;
-    while (face != faceCount && isClean(mesh.arrays, face))
-        ++face;
     DegenerateFaces result;
-    if (face == faceCount)
+    if (areClean(mesh.arrays))
         return result;
 
     MeshArrays const old = mesh.arrays;
@@ -219,7 +230,7 @@ DegenerateFaces dropDegenerateFaces(RepairMesh& mesh)
     corners.reserve(old.cornerCount());
     Orvan::Array<bool> isDropped(faceCount, false);
     Outline outline;
-    for (face = 0; face != faceCount; ++face) {
+    for (unsigned int face = 0; face != faceCount; ++face) {
         outline.trim(old, face);
         std::size_t const oldSize = old.corners(face).size();
         isDropped[face] = outline.size() < 3;

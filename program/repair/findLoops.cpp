@@ -7,7 +7,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr unsigned int kNone = Tessara::Geometry::kInvalidIndex;
+    constexpr unsigned int kNoPlace = Tessara::Geometry::kInvalidIndex;
     constexpr std::size_t kMostCompared = 16; // boundaries at a point of which all pairs are compared
 
     /// An end of a boundary side at a point.
@@ -25,7 +25,7 @@ namespace {
             : position_(mesh.positions->data)
             , adjacency_(adjacency)
             , sides_(sides)
-            , followers_(sides.size(), kNone)
+            , followers_(sides.size(), kNoPlace)
         {
             std::vector<BoundaryEnd> in, out;
             for (unsigned int place = 0; place != sides.size(); ++place) {
@@ -122,7 +122,7 @@ namespace {
             , sides_(sides)
             , followers_(followers)
             , isVisited_(sides.size())
-            , depthOfPoint_(mesh.pointCount(), kNone)
+            , depthOfPoint_(mesh.pointCount(), kNoPlace)
         {
         }
 
@@ -130,7 +130,7 @@ namespace {
         {
             for (unsigned int first = 0; first != sides_.size(); ++first) {
                 unsigned int place = first;
-                for (; place != kNone && !isVisited_[place]; place = followers_[place]) {
+                for (; place != kNoPlace && !isVisited_[place]; place = followers_[place]) {
                     isVisited_[place] = true;
                     unsigned int const side = sides_[place];
                     closeLoopAt(adjacency_.startOf(side));
@@ -149,7 +149,7 @@ namespace {
         void closeLoopAt(unsigned int point)
         {
             unsigned int const depth = depthOfPoint_[point];
-            if (depth == kNone)
+            if (depth == kNoPlace)
                 return;
             loops_.sides.insert(loops_.sides.end(), path_.begin() + depth, path_.end());
             loops_.starts.push_back(loops_.sides.size());
@@ -159,7 +159,7 @@ namespace {
         void dropPath(std::size_t depth)
         {
             for (std::size_t i = depth; i != path_.size(); ++i)
-                depthOfPoint_[adjacency_.startOf(path_[i])] = kNone;
+                depthOfPoint_[adjacency_.startOf(path_[i])] = kNoPlace;
             path_.resize(depth);
         }
 

@@ -75,6 +75,7 @@ namespace {
                 turnOutward(mesh_, *adjacency_);
             counts_.flippedFaces =
                 static_cast<unsigned int>(std::count(mesh_.isFlipped.begin(), mesh_.isFlipped.end(), true));
+            counts_.lossyProperties = propertiesWithLosses(mesh_.keptPoint, object);
             counts_.unusedPoints = applyRepair(std::move(mesh_), steps_.unused, object);
             return counts_;
         }

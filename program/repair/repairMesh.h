@@ -6,6 +6,8 @@
 
 #include <cstddef>
 #include <limits>
+#include <string>
+#include <vector>
 
 namespace ModelingProgram {
 
@@ -30,6 +32,7 @@ struct RepairOptions {
 /// What a repair did.
 struct RepairCounts {
     unsigned int weldedPoints = 0;
+    std::vector<std::string> lossyProperties; // of points that were merged and had different values
     unsigned int degenerateFaces = 0; // dropped
     unsigned int shortenedFaces = 0; // faces that lost repeated corners
     unsigned int doubledFaces = 0; // dropped

@@ -14,7 +14,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr unsigned int kNone = Tessara::Geometry::kInvalidIndex;
+    constexpr unsigned int kNoPoint = Tessara::Geometry::kInvalidIndex;
 
     /// The points that were kept so far, in cells of space. Cells are twice as wide as the distance, so that the points
     /// within the distance of a point are in eight of them; and since kept points are farther apart than the distance,
@@ -24,8 +24,8 @@ namespace {
         WeldGrid(double distance, Orvan::Array<float3> const& positions)
             : position_(positions.data)
             , distance_(distance)
-            , heads_(std::bit_ceil(std::max<std::size_t>(positions.size, 16)), kNone)
-            , nextInSlot_(positions.size, kNone)
+            , heads_(std::bit_ceil(std::max<std::size_t>(positions.size, 16)), kNoPoint)
+            , nextInSlot_(positions.size, kNoPoint)
         {
         }
 
@@ -35,7 +35,7 @@ namespace {
             double3 const p = inDoubles(position_[point]);
             if (!isFinite(position_[point]))
                 return point;
-            unsigned int lowest = kNone;
+            unsigned int lowest = kNoPoint;
             if (distance_ == 0) {
                 lowest = lowestIn(slotOf(p), p);
             } else {
@@ -46,7 +46,7 @@ namespace {
                     lowest =
                         std::min(lowest, lowestIn(slotOf({c.x - (i & 1), c.y - (i >> 1 & 1), c.z - (i >> 2 & 1)}), p));
             }
-            if (lowest != kNone)
+            if (lowest != kNoPoint)
                 return lowest;
             std::size_t const slot = distance_ == 0
                 ? slotOf(p)
@@ -71,8 +71,8 @@ namespace {
 
         unsigned int lowestIn(std::size_t slot, double3 const& p) const
         {
-            unsigned int lowest = kNone;
-            for (unsigned int point = heads_[slot]; point != kNone; point = nextInSlot_[point]) {
+            unsigned int lowest = kNoPoint;
+            for (unsigned int point = heads_[slot]; point != kNoPoint; point = nextInSlot_[point]) {
                 double3 const d = inDoubles(position_[point]) - p;
                 if (point < lowest && dot(d, d) <= distance_ * distance_)
                     lowest = point;
@@ -92,23 +92,23 @@ unsigned int weldPoints(double distance, RepairMesh& mesh)
 {
     unsigned int const count = mesh.arrays.pointCount();
     WeldGrid grid(distance, *mesh.arrays.positions);
-    std::vector<unsigned int> keptPoint(count);
-    mesh.isWelded = Orvan::Array<bool>(count, false);
+    Orvan::Array<unsigned int> keptPoint(count, Orvan::kUninitialized);
     unsigned int weldedCount = 0;
     for (unsigned int point = 0; point != count; ++point) {
         keptPoint[point] = grid.findOrKeep(point);
-        mesh.isWelded[point] = keptPoint[point] != point;
-        weldedCount += mesh.isWelded[point] ? 1u : 0u;
+        weldedCount += keptPoint[point] != point ? 1u : 0u;
     }
-    if (weldedCount != 0)
-        editArray(mesh.arrays.faceVertex, [&](Orvan::Array<unsigned int>& points) {
-            // Each corner writes its own entry.
-            Modeling::parallelFor(
-                tbb::blocked_range<std::size_t>(0, points.size, Modeling::kElementGrain), [&](auto const& corners) {
-                    for (std::size_t corner = corners.begin(); corner != corners.end(); ++corner)
-                        points[corner] = keptPoint[points[corner]];
-                });
-        });
+    if (weldedCount == 0)
+        return 0;
+    editArray(mesh.arrays.faceVertex, [&](Orvan::Array<unsigned int>& points) {
+        // Each corner writes its own entry.
+        Modeling::parallelFor(
+            tbb::blocked_range<std::size_t>(0, points.size, Modeling::kElementGrain), [&](auto const& corners) {
+                for (std::size_t corner = corners.begin(); corner != corners.end(); ++corner)
+                    points[corner] = keptPoint[points[corner]];
+            });
+    });
+    mesh.keptPoint = std::move(keptPoint);
     return weldedCount;
 }
 

@@ -119,6 +119,13 @@ TEST_F(Commands, RepairMakesWhatOthersAccept)
     EXPECT_EQ(left.exitCode, 8);
     EXPECT_THAT(left.messages, HasSubstr("the result is not a closed manifold: 9 open edges. 3 holes have more edges"));
     EXPECT_EQ(run("repair sphere-with-hole.stl out.ply --only weld,orient --strict").exitCode, 0);
+    store(folder / "seam.ply",
+        plyOf(5,
+            "property float heat\nproperty float age\nelement face 2\nproperty list uchar int "
+            "vertex_indices\nend_header\n"
+            "0 0 0 1 7\n1 0 0 2 7\n0 1 0 3 7\n0 0 0 4 7\n1 1 0 5 7\n3 0 1 2\n3 1 4 2\n"));
+    EXPECT_THAT(run("repair seam.ply out.ply --only weld").messages,
+        HasSubstr("warning: points that were merged had different values of heat; those of the lowest are kept"));
     EXPECT_THAT(run("repair bunny.obj out.ply --skip fil").messages,
         HasSubstr("--skip: there is no step \"fil\"; did you mean fill?"));
 }
