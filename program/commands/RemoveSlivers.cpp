@@ -34,20 +34,20 @@ namespace {
             .showDefault();
     }
 
-    Json describeMesh(Object const& object, MeshTopology const& topology, float ratio)
+    Json describeMesh(Object const& object, ExaminedMesh const& mesh)
     {
         Json values = countsOf(object);
-        addPartsAndGenus(topology, values);
-        values["slivers"] = countSlivers(arraysOf(object), ratio);
+        addPartsAndGenus(mesh.topology, values);
+        values["slivers"] = mesh.sliverCount;
         return values;
     }
 
     void RemoveSlivers::run(Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
-        auto const [topology, shape] = examine(arraysOf(mesh));
-        requireClosedTriangleMesh(arraysOf(mesh), topology, {}, "remove-slivers", subject.name);
-        before_ = describeMesh(mesh, topology, ratio_);
+        ExaminedMesh const examined = examine(arraysOf(mesh), ratio_);
+        requireClosedTriangleMesh(arraysOf(mesh), examined.topology, {}, "remove-slivers", subject.name);
+        before_ = describeMesh(mesh, examined);
 
         // The operation keeps only the standard properties up to date; the others are dropped if elements were
         // renumbered.
@@ -59,9 +59,9 @@ namespace {
             dropped_.clear();
         }
 
-        auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
-        change_ = {shape, shapeAfter, largestDistance(arraysOf(mesh), arraysOf(result))};
-        after_ = describeMesh(result, topologyAfter, ratio_);
+        ExaminedMesh const examinedAfter = examine(arraysOf(result), ratio_);
+        change_ = {examined.shape, examinedAfter.shape, largestDistance(arraysOf(mesh), arraysOf(result))};
+        after_ = describeMesh(result, examinedAfter);
         addShape(change_, before_, after_);
         mesh = std::move(result);
     }

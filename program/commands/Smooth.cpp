@@ -204,9 +204,8 @@ namespace {
         moved_ = displacementOf(*arrays.positions, positions);
         dropped_ = moved_.largest != 0 ? dropNormals(mesh) : std::vector<std::string>();
         addDataProperty(sPointPosition, sPointComp, std::move(positions), mesh);
-        bool const isClosed = analyzeTopology(arrays, edges).isClosedManifold();
-        change_ = {shapeOf(arrays, edges, isClosed), shapeOf(arraysOf(mesh), edges, isClosed),
-            largestMove(arrays, arraysOf(mesh))};
+        change_ = {
+            examine(arrays, edges).shape, examine(arraysOf(mesh), edges).shape, largestMove(arrays, arraysOf(mesh))};
         after_ = describeMesh(mesh);
         addShape(change_, before_, after_);
     }

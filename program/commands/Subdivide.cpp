@@ -239,7 +239,7 @@ namespace {
         Object& mesh = *subject.object;
         if (options_.triangulates)
             mesh = triangulatedAs(inFineUnits(mesh), "*", mesh);
-        auto const [topology, shape] = examine(arraysOf(mesh));
+        auto const [topology, shape, slivers] = examine(arraysOf(mesh));
         requireClosedTriangleMesh(
             arraysOf(mesh), topology, faultsOfIsolatedPoints(arraysOf(mesh), topology), "subdivide", subject.name);
 
@@ -251,7 +251,7 @@ namespace {
 
         reportLargeFaces(largeFaces, guide.has_value(), report);
         dropped_ = explainDropped(mesh, result, report);
-        auto const [topologyAfter, shapeAfter] = examine(arraysOf(result));
+        auto const [topologyAfter, shapeAfter, sliversAfter] = examine(arraysOf(result));
         change_ = {shape, shapeAfter, largestMove(arraysOf(mesh), arraysOf(result))};
         before_ = countsOf(mesh);
         after_ = countsOf(result);

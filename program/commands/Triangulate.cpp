@@ -139,8 +139,8 @@ namespace {
         report.document["keptProperties"] = namesOfOtherProperties(result);
         report.document["channels"] = channels_;
         MeshArrays const arrays = arraysOf(mesh), triangles = arraysOf(result);
-        auto const [topology, shape] = examine(arrays);
-        auto const [topologyAfter, shapeAfter] = examine(triangles);
+        auto const [topology, shape, slivers] = examine(arrays);
+        auto const [topologyAfter, shapeAfter, sliversAfter] = examine(triangles);
         change_ = {shape, shapeAfter, largestMove(arrays, triangles)};
         before_ = describeMesh(mesh, topology);
         after_ = describeMesh(result, topologyAfter);

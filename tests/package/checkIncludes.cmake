@@ -12,7 +12,7 @@ endforeach()
 
 set(program_top commands files geometry shell)
 set(program_commands top files geometry shell)
-set(program_geometry shell frame) # the library's frame, for its lists of the corners at each point
+set(program_geometry shell frame) # the library's frame, for its lists of the corners at each point and its lanes
 set(program_shell files)
 set(program_files "")
 
