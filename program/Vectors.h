@@ -70,11 +70,11 @@ inline float distanceInFloats(float3 const& a, float3 const& b)
     return std::hypot(b.x - a.x, b.y - a.y, b.z - a.z);
 }
 
-/// In single precision, rounded exactly as the library rounds edge lengths, so that both find the same slivers.
-inline float edgeLengthInFloats(float3 const& a, float3 const& b)
+/// In single precision; its square root is rounded exactly as the library rounds edge lengths.
+inline float squaredEdgeLengthInFloats(float3 const& a, float3 const& b)
 {
     float3 const d{b.x - a.x, b.y - a.y, b.z - a.z};
-    return std::sqrt((d.x * d.x + d.y * d.y) + d.z * d.z);
+    return (d.x * d.x + d.y * d.y) + d.z * d.z;
 }
 
 }

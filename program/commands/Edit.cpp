@@ -31,14 +31,14 @@ MeshTopology const& Subject::knowTopology()
     return *topology;
 }
 
-ExaminedMesh Subject::know()
+ExaminedMesh Subject::know(float sliverRatio)
 {
     MeshArrays const mesh = arraysOf(*object);
-    if (!topology)
-        setKnown(examine(mesh));
-    else if (!shape)
-        shape = shapeOf(mesh, EdgeSides(mesh), topology->isClosedManifold());
-    return {*topology, *shape};
+    if (topology && shape)
+        return {*topology, *shape, sliverRatio > 0 ? countSlivers(mesh, {sliverRatio})[0] : 0};
+    ExaminedMesh const facts = examine(mesh, sliverRatio);
+    setKnown(facts);
+    return facts;
 }
 
 void Subject::setKnown(std::optional<ExaminedMesh> const& facts)

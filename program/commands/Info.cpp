@@ -32,9 +32,10 @@ namespace {
         values["isolatedPoints"] = topology.isolatedPoints.count;
         values["closedManifold"] = topology.isClosedManifold();
         values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
-        values["sliversBelow0.1"] = countSlivers(mesh, 0.1f);
-        values["sliversBelow0.05"] = countSlivers(mesh, 0.05f);
-        values["sliversBelow0.01"] = countSlivers(mesh, 0.01f);
+        auto const slivers = countSlivers(mesh, {0.1f, 0.05f, 0.01f});
+        values["sliversBelow0.1"] = slivers[0];
+        values["sliversBelow0.05"] = slivers[1];
+        values["sliversBelow0.01"] = slivers[2];
         return values;
     }
 

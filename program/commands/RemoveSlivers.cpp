@@ -34,21 +34,21 @@ namespace {
             .showDefault();
     }
 
-    Json describeMesh(Object const& object, MeshTopology const& topology, float ratio)
+    Json describeMesh(Object const& object, ExaminedMesh const& mesh)
     {
         Json values = countsOf(object);
-        addPartsAndGenus(topology, values);
-        values["slivers"] = countSlivers(arraysOf(object), ratio);
+        addPartsAndGenus(mesh.topology, values);
+        values["slivers"] = mesh.sliverCount;
         return values;
     }
 
     void RemoveSlivers::run(Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
+        ExaminedMesh before;
         if (report.needsFacts())
-            subject.know(); // together with the topology, the shape takes half the time
-        MeshTopology const topology = subject.knowTopology();
-        requireClosedTriangleMesh(arraysOf(mesh), topology, {}, "remove-slivers", subject.name);
+            before = subject.know(ratio_);
+        requireClosedTriangleMesh(arraysOf(mesh), subject.knowTopology(), {}, "remove-slivers", subject.name);
 
         // The operation keeps only the standard properties up to date; the others are dropped if elements were
         // renumbered.
@@ -62,10 +62,10 @@ namespace {
 
         std::optional<ExaminedMesh> after;
         if (report.needsFacts()) {
-            after = examine(arraysOf(result));
-            change_ = {subject.know().shape, after->shape, largestDistance(arraysOf(mesh), arraysOf(result))};
-            before_ = describeMesh(mesh, topology, ratio_);
-            after_ = describeMesh(result, after->topology, ratio_);
+            after = examine(arraysOf(result), ratio_);
+            change_ = {before.shape, after->shape, largestDistance(arraysOf(mesh), arraysOf(result))};
+            before_ = describeMesh(mesh, before);
+            after_ = describeMesh(result, *after);
             addShape(change_, before_, after_);
         }
         mesh = std::move(result);

@@ -234,11 +234,9 @@ namespace {
             subject.shape.reset(); // the topology stays
             return;
         }
-        if (!subject.topology)
-            subject.topology = analyzeTopology(arrays, *edges);
-        bool const isClosed = subject.topology->isClosedManifold();
-        change_ = {subject.shape ? *subject.shape : shapeOf(arrays, *edges, isClosed),
-            shapeOf(arraysOf(mesh), *edges, isClosed), largestMove(arrays, arraysOf(mesh))};
+        if (!subject.topology || !subject.shape)
+            subject.setKnown(examine(arrays, *edges));
+        change_ = {*subject.shape, examine(arraysOf(mesh), *edges).shape, largestMove(arrays, arraysOf(mesh))};
         subject.shape = change_.after;
         after_ = describeMesh(mesh);
         addShape(change_, before_, after_);

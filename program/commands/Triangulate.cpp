@@ -141,7 +141,7 @@ namespace {
         std::optional<ExaminedMesh> after;
         if (report.needsFacts()) {
             MeshArrays const arrays = arraysOf(mesh), triangles = arraysOf(result);
-            auto const [topology, shape] = subject.know();
+            auto const [topology, shape, slivers] = subject.know();
             after = examine(triangles);
             change_ = {shape, after->shape, largestMove(arrays, triangles)};
             before_ = describeMesh(mesh, topology);

@@ -284,7 +284,7 @@ namespace {
                 std::uint64_t point = builder_.pointCount();
                 if (kind_ == Mode::Triangles)
                     point = firstPoint
-                        + welder.numberOf(
+                        + welder.numberOfPosition(
                             {static_cast<float>(local.x), static_cast<float>(local.y), static_cast<float>(local.z)});
                 if (point == builder_.pointCount()) {
                     double3 const p = isMoved ? transform.apply(local) : local;

@@ -174,8 +174,8 @@ namespace {
             Coordinate const x = coordinateFrom(in), y = coordinateFrom(in), z = coordinateFrom(in);
             // If positions are translated, those that differ only in double precision become different points.
             unsigned int const point = builder_.movesPositions()
-                ? widePoints_.numberOf({x.value, y.value, z.value})
-                : points_.numberOf(
+                ? widePoints_.numberOfPosition({x.value, y.value, z.value})
+                : points_.numberOfPosition(
                     {static_cast<float>(x.value), static_cast<float>(y.value), static_cast<float>(z.value)});
             if (point == builder_.pointCount())
                 builder_.addPoint(x, y, z);

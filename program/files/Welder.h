@@ -5,7 +5,9 @@
 #include <OrvanCore/Array.h>
 
 #include <bit>
+#include <cmath>
 #include <cstdint>
+#include <utility>
 
 namespace ModelingProgram {
 
@@ -43,6 +45,16 @@ public:
         return slots_[slot] - 1;
     }
 
+    /// The same for positions. Those that are NaN or infinite are all different: they are left out later, and each one is
+    /// counted.
+    unsigned int numberOfPosition(T const& position)
+    {
+        if (std::isfinite(position.x) && std::isfinite(position.y) && std::isfinite(position.z))
+            return numberOf(position);
+        values_.append(position);
+        return static_cast<unsigned int>(values_.size - 1);
+    }
+
     Orvan::Array<T> const& values() const { return values_; }
 
 private:
@@ -50,12 +62,15 @@ private:
 
     void grow()
     {
-        slots_ = Orvan::Array<unsigned int>(slots_.empty() ? 1024 : 2 * slots_.size);
-        for (unsigned int number = 0; number < values_.size; ++number) {
-            std::uint64_t slot = slotOf(values_[number]);
+        Orvan::Array<unsigned int> const known = std::move(slots_);
+        slots_ = Orvan::Array<unsigned int>(known.empty() ? 1024 : 2 * known.size);
+        for (unsigned int const number : known) {
+            if (number == 0)
+                continue;
+            std::uint64_t slot = slotOf(values_[number - 1]);
             while (slots_[slot] != 0)
                 slot = (slot + 1) & (slots_.size - 1);
-            slots_[slot] = number + 1;
+            slots_[slot] = number;
         }
     }
 

@@ -63,6 +63,8 @@ public:
 
     unsigned int faceOf(unsigned int corner) const
     {
+        if (cornersPerFace_ == 3) // dividing by a constant is faster
+            return corner / 3;
         return cornersPerFace_ != 0 ? corner / cornersPerFace_ : faceOfCorner_[corner];
     }
 

@@ -7,12 +7,6 @@
 
 namespace ModelingProgram {
 
-std::span<unsigned int const> MeshArrays::corners(unsigned int face) const
-{
-    unsigned int const first = (*faceOffset)[face];
-    return {faceVertex->data + first, (*faceOffset)[face + 1] - first};
-}
-
 unsigned int MeshArrays::faceOf(unsigned int corner) const
 {
     // The last face that begins at or before the corner contains it, since faces without corners end where they begin.

@@ -1,6 +1,7 @@
 #include "MeshTopology.h"
 
 #include "ClosedFan.h"
+#include "Creases.h"
 #include "EdgeSides.h"
 #include "connectedComponents.h"
 
@@ -11,7 +12,7 @@
 #include <algorithm>
 #include <array>
 #include <bit>
-#include <limits>
+#include <functional>
 #include <numeric>
 #include <vector>
 
@@ -66,12 +67,32 @@ namespace {
         friend auto operator<=>(SideEnd const&, SideEnd const&) = default;
     };
 
-    /// The sides at one point: which edges they form, and how these connect the corners of the faces to fans.
+    /// The sides at one point: which edges they form, and how these connect the corners of the faces to fans. Can be used
+    /// for one point after the other, which saves allocations.
     class PointStar {
     public:
-        PointStar(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point)
-            : point_(point)
+        void examine(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point, MeshTopology& topology)
         {
+            collect(mesh, edges, point);
+            for (auto first = ends_.begin(); first != ends_.end();) {
+                auto const last = std::find_if(
+                    first, ends_.end(), [=](SideEnd const& end) { return end.otherPoint != first->otherPoint; });
+                if (point < first->otherPoint) // each edge once
+                    examineEdge({first, last}, topology);
+                for (SideEnd const& end : std::span(first, last))
+                    joined_.push_back({first->corner, end.corner});
+                first = last;
+            }
+            if (countFans() > 1)
+                topology.nonManifoldPoints.add(point);
+        }
+
+    private:
+        void collect(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point)
+        {
+            corners_.clear();
+            ends_.clear();
+            joined_.clear();
             unsigned int const* const pointAt = mesh.faceVertex->data;
             edges.forEachCornerAt(point, [&](CornerNeighbors const& at) {
                 corners_.push_back(at.corner);
@@ -85,22 +106,6 @@ namespace {
             std::sort(ends_.begin(), ends_.end());
         }
 
-        void examine(MeshTopology& topology)
-        {
-            for (auto first = ends_.begin(); first != ends_.end();) {
-                auto const last = std::find_if(
-                    first, ends_.end(), [=](SideEnd const& end) { return end.otherPoint != first->otherPoint; });
-                if (point_ < first->otherPoint) // each edge once
-                    examineEdge({first, last}, topology);
-                for (SideEnd const& end : std::span(first, last))
-                    joined_.push_back({first->corner, end.corner});
-                first = last;
-            }
-            if (countFans() > 1)
-                topology.nonManifoldPoints.add(point_);
-        }
-
-    private:
         static void examineEdge(std::span<SideEnd const> sides, MeshTopology& topology)
         {
             ++topology.edgeCount;
@@ -120,53 +125,57 @@ namespace {
         }
 
         /// The number of sets of corners that `joined_` connects.
-        std::size_t countFans() const
+        std::size_t countFans()
         {
-            std::vector<std::size_t> parents(corners_.size());
-            std::iota(parents.begin(), parents.end(), std::size_t{0});
+            parents_.resize(corners_.size());
+            std::iota(parents_.begin(), parents_.end(), std::size_t{0});
             auto const find = [&](unsigned int corner) {
                 auto i = static_cast<std::size_t>(
                     std::lower_bound(corners_.begin(), corners_.end(), corner) - corners_.begin());
-                while (parents[i] != i)
-                    i = parents[i] = parents[parents[i]];
+                while (parents_[i] != i)
+                    i = parents_[i] = parents_[parents_[i]];
                 return i;
             };
             std::size_t count = corners_.size();
             for (auto const& [a, b] : joined_)
                 if (std::size_t const i = find(a), k = find(b); i != k) {
-                    parents[std::max(i, k)] = std::min(i, k);
+                    parents_[std::max(i, k)] = std::min(i, k);
                     --count;
                 }
             return count;
         }
 
-        unsigned int point_;
         std::vector<unsigned int> corners_; // ascending
         std::vector<SideEnd> ends_;
         std::vector<std::array<unsigned int, 2>> joined_; // pairs of corners
+        std::vector<std::size_t> parents_; // of the indices of corners, in sets of joined ones
     };
 
-    void examinePoint(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point, MeshTopology& topology)
-    {
-        if (edges.cornersAt(point).empty())
-            topology.isolatedPoints.add(point);
-        else if (ClosedFan const fan(mesh, edges, point); fan)
-            fan.forEachHigherEdge([&](unsigned int, unsigned int) { ++topology.edgeCount; });
-        else
-            PointStar(mesh, edges, point).examine(topology);
-    }
-
-    bool isSliver(std::span<unsigned int const> corners, float3 const* position, float ratio)
-    {
-        float shortest = std::numeric_limits<float>::max();
-        float longest = 0;
-        for (std::size_t k = 0; k != corners.size(); ++k) {
-            float const edge =
-                edgeLengthInFloats(position[corners[k]], position[corners[k + 1 == corners.size() ? 0 : k + 1]]);
-            shortest = std::min(shortest, edge);
-            longest = std::max(longest, edge);
+    /// What was found at some points, and scratch memory for the next one.
+    struct PointFindings {
+        MeshTopology topology;
+        PointStar star;
+        PointFindings& operator+=(PointFindings const& other)
+        {
+            topology += other.topology;
+            return *this;
         }
-        return longest * ratio > shortest;
+    };
+
+    /// \return a point of the same component, not higher than this one
+    unsigned int examinePoint(MeshArrays const& mesh, EdgeSides const& edges, Creases const* creases,
+        unsigned int point, PointFindings& found)
+    {
+        if (ClosedFan const fan(mesh, edges, point); fan) {
+            found.topology.edgeCount += fan.higherEdgeCount();
+            found.topology.sharpEdgeCount += creases ? creases->countHigherAt(fan) : 0;
+            return std::min(fan.lowestNeighbor(), point);
+        }
+        if (edges.cornersAt(point).empty())
+            found.topology.isolatedPoints.add(point);
+        found.star.examine(mesh, edges, point, found.topology);
+        found.topology.sharpEdgeCount += creases ? creases->countHigherAt(point) : 0;
+        return point;
     }
 
 }
@@ -180,6 +189,7 @@ MeshTopology& MeshTopology::operator+=(MeshTopology const& other)
 {
     triangleCount += other.triangleCount;
     edgeCount += other.edgeCount;
+    sharpEdgeCount += other.sharpEdgeCount;
     for (Finding MeshTopology::*const finding : {&MeshTopology::facesBelowThreeCorners, &MeshTopology::quads,
              &MeshTopology::polygons, &MeshTopology::facesWithRepeatedPoints, &MeshTopology::boundaryEdges,
              &MeshTopology::nonManifoldEdges, &MeshTopology::windingConflicts, &MeshTopology::flippedEdges,
@@ -193,13 +203,15 @@ MeshTopology analyzeTopology(MeshArrays const& mesh)
     return analyzeTopology(mesh, EdgeSides(mesh));
 }
 
-MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges)
+MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges, Creases const* creases)
 {
     auto topology = findInAll<MeshTopology>(
         mesh.faceCount(), [&](unsigned int face, MeshTopology& found) { countFace(mesh, face, found); });
-    topology += findInAll<MeshTopology>(
-        mesh.pointCount(), [&](unsigned int point, MeshTopology& found) { examinePoint(mesh, edges, point, found); });
-    topology.partCount = countConnectedComponents(mesh, edges);
+    Orvan::Array<unsigned int> lowerInParts(mesh.pointCount(), Orvan::kUninitialized);
+    topology += findInAll<PointFindings>(mesh.pointCount(), [&](unsigned int point, PointFindings& found) {
+        lowerInParts.data[point] = examinePoint(mesh, edges, creases, point, found);
+    }).topology;
+    topology.partCount = countConnectedComponents(mesh, edges, std::move(lowerInParts));
     if (topology.isClosedManifold()) {
         auto const points = static_cast<std::int64_t>(mesh.pointCount() - topology.isolatedPoints.count);
         std::int64_t const eulerCharacteristic =
@@ -228,11 +240,28 @@ Finding findIsolatedPoints(MeshArrays const& mesh)
     return isolated;
 }
 
-std::uint64_t countSlivers(MeshArrays const& mesh, float ratio)
+std::vector<std::uint64_t> countSlivers(MeshArrays const& mesh, std::vector<float> const& ratios)
 {
-    return findInAll<std::uint64_t>(mesh.faceCount(), [&](unsigned int face, std::uint64_t& count) {
-        count += isSliver(mesh.corners(face), mesh.positions->data, ratio) ? 1u : 0u;
+    struct Counts : std::vector<std::uint64_t> {
+        Counts& operator+=(Counts const& other)
+        {
+            resize(std::max(size(), other.size()));
+            std::transform(other.begin(), other.end(), begin(), begin(), std::plus<>());
+            return *this;
+        }
+    };
+    Counts counts = findInAll<Counts>(mesh.faceCount(), [&](unsigned int face, Counts& found) {
+        std::span<unsigned int const> const corners = mesh.corners(face);
+        EdgeRange const edges = corners.size() == 3 ? squaredEdgeRange(corners.first<3>(), mesh.positions->data)
+                                                    : squaredEdgeRange(corners, mesh.positions->data);
+        for (std::size_t i = 0; i != ratios.size(); ++i)
+            if (isSliver(edges, ratios[i])) {
+                found.resize(ratios.size());
+                ++found[i];
+            }
     });
+    counts.resize(ratios.size());
+    return counts;
 }
 
 std::uint64_t countCoincidentPoints(MeshArrays const& mesh)

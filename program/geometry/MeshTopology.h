@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <optional>
+#include <vector>
 
 namespace ModelingProgram {
 
@@ -46,6 +47,7 @@ struct MeshTopology {
     Finding nonManifoldEdges; // edges with more than two sides
     Finding windingConflicts; // edges with two or more sides in the same direction; counted per direction
     Finding flippedEdges; // edges with two sides, both in the same direction
+    std::uint64_t sharpEdgeCount = 0; // edges with two sides that are creases, if they are looked for
 
     // `first` is the lowest point.
     Finding nonManifoldPoints; // non-manifold vertices: their faces are not all connected by edges at the point
@@ -62,13 +64,14 @@ struct MeshTopology {
     MeshTopology& operator+=(MeshTopology const& other);
 };
 
+class Creases;
 class EdgeSides;
 
 /// Accepts any valid mesh. Runs in parallel, with the same result for any number of threads. Linear, except for sorting
 /// the edges at each point; needs up to 8 bytes per corner and per point.
 MeshTopology analyzeTopology(MeshArrays const& mesh);
-/// The same for callers that already have the edges of the mesh.
-MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges);
+/// The same for callers that already have the edges of the mesh. Also counts sharp edges if there are creases.
+MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges, Creases const* creases = nullptr);
 
 /// Adds the rows "parts" and "genus" to the table of a command.
 void addPartsAndGenus(MeshTopology const& topology, Json& values);
@@ -76,9 +79,9 @@ void addPartsAndGenus(MeshTopology const& topology, Json& values);
 /// The points that no face uses.
 Finding findIsolatedPoints(MeshArrays const& mesh);
 
-/// The number of faces whose shortest edge is shorter than `ratio` times their longest edge, with edge lengths rounded
-/// as in the library.
-std::uint64_t countSlivers(MeshArrays const& mesh, float ratio);
+/// The numbers of slivers for several ratios. A sliver is a face whose shortest edge is shorter than the ratio times its
+/// longest edge, with edge lengths rounded as in the library.
+std::vector<std::uint64_t> countSlivers(MeshArrays const& mesh, std::vector<float> const& ratios);
 
 /// The number of points at exactly the same position as an earlier point: many of them suggest that the mesh is split
 /// along seams.

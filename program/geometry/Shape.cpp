@@ -1,6 +1,6 @@
 #include "Shape.h"
 
-#include "ClosedFan.h"
+#include "Creases.h"
 #include "Geometry.h"
 #include "SurfaceTree.h"
 
@@ -9,9 +9,9 @@
 #include <tbb/parallel_for.h>
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <limits>
-#include <numbers>
 #include <string>
 
 namespace ModelingProgram {
@@ -84,93 +84,57 @@ namespace {
         });
     }
 
-    std::vector<double3> areaVectors(MeshArrays const& mesh)
-    {
-        std::vector<double3> vectors(mesh.faceCount());
-        tbb::parallel_for(tbb::blocked_range<unsigned int>(0, mesh.faceCount(), 1000), [&](auto const& faces) {
-            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                vectors[face] = areaVector(mesh.corners(face), mesh.positions->data);
-        });
-        return vectors;
-    }
-
     struct Measures {
         double area = 0;
         double volume = 0;
+        std::uint64_t sliverCount = 0;
         Measures& operator+=(Measures const& other)
         {
             area += other.area;
             volume += other.volume;
+            sliverCount += other.sliverCount;
             return *this;
         }
     };
 
-    /// \param origin  inside or near the mesh: far away, the signed volumes of faces would suffer from cancellation
-    Measures measure(MeshArrays const& mesh, std::vector<double3> const& vectors, double3 const& origin)
-    {
-        return sumOverBlocks<Measures>(vectors.size(), [&](std::size_t begin, std::size_t end) {
-            Measures sum;
-            for (std::size_t face = begin; face != end; ++face) {
-                auto const corners = mesh.corners(static_cast<unsigned int>(face));
-                if (corners.empty())
-                    continue;
-                sum.area += length(vectors[face]) / 2;
-                sum.volume += dot(inDoubles((*mesh.positions)[corners[0]]) - origin, vectors[face]) / 6;
-            }
-            return sum;
-        });
-    }
-
-    /// Classifies edges by the angle between the normals of their faces.
-    class Creases {
-    public:
-        Creases(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors, double degrees)
-            : mesh_(mesh)
-            , edges_(edges)
-            , vectors_(vectors)
-            , cosine_(std::cos(degrees * std::numbers::pi / 180))
-        {
-        }
-
-        /// Whether the normals at an edge with two sides differ by more than the angle.
-        bool isSharp(std::span<Side const> sides) const
-        {
-            unsigned int const a = sides[0].corner, b = sides[1].corner;
-            return isSharp(a, b, (*mesh_.faceVertex)[a] != (*mesh_.faceVertex)[b]);
-        }
-
-        /// The same for an edge of the faces of these corners.
-        /// \param areOriented  whether the faces traverse the edge in opposite directions
-        bool isSharp(unsigned int cornerOfA, unsigned int cornerOfB, bool areOriented) const
-        {
-            double3 const &a = vectors_[edges_.faceOf(cornerOfA)], &b = vectors_[edges_.faceOf(cornerOfB)];
-            double const product = areOriented ? dot(a, b) : -dot(a, b);
-            double const lengths = std::sqrt(dot(a, a) * dot(b, b));
-            return lengths > 0 && product < cosine_ * lengths;
-        }
-
-    private:
-        MeshArrays const& mesh_;
-        EdgeSides const& edges_;
-        std::vector<double3> const& vectors_;
-        double cosine_;
+    /// Some faces between two phases: each phase alone runs without waiting for the slow divisions and square roots.
+    struct FaceBatch {
+        static constexpr std::size_t kSize = 64;
+        std::array<double3, kSize> vectors; // area vectors
+        std::array<double, kSize> areas; // twice
+        std::array<double, kSize> volumes; // six times
     };
 
-    std::uint64_t countFoldOvers(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors)
+    /// Measures the faces and sets their normals.
+    /// \param origin  inside or near the mesh: far away, the signed volumes of faces would suffer from cancellation
+    Measures measure(MeshArrays const& mesh, double3 const& origin, float sliverRatio, CompactNormal* normals)
     {
-        Creases const creases(mesh, edges, vectors, kFoldOverDegrees);
-        return sumOverBlocks<std::uint64_t>(mesh.pointCount(), [&](std::size_t begin, std::size_t end) {
-            std::uint64_t count = 0;
-            for (auto point = static_cast<unsigned int>(begin); point != end; ++point) {
-                if (ClosedFan const fan(mesh, edges, point); fan)
-                    fan.forEachHigherEdge(
-                        [&](unsigned int a, unsigned int b) { count += creases.isSharp(a, b, true) ? 1u : 0u; });
+        float3 const* const position = mesh.positions->data;
+        auto const measureFace = [=](auto corners, std::size_t i, FaceBatch& batch, Measures& sum) {
+            batch.vectors[i] = areaVector(corners, position);
+            batch.volumes[i] = corners.empty() ? 0 : dot(inDoubles(position[corners[0]]) - origin, batch.vectors[i]);
+            sum.sliverCount += isSliver(squaredEdgeRange(corners, position), sliverRatio) ? 1u : 0u;
+        };
+        auto const measureBatch = [=, &mesh](std::size_t begin, std::size_t count, FaceBatch& batch, Measures& sum) {
+            for (std::size_t i = 0; i != count; ++i)
+                if (auto const corners = mesh.corners(static_cast<unsigned int>(begin + i)); corners.size() == 3)
+                    measureFace(corners.first<3>(), i, batch, sum);
                 else
-                    edges.forEachEdge(point, point + 1, [&](unsigned int, std::span<Side const> sides) {
-                        count += sides.size() == 2 && creases.isSharp(sides) ? 1u : 0u;
-                    });
+                    measureFace(corners, i, batch, sum);
+            for (std::size_t i = 0; i != count; ++i)
+                batch.areas[i] = length(batch.vectors[i]);
+            for (std::size_t i = 0; i != count; ++i) {
+                normals[begin + i] = CompactNormal(batch.vectors[i], batch.areas[i]);
+                sum.area += batch.areas[i] / 2;
+                sum.volume += batch.volumes[i] / 6;
             }
-            return count;
+        };
+        return sumOverBlocks<Measures>(mesh.faceCount(), [=](std::size_t begin, std::size_t end) {
+            Measures sum;
+            FaceBatch batch;
+            for (; begin < end; begin += FaceBatch::kSize)
+                measureBatch(begin, std::min(FaceBatch::kSize, end - begin), batch, sum);
+            return sum;
         });
     }
 
@@ -214,33 +178,29 @@ namespace {
 
 }
 
-Shape shapeOf(MeshArrays const& mesh, EdgeSides const& edges, bool isClosed)
+ExaminedMesh examine(MeshArrays const& mesh, float sliverRatio)
 {
-    Shape shape;
-    if (mesh.pointCount() == 0)
-        return shape;
-    Extent const extent = extentOf(mesh);
-    std::vector<double3> const vectors = areaVectors(mesh);
-    Measures const measures = measure(mesh, vectors, extent.min);
-    if (isClosed)
-        shape.volume = measures.volume;
-    shape.area = measures.area;
-    shape.foldOvers = countFoldOvers(mesh, edges, vectors);
-    shape.diagonal = length(extent.max - extent.min);
-    return shape;
+    return examine(mesh, EdgeSides(mesh), sliverRatio);
 }
 
-ExaminedMesh examine(MeshArrays const& mesh)
+ExaminedMesh examine(MeshArrays const& mesh, EdgeSides const& edges, float sliverRatio)
 {
-    EdgeSides const edges(mesh);
-    MeshTopology const topology = analyzeTopology(mesh, edges);
-    return {topology, shapeOf(mesh, edges, topology.isClosedManifold())};
+    Extent const extent = mesh.pointCount() == 0 ? Extent{{}, {}} : extentOf(mesh);
+    Orvan::Array<CompactNormal> normals(mesh.faceCount(), Orvan::kUninitialized);
+    Measures const measures = measure(mesh, extent.min, sliverRatio, normals.data);
+    Creases const foldOvers(mesh, edges, kFoldOverDegrees, normals.data);
+    ExaminedMesh result{analyzeTopology(mesh, edges, &foldOvers), {}, measures.sliverCount};
+    if (mesh.pointCount() != 0 && result.topology.isClosedManifold())
+        result.shape.volume = measures.volume;
+    result.shape.area = measures.area;
+    result.shape.foldOvers = result.topology.sharpEdgeCount;
+    result.shape.diagonal = length(extent.max - extent.min);
+    return result;
 }
 
 std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& edges, double degrees)
 {
-    std::vector<double3> const vectors = areaVectors(mesh);
-    Creases const creases(mesh, edges, vectors, degrees);
+    Creases const creases(mesh, edges, degrees);
     return edges.pointsOfEdges(
         [&](std::span<Side const> sides) { return sides.size() > 2 || (sides.size() == 2 && creases.isSharp(sides)); });
 }

@@ -25,16 +25,16 @@ struct Shape {
     double diagonal = 0; // of the bounding box
 };
 
-/// \param isClosed  whether the mesh is a closed manifold
-Shape shapeOf(MeshArrays const& mesh, EdgeSides const& edges, bool isClosed);
-
 struct ExaminedMesh {
     MeshTopology topology;
     Shape shape;
+    std::uint64_t sliverCount = 0; // faces whose shortest edge is shorter than the given ratio times their longest edge
 };
 
-/// Both at once, because finding the edges takes longer than either.
-ExaminedMesh examine(MeshArrays const& mesh);
+/// All at once, because finding the edges and reading the positions of faces take longest.
+ExaminedMesh examine(MeshArrays const& mesh, float sliverRatio = 0);
+/// The same for callers that already have the edges of the mesh.
+ExaminedMesh examine(MeshArrays const& mesh, EdgeSides const& edges, float sliverRatio = 0);
 
 /// The numbers of elements, and the shape: for operations that do not move points.
 Json countsAndShape(Tessara::Object const& mesh, Shape const& shape);

@@ -8,19 +8,21 @@
 #include <atomic>
 #include <functional>
 #include <map>
+#include <numeric>
+#include <utility>
 
 namespace ModelingProgram {
 
 namespace {
 
-    /// Disjoint sets of indices (union-find without locks); initially each index is its own set. All threads may join
-    /// sets at the same time. The lowest index of a set represents it, whatever the order of the joins.
+    /// Disjoint sets of indices (union-find without locks). All threads may join sets at the same time. The lowest index
+    /// of a set represents it, whatever the order of the joins.
     class DisjointSets {
     public:
-        explicit DisjointSets(unsigned int count)
-            : parents_(count)
+        /// \param parents  for each index itself or a lower one in the same set
+        explicit DisjointSets(Orvan::Array<unsigned int> parents)
+            : parents_(std::move(parents))
         {
-            forEachIndex([this](unsigned int index) { parents_[index] = index; });
         }
 
         unsigned int find(unsigned int index)
@@ -35,6 +37,8 @@ namespace {
             }
             return index;
         }
+
+        bool isRepresentative(unsigned int index) { return parentOf(index) == index; }
 
         void join(unsigned int a, unsigned int b)
         {
@@ -53,7 +57,7 @@ namespace {
         /// Calls `visit(index)` for all indices in parallel.
         template <class Visit> void forEachIndex(Visit const& visit)
         {
-            auto const count = static_cast<unsigned int>(parents_.size());
+            auto const count = static_cast<unsigned int>(parents_.size);
             tbb::parallel_for(
                 tbb::blocked_range<unsigned int>(0, count, Modeling::kElementGrain), [&](auto const& indices) {
                     for (unsigned int index = indices.begin(); index != indices.end(); ++index)
@@ -66,7 +70,7 @@ namespace {
         {
             constexpr std::size_t kSampleCount = 1024;
             std::map<unsigned int, unsigned int> counts;
-            for (std::size_t i = 0; i < parents_.size(); i += std::max<std::size_t>(1, parents_.size() / kSampleCount))
+            for (std::uint64_t i = 0; i < parents_.size; i += std::max<std::uint64_t>(1, parents_.size / kSampleCount))
                 ++counts[find(static_cast<unsigned int>(i))];
             auto const isRarer = [](auto const& a, auto const& b) { return a.second < b.second; };
             auto const most = std::max_element(counts.begin(), counts.end(), isRarer);
@@ -74,29 +78,51 @@ namespace {
         }
 
     private:
-        std::atomic_ref<unsigned int> at(unsigned int index) { return std::atomic_ref<unsigned int>(parents_[index]); }
+        std::atomic_ref<unsigned int> at(unsigned int index)
+        {
+            return std::atomic_ref<unsigned int>(parents_.data[index]);
+        }
         unsigned int parentOf(unsigned int index) { return at(index).load(std::memory_order_relaxed); }
 
-        std::vector<unsigned int> parents_;
+        Orvan::Array<unsigned int> parents_;
     };
 
 }
 
 std::uint64_t countConnectedComponents(MeshArrays const& mesh, EdgeSides const& edges)
 {
-    DisjointSets sets(mesh.pointCount());
-    unsigned int const* const pointAt = mesh.faceVertex->data;
+    Orvan::Array<unsigned int> parents(mesh.pointCount(), Orvan::kUninitialized);
+    std::iota(parents.begin(), parents.end(), 0u);
+    return countConnectedComponents(mesh, edges, std::move(parents));
+}
+
+std::uint64_t countConnectedComponents(
+    MeshArrays const& mesh, EdgeSides const& edges, Orvan::Array<unsigned int> lowerInParts)
+{
+    DisjointSets sets(std::move(lowerInParts));
+    auto const countSets = [&] {
+        return tbb::parallel_reduce(
+            tbb::blocked_range<unsigned int>(0, mesh.pointCount(), Modeling::kElementGrain), std::uint64_t{0},
+            [&](auto const& points, std::uint64_t count) {
+                for (unsigned int point = points.begin(); point != points.end(); ++point)
+                    count += sets.isRepresentative(point) && !edges.cornersAt(point).empty() ? 1u : 0u;
+                return count;
+            },
+            std::plus<>());
+    };
+    if (std::uint64_t const count = countSets(); count <= 1)
+        return count;
     auto const joinFace = [&](unsigned int point, unsigned int corner) {
         std::span<unsigned int const> const corners = mesh.corners(edges.faceOf(corner));
         // The neighbors in the face are enough: its other points do the same.
-        unsigned int const* const at = pointAt + corner;
+        unsigned int const* const at = mesh.faceVertex->data + corner;
         sets.join(point, at == &corners.back() ? corners.front() : at[1]);
         sets.join(point, at == &corners.front() ? corners.back() : at[-1]);
     };
-    // One face per point joins most of a mesh. What has become one large set need not be joined again: wherever it
+    // One face of some points joins most of a mesh. What has become one large set need not be joined again: wherever it
     // meets another set, the points of that set join the two.
     sets.forEachIndex([&](unsigned int point) {
-        if (std::span<unsigned int const> const corners = edges.cornersAt(point); !corners.empty())
+        if (std::span<unsigned int const> const corners = edges.cornersAt(point); !corners.empty() && point % 4 == 0)
             joinFace(point, corners[0]);
     });
     unsigned int const largest = sets.findLikelyLargest();
@@ -105,14 +131,7 @@ std::uint64_t countConnectedComponents(MeshArrays const& mesh, EdgeSides const& 
             for (unsigned int const corner : edges.cornersAt(point))
                 joinFace(point, corner);
     });
-    return tbb::parallel_reduce(
-        tbb::blocked_range<unsigned int>(0, mesh.pointCount(), Modeling::kElementGrain), std::uint64_t{0},
-        [&](auto const& points, std::uint64_t count) {
-            for (unsigned int point = points.begin(); point != points.end(); ++point)
-                count += !edges.cornersAt(point).empty() && sets.find(point) == point ? 1u : 0u;
-            return count;
-        },
-        std::plus<>());
+    return countSets();
 }
 
 }

@@ -8,7 +8,10 @@ namespace ModelingProgram {
 
 /// The number of connected components of a mesh: faces that share a point are in the same one. Points that no face
 /// uses do not count.
-/// \param edges  those of the mesh
+/// \param edges         those of the mesh
+/// \param lowerInParts  for each point itself or a lower one of the same component, as far as they are already known
+std::uint64_t countConnectedComponents(
+    MeshArrays const& mesh, EdgeSides const& edges, Orvan::Array<unsigned int> lowerInParts);
 std::uint64_t countConnectedComponents(MeshArrays const& mesh, EdgeSides const& edges);
 
 }

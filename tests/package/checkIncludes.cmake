@@ -13,7 +13,7 @@ endforeach()
 set(program_top commands files geometry shell)
 set(program_commands top files geometry repair shell)
 set(program_repair geometry frame)
-set(program_geometry shell files frame) # the library's frame, for its lists of the corners at each point
+set(program_geometry shell files frame) # the library's frame, for its lists of the corners at each point and its lanes
 set(program_shell files)
 set(program_files frame) # parallel loops and copies of arrays
 

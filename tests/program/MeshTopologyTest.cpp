@@ -2,9 +2,17 @@
 #include "geometry/MeshRequirements.h"
 
 #include "support/MeshBuilder.h"
+#include "support/Random.h"
+#include "support/Testing.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+
+#include <algorithm>
+#include <array>
+#include <map>
+#include <numeric>
+#include <set>
 
 namespace ModelingProgram {
 
@@ -60,6 +68,89 @@ namespace {
         return result;
     }
 
+    /// For each element the lowest one of its set, given pairs of elements of the same set.
+    std::vector<std::size_t> setsOf(std::size_t count, std::vector<std::array<std::size_t, 2>> const& pairs)
+    {
+        std::vector<std::size_t> sets(count);
+        std::iota(sets.begin(), sets.end(), std::size_t{0});
+        for (auto const& [a, b] : pairs)
+            std::replace(sets.begin(), sets.end(), std::size_t{std::max(sets[a], sets[b])},
+                std::size_t{std::min(sets[a], sets[b])});
+        return sets;
+    }
+
+    /// The same counts by definition, except the genus.
+    Counts countsByDefinition(std::size_t pointCount, Faces const& faces)
+    {
+        std::map<std::array<unsigned int, 2>, std::array<long, 2>> edges; // numbers of sides in the two directions
+        std::map<std::array<unsigned int, 2>, std::size_t> cornerAt; // of a point and the other point of an edge
+        std::vector<std::array<std::size_t, 2>> facePairs, fanPairs; // of points, of corners
+        std::vector<std::size_t> pointAt;
+        std::vector<bool> hasFan;
+        for (auto const& face : faces) {
+            std::size_t const first = pointAt.size();
+            pointAt.insert(pointAt.end(), face.begin(), face.end());
+            hasFan.resize(pointAt.size(), face.size() >= 3);
+            for (std::size_t k = 0; k != face.size(); ++k) {
+                std::size_t const next = (k + 1) % face.size();
+                unsigned int const a = face[k], b = face[next];
+                facePairs.push_back({a, b});
+                if (face.size() < 3)
+                    continue;
+                if (a == b)
+                    fanPairs.push_back({first + k, first + next});
+                else {
+                    ++edges[{std::min(a, b), std::max(a, b)}][a < b ? 0 : 1];
+                    fanPairs.push_back({cornerAt.try_emplace({a, b}, first + k).first->second, first + k});
+                    fanPairs.push_back({cornerAt.try_emplace({b, a}, first + next).first->second, first + next});
+                }
+            }
+        }
+        Counts counts{static_cast<long>(edges.size()), 0, 0, 0, 0, 0, 0};
+        for (auto const& [points, sides] : edges) {
+            counts[1] += sides[0] + sides[1] == 1;
+            counts[2] += sides[0] + sides[1] > 2;
+            counts[3] += (sides[0] > 1) + (sides[1] > 1);
+        }
+        auto const parts = setsOf(pointCount, facePairs), fans = setsOf(pointAt.size(), fanPairs);
+        for (std::size_t point = 0; point != pointCount; ++point) {
+            bool const isUsed = std::find(pointAt.begin(), pointAt.end(), point) != pointAt.end();
+            std::set<std::size_t> fansHere;
+            for (std::size_t corner = 0; corner != pointAt.size(); ++corner)
+                if (pointAt[corner] == point && hasFan[corner])
+                    fansHere.insert(fans[corner]);
+            counts[4] += fansHere.size() > 1;
+            counts[5] += !isUsed;
+            counts[6] += isUsed && parts[point] == point;
+        }
+        return counts;
+    }
+
+}
+
+TEST(MeshTopology, FindsTheSameAsByDefinitionInRandomFaces)
+{
+    TestSupport::Random random(1);
+    MeshBuilder const closed = MeshBuilder::sphere(2).joinedWith(MeshBuilder::bipyramid(11), {3, 0, 0});
+    for (unsigned int round = 0; round != 300; ++round) {
+        bool const isSoup = round % 2 == 0;
+        std::size_t const pointCount = isSoup ? 1 + random.below(30) : closed.points.size();
+        Faces faces;
+        for (auto const& face : closed.faces)
+            faces.push_back(
+                isSoup ? std::vector<unsigned int>(random.below(7)) : std::vector(face.begin(), face.end()));
+        std::size_t const changes = isSoup ? faces.size() : random.below(6);
+        for (std::size_t change = 0; change != changes; ++change) {
+            auto& face = faces[isSoup ? change : random.below(faces.size())];
+            if (!isSoup && random.below(2) == 0)
+                std::reverse(face.begin(), face.end());
+            else
+                std::generate(face.begin(), face.end(), [&] { return random.below(pointCount); });
+        }
+        Counts found = countsOf(meshOf(static_cast<unsigned int>(pointCount), faces));
+        found.pop_back();
+        EXPECT_EQ(found, countsByDefinition(pointCount, faces)) << round;
+    }
 }
 
 TEST(MeshTopology, CountsEdgesPointsPartsAndGenus)
@@ -94,7 +185,8 @@ TEST(MeshTopology, CountsEdgesPointsPartsAndGenus)
         {"faces of few points", meshOf(4, {{}, {2}, {0, 1}, {1, 1, 0}}), {1, 0, 0, 0, 0, 1, 2, kNone}},
     };
     for (Case const& c : cases)
-        EXPECT_EQ(countsOf(c.mesh), c.expected) << c.name;
+        for (int const threads : {1, 8})
+            EXPECT_EQ(TestSupport::withThreads(threads, [&] { return countsOf(c.mesh); }), c.expected) << c.name;
 }
 
 TEST(MeshTopology, CountsFacesByCorners)

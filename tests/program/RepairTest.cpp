@@ -85,7 +85,7 @@ namespace {
     Repaired repaired(Mesh mesh, RepairOptions const& options = {})
     {
         RepairCounts const counts = repairMesh(options, *mesh);
-        auto const [topology, shape] = examine(arraysOf(*mesh));
+        auto const [topology, shape, slivers] = examine(arraysOf(*mesh));
         return {std::move(mesh), counts, topology, shape.volume.value_or(0)};
     }
 

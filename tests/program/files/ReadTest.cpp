@@ -271,7 +271,8 @@ namespace {
             {".stl", binary + "rest", 3, {0, 1, 2}, {0, 3}, {"element are left out: 4"}},
             {".stl", "solid\n" + facet + "endsolid\n" + std::string(2, '\0'), 3, {0, 1, 2}, {0, 3},
                 {"element are left out: 2"}},
-            {".stl", "solid\n" + broken + facet + "endsolid\n", 4, {2, 3, 1}, {0, 3}, {"left out: 1", "faces at such"}},
+            {".stl", "solid\n" + broken + facet + broken + "endsolid\n", 4, {2, 3, 1}, {0, 3},
+                {"points that are NaN or infinite are left out: 2", "faces at such points are left out: 2"}},
         };
         for (Case const& test : cases) {
             SCOPED_TRACE(test.extension + test.content);
