@@ -7,9 +7,11 @@
 #include <fmt/format.h>
 #include <tbb/blocked_range.h>
 #include <tbb/parallel_for.h>
+#include <tbb/parallel_reduce.h>
 
 #include <algorithm>
 #include <cmath>
+#include <functional>
 #include <limits>
 #include <numbers>
 #include <string>
@@ -84,15 +86,45 @@ namespace {
         });
     }
 
-    std::vector<double3> areaVectors(MeshArrays const& mesh)
-    {
-        std::vector<double3> vectors(mesh.faceCount());
-        tbb::parallel_for(tbb::blocked_range<unsigned int>(0, mesh.faceCount(), 1000), [&](auto const& faces) {
-            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                vectors[face] = areaVector(mesh.corners(face), mesh.positions->data);
-        });
-        return vectors;
-    }
+    /// The vector areas of faces times two. Those of triangles are computed whenever they are needed: stored, they would
+    /// be larger than the triangles. Those of large faces would then be computed once per edge, so they are stored.
+    class AreaVectors {
+    public:
+        explicit AreaVectors(MeshArrays const& mesh)
+            : mesh_(mesh)
+        {
+            if (areTriangles())
+                return;
+            vectors_.resize(mesh.faceCount());
+            tbb::parallel_for(tbb::blocked_range<unsigned int>(0, mesh.faceCount(), 1000), [&](auto const& faces) {
+                for (unsigned int face = faces.begin(); face != faces.end(); ++face)
+                    vectors_[face] = areaVector(mesh_.corners(face), mesh_.positions->data);
+            });
+        }
+
+        double3 operator[](std::size_t face) const
+        {
+            return vectors_.empty() ? areaVector({mesh_.faceVertex->data + 3 * face, 3}, mesh_.positions->data)
+                                    : vectors_[face];
+        }
+
+    private:
+        bool areTriangles() const
+        {
+            unsigned int const* const offset = mesh_.faceOffset->data;
+            return tbb::parallel_reduce(
+                tbb::blocked_range<unsigned int>(0, mesh_.faceCount(), 10'000), true,
+                [=](auto const& faces, bool areSo) {
+                    for (unsigned int face = faces.begin(); areSo && face != faces.end(); ++face)
+                        areSo = offset[face] == 3 * face && offset[face + 1] == 3 * (face + 1);
+                    return areSo;
+                },
+                std::logical_and<>());
+        }
+
+        MeshArrays const& mesh_;
+        std::vector<double3> vectors_; // empty if all faces are triangles
+    };
 
     struct Measures {
         double area = 0;
@@ -106,16 +138,17 @@ namespace {
     };
 
     /// \param origin  inside or near the mesh: far away, the signed volumes of faces would suffer from cancellation
-    Measures measure(MeshArrays const& mesh, std::vector<double3> const& vectors, double3 const& origin)
+    Measures measure(MeshArrays const& mesh, AreaVectors const& vectors, double3 const& origin)
     {
-        return sumOverBlocks<Measures>(vectors.size(), [&](std::size_t begin, std::size_t end) {
+        return sumOverBlocks<Measures>(mesh.faceCount(), [&](std::size_t begin, std::size_t end) {
             Measures sum;
             for (std::size_t face = begin; face != end; ++face) {
                 auto const corners = mesh.corners(static_cast<unsigned int>(face));
                 if (corners.empty())
                     continue;
-                sum.area += length(vectors[face]) / 2;
-                sum.volume += dot(inDoubles((*mesh.positions)[corners[0]]) - origin, vectors[face]) / 6;
+                double3 const vector = vectors[face];
+                sum.area += length(vector) / 2;
+                sum.volume += dot(inDoubles((*mesh.positions)[corners[0]]) - origin, vector) / 6;
             }
             return sum;
         });
@@ -124,7 +157,7 @@ namespace {
     /// Classifies edges by the angle between the normals of their faces.
     class Creases {
     public:
-        Creases(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors, double degrees)
+        Creases(MeshArrays const& mesh, EdgeSides const& edges, AreaVectors const& vectors, double degrees)
             : mesh_(mesh)
             , edges_(edges)
             , vectors_(vectors)
@@ -143,7 +176,7 @@ namespace {
         /// \param areOriented  whether the faces traverse the edge in opposite directions
         bool isSharp(unsigned int cornerOfA, unsigned int cornerOfB, bool areOriented) const
         {
-            double3 const &a = vectors_[edges_.faceOf(cornerOfA)], &b = vectors_[edges_.faceOf(cornerOfB)];
+            double3 const a = vectors_[edges_.faceOf(cornerOfA)], b = vectors_[edges_.faceOf(cornerOfB)];
             double const product = areOriented ? dot(a, b) : -dot(a, b);
             double const lengths = std::sqrt(dot(a, a) * dot(b, b));
             return lengths > 0 && product < cosine_ * lengths;
@@ -152,11 +185,11 @@ namespace {
     private:
         MeshArrays const& mesh_;
         EdgeSides const& edges_;
-        std::vector<double3> const& vectors_;
+        AreaVectors const& vectors_;
         double cosine_;
     };
 
-    std::uint64_t countFoldOvers(MeshArrays const& mesh, EdgeSides const& edges, std::vector<double3> const& vectors)
+    std::uint64_t countFoldOvers(MeshArrays const& mesh, EdgeSides const& edges, AreaVectors const& vectors)
     {
         Creases const creases(mesh, edges, vectors, kFoldOverDegrees);
         return sumOverBlocks<std::uint64_t>(mesh.pointCount(), [&](std::size_t begin, std::size_t end) {
@@ -220,7 +253,7 @@ Shape shapeOf(MeshArrays const& mesh, EdgeSides const& edges, bool isClosed)
     if (mesh.pointCount() == 0)
         return shape;
     Extent const extent = extentOf(mesh);
-    std::vector<double3> const vectors = areaVectors(mesh);
+    AreaVectors const vectors(mesh);
     Measures const measures = measure(mesh, vectors, extent.min);
     if (isClosed)
         shape.volume = measures.volume;
@@ -239,7 +272,7 @@ ExaminedMesh examine(MeshArrays const& mesh)
 
 std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& edges, double degrees)
 {
-    std::vector<double3> const vectors = areaVectors(mesh);
+    AreaVectors const vectors(mesh);
     Creases const creases(mesh, edges, vectors, degrees);
     return edges.pointsOfEdges(
         [&](std::span<Side const> sides) { return sides.size() > 2 || (sides.size() == 2 && creases.isSharp(sides)); });
