@@ -10,6 +10,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <optional>
 
 namespace ModelingProgram {
 
@@ -127,9 +128,11 @@ namespace {
     {
         Object& mesh = *subject.object;
         requireMatches(channels_, mesh);
-        Object const measured = keepsUnits_ ? mesh : inFineUnits(mesh);
+        std::optional<Object> measured(keepsUnits_ ? mesh : inFineUnits(mesh));
         Object result;
-        runOperation(report, [&] { result = triangulatedAs(measured, channels_, mesh); });
+        runOperation(report, [&] { result = triangulatedAs(*measured, channels_, mesh); });
+        if (!checksAreas_)
+            measured.reset();
 
         dropped_ = namesMissingIn(result, mesh);
         for (std::string const& name : dropOutdatedProperties(result)) {
@@ -148,7 +151,7 @@ namespace {
             after_ = describeMesh(result, after->topology);
             addShape(change_, before_, after_);
             if (checksAreas_)
-                check_ = checkTriangulation(arraysOf(measured), triangles);
+                check_ = checkTriangulation(arraysOf(*measured), triangles);
         }
         mesh = std::move(result);
         subject.setKnown(after);

@@ -11,7 +11,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr std::size_t kBlockBytes = std::size_t{1} << 18; // fits the second-level cache
+    constexpr std::size_t kRecordBlockBytes = std::size_t{1} << 18; // fits the second-level cache
 
     /// Reverses the order of `Bytes` bytes in each record. The size is a constant so that this is a few instructions.
     template <std::size_t Bytes>
@@ -44,7 +44,8 @@ bool forEachBlock(
     if (records.count == 0)
         return true;
     std::uint64_t const meanBytes = (records.startOf(records.count) - records.begin) / records.count;
-    std::uint64_t const blockSize = std::max<std::uint64_t>(1, kBlockBytes / std::max<std::uint64_t>(1, meanBytes));
+    std::uint64_t const blockSize =
+        std::max<std::uint64_t>(1, kRecordBlockBytes / std::max<std::uint64_t>(1, meanBytes));
     std::atomic<bool> isStopped = false;
     auto const visitBlocks = [&](tbb::blocked_range<std::uint64_t> const& blocks) {
         std::unique_ptr<char[]> buffer;

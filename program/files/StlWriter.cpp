@@ -17,7 +17,7 @@ namespace {
 
     static_assert(std::endian::native == std::endian::little, "numbers are written with the byte order of memory");
 
-    constexpr std::size_t kTriangleBytes = 50;
+    constexpr std::size_t kBytesPerTriangle = 50;
 
     void checkTriangles(WritableGeometry const& geometry, std::filesystem::path const& file)
     {
@@ -95,10 +95,10 @@ void writeStl(WritableGeometry& geometry, std::filesystem::path const& file)
     out.write(header.data(), header.size());
     out.writeBinary(static_cast<std::uint32_t>(geometry.cellCount()));
     writeInBlocks(
-        geometry.cellCount(), kTriangleBytes,
+        geometry.cellCount(), kBytesPerTriangle,
         [&](std::uint64_t first, std::uint64_t end, OutputBuffer& block) {
-            char* triangle = block.extend((end - first) * kTriangleBytes);
-            for (std::uint64_t face = first; face != end; ++face, triangle += kTriangleBytes)
+            char* triangle = block.extend((end - first) * kBytesPerTriangle);
+            for (std::uint64_t face = first; face != end; ++face, triangle += kBytesPerTriangle)
                 fillTriangle(geometry, face, attributes ? (*attributes)[face] : 0, triangle);
         },
         out);

@@ -16,9 +16,9 @@ using Tessara::Math::float3;
 namespace {
 
     constexpr unsigned int kCornersEach = 3; // of a record
-    constexpr unsigned int kNone = 0xFFFFFFFF;
+    constexpr unsigned int kNoCorner = 0xFFFFFFFF;
 
-    struct Corner {
+    struct WeldedCorner {
         float3 position;
         unsigned int number;
     };
@@ -123,7 +123,7 @@ namespace {
 
         void distribute()
         {
-            corners_ = Modeling::uninitializedArray<Corner>(cornerCount_);
+            corners_ = Modeling::uninitializedArray<WeldedCorner>(cornerCount_);
             visitRuns([&](std::uint64_t run) {
                 return
                     [this, next = runParts_.data() + run * partCount()](unsigned int corner, float3 const& position) {
@@ -149,15 +149,15 @@ namespace {
         /// The table has open addressing; at most half of it is used.
         void findFirstCornersIn(std::size_t part, std::vector<unsigned int>& table)
         {
-            Corner const* const corners = corners_.data + partOffsets_[part];
+            WeldedCorner const* const corners = corners_.data + partOffsets_[part];
             std::uint64_t const count = partOffsets_[part + 1] - partOffsets_[part];
             std::uint64_t const mask = std::bit_ceil(2 * count + 1) - 1;
-            table.assign(mask + 1, kNone);
+            table.assign(mask + 1, kNoCorner);
             for (std::uint64_t i = 0; i != count; ++i) {
                 std::uint64_t slot = hashOf(corners[i].position) & mask;
-                while (table[slot] != kNone && !(corners[table[slot]].position == corners[i].position))
+                while (table[slot] != kNoCorner && !(corners[table[slot]].position == corners[i].position))
                     slot = (slot + 1) & mask;
-                if (table[slot] == kNone)
+                if (table[slot] == kNoCorner)
                     table[slot] = static_cast<unsigned int>(i);
                 firsts_[corners[i].number] = corners[table[slot]].number;
             }
@@ -211,7 +211,7 @@ namespace {
         std::uint64_t runSize_; // records of a run, which one thread visits
         std::vector<std::uint64_t> runParts_; // the place of the next corner of each run and part in `corners_`
         std::vector<std::uint64_t> partOffsets_;
-        Orvan::Array<Corner> corners_; // by part, then in ascending order
+        Orvan::Array<WeldedCorner> corners_; // by part, then in ascending order
         Orvan::Array<unsigned int> firsts_;
     };
 
