@@ -41,7 +41,7 @@ Exit codes:
   3  a file or standard output cannot be read or written
   4  a file contains invalid geometry
   5  the operation refuses its input; the message says why
-  6  cancelled by Ctrl-C or SIGTERM; nothing was written
+  6  cancelled by Ctrl-C, SIGTERM or SIGHUP; nothing was written
   7  out of memory, or beyond --max-memory
   8  done, but there are warnings about the result, with --strict
 

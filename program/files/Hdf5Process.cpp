@@ -73,13 +73,11 @@ namespace {
     {
         for (int const signal : {SIGSEGV, SIGBUS, SIGABRT, SIGFPE, SIGILL, SIGXCPU, SIGPIPE})
             ::signal(signal, SIG_DFL);
-        for (int const signal : {SIGHUP, SIGQUIT}) { // nohup ignores them
-            struct sigaction old = {};
-            if (::sigaction(signal, nullptr, &old) == 0 && old.sa_handler != SIG_IGN)
-                ::signal(signal, SIG_DFL);
-        }
-        ::signal(SIGINT, SIG_IGN);
-        ::signal(SIGTERM, SIG_IGN);
+        struct sigaction old = {};
+        if (::sigaction(SIGQUIT, nullptr, &old) == 0 && old.sa_handler != SIG_IGN) // background jobs ignore it
+            ::signal(SIGQUIT, SIG_DFL);
+        for (int const signal : {SIGINT, SIGTERM, SIGHUP})
+            ::signal(signal, SIG_IGN);
         ::prctl(PR_SET_PDEATHSIG, SIGKILL);
         limit(RLIMIT_CORE, 0);
         if (int const null = ::open("/dev/null", O_WRONLY); null >= 0) {

@@ -28,7 +28,19 @@ namespace {
         return file;
     }
 
-    /// Renaming could replace such a file, but its permissions say that it is to be kept.
+    std::filesystem::path folderOf(std::filesystem::path const& file)
+    {
+        return file.has_parent_path() ? file.parent_path() : ".";
+    }
+
+    /// A name of an open file, whether or not it has another one.
+    std::string nameOf(int descriptor)
+    {
+        return "/proc/self/fd/" + std::to_string(descriptor);
+    }
+
+    /// Renaming could replace such a file, but its permissions say that it is to be kept. They say so to the superuser
+    /// too, who could write it: nobody removes the write permission of a file without a purpose.
     bool isWriteProtected(std::filesystem::path const& file, std::filesystem::perms permissions)
     {
         using std::filesystem::perms;
@@ -63,7 +75,7 @@ namespace {
 
 }
 
-OutputFile::OutputFile(std::filesystem::path const& file, Existing existing)
+OutputFile::OutputFile(std::filesystem::path const& file, Existing existing, Temporary temporary)
     : file_(file)
     , target_(followLinks(file))
     , existing_(existing)
@@ -78,8 +90,9 @@ OutputFile::OutputFile(std::filesystem::path const& file, Existing existing)
         fail(EEXIST);
     if (isRegular && isWriteProtected(target_, status.permissions()))
         fail("it is write-protected");
-    if (isRegular || !std::filesystem::exists(status))
-        openBeside();
+    isDirect_ = !isRegular && std::filesystem::exists(status);
+    if (!isDirect_)
+        openBeside(temporary);
     else if ((descriptor_ = ::open(target_.c_str(), O_WRONLY | O_CLOEXEC)) < 0)
         fail(errno);
     if (isRegular) // the new file gets the permissions of the old one
@@ -95,17 +108,38 @@ OutputFile::~OutputFile()
     releaseTemporary();
 }
 
-void OutputFile::openBeside()
+void OutputFile::openBeside(Temporary temporary)
+{
+    if (temporary == Temporary::Unnamed && openUnnamed())
+        return;
+    createTemporary([this] {
+        descriptor_ = ::open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kReadAndWriteForAll);
+        return descriptor_ >= 0;
+    });
+}
+
+/// Some file systems have no files without names, and without /proc none could get a name.
+bool OutputFile::openUnnamed()
+{
+    descriptor_ = ::open(folderOf(target_).c_str(), O_WRONLY | O_TMPFILE | O_CLOEXEC, kReadAndWriteForAll);
+    if (descriptor_ >= 0 && ::access(nameOf(descriptor_).c_str(), F_OK) != 0)
+        ::close(std::exchange(descriptor_, -1));
+    return descriptor_ >= 0;
+}
+
+/// Calls a function that creates a file of the name `temporary_`, with a name that does not exist yet.
+template <class Create> void OutputFile::createTemporary(Create const& create)
 {
     static std::atomic<unsigned int> counter = 0;
+    bool isCreated = false;
     do {
         releaseTemporary();
         temporary_ = target_.parent_path()
             / (".modeling-" + std::to_string(::getpid()) + "-" + std::to_string(counter.fetch_add(1)) + ".tmp");
         isRegistered_ = unfinished.take(temporary_); // before the file exists, because a signal may arrive in between
-        descriptor_ = ::open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kReadAndWriteForAll);
-    } while (descriptor_ < 0 && errno == EEXIST);
-    if (descriptor_ < 0) {
+        isCreated = create();
+    } while (!isCreated && errno == EEXIST);
+    if (!isCreated) {
         int const error = errno;
         releaseTemporary();
         fail(error);
@@ -140,23 +174,51 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
 
 std::filesystem::path OutputFile::temporaryFile() const
 {
-    if (temporary_.empty())
+    if (isDirect_)
         fail("this format needs a regular file, not a device or a pipe");
-    return "/proc/self/fd/" + std::to_string(descriptor_);
+    return nameOf(descriptor_);
 }
 
 void OutputFile::commit()
 {
     flush();
-    if (::close(std::exchange(descriptor_, -1)) != 0)
+    if (!isDirect_) {
+        store();
+        moveIntoPlace();
+    }
+    if (::close(std::exchange(descriptor_, -1)) != 0 && isDirect_)
         fail(errno);
-    if (temporary_.empty())
-        return;
-    moveIntoPlace();
-    releaseTemporary();
 }
 
-void OutputFile::moveIntoPlace() const
+/// Waits until the content is on the disk, so that a crash of the machine does not leave an empty file under the name.
+void OutputFile::store() const
+{
+    if (::fsync(descriptor_) != 0 && errno != EINVAL && errno != ENOSYS) // not supported by some file systems
+        fail(errno);
+}
+
+void OutputFile::moveIntoPlace()
+{
+    auto const link = [this](std::filesystem::path const& name) {
+        return ::linkat(AT_FDCWD, nameOf(descriptor_).c_str(), AT_FDCWD, name.c_str(), AT_SYMLINK_FOLLOW) == 0;
+    };
+    bool const isUnnamed = temporary_.empty();
+    if (!isUnnamed || !link(target_)) {
+        if (isUnnamed && (errno != EEXIST || existing_ == Existing::Keep))
+            fail(errno);
+        if (isUnnamed) // a link cannot replace a file, but a file with a name can be renamed
+            createTemporary([&] { return link(temporary_); });
+        renameTemporary();
+        releaseTemporary();
+    }
+    int const folder = ::open(folderOf(target_).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (folder >= 0) {
+        static_cast<void>(::fsync(folder)); // the file is there, whether or not its name can be waited for
+        ::close(folder);
+    }
+}
+
+void OutputFile::renameTemporary() const
 {
     if (existing_ == Existing::Keep) {
         if (::renameat2(AT_FDCWD, temporary_.c_str(), AT_FDCWD, target_.c_str(), RENAME_NOREPLACE) == 0)

@@ -9,13 +9,21 @@
 
 namespace ModelingProgram {
 
-/// Writes to a temporary file in the same folder and renames it when it is complete. Until then, and if anything fails,
-/// an existing file is unchanged. Anything but a regular file (a device, a pipe) is written directly.
+/// Writes a file that appears under its name when it is complete and on the disk. Until then, and if anything fails, an
+/// existing file is unchanged. The file is written without a name, so that nothing remains however the process ends; on
+/// file systems that have no such files it has a temporary name in the same folder. Anything but a regular file (a
+/// device, a pipe) is written directly.
 class OutputFile {
 public:
+    enum class Temporary {
+        Unnamed, // if the file system has such files
+        Named // for libraries that look up the real name of what they open
+    };
+
     /// \throws FileError, as all functions do: here if the folder is not writable, or if the file exists and is to be
     ///                    kept or is write-protected
-    explicit OutputFile(std::filesystem::path const& file, Existing existing = Existing::Replace);
+    explicit OutputFile(std::filesystem::path const& file, Existing existing = Existing::Replace,
+        Temporary temporary = Temporary::Unnamed);
     OutputFile(OutputFile const&) = delete;
     OutputFile& operator=(OutputFile const&) = delete;
     ~OutputFile();
@@ -55,29 +63,33 @@ public:
     /// Writes the bytes of a number as in memory.
     template <class T> void writeBinary(T number) { write(&number, sizeof(T)); }
 
-    /// A name of the temporary file, for a library that opens files by their names, in this process or a forked one. It
-    /// leads to the open file, so that nothing is created again after a signal has removed it.
+    /// A name of the file being written, for a library that opens files by their names, in this process or a forked one.
+    /// It leads to the open file, so that nothing is created again after a signal has removed it.
     /// \throws FileError  if the file is not a regular one
     std::filesystem::path temporaryFile() const;
 
-    /// Completes the file and renames it.
+    /// Completes the file and gives it its name.
     /// \throws FileError  also if a file that is to be kept has been created in the meantime
     void commit();
 
     /// Throws what the constructor would throw, and leaves no file behind. Devices and pipes are not checked.
     static void checkWritable(std::filesystem::path const& file, Existing existing);
 
-    /// Removes an incomplete temporary file. Async-signal-safe, for handlers of signals that end the process.
+    /// Removes a temporary file. Async-signal-safe, for handlers of signals that end the process.
     static void removeUnfinished() noexcept;
 
 private:
     static constexpr std::size_t kBufferBytes = 1 << 18;
 
-    void openBeside();
+    void openBeside(Temporary temporary);
+    bool openUnnamed();
+    template <class Create> void createTemporary(Create const& create);
     void releaseTemporary();
     void flush();
     void writeThrough(char const* data, std::size_t bytes);
-    void moveIntoPlace() const;
+    void store() const;
+    void moveIntoPlace();
+    void renameTemporary() const;
     [[noreturn]] void fail(char const* why) const;
     [[noreturn]] void fail(int error) const { fail(std::strerror(error)); }
 
@@ -85,6 +97,7 @@ private:
     std::filesystem::path target_; // with links resolved
     std::filesystem::path temporary_; // empty if there is none
     bool isRegistered_ = false; // `removeUnfinished` knows its name
+    bool isDirect_ = false; // a device or a pipe
     Existing existing_;
     int descriptor_ = -1;
     std::unique_ptr<char[]> buffer_;

@@ -14,8 +14,8 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr int kCancelling[] = {SIGINT, SIGTERM};
-    constexpr int kEnding[] = {SIGHUP, SIGPIPE, SIGQUIT, SIGALRM, SIGUSR1, SIGUSR2, SIGXCPU};
+    constexpr int kCancelling[] = {SIGINT, SIGTERM, SIGHUP};
+    constexpr int kEnding[] = {SIGPIPE, SIGQUIT, SIGALRM, SIGUSR1, SIGUSR2, SIGXCPU};
 
     std::atomic<bool> isStopping = false;
 

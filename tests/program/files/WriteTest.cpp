@@ -1,5 +1,4 @@
 #include "FileSupport.h"
-#include "OutputFile.h"
 
 #include <csignal>
 #include <sstream>
@@ -331,11 +330,6 @@ namespace {
         EXPECT_THAT(contentOf(folder / "real.obj"), HasSubstr("f 1 2 3"));
         EXPECT_EQ(std::filesystem::status(folder / "real.obj").permissions(), perms::owner_read | perms::owner_write);
         EXPECT_EQ(folder.entryCount(), 2);
-
-        OutputFile late(folder / "late.obj", Existing::Keep);
-        store(folder / "late.obj", "of another program");
-        EXPECT_THROW(late.commit(), FileError);
-        EXPECT_EQ(contentOf(folder / "late.obj"), "of another program");
     }
 
 }
