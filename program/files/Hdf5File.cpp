@@ -159,7 +159,7 @@ GeometryFile readHdf5Geometry(Hdf5Location const& location, ReadOptions const& o
 void writeHdf5Objects(
     std::vector<Hdf5Object> const& objects, std::filesystem::path const& file, WriteOptions const& options)
 {
-    OutputFile out(file, options.existing, OutputFile::Temporary::Named);
+    OutputFile out(file, options.existing);
     std::filesystem::path const temporary = out.temporaryFile();
     try {
         writeHdf5With(objects, temporary, options.compression);

@@ -2,6 +2,7 @@
 
 #include "CodecModule.h"
 #include "Hdf5Codec.h"
+#include "Streams.h"
 
 #include <array>
 #include <cerrno>
@@ -188,11 +189,12 @@ std::string outlineOf(
     constexpr std::uint64_t kLeastBytes = 1 << 20;
     auto* const describe =
         hdf5Function<decltype(modelingDescribeHdf5)>("modelingDescribeHdf5"); // before the process starts
+    std::filesystem::path const regular = regularFileOf(file);
     std::optional<std::string> outline;
     try {
         outline = runInProcess(file, 2 * fileBytes + kLeastBytes, [&](int pipe) {
             limitUse(fileBytes);
-            describe(file.c_str(), selection, name.c_str(), pipe);
+            describe(regular.c_str(), selection, name.c_str(), pipe);
         });
     } catch (std::bad_alloc const&) {
         // The process may use enough for any file that is not broken.

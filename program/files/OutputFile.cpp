@@ -1,10 +1,13 @@
 #include "OutputFile.h"
 
+#include "Streams.h"
+
 #include <atomic>
 #include <cerrno>
 #include <cstdio>
 #include <fcntl.h>
 #include <linux/limits.h>
+#include <poll.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -31,12 +34,6 @@ namespace {
     std::filesystem::path folderOf(std::filesystem::path const& file)
     {
         return file.has_parent_path() ? file.parent_path() : ".";
-    }
-
-    /// A name of an open file, whether or not it has another one.
-    std::string nameOf(int descriptor)
-    {
-        return "/proc/self/fd/" + std::to_string(descriptor);
     }
 
     /// Renaming could replace such a file, but its permissions say that it is to be kept. They say so to the superuser
@@ -75,12 +72,17 @@ namespace {
 
 }
 
-OutputFile::OutputFile(std::filesystem::path const& file, Existing existing, Temporary temporary)
+OutputFile::OutputFile(std::filesystem::path const& file, Existing existing)
     : file_(file)
     , target_(followLinks(file))
     , existing_(existing)
     , buffer_(std::make_unique_for_overwrite<char[]>(kBufferBytes))
 {
+    isDirect_ = isStream(file);
+    if (isDirect_) {
+        openDirectly();
+        return;
+    }
     std::error_code error;
     std::filesystem::file_status const status = std::filesystem::status(target_, error);
     if (std::filesystem::is_directory(status))
@@ -90,11 +92,7 @@ OutputFile::OutputFile(std::filesystem::path const& file, Existing existing, Tem
         fail(EEXIST);
     if (isRegular && isWriteProtected(target_, status.permissions()))
         fail("it is write-protected");
-    isDirect_ = !isRegular && std::filesystem::exists(status);
-    if (!isDirect_)
-        openBeside(temporary);
-    else if ((descriptor_ = ::open(target_.c_str(), O_WRONLY | O_CLOEXEC)) < 0)
-        fail(errno);
+    openBeside();
     if (isRegular) // the new file gets the permissions of the old one
         static_cast<void>(::fchmod(descriptor_, static_cast<mode_t>(status.permissions())));
 }
@@ -103,14 +101,24 @@ OutputFile::~OutputFile()
 {
     if (descriptor_ >= 0)
         ::close(descriptor_);
+    if (copy_ >= 0)
+        ::close(copy_);
     if (!temporary_.empty())
         ::unlink(temporary_.c_str());
     releaseTemporary();
 }
 
-void OutputFile::openBeside(Temporary temporary)
+void OutputFile::openDirectly()
 {
-    if (temporary == Temporary::Unnamed && openUnnamed())
+    if ((descriptor_ = openForWriting(file_)) < 0)
+        fail(errno);
+    if ((::fcntl(descriptor_, F_GETFL) & O_ACCMODE) == O_RDONLY) // such as a closed standard output
+        fail(EBADF);
+}
+
+void OutputFile::openBeside()
+{
+    if (openUnnamed())
         return;
     createTemporary([this] {
         descriptor_ = ::open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kReadAndWriteForAll);
@@ -122,7 +130,7 @@ void OutputFile::openBeside(Temporary temporary)
 bool OutputFile::openUnnamed()
 {
     descriptor_ = ::open(folderOf(target_).c_str(), O_WRONLY | O_TMPFILE | O_CLOEXEC, kReadAndWriteForAll);
-    if (descriptor_ >= 0 && ::access(nameOf(descriptor_).c_str(), F_OK) != 0)
+    if (descriptor_ >= 0 && ::access(nameOfDescriptor(descriptor_).c_str(), F_OK) != 0)
         ::close(std::exchange(descriptor_, -1));
     return descriptor_ >= 0;
 }
@@ -163,7 +171,11 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
 {
     while (bytes != 0) {
         ssize_t const written = ::write(descriptor_, data, bytes);
-        if (written < 0 && errno == EINTR)
+        if (written < 0 && errno == EAGAIN) { // another program made the stream return at once
+            pollfd waiting{descriptor_, POLLOUT, 0};
+            ::poll(&waiting, 1, -1);
+        }
+        if (written < 0 && (errno == EINTR || errno == EAGAIN))
             continue;
         if (written < 0)
             fail(errno);
@@ -172,21 +184,33 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
     }
 }
 
-std::filesystem::path OutputFile::temporaryFile() const
+std::filesystem::path OutputFile::temporaryFile()
 {
-    if (isDirect_)
-        fail("this format needs a regular file, not a device or a pipe");
-    return nameOf(descriptor_);
+    if (isDirect_ && copy_ < 0 && (copy_ = openTemporary()) < 0)
+        fail(errno);
+    return nameOfDescriptor(isDirect_ ? copy_ : descriptor_);
 }
 
 void OutputFile::commit()
 {
     flush();
-    if (!isDirect_) {
+    if (isDirect_) {
+        sendCopy();
+    } else {
         store();
         moveIntoPlace();
     }
     if (::close(std::exchange(descriptor_, -1)) != 0 && isDirect_)
+        fail(errno);
+}
+
+/// Writes what a library has written to the temporary file.
+void OutputFile::sendCopy()
+{
+    ssize_t count = 0;
+    for (off_t at = 0; copy_ >= 0 && (count = ::pread(copy_, buffer_.get(), kBufferBytes, at)) > 0; at += count)
+        writeThrough(buffer_.get(), static_cast<std::size_t>(count));
+    if (count < 0)
         fail(errno);
 }
 
@@ -200,7 +224,8 @@ void OutputFile::store() const
 void OutputFile::moveIntoPlace()
 {
     auto const link = [this](std::filesystem::path const& name) {
-        return ::linkat(AT_FDCWD, nameOf(descriptor_).c_str(), AT_FDCWD, name.c_str(), AT_SYMLINK_FOLLOW) == 0;
+        return ::linkat(AT_FDCWD, nameOfDescriptor(descriptor_).c_str(), AT_FDCWD, name.c_str(), AT_SYMLINK_FOLLOW)
+            == 0;
     };
     bool const isUnnamed = temporary_.empty();
     if (!isUnnamed || !link(target_)) {
@@ -233,11 +258,7 @@ void OutputFile::renameTemporary() const
 
 void OutputFile::checkWritable(std::filesystem::path const& file, Existing existing)
 {
-    std::error_code error;
-    std::filesystem::file_status const status = std::filesystem::status(file, error);
-    bool const isSpecial = std::filesystem::exists(status) && !std::filesystem::is_regular_file(status)
-        && !std::filesystem::is_directory(status);
-    if (!isSpecial) // opening and closing a pipe would be the end of file for its reader
+    if (!isStream(file)) // opening and closing a pipe would be the end of file for its reader
         OutputFile(file, existing);
 }
 
@@ -250,6 +271,11 @@ void OutputFile::removeUnfinished() noexcept
 void OutputFile::fail(char const* why) const
 {
     throw FileError(file_.string() + " cannot be written: " + why);
+}
+
+void OutputFile::fail(int error) const
+{
+    fail(error == EPIPE ? "the program that reads it has ended" : std::strerror(error));
 }
 
 }

@@ -15,15 +15,9 @@ namespace ModelingProgram {
 /// device, a pipe) is written directly.
 class OutputFile {
 public:
-    enum class Temporary {
-        Unnamed, // if the file system has such files
-        Named // for libraries that look up the real name of what they open
-    };
-
     /// \throws FileError, as all functions do: here if the folder is not writable, or if the file exists and is to be
     ///                    kept or is write-protected
-    explicit OutputFile(std::filesystem::path const& file, Existing existing = Existing::Replace,
-        Temporary temporary = Temporary::Unnamed);
+    explicit OutputFile(std::filesystem::path const& file, Existing existing = Existing::Replace);
     OutputFile(OutputFile const&) = delete;
     OutputFile& operator=(OutputFile const&) = delete;
     ~OutputFile();
@@ -65,8 +59,8 @@ public:
 
     /// A name of the file being written, for a library that opens files by their names, in this process or a forked one.
     /// It leads to the open file, so that nothing is created again after a signal has removed it.
-    /// \throws FileError  if the file is not a regular one
-    std::filesystem::path temporaryFile() const;
+    /// What is written to a device or a pipe is copied from there at the end.
+    std::filesystem::path temporaryFile();
 
     /// Completes the file and gives it its name.
     /// \throws FileError  also if a file that is to be kept has been created in the meantime
@@ -81,17 +75,19 @@ public:
 private:
     static constexpr std::size_t kBufferBytes = 1 << 18;
 
-    void openBeside(Temporary temporary);
+    void openBeside();
+    void openDirectly();
     bool openUnnamed();
     template <class Create> void createTemporary(Create const& create);
     void releaseTemporary();
     void flush();
     void writeThrough(char const* data, std::size_t bytes);
+    void sendCopy();
     void store() const;
     void moveIntoPlace();
     void renameTemporary() const;
     [[noreturn]] void fail(char const* why) const;
-    [[noreturn]] void fail(int error) const { fail(std::strerror(error)); }
+    [[noreturn]] void fail(int error) const;
 
     std::filesystem::path file_; // as given by the caller
     std::filesystem::path target_; // with links resolved
@@ -100,6 +96,7 @@ private:
     bool isDirect_ = false; // a device or a pipe
     Existing existing_;
     int descriptor_ = -1;
+    int copy_ = -1; // the temporary file of a library, if `isDirect_`
     std::unique_ptr<char[]> buffer_;
     std::size_t used_ = 0;
 };

@@ -1,5 +1,7 @@
 #include "Scanner.h"
 
+#include "Streams.h"
+
 #include <bit>
 #include <cerrno>
 #include <cstdio>
@@ -52,19 +54,12 @@ std::string lowerCase(std::string_view text)
 InputFile::InputFile(std::filesystem::path const& file)
     : path(file)
 {
-    std::error_code error;
-    std::filesystem::file_status const status = std::filesystem::status(file, error);
-    if (status.type() == std::filesystem::file_type::not_found)
-        refuseFile(file, "there is no such file");
-    if (error)
-        refuseFile(file, error.message());
-    if (!std::filesystem::is_regular_file(status))
-        refuseFile(file, "it is not a regular file");
-
-    std::unique_ptr<std::FILE, int (*)(std::FILE*)> const stream(std::fopen(file.c_str(), "rb"), &std::fclose);
+    std::filesystem::path const regular = regularFileOf(file);
+    std::unique_ptr<std::FILE, int (*)(std::FILE*)> const stream(std::fopen(regular.c_str(), "rb"), &std::fclose);
     if (!stream)
         refuseFile(file, std::strerror(errno));
-    std::uintmax_t const fileSize = std::filesystem::file_size(file, error);
+    std::error_code error;
+    std::uintmax_t const fileSize = std::filesystem::file_size(regular, error);
     if (error)
         refuseFile(file, error.message());
     bytes = std::make_unique_for_overwrite<char[]>(fileSize);
