@@ -87,7 +87,7 @@ namespace {
     std::string wordOf(Json const& value, OptionDescription const& option)
     {
         std::string word = value.is_string() ? value.get<std::string>() : value.dump();
-        if (option.kind == ValueKind::File && word.starts_with('-'))
+        if (option.kind == ValueKind::File && word.starts_with('-') && word != "-")
             word.insert(0, "./"); // otherwise it would be an option
         return word;
     }

@@ -258,7 +258,7 @@ void OutputFile::renameTemporary() const
 
 void OutputFile::checkWritable(std::filesystem::path const& file, Existing existing)
 {
-    if (!isStream(file)) // opening and closing a pipe would be the end of file for its reader
+    if (!isStream(file) || descriptorOf(file)) // opening and closing a pipe would be the end of file for its reader
         OutputFile(file, existing);
 }
 

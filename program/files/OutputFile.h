@@ -66,7 +66,7 @@ public:
     /// \throws FileError  also if a file that is to be kept has been created in the meantime
     void commit();
 
-    /// Throws what the constructor would throw, and leaves no file behind. Devices and pipes are not checked.
+    /// Throws what the constructor would throw, and leaves no file behind. Pipes and devices with names are not checked.
     static void checkWritable(std::filesystem::path const& file, Existing existing);
 
     /// Removes a temporary file. Async-signal-safe, for handlers of signals that end the process.

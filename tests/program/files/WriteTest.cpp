@@ -291,8 +291,8 @@ namespace {
             EXPECT_EQ(contentOf(folder / test.name), "old");
             EXPECT_EQ(folder.entryCount(), 1);
         }
-        EXPECT_TRUE(isWritableFormat("x.PLY"));
-        EXPECT_FALSE(isWritableFormat("x.off"));
+        EXPECT_TRUE(isWritableFormat(formatOf("x.PLY")));
+        EXPECT_FALSE(isWritableFormat(".off"));
     }
 
     TEST(WriteGeometryFile, LeavesTheOldFileUnchangedIfTheDiskIsFull)
