@@ -33,8 +33,8 @@ namespace {
 written: .obj .ply .stl .vtp .glb .h5. FILE.h5#NAME is one of several objects in an HDF5 file. An
 existing file is replaced only with --force, even if OUT is IN, and only by a complete file; if
 anything fails it stays unchanged. Results are printed to standard output, messages to standard
-error. - is standard input or output, whose format --format names; if geometry is written to standard
-output, results are printed to standard error.
+error. - is standard input or output, whose format --format names; if geometry is written to
+standard output, results are printed to standard error.
 
 Exit codes:
   0  done
