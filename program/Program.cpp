@@ -3,6 +3,7 @@
 #include "commands/Commands.h"
 #include "commands/Operation.h"
 #include "files/GeometryFile.h"
+#include "files/Streams.h"
 #include "geometry/MeshRequirements.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
@@ -33,7 +34,8 @@ namespace {
 written: .obj .ply .stl .vtp .glb .h5. FILE.h5#NAME is one of several objects in an HDF5 file. An
 existing file is replaced only with --force, even if OUT is IN, and only by a complete file; if
 anything fails it stays unchanged. Results are printed to standard output, messages to standard
-error.
+error. - is standard input or output, whose format --format names; if geometry is written to
+standard output, results are printed to standard error.
 
 Exit codes:
   0  done
@@ -42,7 +44,7 @@ Exit codes:
   3  a file or standard output cannot be read or written
   4  a file contains invalid geometry
   5  the operation refuses its input; the message says why
-  6  cancelled by Ctrl-C or SIGTERM; nothing was written
+  6  cancelled by Ctrl-C, SIGTERM or SIGHUP; nothing was written
   7  out of memory, or beyond --max-memory
   8  done, but there are warnings about the result, with --strict
 
@@ -59,6 +61,8 @@ Exit codes:
             return failure;
         } catch (FileError const& error) {
             return {ExitCode::File, error.what()};
+        } catch (Cancelled const&) {
+            return {ExitCode::Cancelled, "cancelled; nothing was written"};
         } catch (std::bad_alloc const&) {
             return {ExitCode::OutOfMemory, kOutOfMemory};
         } catch (std::exception const& error) {
@@ -88,17 +92,42 @@ Exit codes:
         return report.lines.empty() ? toText(report.document) + "\n" : text;
     }
 
+    std::string extensionOf(std::string const& format)
+    {
+        return format.empty() ? format : "." + format;
+    }
+
+    /// Gives the output of the command its format. If it is standard output, the report goes to standard error.
+    void prepareOutput(Invocation const& invocation)
+    {
+        auto const output = invocation.outputs.find(invocation.command);
+        auto const list = invocation.lists.find(invocation.command);
+        std::filesystem::path file;
+        if (output != invocation.outputs.end()) {
+            output->second->format = extensionOf(invocation.format);
+            file = output->second->file;
+        } else if (list != invocation.lists.end()) {
+            list->second->out.format = extensionOf(invocation.format);
+            file = outputOf(*list->second);
+        }
+        if (descriptorOf(file) == descriptorOf(kStandardOutput))
+            reserveStandardOutput();
+    }
+
     int runCommand(Invocation const& invocation)
     {
         CancelOnSignal const cancelOnSignal;
         std::optional<tbb::global_control> threadLimit;
         if (invocation.threads != 0)
             threadLimit.emplace(tbb::global_control::max_allowed_parallelism, invocation.threads);
+        prepareOutput(invocation);
         Report report(invocation.command);
         report.isJson = invocation.asJson;
         report.isQuiet = invocation.isQuiet;
         report.isStrict = invocation.isStrict;
         report.reading = invocation.reading;
+        report.reading.format = extensionOf(invocation.inFormat);
+        report.reading.fallbackFormat = extensionOf(invocation.format);
         report.reading.onSize = [](std::uint64_t bytes) { requireMemory(bytes, "an array of the file"); };
         if (std::vector<double> const& center = invocation.center; !center.empty())
             report.reading.origin = {center[0], center[1], center[2]};
@@ -195,6 +224,17 @@ Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& in
         .excludes(center)
         .common();
     command
+        .addOption("--format", invocation.format,
+            "Format of -, pipes and files whose names do not tell it; of inputs only if their first bytes do not "
+            "either")
+        .valueName("EXT")
+        .oneOf(geometryFormats())
+        .common();
+    command.addOption("--in-format", invocation.inFormat, "The same of inputs, whatever their first bytes are")
+        .valueName("EXT")
+        .oneOf(geometryFormats())
+        .common();
+    command
         .addOption("--require", invocation.requirements,
             "Refuse inputs that are not all of these, separated by commas: " + listOf(requirementNames()))
         .valueName("LIST")
@@ -211,10 +251,13 @@ void addFile(
         option.required();
 }
 
-void addOutput(std::string const& description, Output& out, Command& command, Needed needed)
+void addOutput(std::string const& description, Output& out, Command& command, Invocation& invocation, Needed needed)
 {
-    addFile("OUT", description, out.file, command, needed);
+    Option option = command.addOption("OUT", out.file, description).synopsis(" ").output();
+    if (needed == Needed::Always)
+        option.required();
     addForce(out, command);
+    invocation.outputs[command.name()] = &out;
 }
 
 void addForce(Output& out, Command& command)
@@ -225,14 +268,17 @@ void addForce(Output& out, Command& command)
         .between(1, 9);
 }
 
-void addFiles(FileList& files, Command& command, Needed needed)
+void addFiles(FileList& files, Command& command, Invocation& invocation, Needed needed)
 {
     Option option = command.addOption("FILES", files.in, "Files to read; without -o the last one is the output")
                         .synopsis("IN... [OUT]");
     if (needed == Needed::Always)
         option.required();
-    command.addOption("-o,--output", files.out.file, "The output; all other names are inputs").valueName("OUT");
+    command.addOption("-o,--output", files.out.file, "The output; all other names are inputs")
+        .valueName("OUT")
+        .output();
     addForce(files.out, command);
+    invocation.lists[command.name()] = &files;
 }
 
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run)

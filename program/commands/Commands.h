@@ -5,6 +5,7 @@
 
 #include <filesystem>
 #include <functional>
+#include <map>
 #include <string>
 
 namespace ModelingProgram {
@@ -23,7 +24,12 @@ struct Invocation {
     unsigned int threads = 0; // upper limit; 0 for all
     ReadOptions reading;
     std::vector<double> center; // three numbers, or empty
+    std::string format; // of files whose names do not tell it; empty if it is not given
+    std::string inFormat; // the same, of files that are read
     std::function<void(Report&)> run;
+    // What each command writes: a file, or the last one of a list.
+    std::map<std::string, Output*> outputs;
+    std::map<std::string, FileList*> lists;
 };
 
 /// Adds a command with the options that all commands have.
@@ -36,11 +42,12 @@ void addFile(char const* name, std::string const& description, std::filesystem::
     Needed needed = Needed::Always);
 
 /// Adds OUT and --force, which allows replacing an existing file.
-void addOutput(std::string const& description, Output& out, Command& command, Needed needed = Needed::Always);
+void addOutput(std::string const& description, Output& out, Command& command, Invocation& invocation,
+    Needed needed = Needed::Always);
 /// Adds --force only.
 void addForce(Output& out, Command& command);
 /// Adds FILES, -o and --force.
-void addFiles(FileList& files, Command& command, Needed needed = Needed::Always);
+void addFiles(FileList& files, Command& command, Invocation& invocation, Needed needed = Needed::Always);
 
 /// Sets the invocation if `command` is the one on the command line.
 void onSelected(Command& command, Invocation& invocation, std::function<void(Report&)> run);

@@ -37,7 +37,7 @@ and the geometry cannot hold, and what the second format cannot: then it is left
         "  modeling convert tile.xyz tile.ply --center"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "File to read", options->in, command);
-    addOutput("File to write", options->out, command);
+    addOutput("File to write", options->out, command, invocation);
     onSelected(command, invocation, [options](Report& report) { convert(*options, report); });
 }
 

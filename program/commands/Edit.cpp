@@ -70,7 +70,7 @@ void addEditCommand(EditKind const& kind, CommandLine& program, Invocation& invo
     Command command = addCommand(kind.help, program, invocation);
     addFile("IN", describeFile(kind.takes, "read"), files->in[0], command);
     edit->declareFiles(command);
-    addOutput(describeFile(kind.gives, "write"), files->out, command);
+    addOutput(describeFile(kind.gives, "write"), files->out, command, invocation);
     edit->declareOptions(command);
     onSelected(command, invocation,
         [&kind, edit, files](Report& report) { runOnFiles(kind, *edit, files->in, files->out, report); });

@@ -1,6 +1,7 @@
 #include "Commands.h"
 #include "Operation.h"
 #include "VolumeReport.h"
+#include "files/Streams.h"
 #include "files/VdbFile.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
@@ -43,7 +44,7 @@ namespace {
 
     void requireVdb(Output const& out)
     {
-        if (out.file.extension() != ".vdb")
+        if (out.file.extension() != ".vdb" && !isStream(out.file))
             throw Failure(
                 ExitCode::File, fmt::format("{} cannot be written: its name has to end in .vdb", out.file.string()));
         requirePlace(out);
@@ -185,7 +186,7 @@ face, or the distance to a given point. Faces may have any number of corners.
         "  modeling make-volume scan.ply guide.vdb --attribute quality --voxels 200 --band 5"};
     Command command = addCommand(kHelp, program, invocation);
     addFile("MESH", "Mesh to read", options->in, command);
-    addOutput("OpenVDB file to write", options->out, command);
+    addOutput("OpenVDB file to write", options->out, command, invocation);
     addValueOptions(*options, command);
     Option const voxelSize = command.addOption("--voxel-size", options->voxelSize, "Side of a voxel in model units")
                                  .valueName("S")

@@ -275,7 +275,7 @@ void addMerge(CommandLine& program, Invocation& invocation)
     auto const files = std::make_shared<FileList>();
     std::shared_ptr<Edit> const edit = kMerge.create();
     Command command = addCommand(kMerge.help, program, invocation);
-    addFiles(*files, command);
+    addFiles(*files, command, invocation);
     edit->declareOptions(command);
     onSelected(command, invocation, [files, edit](Report& report) {
         chooseOutput("merge", *files);

@@ -2,6 +2,7 @@
 
 #include "files/OutputFile.h"
 #include "files/Scanner.h"
+#include "files/Streams.h"
 #include "files/WorkMeter.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshArrays.h"
@@ -88,7 +89,7 @@ namespace {
 
     bool hasExtension(Output const& out, std::string_view extension)
     {
-        return extensionOf(out.file) == extension;
+        return formatOf(out.file, out.format) == extension;
     }
 
     /// Refuses a mesh with faces that the format cannot hold.
@@ -109,6 +110,13 @@ namespace {
 
 }
 
+fs::path outputOf(FileList const& files)
+{
+    if (!files.out.file.empty() || files.in.size() < 2)
+        return files.out.file;
+    return files.in.back() == kStandardInput ? fs::path(kStandardOutput) : files.in.back(); // it was a -
+}
+
 void chooseOutput(char const* command, FileList& files)
 {
     Output& out = files.out;
@@ -119,10 +127,10 @@ void chooseOutput(char const* command, FileList& files)
             fmt::format(
                 "{0} needs input files and an output file: modeling {0} IN... OUT, or modeling {0} IN... -o OUT",
                 command));
-    out.file = std::move(files.in.back());
+    out.file = outputOf(files);
     files.in.pop_back();
     std::error_code ignored;
-    if (!out.replaces && fs::is_regular_file(fileOf(out.file), ignored))
+    if (!out.replaces && !isStream(out.file) && fs::is_regular_file(fileOf(out.file), ignored))
         throw Failure(ExitCode::File,
             fmt::format("the last file, {}, exists. If it is an input, name the output with -o OUT; if it is the "
                         "output, --force replaces it",
@@ -131,8 +139,11 @@ void chooseOutput(char const* command, FileList& files)
 
 void requireHolds(Output const& out, GeometryType type)
 {
-    if (!isWritableFormat(out.file))
-        refuseOutput(out, "its name has to end in .obj, .ply, .stl, .vtp, .glb or .h5");
+    if (!isWritableFormat(formatOf(out.file, out.format)))
+        refuseOutput(out,
+            out.file.has_extension() && !isStream(out.file)
+                ? "its name has to end in .obj, .ply, .stl, .vtp, .glb or .h5"
+                : "--format has to name its format: obj, ply, stl, vtp, glb or h5");
     if (type == GeometryType::Strands && (hasExtension(out, ".ply") || hasExtension(out, ".stl")))
         refuseOutput(out, "this format cannot hold strands; OBJ, VTP, GLB and HDF5 can");
     if (type == GeometryType::PointCloud && hasExtension(out, ".stl"))
@@ -141,7 +152,8 @@ void requireHolds(Output const& out, GeometryType type)
 
 void requireHolds(Output const& out, Tessara::Object const& object)
 {
-    GeometryType const type = typeOf(object);
+    bool const isEmpty = Tessara::Geometry::getElementCount(object, Tessara::Geometry::sPointComp) == 0;
+    GeometryType const type = isEmpty ? GeometryType::None : typeOf(object);
     requireHolds(out, type);
     if (type == GeometryType::Mesh)
         requireWritableFaces(out, object);
@@ -162,7 +174,7 @@ void requirePlace(Output const& out)
     fs::path const folder = file.has_parent_path() ? file.parent_path() : fs::path(".");
     if (!fs::is_directory(folder, ignored))
         refuseOutput(out, fmt::format("there is no folder {}", folder.string()));
-    if (!out.replaces && fs::is_regular_file(file, ignored))
+    if (!out.replaces && !isStream(file) && fs::is_regular_file(file, ignored))
         refuseOutput(out, "the file exists; --force replaces it");
     if (out.compression != 0 && !hasExtension(out, ".h5"))
         throw Failure(ExitCode::CommandLine,
@@ -285,8 +297,8 @@ void saveGeometry(Tessara::Object const& object, Output const& out, Report& repo
             fmt::format("the result is invalid, so nothing was written: {}", status.message().view()));
     stopIfCancelled();
     std::string const remark = report.reading.origin ? centerOf(report.reading) : std::string();
-    for (std::string const& note :
-        writeGeometryFile(object, out.file, {out.existing(), remark, out.compression, report.reading.onSize}))
+    for (std::string const& note : writeGeometryFile(
+             object, out.file, {out.existing(), remark, out.compression, report.reading.onSize, out.format}))
         report.warn(note);
     report.document["output"] = out.file.string();
 }

@@ -29,6 +29,7 @@ namespace ModelingProgram {
 /// A file to write.
 struct Output {
     std::filesystem::path file;
+    std::string format = {}; // if the name does not tell it, as an extension: ".ply"
     bool replaces = false; // otherwise an existing file is refused
     unsigned int compression = 0; // of an HDF5 file, 1 to 9
 
@@ -41,6 +42,8 @@ struct FileList {
     Output out;
 };
 
+/// The output, which may be at the end of the list; empty if there is none.
+std::filesystem::path outputOf(FileList const& files);
 /// Moves the output from the end of the list to `out`, unless that is given.
 void chooseOutput(char const* command, FileList& files);
 

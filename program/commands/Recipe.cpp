@@ -101,7 +101,7 @@ namespace {
         std::string word = value.is_string()       ? value.get<std::string>()
             : isInteger && value.is_number_float() ? std::to_string(value.get<std::int64_t>())
                                                    : value.dump();
-        if (option.kind == ValueKind::File && word.starts_with('-'))
+        if (option.kind == ValueKind::File && word.starts_with('-') && word != "-")
             word.insert(0, "./"); // otherwise it would be an option
         return word;
     }

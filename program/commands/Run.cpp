@@ -72,7 +72,7 @@ A recipe is a JSON file of steps, such as {{"modeling": 1, "steps": [{{"do": "tr
         "  modeling run --do \"triangulate; remove-slivers\" --print-recipe > clean.json\n"
         "  modeling run part.obj part.vtp --recipe clean.json"};
     Command command = addCommand(help, program, invocation);
-    addFiles(options->files, command, Needed::Sometimes);
+    addFiles(options->files, command, invocation, Needed::Sometimes);
     Command steps = command.addChoice("Steps", "one of these is required");
     steps.addOption("--do", options->steps, "Steps, separated by semicolons").valueName("STEPS");
     steps.addOption("--recipe", options->recipe, "A JSON file of steps").valueName("FILE");

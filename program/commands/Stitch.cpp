@@ -412,7 +412,7 @@ void addStitch(CommandLine& program, Invocation& invocation)
     Command command = addCommand(kStitch.help, program, invocation);
     edit->declareFiles(command);
     command.addOption("--on", files->on[0], "Mesh to lay the template on").synopsis("MESH");
-    addOutput("File of strands to write", files->out, command, Needed::Sometimes);
+    addOutput("File of strands to write", files->out, command, invocation, Needed::Sometimes);
     edit->declareOptions(command);
     command.addFlag("--check", files->checkOnly, "Only report whether the template is usable");
     onSelected(command, invocation, [files, edit](Report& report) {

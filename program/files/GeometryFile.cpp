@@ -2,9 +2,11 @@
 
 #include "Hdf5File.h"
 #include "Readers.h"
+#include "Recognition.h"
 #include "WorkMeter.h"
 #include "Writers.h"
 
+#include <algorithm>
 #include <map>
 
 namespace ModelingProgram {
@@ -31,19 +33,41 @@ namespace {
         return result;
     }
 
-    Format formatOf(std::filesystem::path const& file)
+    constexpr char kHdf5[] = ".h5";
+
+    Format functionsOf(std::string const& format)
     {
-        auto const format = formats().find(extensionOf(file));
-        return format == formats().end() ? Format{} : format->second;
+        auto const known = formats().find(format);
+        return known == formats().end() ? Format{} : known->second;
+    }
+
+    bool isKnown(std::string const& format)
+    {
+        return format == kHdf5 || formats().contains(format);
+    }
+
+    std::string formatOfInput(std::filesystem::path const& file, ReadOptions const& options)
+    {
+        std::string format = formatOf(file, options.format);
+        if (isKnown(format))
+            return format;
+        format = recognizedFormat(file);
+        if (format.empty())
+            format = options.fallbackFormat;
+        if (format.empty())
+            throw FileError(file.string()
+                + " cannot be read: neither its name nor its first bytes tell the format; --format names it");
+        return format;
     }
 
 }
 
 GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions const& options)
 {
-    if (auto const location = hdf5LocationOf(file))
-        return readHdf5Geometry(*location, options);
-    Format const format = formatOf(file);
+    std::string const name = formatOfInput(file, options);
+    if (name == kHdf5)
+        return readHdf5Geometry(hdf5LocationOf(file).value_or(Hdf5Location{file, std::nullopt}), options);
+    Format const format = functionsOf(name);
     if (!format.read)
         throw FileError(file.string()
             + " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .glb, .gltf, .h5 and .hdf5");
@@ -58,11 +82,12 @@ GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions con
 std::vector<std::string> writeGeometryFile(
     Tessara::Object const& object, std::filesystem::path const& file, WriteOptions const& options)
 {
-    if (auto const location = hdf5LocationOf(file)) {
-        writeHdf5Geometry(object, *location, options);
+    std::string const name = formatOf(file, options.format);
+    if (name == kHdf5) {
+        writeHdf5Geometry(object, hdf5LocationOf(file).value_or(Hdf5Location{file, std::nullopt}), options);
         return {};
     }
-    Format const format = formatOf(file);
+    Format const format = functionsOf(name);
     if (!format.write)
         throw FileError(
             file.string() + " cannot be written: its extension is none of .obj, .ply, .stl, .vtp, .glb, .h5 and .hdf5");
@@ -77,14 +102,24 @@ std::vector<std::string> writeGeometryFile(
     return std::move(geometry.leftOut);
 }
 
-bool isWritableFormat(std::filesystem::path const& file)
+std::vector<std::string> geometryFormats()
 {
-    return hdf5LocationOf(file) || formatOf(file).write;
+    std::vector<std::string> names{kHdf5 + 1};
+    for (auto const& [extension, format] : formats())
+        names.push_back(extension.substr(1));
+    std::sort(names.begin(), names.end());
+    return names;
 }
 
-std::string extensionOf(std::filesystem::path const& file)
+bool isWritableFormat(std::string const& format)
 {
-    return hdf5LocationOf(file) ? ".h5" : lowerCase(file.extension().string());
+    return format == kHdf5 || functionsOf(format).write;
+}
+
+std::string formatOf(std::filesystem::path const& file, std::string const& otherwise)
+{
+    std::string extension = hdf5LocationOf(file) ? kHdf5 : lowerCase(file.extension().string());
+    return isKnown(extension) || otherwise.empty() ? extension : otherwise;
 }
 
 std::filesystem::path fileOf(std::filesystem::path const& file)

@@ -33,6 +33,10 @@ struct ReadOptions {
     /// Called with the number of bytes before larger arrays of HDF5 and glTF files are allocated; may throw to refuse
     /// them. Other formats do not need more memory than the size of the file suggests.
     std::function<void(std::uint64_t)> onSize = {};
+    /// The format of a file whose name does not tell it, as an extension: ".ply". If it is empty, the first bytes tell.
+    std::string format = {};
+    /// The format if the first bytes do not tell either.
+    std::string fallbackFormat = {};
 };
 
 /// The contents of a file: a mesh if there are faces, otherwise a strand set if there are polylines, otherwise a point
@@ -45,7 +49,8 @@ struct GeometryFile {
     std::optional<Tessara::Math::double3> origin = {}; // what was subtracted from all positions
 };
 
-/// Reads OBJ, PLY, STL, OFF, XYZ, glTF (.glb, .gltf) and HDF5 files, determined by the extension in upper or lower case.
+/// Reads OBJ, PLY, STL, OFF, XYZ, glTF (.glb, .gltf) and HDF5 files, determined by the extension in upper or lower case,
+/// or as `ReadOptions` says. Standard input (/dev/stdin) and pipes are read to their end first.
 /// "scan.h5#left" is one of several objects in an HDF5 file. The object of an HDF5 file may be invalid, that of other
 /// files never is.
 /// \throws FileError  if the file does not exist, is cut off, or is malformed
@@ -59,6 +64,7 @@ struct WriteOptions {
     std::string remark = {}; // a line of text without a line end, stored as a comment; empty for none
     unsigned int compression = 0; // of HDF5 files, 1 to 9 as those of gzip; 0 for none
     std::function<void(std::uint64_t)> onSize = {}; // as in `ReadOptions`, for objects of a file that are kept
+    std::string format = {}; // if the name does not tell it, as an extension: ".ply"
 };
 
 /// Writes OBJ, PLY (binary, little-endian), STL (binary), VTP, GLB (binary glTF) and HDF5 files. The file appears under
@@ -70,11 +76,14 @@ struct WriteOptions {
 std::vector<std::string> writeGeometryFile(
     Tessara::Object const& object, std::filesystem::path const& file, WriteOptions const& options = {});
 
-/// Whether `writeGeometryFile` supports the extension.
-bool isWritableFormat(std::filesystem::path const& file);
+/// The extensions of all formats that are read or written, without dots.
+std::vector<std::string> geometryFormats();
+/// Whether `writeGeometryFile` supports a format, such as ".ply".
+bool isWritableFormat(std::string const& format);
 
-/// What determines the format: the extension in lower case, ".h5" for all HDF5 files.
-std::string extensionOf(std::filesystem::path const& file);
+/// What determines the format: a known extension in lower case, ".h5" for all HDF5 files. If the name does not end in
+/// one, `otherwise`, or if that is empty the extension all the same.
+std::string formatOf(std::filesystem::path const& file, std::string const& otherwise = {});
 /// The file without the object that it names: "scan.h5" for "scan.h5#left".
 std::filesystem::path fileOf(std::filesystem::path const& file);
 

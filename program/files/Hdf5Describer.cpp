@@ -1,4 +1,5 @@
 #include "Hdf5Codec.h"
+#include "Hdf5Driver.h"
 #include "Hdf5Names.h"
 #include "Hdf5Types.h"
 
@@ -108,6 +109,7 @@ namespace {
         void open(char const* file)
         {
             Hdf5Properties const access(H5Pcreate(H5P_FILE_ACCESS));
+            useDescriptors(access);
             checked(H5Pset_file_locking(access, false, true));
             file_ = Hdf5FileHandle(H5Fopen(file, H5F_ACC_RDONLY, access));
             hsize_t userBytes = 0;

@@ -2,6 +2,7 @@
 
 #include "CodecModule.h"
 #include "Hdf5Codec.h"
+#include "Streams.h"
 
 #include <array>
 #include <cerrno>
@@ -73,13 +74,11 @@ namespace {
     {
         for (int const signal : {SIGSEGV, SIGBUS, SIGABRT, SIGFPE, SIGILL, SIGXCPU, SIGPIPE})
             ::signal(signal, SIG_DFL);
-        for (int const signal : {SIGHUP, SIGQUIT}) { // nohup ignores them
-            struct sigaction old = {};
-            if (::sigaction(signal, nullptr, &old) == 0 && old.sa_handler != SIG_IGN)
-                ::signal(signal, SIG_DFL);
-        }
-        ::signal(SIGINT, SIG_IGN);
-        ::signal(SIGTERM, SIG_IGN);
+        struct sigaction old = {};
+        if (::sigaction(SIGQUIT, nullptr, &old) == 0 && old.sa_handler != SIG_IGN) // background jobs ignore it
+            ::signal(SIGQUIT, SIG_DFL);
+        for (int const signal : {SIGINT, SIGTERM, SIGHUP})
+            ::signal(signal, SIG_IGN);
         ::prctl(PR_SET_PDEATHSIG, SIGKILL);
         limit(RLIMIT_CORE, 0);
         if (int const null = ::open("/dev/null", O_WRONLY); null >= 0) {
@@ -190,11 +189,12 @@ std::string outlineOf(
     constexpr std::uint64_t kLeastBytes = 1 << 20;
     auto* const describe =
         hdf5Function<decltype(modelingDescribeHdf5)>("modelingDescribeHdf5"); // before the process starts
+    std::filesystem::path const regular = regularFileOf(file);
     std::optional<std::string> outline;
     try {
         outline = runInProcess(file, 2 * fileBytes + kLeastBytes, [&](int pipe) {
             limitUse(fileBytes);
-            describe(file.c_str(), selection, name.c_str(), pipe);
+            describe(regular.c_str(), selection, name.c_str(), pipe);
         });
     } catch (std::bad_alloc const&) {
         // The process may use enough for any file that is not broken.

@@ -2,6 +2,7 @@
 #include "Hdf5Names.h"
 #include "Hdf5Outline.h"
 #include "Hdf5Process.h"
+#include "Streams.h"
 #include "WorkMeter.h"
 
 #include <algorithm>
@@ -42,13 +43,11 @@ namespace {
     class RawFile {
     public:
         explicit RawFile(std::filesystem::path const& file)
-            : descriptor_(::open(file.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK)) // a pipe would block
+            : descriptor_(::open(regularFileOf(file).c_str(), O_RDONLY | O_CLOEXEC))
         {
             struct stat status = {};
             if (descriptor_ < 0 || ::fstat(descriptor_, &status) != 0)
-                fail(file, errno == ENOENT ? "there is no such file" : std::strerror(errno));
-            if (!S_ISREG(status.st_mode))
-                fail(file, "it is not a regular file");
+                fail(file, std::strerror(errno));
             size = static_cast<std::uint64_t>(status.st_size);
         }
         RawFile(RawFile const&) = delete;

@@ -1,4 +1,5 @@
 #include "Hdf5Codec.h"
+#include "Hdf5Driver.h"
 #include "Hdf5Names.h"
 #include "Hdf5Types.h"
 
@@ -253,6 +254,7 @@ namespace {
     {
         // The oldest version of the format with checksums of the structure.
         Hdf5Properties const access(H5Pcreate(H5P_FILE_ACCESS));
+        useDescriptors(access);
         checked(H5Pset_libver_bounds(access, H5F_LIBVER_V18, H5F_LIBVER_V18));
         checked(H5Pset_fclose_degree(access, H5F_CLOSE_STRONG));
         checked(H5Pset_file_locking(access, false, true));

@@ -1,5 +1,6 @@
 #include "OutputFile.h"
 
+#include "Streams.h"
 #include "WorkMeter.h"
 
 #include <atomic>
@@ -7,6 +8,7 @@
 #include <cstdio>
 #include <fcntl.h>
 #include <linux/limits.h>
+#include <poll.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -30,7 +32,13 @@ namespace {
         return file;
     }
 
-    /// Renaming could replace such a file, but its permissions say that it is to be kept.
+    std::filesystem::path folderOf(std::filesystem::path const& file)
+    {
+        return file.has_parent_path() ? file.parent_path() : ".";
+    }
+
+    /// Renaming could replace such a file, but its permissions say that it is to be kept. They say so to the superuser
+    /// too, who could write it: nobody removes the write permission of a file without a purpose.
     bool isWriteProtected(std::filesystem::path const& file, std::filesystem::perms permissions)
     {
         using std::filesystem::perms;
@@ -71,6 +79,11 @@ OutputFile::OutputFile(std::filesystem::path const& file, Existing existing)
     , existing_(existing)
     , buffer_(std::make_unique_for_overwrite<char[]>(kBufferBytes))
 {
+    isDirect_ = isStream(file);
+    if (isDirect_) {
+        openDirectly();
+        return;
+    }
     std::error_code error;
     std::filesystem::file_status const status = std::filesystem::status(target_, error);
     if (std::filesystem::is_directory(status))
@@ -80,10 +93,7 @@ OutputFile::OutputFile(std::filesystem::path const& file, Existing existing)
         fail(EEXIST);
     if (isRegular && isWriteProtected(target_, status.permissions()))
         fail("it is write-protected");
-    if (isRegular || !std::filesystem::exists(status))
-        openBeside();
-    else if ((descriptor_ = ::open(target_.c_str(), O_WRONLY | O_CLOEXEC)) < 0)
-        fail(errno);
+    openBeside();
     if (isRegular) // the new file gets the permissions of the old one
         static_cast<void>(::fchmod(descriptor_, static_cast<mode_t>(status.permissions())));
 }
@@ -92,22 +102,53 @@ OutputFile::~OutputFile()
 {
     if (descriptor_ >= 0)
         ::close(descriptor_);
+    if (copy_ >= 0)
+        ::close(copy_);
     if (!temporary_.empty())
         ::unlink(temporary_.c_str());
     releaseTemporary();
 }
 
+void OutputFile::openDirectly()
+{
+    if ((descriptor_ = openForWriting(file_)) < 0)
+        fail(errno);
+    if ((::fcntl(descriptor_, F_GETFL) & O_ACCMODE) == O_RDONLY) // such as a closed standard output
+        fail(EBADF);
+}
+
 void OutputFile::openBeside()
 {
+    if (openUnnamed())
+        return;
+    createTemporary([this] {
+        descriptor_ = ::open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kReadAndWriteForAll);
+        return descriptor_ >= 0;
+    });
+}
+
+/// Some file systems have no files without names, and without /proc none could get a name.
+bool OutputFile::openUnnamed()
+{
+    descriptor_ = ::open(folderOf(target_).c_str(), O_WRONLY | O_TMPFILE | O_CLOEXEC, kReadAndWriteForAll);
+    if (descriptor_ >= 0 && ::access(nameOfDescriptor(descriptor_).c_str(), F_OK) != 0)
+        ::close(std::exchange(descriptor_, -1));
+    return descriptor_ >= 0;
+}
+
+/// Calls a function that creates a file of the name `temporary_`, with a name that does not exist yet.
+template <class Create> void OutputFile::createTemporary(Create const& create)
+{
     static std::atomic<unsigned int> counter = 0;
+    bool isCreated = false;
     do {
         releaseTemporary();
         temporary_ = target_.parent_path()
             / (".modeling-" + std::to_string(::getpid()) + "-" + std::to_string(counter.fetch_add(1)) + ".tmp");
         isRegistered_ = unfinished.take(temporary_); // before the file exists, because a signal may arrive in between
-        descriptor_ = ::open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kReadAndWriteForAll);
-    } while (descriptor_ < 0 && errno == EEXIST);
-    if (descriptor_ < 0) {
+        isCreated = create();
+    } while (!isCreated && errno == EEXIST);
+    if (!isCreated) {
         int const error = errno;
         releaseTemporary();
         fail(error);
@@ -131,7 +172,11 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
 {
     while (bytes != 0) {
         ssize_t const written = ::write(descriptor_, data, bytes);
-        if (written < 0 && errno == EINTR)
+        if (written < 0 && errno == EAGAIN) { // another program made the stream return at once
+            pollfd waiting{descriptor_, POLLOUT, 0};
+            ::poll(&waiting, 1, -1);
+        }
+        if (written < 0 && (errno == EINTR || errno == EAGAIN))
             continue;
         if (written < 0)
             fail(errno);
@@ -141,25 +186,66 @@ void OutputFile::writeThrough(char const* data, std::size_t bytes)
     }
 }
 
-std::filesystem::path OutputFile::temporaryFile() const
+std::filesystem::path OutputFile::temporaryFile()
 {
-    if (temporary_.empty())
-        fail("this format needs a regular file, not a device or a pipe");
-    return "/proc/self/fd/" + std::to_string(descriptor_);
+    if (isDirect_ && copy_ < 0 && (copy_ = openTemporary()) < 0)
+        fail(errno);
+    return nameOfDescriptor(isDirect_ ? copy_ : descriptor_);
 }
 
 void OutputFile::commit()
 {
     flush();
-    if (::close(std::exchange(descriptor_, -1)) != 0)
+    if (isDirect_) {
+        sendCopy();
+    } else {
+        store();
+        moveIntoPlace();
+    }
+    if (::close(std::exchange(descriptor_, -1)) != 0 && isDirect_)
         fail(errno);
-    if (temporary_.empty())
-        return;
-    moveIntoPlace();
-    releaseTemporary();
 }
 
-void OutputFile::moveIntoPlace() const
+/// Writes what a library has written to the temporary file.
+void OutputFile::sendCopy()
+{
+    ssize_t count = 0;
+    for (off_t at = 0; copy_ >= 0 && (count = ::pread(copy_, buffer_.get(), kBufferBytes, at)) > 0; at += count)
+        writeThrough(buffer_.get(), static_cast<std::size_t>(count));
+    if (count < 0)
+        fail(errno);
+}
+
+/// Waits until the content is on the disk, so that a crash of the machine does not leave an empty file under the name.
+void OutputFile::store() const
+{
+    if (::fsync(descriptor_) != 0 && errno != EINVAL && errno != ENOSYS) // not supported by some file systems
+        fail(errno);
+}
+
+void OutputFile::moveIntoPlace()
+{
+    auto const link = [this](std::filesystem::path const& name) {
+        return ::linkat(AT_FDCWD, nameOfDescriptor(descriptor_).c_str(), AT_FDCWD, name.c_str(), AT_SYMLINK_FOLLOW)
+            == 0;
+    };
+    bool const isUnnamed = temporary_.empty();
+    if (!isUnnamed || !link(target_)) {
+        if (isUnnamed && (errno != EEXIST || existing_ == Existing::Keep))
+            fail(errno);
+        if (isUnnamed) // a link cannot replace a file, but a file with a name can be renamed
+            createTemporary([&] { return link(temporary_); });
+        renameTemporary();
+        releaseTemporary();
+    }
+    int const folder = ::open(folderOf(target_).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (folder >= 0) {
+        static_cast<void>(::fsync(folder)); // the file is there, whether or not its name can be waited for
+        ::close(folder);
+    }
+}
+
+void OutputFile::renameTemporary() const
 {
     if (existing_ == Existing::Keep) {
         if (::renameat2(AT_FDCWD, temporary_.c_str(), AT_FDCWD, target_.c_str(), RENAME_NOREPLACE) == 0)
@@ -174,11 +260,7 @@ void OutputFile::moveIntoPlace() const
 
 void OutputFile::checkWritable(std::filesystem::path const& file, Existing existing)
 {
-    std::error_code error;
-    std::filesystem::file_status const status = std::filesystem::status(file, error);
-    bool const isSpecial = std::filesystem::exists(status) && !std::filesystem::is_regular_file(status)
-        && !std::filesystem::is_directory(status);
-    if (!isSpecial) // opening and closing a pipe would be the end of file for its reader
+    if (!isStream(file) || descriptorOf(file)) // opening and closing a pipe would be the end of file for its reader
         OutputFile(file, existing);
 }
 
@@ -191,6 +273,11 @@ void OutputFile::removeUnfinished() noexcept
 void OutputFile::fail(char const* why) const
 {
     throw FileError(file_.string() + " cannot be written: " + why);
+}
+
+void OutputFile::fail(int error) const
+{
+    fail(error == EPIPE ? "the program that reads it has ended" : std::strerror(error));
 }
 
 }

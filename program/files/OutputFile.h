@@ -9,8 +9,10 @@
 
 namespace ModelingProgram {
 
-/// Writes to a temporary file in the same folder and renames it when it is complete. Until then, and if anything fails,
-/// an existing file is unchanged. Anything but a regular file (a device, a pipe) is written directly.
+/// Writes a file that appears under its name when it is complete and on the disk. Until then, and if anything fails, an
+/// existing file is unchanged. The file is written without a name, so that nothing remains however the process ends; on
+/// file systems that have no such files it has a temporary name in the same folder. Anything but a regular file (a
+/// device, a pipe) is written directly.
 class OutputFile {
 public:
     /// \throws FileError, as all functions do: here if the folder is not writable, or if the file exists and is to be
@@ -55,38 +57,46 @@ public:
     /// Writes the bytes of a number as in memory.
     template <class T> void writeBinary(T number) { write(&number, sizeof(T)); }
 
-    /// A name of the temporary file, for a library that opens files by their names, in this process or a forked one. It
-    /// leads to the open file, so that nothing is created again after a signal has removed it.
-    /// \throws FileError  if the file is not a regular one
-    std::filesystem::path temporaryFile() const;
+    /// A name of the file being written, for a library that opens files by their names, in this process or a forked one.
+    /// It leads to the open file, so that nothing is created again after a signal has removed it.
+    /// What is written to a device or a pipe is copied from there at the end.
+    std::filesystem::path temporaryFile();
 
-    /// Completes the file and renames it.
+    /// Completes the file and gives it its name.
     /// \throws FileError  also if a file that is to be kept has been created in the meantime
     void commit();
 
-    /// Throws what the constructor would throw, and leaves no file behind. Devices and pipes are not checked.
+    /// Throws what the constructor would throw, and leaves no file behind. Pipes and devices with names are not checked.
     static void checkWritable(std::filesystem::path const& file, Existing existing);
 
-    /// Removes an incomplete temporary file. Async-signal-safe, for handlers of signals that end the process.
+    /// Removes a temporary file. Async-signal-safe, for handlers of signals that end the process.
     static void removeUnfinished() noexcept;
 
 private:
     static constexpr std::size_t kBufferBytes = 1 << 18;
 
     void openBeside();
+    void openDirectly();
+    bool openUnnamed();
+    template <class Create> void createTemporary(Create const& create);
     void releaseTemporary();
     void flush();
     void writeThrough(char const* data, std::size_t bytes);
-    void moveIntoPlace() const;
+    void sendCopy();
+    void store() const;
+    void moveIntoPlace();
+    void renameTemporary() const;
     [[noreturn]] void fail(char const* why) const;
-    [[noreturn]] void fail(int error) const { fail(std::strerror(error)); }
+    [[noreturn]] void fail(int error) const;
 
     std::filesystem::path file_; // as given by the caller
     std::filesystem::path target_; // with links resolved
     std::filesystem::path temporary_; // empty if there is none
     bool isRegistered_ = false; // `removeUnfinished` knows its name
+    bool isDirect_ = false; // a device or a pipe
     Existing existing_;
     int descriptor_ = -1;
+    int copy_ = -1; // the temporary file of a library, if `isDirect_`
     std::unique_ptr<char[]> buffer_;
     std::size_t used_ = 0;
 };

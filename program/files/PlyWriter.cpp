@@ -79,7 +79,7 @@ namespace {
 
         void write()
         {
-            if (geometry_.kind == WritableGeometry::Kind::Strands)
+            if (geometry_.kind == WritableGeometry::Kind::Strands && !geometry_.isEmpty())
                 throw FileError(
                     file_.string() + " cannot be written: PLY files cannot hold strands; OBJ and VTP files can");
             std::ostringstream header;

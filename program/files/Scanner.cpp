@@ -1,5 +1,6 @@
 #include "Scanner.h"
 
+#include "Streams.h"
 #include "WorkMeter.h"
 
 #include "frame/ParallelFor.h"
@@ -58,19 +59,12 @@ std::string lowerCase(std::string_view text)
 InputFile::InputFile(std::filesystem::path const& file, Loading loading)
     : path(file)
 {
-    std::error_code error;
-    std::filesystem::file_status const status = std::filesystem::status(file, error);
-    if (status.type() == std::filesystem::file_type::not_found)
-        refuseFile(file, "there is no such file");
-    if (error)
-        refuseFile(file, error.message());
-    if (!std::filesystem::is_regular_file(status))
-        refuseFile(file, "it is not a regular file");
-
-    descriptor_.number = ::open(file.c_str(), O_RDONLY | O_CLOEXEC);
+    std::filesystem::path const regular = regularFileOf(file);
+    descriptor_.number = ::open(regular.c_str(), O_RDONLY | O_CLOEXEC);
     if (descriptor_.number < 0)
         refuseFile(file, std::strerror(errno));
-    std::uintmax_t const fileSize = std::filesystem::file_size(file, error);
+    std::error_code error;
+    std::uintmax_t const fileSize = std::filesystem::file_size(regular, error);
     if (error)
         refuseFile(file, error.message());
     size = fileSize;

@@ -24,6 +24,8 @@ namespace {
         auto const refuse = [&](std::string const& why) {
             throw FileError(file.string() + " cannot be written: STL files hold triangles only, " + why);
         };
+        if (geometry.isEmpty())
+            return;
         if (geometry.kind != WritableGeometry::Kind::Mesh)
             refuse("and this is not a mesh");
         Orvan::Array<unsigned int> const& offset = *geometry.offsets;
@@ -86,7 +88,8 @@ void writeStl(WritableGeometry& geometry, std::filesystem::path const& file)
         else
             leaveOut(attribute, "STL files cannot hold it", geometry.leftOut);
     }
-    noteUnusedPoints(geometry);
+    if (!geometry.isEmpty())
+        noteUnusedPoints(geometry);
 
     OutputFile out(file, geometry.existing);
     // The header must not begin with "solid", like a text file.

@@ -42,6 +42,8 @@ struct WritableGeometry {
     Existing existing = Existing::Replace;
 
     std::uint64_t pointCount() const { return positions->size; }
+    /// Empty geometry has no type in most files.
+    bool isEmpty() const { return pointCount() == 0 && cellCount() == 0; }
     /// Faces or strands.
     std::uint64_t cellCount() const { return offsets ? offsets->size - 1 : 0; }
 };

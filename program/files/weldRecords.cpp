@@ -1,8 +1,8 @@
 #include "weldRecords.h"
 
-#include "WorkMeter.h"
 #include "Vectors.h"
 #include "Welder.h"
+#include "WorkMeter.h"
 
 #include "frame/Arrays.h"
 

@@ -15,8 +15,8 @@ namespace ModelingProgram {
 
 namespace {
 
-    constexpr int kCancelling[] = {SIGINT, SIGTERM};
-    constexpr int kEnding[] = {SIGHUP, SIGPIPE, SIGQUIT, SIGALRM, SIGUSR1, SIGUSR2, SIGXCPU};
+    constexpr int kCancelling[] = {SIGINT, SIGTERM, SIGHUP};
+    constexpr int kEnding[] = {SIGQUIT, SIGALRM, SIGUSR1, SIGUSR2, SIGXCPU};
 
     std::atomic<bool> isStopping = false;
 
@@ -56,7 +56,8 @@ CancelOnSignal::CancelOnSignal()
         handle(signal, cancelJob);
     for (int const signal : kEnding)
         handle(signal, endProgram);
-    handle(SIGXFSZ, SIG_IGN); // writing then fails as on a full disk
+    for (int const signal : {SIGXFSZ, SIGPIPE})
+        handle(signal, SIG_IGN); // writing then fails as on a full disk
 }
 
 CancelOnSignal::~CancelOnSignal()

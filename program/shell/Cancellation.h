@@ -6,8 +6,9 @@
 
 namespace ModelingProgram {
 
-/// During its lifetime, the first Ctrl-C (or SIGTERM) asks the running operation to stop. A second one terminates the
-/// program immediately, as do SIGHUP, SIGPIPE, SIGQUIT and other signals; an unfinished output file is removed first.
+/// During its lifetime, the first Ctrl-C (or SIGTERM, or SIGHUP when a terminal is closed) asks the running operation to
+/// stop. A second one terminates the program immediately, as do SIGQUIT and other signals; a temporary file is
+/// removed first.
 class CancelOnSignal {
 public:
     CancelOnSignal();

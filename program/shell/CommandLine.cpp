@@ -2,6 +2,7 @@
 
 #include "Failure.h"
 #include "Suggestion.h"
+#include "files/Streams.h"
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
@@ -117,6 +118,18 @@ namespace {
     std::vector<CLI::Option const*> choicesOf(CLI::App const& group)
     {
         return group.get_options([&](CLI::Option const* option) { return option != group.get_help_ptr(); });
+    }
+
+    /// Gives - the name of the standard stream that it stands for.
+    CLI::Validator nameStream(OptionDescription const& declared)
+    {
+        return CLI::Validator(
+            [&declared](std::string& file) {
+                if (file == "-")
+                    file = declared.isOutput ? kStandardOutput : kStandardInput;
+                return std::string();
+            },
+            "");
     }
 
     std::string describeUnknownOption(
@@ -372,6 +385,12 @@ Option& Option::showDefault()
     return *this;
 }
 
+Option& Option::output()
+{
+    declared_->isOutput = true;
+    return *this;
+}
+
 Option& Option::common()
 {
     declared_->isCommon = true;
@@ -453,6 +472,8 @@ template <class T> Option Command::addOption(char const* name, T& value, std::st
     OptionDescription& declared = (*declarations_)[&option];
     declared.kind = kindOf<typename ValueOf<T>::Type>();
     declared.count = kIsList<T> ? 0 : 1;
+    if (declared.kind == ValueKind::File)
+        option.transform(nameStream(declared));
     return Option(option, declared);
 }
 

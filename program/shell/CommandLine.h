@@ -34,6 +34,7 @@ struct OptionDescription {
     std::string description;
     std::vector<std::string> needs; // names of options
     bool isCommon = false; // every command has it
+    bool isOutput = false; // a file that is written
     int group = -1; // the number of the group of which exactly one option is required
     std::vector<std::string> given; // the values on the command line, after parsing
 };
@@ -73,6 +74,9 @@ public:
     Option& synopsis(char const* text);
     /// Shows the current value of the variable as the default in the help.
     Option& showDefault();
+
+    /// Says that the file is written, so that - is standard output. Otherwise - is standard input.
+    Option& output();
 
     /// Says that every command has this option.
     Option& common();

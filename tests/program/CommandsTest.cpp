@@ -647,22 +647,23 @@ TEST_F(Commands, EmptyGeometryIsAccepted)
     copySamples({"cube.ply", "stitch-quad.obj", "stitch-quad-rings.obj"});
     store(folder / "cloud.ply", kCloud);
     store(folder / "all", "");
-    for (std::string const extension : {"obj", "ply", "stl", "off", "xyz"}) {
+    for (std::string const extension : {"obj", "ply", "stl", "glb", "h5", "off", "xyz"}) {
         if (extension == "off")
             store(folder / "empty.off", "OFF\n0 0 0\n");
         else if (extension == "xyz")
             store(folder / "empty.xyz", "");
-        else if (extension == "stl")
-            ASSERT_EQ(run("triangulate empty.ply empty.stl").exitCode, 0);
+        else if (extension == "stl" || extension == "glb")
+            ASSERT_EQ(run("triangulate empty.ply empty." + extension).exitCode, 0);
         else
             ASSERT_EQ(run("delete-faces cube.ply --indices all --invert empty." + extension).exitCode, 0);
         std::string const file = "empty." + extension;
-        for (std::string arguments : {"info @", "validate @", "convert @ o.ply", "triangulate @ o.ply",
-                 "smooth @ o.ply", "remove-slivers @ o.ply", "repair @ o.ply", "subdivide @ o.ply --relative 0.1",
-                 "subdivide @ o.ply --tolerance 1", "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2",
-                 "delete-faces @ o.ply --indices all", "delete-points @ o.ply --indices all", "add-points @ @ o.ply",
-                 "merge @ cube.ply -o o.ply", "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj",
-                 "merge @ @ -o o.ply", "stitch --template stitch-quad.obj stitch-quad-rings.obj --on @ o.vtp"}) {
+        for (std::string arguments :
+            {"info @", "validate @", "convert @ o.ply", "convert @ o.stl", "merge @ @ -o o.glb", "triangulate @ o.ply",
+                "smooth @ o.ply", "remove-slivers @ o.ply", "repair @ o.ply", "subdivide @ o.ply --relative 0.1",
+                "subdivide @ o.ply --tolerance 1", "make-volume @ guide.vdb --distance-to 0 0 0 --from 1 --to 2",
+                "delete-faces @ o.ply --indices all", "delete-points @ o.ply --indices all", "add-points @ @ o.ply",
+                "merge @ cube.ply -o o.ply", "merge @ cloud.ply -o o.ply", "merge @ stitch-quad-rings.obj -o o.obj",
+                "merge @ @ -o o.ply", "stitch --template stitch-quad.obj stitch-quad-rings.obj --on @ o.vtp"}) {
             for (auto at = arguments.find('@'); at != std::string::npos; at = arguments.find('@'))
                 arguments.replace(at, 1, file);
             Result const result = run(arguments);

@@ -179,7 +179,7 @@ namespace {
         for (char const* const extension : {".ply", ".stl", ".off"})
             EXPECT_EQ(refusalOf(extension, ""), " cannot be read: it is empty");
         EXPECT_EQ(refusalOf(".abc", "x"),
-            " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .glb, .gltf, .h5 and .hdf5");
+            " cannot be read: neither its name nor its first bytes tell the format; --format names it");
         EXPECT_EQ(refusalOf(".stl", std::string(90, '\0')),
             ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90");
 
