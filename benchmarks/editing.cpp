@@ -20,13 +20,15 @@ namespace {
 
 constexpr std::size_t kPointBytes = 32; // in the clouds that are edited and merged
 
-/// The source in fresh memory, with that many more elements, which are zero unless `kUninitialized` is passed.
-template <class T, class... How> Orvan::Array<T> extended(Orvan::Array<T> const& source, std::size_t added, How... how)
+/// The source and the added values in fresh memory; zeros if no values are given.
+template <class T> Orvan::Array<T> extended(Orvan::Array<T> const& source, std::size_t added, T const* values = nullptr)
 {
-    Orvan::Array<T> array;
-    array.reserve(source.size + added);
-    array = source;
-    array.resize(source.size + added, how...);
+    Orvan::Array<T> array(source.size + added, Orvan::kUninitialized);
+    T* const end = std::copy(source.begin(), source.end(), array.data);
+    if (values)
+        std::copy_n(values, added, end);
+    else
+        std::fill_n(end, added, T{});
     return array;
 }
 
@@ -38,8 +40,7 @@ Row const adding("addPointsToPointCloud", kAdded, {"", ":memcpy", ":copy and fil
     Points const positions(added, float3{1, 2, 3});
     if (run.variant == ":copy and fill")
         timeOnCopies(run, count, FlatCloud{0}, [&](FlatCloud& result) {
-            result.positions = extended(cloud.positions, added, Orvan::kUninitialized);
-            std::copy(positions.begin(), positions.end(), result.positions.data + run.size());
+            result.positions = extended(cloud.positions, added, positions.data);
             result.normals = extended(cloud.normals, added);
             result.colors = extended(cloud.colors, added);
             result.intensities = extended(cloud.intensities, added);

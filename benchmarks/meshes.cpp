@@ -16,8 +16,6 @@
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
 
-#include <tbb/parallel_for.h>
-
 #include <algorithm>
 #include <cmath>
 
@@ -38,6 +36,14 @@ template <class Edit> Object edited(Object object, Edit const& edit)
 {
     edit(object);
     return object;
+}
+
+template <class Work> void forEachIndex(unsigned int count, Work const& work)
+{
+    parallelFor(tbb::blocked_range<unsigned int>(0, count, 1), [&](auto const& range) {
+        for (unsigned int i = range.begin(); i != range.end(); ++i)
+            work(i);
+    });
 }
 
 /// The face across edge k of a face.
@@ -62,7 +68,7 @@ void measureFaces(FlatMesh const& mesh)
     auto adjacency = uninitializedArray<unsigned int>(mesh.faceVertex.size);
     auto normals = uninitializedArray<float3>(mesh.faceCount());
     auto ratios = uninitializedArray<float>(mesh.faceCount());
-    tbb::parallel_for(0u, mesh.faceCount(), [&](unsigned int face) {
+    forEachIndex(mesh.faceCount(), [&](unsigned int face) {
         unsigned int const* const c = corner + std::size_t{3} * face;
         for (unsigned int k = 0; k != 3; ++k)
             adjacency[std::size_t{3} * face + k] = twinOf(around, corner, face, k);
@@ -193,7 +199,7 @@ void subdivideOnce(Points& points, Indices& corners)
     };
     auto newPoints = uninitializedArray<float3>(std::uint64_t{pointCount} + faceCount);
     auto newCorners = uninitializedArray<unsigned int>(3 * corners.size);
-    tbb::parallel_for(0u, faceCount, [&](unsigned int face) {
+    forEachIndex(faceCount, [&](unsigned int face) {
         unsigned int const* const c = corners.data + std::size_t{3} * face;
         newPoints[pointCount + face] = (points[c[0]] + points[c[1]] + points[c[2]]) * (1.0f / 3);
         for (unsigned int k = 0; k != 3; ++k) {
@@ -206,7 +212,7 @@ void subdivideOnce(Points& points, Indices& corners)
             target[2] = pointCount + face;
         }
     });
-    tbb::parallel_for(0u, pointCount, [&](unsigned int point) {
+    forEachIndex(pointCount, [&](unsigned int point) {
         unsigned int const first = around.offsets[point], last = around.offsets[point + 1];
         float3 sum{0, 0, 0};
         for (unsigned int i = first; i != last; ++i)
