@@ -8,18 +8,19 @@
 
 #include <algorithm>
 #include <map>
-#include <numeric>
 
 namespace Benchmarks {
 
 using namespace Modeling; // operators of vectors
+using namespace Tessara::Geometry;
 using TestSupport::Random;
 
-namespace {
-
-    /// Cuts each face into four, with the new points moved out to the unit sphere.
-    void cutIntoFour(MeshBuilder& mesh)
-    {
+MeshBuilder Meshes::icosahedronCut(std::size_t faces)
+{
+    MeshBuilder mesh = MeshBuilder::icosahedron();
+    for (float3& p : mesh.points)
+        p = safeNormalize(p);
+    while (mesh.faces.size() < faces) {
         std::map<std::pair<unsigned int, unsigned int>, unsigned int> middles;
         auto const middle = [&](unsigned int a, unsigned int b) {
             auto const point = static_cast<unsigned int>(mesh.points.size());
@@ -28,50 +29,25 @@ namespace {
                 mesh.points.push_back(safeNormalize(mesh.points[a] + mesh.points[b]));
             return entry->second;
         };
-        std::vector<MeshBuilder::Triangle> faces;
-        for (auto const& [a, b, c] : mesh.faces) {
+        for (auto const& [a, b, c] : std::exchange(mesh.faces, {})) {
             unsigned int const ab = middle(a, b), bc = middle(b, c), ca = middle(c, a);
-            faces.insert(faces.end(), {{a, ab, ca}, {b, bc, ab}, {c, ca, bc}, {ab, bc, ca}});
+            mesh.faces.insert(mesh.faces.end(), {{a, ab, ca}, {b, bc, ab}, {c, ca, bc}, {ab, bc, ca}});
         }
-        mesh.faces = std::move(faces);
     }
-
-    float3 onCircle(float turn, float radius)
-    {
-        return {radius * std::cos(turn * 6.2831853f), radius * std::sin(turn * 6.2831853f), 0};
-    }
-
-}
-
-MeshBuilder Meshes::icosahedronCut(std::size_t faces)
-{
-    MeshBuilder mesh = MeshBuilder::icosahedron();
-    for (float3& p : mesh.points)
-        p = safeNormalize(p);
-    while (mesh.faces.size() < faces)
-        cutIntoFour(mesh);
     return mesh;
 }
 
 PolygonMesh const& made(MakeMesh make, std::size_t size)
 {
     static std::map<std::pair<MakeMesh, std::size_t>, PolygonMesh> meshes;
-    auto const [entry, isNew] = meshes.try_emplace({make, size});
-    if (isNew)
-        entry->second = make(size);
-    return entry->second;
-}
-
-PatchedSphere::PatchedSphere(std::size_t faces)
-    : FlatMesh(Meshes::sphere, faces)
-{
-    for (std::size_t face = 0; face != deleted.size; ++face)
-        deleted[face] = face / 100 % 2 == 1;
+    PolygonMesh& mesh = meshes[{make, size}];
+    if (mesh.points.empty())
+        mesh = make(size);
+    return mesh;
 }
 
 Orvan::MutablePtr<Object> PatchedSphere::build() const
 {
-    using namespace Tessara::Geometry;
     auto mesh = makeMesh(points, faceVertex, faceOffset);
     addDataProperty("normal", sPointComp, normals, *mesh);
     addDataProperty("uv", sFaceVertexComp, coordinates, *mesh);
@@ -79,32 +55,28 @@ Orvan::MutablePtr<Object> PatchedSphere::build() const
     return mesh;
 }
 
-FlatCloud::FlatCloud(std::size_t points)
-    : positions(points)
-    , normals(points, float3{0, 0, 1})
-    , colors(points)
-    , intensities(points, 0.5f)
+Orvan::MutablePtr<Object> FlatCloud::build() const
 {
-    Random random(1);
-    for (std::size_t point = 0; point != points; ++point) {
-        positions[point] = random.point();
-        colors[point].x = static_cast<unsigned char>(point);
-    }
+    auto cloud = makePointCloud(positions);
+    addDataProperty("normal", sPointComp, normals, *cloud);
+    addDataProperty("color", sPointComp, colors, *cloud);
+    addDataProperty("intensity", sPointComp, intensities, *cloud);
+    return cloud;
 }
 
 Indices everySecondAtRandom(std::size_t points)
 {
-    Indices order(points);
-    std::iota(order.begin(), order.end(), 0u);
-    Random random(2);
-    for (std::size_t i = points; i > 1; --i)
-        std::swap(order[i - 1], order[random.below(i)]);
+    Indices order = arrayOf(points, [](std::size_t point) { return static_cast<unsigned int>(point); });
+    Random(2).shuffle(order);
     order.resize(points / 2);
     return order;
 }
 
 std::vector<DrawnPolygon> drawnPolygons(std::size_t pointCount)
 {
+    auto const onCircle = [](float turn, float radius) {
+        return float3{radius * std::cos(turn * 6.2831853f), radius * std::sin(turn * 6.2831853f), 0};
+    };
     Random random(1);
     std::vector<DrawnPolygon> polygons(pointCount / 100);
     for (auto& [corners, points] : polygons) {

@@ -61,25 +61,42 @@ struct FlatMesh {
     unsigned int faceCount() const { return static_cast<unsigned int>(faceOffset.size - 1); }
 };
 
+/// What `rule(i)` gives for each i below the count.
+template <class Rule> auto arrayOf(std::size_t count, Rule rule)
+{
+    Orvan::Array<decltype(rule(count))> array(count);
+    for (std::size_t i = 0; i != count; ++i)
+        array[i] = rule(i);
+    return array;
+}
+
 /// A sphere with 24 bytes per point and 44 per face, of which half are to be deleted in patches of a hundred.
 struct PatchedSphere : FlatMesh {
     Points normals = points;
     Orvan::Array<float2> coordinates = Orvan::Array<float2>(faceVertex.size, float2{0.5f, 0.25f}); // of corners
     Orvan::Array<int> materials = Orvan::Array<int>(faceCount(), 7); // of faces
-    Orvan::Array<bool> deleted = Orvan::Array<bool>(faceCount());
+    Orvan::Array<bool> deleted = arrayOf(faceCount(), [](std::size_t face) { return face / 100 % 2 == 1; });
 
-    explicit PatchedSphere(std::size_t faces);
+    explicit PatchedSphere(std::size_t faces)
+        : FlatMesh(Meshes::sphere, faces)
+    {
+    }
     std::size_t bytes() const { return points.size * 24 + faceVertex.size * 12 + materials.size * 8 + 4; }
     Orvan::MutablePtr<Object> build() const;
 };
 
 /// Points with 32 bytes each.
 struct FlatCloud {
-    Points positions, normals;
-    Orvan::Array<uchar4> colors;
-    Orvan::Array<float> intensities;
+    std::size_t count;
+    Points positions =
+        arrayOf(count, [random = TestSupport::Random(1)](std::size_t) mutable { return random.point(); });
+    Points normals = Points(count, float3{0, 0, 1});
+    Orvan::Array<uchar4> colors = arrayOf(count, [](std::size_t i) {
+        return uchar4{static_cast<unsigned char>(i), 0, 0, 0};
+    });
+    Orvan::Array<float> intensities = Orvan::Array<float>(count, 0.5f);
 
-    explicit FlatCloud(std::size_t points);
+    Orvan::MutablePtr<Object> build() const;
 };
 
 /// Half of the points, in no order.

@@ -11,8 +11,6 @@
 
 namespace {
 
-constexpr char kCopySuffix[] = ":memcpy";
-
 std::atomic<bool> isCounting = false; // off while time is measured
 std::atomic<std::int64_t> allocated = 0;
 std::atomic<std::int64_t> mostAllocated = 0;
@@ -21,21 +19,17 @@ std::atomic<std::int64_t> mostAllocated = 0;
 
 namespace Benchmarks {
 
-Row::Row(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure)
+Row::Row(std::string const& name, Sizes const& sizes, std::vector<std::string> const& variants, Measure const& measure)
 {
-    auto* const row = benchmark::RegisterBenchmark(name.c_str(), [=](benchmark::State& state) {
-        Run run{state, name.ends_with(kCopySuffix)};
-        measure(run);
-    });
-    for (auto const& arguments : sizes)
-        row->Args(arguments);
-    row->UseRealTime();
-}
-
-RowBesideCopy::RowBesideCopy(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure)
-{
-    Row(name, sizes, measure);
-    Row(name + kCopySuffix, sizes, measure);
+    for (std::string const& variant : variants) {
+        auto* const row = benchmark::RegisterBenchmark((name + variant).c_str(), [=](benchmark::State& state) {
+            Run run{state, variant};
+            measure(run);
+        });
+        for (auto const& arguments : sizes)
+            row->Args(arguments);
+        row->UseRealTime();
+    }
 }
 
 void Run::reportTimePerElement(std::size_t elements) const
@@ -46,7 +40,7 @@ void Run::reportTimePerElement(std::size_t elements) const
 
 bool Run::copies(std::size_t bytes, std::size_t elements) const
 {
-    if (!isCopy)
+    if (variant != ":memcpy")
         return false;
     Orvan::Array<unsigned char> const source(bytes);
     for (auto _ : state) {

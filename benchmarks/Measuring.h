@@ -21,10 +21,10 @@ using Tessara::Object;
 /// The arguments of each run of a row; most rows have one, the number of elements.
 using Sizes = std::vector<std::vector<std::int64_t>>;
 
-/// A run of a row for one of its sizes.
+/// A run of a row, or of a variant of it, for one of its sizes.
 struct Run {
     benchmark::State& state;
-    bool const isCopy = false;
+    std::string const variant = {};
 
     std::size_t size(std::size_t argument = 0) const { return static_cast<std::size_t>(state.range(argument)); }
     void report(char const* counter, double value) const { state.counters[counter] = value; }
@@ -33,19 +33,20 @@ struct Run {
     {
         report("working bytes/element", bytes / static_cast<double>(elements));
     }
-    /// False, unless this is a run of the row `:memcpy`: then copies that much, and reports no time per element if there are none.
+    /// False, unless this is the variant `:memcpy`: then copies that much, and reports no time per element if there are none.
     bool copies(std::size_t bytes, std::size_t elements = 0) const;
 };
 
-/// Registers a row that is measured in wall time.
+/// Registers a row that is measured in wall time, as "<name><variant>" for each of its variants.
 struct Row {
-    Row(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure);
+    using Measure = std::function<void(Run&)>;
+    Row(std::string const& name, Sizes const& sizes, std::vector<std::string> const& variants, Measure const& measure);
+    Row(std::string const& name, Sizes const& sizes, Measure const& measure)
+        : Row(name, sizes, {""}, measure)
+    {
+    }
 };
-
-/// Also registers the row `<name>:memcpy`, for which `measure` returns if `run.copies()`.
-struct RowBesideCopy {
-    RowBesideCopy(std::string const& name, Sizes const& sizes, std::function<void(Run&)> const& measure);
-};
+inline std::vector<std::string> const kBesideCopy{"", ":memcpy"}; // `measure` returns if `run.copies()`
 
 /// Bytes that work allocates through `operator new`: the most at one time, and what is left when it ends.
 struct Memory {

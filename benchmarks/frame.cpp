@@ -26,34 +26,29 @@ void dispatch(benchmark::State& state)
 }
 BENCHMARK(dispatch)->Arg(0)->Arg(1);
 
-// Loops over floats, beside the time for copying them.
 Sizes const kLoops{{1'000}, {1'000'000}, {30'000'000}};
 
-RowBesideCopy const adding("parallelForAddsOne", kLoops, [](Run& run) {
-    if (run.copies(run.size() * sizeof(float)))
-        return;
-    Orvan::Array<float> values(run.size());
-    float* const value = values.data;
-    timeRuns(run, values.size, [=, count = values.size] {
-        parallelFor(tbb::blocked_range<std::size_t>(0, count, kElementGrain), [=](auto const& range) {
+/// Times `work(values)` on floats, beside the time for copying them.
+Row rowOfLoop(char const* name, void (*work)(Orvan::Array<float>& values))
+{
+    return Row(name, kLoops, kBesideCopy, [=](Run& run) {
+        Orvan::Array<float> values(run.size());
+        if (!run.copies(run.size() * sizeof(float)))
+            timeRuns(run, run.size(), [&] { work(values); });
+    });
+}
+
+Row const adding = rowOfLoop("parallelForAddsOne", [](auto& values) {
+    parallelFor(
+        tbb::blocked_range<std::size_t>(0, values.size, kElementGrain), [value = values.data](auto const& range) {
             for (std::size_t i = range.begin(); i != range.end(); ++i)
                 value[i] += 1.0f;
         });
-    });
 });
+Row const copying = rowOfLoop("copyArray", [](auto& source) { DoNotOptimize(copyOfFirst(source.size, source).data); });
+Row const filling = rowOfLoop("fillArray", [](auto& values) { DoNotOptimize(filledArray(values.size, 1.5f).data); });
 
-RowBesideCopy const copying("copyArray", kLoops, [](Run& run) {
-    Orvan::Array<float> const source(run.size());
-    if (!run.copies(run.size() * sizeof(float)))
-        timeRuns(run, run.size(), [&] { DoNotOptimize(copyOfFirst(source.size, source).data); });
-});
-
-RowBesideCopy const filling("fillArray", kLoops, [](Run& run) {
-    if (!run.copies(run.size() * sizeof(float)))
-        timeRuns(run, run.size(), [&] { DoNotOptimize(filledArray(run.size(), 1.5f).data); });
-});
-
-RowBesideCopy const summing("sumOffsets", kLoops, [](Run& run) {
+Row const summing("sumOffsets", kLoops, kBesideCopy, [](Run& run) {
     Orvan::Array<unsigned char> const counts(run.size(), static_cast<unsigned char>(3));
     auto const countOf = [count = counts.data](std::size_t i) -> unsigned int { return count[i]; };
     if (!run.copies(run.size() * sizeof(float)))

@@ -40,13 +40,11 @@ Orvan::Ptr<Points> square()
 /// Two strands across a square.
 StitchTemplate crossing()
 {
-    Points points(10);
-    for (std::size_t i = 0; i != 5; ++i) {
-        float const t = 0.25f * static_cast<float>(i);
-        points[i] = {t, 0.6f, -0.1f};
-        points[5 + i] = {0.4f, t, 0.1f};
-    }
-    return {square(), Orvan::makePtr<Points>(points), Orvan::makePtr<Indices>(Indices{0, 5, 10}), false};
+    auto const points = Orvan::makePtr<Points>(arrayOf(10, [](std::size_t i) {
+        float const t = 0.25f * static_cast<float>(i % 5);
+        return i < 5 ? float3{t, 0.6f, -0.1f} : float3{0.4f, t, 0.1f};
+    }));
+    return {square(), points, Orvan::makePtr<Indices>(Indices{0, 5, 10}), false};
 }
 
 /// One control point after the other in a quad that stays in the nearest cache.
@@ -65,17 +63,13 @@ Row const controlPoints("stitch findControlPointPos", {}, [](Run& run) {
 
 /// That many strands of eight control points from one edge of a square to the opposite one.
 Row const fill("stitch fill", {{1'000}, {10'000}, {100'000}}, [](Run& run) {
-    Points positions;
-    Indices offsets{0};
-    for (std::size_t strand = 0; strand != run.size(); ++strand) {
-        auto const place = static_cast<float>((strand * 7919) % run.size()) / static_cast<float>(run.size());
-        for (int point = 0; point != 8; ++point)
-            positions.append({0.1f + 0.8f * place, static_cast<float>(point) / 7, 0});
-        offsets.append(static_cast<unsigned int>(positions.size));
-    }
-    auto const polygon = square(), points = Orvan::makePtr<Points>(positions);
-    auto const starts = Orvan::makePtr<Indices>(offsets);
-    timeRuns(run, positions.size, [&] { DoNotOptimize(StitchTemplate(polygon, points, starts, false)); });
+    auto const polygon = square(), points = Orvan::makePtr<Points>(arrayOf(8 * run.size(), [&](std::size_t i) {
+        auto const place = static_cast<float>(i / 8 * 7919 % run.size()) / static_cast<float>(run.size());
+        return float3{0.1f + 0.8f * place, static_cast<float>(i % 8) / 7, 0};
+    }));
+    auto const offsets = Orvan::makePtr<Indices>(
+        arrayOf(run.size() + 1, [](std::size_t strand) { return static_cast<unsigned int>(8 * strand); }));
+    timeRuns(run, points->size, [&] { DoNotOptimize(StitchTemplate(polygon, points, offsets, false)); });
 });
 
 /// Lays a template on each quad of a bent mesh, with as many threads as the argument says.

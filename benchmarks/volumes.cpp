@@ -35,64 +35,57 @@ template <class Traits, Layers layers> LinearSampler<Traits> samplerWith()
         layers == Layers::padded ? &padded : nullptr};
 }
 
-template <class Traits, Layers layers> void addMarking(std::string const& name)
+template <class Traits, Layers layers> void measureMarking(Run& run)
 {
-    for (bool const isByVolume : {true, false})
-        Row(name + (isByVolume ? "" : ":length"), kSampled, [=](Run& run) {
-            using Geometry::Mesh::Internal::markForSubdivision;
-            auto const sampler = samplerWith<Traits, layers>();
-            FlatMesh const mesh(Meshes::sphere, run.size());
-            auto const& [points, faceVertex, faceOffset] = mesh;
-            Orvan::Array<bool> marks(mesh.faceCount());
-            timeRuns(run, mesh.faceCount(), [&] {
-                if (isByVolume)
-                    markForSubdivision(sampler, mesh.faceCount(), points, faceVertex, faceOffset, marks, kTolerance);
-                else
-                    markForSubdivision(kTolerance, mesh.faceCount(), points, faceVertex, faceOffset, marks);
-                DoNotOptimize(marks.data);
-            });
-        });
+    using Geometry::Mesh::Internal::markForSubdivision;
+    auto const sampler = samplerWith<Traits, layers>();
+    FlatMesh const mesh(Meshes::sphere, run.size());
+    auto const& [points, faceVertex, faceOffset] = mesh;
+    Orvan::Array<bool> marks(mesh.faceCount());
+    timeRuns(run, mesh.faceCount(), [&, isByVolume = run.variant.empty()] {
+        if (isByVolume)
+            markForSubdivision(sampler, mesh.faceCount(), points, faceVertex, faceOffset, marks, kTolerance);
+        else
+            markForSubdivision(kTolerance, mesh.faceCount(), points, faceVertex, faceOffset, marks);
+        DoNotOptimize(marks.data);
+    });
 }
 
 /// Points along the mesh or in random order, in rows or one by one.
-template <class Traits, Layers layers> void addSampling(std::string const& name)
+template <class Traits, Layers layers> void measureSampling(Run& run)
 {
-    for (bool const isShuffled : {false, true})
-        for (bool const inRows : {true, false})
-            Row(name + (isShuffled ? "AtRandom" : "") + (inRows ? "" : ":single"), kSampled, [=](Run& run) {
-                std::vector<float3> points = pointsInBand(run.size(), 1);
-                if (isShuffled)
-                    std::shuffle(points.begin(), points.end(), std::mt19937(1));
-                auto sampler = samplerWith<Traits, layers>();
-                std::vector<float> values(points.size());
-                timeRuns(run, points.size(), [&] {
-                    if (inRows)
-                        sampler.sampleAll(points.data(), points.size(), Traits::kUnitDepth, kWorldSpace, values.data());
-                    else
-                        for (std::size_t n = 0; n < points.size(); ++n)
-                            values[n] = sampler.sample(points[n], Traits::kUnitDepth, kWorldSpace);
-                    DoNotOptimize(values.data());
-                });
-            });
+    std::vector<float3> points = pointsInBand(run.size(), 1);
+    if (run.variant.starts_with("AtRandom"))
+        std::shuffle(points.begin(), points.end(), std::mt19937(1));
+    auto sampler = samplerWith<Traits, layers>();
+    std::vector<float> values(points.size());
+    timeRuns(run, points.size(), [&, inRows = !run.variant.ends_with(":single")] {
+        if (inRows)
+            sampler.sampleAll(points.data(), points.size(), Traits::kUnitDepth, kWorldSpace, values.data());
+        else
+            for (std::size_t n = 0; n < points.size(); ++n)
+                values[n] = sampler.sample(points[n], Traits::kUnitDepth, kWorldSpace);
+        DoNotOptimize(values.data());
+    });
 }
 
-template <class Traits> bool addRows(std::string const& suffix)
+template <class Traits> bool addRows(std::string const& suffix, std::vector<std::string> const& variantsOfBuilding)
 {
-    addMarking<Traits, Layers::padded>("markByPaddedVolume" + suffix);
-    addMarking<Traits, Layers::positive>("markByVolume" + suffix);
-    addSampling<Traits, Layers::padded>("samplePaddedVolume" + suffix);
-    addSampling<Traits, Layers::positive>("sampleVolume" + suffix);
-    addSampling<Traits, Layers::full>("sampleCenteredVolume" + suffix);
-    Row("buildVolume" + suffix, kRadii, [](Run& run) {
+    std::vector<std::string> const marking{"", ":length"}, sampling{"", ":single", "AtRandom", "AtRandom:single"};
+    Row("markByPaddedVolume" + suffix, kSampled, marking, measureMarking<Traits, Layers::padded>);
+    Row("markByVolume" + suffix, kSampled, marking, measureMarking<Traits, Layers::positive>);
+    Row("samplePaddedVolume" + suffix, kSampled, sampling, measureSampling<Traits, Layers::padded>);
+    Row("sampleVolume" + suffix, kSampled, sampling, measureSampling<Traits, Layers::positive>);
+    Row("sampleCenteredVolume" + suffix, kSampled, sampling, measureSampling<Traits, Layers::full>);
+    Row("buildVolume" + suffix, kRadii, variantsOfBuilding, [](Run& run) {
         std::vector<Voxel> const voxels = bandOfVoxels(run.size());
+        if (run.copies(voxels.size() * sizeof(Voxel)))
+            return;
         timeRuns(run, voxels.size(), [&] { DoNotOptimize(volumeOf<Traits>(voxels)); });
         run.report("voxels", static_cast<double>(voxels.size()));
     });
     return true;
 }
-[[maybe_unused]] bool const areRowsAdded = addRows<Traits2>("") && addRows<Traits5>("5");
-
-Row const copying(
-    "buildVolume:memcpy", kRadii, [](Run& run) { run.copies(bandOfVoxels(run.size()).size() * sizeof(Voxel)); });
+[[maybe_unused]] bool const areRowsAdded = addRows<Traits2>("", kBesideCopy) && addRows<Traits5>("5", {""});
 
 }

@@ -64,8 +64,7 @@ Row const deletion("deleteFaces:CGAL", kFaces, [](Run& run) {
 template <auto make> void measureTriangulation(Run& run)
 {
     PolygonMesh const& mesh = made(make, run.size());
-    timeOnCopies(run, mesh.faceVertex.size() - 2 * mesh.faceCount(),
-        surfaceOf<CGAL::Exact_predicates_inexact_constructions_kernel>(mesh),
+    timeOnCopies(run, mesh.triangleCount(), surfaceOf<CGAL::Exact_predicates_inexact_constructions_kernel>(mesh),
         [](auto& surface) { Processing::triangulate_faces(surface); });
 }
 Row const quads("triangulate quads:CGAL", kQuads, measureTriangulation<Meshes::bentQuads>);

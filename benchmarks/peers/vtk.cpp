@@ -93,8 +93,7 @@ template <auto make> void measureTriangulation(Run& run)
         filter->SetInputData(copy);
         return filter;
     };
-    timeOnEach(
-        run, mesh.faceVertex.size() - 2 * mesh.faceCount(), makeFilter, [](auto const& filter) { filter->Update(); });
+    timeOnEach(run, mesh.triangleCount(), makeFilter, [](auto const& filter) { filter->Update(); });
 }
 Row const quads("triangulate quads:VTK", kQuads, measureTriangulation<Meshes::bentQuads>);
 Row const polygons("triangulate polygons:VTK", kPolygons, measureTriangulation<Meshes::concave>);

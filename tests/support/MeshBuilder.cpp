@@ -200,14 +200,9 @@ MeshBuilder MeshBuilder::graded() &&
 MeshBuilder MeshBuilder::shuffled(unsigned int seed) &&
 {
     Random random(seed);
-    // Written out, because standard libraries shuffle differently.
-    auto const shuffle = [&](auto& values) {
-        for (std::size_t i = values.size(); i > 1; --i)
-            std::swap(values[i - 1], values[random.below(i)]);
-    };
     std::vector<unsigned int> order(points.size());
     std::iota(order.begin(), order.end(), 0u);
-    shuffle(order);
+    random.shuffle(order);
     std::vector<float3> moved(points.size());
     for (std::size_t point = 0; point != points.size(); ++point)
         moved[order[point]] = points[point];
@@ -215,7 +210,7 @@ MeshBuilder MeshBuilder::shuffled(unsigned int seed) &&
     for (Triangle& face : faces)
         for (unsigned int& corner : face)
             corner = order[corner];
-    shuffle(faces);
+    random.shuffle(faces);
     return std::move(*this);
 }
 

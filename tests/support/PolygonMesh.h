@@ -33,6 +33,7 @@ struct PolygonMesh {
     PolygonMesh joinedWith(PolygonMesh const& other) &&;
 
     std::size_t faceCount() const { return faceOffset.size() - 1; }
+    std::size_t triangleCount() const { return faceVertex.size() - 2 * faceCount(); }
     /// Adds a face that shares no points.
     void addPolygon(std::vector<float3> const& corners);
 

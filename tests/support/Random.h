@@ -3,6 +3,8 @@
 #include <TessaraMathSupport/Types.h>
 
 #include <random>
+#include <ranges>
+#include <utility>
 
 namespace TestSupport {
 
@@ -20,6 +22,12 @@ public:
     Tessara::Math::float3 point(float reach = 1)
     {
         return {reach * coordinate(), reach * coordinate(), reach * coordinate()};
+    }
+    /// Written out, because standard libraries shuffle differently.
+    template <class Values> void shuffle(Values& values)
+    {
+        for (std::size_t i = std::ranges::size(values); i > 1; --i)
+            std::swap(*(values.begin() + (i - 1)), *(values.begin() + below(i)));
     }
 
 private:

@@ -1,0 +1,159 @@
+// Adding, deleting and merging elements. The rows `:flat` and `:copy and fill` are what that costs at least: the same work
+// by loops over plain arrays on one thread, without objects, checks or exceptions to rules.
+
+#include "Inputs.h"
+
+#include <Modeling/addPointsToPointCloud.h>
+#include <Modeling/deleteFaces.h>
+#include <Modeling/deletePointsInPointCloud.h>
+#include <Modeling/mergeMeshes.h>
+#include <Modeling/mergePointClouds.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <algorithm>
+
+using namespace Benchmarks;
+using namespace Tessara::Geometry;
+using namespace Tessara::GeometryAlgorithms;
+
+namespace {
+
+constexpr std::size_t kPointBytes = 32; // in the clouds that are edited and merged
+
+/// The source and the added values in fresh memory; zeros if no values are given.
+template <class T> Orvan::Array<T> extended(Orvan::Array<T> const& source, std::size_t added, T const* values = nullptr)
+{
+    Orvan::Array<T> array(source.size + added, Orvan::kUninitialized);
+    T* const end = std::copy(source.begin(), source.end(), array.data);
+    if (values)
+        std::copy_n(values, added, end);
+    else
+        std::fill_n(end, added, T{});
+    return array;
+}
+
+Row const adding("addPointsToPointCloud", kAdded, {"", ":memcpy", ":copy and fill"}, [](Run& run) {
+    std::size_t const added = run.size(1), count = run.size() + added, bytes = count * kPointBytes;
+    if (run.copies(bytes, count))
+        return;
+    FlatCloud const cloud{run.size()};
+    Points const positions(added, float3{1, 2, 3});
+    if (run.variant == ":copy and fill")
+        timeOnCopies(run, count, FlatCloud{0}, [&](FlatCloud& result) {
+            result.positions = extended(cloud.positions, added, positions.data);
+            result.normals = extended(cloud.normals, added);
+            result.colors = extended(cloud.colors, added);
+            result.intensities = extended(cloud.intensities, added);
+            DoNotOptimize(result.positions.data);
+        });
+    else // the result has as much unused capacity, whose memory is never touched
+        measureEdit(run, count, 2 * bytes, *cloud.build(),
+            [&](Object& object) { addPointsToPointCloud(positions, {}, object, nullptr); });
+});
+
+template <class... T> void compact(Orvan::Array<bool> const& deleted, Orvan::Array<T>&... arrays)
+{
+    auto const compactOne = [&](auto& array) {
+        std::size_t count = 0;
+        for (std::size_t i = 0; i != deleted.size; ++i)
+            if (!deleted[i])
+                array[count++] = array[i];
+        array.resize(count);
+    };
+    (compactOne(arrays), ...);
+}
+
+Row const deletingPoints("deletePointsInPointCloud", kPoints, {"", ":memcpy", ":in place", ":flat"}, [](Run& run) {
+    std::size_t const points = run.size();
+    if (run.copies(points * kPointBytes, points))
+        return;
+    FlatCloud const source{points};
+    auto const indices = everySecondAtRandom(points);
+    auto const edit = [&](Object& object) { deletePointsInPointCloud(indices, object, nullptr); };
+    if (run.variant == ":in place") // on an object that is not shared
+        timeOnEach(
+            run, points, [&] { return source.build(); }, [&](auto const& object) { edit(*object); });
+    else if (run.variant == ":flat")
+        timeOnCopies(run, points, source, [&](FlatCloud& cloud) {
+            Orvan::Array<bool> deleted(points);
+            for (unsigned int const point : indices)
+                deleted[point] = true;
+            compact(deleted, cloud.positions, cloud.normals, cloud.colors, cloud.intensities);
+            DoNotOptimize(cloud.positions.data);
+        });
+    else
+        measureEdit(run, points, (points - indices.size) * kPointBytes, *source.build(), edit);
+});
+
+/// Marks, numbers and compacts.
+void deleteFlat(PatchedSphere const& source, PatchedSphere& mesh)
+{
+    Orvan::Array<bool> unused(mesh.points.size, true);
+    std::size_t corners = 0, faces = 0;
+    for (std::size_t face = 0; face != source.deleted.size; ++face) {
+        if (source.deleted[face])
+            continue;
+        for (unsigned int corner = source.faceOffset[face]; corner != source.faceOffset[face + 1]; ++corner) {
+            unused[mesh.faceVertex[corner]] = false;
+            mesh.faceVertex[corners] = mesh.faceVertex[corner];
+            mesh.coordinates[corners++] = mesh.coordinates[corner];
+        }
+        mesh.materials[faces] = mesh.materials[face];
+        mesh.faceOffset[++faces] = static_cast<unsigned int>(corners);
+    }
+    Indices remap(unused.size, Orvan::kUninitialized);
+    unsigned int count = 0;
+    for (std::size_t point = 0; point != unused.size; ++point)
+        remap[point] = unused[point] ? count : count++;
+    compact(unused, mesh.points, mesh.normals);
+    for (std::size_t corner = 0; corner != corners; ++corner)
+        mesh.faceVertex[corner] = remap[mesh.faceVertex[corner]];
+    DoNotOptimize(mesh.points.data);
+}
+
+Row const deletingFaces("deleteFaces", kFaces, {"", ":memcpy", ":flat"}, [](Run& run) {
+    PatchedSphere const sphere(run.size());
+    if (run.copies(sphere.bytes(), sphere.faceCount()))
+        return;
+    if (run.variant == ":flat")
+        timeOnCopies(run, sphere.faceCount(), sphere, [&](PatchedSphere& mesh) { deleteFlat(sphere, mesh); });
+    else
+        measureEdit(run, sphere.faceCount(), sphere.bytes() / 2, *sphere.build(),
+            [&](Object& object) { deleteFaces(sphere.deleted, object); });
+});
+
+/// `elements` and `bytes` are those of each input.
+void measureMerging(Run& run, std::size_t elements, std::size_t bytes, decltype(&mergeMeshes) merge,
+    std::function<Orvan::MutablePtr<Object>()> const& makeInput)
+{
+    if (run.copies(run.size() * bytes, run.size() * elements))
+        return;
+    Orvan::Array<Orvan::Ptr<Object>> inputs;
+    while (inputs.size != run.size())
+        inputs.append(makeInput());
+    auto const mergeInto = [&](Object& output) { merge(inputs, output, nullptr); };
+    timeOnCopies(run, run.size() * elements, Object(), mergeInto);
+    Object output;
+    Memory const memory = memoryOf([&] { mergeInto(output); });
+    run.report("peak/result", memory.peak / memory.kept);
+}
+
+Row const mergingMeshes("mergeMeshes", kMeshes, kBesideCopy, [](Run& run) {
+    PatchedSphere const sphere(run.size(1));
+    std::size_t const bytes = sphere.bytes() - sizeof(unsigned int); // the offset behind the last face
+    measureMerging(run, sphere.faceCount(), bytes, mergeMeshes, [&] { return sphere.build(); });
+});
+
+Row const mergingClouds("mergePointClouds", kClouds, kBesideCopy, [](Run& run) {
+    std::size_t const points = run.size(1);
+    measureMerging(run, points, points * kPointBytes, mergePointClouds, [=] {
+        auto cloud = makePointCloud(Points(points, float3{1, 2, 3}));
+        addDataProperty("color", sPointComp, Orvan::Array<int>(points, 1), *cloud);
+        addDataProperty("weight", sPointComp, Orvan::Array<double>(points, 0.5), *cloud);
+        addDataProperty("id", sPointComp, Orvan::Array<unsigned int>(points, 3u), *cloud);
+        addDataProperty("radius", sPointComp, Orvan::Array<float>(points, 1.0f), *cloud);
+        return cloud;
+    });
+});
+
+}

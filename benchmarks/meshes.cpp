@@ -1,0 +1,256 @@
+// Cleaning up, triangulating and refining meshes. The rows `:flat passes` and `:flat kernel` are what that costs at least:
+// loops over plain arrays, without objects, checks or exceptions to rules.
+
+#include "Inputs.h"
+
+#include "frame/Arrays.h"
+#include "frame/PointCorners.h"
+#include "frame/VectorMath.h"
+#include "subdivision/refineMesh.h"
+
+#include <Modeling/HalfEdgeDataStructure.h>
+#include <Modeling/removeSlivers.h>
+#include <Modeling/smooth.h>
+#include <Modeling/subdivide.h>
+#include <Modeling/triangulate.h>
+#include <TessaraGeometry/Elements.h>
+#include <TessaraGeometry/Makers.h>
+
+#include <algorithm>
+#include <cmath>
+
+using namespace Benchmarks;
+using namespace Modeling;
+using namespace Tessara::Geometry;
+
+namespace {
+
+constexpr std::size_t kTriangleBytes = 4 * sizeof(unsigned int); // corners and offset
+
+std::size_t bytesOf(Object const& mesh)
+{
+    return getElementCount(mesh, sPointComp) * sizeof(float3) + getElementCount(mesh, sFaceComp) * kTriangleBytes;
+}
+
+template <class Edit> Object edited(Object object, Edit const& edit)
+{
+    edit(object);
+    return object;
+}
+
+template <class Work> void forEachIndex(unsigned int count, Work const& work)
+{
+    parallelFor(tbb::blocked_range<unsigned int>(0, count, 1), [&](auto const& range) {
+        for (unsigned int i = range.begin(); i != range.end(); ++i)
+            work(i);
+    });
+}
+
+/// The face across edge k of a face.
+unsigned int twinOf(PointCorners const& around, unsigned int const* corner, unsigned int face, unsigned int k)
+{
+    unsigned int const* const c = corner + std::size_t{3} * face;
+    unsigned int const end = c[k == 2 ? 0 : k + 1];
+    for (unsigned int i = around.offsets[end]; i != around.offsets[end + 1]; ++i) {
+        unsigned int const other = around.corners[i];
+        if (corner[other % 3 == 2 ? other - 2 : other + 1] == c[k])
+            return other / 3;
+    }
+    return kInvalidIndex;
+}
+
+/// What any method needs: adjacency, normals and one measuring sweep.
+void measureFaces(FlatMesh const& mesh)
+{
+    unsigned int const* const corner = mesh.faceVertex.data;
+    float3 const* const position = mesh.points.data;
+    PointCorners const around = cornersByPoint(mesh.pointCount(), corner, mesh.faceVertex.size);
+    auto adjacency = uninitializedArray<unsigned int>(mesh.faceVertex.size);
+    auto normals = uninitializedArray<float3>(mesh.faceCount());
+    auto ratios = uninitializedArray<float>(mesh.faceCount());
+    forEachIndex(mesh.faceCount(), [&](unsigned int face) {
+        unsigned int const* const c = corner + std::size_t{3} * face;
+        for (unsigned int k = 0; k != 3; ++k)
+            adjacency[std::size_t{3} * face + k] = twinOf(around, corner, face, k);
+        float3 const a = position[c[0]], b = position[c[1]], d = position[c[2]];
+        normals[face] = cross(safeNormalize(b - a), safeNormalize(d - a));
+        float const ab = length(b - a), bd = length(d - b), da = length(a - d);
+        ratios[face] = std::min({ab, bd, da}) / std::max({ab, bd, da});
+    });
+    DoNotOptimize(adjacency.data);
+    DoNotOptimize(normals.data);
+    DoNotOptimize(ratios.data);
+}
+
+Row const slivers("removeSlivers", kTriangles, {"", ":memcpy", ":flat passes"}, [](Run& run) {
+    auto const source = made(Meshes::needled, run.size()).build();
+    auto const edit = [](Object& mesh) { ::Geometry::Mesh::removeSlivers(kSliverRatio, mesh); };
+    if (run.copies(bytesOf(*source), run.size()))
+        return;
+    if (run.variant == ":flat passes")
+        timeRuns(run, run.size(), [mesh = FlatMesh(Meshes::needled, run.size())] { measureFaces(mesh); });
+    else
+        measureEdit(run, run.size(), bytesOf(edited(*source, edit)), *source, edit);
+});
+
+/// The shortest edges of all faces end at one of two hubs.
+Row const sliversAtHubs("removeSlivers:hubs", kTriangles, [](Run& run) {
+    auto const source = MeshBuilder::wheel(static_cast<unsigned int>(run.size() / 2)).build();
+    timeOnCopies(run, run.size(), *source, [](Object& mesh) { ::Geometry::Mesh::removeSlivers(0.5f, mesh); });
+});
+
+void measureSmoothing(Run& run, FlatMesh mesh, std::size_t elementsPerStep)
+{
+    float const amount = 0.9f * kSmoothingSteps - 0.1f; // rounding leaves no further step
+    auto const smooth = [&] {
+        ::Geometry::Mesh::smooth(amount, mesh.pointCount(), mesh.faceCount(), mesh.faceVertex, mesh.faceOffset, nullptr,
+            mesh.points, CoreGL::NOPLogger());
+    };
+    timeRuns(run, elementsPerStep * kSmoothingSteps, smooth);
+    run.report("working bytes/corner", memoryOf(smooth).peak / static_cast<double>(mesh.faceVertex.size));
+}
+
+Row const smoothing("smooth triangles", kTriangles, kBesideCopy, [](Run& run) {
+    FlatMesh const mesh(Meshes::noisy, run.size());
+    if (!run.copies(mesh.points.size * sizeof(float3), mesh.faceCount())) // once per step
+        measureSmoothing(run, mesh, mesh.faceCount());
+});
+
+Row const smoothingQuads("smooth quads, a corner", kTriangles, [](Run& run) {
+    FlatMesh const mesh(Meshes::bentQuads, run.size());
+    measureSmoothing(run, mesh, mesh.faceVertex.size);
+});
+
+/// One polygon with that many corners.
+PolygonMesh comb(std::size_t corners)
+{
+    auto const teeth = static_cast<float>(corners / 2 - 1);
+    std::vector<float3> outline{{teeth / 2, -10, 0}, {teeth, 0, 0}};
+    for (float tooth = teeth - 1; tooth >= 0; --tooth)
+        outline.insert(outline.end(), {{tooth + 0.5f, 5, 0}, {tooth, 0, 0}});
+    PolygonMesh mesh;
+    mesh.addPolygon(outline);
+    return mesh;
+}
+
+void triangulateAll(Object& object)
+{
+    ::Geometry::Mesh::triangulate("*", object);
+}
+
+template <auto make> void measureTriangulation(Run& run)
+{
+    PolygonMesh const& mesh = made(make, run.size());
+    std::size_t const triangles = mesh.triangleCount(), bytes = triangles * kTriangleBytes;
+    if (!run.copies(bytes, triangles))
+        measureEdit(run, triangles, bytes, *mesh.build(), triangulateAll);
+}
+Row const quads("triangulate quads", kQuads, kBesideCopy, measureTriangulation<Meshes::bentQuads>);
+Row const polygons("triangulate polygons", kPolygons, kBesideCopy, measureTriangulation<Meshes::concave>);
+Row const combs("triangulate comb", {{100}, {1'000}, {10'000}}, measureTriangulation<comb>);
+
+/// Normals, texture coordinates and weights at the corners, and numbers of faces.
+Row const attributes("triangulate attributes", kQuads, kBesideCopy, [](Run& run) {
+    PolygonMesh const& mesh = made(Meshes::bentQuads, run.size());
+    std::size_t const triangles = mesh.triangleCount(), corners = mesh.faceVertex.size();
+    if (run.copies(triangles * (kTriangleBytes + 3 * (12 + 8 + 8) + 4), triangles))
+        return;
+    auto const source = mesh.build();
+    addDataProperty("normal", sFaceVertexComp, Points(corners, float3{0, 0, 1}), *source);
+    addDataProperty("uv", sFaceVertexComp, Orvan::Array<float2>(corners, float2{0.5f, 0.25f}), *source);
+    addDataProperty("weight", sFaceVertexComp, Orvan::Array<double>(corners, 0.5), *source);
+    addDataProperty("material", sFaceComp, Orvan::Array<int>(mesh.faceCount(), 3), *source);
+    timeOnCopies(run, triangles, *source, triangulateAll);
+});
+
+template <auto make> void measureHalfEdges(Run& run)
+{
+    FlatMesh const mesh(make, run.size());
+    if (run.copies(mesh.faceVertex.size * sizeof(unsigned int), mesh.faceCount()))
+        return;
+    auto const build = [&] {
+        ::Geometry::Mesh::HalfEdgeDataStructure const built(
+            mesh.pointCount(), mesh.faceCount(), mesh.faceVertex, mesh.faceOffset);
+        DoNotOptimize(built.valence(0));
+    };
+    timeRuns(run, mesh.faceCount(), build);
+    run.reportWorkingBytes(mesh.faceCount(), memoryOf(build).peak);
+}
+Row const halfEdges("halfEdges", kHalfEdges, kBesideCopy, measureHalfEdges<Meshes::sphere>);
+Row const shuffled("halfEdges shuffled", kHalfEdges, measureHalfEdges<Meshes::shuffled>);
+
+/// Elements are the faces of the result.
+template <class Refine> void measureRefinement(Run& run, MakeMesh make, Refine const& refine)
+{
+    auto const source = made(make, run.size()).build();
+    std::size_t const faces = getElementCount(edited(*source, refine), sFaceComp);
+    measureEdit(run, faces, 0, *source, refine);
+    run.report("result faces", static_cast<double>(faces));
+}
+
+/// One uniform step, all on one level: twins, middles, turned edges, and the old points relaxed.
+void subdivideOnce(Points& points, Indices& corners)
+{
+    auto const pointCount = static_cast<unsigned int>(points.size);
+    auto const faceCount = static_cast<unsigned int>(corners.size / 3);
+    PointCorners const around = cornersByPoint(pointCount, corners.data, corners.size);
+    auto const before = [&](unsigned int i) { // the point before a corner in its face
+        return corners[around.corners[i] % 3 == 0 ? around.corners[i] + 2 : around.corners[i] - 1];
+    };
+    auto newPoints = uninitializedArray<float3>(std::uint64_t{pointCount} + faceCount);
+    auto newCorners = uninitializedArray<unsigned int>(3 * corners.size);
+    forEachIndex(faceCount, [&](unsigned int face) {
+        unsigned int const* const c = corners.data + std::size_t{3} * face;
+        newPoints[pointCount + face] = (points[c[0]] + points[c[1]] + points[c[2]]) * (1.0f / 3);
+        for (unsigned int k = 0; k != 3; ++k) {
+            unsigned int i = around.offsets[c[k]];
+            while (before(i) != c[k == 2 ? 0 : k + 1])
+                ++i;
+            unsigned int* const target = newCorners.data + 3 * (std::size_t{3} * face + k);
+            target[0] = c[k];
+            target[1] = pointCount + around.corners[i] / 3;
+            target[2] = pointCount + face;
+        }
+    });
+    forEachIndex(pointCount, [&](unsigned int point) {
+        unsigned int const first = around.offsets[point], last = around.offsets[point + 1];
+        float3 sum{0, 0, 0};
+        for (unsigned int i = first; i != last; ++i)
+            sum = sum + points[before(i)];
+        auto const valence = static_cast<float>(last - first);
+        float const weight = (4 - 2 * std::cos(6.2831855f / valence)) / 9;
+        newPoints[point] = points[point] * (1 - weight) + sum * (weight / valence);
+    });
+    points.swap(newPoints);
+    corners.swap(newCorners);
+}
+
+Row const uniform("subdivide uniform", kUniform, {"", ":memcpy", ":flat kernel"}, [](Run& run) {
+    std::size_t const faces = run.size() * 81;
+    if (run.copies(faces * kTriangleBytes + faces * sizeof(float3) / 2, faces))
+        return;
+    if (run.variant == ":flat kernel")
+        timeRuns(run, faces, [mesh = FlatMesh(Meshes::icosphere, run.size())] {
+            Points points = mesh.points;
+            Indices corners = mesh.faceVertex;
+            for (unsigned int step = 0; step != kUniformSteps; ++step)
+                subdivideOnce(points, corners);
+            DoNotOptimize(points.data);
+        });
+    else
+        measureRefinement(run, Meshes::icosphere, [](Object& mesh) {
+            unsigned int pass = 0;
+            auto const markAll = [&](auto const&, Orvan::Array<bool>& marks) {
+                if (pass++ != kUniformSteps)
+                    fillElements(marks.data, marks.size, true);
+            };
+            ::Geometry::Mesh::Internal::refineMesh(markAll, mesh);
+        });
+});
+
+Row const adaptive("subdivide adaptive", kAdaptive, [](Run& run) {
+    measureRefinement(run, Meshes::graded,
+        [tolerance = toleranceFor(run.size())](Object& mesh) { ::Geometry::Mesh::subdivide(tolerance, mesh); });
+});
+
+}
