@@ -97,7 +97,7 @@ namespace {
 
     Json describeMesh(Object const& mesh, ExaminedMesh const& examined)
     {
-        auto const& [topology, shape] = examined;
+        auto const& [topology, shape, slivers] = examined;
         Json values = countsOf(mesh);
         addPartsAndGenus(topology, values);
         values["openEdges"] = topology.boundaryEdges.count;
@@ -113,14 +113,17 @@ namespace {
     void Repair::run(Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
-        before_ = describeMesh(mesh, examine(arraysOf(mesh)));
+        if (report.needsFacts())
+            before_ = describeMesh(mesh, subject.know());
         RepairOptions const options{chosenSteps(), weldDistance_, mostHoleEdges_};
         Object result = mesh;
         runOperation(report, [&] { counts_ = repairMesh(options, result); });
         dropped_ = dropOutdatedProperties(result);
-        result_ = examine(arraysOf(result));
-        after_ = describeMesh(result, result_);
+        result_ = examine(arraysOf(result)); // also for the warnings
+        if (report.needsFacts())
+            after_ = describeMesh(result, result_);
         mesh = std::move(result);
+        subject.setKnown(result_);
     }
 
     /// Faults that a step that was run could not mend.

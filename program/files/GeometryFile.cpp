@@ -97,7 +97,7 @@ std::vector<std::string> writeGeometryFile(
     if (format.write != writeObj)
         for (FaceNames const& names : geometry.faceNames)
             leaveOut(names.data, "only OBJ and HDF5 files can hold names of faces", geometry.leftOut);
-    workMeter.begin(WorkMeter::kBytes, estimateFileBytes(geometry, extensionOf(file)));
+    workMeter.begin(WorkMeter::kBytes, estimateFileBytes(geometry, name));
     format.write(geometry, file);
     return std::move(geometry.leftOut);
 }

@@ -215,7 +215,7 @@ namespace {
 
 }
 
-DegenerateFaces dropDegenerateFaces(RepairMesh& mesh)
+DegenerateFaces dropDegenerateFaces(MeshWithSources& mesh)
 {
     unsigned int const faceCount = mesh.arrays.faceCount();
     DegenerateFaces result;
@@ -252,7 +252,7 @@ DegenerateFaces dropDegenerateFaces(RepairMesh& mesh)
     return result;
 }
 
-DoubledFaces dropDoubledFaces(RepairMesh& mesh)
+DoubledFaces dropDoubledFaces(MeshWithSources& mesh)
 {
     FoundCopies found = findCopies(mesh.arrays);
     DoubledFaces result{static_cast<unsigned int>(found.copies.size()), std::move(found.twins)};

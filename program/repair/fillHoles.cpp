@@ -209,7 +209,7 @@ namespace {
     /// Appends the triangles of lids to the mesh.
     class LidWriter {
     public:
-        LidWriter(Lids const& lids, RepairMesh& mesh, Adjacency& adjacency)
+        LidWriter(Lids const& lids, MeshWithSources& mesh, Adjacency& adjacency)
             : lids_(lids)
             , mesh_(mesh)
             , adjacency_(adjacency)
@@ -297,7 +297,7 @@ namespace {
         unsigned int pointOf(unsigned int corner) const { return adjacency_.startOf(lids_.sides[corner]); }
 
         Lids const& lids_;
-        RepairMesh& mesh_;
+        MeshWithSources& mesh_;
         Adjacency& adjacency_;
         std::size_t firstCorner_;
         Orvan::Array<unsigned int> points_, offsets_;
@@ -308,7 +308,7 @@ namespace {
 
 }
 
-FilledHoles fillHoles(std::size_t mostEdges, RepairMesh& mesh, Adjacency& adjacency)
+FilledHoles fillHoles(std::size_t mostEdges, MeshWithSources& mesh, Adjacency& adjacency)
 {
     FilledHoles result;
     Lids lids = chooseLids(mostEdges, mesh.arrays, adjacency, result);

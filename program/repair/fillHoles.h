@@ -1,7 +1,7 @@
 #pragma once
 
 #include "Adjacency.h"
-#include "RepairMesh.h"
+#include "MeshWithSources.h"
 
 namespace ModelingProgram {
 
@@ -30,6 +30,6 @@ struct FilledHoles {
 /// O(n log n) for the n edges of all loops, and up to quadratic in those of one of them, plus one parallel pass over all
 /// corners.
 /// \param mostEdges  longer loops remain open
-FilledHoles fillHoles(std::size_t mostEdges, RepairMesh& mesh, Adjacency& adjacency);
+FilledHoles fillHoles(std::size_t mostEdges, MeshWithSources& mesh, Adjacency& adjacency);
 
 }

@@ -240,7 +240,7 @@ Orientation orientSheets(MeshArrays const& mesh, Adjacency const& adjacency)
     return result;
 }
 
-void flipFaces(std::vector<unsigned char> const& isFlipped, RepairMesh& mesh, Adjacency& adjacency)
+void flipFaces(std::vector<unsigned char> const& isFlipped, MeshWithSources& mesh, Adjacency& adjacency)
 {
     if (std::find(isFlipped.begin(), isFlipped.end(), 1) == isFlipped.end())
         return;
@@ -262,7 +262,7 @@ void flipFaces(std::vector<unsigned char> const& isFlipped, RepairMesh& mesh, Ad
     adjacency.reverse(isFlipped);
 }
 
-void turnOutward(RepairMesh& mesh, Adjacency& adjacency)
+void turnOutward(MeshWithSources& mesh, Adjacency& adjacency)
 {
     MeshArrays const& arrays = mesh.arrays;
     Sheets const sheets = findSheets(arrays, adjacency);
@@ -285,7 +285,7 @@ void turnOutward(RepairMesh& mesh, Adjacency& adjacency)
 }
 
 unsigned int dropCopiedSheets(
-    std::vector<std::array<unsigned int, 2>> const& twins, Adjacency const& adjacency, RepairMesh& mesh)
+    std::vector<std::array<unsigned int, 2>> const& twins, Adjacency const& adjacency, MeshWithSources& mesh)
 {
     if (twins.empty())
         return 0;

@@ -1,7 +1,7 @@
 #pragma once
 
 #include "Adjacency.h"
-#include "RepairMesh.h"
+#include "MeshWithSources.h"
 
 #include <cstddef>
 #include <span>
@@ -34,15 +34,15 @@ struct Orientation {
 Orientation orientSheets(MeshArrays const& mesh, Adjacency const& adjacency);
 
 /// Reverses the corners of faces, all but the first.
-void flipFaces(std::vector<unsigned char> const& isFlipped, RepairMesh& mesh, Adjacency& adjacency);
+void flipFaces(std::vector<unsigned char> const& isFlipped, MeshWithSources& mesh, Adjacency& adjacency);
 
 /// Turns closed sheets outward, so that their volume is positive. Those inside an odd number of other closed sheets
 /// that are oriented inward remain so: they bound cavities. Open sheets remain as they are.
-void turnOutward(RepairMesh& mesh, Adjacency& adjacency);
+void turnOutward(MeshWithSources& mesh, Adjacency& adjacency);
 
 /// Drops sheets that are copies: open ones in which each face has a twin in another sheet, unless that was dropped too.
 /// \return the number of faces that were dropped; if it is not 0, the adjacency has to be made anew
 unsigned int dropCopiedSheets(
-    std::vector<std::array<unsigned int, 2>> const& twins, Adjacency const& adjacency, RepairMesh& mesh);
+    std::vector<std::array<unsigned int, 2>> const& twins, Adjacency const& adjacency, MeshWithSources& mesh);
 
 }

@@ -126,7 +126,7 @@ namespace {
 
         RepairOptions const& options_;
         RepairSteps const& steps_;
-        RepairMesh mesh_;
+        MeshWithSources mesh_;
         std::vector<Twins> twins_;
         std::optional<Adjacency> adjacency_; // of the mesh, once its faces are connected
         bool mayHaveCrowdedEdges_ = false;

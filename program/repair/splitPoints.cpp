@@ -60,7 +60,7 @@ namespace {
         std::vector<bool> isVisited_;
     };
 
-    void appendPoints(std::vector<unsigned int> const& originals, RepairMesh& mesh)
+    void appendPoints(std::vector<unsigned int> const& originals, MeshWithSources& mesh)
     {
         editArray(mesh.arrays.positions, [&](Orvan::Array<float3>& positions) {
             for (unsigned int const point : originals)
@@ -72,7 +72,7 @@ namespace {
 
 }
 
-unsigned int splitPoints(RepairMesh& mesh, Adjacency const& adjacency)
+unsigned int splitPoints(MeshWithSources& mesh, Adjacency const& adjacency)
 {
     MeshArrays const old = mesh.arrays; // the walk needs the points as they were
     Fans fans(old, adjacency);
@@ -105,7 +105,7 @@ unsigned int splitPoints(RepairMesh& mesh, Adjacency const& adjacency)
     return static_cast<unsigned int>(originals.size());
 }
 
-unsigned int cutCrowdedEdges(RepairMesh const& mesh, Adjacency& adjacency)
+unsigned int cutCrowdedEdges(MeshWithSources const& mesh, Adjacency& adjacency)
 {
     Adjacency other(mesh.arrays);
     NonManifoldEdges const edges = joinTwoSided(mesh.arrays, other);

@@ -1,7 +1,7 @@
 #pragma once
 
 #include "Adjacency.h"
-#include "RepairMesh.h"
+#include "MeshWithSources.h"
 
 namespace ModelingProgram {
 
@@ -10,11 +10,11 @@ namespace ModelingProgram {
 /// the order of the lowest corners of their fans. The mesh then has no non-manifold points. Edges with more than two
 /// sides may remain if the fans at both of their points are connected elsewhere. Linear, on the calling thread.
 /// \return the number of new points
-unsigned int splitPoints(RepairMesh& mesh, Adjacency const& adjacency);
+unsigned int splitPoints(MeshWithSources& mesh, Adjacency const& adjacency);
 
 /// Separates all sides of the edges that still have more than two. If points are split again, none has more than two.
 /// In parallel.
 /// \return the number of such edges
-unsigned int cutCrowdedEdges(RepairMesh const& mesh, Adjacency& adjacency);
+unsigned int cutCrowdedEdges(MeshWithSources const& mesh, Adjacency& adjacency);
 
 }

@@ -88,7 +88,7 @@ namespace {
 
 }
 
-unsigned int weldPoints(double distance, RepairMesh& mesh)
+unsigned int weldPoints(double distance, MeshWithSources& mesh)
 {
     unsigned int const count = mesh.arrays.pointCount();
     WeldGrid grid(distance, *mesh.arrays.positions);

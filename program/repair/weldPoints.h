@@ -1,6 +1,6 @@
 #pragma once
 
-#include "RepairMesh.h"
+#include "MeshWithSources.h"
 
 namespace ModelingProgram {
 
@@ -12,6 +12,6 @@ namespace ModelingProgram {
 /// Faces then use the points that were kept, and may use one several times. Linear, on the calling thread, with 8 to 20
 /// bytes per point.
 /// \return the number of points that were merged into others
-unsigned int weldPoints(double distance, RepairMesh& mesh);
+unsigned int weldPoints(double distance, MeshWithSources& mesh);
 
 }

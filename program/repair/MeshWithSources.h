@@ -13,8 +13,8 @@ namespace ModelingProgram {
 
 /// A mesh under repair: its standard arrays and, for each element, the element of the original mesh whose properties it
 /// gets. The steps of the repair edit these only; all other properties are gathered once, at the end.
-struct RepairMesh {
-    explicit RepairMesh(Tessara::Object const& mesh);
+struct MeshWithSources {
+    explicit MeshWithSources(Tessara::Object const& mesh);
 
     MeshArrays arrays;
     Orvan::Array<unsigned int> pointSource;
@@ -44,6 +44,6 @@ std::vector<std::string> propertiesWithLosses(
 /// mesh and the properties of its elements: data of all element types, and ranges.
 /// \param object  the mesh that was repaired; data that does not fit its elements is left as it is
 /// \return the number of points that no face used, those that were welded not included
-unsigned int applyRepair(RepairMesh mesh, bool dropsUnused, Tessara::Object& object);
+unsigned int applyRepair(MeshWithSources mesh, bool dropsUnused, Tessara::Object& object);
 
 }

@@ -1,4 +1,4 @@
-#include "RepairMesh.h"
+#include "MeshWithSources.h"
 
 #include "frame/ParallelFor.h"
 
@@ -93,7 +93,7 @@ namespace {
     }
 
     /// Drops points and returns how many of them no face used.
-    unsigned int dropPoints(bool dropsUnused, RepairMesh& mesh)
+    unsigned int dropPoints(bool dropsUnused, MeshWithSources& mesh)
     {
         unsigned int const count = mesh.arrays.pointCount();
         Orvan::Array<bool> isKept(count, !dropsUnused);
@@ -152,7 +152,7 @@ std::vector<std::string> propertiesWithLosses(Indices const& keptPoint, Object c
     return names;
 }
 
-RepairMesh::RepairMesh(Object const& mesh)
+MeshWithSources::MeshWithSources(Object const& mesh)
     : arrays(arraysOf(mesh))
     , pointSource(countingUp(arrays.pointCount()))
     , cornerSource(countingUp(arrays.cornerCount()))
@@ -161,7 +161,7 @@ RepairMesh::RepairMesh(Object const& mesh)
 {
 }
 
-void RepairMesh::dropFaces(Orvan::Array<bool> const& isDropped)
+void MeshWithSources::dropFaces(Orvan::Array<bool> const& isDropped)
 {
     Indices points, offsets, corners, faces;
     Orvan::Array<bool> flips;
@@ -185,7 +185,7 @@ void RepairMesh::dropFaces(Orvan::Array<bool> const& isDropped)
     isFlipped = std::move(flips);
 }
 
-unsigned int applyRepair(RepairMesh mesh, bool dropsUnused, Object& object)
+unsigned int applyRepair(MeshWithSources mesh, bool dropsUnused, Object& object)
 {
     MeshArrays const old = arraysOf(object);
     unsigned int const unusedCount = dropPoints(dropsUnused, mesh);
