@@ -110,7 +110,7 @@ Exit codes:
             list->second->out.format = extensionOf(invocation.format);
             file = outputOf(*list->second);
         }
-        if (descriptorOf(file) == descriptorOf(kStandardOutput))
+        if (isStandardOutput(file))
             reserveStandardOutput();
     }
 

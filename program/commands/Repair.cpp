@@ -137,7 +137,7 @@ namespace {
                 faults.push_back(countOf(finding.count, singular, plural));
         };
         addFault(steps.fill, topology.boundaryEdges, "open edge", "open edges");
-        addFault(steps.split, topology.nonManifoldEdges, "non-manifold edge", "non-manifold edges");
+        addFault(steps.split || steps.fill, topology.nonManifoldEdges, "non-manifold edge", "non-manifold edges");
         addFault(steps.orient, topology.windingConflicts, "winding conflict", "winding conflicts");
         addFault(steps.split, topology.nonManifoldPoints, "pinched point", "pinched points");
         addFault(steps.degenerate, topology.facesBelowThreeCorners, "face with fewer than three corners",
@@ -189,8 +189,9 @@ namespace {
             report.warn(fmt::format("points that were merged had different values of {}; those of the lowest are kept",
                 listOf(counts_.lossyProperties)));
         if (counts_.conflictingEdges != 0)
-            report.warn(fmt::format(
-                "the surface is not orientable, and was cut at {}", countOf(counts_.conflictingEdges, "edge")));
+            report.warn(fmt::format("the surface is not orientable{} {}",
+                chosenSteps().split ? ", and was cut at" : "; the step split would cut it at",
+                countOf(counts_.conflictingEdges, "edge")));
         warnOfFilledArea(report);
         warnOfRemainder(report);
         report.text += shown.empty() ? "nothing to repair\n\n" : formatValues({{"", shown}}) + "\n";
@@ -206,14 +207,14 @@ constinit EditKind const kRepair = {
   weld        merge points at equal positions, or not farther apart than --weld DISTANCE, into the
               lowest one, which keeps its position and attributes
   degenerate  drop repeated corners of faces, and faces with fewer than three points
-  doubled     drop faces with the same points as a lower face. Of two back to back both are kept if they
-              are walls of two solids or the sides of a sheet
-  orient      orient neighboring faces as most of their sheet are, and closed sheets outward, except for
-              cavities: those inside another one that are oriented inward
-  fill        fill holes with triangles, which get the attributes of the faces around them. Every boundary
-              counts, also the outer one of a sheet; --max-hole leaves longer ones open
-  split       give each sheet its own points where sheets share points only, or an edge with more than two
-              faces; new points are copies
+  doubled     drop faces with the same points as a lower face. Of two back to back both are kept if
+              they are walls of two solids or the sides of a sheet
+  orient      orient neighboring faces as most of their sheet are, and closed sheets outward, except
+              for cavities: those inside another one that are oriented inward
+  fill        fill holes with triangles, which get the attributes of the faces around them. Every
+              boundary counts, also the outer one of a sheet; --max-hole leaves longer ones open
+  split       give each sheet its own points where sheets share points only, or an edge with more
+              than two faces; new points are copies
   unused      drop points that no face uses
 
 All attributes are carried over. Faces without area are kept if they have three points. If the result is not

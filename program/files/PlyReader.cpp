@@ -53,7 +53,8 @@ namespace {
 
         void prepare(PlyElement& element)
         {
-            in_.beginElement(element.name.c_str(), 0);
+            if (element.count != 0)
+                in_.beginElement(element.name.c_str(), 0);
             if (element.name == "vertex") {
                 preparePositions(element);
                 builder_.expectPoints(element.count);

@@ -183,7 +183,7 @@ namespace {
             std::vector<Axis> converted;
             std::vector<RecordField> floats;
             for (Axis const& axis : axes_) {
-                auto* const target = reinterpret_cast<std::byte*>(positions.data) + axis.property->axis * sizeof(float);
+                auto* const target = reinterpret_cast<std::byte*>(&positions.data->x + axis.property->axis);
                 if (axis.property->type == PlyScalar::Float && widePositions.empty())
                     floats.push_back({axis.offset, false, sizeof(float), 1, target, sizeof(float3)});
                 else

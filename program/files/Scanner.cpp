@@ -107,12 +107,19 @@ void InputFile::read(std::size_t offset, std::size_t count, void* target) const
         ssize_t const done = ::pread(descriptor_.number, to, count, static_cast<off_t>(offset));
         if (done < 0 && errno == EINTR)
             continue;
-        if (done <= 0)
-            refuseFile(path, done < 0 ? std::strerror(errno) : "it changed while it was read");
+        if (done < 0)
+            refuseFile(path, std::strerror(errno));
+        if (done == 0)
+            refuseChanged();
         to += done;
         offset += static_cast<std::size_t>(done);
         count -= static_cast<std::size_t>(done);
     }
+}
+
+void InputFile::refuseChanged() const
+{
+    refuseFile(path, "it changed while it was read");
 }
 
 void Scanner::countChunk()

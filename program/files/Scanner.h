@@ -41,6 +41,9 @@ struct InputFile {
     /// \pre  they are inside the file
     void read(std::size_t offset, std::size_t count, void* target) const;
 
+    /// For readers that find other bytes when they read a part again.
+    [[noreturn]] void refuseChanged() const;
+
     std::filesystem::path path;
     std::size_t size = 0;
     std::unique_ptr<char[]> bytes; // memory for all of them, which takes up space only when they are loaded

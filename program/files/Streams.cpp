@@ -165,6 +165,15 @@ bool isStream(std::filesystem::path const& file)
             && !std::filesystem::is_directory(status));
 }
 
+bool isStandardOutput(std::filesystem::path const& file)
+{
+    if (descriptorOf(file) == descriptorOf(kStandardOutput))
+        return true;
+    struct stat named = {}, output = {};
+    return ::stat(file.c_str(), &named) == 0 && ::fstat(STDOUT_FILENO, &output) == 0 && S_ISFIFO(output.st_mode)
+        && named.st_dev == output.st_dev && named.st_ino == output.st_ino;
+}
+
 void reserveStandardOutput()
 {
     int const copy = ::fcntl(STDOUT_FILENO, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);

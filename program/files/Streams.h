@@ -27,6 +27,9 @@ std::string nameOfDescriptor(int descriptor);
 /// Whether a file is written from one end to the other and cannot be replaced: a descriptor, a pipe or a device.
 bool isStream(std::filesystem::path const& file);
 
+/// Whether a name, such as a link to /dev/stdout, leads to standard output.
+bool isStandardOutput(std::filesystem::path const& file);
+
 /// From now on only files written to /dev/stdout go there. What the program prints goes to standard error instead.
 void reserveStandardOutput();
 

@@ -40,7 +40,8 @@ namespace {
         {
             if (!countParts())
                 return std::nullopt;
-            distribute();
+            if (!distribute())
+                file_.refuseChanged();
             findFirstCorners();
             return numberPoints();
         }
@@ -121,15 +122,22 @@ namespace {
             return areFinite;
         }
 
-        void distribute()
+        /// \return false if the file no longer has the corners that were counted
+        bool distribute()
         {
             corners_ = Modeling::uninitializedArray<WeldedCorner>(cornerCount_);
-            visitRuns([&](std::uint64_t run) {
-                return
-                    [this, next = runParts_.data() + run * partCount()](unsigned int corner, float3 const& position) {
-                        corners_[next[partOf(hashOf(position))]++] = {position, corner};
-                        return true;
-                    };
+            return visitRuns([&](std::uint64_t run) {
+                auto const begin = runParts_.begin() + static_cast<std::ptrdiff_t>(run * partCount());
+                auto const count = static_cast<std::ptrdiff_t>(partCount());
+                auto const end = run + 1 == runCount() ? partOffsets_.begin() + 1 : begin + count;
+                return [this, next = std::vector(begin, begin + count), end](
+                           unsigned int corner, float3 const& position) mutable {
+                    std::size_t const part = partOf(hashOf(position));
+                    if (next[part] == end[static_cast<std::ptrdiff_t>(part)])
+                        return false;
+                    corners_[next[part]++] = {position, corner};
+                    return true;
+                };
             });
         }
 
@@ -186,15 +194,17 @@ namespace {
                 next[run + 1] += next[run];
             WeldedPoints result{Modeling::uninitializedArray<float3>(next[runCount()]),
                 Modeling::uninitializedArray<unsigned int>(cornerCount_)};
-            visitRuns([&](std::uint64_t run) {
+            bool const areFinite = visitRuns([&](std::uint64_t run) {
                 return [this, &result, point = next[run]](unsigned int corner, float3 const& position) mutable {
                     if (firsts_[corner] == corner) {
                         result.numbers[corner] = static_cast<unsigned int>(point);
                         result.positions[point++] = position;
                     }
-                    return true;
+                    return isFinite(position);
                 };
             });
+            if (!areFinite)
+                file_.refuseChanged();
             forEachRun([&](std::uint64_t, std::uint64_t begin, std::uint64_t end) {
                 for (std::uint64_t corner = begin; corner != end; ++corner)
                     if (firsts_[corner] != corner)
@@ -209,7 +219,7 @@ namespace {
         std::uint64_t cornerCount_;
         int partBits_;
         std::uint64_t runSize_; // records of a run, which one thread visits
-        std::vector<std::uint64_t> runParts_; // the place of the next corner of each run and part in `corners_`
+        std::vector<std::uint64_t> runParts_; // the place of the first corner of each run and part in `corners_`
         std::vector<std::uint64_t> partOffsets_;
         Orvan::Array<WeldedCorner> corners_; // by part, then in ascending order
         Orvan::Array<unsigned int> firsts_;

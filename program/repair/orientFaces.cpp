@@ -155,18 +155,19 @@ namespace {
 
         bool isCrossed(float3 const& p, std::array<unsigned int, 3> const& points) const
         {
-            // An odd number of its edges are right of the point. That is a question to the edge alone, so that a ray
-            // through an edge crosses exactly one of the faces at it.
+            // An odd number of its edges are right of the point. That depends on where the edge is seen from above and
+            // on nothing else, not even on the order of its points: so a ray through an edge crosses exactly one of the
+            // faces at it, and also edges that are above each other are passed on the same side.
             unsigned int passedCount = 0;
             double weight[3];
             for (unsigned int i = 0; i != 3; ++i) {
                 unsigned int const start = points[i], end = points[i == 2 ? 0 : i + 1];
-                double const area = areaSeen(std::min(start, end), std::max(start, end), p);
-                bool const startsAbove = position_[std::min(start, end)].y > p.y;
-                bool const endsAbove = position_[std::max(start, end)].y > p.y;
-                if (startsAbove != endsAbove && (area > 0) == endsAbove)
+                unsigned int const lower = position_[start].y > position_[end].y ? end : start;
+                unsigned int const upper = lower == start ? end : start;
+                double const area = areaSeen(lower, upper, p);
+                if (position_[lower].y <= p.y && position_[upper].y > p.y && area > 0)
                     ++passedCount;
-                weight[i] = start < end ? area : -area;
+                weight[i] = lower == start ? area : -area;
             }
             if (passedCount % 2 == 0)
                 return false;

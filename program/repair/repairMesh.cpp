@@ -83,6 +83,7 @@ namespace {
     private:
         void joinAndOrient()
         {
+            counts_.conflictingEdges = 0;
             adjacency_.emplace(mesh_.arrays);
             NonManifoldEdges const edges = joinTwoSided(mesh_.arrays, *adjacency_);
             bool const hasNonManifoldEdges = edges.count() != 0;

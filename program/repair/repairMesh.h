@@ -37,7 +37,7 @@ struct RepairCounts {
     unsigned int shortenedFaces = 0; // faces that lost repeated corners
     unsigned int doubledFaces = 0; // dropped
     unsigned int flippedFaces = 0;
-    unsigned int conflictingEdges = 0; // cut because the surface is not orientable
+    unsigned int conflictingEdges = 0; // where the surface is not orientable; split cuts them
     FilledHoles holes;
     double filledArea = 0;
     unsigned int splitPoints = 0; // added
@@ -54,7 +54,8 @@ struct RepairCounts {
 /// orientation are split only where they are not orientable.
 ///
 /// Data of elements that is shorter than their component remains as it is and no longer fits. The result does not
-/// depend on the number of threads. O(n log n), except for holes with very many edges (`fillHoles.h`).
+/// depend on the number of threads. O(n log n), except for holes with very many edges (`fillHoles.h`) and very
+/// many closed sheets that are oriented inward (`orientFaces.h`).
 /// \param mesh  any valid mesh
 RepairCounts repairMesh(RepairOptions const& options, Tessara::Object& mesh);
 

@@ -23,7 +23,7 @@ namespace {
     public:
         WeldGrid(double distance, Orvan::Array<float3> const& positions)
             : position_(positions.data)
-            , distance_(distance)
+            , distance_(distance * distance > 0 ? distance : 0) // cells of that width would be infinitely many
             , heads_(std::bit_ceil(std::max<std::size_t>(positions.size, 16)), kNoPoint)
             , nextInSlot_(positions.size, kNoPoint)
         {

@@ -291,15 +291,18 @@ namespace {
         return result;
     }
 
-    /// Rewraps paragraphs, separated by empty lines, to the width of the help.
+    /// Rewraps paragraphs, separated by empty lines, to the width of the help. Those that begin with a blank are tables.
     std::string reflowed(std::string_view text)
     {
         std::string result;
         while (!text.empty()) {
             std::size_t const end = std::min(text.find("\n\n"), text.size());
             std::string paragraph(text.substr(0, end));
-            std::replace(paragraph.begin(), paragraph.end(), '\n', ' ');
-            result += (result.empty() ? "" : "\n\n") + wrapped(paragraph, kHelpColumns, 0);
+            if (!paragraph.starts_with(' ')) {
+                std::replace(paragraph.begin(), paragraph.end(), '\n', ' ');
+                paragraph = wrapped(paragraph, kHelpColumns, 0);
+            }
+            result += (result.empty() ? "" : "\n\n") + paragraph;
             text.remove_prefix(std::min(end + 2, text.size()));
         }
         return result;

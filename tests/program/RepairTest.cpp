@@ -12,6 +12,7 @@
 #include <algorithm>
 #include <cstdlib>
 #include <map>
+#include <numeric>
 
 namespace ModelingProgram {
 
@@ -110,11 +111,11 @@ namespace {
             differentCount += areEqual((*mesh.positions)[p], original.points[expected]) ? 0u : 1u;
         };
         for (unsigned int p = 0; p != mesh.pointCount(); ++p)
-            expectPosition(p, (*point)[p]);
+            expectPosition(p, static_cast<std::size_t>((*point)[p]));
         EXPECT_EQ(differentCount, result.counts.holes.centerCount);
         differentCount = 0;
         for (unsigned int c = 0; c != mesh.cornerCount(); ++c)
-            expectPosition((*mesh.faceVertex)[c], original.faceVertex[(*corner)[c]]);
+            expectPosition((*mesh.faceVertex)[c], original.faceVertex[static_cast<std::size_t>((*corner)[c])]);
         EXPECT_TRUE(differentCount == 0 || result.counts.holes.centerCount != 0) << differentCount;
         unsigned int const keptCount = mesh.faceCount() - result.counts.holes.faceCount;
         for (unsigned int f = 0; f != keptCount; ++f)
@@ -239,6 +240,26 @@ TEST(Repair, MendsWhatItIsFor)
     }
 }
 
+// Seen from above, edges of one cavity are exactly above those of the other, and above its points.
+TEST(Repair, KeepsCavitiesAboveEachOther)
+{
+    PolygonMesh const box = bothOf(bothOf(cube(4), cube(1, {1, 1, .5f}, true)), cube(1, {1, 1, 2.5f}, true));
+    TestSupport::Random random(3);
+    std::vector<unsigned int> order(box.points.size());
+    std::iota(order.begin(), order.end(), 0u);
+    for (int i = 0; i != 100; ++i) {
+        random.shuffle(order);
+        PolygonMesh mesh = box;
+        for (std::size_t point = 0; point != order.size(); ++point)
+            mesh.points[order[point]] = box.points[point];
+        for (unsigned int& point : mesh.faceVertex)
+            point = order[point];
+        Repaired const result = repaired(mesh.build());
+        ASSERT_EQ(result.counts.flippedFaces, 0u);
+        ASSERT_NEAR(result.volume, 62, 1e-6);
+    }
+}
+
 TEST(Repair, ClosesRandomBrokenMeshes)
 {
     TestSupport::Random random(7);
@@ -333,7 +354,8 @@ TEST(Repair, WeldsNearPointsToTheLowest)
         points.push_back(random.point());
     std::vector<int> kept;
     for (unsigned int i = 0; i != points.size(); ++i)
-        if (std::none_of(kept.begin(), kept.end(), [&](int k) { return distance(points[k], points[i]) <= 0.1; }))
+        if (std::none_of(kept.begin(), kept.end(),
+                [&](int k) { return distance(points[static_cast<std::size_t>(k)], points[i]) <= 0.1; }))
             kept.push_back(static_cast<int>(i));
     Mesh const mesh = numbered(polygonsOf(points, {}));
     RepairOptions options{.steps = {.unused = false}, .weldDistance = 0.1};

@@ -27,7 +27,7 @@ public:
     template <class Values> void shuffle(Values& values)
     {
         for (std::size_t i = std::ranges::size(values); i > 1; --i)
-            std::swap(*(values.begin() + (i - 1)), *(values.begin() + below(i)));
+            std::swap(values[i - 1], values[below(i)]);
     }
 
 private:

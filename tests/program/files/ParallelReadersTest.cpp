@@ -299,7 +299,7 @@ namespace {
             ReadOptions const options{.isLenient = i % 2 == 0, .isCentered = i % 3 == 0};
             Outcome const whole = outcomeOf([&] { return readObj(file, options, content.size()); });
             readCount += !!whole.object;
-            for (std::size_t const partBytes : {1, 20, 100, 400})
+            for (std::size_t const partBytes : std::initializer_list<std::size_t>{1, 20, 100, 400})
                 expectSame(outcomeOf([&] { return readObj(file, options, partBytes); }), whole);
         }
         EXPECT_GT(readCount, 100);
