@@ -25,7 +25,7 @@ struct Subject {
 
     /// The topology, computed only if it is not known.
     MeshTopology const& knowTopology();
-    /// The same for topology and shape, which together take half the time. Slivers are counted in any case.
+    /// The same for topology and shape, which are faster to compute together. Slivers are counted in any case.
     ExaminedMesh know(float sliverRatio = 0);
     /// After the mesh has changed. By default nothing is known of the new one.
     void setKnown(std::optional<ExaminedMesh> const& facts = {});

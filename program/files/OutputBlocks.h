@@ -60,7 +60,7 @@ private:
 
 /// Writes elements in blocks, which are filled in parallel while earlier ones are written. The file does not depend on
 /// the number of threads.
-/// \param bytesEach  about how many bytes an element takes up in the file
+/// \param bytesEach  approximate bytes per element in the file
 /// \param fill       appends the elements from `first` up to `end`; called from several threads
 void writeInBlocks(std::uint64_t count, std::size_t bytesEach,
     std::function<void(std::uint64_t first, std::uint64_t end, OutputBuffer&)> const& fill, OutputFile& out);

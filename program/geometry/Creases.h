@@ -6,6 +6,7 @@
 #include <array>
 #include <cmath>
 #include <cstdint>
+#include <limits>
 #include <numbers>
 
 namespace ModelingProgram {
@@ -34,7 +35,7 @@ public:
 /// edges are not sharp.
 class Creases {
 public:
-    /// \param normals  one per face: they tell most edges that are not sharp. May be null.
+    /// \param normals  one per face: they rule out most smooth edges quickly. May be null.
     Creases(MeshArrays const& mesh, EdgeSides const& edges, double degrees, CompactNormal const* normals = nullptr)
         : mesh_(mesh)
         , edges_(edges)

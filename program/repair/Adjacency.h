@@ -9,7 +9,7 @@
 namespace ModelingProgram {
 
 /// Which sides of faces are joined: each side at most with one other. A side is named by the corner at which it starts.
-/// Other than in a table of edges, faces that meet at an edge need not be neighbors, so that sheets can be told apart
+/// Unlike in an edge table, faces that meet at an edge need not be neighbors, so that sheets can be told apart
 /// before they have points of their own. Needs 4 bytes per corner, and 4 more if not all faces are triangles.
 class Adjacency {
 public:

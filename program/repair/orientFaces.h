@@ -3,6 +3,7 @@
 #include "Adjacency.h"
 #include "MeshWithSources.h"
 
+#include <array>
 #include <cstddef>
 #include <span>
 #include <vector>
@@ -41,7 +42,7 @@ void flipFaces(std::vector<unsigned char> const& isFlipped, MeshWithSources& mes
 void turnOutward(MeshWithSources& mesh, Adjacency& adjacency);
 
 /// Drops sheets that are copies: open ones in which each face has a twin in another sheet, unless that was dropped too.
-/// \return the number of faces that were dropped; if it is not 0, the adjacency has to be made anew
+/// \return the number of faces that were dropped; if it is not 0, the adjacency must be rebuilt
 unsigned int dropCopiedSheets(
     std::vector<std::array<unsigned int, 2>> const& twins, Adjacency const& adjacency, MeshWithSources& mesh);
 
