@@ -172,11 +172,11 @@ namespace {
     /// A file of many blocks, with faces of 3 or of 3 to 6 corners.
     std::string largePly(std::endian order, bool areTriangles)
     {
-        constexpr unsigned int kPoints = 150'000, kFaces = 200'000;
+        constexpr unsigned int kPoints = 70'000, kFaces = 60'000;
         std::string content = "ply\nformat binary_" + std::string(order == std::endian::little ? "little" : "big")
-            + "_endian 1.0\nelement vertex 150000\nproperty float x\nproperty float y\nproperty float z\n"
+            + "_endian 1.0\nelement vertex 70000\nproperty float x\nproperty float y\nproperty float z\n"
               "property uchar red\nproperty uchar green\nproperty uchar blue\nproperty short s\n"
-              "element face 200000\nproperty uchar before\nproperty list uchar int vertex_indices\n"
+              "element face 60000\nproperty uchar before\nproperty list uchar int vertex_indices\n"
               "property ushort after\n";
         if (areTriangles)
             content += "property list uchar float texcoord\n";
