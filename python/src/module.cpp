@@ -1,0 +1,7 @@
+#include "Handles.h"
+
+PYBIND11_MODULE(_modeling, module)
+{
+    module.doc() = "The part of the package `modeling` that is written in C++.";
+    module.attr("__version__") = MODELING_VERSION;
+}
