@@ -15,28 +15,6 @@ using namespace Modeling; // operators of vectors
 using namespace Tessara::Geometry;
 using TestSupport::Random;
 
-MeshBuilder Meshes::icosahedronCut(std::size_t faces)
-{
-    MeshBuilder mesh = MeshBuilder::icosahedron();
-    for (float3& p : mesh.points)
-        p = safeNormalize(p);
-    while (mesh.faces.size() < faces) {
-        std::map<std::pair<unsigned int, unsigned int>, unsigned int> middles;
-        auto const middle = [&](unsigned int a, unsigned int b) {
-            auto const point = static_cast<unsigned int>(mesh.points.size());
-            auto const [entry, isNew] = middles.try_emplace(std::minmax(a, b), point);
-            if (isNew)
-                mesh.points.push_back(safeNormalize(mesh.points[a] + mesh.points[b]));
-            return entry->second;
-        };
-        for (auto const& [a, b, c] : std::exchange(mesh.faces, {})) {
-            unsigned int const ab = middle(a, b), bc = middle(b, c), ca = middle(c, a);
-            mesh.faces.insert(mesh.faces.end(), {{a, ab, ca}, {b, bc, ab}, {c, ca, bc}, {ab, bc, ca}});
-        }
-    }
-    return mesh;
-}
-
 PolygonMesh const& made(MakeMesh make, std::size_t size)
 {
     static std::map<std::pair<MakeMesh, std::size_t>, PolygonMesh> meshes;

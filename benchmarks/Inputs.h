@@ -20,8 +20,6 @@ using Indices = Orvan::Array<unsigned int>;
 /// Meshes of at least that many faces. All but the last two are triangles on the unit sphere or close to it.
 struct Meshes {
     static MeshBuilder ball(std::size_t faces) { return MeshBuilder::sphereWithFaces(faces); }
-    static MeshBuilder icosahedronCut(std::size_t faces); // each face into four, repeatedly
-
     static PolygonMesh sphere(std::size_t faces) { return ball(faces).polygons(); }
     static PolygonMesh shuffled(std::size_t faces) { return ball(faces).shuffled(1).polygons(); }
     static PolygonMesh noisy(std::size_t faces)
@@ -30,9 +28,7 @@ struct Meshes {
     }
     /// 23,520 needles at 500,000 faces: each cut makes two.
     static PolygonMesh needled(std::size_t faces) { return ball(faces).withNeedles(faces * 1176 / 50'000).polygons(); }
-    /// 20 · 4ⁿ faces.
-    static PolygonMesh icosphere(std::size_t faces) { return icosahedronCut(faces).polygons(); }
-    static PolygonMesh graded(std::size_t faces) { return icosahedronCut(faces).graded().polygons(); }
+    static PolygonMesh graded(std::size_t faces) { return ball(faces).graded().polygons(); }
     static PolygonMesh concave(std::size_t faces) { return PolygonMesh::stars(faces, 4, 12, 1); }
     /// About that many quads, none of them planar.
     static PolygonMesh bentQuads(std::size_t faces)
@@ -123,6 +119,13 @@ constexpr unsigned int kUniformSteps = 4; // give 81 times as many faces
 inline float toleranceFor(std::size_t faces)
 {
     return 0.0042f / std::sqrt(static_cast<float>(faces) / 81'920);
+}
+
+/// Peers are not measured on the largest meshes.
+inline Sizes withoutLargest(Sizes sizes)
+{
+    sizes.pop_back();
+    return sizes;
 }
 
 inline Sizes const kTriangles{{5'000}, {50'000}, {500'000}}; // for cleaning up

@@ -1,21 +1,6 @@
 #include "Measuring.h"
 
-#include "support/AllocationHooks.h"
-
-#include <atomic>
-#include <cstdlib>
 #include <cstring>
-#include <new>
-
-#include <malloc.h>
-
-namespace {
-
-std::atomic<bool> isCounting = false; // off while time is measured
-std::atomic<std::int64_t> allocated = 0;
-std::atomic<std::int64_t> mostAllocated = 0;
-
-}
 
 namespace Benchmarks {
 
@@ -55,34 +40,4 @@ bool Run::copies(std::size_t bytes, std::size_t elements) const
     return true;
 }
 
-Memory memoryOf(std::function<void()> const& work)
-{
-    allocated = mostAllocated = 0;
-    isCounting = true;
-    work();
-    isCounting = false;
-    return {static_cast<double>(mostAllocated), static_cast<double>(allocated)};
-}
-
-}
-
-void* TestSupport::allocateBlock(std::size_t bytes, std::size_t alignment)
-{
-    void* const block = systemBlock(bytes, alignment);
-    if (!block)
-        throw std::bad_alloc();
-    if (isCounting.load(std::memory_order_relaxed)) {
-        auto const usable = static_cast<std::int64_t>(::malloc_usable_size(block));
-        std::int64_t const now = allocated.fetch_add(usable) + usable;
-        std::int64_t most = mostAllocated.load();
-        while (now > most && !mostAllocated.compare_exchange_weak(most, now)) { }
-    }
-    return block;
-}
-
-void TestSupport::freeBlock(void* block) noexcept
-{
-    if (block && isCounting.load(std::memory_order_relaxed))
-        allocated.fetch_sub(static_cast<std::int64_t>(::malloc_usable_size(block)));
-    std::free(block);
 }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "support/AllocationHooks.h"
+
 #include <OrvanCore/Array.h>
 #include <TessaraObject/Object.h>
 
@@ -17,6 +19,7 @@ namespace Benchmarks {
 
 using benchmark::DoNotOptimize;
 using Tessara::Object;
+using TestSupport::memoryOf;
 
 /// The arguments of each run of a row; most rows have one, the number of elements.
 using Sizes = std::vector<std::vector<std::int64_t>>;
@@ -29,9 +32,9 @@ struct Run {
     std::size_t size(std::size_t argument = 0) const { return static_cast<std::size_t>(state.range(argument)); }
     void report(char const* counter, double value) const { state.counters[counter] = value; }
     void reportTimePerElement(std::size_t elements) const;
-    void reportWorkingBytes(std::size_t elements, double bytes) const
+    void reportWorkingBytes(std::size_t elements, std::int64_t bytes) const
     {
-        report("working bytes/element", bytes / static_cast<double>(elements));
+        report("working bytes/element", static_cast<double>(bytes) / static_cast<double>(elements));
     }
     /// False, unless this is the variant `:memcpy`: then copies that much, and reports no time per element if there are none.
     bool copies(std::size_t bytes, std::size_t elements = 0) const;
@@ -48,14 +51,8 @@ struct Row {
 };
 inline std::vector<std::string> const kBesideCopy{"", ":memcpy"}; // `measure` returns if `run.copies()`
 
-/// Bytes that work allocates through `operator new`: the most at one time, and what is left when it ends.
-struct Memory {
-    double peak, kept;
-};
-Memory memoryOf(std::function<void()> const& work);
-
-/// Times `work()`, and reports the wall time per element as all of these do.
-template <class Work> void timeRuns(Run& run, std::size_t elements, Work const& work)
+/// Times `work()`, and reports the wall time per element as all of these do. The number of elements may be known only then.
+template <class Work> void timeRuns(Run& run, std::size_t const& elements, Work const& work)
 {
     for (auto _ : run.state) {
         work();
@@ -89,14 +86,23 @@ void timeOnCopies(Run& run, std::size_t elements, Source const& source, Work con
         run, elements, [&] { return source; }, work);
 }
 
-/// Times `edit(copy)` on copies of the source, and reports what it allocates beyond the bytes of the result.
-template <class Edit>
-void measureEdit(Run& run, std::size_t elements, std::size_t resultBytes, Object const& source, Edit const& edit)
+/// Times `edit(copy)` on copies of the source, and reports what it allocates beyond what the result keeps.
+template <class Edit> void measureEdit(Run& run, std::size_t elements, Object const& source, Edit const& edit)
 {
     timeOnCopies(run, elements, source, edit);
     Object object = source;
-    double const bytes = memoryOf([&] { edit(object); }).peak - static_cast<double>(resultBytes);
-    run.reportWorkingBytes(elements, bytes);
+    TestSupport::Memory const memory = memoryOf([&] { edit(object); });
+    run.reportWorkingBytes(elements, memory.peak - memory.kept);
+}
+
+/// Times `refine()`, which makes a mesh from arrays or shared ones and returns its number of faces: these are the elements.
+template <class Refine> void measureRefinement(Run& run, Refine const& refine)
+{
+    std::size_t faces = 0;
+    auto const work = [&] { faces = refine(); };
+    timeRuns(run, faces, work);
+    run.reportWorkingBytes(faces, memoryOf(work).peak);
+    run.report("result faces", static_cast<double>(faces));
 }
 
 }

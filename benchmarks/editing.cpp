@@ -20,35 +20,31 @@ namespace {
 
 constexpr std::size_t kPointBytes = 32; // in the clouds that are edited and merged
 
-/// The source and the added values in fresh memory; zeros if no values are given.
-template <class T> Orvan::Array<T> extended(Orvan::Array<T> const& source, std::size_t added, T const* values = nullptr)
+/// The source and an added value, repeated, in fresh memory.
+template <class T> Orvan::Array<T> extended(Orvan::Array<T> const& source, std::size_t added, T const& value = {})
 {
     Orvan::Array<T> array(source.size + added, Orvan::kUninitialized);
-    T* const end = std::copy(source.begin(), source.end(), array.data);
-    if (values)
-        std::copy_n(values, added, end);
-    else
-        std::fill_n(end, added, T{});
+    std::fill_n(std::copy(source.begin(), source.end(), array.data), added, value);
     return array;
 }
 
 Row const adding("addPointsToPointCloud", kAdded, {"", ":memcpy", ":copy and fill"}, [](Run& run) {
-    std::size_t const added = run.size(1), count = run.size() + added, bytes = count * kPointBytes;
-    if (run.copies(bytes, count))
+    std::size_t const added = run.size(1), count = run.size() + added;
+    if (run.copies(count * kPointBytes, count))
         return;
     FlatCloud const cloud{run.size()};
     Points const positions(added, float3{1, 2, 3});
     if (run.variant == ":copy and fill")
         timeOnCopies(run, count, FlatCloud{0}, [&](FlatCloud& result) {
-            result.positions = extended(cloud.positions, added, positions.data);
+            result.positions = extended(cloud.positions, added, positions[0]);
             result.normals = extended(cloud.normals, added);
             result.colors = extended(cloud.colors, added);
             result.intensities = extended(cloud.intensities, added);
             DoNotOptimize(result.positions.data);
         });
-    else // the result has as much unused capacity, whose memory is never touched
-        measureEdit(run, count, 2 * bytes, *cloud.build(),
-            [&](Object& object) { addPointsToPointCloud(positions, {}, object, nullptr); });
+    else
+        measureEdit(
+            run, count, *cloud.build(), [&](Object& object) { addPointsToPointCloud(positions, {}, object, nullptr); });
 });
 
 template <class... T> void compact(Orvan::Array<bool> const& deleted, Orvan::Array<T>&... arrays)
@@ -82,7 +78,7 @@ Row const deletingPoints("deletePointsInPointCloud", kPoints, {"", ":memcpy", ":
             DoNotOptimize(cloud.positions.data);
         });
     else
-        measureEdit(run, points, (points - indices.size) * kPointBytes, *source.build(), edit);
+        measureEdit(run, points, *source.build(), edit);
 });
 
 /// Marks, numbers and compacts.
@@ -118,8 +114,8 @@ Row const deletingFaces("deleteFaces", kFaces, {"", ":memcpy", ":flat"}, [](Run&
     if (run.variant == ":flat")
         timeOnCopies(run, sphere.faceCount(), sphere, [&](PatchedSphere& mesh) { deleteFlat(sphere, mesh); });
     else
-        measureEdit(run, sphere.faceCount(), sphere.bytes() / 2, *sphere.build(),
-            [&](Object& object) { deleteFaces(sphere.deleted, object); });
+        measureEdit(
+            run, sphere.faceCount(), *sphere.build(), [&](Object& object) { deleteFaces(sphere.deleted, object); });
 });
 
 /// `elements` and `bytes` are those of each input.
@@ -131,11 +127,7 @@ void measureMerging(Run& run, std::size_t elements, std::size_t bytes, decltype(
     Orvan::Array<Orvan::Ptr<Object>> inputs;
     while (inputs.size != run.size())
         inputs.append(makeInput());
-    auto const mergeInto = [&](Object& output) { merge(inputs, output, nullptr); };
-    timeOnCopies(run, run.size() * elements, Object(), mergeInto);
-    Object output;
-    Memory const memory = memoryOf([&] { mergeInto(output); });
-    run.report("peak/result", memory.peak / memory.kept);
+    measureEdit(run, run.size() * elements, Object(), [&](Object& output) { merge(inputs, output, nullptr); });
 }
 
 Row const mergingMeshes("mergeMeshes", kMeshes, kBesideCopy, [](Run& run) {

@@ -10,21 +10,17 @@ using namespace Modeling;
 namespace {
 
 /// Finding the type of one property's array: the argument is 0 for the first type of the list, 1 for the last.
-void dispatch(benchmark::State& state)
-{
-    Run run{state};
+Row const dispatch("dispatch", {{0}, {1}}, [](Run& run) {
     using First = signed char;
     using Last = Tessara::Geometry::Transform::GraphTransforms;
-    Tessara::PropertyValue const value = state.range(0) == 0
-        ? Tessara::PropertyValue(Orvan::makePtr<Orvan::Array<First>>())
-        : Tessara::PropertyValue(Orvan::makePtr<Orvan::Array<Last>>());
+    Tessara::PropertyValue const value = run.size() == 0 ? Tessara::PropertyValue(Orvan::makePtr<Orvan::Array<First>>())
+                                                         : Tessara::PropertyValue(Orvan::makePtr<Orvan::Array<Last>>());
     timeRuns(run, 1, [&] {
         bool result = false;
         forEachElementType<AllElementTypes, ArrayForm>(&value, &result, [](auto& array) { return !array->empty(); });
         DoNotOptimize(result);
     });
-}
-BENCHMARK(dispatch)->Arg(0)->Arg(1);
+});
 
 Sizes const kLoops{{1'000}, {1'000'000}, {30'000'000}};
 

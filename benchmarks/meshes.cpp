@@ -4,7 +4,7 @@
 #include "Inputs.h"
 
 #include "frame/Arrays.h"
-#include "frame/PointCorners.h"
+#include "frame/FaceAdjacency.h"
 #include "frame/VectorMath.h"
 #include "subdivision/refineMesh.h"
 
@@ -27,17 +27,6 @@ namespace {
 
 constexpr std::size_t kTriangleBytes = 4 * sizeof(unsigned int); // corners and offset
 
-std::size_t bytesOf(Object const& mesh)
-{
-    return getElementCount(mesh, sPointComp) * sizeof(float3) + getElementCount(mesh, sFaceComp) * kTriangleBytes;
-}
-
-template <class Edit> Object edited(Object object, Edit const& edit)
-{
-    edit(object);
-    return object;
-}
-
 template <class Work> void forEachIndex(unsigned int count, Work const& work)
 {
     parallelFor(tbb::blocked_range<unsigned int>(0, count, 1), [&](auto const& range) {
@@ -46,32 +35,17 @@ template <class Work> void forEachIndex(unsigned int count, Work const& work)
     });
 }
 
-/// The face across edge k of a face.
-unsigned int twinOf(PointCorners const& around, unsigned int const* corner, unsigned int face, unsigned int k)
-{
-    unsigned int const* const c = corner + std::size_t{3} * face;
-    unsigned int const end = c[k == 2 ? 0 : k + 1];
-    for (unsigned int i = around.offsets[end]; i != around.offsets[end + 1]; ++i) {
-        unsigned int const other = around.corners[i];
-        if (corner[other % 3 == 2 ? other - 2 : other + 1] == c[k])
-            return other / 3;
-    }
-    return kInvalidIndex;
-}
-
 /// What any method needs: adjacency, normals and one measuring sweep.
 void measureFaces(FlatMesh const& mesh)
 {
-    unsigned int const* const corner = mesh.faceVertex.data;
     float3 const* const position = mesh.points.data;
-    PointCorners const around = cornersByPoint(mesh.pointCount(), corner, mesh.faceVertex.size);
-    auto adjacency = uninitializedArray<unsigned int>(mesh.faceVertex.size);
+    FaceView const faces{mesh.faceVertex.data, mesh.faceOffset, mesh.faceCount()};
+    FaceAdjacency const adjacency =
+        buildFaceAdjacency(faces, cornersByPoint(mesh.pointCount(), mesh.faceVertex.data, mesh.faceVertex.size));
     auto normals = uninitializedArray<float3>(mesh.faceCount());
     auto ratios = uninitializedArray<float>(mesh.faceCount());
     forEachIndex(mesh.faceCount(), [&](unsigned int face) {
-        unsigned int const* const c = corner + std::size_t{3} * face;
-        for (unsigned int k = 0; k != 3; ++k)
-            adjacency[std::size_t{3} * face + k] = twinOf(around, corner, face, k);
+        unsigned int const* const c = faces.corners(face);
         float3 const a = position[c[0]], b = position[c[1]], d = position[c[2]];
         normals[face] = cross(safeNormalize(b - a), safeNormalize(d - a));
         float const ab = length(b - a), bd = length(d - b), da = length(a - d);
@@ -83,14 +57,14 @@ void measureFaces(FlatMesh const& mesh)
 }
 
 Row const slivers("removeSlivers", kTriangles, {"", ":memcpy", ":flat passes"}, [](Run& run) {
-    auto const source = made(Meshes::needled, run.size()).build();
-    auto const edit = [](Object& mesh) { ::Geometry::Mesh::removeSlivers(kSliverRatio, mesh); };
-    if (run.copies(bytesOf(*source), run.size()))
+    PolygonMesh const& needled = made(Meshes::needled, run.size());
+    if (run.copies(needled.points.size() * sizeof(float3) + needled.faceCount() * kTriangleBytes, run.size()))
         return;
     if (run.variant == ":flat passes")
         timeRuns(run, run.size(), [mesh = FlatMesh(Meshes::needled, run.size())] { measureFaces(mesh); });
     else
-        measureEdit(run, run.size(), bytesOf(edited(*source, edit)), *source, edit);
+        measureEdit(run, run.size(), *needled.build(),
+            [](Object& mesh) { ::Geometry::Mesh::removeSlivers(kSliverRatio, mesh); });
 });
 
 /// The shortest edges of all faces end at one of two hubs.
@@ -107,7 +81,7 @@ void measureSmoothing(Run& run, FlatMesh mesh, std::size_t elementsPerStep)
             mesh.points, CoreGL::NOPLogger());
     };
     timeRuns(run, elementsPerStep * kSmoothingSteps, smooth);
-    run.report("working bytes/corner", memoryOf(smooth).peak / static_cast<double>(mesh.faceVertex.size));
+    run.reportWorkingBytes(elementsPerStep, memoryOf(smooth).peak);
 }
 
 Row const smoothing("smooth triangles", kTriangles, kBesideCopy, [](Run& run) {
@@ -141,9 +115,9 @@ void triangulateAll(Object& object)
 template <auto make> void measureTriangulation(Run& run)
 {
     PolygonMesh const& mesh = made(make, run.size());
-    std::size_t const triangles = mesh.triangleCount(), bytes = triangles * kTriangleBytes;
-    if (!run.copies(bytes, triangles))
-        measureEdit(run, triangles, bytes, *mesh.build(), triangulateAll);
+    std::size_t const triangles = mesh.triangleCount();
+    if (!run.copies(triangles * kTriangleBytes, triangles))
+        measureEdit(run, triangles, *mesh.build(), triangulateAll);
 }
 Row const quads("triangulate quads", kQuads, kBesideCopy, measureTriangulation<Meshes::bentQuads>);
 Row const polygons("triangulate polygons", kPolygons, kBesideCopy, measureTriangulation<Meshes::concave>);
@@ -168,47 +142,42 @@ template <auto make> void measureHalfEdges(Run& run)
     FlatMesh const mesh(make, run.size());
     if (run.copies(mesh.faceVertex.size * sizeof(unsigned int), mesh.faceCount()))
         return;
-    auto const build = [&] {
+    measureRefinement(run, [&] {
         ::Geometry::Mesh::HalfEdgeDataStructure const built(
             mesh.pointCount(), mesh.faceCount(), mesh.faceVertex, mesh.faceOffset);
         DoNotOptimize(built.valence(0));
-    };
-    timeRuns(run, mesh.faceCount(), build);
-    run.reportWorkingBytes(mesh.faceCount(), memoryOf(build).peak);
+        return mesh.faceCount();
+    });
 }
 Row const halfEdges("halfEdges", kHalfEdges, kBesideCopy, measureHalfEdges<Meshes::sphere>);
 Row const shuffled("halfEdges shuffled", kHalfEdges, measureHalfEdges<Meshes::shuffled>);
 
-/// Elements are the faces of the result.
 template <class Refine> void measureRefinement(Run& run, MakeMesh make, Refine const& refine)
 {
-    auto const source = made(make, run.size()).build();
-    std::size_t const faces = getElementCount(edited(*source, refine), sFaceComp);
-    measureEdit(run, faces, 0, *source, refine);
-    run.report("result faces", static_cast<double>(faces));
+    measureRefinement(run, [&, source = made(make, run.size()).build()] {
+        Object mesh = *source;
+        refine(mesh);
+        return getElementCount(mesh, sFaceComp);
+    });
 }
 
-/// One uniform step, all on one level: twins, middles, turned edges, and the old points relaxed.
-void subdivideOnce(Points& points, Indices& corners)
+/// One uniform step, all on one level: middles, turned edges, and the old points relaxed. Of the offsets, which are
+/// multiples of 3, as many are used as there are faces.
+void subdivideOnce(Points& points, Indices& corners, Indices const& offsets)
 {
     auto const pointCount = static_cast<unsigned int>(points.size);
-    auto const faceCount = static_cast<unsigned int>(corners.size / 3);
+    FaceView const faces{corners.data, offsets, static_cast<unsigned int>(corners.size / 3)};
     PointCorners const around = cornersByPoint(pointCount, corners.data, corners.size);
-    auto const before = [&](unsigned int i) { // the point before a corner in its face
-        return corners[around.corners[i] % 3 == 0 ? around.corners[i] + 2 : around.corners[i] - 1];
-    };
-    auto newPoints = uninitializedArray<float3>(std::uint64_t{pointCount} + faceCount);
+    FaceAdjacency const adjacency = buildFaceAdjacency(faces, around);
+    auto newPoints = uninitializedArray<float3>(std::uint64_t{pointCount} + faces.count);
     auto newCorners = uninitializedArray<unsigned int>(3 * corners.size);
-    forEachIndex(faceCount, [&](unsigned int face) {
-        unsigned int const* const c = corners.data + std::size_t{3} * face;
+    forEachIndex(faces.count, [&](unsigned int face) {
+        unsigned int const* const c = faces.corners(face);
         newPoints[pointCount + face] = (points[c[0]] + points[c[1]] + points[c[2]]) * (1.0f / 3);
         for (unsigned int k = 0; k != 3; ++k) {
-            unsigned int i = around.offsets[c[k]];
-            while (before(i) != c[k == 2 ? 0 : k + 1])
-                ++i;
             unsigned int* const target = newCorners.data + 3 * (std::size_t{3} * face + k);
             target[0] = c[k];
-            target[1] = pointCount + around.corners[i] / 3;
+            target[1] = pointCount + adjacency[face][k];
             target[2] = pointCount + face;
         }
     });
@@ -216,7 +185,7 @@ void subdivideOnce(Points& points, Indices& corners)
         unsigned int const first = around.offsets[point], last = around.offsets[point + 1];
         float3 sum{0, 0, 0};
         for (unsigned int i = first; i != last; ++i)
-            sum = sum + points[before(i)];
+            sum = sum + points[faces.corners(around.corners[i] / 3)[previousCorner(around.corners[i] % 3)]];
         auto const valence = static_cast<float>(last - first);
         float const weight = (4 - 2 * std::cos(6.2831855f / valence)) / 9;
         newPoints[point] = points[point] * (1 - weight) + sum * (weight / valence);
@@ -226,25 +195,26 @@ void subdivideOnce(Points& points, Indices& corners)
 }
 
 Row const uniform("subdivide uniform", kUniform, {"", ":memcpy", ":flat kernel"}, [](Run& run) {
-    std::size_t const faces = run.size() * 81;
+    FlatMesh const mesh(Meshes::sphere, run.size());
+    std::size_t const faces = std::size_t{81} * mesh.faceCount();
     if (run.copies(faces * kTriangleBytes + faces * sizeof(float3) / 2, faces))
         return;
-    if (run.variant == ":flat kernel")
-        timeRuns(run, faces, [mesh = FlatMesh(Meshes::icosphere, run.size())] {
-            Points points = mesh.points;
-            Indices corners = mesh.faceVertex;
+    if (run.variant == ":flat kernel") {
+        Indices const offsets =
+            arrayOf(faces + 1, [](std::size_t face) { return static_cast<unsigned int>(3 * face); });
+        timeOnCopies(run, faces, mesh, [&](FlatMesh& fine) {
             for (unsigned int step = 0; step != kUniformSteps; ++step)
-                subdivideOnce(points, corners);
-            DoNotOptimize(points.data);
+                subdivideOnce(fine.points, fine.faceVertex, offsets);
+            DoNotOptimize(fine.points.data);
         });
-    else
-        measureRefinement(run, Meshes::icosphere, [](Object& mesh) {
+    } else
+        measureRefinement(run, Meshes::sphere, [](Object& object) {
             unsigned int pass = 0;
             auto const markAll = [&](auto const&, Orvan::Array<bool>& marks) {
                 if (pass++ != kUniformSteps)
                     fillElements(marks.data, marks.size, true);
             };
-            ::Geometry::Mesh::Internal::refineMesh(markAll, mesh);
+            ::Geometry::Mesh::Internal::refineMesh(markAll, object);
         });
 });
 

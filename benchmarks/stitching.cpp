@@ -5,7 +5,6 @@
 #include <Modeling/StitchTemplate.h>
 
 #include <tbb/global_control.h>
-#include <tbb/task_arena.h>
 
 #include <algorithm>
 
@@ -90,11 +89,8 @@ Row const lay("stitch lay on a million quads, threads", {{1}, {2}}, [](Run& run)
         }
     };
     tbb::global_control const allowed(tbb::global_control::max_allowed_parallelism, run.size());
-    tbb::task_arena arena(static_cast<int>(run.size()));
     tbb::blocked_range<std::size_t> const quads(0, mesh.faceCount(), Modeling::kElementGrain);
-    timeRuns(run, laid.size, [&] { // each quad writes its own stretch
-        arena.execute([&] { Modeling::parallelFor(quads, layOnRange); });
-    });
+    timeRuns(run, laid.size, [&] { Modeling::parallelFor(quads, layOnRange); }); // each quad writes its own stretch
 });
 
 }

@@ -1,4 +1,5 @@
 #include "host/GeoProperties.h"
+#include "support/AllocationHooks.h"
 #include "support/Testing.h"
 #include "support/Volumes.h"
 
@@ -291,4 +292,40 @@ TEST(EveryOperation, LeavesTheObjectAsItWasWhenMemoryRunsOut)
             expectAllOrNothing(*input, operation.run, operation.mayGrow);
             expectUnchanged(operation.read, readBefore);
         }
+}
+
+TEST(EveryOperation, NeedsNoMoreWorkingMemoryThanItsHeaderSays)
+{
+    struct Sizes {
+        double points, corners, faces; // before
+        double resultFaces, resultBytes; // bytes that are not shared with the input
+    };
+    auto const subdivision = [](Sizes const& sizes) { return 135 * sizes.resultFaces - sizes.resultBytes; };
+    std::map<std::string, std::function<double(Sizes const&)>> const bounds{
+        {"removeSlivers", [](Sizes const& sizes) { return 40 * sizes.faces; }},
+        {"smooth", [](Sizes const& sizes) { return 32 * sizes.points + 12 * sizes.corners + 24 * sizes.faces; }},
+        {"triangulate", [](Sizes const& sizes) { return 0.01 * sizes.resultBytes; }},
+        {"subdivide", subdivision},
+        {"subdivide by volume", subdivision},
+        {"subdivide by volume with five voxels", subdivision},
+        {"mergeMeshes", [](Sizes const& sizes) { return 0.01 * sizes.resultBytes; }},
+        {"edit", // of points, in two steps; the result of the first is released
+            [](Sizes const& sizes) {
+                return 9 * (sizes.points + sizes.corners + sizes.faces) + (sizes.faces == 0 ? sizes.resultBytes : 0);
+            }},
+    };
+    for (Operation const& operation : operations()) {
+        if (!operation.large)
+            continue;
+        Object object = *operation.large;
+        auto const count = [&](char const* component) {
+            return static_cast<double>(getElementCount(object, component));
+        };
+        Sizes sizes{count(sPointComp), count(sFaceVertexComp), count(sFaceComp), 0, 0};
+        Memory const memory = memoryOf([&] { operation.run(object); });
+        sizes.resultFaces = count(sFaceComp);
+        sizes.resultBytes = static_cast<double>(memory.kept);
+        EXPECT_GT(memory.kept, 0) << operation.name;
+        EXPECT_LE(static_cast<double>(memory.peak - memory.kept), bounds.at(operation.name)(sizes)) << operation.name;
+    }
 }

@@ -1,4 +1,4 @@
-#include "refinement.h"
+#include "Inputs.h"
 
 #include <CGAL/Barycentric_coordinates_2/Mean_value_coordinates_2.h>
 #include <CGAL/Exact_predicates_inexact_constructions_kernel.h>
@@ -9,6 +9,8 @@
 #include <CGAL/Surface_mesh.h>
 #include <CGAL/boost/graph/Euler_operations.h>
 #include <CGAL/subdivision_method_3.h>
+
+#include <deque>
 
 using namespace Benchmarks;
 namespace Processing = CGAL::Polygon_mesh_processing;
@@ -79,7 +81,7 @@ template <class Refine> void measureRefinement(Run& run, PolygonMesh const& mesh
     std::vector<std::array<std::size_t, 3>> faces;
     for (std::size_t corner = 0; corner != mesh.faceVertex.size(); corner += 3)
         faces.push_back({mesh.faceVertex[corner], mesh.faceVertex[corner + 1], mesh.faceVertex[corner + 2]});
-    measurePeerRefinement(run, [&] {
+    Benchmarks::measureRefinement(run, [&] {
         Surface<InFloat> surface;
         Processing::polygon_soup_to_polygon_mesh(points, faces, surface);
         return refine(surface);
@@ -94,7 +96,7 @@ Row const halfEdges("halfEdges:CGAL", withoutLargest(kHalfEdges), measureHalfEdg
 Row const shuffled("halfEdges shuffled:CGAL", withoutLargest(kHalfEdges), measureHalfEdges<Meshes::shuffled>);
 
 Row const uniform("subdivide uniform:CGAL", withoutLargest(kUniform), [](Run& run) {
-    measureRefinement(run, made(Meshes::icosphere, run.size()), [](auto& surface) {
+    measureRefinement(run, made(Meshes::sphere, run.size()), [](auto& surface) {
         CGAL::Subdivision_method_3::Sqrt3_subdivision(surface, CGAL::parameters::number_of_iterations(kUniformSteps));
         return surface.number_of_faces();
     });
@@ -105,26 +107,25 @@ template <class Kernel> void measureCoordinates(Run& run)
 {
     using Corners = std::vector<typename Kernel::Point_2>;
     using Coordinates = CGAL::Barycentric_coordinates::Mean_value_coordinates_2<Corners, Kernel>;
-    struct Polygon {
-        Corners corners, points;
-        std::unique_ptr<Coordinates> coordinates; // refers to the corners
+    auto const inPlane = [](Points const& points) {
+        Corners converted;
+        for (auto const& point : points)
+            converted.emplace_back(point.x, point.y);
+        return converted;
     };
-    std::vector<DrawnPolygon> const drawn = drawnPolygons(run.size());
-    std::vector<Polygon> polygons(drawn.size());
-    for (std::size_t i = 0; i != drawn.size(); ++i) {
-        for (auto const& corner : drawn[i].corners)
-            polygons[i].corners.emplace_back(corner.x, corner.y);
-        for (auto const& point : drawn[i].points)
-            polygons[i].points.emplace_back(point.x, point.y);
+    std::deque<Corners> corners, points; // whose elements stay in place
+    std::deque<Coordinates> coordinates;
+    for (auto const& polygon : drawnPolygons(run.size())) {
+        points.push_back(inPlane(polygon.points));
         // Without a look for points on edges, which the library has.
-        polygons[i].coordinates = std::make_unique<Coordinates>(
-            polygons[i].corners, CGAL::Barycentric_coordinates::Computation_policy_2::FAST);
+        coordinates.emplace_back(
+            corners.emplace_back(inPlane(polygon.corners)), CGAL::Barycentric_coordinates::Computation_policy_2::FAST);
     }
     std::vector<typename Kernel::FT> weights(64);
     timeRuns(run, run.size(), [&] {
-        for (Polygon& polygon : polygons)
-            for (auto const& point : polygon.points)
-                (*polygon.coordinates)(point, weights.begin());
+        for (std::size_t i = 0; i != points.size(); ++i)
+            for (auto const& point : points[i])
+                coordinates[i](point, weights.begin());
     });
 }
 Row const inFloat("stitch coordinates:CGAL in float", {{200'000}}, measureCoordinates<InFloat>);

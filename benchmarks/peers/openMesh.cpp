@@ -1,4 +1,4 @@
-#include "refinement.h"
+#include "Inputs.h"
 
 #include <OpenMesh/Core/Mesh/TriMesh_ArrayKernelT.hh>
 #include <OpenMesh/Tools/Smoother/JacobiLaplaceSmootherT.hh>
@@ -43,14 +43,14 @@ Row const smoothing("smooth triangles:OpenMesh", kTriangles, [](Run& run) {
 template <auto make> void measureHalfEdges(Run& run)
 {
     PolygonMesh const& mesh = made(make, run.size());
-    measurePeerRefinement(run, [&] { return build<Plain>(mesh).n_halfedges() / 3; });
+    measureRefinement(run, [&] { return build<Plain>(mesh).n_halfedges() / 3; });
 }
 Row const halfEdges("halfEdges:OpenMesh", withoutLargest(kHalfEdges), measureHalfEdges<Meshes::sphere>);
 Row const shuffled("halfEdges shuffled:OpenMesh", withoutLargest(kHalfEdges), measureHalfEdges<Meshes::shuffled>);
 
 Row const uniform("subdivide uniform:OpenMesh", withoutLargest(kUniform), [](Run& run) {
-    PolygonMesh const& source = made(Meshes::icosphere, run.size());
-    measurePeerRefinement(run, [&] {
+    PolygonMesh const& source = made(Meshes::sphere, run.size());
+    measureRefinement(run, [&] {
         auto mesh = build<Plain>(source);
         OpenMesh::Subdivider::Uniform::Sqrt3T<Plain, float> sqrt3;
         sqrt3.attach(mesh);
@@ -98,7 +98,7 @@ std::size_t refineAdaptively(PolygonMesh const& source, float tolerance)
 
 Row const adaptive("subdivide adaptive:OpenMesh", withoutLargest(kAdaptive), [](Run& run) {
     PolygonMesh const& source = made(Meshes::graded, run.size());
-    measurePeerRefinement(run, [&] { return refineAdaptively(source, toleranceFor(run.size())); });
+    measureRefinement(run, [&] { return refineAdaptively(source, toleranceFor(run.size())); });
 });
 
 }

@@ -1,11 +1,9 @@
 #include "Inputs.h"
 
+#include <vtkAOSDataArrayTemplate.h>
 #include <vtkAppendPolyData.h>
 #include <vtkCellArray.h>
 #include <vtkCellData.h>
-#include <vtkDoubleArray.h>
-#include <vtkFloatArray.h>
-#include <vtkIntArray.h>
 #include <vtkNew.h>
 #include <vtkPointData.h>
 #include <vtkPoints.h>
@@ -13,8 +11,6 @@
 #include <vtkThreshold.h>
 #include <vtkThresholdPoints.h>
 #include <vtkTriangleFilter.h>
-#include <vtkUnsignedCharArray.h>
-#include <vtkUnsignedIntArray.h>
 #include <vtkUnstructuredGrid.h>
 #include <vtkWindowedSincPolyDataFilter.h>
 
@@ -22,10 +18,9 @@ using namespace Benchmarks;
 
 namespace {
 
-template <class Array>
-vtkSmartPointer<Array> addArray(char const* name, int components, std::size_t count, vtkFieldData* data)
+template <class T> auto addArray(char const* name, int components, std::size_t count, vtkFieldData* data)
 {
-    auto array = vtkSmartPointer<Array>::New();
+    auto array = vtkSmartPointer<vtkAOSDataArrayTemplate<T>>::New();
     array->SetName(name);
     array->SetNumberOfComponents(components);
     array->SetNumberOfTuples(static_cast<vtkIdType>(count));
@@ -55,45 +50,41 @@ vtkSmartPointer<vtkPolyData> polyDataOf(PolygonMesh const& mesh)
 vtkSmartPointer<vtkPolyData> attributedSphere(std::size_t faces)
 {
     auto polyData = polyDataOf(made(Meshes::sphere, faces));
-    addArray<vtkFloatArray>("normal", 3, made(Meshes::sphere, faces).points.size(), polyData->GetPointData());
-    addArray<vtkIntArray>("material", 1, made(Meshes::sphere, faces).faceCount(), polyData->GetCellData());
+    addArray<float>("normal", 3, made(Meshes::sphere, faces).points.size(), polyData->GetPointData());
+    addArray<int>("material", 1, made(Meshes::sphere, faces).faceCount(), polyData->GetCellData());
     return polyData;
 }
 
 vtkSmartPointer<vtkPolyData> cloudOf(std::size_t count)
 {
-    auto polyData = vtkSmartPointer<vtkPolyData>::New();
-    vtkNew<vtkPoints> points;
-    points->SetNumberOfPoints(static_cast<vtkIdType>(count));
-    points->GetData()->Fill(0);
-    polyData->SetPoints(points);
-    return polyData;
+    return polyDataOf({std::vector<float3>(count), {}});
+}
+
+/// Runs a filter anew each time.
+template <class Filter> void timeFilter(Run& run, std::size_t elements, Filter* filter)
+{
+    auto const prepare = [=] {
+        filter->GetOutput()->Initialize();
+        filter->Modified();
+        return filter;
+    };
+    timeOnEach(run, elements, prepare, [](Filter* prepared) { prepared->Update(); });
 }
 
 /// Moves points along their normals too.
 Row const smoothing("smooth triangles:VTK", kTriangles, [](Run& run) {
     PolygonMesh const& mesh = made(Meshes::noisy, run.size());
-    auto const polyData = polyDataOf(mesh);
-    timeRuns(run, mesh.faceCount() * kSmoothingSteps, [&] {
-        vtkNew<vtkWindowedSincPolyDataFilter> filter;
-        filter->SetInputData(polyData);
-        filter->SetNumberOfIterations(kSmoothingSteps);
-        filter->Update();
-    });
+    vtkNew<vtkWindowedSincPolyDataFilter> filter;
+    filter->SetInputData(polyDataOf(mesh));
+    filter->SetNumberOfIterations(kSmoothingSteps);
+    timeFilter(run, mesh.faceCount() * kSmoothingSteps, filter.Get());
 });
 
 template <auto make> void measureTriangulation(Run& run)
 {
-    PolygonMesh const& mesh = made(make, run.size());
-    auto const polyData = polyDataOf(mesh);
-    auto const makeFilter = [&] {
-        vtkNew<vtkPolyData> copy;
-        copy->ShallowCopy(polyData);
-        auto filter = vtkSmartPointer<vtkTriangleFilter>::New();
-        filter->SetInputData(copy);
-        return filter;
-    };
-    timeOnEach(run, mesh.triangleCount(), makeFilter, [](auto const& filter) { filter->Update(); });
+    vtkNew<vtkTriangleFilter> filter;
+    filter->SetInputData(polyDataOf(made(make, run.size())));
+    timeFilter(run, made(make, run.size()).triangleCount(), filter.Get());
 }
 Row const quads("triangulate quads:VTK", kQuads, measureTriangulation<Meshes::bentQuads>);
 Row const polygons("triangulate polygons:VTK", kPolygons, measureTriangulation<Meshes::concave>);
@@ -101,15 +92,10 @@ Row const polygons("triangulate polygons:VTK", kPolygons, measureTriangulation<M
 /// Appends as many inputs as the first argument says, each with that many elements.
 template <class MakeInput> void measureAppending(Run& run, std::size_t elements, MakeInput const& makeInput)
 {
-    std::vector<vtkSmartPointer<vtkPolyData>> inputs;
-    while (inputs.size() != run.size())
-        inputs.push_back(makeInput());
-    timeRuns(run, run.size() * elements, [&] {
-        vtkNew<vtkAppendPolyData> append;
-        for (auto const& input : inputs)
-            append->AddInputData(input);
-        append->Update();
-    });
+    vtkNew<vtkAppendPolyData> append;
+    for (std::size_t i = 0; i != run.size(); ++i)
+        append->AddInputData(makeInput());
+    timeFilter(run, run.size() * elements, append.Get());
 }
 
 Row const appendingMeshes("mergeMeshes:VTK", kMeshes, [](Run& run) {
@@ -120,46 +106,35 @@ Row const appendingClouds("mergePointClouds:VTK", kClouds, [](Run& run) {
     std::size_t const count = run.size(1);
     measureAppending(run, count, [&] {
         auto const cloud = cloudOf(count);
-        addArray<vtkIntArray>("color", 1, count, cloud->GetPointData());
-        addArray<vtkDoubleArray>("weight", 1, count, cloud->GetPointData());
-        addArray<vtkUnsignedIntArray>("id", 1, count, cloud->GetPointData());
-        addArray<vtkFloatArray>("radius", 1, count, cloud->GetPointData());
+        addArray<int>("color", 1, count, cloud->GetPointData());
+        addArray<double>("weight", 1, count, cloud->GetPointData());
+        addArray<unsigned int>("id", 1, count, cloud->GetPointData());
+        addArray<float>("radius", 1, count, cloud->GetPointData());
         return cloud;
     });
 });
 
-/// Runs the filter anew each time, which keeps what has a flag below 0.5.
-template <class Filter> void measureDeletion(Run& run, std::size_t elements, Filter* filter)
-{
-    auto const prepare = [=] {
-        filter->GetOutput()->Initialize();
-        filter->Modified();
-        return filter;
-    };
-    timeOnEach(run, elements, prepare, [](Filter* prepared) { prepared->Update(); });
-}
-
 Row const deletingPoints("deletePointsInPointCloud:VTK", kPoints, [](Run& run) {
     auto const cloud = cloudOf(run.size());
     auto* const data = cloud->GetPointData();
-    addArray<vtkFloatArray>("normal", 3, run.size(), data);
-    addArray<vtkUnsignedCharArray>("color", 4, run.size(), data);
-    addArray<vtkFloatArray>("intensity", 1, run.size(), data);
-    auto const flags = addArray<vtkUnsignedCharArray>("deleted", 1, run.size(), data);
+    addArray<float>("normal", 3, run.size(), data);
+    addArray<unsigned char>("color", 4, run.size(), data);
+    addArray<float>("intensity", 1, run.size(), data);
+    auto const flags = addArray<unsigned char>("deleted", 1, run.size(), data);
     for (unsigned int const point : everySecondAtRandom(run.size()))
         flags->SetValue(static_cast<vtkIdType>(point), 1);
     data->SetActiveScalars("deleted");
     vtkNew<vtkThresholdPoints> filter;
     filter->SetInputData(cloud);
     filter->ThresholdByLower(0.5);
-    measureDeletion(run, run.size(), filter.Get());
+    timeFilter(run, run.size(), filter.Get());
     run.report("remaining", static_cast<double>(filter->GetOutput()->GetNumberOfPoints()));
 });
 
 Row const deletingFaces("deleteFaces:VTK", kFaces, [](Run& run) {
     PatchedSphere const sphere(run.size());
     auto const mesh = attributedSphere(run.size());
-    auto const flags = addArray<vtkUnsignedCharArray>("deleted", 1, sphere.faceCount(), mesh->GetCellData());
+    auto const flags = addArray<unsigned char>("deleted", 1, sphere.faceCount(), mesh->GetCellData());
     for (std::size_t face = 0; face != sphere.deleted.size; ++face)
         flags->SetValue(static_cast<vtkIdType>(face), sphere.deleted[face] ? 1 : 0);
     mesh->GetCellData()->SetActiveScalars("deleted");
@@ -168,7 +143,7 @@ Row const deletingFaces("deleteFaces:VTK", kFaces, [](Run& run) {
     filter->SetInputArrayToProcess(0, 0, 0, vtkDataObject::FIELD_ASSOCIATION_CELLS, "deleted");
     filter->SetThresholdFunction(vtkThreshold::THRESHOLD_LOWER);
     filter->SetLowerThreshold(0.5);
-    measureDeletion(run, sphere.faceCount(), filter.Get());
+    timeFilter(run, sphere.faceCount(), filter.Get());
     run.report("remaining", static_cast<double>(filter->GetOutput()->GetNumberOfCells()));
 });
 

@@ -4,7 +4,53 @@
 #include <cstdlib>
 #include <new>
 
+#include <malloc.h>
+
 namespace TestSupport {
+
+namespace {
+
+    std::atomic<bool> isCounting = false;
+    std::atomic<std::int64_t> allocated = 0, mostAllocated = 0;
+
+    void count(void* block)
+    {
+        auto const usable = static_cast<std::int64_t>(::malloc_usable_size(block));
+        std::int64_t const now = allocated.fetch_add(usable) + usable;
+        std::int64_t most = mostAllocated.load();
+        while (now > most && !mostAllocated.compare_exchange_weak(most, now)) { }
+    }
+
+    void* allocateBlock(std::size_t bytes, std::size_t alignment)
+    {
+        auto const isAllowed = mayAllocate.load(std::memory_order_relaxed);
+        void* const block = isAllowed && !isAllowed() ? nullptr : systemBlock(bytes, alignment);
+        if (!block)
+            throw std::bad_alloc();
+        if (auto const visit = onAllocated.load(std::memory_order_relaxed))
+            visit(block, bytes);
+        if (isCounting.load(std::memory_order_relaxed))
+            count(block);
+        return block;
+    }
+
+    void freeBlock(void* block) noexcept
+    {
+        if (block && isCounting.load(std::memory_order_relaxed))
+            allocated.fetch_sub(static_cast<std::int64_t>(::malloc_usable_size(block)));
+        std::free(block);
+    }
+
+}
+
+Memory memoryOf(std::function<void()> const& work)
+{
+    allocated = mostAllocated = 0;
+    isCounting = true;
+    work();
+    isCounting = false;
+    return {mostAllocated, allocated};
+}
 
 void* systemBlock(std::size_t bytes, std::size_t alignment) noexcept
 {

@@ -24,35 +24,25 @@ namespace {
 
     std::atomic<std::int64_t> allocationsLeft = kNever; // until the one that fails
     std::atomic<bool> failsOnce = false;
-    std::atomic<std::int64_t> liveBlocks = 0;
 
-    bool mustFail()
+    bool maySucceed()
     {
         if (ExhaustedMemory::isAlive.load(std::memory_order_relaxed))
-            return true;
-        if (allocationsLeft.load(std::memory_order_relaxed) == kNever)
             return false;
+        if (allocationsLeft.load(std::memory_order_relaxed) == kNever)
+            return true;
         std::int64_t const left = allocationsLeft.fetch_sub(1);
-        return failsOnce ? left == 0 : left <= 0;
+        return failsOnce ? left != 0 : left > 0;
     }
 
-}
+    /// Exposes reads of uninitialized memory.
+    void scribble(void* block, std::size_t bytes)
+    {
+        std::memset(block, 0xA5, std::min<std::size_t>(bytes, 4096));
+    }
 
-void* allocateBlock(std::size_t bytes, std::size_t alignment)
-{
-    void* const block = mustFail() ? nullptr : systemBlock(bytes, alignment);
-    if (!block)
-        throw std::bad_alloc();
-    std::memset(block, 0xA5, std::min<std::size_t>(bytes, 4096)); // exposes reads of uninitialized memory
-    liveBlocks.fetch_add(1, std::memory_order_relaxed);
-    return block;
-}
+    [[maybe_unused]] bool const areHooksSet = (mayAllocate = &maySucceed, onAllocated = &scribble, true);
 
-void freeBlock(void* block) noexcept
-{
-    if (block)
-        liveBlocks.fetch_sub(1, std::memory_order_relaxed);
-    std::free(block);
 }
 
 void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
@@ -67,9 +57,8 @@ void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
         for (std::int64_t number = 1; (number == 1 || hasFailed) && !testing::Test::HasFatalFailure(); ++number) {
             SCOPED_TRACE("allocation " + std::to_string(number) + (once ? " fails" : " and all later ones fail"));
             ASSERT_LT(number, 100'000) << "the action never succeeds";
-            std::int64_t const before = liveBlocks;
             hasFailed = false;
-            trial([&](std::function<void()> const& action) {
+            Attempt const attempt = [&](std::function<void()> const& action) {
                 bool isCompleted = true;
                 failsOnce = once;
                 allocationsLeft = number - 1;
@@ -82,8 +71,8 @@ void sweepFailingAllocations(std::function<void(Attempt const&)> const& trial)
                 hasFailed = hasFailed || isFailing;
                 EXPECT_TRUE(isCompleted || isFailing) << "std::bad_alloc without a failed allocation";
                 return isCompleted;
-            });
-            EXPECT_EQ(liveBlocks, before) << "blocks leaked";
+            };
+            EXPECT_EQ(memoryOf([&] { trial(attempt); }).kept, 0) << "bytes leaked";
         }
 }
 
