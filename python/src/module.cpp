@@ -1,7 +1,12 @@
-#include "Handles.h"
+#include "Bindings.h"
 
 PYBIND11_MODULE(_modeling, module)
 {
+    using namespace ModelingPython;
     module.doc() = "The part of the package `modeling` that is written in C++.";
     module.attr("__version__") = MODELING_VERSION;
+    bindHandles(module);
+    bindViews(module);
+    bindProperties(module);
+    bindPickling(module);
 }

@@ -19,10 +19,28 @@ namespace Internal {
         virtual Ptr<T> clone(T const& value) const = 0; ///< A copy of the value, with one reference.
         virtual void dispose() noexcept = 0; ///< Destroys the value and this block.
 
-        std::atomic<std::uint64_t> count{1};
+        /// References that are not a `Ptr` and are never released. With one of them a value always counts as shared.
+        std::uint64_t const permanent;
+        std::atomic<std::uint64_t> count;
 
     protected:
+        explicit ControlBlock(std::uint64_t permanentReferences = 0)
+            : permanent(permanentReferences)
+            , count(permanentReferences + 1)
+        {
+        }
         ~ControlBlock() = default;
+    };
+
+    /// Makes the first reference to a value whose control block another header defines.
+    struct FirstReference {
+        template <class T> static Ptr<T> make(T* value, ControlBlock<T>* control) noexcept
+        {
+            Ptr<T> reference;
+            reference.value_ = value;
+            reference.control_ = control;
+            return reference;
+        }
     };
 
     /// Contains the value, so that a shared value needs only one allocation.
@@ -47,7 +65,7 @@ namespace Internal {
 
     template <class T> void release(ControlBlock<T>* control) noexcept
     {
-        if (control && control->count.fetch_sub(1, std::memory_order_acq_rel) == 1)
+        if (control && control->count.fetch_sub(1, std::memory_order_acq_rel) == control->permanent + 1)
             control->dispose();
     }
 
@@ -94,6 +112,7 @@ public:
 
 private:
     friend class MutablePtr<T>;
+    friend struct Internal::FirstReference;
     template <class U> friend MutablePtr<U> makeMutable(Ptr<U>&& shared);
 
     T* value_ = nullptr;
