@@ -1,5 +1,65 @@
 """Geometry algorithms for meshes, point clouds and strand sets with all their properties."""
 
-from ._modeling import __version__
+from ._modeling import HalfEdges, Mesh, PointCloud, StrandSet, __version__, thread_count, threads
+from .errors import FileError, GeometryWarning, InvalidGeometry, Refusal
+from .files import read, write
+from .guides import Guide, StitchTemplate, make_volume
+from .operations import (
+    Topology,
+    add_points_to_point_cloud,
+    compute_deleted_component_mapping,
+    copy_non_geo_properties,
+    delete_components,
+    delete_faces,
+    delete_points_in_point_cloud,
+    large_faces,
+    merge,
+    merge_meshes,
+    merge_point_clouds,
+    merge_strands,
+    remove_slivers,
+    smooth,
+    subdivide,
+    subdivide_by_volume,
+    topology,
+    triangulate,
+    validate,
+)
 
-__all__ = ["__version__"]
+__all__ = [
+    "FileError",
+    "GeometryWarning",
+    "Guide",
+    "HalfEdges",
+    "InvalidGeometry",
+    "Mesh",
+    "PointCloud",
+    "Refusal",
+    "StitchTemplate",
+    "StrandSet",
+    "Topology",
+    "__version__",
+    "add_points_to_point_cloud",
+    "compute_deleted_component_mapping",
+    "copy_non_geo_properties",
+    "delete_components",
+    "delete_faces",
+    "delete_points_in_point_cloud",
+    "large_faces",
+    "make_volume",
+    "merge",
+    "merge_meshes",
+    "merge_point_clouds",
+    "merge_strands",
+    "read",
+    "remove_slivers",
+    "smooth",
+    "subdivide",
+    "subdivide_by_volume",
+    "thread_count",
+    "threads",
+    "topology",
+    "triangulate",
+    "validate",
+    "write",
+]
