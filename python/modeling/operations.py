@@ -27,8 +27,18 @@ AnyGeometry = TypeVar("AnyGeometry", Mesh, PointCloud, StrandSet)
 _COMPONENTS = {"points": "sPointComp", "faces": "sFaceComp", "corners": "sFaceVertexComp", "strands": "sStrandComp"}
 
 
+def _numbers(values: ArrayLike, name: str) -> NDArray[np.float32]:
+    array = np.asarray(values)
+    if array.dtype == np.float32:
+        return array
+    if array.dtype.kind not in "fiu" and array.size != 0:
+        raise TypeError(f"{name} has to hold real numbers, not {array.dtype}")
+    with np.errstate(over="ignore"):  # becomes infinite, which operations check
+        return array.astype(np.float32)
+
+
 def _points(values: ArrayLike, name: str) -> NDArray[np.float32]:
-    points = np.ascontiguousarray(_numbers(values, name))
+    points = _numbers(values, name)
     if points.size == 0:
         return np.empty((0, 3), np.float32)
     if points.ndim != 2 or points.shape[1] != 3:
@@ -36,33 +46,18 @@ def _points(values: ArrayLike, name: str) -> NDArray[np.float32]:
     return points
 
 
-def _numbers(values: ArrayLike, name: str) -> NDArray[np.float32]:
-    array = np.asarray(values)
-    if array.dtype.kind not in "fiu" and array.size != 0:
-        raise TypeError(f"{name} has to hold real numbers, not {array.dtype}")
-    with np.errstate(over="ignore"):  # becomes infinite, which operations check
-        return array.astype(np.float32, copy=False)
-
-
-def _mask(selected: ArrayLike, count: int, name: str) -> NDArray[np.bool_]:
-    """A mask of elements, from a mask or from indices."""
-    array = np.asarray(selected)
+def _selected(elements: ArrayLike, name: str) -> NDArray[np.bool_] | NDArray[np.int64]:
+    """A mask of elements, or their indices."""
+    array = np.asarray(elements)
     if array.ndim != 1:
         raise ValueError(f"{name} has to have one dimension, not {array.ndim}")
-    if array.dtype == np.bool_:
-        if len(array) != count:
-            raise IndexError(f"{name} is a mask with {len(array)} entries, but there are {count} elements")
-        return np.ascontiguousarray(array)
-    if array.size != 0 and array.dtype.kind not in "iu":
+    if array.dtype == np.bool_ or array.dtype == np.int64:
+        return array
+    if array.size == 0:
+        return np.empty(0, np.int64)
+    if array.dtype.kind not in "iu":
         raise TypeError(f"{name} has to hold indices or be a mask, but its type is {array.dtype}")
-    mask = np.zeros(count, np.bool_)
-    if array.size != 0:
-        least, most = int(array.min()), int(array.max())
-        if least < 0 or most >= count:
-            wrong = least if least < 0 else most
-            raise IndexError(f"{name}: index {wrong} is out of range: there are {count} elements, counted from 0")
-        mask[array] = True
-    return mask
+    return array.astype(np.int64)  # indices beyond it become negative
 
 
 def _text(value: str, name: str) -> str:
@@ -104,8 +99,7 @@ def delete_points_in_point_cloud(cloud: PointCloud, points: ArrayLike) -> PointC
     points
         Indices (integers in any order, from 0), or a mask with one boolean per point.
     """
-    mask = _mask(points, _modeling.count_elements(cloud, "sPointComp"), "points")
-    return _modeling.delete_points_in_point_cloud(cloud, np.flatnonzero(mask).astype(np.uint32))
+    return _modeling.delete_points_in_point_cloud(cloud, _selected(points, "points"))
 
 
 def delete_faces(mesh: Mesh, faces: ArrayLike) -> Mesh:
@@ -120,7 +114,7 @@ def delete_faces(mesh: Mesh, faces: ArrayLike) -> Mesh:
     >>> topology(delete_faces(cylinder, [0])).open_edges
     3
     """
-    return _modeling.delete_faces(mesh, _mask(faces, _modeling.count_elements(mesh, "sFaceComp"), "faces"))
+    return _modeling.delete_faces(mesh, _selected(faces, "faces"))
 
 
 def delete_components(object: AnyGeometry, component: str, elements: ArrayLike) -> AnyGeometry:
@@ -135,7 +129,7 @@ def delete_components(object: AnyGeometry, component: str, elements: ArrayLike) 
     also renumbers.
     """
     name = _COMPONENTS.get(_text(component, "component"), component)
-    return _modeling.delete_components(object, name, _mask(elements, _modeling.count_elements(object, name), "elements"))
+    return _modeling.delete_components(object, name, _selected(elements, "elements"))
 
 
 def compute_deleted_component_mapping(deleted: ArrayLike) -> NDArray[np.uint32]:
@@ -150,7 +144,7 @@ def compute_deleted_component_mapping(deleted: ArrayLike) -> NDArray[np.uint32]:
     array = np.asarray(deleted)
     if array.dtype != np.bool_ or array.ndim != 1:
         raise TypeError("deleted has to be a mask: booleans in one dimension")
-    return _modeling.compute_deleted_component_mapping(np.ascontiguousarray(array))
+    return _modeling.compute_deleted_component_mapping(array)
 
 
 def copy_non_geo_properties(object: AnyGeometry, inputs: Iterable[Geometry]) -> AnyGeometry:
@@ -295,7 +289,7 @@ def smooth(
     >>> smooth(read(samples / "bunny.obj"), 2, pin_boundary=True)    # doctest: +ELLIPSIS
     <...Mesh...>
     """
-    factors = None if weights is None else np.ascontiguousarray(_numbers(weights, "weights"))
+    factors = None if weights is None else _numbers(weights, "weights")
     if factors is not None and factors.ndim != 1:
         raise ValueError(f"weights has to have one dimension, not {factors.ndim}")
     if pin_sharp is not None and not 0 <= pin_sharp <= 180:

@@ -63,4 +63,10 @@ py::object makeValidHandle(Orvan::Ptr<Tessara::Object> object, Facts facts)
     return handle;
 }
 
+bool isBare(Tessara::Object const& mesh)
+{
+    constexpr std::uint64_t kStandardKeys = 6; // of a valid mesh, which has all of them
+    return mesh.keys()->size == kStandardKeys;
+}
+
 }

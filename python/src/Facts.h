@@ -31,6 +31,17 @@ void requireClosedTriangles(char const* operation, bool acceptsIsolatedPoints, M
 
 /// A new handle for the result of an operation.
 py::object makeValidHandle(Orvan::Ptr<Tessara::Object> object, Facts facts = {});
+/// The same for a result of known kind: finding the kind takes as long as an operation on a few faces.
+template <class Kind> py::object makeValid(Orvan::Ptr<Tessara::Object> object, Facts facts = {})
+{
+    facts.isValid = true;
+    Kind handle(std::move(object));
+    handle.setFacts(std::make_shared<Facts>(facts));
+    return py::cast(std::move(handle));
+}
+
+/// Whether a mesh has nothing but its three components and three standard properties.
+bool isBare(Tessara::Object const& mesh);
 
 /// A copy of the object, which shares its arrays: what an operation edits.
 inline Orvan::MutablePtr<Tessara::Object> copyOf(Orvan::Ptr<Tessara::Object> const& object)

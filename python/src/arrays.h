@@ -5,6 +5,8 @@
 
 #include <pybind11/numpy.h>
 
+#include <fmt/format.h>
+
 #include <cstring>
 #include <stdexcept>
 #include <string>
@@ -45,6 +47,35 @@ inline py::array_t<float> numbersOf(Orvan::Array<Tessara::Math::float3> const& v
 {
     return py::array_t<float>(
         {static_cast<py::ssize_t>(values.size), py::ssize_t{3}}, reinterpret_cast<float const*>(values.data));
+}
+
+/// Calls `visit(index)` for each index of an array of integers from 0 up to but excluding `count`.
+/// \throws IndexError  before which some indices may have been visited
+template <class Visit> void forEachIndex(Values<long long> const& indices, unsigned int count, Visit const& visit)
+{
+    long long const* const index = indices.data();
+    for (py::ssize_t i = 0; i != indices.size(); ++i) {
+        if (index[i] < 0 || index[i] >= count)
+            throw py::index_error(
+                fmt::format("index {} is out of range: there are {} elements, counted from 0", index[i], count));
+        visit(static_cast<unsigned int>(index[i]));
+    }
+}
+
+/// A mask of elements, from a mask or from indices.
+inline Orvan::Array<bool> maskOf(py::array const& selected, unsigned int count)
+{
+    if (selected.ndim() != 1)
+        throw py::value_error("elements need a mask or indices in one dimension");
+    if (py::isinstance<Values<bool>>(selected)) {
+        if (selected.size() != py::ssize_t{count})
+            throw py::index_error(
+                fmt::format("the mask has {} entries, but there are {} elements", selected.size(), count));
+        return arrayOf<bool>(py::cast<Values<bool>>(selected));
+    }
+    Orvan::Array<bool> mask(count);
+    forEachIndex(py::cast<Values<long long>>(selected), count, [&](unsigned int i) { mask[i] = true; });
+    return mask;
 }
 
 }

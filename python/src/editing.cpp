@@ -57,15 +57,32 @@ namespace {
             refuse(fmt::format("a tag named {} would replace the points", tag));
         if (!tag.empty() && object->hasProperty(tag.c_str()))
             warn(fmt::format("the tag replaces the attribute {}", tag));
-        return makeValidHandle(edited("add_points_to_point_cloud", object,
+        return makeValid<PointCloud>(edited("add_points_to_point_cloud", object,
             [&](Object& copy) { return addPointsToPointCloud(points, tag.c_str(), copy, nullptr); }));
     }
 
-    py::object deletePoints(PointCloud& cloud, Values<unsigned int> const& indices)
+    /// The indices of the elements that a mask or indices select.
+    Orvan::Array<unsigned int> indicesOf(py::array const& selected, unsigned int count)
+    {
+        Orvan::Array<unsigned int> indices;
+        if (selected.ndim() == 1 && !py::isinstance<Values<bool>>(selected)) {
+            indices.reserve(static_cast<std::uint64_t>(selected.size()));
+            forEachIndex(
+                py::cast<Values<long long>>(selected), count, [&](unsigned int element) { indices.append(element); });
+            return indices;
+        }
+        auto const mask = maskOf(selected, count);
+        for (unsigned int element = 0; element != count; ++element)
+            if (mask[element])
+                indices.append(element);
+        return indices;
+    }
+
+    py::object deletePoints(PointCloud& cloud, py::array const& points)
     {
         Orvan::Ptr<Object> const object = validObjectOf(cloud);
-        auto const deleted = arrayOf<unsigned int>(indices);
-        return makeValidHandle(edited("delete_points_in_point_cloud", object, [&](Object& copy) {
+        auto const deleted = indicesOf(points, getElementCount(*object, sPointComp));
+        return makeValid<PointCloud>(edited("delete_points_in_point_cloud", object, [&](Object& copy) {
             return getElementCount(copy, sPointComp) == 0 || deletePointsInPointCloud(deleted, copy, nullptr);
         }));
     }
@@ -81,21 +98,21 @@ namespace {
                     "delete_faces needs faces with corners, but face {} of the mesh has none (counted from 0)", face));
     }
 
-    py::object deleteFacesOf(Mesh& mesh, Values<bool> const& mask)
+    py::object deleteFacesOf(Mesh& mesh, py::array const& faces)
     {
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
-        auto const deleted = arrayOf<bool>(mask);
+        auto const deleted = maskOf(faces, getElementCount(*object, sFaceComp));
         auto result = edited("delete_faces", object, [&](Object& copy) {
             requireFacesWithCorners(copy);
             return deleted.empty() || deleteFaces(deleted, copy);
         });
-        return makeValidHandle(std::move(result), {.hasNoIsolatedPoints = !deleted.empty()});
+        return makeValid<Mesh>(std::move(result), {.hasNoIsolatedPoints = !deleted.empty()});
     }
 
-    py::object deleteElements(Handle& handle, std::string const& component, Values<bool> const& mask)
+    py::object deleteElements(Handle& handle, std::string const& component, py::array const& elements)
     {
         Orvan::Ptr<Object> const object = validObjectOf(handle);
-        auto const deleted = arrayOf<bool>(mask);
+        auto const deleted = maskOf(elements, getElementCount(*object, component.c_str()));
         Orvan::Ptr<Object> const result = edited("delete_components", object, [&](Object& copy) {
             return deleted.empty()
                 || deleteComponents(computeDeletedComponentMapping(deleted), component.c_str(), copy);
@@ -127,11 +144,6 @@ namespace {
         return copy;
     }
 
-    unsigned int countElements(Handle const& handle, std::string const& component)
-    {
-        return getElementCount(*handle.object(), component.c_str());
-    }
-
 }
 
 void bindEditing(py::module_& module)
@@ -142,7 +154,6 @@ void bindEditing(py::module_& module)
     module.def("delete_components", &deleteElements);
     module.def("compute_deleted_component_mapping", &computeMapping);
     module.def("copy_non_geo_properties", &copyProperties);
-    module.def("count_elements", &countElements);
 }
 
 }

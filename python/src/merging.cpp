@@ -70,17 +70,17 @@ namespace {
         return objects;
     }
 
-    py::object mergeWith(MergeObjects merge, Objects const& objects)
+    template <class Kind> py::object mergeWith(MergeObjects merge, Objects const& objects)
     {
         Orvan::MutablePtr<Object> result = Tessara::createObject();
         if (!withoutLock([&] { return merge(objects, *result, nullptr); }))
             refuse("there would be more than 4,294,967,295 elements of one kind");
-        return makeValidHandle(std::move(result));
+        return makeValid<Kind>(std::move(result));
     }
 
     template <class Kind, MergeObjects merge> py::object mergeAlike(std::vector<Kind*> const& handles)
     {
-        return mergeWith(merge, objectsOf({handles.begin(), handles.end()}));
+        return mergeWith<Kind>(merge, objectsOf({handles.begin(), handles.end()}));
     }
 
     py::object mergeAny(std::vector<Handle*> const& handles)
@@ -89,11 +89,11 @@ namespace {
         Objects objects = objectsOf(handles);
         switch (giveOneKind(objects)) {
         case GeometryType::Mesh:
-            return mergeWith(mergeMeshes, objects);
+            return mergeWith<Mesh>(mergeMeshes, objects);
         case GeometryType::PointCloud:
-            return mergeWith(mergePointClouds, objects);
+            return mergeWith<PointCloud>(mergePointClouds, objects);
         default:
-            return mergeWith(mergeStrands, objects);
+            return mergeWith<StrandSet>(mergeStrands, objects);
         }
     }
 

@@ -57,7 +57,8 @@ namespace {
     py::object triangulate(Mesh& mesh, std::string const& channels, bool keepsUnits)
     {
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
-        requireChannels(channels);
+        if (channels != "*")
+            requireChannels(channels);
         std::vector<std::string> outdated;
         Orvan::Ptr<Object> result = withoutLock([&] {
             Orvan::MutablePtr<Object> triangles = copyOf(object);
@@ -65,12 +66,13 @@ namespace {
                 Geometry::Mesh::triangulate(channels.c_str(), *triangles);
             else
                 *triangles = triangulatedAs(inFineUnits(*object), channels, *object);
-            outdated = dropOutdatedProperties(*triangles);
+            if (!isBare(*triangles))
+                outdated = dropOutdatedProperties(*triangles);
             return triangles;
         });
         for (std::string const& name : outdated)
             warn(fmt::format("\"{}\" is dropped: values of its type cannot be copied to triangles", name));
-        return makeValidHandle(std::move(result));
+        return makeValid<Mesh>(std::move(result));
     }
 
     // -- Refinement
@@ -129,7 +131,7 @@ namespace {
             largeFaces = guide->refine(tolerance, *mesh);
         else if (!Geometry::Mesh::subdivide(tolerance, *mesh))
             return {};
-        else
+        else if (getElementCount(*mesh, sPointComp) != getElementCount(*object, sPointComp)) // otherwise all are small
             largeFaces = countFacesAbove(tolerance, *mesh);
         return {std::move(mesh), largeFaces};
     }
@@ -156,11 +158,12 @@ namespace {
             requireClosedTriangles(operation, false, mesh);
             refuse(fmt::format("{} failed: the mesh does not meet the requirements of the operation", operation));
         }
-        for (DroppedByRefinement const& dropped : droppedByRefinement(*object, *refined.object))
-            warn(dropped.sentence());
+        if (!isBare(*object))
+            for (DroppedByRefinement const& dropped : droppedByRefinement(*object, *refined.object))
+                warn(dropped.sentence());
         if (refined.largeFaces != 0)
             warn(warningOfLargeFaces(refined.largeFaces));
-        return makeValidHandle(std::move(refined.object));
+        return makeValid<Mesh>(std::move(refined.object));
     }
 
     void requireTriangles(MeshArrays const& mesh)
@@ -293,14 +296,15 @@ namespace {
             Orvan::MutablePtr<Object> copy = copyOf(object);
             dropped.clear();
             if (!(positions == *arrays.positions)) {
-                dropped = dropNormals(*copy);
+                if (!isBare(*copy))
+                    dropped = dropNormals(*copy);
                 addDataProperty(sPointPosition, sPointComp, std::move(positions), *copy);
             }
             return Orvan::Ptr<Object>(std::move(copy));
         });
         for (std::string const& name : dropped)
             warn(fmt::format("dropped {}: normals no longer fit the surface", name));
-        return makeValidHandle(std::move(result), factsOf(mesh));
+        return makeValid<Mesh>(std::move(result), factsOf(mesh));
     }
 
     // -- Slivers
@@ -314,7 +318,8 @@ namespace {
         Orvan::Ptr<Object> result = withoutLock([&] {
             // The operation keeps only the standard properties up to date.
             Orvan::MutablePtr<Object> copy = copyOf(object);
-            dropped = dropOtherProperties(*copy);
+            if (!isBare(*copy))
+                dropped = dropOtherProperties(*copy);
             Geometry::Mesh::removeSlivers(ratio, *copy);
             if (getElementCount(*copy, sPointComp) != getElementCount(*object, sPointComp))
                 return Orvan::Ptr<Object>(std::move(copy));
@@ -324,7 +329,7 @@ namespace {
         if (!dropped.empty())
             warn(fmt::format("dropped {}: collapses renumber points and faces", fmt::join(dropped, ", ")));
         bool const isSame = result == object;
-        return makeValidHandle(std::move(result), isSame ? factsOf(mesh) : Facts{});
+        return makeValid<Mesh>(std::move(result), isSame ? factsOf(mesh) : Facts{});
     }
 
 }
