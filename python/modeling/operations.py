@@ -68,10 +68,9 @@ def _text(value: str, name: str) -> str:
     return value
 
 
-def _positive(value: float, name: str) -> float:
+def _positive(value: Any, name: str) -> None:
     if not value > 0:
         raise ValueError(f"{name} has to be above 0, not {value}")
-    return value
 
 
 # -- Points, faces and other elements
@@ -231,7 +230,9 @@ def subdivide(mesh: Mesh, tolerance: float | None = None, *, relative: float | N
     >>> topology(subdivide(cylinder, relative=0.1)).closed_manifold
     True
     """
-    return _subdivide(mesh, tolerance, relative, None, check)
+    if relative is not None or tolerance is None or not tolerance > 0:
+        _require_size(tolerance, relative)
+    return _modeling.subdivide(mesh, tolerance, relative, None, check)
 
 
 def subdivide_by_volume(
@@ -246,17 +247,14 @@ def subdivide_by_volume(
     """
     if not isinstance(guide, Guide):
         raise TypeError(f"guide has to be a Guide, not {type(guide).__name__}")
-    return _subdivide(mesh, tolerance, relative, guide._guide, check)
+    _require_size(tolerance, relative)
+    return _modeling.subdivide(mesh, tolerance, relative, guide._guide, check)
 
 
-def _subdivide(mesh: Mesh, tolerance: float | None, relative: float | None, guide: Any, check: bool) -> Mesh:
-    if tolerance is not None and relative is None:
-        _positive(tolerance, "tolerance")
-    elif relative is not None and tolerance is None:
-        _positive(relative, "relative")
-    else:
+def _require_size(tolerance: float | None, relative: float | None) -> None:
+    if (tolerance is None) == (relative is None):
         raise TypeError("either tolerance or relative is required")
-    return _modeling.subdivide(mesh, tolerance, relative, guide, check)
+    _positive(relative if tolerance is None else tolerance, "tolerance" if relative is None else "relative")
 
 
 def large_faces(mesh: Mesh, tolerance: float) -> NDArray[np.bool_]:

@@ -31,7 +31,7 @@ namespace {
         Orvan::setJobCancelled(true);
         if (pythonAction.sa_flags & SA_SIGINFO)
             pythonAction.sa_sigaction(signal, information, context);
-        else
+        else if (pythonAction.sa_handler != SIG_IGN && pythonAction.sa_handler != SIG_DFL)
             pythonAction.sa_handler(signal);
     }
 
@@ -61,20 +61,25 @@ namespace {
             action.sa_sigaction = cancelJob;
             action.sa_flags = SA_SIGINFO | SA_RESTART | SA_ONSTACK;
             sigemptyset(&action.sa_mask);
-            if (::sigaction(SIGINT, nullptr, &pythonAction) != 0 || pythonAction.sa_handler == SIG_IGN
-                || pythonAction.sa_handler == SIG_DFL)
-                return; // Python does not handle it
-            isHooked_ = ::sigaction(SIGINT, &action, nullptr) == 0;
+            isHooked_ = ::sigaction(SIGINT, &action, &pythonAction) == 0;
+            if (isHooked_ && (pythonAction.sa_handler == SIG_IGN || pythonAction.sa_handler == SIG_DFL))
+                unhook(); // Python does not handle it
         }
         CancelOnInterrupt(CancelOnInterrupt const&) = delete;
         CancelOnInterrupt& operator=(CancelOnInterrupt const&) = delete;
         ~CancelOnInterrupt()
         {
             if (isHooked_)
-                ::sigaction(SIGINT, &pythonAction, nullptr);
+                unhook();
         }
 
     private:
+        void unhook()
+        {
+            ::sigaction(SIGINT, &pythonAction, nullptr);
+            isHooked_ = false;
+        }
+
         bool isHooked_ = false;
     };
 
