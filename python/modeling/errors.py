@@ -6,8 +6,7 @@ from __future__ import annotations
 class FileError(OSError):
     """A file cannot be read or written: the text names the file, and the line or element if there is one.
 
-    If the file does not exist, exists, is a folder, or must not be accessed, the exception is also the built-in one for that, such as
-    `FileNotFoundError`.
+    If there is no such file, it is a `FileNotFoundError` too, and a `FileExistsError` if the file is not to be replaced.
     """
 
 
@@ -39,5 +38,5 @@ class GeometryWarning(UserWarning):
     """Something was left out, converted or guessed, or a property was dropped."""
 
 
-for _class in (FileError, MissingFileError, PresentFileError, Refusal, InvalidGeometry, GeometryWarning):
+for _class in (FileError, Refusal, InvalidGeometry, GeometryWarning):
     _class.__module__ = "modeling"  # where users find it, which tracebacks show

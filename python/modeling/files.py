@@ -159,10 +159,7 @@ def write(
         raise ValueError("compression applies to HDF5 files only")
     if "\n" in comment or "\r" in comment:
         raise ValueError("comment has to be one line")
-    path = _modeling.file_of(name)
-    if not overwrite and _is_regular(path):
-        message = f"{os.fsdecode(path)} cannot be written: the file exists; overwrite=True replaces it"
-        raise PresentFileError(errno.EEXIST, message, os.fsdecode(path))
+    _require_new(_modeling.file_of(name), overwrite)
     try:
         _modeling.write(object, name, overwrite, compression, extension, comment)
     except FileError as error:
@@ -170,8 +167,11 @@ def write(
         raise
 
 
-def _is_regular(path: bytes) -> bool:
+def _require_new(path: bytes, overwrite: bool) -> None:
     try:
-        return stat.S_ISREG(os.stat(path).st_mode)
+        exists = stat.S_ISREG(os.stat(path).st_mode)
     except OSError:
-        return False
+        return  # writing says why
+    if exists and not overwrite:
+        message = f"{os.fsdecode(path)} cannot be written: the file exists; overwrite=True replaces it"
+        raise PresentFileError(errno.EEXIST, message, os.fsdecode(path))

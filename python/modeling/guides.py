@@ -10,8 +10,8 @@ import numpy as np
 
 from . import _modeling
 from ._modeling import Mesh, StrandSet
-from .files import Path, Point, _encoded, _is_regular, _point
-from .errors import PresentFileError
+from .errors import FileError
+from .files import Path, Point, _encoded, _point, _raise_specific, _require_new
 
 if TYPE_CHECKING:
     from numpy.typing import ArrayLike, NDArray
@@ -68,7 +68,12 @@ class Guide:
         tile_side
             Voxels per side of a tile in memory, 4 or 5.
         """
-        return cls._of(_modeling.Guide.read(_encoded(file), grid, min_value, _tile_side(tile_side)))
+        name = _encoded(file)
+        try:
+            return cls._of(_modeling.Guide.read(name, grid, min_value, _tile_side(tile_side)))
+        except FileError as error:
+            _raise_specific(error, name, writes=False)
+            raise
 
     @classmethod
     def from_array(
@@ -231,9 +236,12 @@ def make_volume(
     numbers = None if values is None else _floats(values, 1, "values")
     place = None if distance_to is None else _finite(distance_to)
     name = _encoded(file)
-    if not overwrite and _is_regular(name):
-        raise PresentFileError(17, "the file exists; overwrite=True replaces it", name.decode(errors="surrogateescape"))
-    _modeling.write_volume(name, mesh, numbers, place, made, overwrite)
+    _require_new(name, overwrite)
+    try:
+        _modeling.write_volume(name, mesh, numbers, place, made, overwrite)
+    except FileError as error:
+        _raise_specific(error, name, writes=True)
+        raise
 
 
 class StitchTemplate:

@@ -5,6 +5,9 @@
 #include "files/GeometryFile.h"
 #include "shell/Failure.h"
 
+#include <algorithm>
+#include <regex>
+
 namespace ModelingPython {
 
 namespace {
@@ -21,11 +24,30 @@ namespace {
         return py::module_::import(kErrors).attr(name);
     }
 
+    /// The sentence with arguments of Python instead of options: "min_value" for "--min-value". Options of a whole command
+    /// line, "modeling repair --only fill", stay.
+    std::string withArguments(std::string const& sentence)
+    {
+        static std::regex const option("(modeling [a-z-]+ )?--([a-z][a-z-]*)");
+        std::string text;
+        auto rest = sentence.begin();
+        for (std::sregex_iterator found(sentence.begin(), sentence.end(), option), end; found != end; ++found) {
+            std::smatch const& match = *found;
+            text.append(rest, match[0].first);
+            std::string name = match[1].matched ? match.str() : match[2].str();
+            if (!match[1].matched)
+                std::replace(name.begin(), name.end(), '-', '_');
+            text += name;
+            rest = match[0].second;
+        }
+        return text.append(rest, sentence.end());
+    }
+
     /// Sets the Python exception for a failure of the program.
     void setFailure(Failure const& failure)
     {
         py::list reasons;
-        std::string text = failure.what();
+        std::string text = withArguments(failure.what());
         for (std::string const& reason : failure.reasons) {
             text += "\n  " + reason;
             reasons.append(textOf(reason));

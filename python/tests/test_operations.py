@@ -128,6 +128,12 @@ def test_an_array_makes_the_volume_that_it_says() -> None:
     for wrong in (np.zeros((2, 2)), np.full((1, 1, 1), math.nan)):
         with pytest.raises(ValueError):
             modeling.Guide.from_array(wrong, 1)
+    point = scratch(".obj")
+    point.write_text("v 1 1 1\nv 1 1 1\nv 1 1 1\nf 1 2 3\n")
+    with pytest.raises(modeling.Refusal, match="so voxel_size is required"):
+        modeling.Guide.from_distance(modeling.read(point), (0, 0, 0))
+    with pytest.raises(FileNotFoundError):
+        modeling.Guide.read(scratch(".vdb"))
 
 
 def test_a_template_lays_strands_as_the_program_does() -> None:
