@@ -6,7 +6,7 @@
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
-#include "geometry/SurfaceBand.h"
+#include "geometry/SurfaceVolume.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 #include "shell/MemoryLimit.h"
@@ -50,12 +50,6 @@ namespace {
         requirePlace(out);
     }
 
-    void requireFiniteSurface(MeshArrays const& mesh, std::filesystem::path const& file)
-    {
-        if (!std::all_of(mesh.positions->begin(), mesh.positions->end(), [](float3 const& p) { return isFinite(p); }))
-            throw Failure(ExitCode::Refused, fmt::format("a coordinate in {} is not finite", file.string()));
-    }
-
     SurfaceValue surfaceValueOf(Options const& options, Object const& mesh)
     {
         SurfaceValue value;
@@ -64,53 +58,8 @@ namespace {
             return value;
         }
         value.pointNumbers = pointNumbers("--attribute", options.attribute, mesh, options.in);
-        if (!std::all_of(
-                value.pointNumbers.begin(), value.pointNumbers.end(), [](float n) { return std::isfinite(n); }))
-            throw Failure(ExitCode::Refused, fmt::format("the values of \"{}\" are not all finite", options.attribute));
+        requireFiniteNumbers(value.pointNumbers, fmt::format("values of \"{}\"", options.attribute));
         return value;
-    }
-
-    double voxelSizeOf(Options const& options, Object const& mesh)
-    {
-        if (options.voxelSize)
-            return *options.voxelSize;
-        auto const box = boundingBoxOf(mesh);
-        if (!box)
-            return 1; // any size, since there are no voxels
-        double const longest = std::max(
-            {double{box->max.x} - box->min.x, double{box->max.y} - box->min.y, double{box->max.z} - box->min.z});
-        if (!(longest > 0))
-            throw Failure(ExitCode::Refused,
-                fmt::format(
-                    "all points of {} are at the same position, so --voxel-size is required", options.in.string()));
-        return longest / options.voxels;
-    }
-
-    using Range = std::pair<float, float>;
-
-    Range rangeOf(std::vector<TSR::TileTree3D::Voxel> const& voxels)
-    {
-        auto const [least, most] = std::minmax_element(
-            voxels.begin(), voxels.end(), [](auto const& a, auto const& b) { return a.value < b.value; });
-        return least == voxels.end() ? Range() : Range(least->value, most->value);
-    }
-
-    /// Maps the values linearly, so that the smallest one becomes `from` and the largest one `to`.
-    void mapValues(float from, float to, std::vector<TSR::TileTree3D::Voxel>& voxels)
-    {
-        auto const [least, most] = rangeOf(voxels);
-        double const width = double{most} - least;
-        for (auto& voxel : voxels) {
-            double const t = width > 0 ? (double{voxel.value} - least) / width : 0;
-            voxel.value = static_cast<float>((1 - t) * from + t * to);
-        }
-    }
-
-    void requireFiniteValues(SparseVolume const& volume)
-    {
-        if (!std::all_of(volume.voxels.begin(), volume.voxels.end(),
-                [](TSR::TileTree3D::Voxel const& voxel) { return std::isfinite(voxel.value); }))
-            throw Failure(ExitCode::Refused, "the values of the volume are too large for single precision");
     }
 
     void requireMemory(BandSize const& size, double voxelSize, MemoryLimit const& limit)
@@ -129,22 +78,21 @@ namespace {
         Orvan::MutablePtr<Object> const mesh = loadInput(options.in, report).object;
         requireType(GeometryType::Mesh, *mesh, "make-volume", options.in);
         MeshArrays const arrays = arraysOf(*mesh);
-        requireFiniteSurface(arrays, options.in);
+        requireFiniteSurface(arrays, options.in.string());
         SurfaceValue const value = surfaceValueOf(options, *mesh);
 
         std::optional<Phase> phase(std::in_place, report, &Times::report, kReportTitle);
         SparseVolume volume;
         volume.name = options.grid;
-        volume.voxelSize = voxelSizeOf(options, *mesh);
+        volume.voxelSize =
+            options.voxelSize ? *options.voxelSize : voxelSizeFor(options.voxels, *mesh, options.in.string());
         volume.background = options.background;
         requireMemory(estimateBand(arrays, volume.voxelSize, options.halfWidth), volume.voxelSize, limit);
         runOperation(report, [&] {
-            volume.voxels = voxelsAround(arrays, value, volume.voxelSize, options.halfWidth);
-            if (options.from)
-                mapValues(*options.from, *options.to, volume.voxels);
-            requireFiniteValues(volume);
+            fillBand(arrays, value, options.halfWidth,
+                options.from ? std::optional(std::pair(*options.from, *options.to)) : std::nullopt, volume);
         });
-        auto const [least, most] = rangeOf(volume.voxels);
+        auto const [least, most] = valueRange(volume.voxels);
         reportVolume(volume, least, most, report);
         stopIfCancelled();
         phase.emplace(report, &Times::writing, fmt::format("writing {}", options.out.file.filename().string()));

@@ -2,9 +2,9 @@
 #include "GuideVolume.h"
 #include "files/WorkMeter.h"
 #include "geometry/Geometry.h"
-#include "geometry/LargeFaces.h"
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
+#include "geometry/Refinement.h"
 #include "geometry/Shape.h"
 #include "geometry/Triangulation.h"
 #include "shell/Failure.h"
@@ -13,17 +13,12 @@
 #include "shell/Progress.h"
 
 #include <Modeling/subdivide.h>
-#include <Modeling/subdivisionSteps.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
 #include <TessaraGeometry/Names.h>
 
 #include <fmt/format.h>
 
-#include <algorithm>
-#include <cmath>
-#include <limits>
-#include <map>
 #include <memory>
 #include <optional>
 
@@ -89,19 +84,16 @@ namespace {
     };
 
     /// \return how many faces are still too large
-    std::uint64_t refineBy(std::optional<GuideVolume> const& guide, float tolerance, Object& object)
+    std::uint64_t refineBy(std::optional<GuideGrid> const& guide, float tolerance, Object& object)
     {
         if (guide)
             return guide->refine(tolerance, object);
         Geometry::Mesh::subdivide(tolerance, object);
-        return countLargeFaces(object, [=](MeshArrays const& refined, Orvan::Array<bool>& marks) {
-            Geometry::Mesh::Internal::markForSubdivision(
-                tolerance, refined.faceCount(), *refined.positions, *refined.faceVertex, *refined.faceOffset, marks);
-        });
+        return countFacesAbove(tolerance, object);
     }
 
     /// Does the same, and counts the faces if progress is shown.
-    std::uint64_t refine(std::optional<GuideVolume> const& guide, float tolerance, Object& mesh)
+    std::uint64_t refine(std::optional<GuideGrid> const& guide, float tolerance, Object& mesh)
     {
         if (!isProgressShown())
             return refineBy(guide, tolerance, mesh);
@@ -115,77 +107,17 @@ namespace {
     {
         report.document["tooLargeFaces"] = count;
         if (count != 0)
-            report.warn(
-                fmt::format("{} still larger than the tolerance: they reached the limit of 31 steps, which divide "
-                            "edges by 25 million.{}",
-                    count == 1 ? "1 face is" : groupDigits(count) + " faces are",
-                    isGuided ? " --min-value keeps the tolerance away from 0." : ""));
+            report.warn(warningOfLargeFaces(count) + (isGuided ? " --min-value keeps the tolerance away from 0." : ""));
     }
 
     constexpr char kAdvice[] = "Dividing the tolerance by 3 makes about nine times as many faces.";
 
-    /// The library refines nothing below its own limit; and if points are only as far apart as adjacent floats, faces
-    /// never become small enough.
-    bool isTooFine(float tolerance, float farthest)
-    {
-        constexpr float kFinest = std::numeric_limits<float>::epsilon();
-        return !(tolerance > 4 * kFinest * farthest);
-    }
-
-    float toleranceOf(Options const& options, Object const& mesh, std::optional<GuideVolume> const& guide)
-    {
-        if (!boundingBoxOf(mesh))
-            return options.tolerance.value_or(0); // not used for an empty mesh
-        BoundingBox const box = *boundingBoxOf(mesh);
-        float3 const size{box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z};
-        float const tolerance =
-            options.tolerance ? *options.tolerance : *options.relative * std::hypot(size.x, size.y, size.z);
-
-        constexpr float kNear = 0.25f; // closer to the origin, the library's own limit is the coarser one
-        float farthest = kNear;
-        for (float const coordinate : {box.min.x, box.min.y, box.min.z, box.max.x, box.max.y, box.max.z})
-            farthest = std::max(farthest, std::abs(coordinate));
-        if (isTooFine(tolerance, farthest) && farthest == kNear)
-            throw Failure(ExitCode::Refused,
-                fmt::format(
-                    "a tolerance of {} is too fine: below {} nothing is refined. Use a larger one, or scale the mesh "
-                    "up.",
-                    tolerance, kNear * 4 * std::numeric_limits<float>::epsilon()));
-        if (isTooFine(tolerance, farthest))
-            throw Failure(ExitCode::Refused,
-                fmt::format(
-                    "a tolerance of {} is finer than single precision can distinguish at coordinates of up to {}. "
-                    "Use a larger one, or move the mesh to the origin.",
-                    tolerance, farthest));
-        float const scale = guide ? guide->smallestPositiveValue().value_or(1) : 1;
-        if (isTooFine(tolerance * scale, farthest))
-            throw Failure(ExitCode::Refused,
-                fmt::format(
-                    "a tolerance of {} times the smallest positive value of grid \"{}\", {}, is finer than single "
-                    "precision can distinguish there. Use a larger tolerance or --min-value.",
-                    tolerance, guide->grid(), scale));
-        return tolerance;
-    }
-
     /// Warns of the properties that were dropped, and why. \return their names
     std::vector<std::string> explainDropped(Object const& before, Object const& after, Report& report)
     {
-        std::vector<std::string> dropped;
-        std::map<std::string, std::vector<std::string>> namesByReason;
-        for (Property const& property : propertiesOf(before)) {
-            if (after.hasProperty(property.name.c_str()))
-                continue;
-            dropped.push_back(property.name);
-            std::string reason = "refinement replaces faces and corners";
-            if (property.component == Tessara::Geometry::sPointComp)
-                reason = property.range.empty() && property.type != "range"
-                    ? fmt::format("values of type {} cannot be interpolated for new points", property.type)
-                    : "ranges cannot be interpolated for new points";
-            namesByReason[reason].push_back(property.name);
-        }
-        for (auto const& [reason, names] : namesByReason)
-            report.warn(fmt::format("dropped {}: {}", fmt::join(names, ", "), reason));
-        return dropped;
+        for (DroppedByRefinement const& dropped : droppedByRefinement(before, after))
+            report.warn(dropped.sentence());
+        return namesMissingIn(after, before);
     }
 
     class Subdivide final : public Edit {
@@ -196,7 +128,7 @@ namespace {
         void report(Report& report) override;
 
     private:
-        std::optional<GuideVolume> readGuide(Object const& mesh, Report& report) const;
+        std::optional<GuideGrid> readGuide(Object const& mesh, Report& report) const;
 
         Options options_;
         MemoryLimit const* limit_ = nullptr; // while it applies
@@ -226,11 +158,12 @@ namespace {
         limit.run(work, kAdvice);
     }
 
-    std::optional<GuideVolume> Subdivide::readGuide(Object const& mesh, Report& report) const
+    std::optional<GuideGrid> Subdivide::readGuide(Object const& mesh, Report& report) const
     {
-        std::optional<GuideVolume> guide;
+        std::optional<GuideGrid> guide;
         if (!options_.guide.file.empty())
-            guide.emplace(options_.guide, report, limit_).reportCoverage(arraysOf(mesh), report);
+            reportCoverage(
+                guide.emplace(ModelingProgram::readGuide(options_.guide, report, limit_)), arraysOf(mesh), report);
         return guide;
     }
 
@@ -248,8 +181,8 @@ namespace {
         requireClosedTriangleMesh(
             arraysOf(mesh), topology, faultsOfIsolatedPoints(arraysOf(mesh), topology), "subdivide", subject.name);
 
-        std::optional<GuideVolume> const guide = readGuide(mesh, report);
-        tolerance_ = toleranceOf(options_, mesh, guide);
+        std::optional<GuideGrid> const guide = readGuide(mesh, report);
+        tolerance_ = refinementTolerance(options_.tolerance, options_.relative, mesh, guide ? &*guide : nullptr);
         Object result = mesh;
         std::uint64_t largeFaces = 0;
         runOperation(report, [&] { largeFaces = refine(guide, tolerance_, result); });

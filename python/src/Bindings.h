@@ -9,5 +9,15 @@ void bindHandles(pybind11::module_& module);
 void bindViews(pybind11::module_& module);
 void bindProperties(pybind11::module_& module);
 void bindPickling(pybind11::module_& module);
+void bindErrors(pybind11::module_& module);
+void bindFiles(pybind11::module_& module);
+void bindInspection(pybind11::module_& module);
+void bindEditing(pybind11::module_& module);
+void bindMerging(pybind11::module_& module);
+void bindSurfaces(pybind11::module_& module);
+void bindHalfEdges(pybind11::module_& module);
+void bindGuide(pybind11::module_& module);
+void bindStitch(pybind11::module_& module);
+void bindThreads(pybind11::module_& module);
 
 }

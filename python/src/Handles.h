@@ -4,11 +4,14 @@
 
 #include <pybind11/pybind11.h>
 
+#include <memory>
 #include <utility>
 
 namespace ModelingPython {
 
 namespace py = pybind11;
+
+struct Facts;
 
 /// What the Python classes `Mesh`, `PointCloud` and `StrandSet` hold: a reference to an object that nobody changes. Each
 /// change makes a new object, which shares all arrays that did not change, and replaces the reference.
@@ -20,10 +23,19 @@ public:
     }
 
     Orvan::Ptr<Tessara::Object> const& object() const { return object_; }
-    void replace(Orvan::Ptr<Tessara::Object> object) { object_ = std::move(object); }
+    void replace(Orvan::Ptr<Tessara::Object> object)
+    {
+        object_ = std::move(object);
+        facts_.reset();
+    }
+
+    /// What is known about the object (`Facts.h`), so that it is checked once; null if nothing is.
+    std::shared_ptr<Facts> const& facts() const { return facts_; }
+    void setFacts(std::shared_ptr<Facts> facts) { facts_ = std::move(facts); }
 
 private:
     Orvan::Ptr<Tessara::Object> object_;
+    std::shared_ptr<Facts> facts_;
 };
 
 class Mesh : public Handle {

@@ -19,11 +19,11 @@ namespace {
     using TestSupport::MeshBuilder;
 
     /// A guide read from a file to which a volume was written.
-    GuideVolume throughFile(SparseVolume const& volume, Report& report, GuideOptions options = {})
+    GuideGrid throughFile(SparseVolume const& volume, Report& report, GuideOptions options = {})
     {
         options.file = std::filesystem::path(testing::TempDir()) / "modeling-guide.vdb";
         writeVdbFile(volume, options.file);
-        return GuideVolume(options, report);
+        return readGuide(options, report);
     }
 
     /// Fine where x is above 0, half as boxes and half as voxels, on a lattice with an offset in voxels.
@@ -77,8 +77,8 @@ TEST(GuideVolume, ScalesTheToleranceAtThePositionsInTheFile)
             GuideOptions options;
             options.tileSide = tileSide;
             Report report("test");
-            GuideVolume const guide = throughFile(halfSpace(0.05, shift), report, options);
-            guide.reportCoverage(arraysOf(*sphere), report);
+            GuideGrid const guide = throughFile(halfSpace(0.05, shift), report, options);
+            reportCoverage(guide, arraysOf(*sphere), report);
             EXPECT_EQ(report.document["warnings"].size(), 0);
             EXPECT_NEAR(
                 report.document["volume"]["coveredFaces"].get<double>() / arraysOf(*sphere).faceCount(), 0.5, 0.1);
@@ -115,7 +115,7 @@ TEST(GuideVolume, RefusesWhatItCannotRepresent)
         Report report("test");
         mixed.background = background;
         mixed.voxels = {{0, 0, 0, 0.0f}};
-        EXPECT_EQ(throughFile(mixed, report).smallestPositiveValue().has_value(), background > 0);
+        EXPECT_EQ(throughFile(mixed, report).range().leastPositive.has_value(), background > 0);
         EXPECT_EQ(report.document["warnings"].size(), 1) << background;
     }
 }

@@ -72,7 +72,7 @@ TEST(MemoryLimit, RefusesBandsAndVolumesBeforeTheyAreMade)
     MemoryLimit const limit(presentMemory() + (20u << 20)); // OpenVDB alone needs more
     Report report("test");
     try {
-        GuideVolume const guide(options, report, &limit);
+        GuideGrid const guide = readGuide(options, report, &limit);
         ADD_FAILURE() << "read in spite of the limit";
     } catch (Failure const& failure) {
         EXPECT_EQ(failure.code, ExitCode::OutOfMemory);

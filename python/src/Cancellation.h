@@ -1,0 +1,46 @@
+#pragma once
+
+#include <pybind11/pybind11.h>
+
+#include <functional>
+#include <optional>
+#include <type_traits>
+#include <utility>
+
+namespace ModelingPython {
+
+namespace py = pybind11;
+
+/// Runs `work` without the interpreter lock, so that other Python threads continue. It must not use Python objects.
+template <class Work> auto withoutLock(Work const& work)
+{
+    py::gil_scoped_release const unlocked;
+    return work();
+}
+
+namespace Internal {
+    void runCancellable(std::function<void()> const& work);
+}
+
+/// Does the same for work that checks whether the job is cancelled. On the main thread, Ctrl-C cancels it, and the
+/// exception that the Python handler of SIGINT raises is thrown. If the handler raises none, or if the job of another
+/// thread was meant, the work starts again: so it must not have side effects if it is cancelled.
+template <class Work> auto runCancellable(Work const& work)
+{
+    using Result = std::invoke_result_t<Work>;
+    std::optional<Result> result;
+    Internal::runCancellable([&] {
+        result.reset();
+        result.emplace(work());
+    });
+    return std::move(*result);
+}
+
+/// Ends a loop that the library does not cancel.
+/// \throws  what `runCancellable` takes for a cancellation, if the job of this thread is cancelled
+void stopIfCancelled();
+
+/// Whether this thread runs cancellable work.
+bool isCancellable() noexcept;
+
+}

@@ -1,0 +1,81 @@
+#pragma once
+
+#include <OrvanCore/Array.h>
+#include <TessaraMathSupport/Types.h>
+
+#include <pybind11/numpy.h>
+
+#include <fmt/format.h>
+
+#include <cstring>
+#include <stdexcept>
+#include <string>
+
+namespace ModelingPython {
+
+namespace py = pybind11;
+
+// Arrays from Python. The wrappers in Python convert and check them, so other types and shapes are faults of the caller.
+
+template <class T> using Values = py::array_t<T, py::array::c_style>;
+
+/// One value of the library per entry, or per row of three numbers.
+template <class T, class Number> Orvan::Array<T> arrayOf(Values<Number> const& values)
+{
+    constexpr auto kColumns = static_cast<py::ssize_t>(sizeof(T) / sizeof(Number));
+    bool const fits = kColumns == 1 ? values.ndim() == 1 : values.ndim() == 2 && values.shape(1) == kColumns;
+    if (!fits)
+        throw py::value_error("an array has the wrong shape");
+    Orvan::Array<T> result(static_cast<std::uint64_t>(values.shape(0)), Orvan::kUninitialized);
+    if (values.size() != 0)
+        std::memcpy(result.data, values.data(), static_cast<std::size_t>(values.size()) * sizeof(Number));
+    return result;
+}
+
+inline Orvan::Array<Tessara::Math::float3> pointsOf(Values<float> const& values)
+{
+    return arrayOf<Tessara::Math::float3>(values);
+}
+
+/// A NumPy array of these values.
+template <class T> py::array_t<T> numbersOf(Orvan::Array<T> const& values)
+{
+    return py::array_t<T>(static_cast<py::ssize_t>(values.size), values.data);
+}
+
+inline py::array_t<float> numbersOf(Orvan::Array<Tessara::Math::float3> const& values)
+{
+    return py::array_t<float>(
+        {static_cast<py::ssize_t>(values.size), py::ssize_t{3}}, reinterpret_cast<float const*>(values.data));
+}
+
+/// Calls `visit(index)` for each index of an array of integers from 0 up to but excluding `count`.
+/// \throws IndexError  before which some indices may have been visited
+template <class Visit> void forEachIndex(Values<long long> const& indices, unsigned int count, Visit const& visit)
+{
+    long long const* const index = indices.data();
+    for (py::ssize_t i = 0; i != indices.size(); ++i) {
+        if (index[i] < 0 || index[i] >= count)
+            throw py::index_error(
+                fmt::format("index {} is out of range: there are {} elements, counted from 0", index[i], count));
+        visit(static_cast<unsigned int>(index[i]));
+    }
+}
+
+/// A mask of elements, from a mask or from indices.
+inline Orvan::Array<bool> maskOf(py::array const& selected, unsigned int count)
+{
+    if (selected.ndim() != 1)
+        throw py::value_error("elements need a mask or indices in one dimension");
+    if (py::isinstance<Values<bool>>(selected)) {
+        if (selected.size() != py::ssize_t{count})
+            throw py::index_error(
+                fmt::format("the mask has {} entries, but there are {} elements", selected.size(), count));
+        return arrayOf<bool>(py::cast<Values<bool>>(selected));
+    }
+    Orvan::Array<bool> mask(count);
+    forEachIndex(py::cast<Values<long long>>(selected), count, [&](unsigned int i) { mask[i] = true; });
+    return mask;
+}
+
+}
