@@ -255,6 +255,7 @@ void bindRecipes(py::module_& module)
         "report as far as it got.");
     module.attr("library_version") = MODELING_VERSION " build " MODELING_BUILD;
     module.attr("writable_formats") = writableFormats();
+    module.attr("requirements") = py::tuple(py::cast(requirementNames()));
     module.def("check_recipe", &checkPythonRecipe, py::arg("text"), py::arg("format") = "",
         "Checks a recipe in JSON for one input file per run. If its output, or `format`, names a format, checks "
         "whether "
