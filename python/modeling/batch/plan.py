@@ -138,7 +138,7 @@ def _settle(job: Job, settings: Settings, record: Entry | None, force: bool) -> 
         return make_entry(job, "failed", f"{job.output} exists, and {why}; --force replaces it", recorded)
     if record and recorded == present and record["status"] in ("done", "current") and _is_current(job, settings, record):
         return {**record, "status": "current", "input": job.input}
-    return replace(job, replaces=True, old_hash=present)
+    return replace(job, old_hash=present)
 
 
 def _is_current(job: Job, settings: Settings, record: Entry) -> bool:

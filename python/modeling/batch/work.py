@@ -38,8 +38,7 @@ class Job:
     input: str  # "scan.h5#left" is one of several objects in an HDF5 file
     output: str
     format: str
-    replaces: bool = False
-    old_hash: str | None = None  # of the output that exists
+    old_hash: str | None = None  # of the output that exists, which may be replaced
 
 
 def hash_file(path: str) -> str:
@@ -116,7 +115,7 @@ def _run(job: Job, settings: Settings) -> Entry:
         settings.recipe,
         [job.input],
         job.output,
-        force=job.replaces,
+        force=True,  # a worker that died may have written it
         compress=settings.compress if job.format == "h5" else 0,
         threads=settings.threads,
         lenient=settings.lenient,
