@@ -84,6 +84,12 @@ namespace {
         return option.kind == ValueKind::File && !option.given.empty();
     }
 
+    std::size_t lineOf(RecipePlace const& place, Recipe const& recipe)
+    {
+        auto const line = recipe.lines.find(place);
+        return line != recipe.lines.end() ? line->second : 0;
+    }
+
     /// Refuses standard input and pipes, which belong to the program around this module.
     void refuseStreams(Recipe const& recipe)
     {
@@ -92,11 +98,10 @@ namespace {
                 for (std::string const& file : option.given)
                     if (isFile(option) && (file == "-" || isStream(file))) {
                         RecipePlace const place{i + 1, option.name};
-                        auto const line = recipe.lines.find(place);
                         throw RecipeFailure({ExitCode::CommandLine,
                                                 titleOf(i + 1, recipe.steps[i].kind->help.name) + ": \"" + option.name
                                                     + "\" has to be a file, and " + file + " is a stream"},
-                            place, line != recipe.lines.end() ? line->second : 0);
+                            place, lineOf(place, recipe));
                     }
     }
 
@@ -116,7 +121,7 @@ namespace {
             for (std::size_t i = 0; i != recipe.steps.size(); ++i)
                 for (OptionDescription const& option : recipe.steps[i].options.options)
                     if (isFile(option))
-                        files.append(py::make_tuple(i, option.name));
+                        files.append(py::make_tuple(i, option.name, lineOf({i + 1, option.name}, recipe)));
             py::dict result;
             result["recipe"] = toPython(recipeOf(recipe.steps));
             result["files"] = files;
@@ -260,7 +265,7 @@ void bindRecipes(py::module_& module)
         "Checks a recipe in JSON for one input file per run. If its output, or `format`, names a format, checks "
         "whether "
         "that can hold the result. Returns the `recipe` in its normal form, the places of its `files` as (index of the "
-        "step, key), and `format` and `compress` of its output. Raises RecipeError.");
+        "step, key, line), and `format` and `compress` of its output. Raises RecipeError.");
     module.def("run_recipe", &runPythonRecipe, py::arg("recipe"), py::arg("inputs"), py::arg("output"), py::kw_only(),
         py::arg("force") = false, py::arg("format") = "", py::arg("compress") = 0, py::arg("threads") = 0,
         py::arg("lenient") = false, py::arg("require") = "",

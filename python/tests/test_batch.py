@@ -75,7 +75,7 @@ def test_refuses_wrong_recipes_with_the_line(batch: Batch, tmp_path: Path, capsy
             ('{"modeling": 1,\n"steps": [{"do": "merge",\n"source-attribute": "a"}],\n"output": {"format": "stl"}}', "line 2: "),
             ('{"modeling": 1,\n', "parse error at line 2"),
             ('{"modeling": 1, "steps": [{"do": "add-points", "points": "-"}]}', "is a stream"),
-            ('{"modeling": 1, "steps": [{"do": "add-points", "points": "none.ply"}]}', "none.ply cannot be read: No such file"),
+            ('{"modeling": 1, "steps": [\n{"do": "add-points", "points": "none.ply"}]}', 'line 2: step 1: "points": '),
         ],
         "r.toml": [
             ("modeling = 1\n\n" + steps + "# a comment\n\namuont = 1\n", 'line 7: step 1 (smooth): there is no key "amuont"'),
@@ -93,7 +93,7 @@ def test_refuses_wrong_recipes_with_the_line(batch: Batch, tmp_path: Path, capsy
             write(tmp_path / name, text)
             assert batch("a.obj", recipe=name) == (2, {}), text
             error = capsys.readouterr().err
-            assert name in error or "add-points" in text, text
+            assert name in error, text
             assert message in error, text
     assert not os.path.exists("out")
 

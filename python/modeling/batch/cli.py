@@ -178,7 +178,7 @@ def _make_folders(jobs: list[Job], options: argparse.Namespace) -> None:
 def _list_jobs(plan: Plan, options: argparse.Namespace) -> int:
     for job in plan.jobs:
         print(f"{job.input} -> {job.output}")
-    print(f"{len(plan.jobs)} files to run, {len(plan.settled)} up to date or refused", file=sys.stderr)
+    print(f"{len(plan.jobs)} to run, {len(plan.settled)} up to date or refused", file=sys.stderr)
     return DONE
 
 
@@ -209,4 +209,5 @@ def _print_results(report: Report, seconds: float, options: argparse.Namespace) 
         print_table(entries)
     counts = report.counts()
     parts = [f"{counts[status]} {status}" for status in ("done", "current", "failed", "open") if counts[status]]
-    print(f"{counts['files']} files: {', '.join(parts)}, {seconds:.1f} s; {report.path}")
+    files = "1 file" if counts["files"] == 1 else f"{counts['files']} files"
+    print(f"{files}: {', '.join(parts)}, {seconds:.1f} s; {report.path}")

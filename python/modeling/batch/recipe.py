@@ -54,21 +54,27 @@ def read_recipe(path: str) -> Recipe:
     except _modeling.RecipeError as error:
         line = line_in_toml(source, error.step, error.key) if is_toml else error.line
         raise BatchError(f"{path}: {f'line {line}: ' if line else ''}{error}") from None
-    document, digest = _with_absolute_files(checked["recipe"], checked["files"])
+    places = [
+        (step, key, line_in_toml(source, step + 1, key) if is_toml else line) for step, key, line in checked["files"]
+    ]
+    document, digest = _with_absolute_files(path, checked["recipe"], places)
     return Recipe(path, json.dumps(document), digest, checked["format"], checked["compress"])
 
 
-def _with_absolute_files(recipe: dict[str, Any], places: list[tuple[int, str]]) -> tuple[dict[str, Any], str]:
+def _with_absolute_files(
+    path: str, recipe: dict[str, Any], places: list[tuple[int, str, int]]
+) -> tuple[dict[str, Any], str]:
     """Workers have other current folders. The digest does not depend on where the files are."""
     absolute, hashed = copy.deepcopy(recipe), copy.deepcopy(recipe)
-    for step, key in places:
+    for step, key, line in places:
         value = recipe["steps"][step][key]
         names = value if isinstance(value, list) else [value]
         paths = [os.path.abspath(name) for name in names]
         try:
-            hashes = [hash_input(path) for path in paths]
+            hashes = [hash_input(file) for file in paths]
         except OSError as error:
-            raise BatchError(f"step {step + 1}: {key}: {error.filename} cannot be read: {error.strerror}") from None
+            why = f'"{key}": {error.filename} cannot be read: {error.strerror}'
+            raise BatchError(f"{path}: line {line}: step {step + 1}: {why}") from None
         absolute["steps"][step][key] = paths if isinstance(value, list) else paths[0]
         hashed["steps"][step][key] = hashes
     return absolute, hashlib.sha256(json.dumps(hashed, sort_keys=True).encode()).hexdigest()
