@@ -52,24 +52,6 @@ Exit codes:
 
     constexpr char kOutOfMemory[] = "out of memory";
 
-    /// \pre  an exception is being handled
-    Failure currentFailure()
-    {
-        try {
-            throw;
-        } catch (Failure const& failure) {
-            return failure;
-        } catch (FileError const& error) {
-            return {ExitCode::File, error.what()};
-        } catch (Cancelled const&) {
-            return {ExitCode::Cancelled, "cancelled; nothing was written"};
-        } catch (std::bad_alloc const&) {
-            return {ExitCode::OutOfMemory, kOutOfMemory};
-        } catch (std::exception const& error) {
-            return {ExitCode::Unexpected, fmt::format("unexpected failure: {}", error.what())};
-        }
-    }
-
     int reportFailure(Failure const& failure, bool asJson, Report& report)
     {
         printMessage(fmt::format("modeling: {}", failure.what()));
@@ -187,6 +169,23 @@ Exit codes:
                 static_cast<void>(::open("/dev/null", O_RDONLY));
     }
 
+}
+
+Failure currentFailure()
+{
+    try {
+        throw;
+    } catch (Failure const& failure) {
+        return failure;
+    } catch (FileError const& error) {
+        return {ExitCode::File, error.what()};
+    } catch (Cancelled const&) {
+        return {ExitCode::Cancelled, "cancelled; nothing was written"};
+    } catch (std::bad_alloc const&) {
+        return {ExitCode::OutOfMemory, kOutOfMemory};
+    } catch (std::exception const& error) {
+        return {ExitCode::Unexpected, fmt::format("unexpected failure: {}", error.what())};
+    }
 }
 
 Command addCommand(CommandHelp const& help, CommandLine& program, Invocation& invocation)

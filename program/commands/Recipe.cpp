@@ -17,36 +17,121 @@ namespace ModelingProgram {
 namespace {
 
     constexpr int kVersion = 1;
+    constexpr int kMostCompression = 9;
 
-    [[noreturn]] void refuse(std::string const& where, std::string const& why)
+    [[noreturn]] void refuse(RecipePlace place, std::string const& sentence)
     {
-        throw Failure(ExitCode::CommandLine, fmt::format("{}: {}", where, why));
+        throw RecipeFailure({ExitCode::CommandLine, sentence}, std::move(place));
     }
 
-    /// Refuses a key that occurs twice in an object, of which the parser would drop one.
-    Json parseJson(std::string_view text, std::filesystem::path const& file)
-    {
-        constexpr int kMostLevels = 100; // values are copied recursively
-        std::vector<std::set<std::string>> keys;
-        auto const check = [&](int level, Json::parse_event_t event, Json& value) {
-            if (level > kMostLevels)
-                throw FileError(fmt::format("{} cannot be read: its values are nested too deeply", file.string()));
-            if (event == Json::parse_event_t::object_start)
-                keys.emplace_back();
-            else if (event == Json::parse_event_t::object_end)
-                keys.pop_back();
-            else if (event == Json::parse_event_t::key && !keys.back().insert(value.get<std::string>()).second)
-                throw FileError(
-                    fmt::format("{} cannot be read: the key {} occurs twice", file.string(), toText(value)));
-            return true;
-        };
-        try {
-            return Json::parse(text, check);
-        } catch (Json::exception const& error) {
-            std::string const why = error.what(); // "[json.exception.parse_error.101] parse error at line 1, ..."
-            std::size_t const start = std::min(why.find("] ") + 2, why.size());
-            throw FileError(fmt::format("{} cannot be read: {}", file.string(), why.substr(start)));
+    /// Follows the parser, which knows no lines: it reads one character at a time, up to the end of each key.
+    class ReadPosition {
+    public:
+        using iterator_category = std::input_iterator_tag;
+        using value_type = char;
+        using difference_type = std::ptrdiff_t;
+        using pointer = char const*;
+        using reference = char const&;
+
+        ReadPosition(char const* position, char const*& last)
+            : position_(position)
+            , last_(&last)
+        {
         }
+        reference operator*() const { return *position_; }
+        ReadPosition& operator++()
+        {
+            *last_ = ++position_;
+            return *this;
+        }
+        bool operator==(ReadPosition const& other) const { return position_ == other.position_; }
+
+    private:
+        char const* position_;
+        char const** last_;
+    };
+
+    /// Notes the lines of keys and steps, and refuses what the parser would accept: a key that occurs twice in an
+    /// object, of which it would drop one, and values that are nested too deeply to be copied recursively.
+    class RecipeParser {
+    public:
+        explicit RecipeParser(std::string_view text)
+            : text_(text)
+            , position_(text.data())
+        {
+        }
+
+        Json parse()
+        {
+            char const* const end = text_.data() + text_.size();
+            return Json::parse(ReadPosition(text_.data(), position_), ReadPosition(end, position_),
+                [this](int level, Json::parse_event_t event, Json& value) {
+                    look(level, event, value);
+                    return true;
+                });
+        }
+
+        RecipeLines lines;
+
+    private:
+        using Event = Json::parse_event_t;
+
+        std::size_t line() const
+        {
+            // The end of a number is only known after the next character.
+            char const* const last = std::max(text_.data(), position_ - 1);
+            return 1 + static_cast<std::size_t>(std::count(text_.data(), last, '\n'));
+        }
+
+        void look(int level, Event event, Json const& value)
+        {
+            constexpr int kMostLevels = 100;
+            if (level > kMostLevels)
+                throw RecipeFailure({ExitCode::File, "its values are nested too deeply"}, {}, line());
+            if (event == Event::object_start)
+                keys_.emplace_back();
+            else if (event == Event::object_end)
+                keys_.pop_back();
+            else if (event == Event::key && !keys_.back().insert(value.get<std::string>()).second)
+                throw RecipeFailure(
+                    {ExitCode::File, fmt::format("the key {} occurs twice", toText(value))}, {}, line());
+            note(level, event, value);
+        }
+
+        void note(int level, Event event, Json const& value)
+        {
+            bool const isStart = event == Event::object_start || event == Event::array_start || event == Event::value;
+            if (level == 0 && isStart)
+                lines.insert({{}, line()});
+            else if (level == 1 && event == Event::key)
+                lines.insert({{0, topKey_ = value.get<std::string>()}, line()});
+            else if (level == 2 && isStart && topKey_ == "steps")
+                lines.insert({{++step_, {}}, line()});
+            else if (level == 2 && event == Event::key)
+                lines.insert({{0, topKey_ + "." + value.get<std::string>()}, line()});
+            else if (level == 3 && event == Event::key && topKey_ == "steps")
+                lines.insert({{step_, value.get<std::string>()}, line()});
+        }
+
+        std::string_view text_;
+        char const* position_; // after what has been parsed
+        std::vector<std::set<std::string>> keys_;
+        std::string topKey_;
+        std::size_t step_ = 0;
+    };
+
+    /// The line of a place, or of the smallest part around it that has one.
+    std::size_t lineOf(RecipePlace const& place, RecipeLines const& lines)
+    {
+        std::vector<RecipePlace> parts{place};
+        if (place.step != 0)
+            parts.push_back({place.step, {}});
+        parts.push_back({0, place.step != 0 ? "steps" : place.key.substr(0, place.key.find('.'))});
+        parts.push_back({});
+        for (RecipePlace const& part : parts)
+            if (auto const found = lines.find(part); found != lines.end())
+                return found->second;
+        return 0;
     }
 
     char const* nameOfKind(ValueKind kind)
@@ -107,22 +192,23 @@ namespace {
     }
 
     /// Adds an option as it would be on a command line.
-    void addWords(
-        Json const& value, OptionDescription const& option, std::string const& where, std::vector<std::string>& words)
+    void addWords(Json const& value, OptionDescription const& option, std::size_t number, std::string const& where,
+        std::vector<std::string>& words)
     {
+        RecipePlace const place{number, option.name};
         bool const isList = option.count != 1;
         std::vector<Json> const values =
             isList && value.is_array() ? value.get<std::vector<Json>>() : std::vector{value};
         bool const fits = value.is_array() == isList && (!isList || values.size() == option.count)
             && std::all_of(values.begin(), values.end(), [&](Json const& one) { return hasKind(one, option.kind); });
         if (!fits)
-            refuse(where,
-                fmt::format("\"{}\" has to be {}", option.name,
+            refuse(place,
+                fmt::format("{}: \"{}\" has to be {}", where, option.name,
                     isList ? fmt::format("a list of {} values, each {}", option.count, nameOfKind(option.kind))
                            : nameOfKind(option.kind)));
         for (Json const& one : values)
             if (one.is_string() && one.get<std::string>().find('\0') != std::string::npos)
-                refuse(where, fmt::format("\"{}\" contains a null character", option.name));
+                refuse(place, fmt::format("{}: \"{}\" contains a null character", where, option.name));
         if (option.kind == ValueKind::Flag) {
             if (value.get<bool>())
                 words.push_back("--" + option.name);
@@ -144,9 +230,9 @@ namespace {
     {
         std::string const place = fmt::format("step {}", number);
         if (!step.is_object())
-            refuse(place, "it has to be an object, such as {\"do\": \"triangulate\"}");
+            refuse({number}, place + ": it has to be an object, such as {\"do\": \"triangulate\"}");
         if (!step.contains("do") || !step["do"].is_string())
-            refuse(place, "\"do\" has to name what to do");
+            refuse({number, "do"}, place + ": \"do\" has to name what to do");
         std::string const name = step["do"].get<std::string>();
         CommandDescription const known = describeStep(editKindOf(name, number));
         std::string const where = titleOf(number, name);
@@ -157,26 +243,85 @@ namespace {
         for (auto const& [key, value] : step.items()) {
             auto const option = std::find(names.begin(), names.end(), key);
             if (option != names.end())
-                addWords(value, known.options[static_cast<std::size_t>(option - names.begin())], where, words);
+                addWords(value, known.options[static_cast<std::size_t>(option - names.begin())], number, where, words);
             else if (key != "do")
-                refuse(where, fmt::format("there is no key \"{}\"{}", key, suggestionFor(key, names)));
+                refuse(
+                    {number, key}, fmt::format("{}: there is no key \"{}\"{}", where, key, suggestionFor(key, names)));
         }
         return words;
+    }
+
+    void refuseOtherKeys(Json const& object, std::string const& path, std::vector<std::string> const& names)
+    {
+        for (auto const& [key, value] : object.items())
+            if (std::find(names.begin(), names.end(), key) == names.end())
+                refuse({0, path + key}, fmt::format("there is no key \"{}\"{}", key, suggestionFor(key, names)));
     }
 
     Json const& stepsIn(Json const& recipe)
     {
         if (!recipe.is_object() || !recipe.contains("modeling") || recipe["modeling"] != kVersion)
-            throw Failure(ExitCode::CommandLine,
+            refuse({0, "modeling"},
                 fmt::format(
                     "it is no recipe of version {0}, which would be an object with \"modeling\": {0}", kVersion));
-        for (auto const& [key, value] : recipe.items())
-            if (key != "modeling" && key != "steps" && key != "$schema")
-                throw Failure(ExitCode::CommandLine,
-                    fmt::format("there is no key \"{}\"{}", key, suggestionFor(key, {"modeling", "steps", "$schema"})));
+        refuseOtherKeys(recipe, {}, {"modeling", "steps", "output", "$schema"});
         if (!recipe.contains("steps") || !recipe["steps"].is_array() || recipe["steps"].empty())
-            throw Failure(ExitCode::CommandLine, "\"steps\" has to be a list of at least one step");
+            refuse({0, "steps"}, "\"steps\" has to be a list of at least one step");
         return recipe["steps"];
+    }
+
+    std::vector<std::string> writableFormats()
+    {
+        std::vector<std::string> names = geometryFormats();
+        std::erase_if(names, [](std::string const& name) { return !isWritableFormat("." + name); });
+        return names;
+    }
+
+    Output outputIn(Json const& recipe)
+    {
+        Output output;
+        if (!recipe.contains("output"))
+            return output;
+        Json const& values = recipe["output"];
+        if (!values.is_object())
+            refuse({0, "output"}, "\"output\" has to be an object, such as {\"format\": \"ply\"}");
+        refuseOtherKeys(values, "output.", {"format", "compress"});
+        if (values.contains("format")) {
+            std::vector<std::string> const names = writableFormats();
+            Json const& format = values["format"];
+            if (!format.is_string() || std::find(names.begin(), names.end(), format.get<std::string>()) == names.end())
+                refuse({0, "output.format"}, fmt::format("\"format\" has to be one of {}", listOf(names)));
+            output.format = "." + format.get<std::string>();
+        }
+        if (values.contains("compress")) {
+            Json const& level = values["compress"];
+            if (!isWhole(level) || level.get<double>() < 1 || level.get<double>() > kMostCompression)
+                refuse({0, "output.compress"},
+                    fmt::format("\"compress\" has to be a whole number from 1 to {}", kMostCompression));
+            if (!output.format.empty() && output.format != ".h5")
+                refuse({0, "output.compress"}, "\"compress\" applies to HDF5 files only: the format h5");
+            output.compression = level.get<unsigned int>();
+        }
+        return output;
+    }
+
+    /// The key of a step that a message is about: one whose option it names.
+    std::string keyNamedBy(std::string const& message, Json const& step)
+    {
+        for (auto const& [key, value] : step.items())
+            if (message.find("--" + key) != std::string::npos)
+                return key;
+        return {};
+    }
+
+    Step parseJsonStep(Json const& values, std::size_t number)
+    {
+        std::vector<std::string> const words = wordsOf(values, number);
+        try {
+            return parseStep(words, number);
+        } catch (Failure const& failure) {
+            throw RecipeFailure(failure, {number, keyNamedBy(failure.what(), values)});
+        }
     }
 
     /// The value as it is in a recipe.
@@ -248,6 +393,15 @@ namespace {
         return schema;
     }
 
+    Json schemaOfOutput()
+    {
+        Json const format = {{"description", "The format"}, {"type", "string"}, {"enum", writableFormats()}};
+        Json const compress = {{"description", "Compress HDF5 files, from 1 (fast) to 9 (small)"}, {"type", "integer"},
+            {"minimum", 1}, {"maximum", kMostCompression}};
+        return {{"description", "What to write if the recipe is run on many files"}, {"type", "object"},
+            {"properties", {{"format", format}, {"compress", compress}}}, {"additionalProperties", false}};
+    }
+
     Json schemaOfStep(EditKind const& kind)
     {
         CommandDescription const step = describeStep(kind);
@@ -273,17 +427,52 @@ namespace {
 
 }
 
+Recipe parseRecipe(std::string_view text)
+{
+    RecipeParser parser(text);
+    try {
+        Json const document = parser.parse();
+        Recipe recipe;
+        for (Json const& step : stepsIn(document))
+            recipe.steps.push_back(parseJsonStep(step, recipe.steps.size() + 1));
+        recipe.output = outputIn(document);
+        recipe.lines = std::move(parser.lines);
+        return recipe;
+    } catch (Json::exception const& error) {
+        std::string const why = error.what(); // "[json.exception.parse_error.101] parse error at line 1, ..."
+        throw RecipeFailure({ExitCode::File, why.substr(std::min(why.find("] ") + 2, why.size()))}, {});
+    } catch (RecipeFailure const& failure) {
+        std::size_t const line = failure.line != 0 ? failure.line : lineOf(failure.place, parser.lines);
+        throw RecipeFailure(failure, failure.place, line);
+    }
+}
+
+void checkRecipe(Recipe const& recipe, std::string const& format)
+{
+    RecipePlace place;
+    try {
+        requireChain(recipe.steps, 1);
+        if (!format.empty())
+            requireFit(recipe.steps, {"output" + format});
+    } catch (StepFailure const& failure) {
+        place.step = failure.step;
+        throw RecipeFailure(failure, place, lineOf(place, recipe.lines));
+    } catch (Failure const& failure) {
+        place.key = "output.format";
+        throw RecipeFailure(failure, place, lineOf(place, recipe.lines));
+    }
+}
+
 std::vector<Step> readRecipe(std::filesystem::path const& file)
 {
     InputFile const input(file);
-    Json const recipe = parseJson({input.bytes.get(), input.size}, file);
     try {
-        std::vector<Step> steps;
-        for (Json const& step : stepsIn(recipe))
-            steps.push_back(parseStep(wordsOf(step, steps.size() + 1), steps.size() + 1));
-        return steps;
-    } catch (Failure const& failure) {
-        throw Failure(failure.code, fmt::format("{}: {}", file.string(), failure.what()), failure.reasons);
+        return parseRecipe({input.bytes.get(), input.size}).steps;
+    } catch (RecipeFailure const& failure) {
+        std::string const line = failure.line != 0 ? fmt::format("line {}: ", failure.line) : "";
+        if (failure.code == ExitCode::File)
+            throw FileError(fmt::format("{} cannot be read: {}{}", file.string(), line, failure.what()));
+        throw Failure(failure.code, fmt::format("{}: {}{}", file.string(), line, failure.what()), failure.reasons);
     }
 }
 
@@ -316,7 +505,8 @@ Json recipeSchema()
         {"type", "object"},
         {"properties",
             {{"$schema", {{"type", "string"}}}, {"modeling", {{"description", "The version"}, {"const", kVersion}}},
-                {"steps", {{"type", "array"}, {"minItems", 1}, {"items", {{"oneOf", names}}}}}}},
+                {"steps", {{"type", "array"}, {"minItems", 1}, {"items", {{"oneOf", names}}}}},
+                {"output", schemaOfOutput()}}},
         {"required", {"modeling", "steps"}}, {"additionalProperties", false}, {"$defs", definitions}};
 }
 

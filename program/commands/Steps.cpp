@@ -34,9 +34,9 @@ namespace {
         try {
             part();
         } catch (Failure const& failure) {
-            throw Failure(failure.code, fmt::format("{}: {}", title, failure.what()), failure.reasons);
+            throw StepFailure(number, {failure.code, fmt::format("{}: {}", title, failure.what()), failure.reasons});
         } catch (FileError const& error) {
-            throw Failure(ExitCode::File, fmt::format("{}: {}", title, error.what()));
+            throw StepFailure(number, {ExitCode::File, fmt::format("{}: {}", title, error.what())});
         }
     }
 
@@ -48,6 +48,16 @@ namespace {
             if (step.kind->gives != GeometryType::None)
                 type = step.kind->gives;
         return type;
+    }
+
+    /// Whether an option of a step after this one names the attribute, which then need not be written.
+    bool isUsedAfter(std::size_t i, std::string const& attribute, std::vector<Step> const& steps)
+    {
+        for (std::size_t later = i + 1; later < steps.size(); ++later)
+            for (OptionDescription const& option : steps[later].options.options)
+                if (std::find(option.given.begin(), option.given.end(), attribute) != option.given.end())
+                    return true;
+        return false;
     }
 
     void requireValidResult(Tessara::Object const& object)
@@ -70,13 +80,8 @@ namespace {
 
         void checkBefore(Output const& out)
         {
-            for (std::size_t i = 0; i != steps_.size(); ++i)
-                inStep(i + 1, steps_[i], [&] { steps_[i].edit->checkOptions(); });
-            requireWritable(out, resultOf(steps_));
-            for (std::size_t i = 0; i != steps_.size(); ++i)
-                if (Edit::NewAttribute const attribute = steps_[i].edit->newAttribute();
-                    !isUsedAfter(i, attribute.name))
-                    inStep(i + 1, steps_[i], [&] { requireAttribute(attribute, out); });
+            requireFit(steps_, out);
+            requirePlace(out);
             for (std::size_t i = 0; i != steps_.size(); ++i)
                 runPart(i, [&] { steps_[i].edit->readFiles(reports_[i]); });
         }
@@ -103,16 +108,6 @@ namespace {
         }
 
     private:
-        /// Whether an option of a later step names the attribute, which then need not be written.
-        bool isUsedAfter(std::size_t i, std::string const& attribute) const
-        {
-            for (std::size_t later = i + 1; later < steps_.size(); ++later)
-                for (OptionDescription const& option : steps_[later].options.options)
-                    if (std::find(option.given.begin(), option.given.end(), attribute) != option.given.end())
-                        return true;
-            return false;
-        }
-
         /// Runs a part of a step that may fail.
         template <class Part> void guard(std::size_t i, Part const& part)
         {
@@ -213,7 +208,8 @@ std::vector<Step> parseSteps(std::string const& text)
 void requireChain(std::vector<Step> const& steps, std::size_t fileCount)
 {
     auto const refuse = [&](std::size_t i, std::string const& why) {
-        throw Failure(ExitCode::CommandLine, fmt::format("{}: {}", titleOf(i + 1, steps[i].kind->help.name), why));
+        throw StepFailure(
+            i + 1, {ExitCode::CommandLine, fmt::format("{}: {}", titleOf(i + 1, steps[i].kind->help.name), why)});
     };
     if (fileCount == 0)
         throw Failure(ExitCode::CommandLine, "run needs at least one input file: modeling run IN... -o OUT");
@@ -231,6 +227,16 @@ void requireChain(std::vector<Step> const& steps, std::size_t fileCount)
     }
     if (fileCount != 1 && !steps[0].kind->takesManyFiles)
         refuse(0, fmt::format("it takes one file, but {} are given; begin with merge to join them", fileCount));
+}
+
+void requireFit(std::vector<Step> const& steps, Output const& out)
+{
+    for (std::size_t i = 0; i != steps.size(); ++i)
+        inStep(i + 1, steps[i], [&] { steps[i].edit->checkOptions(); });
+    requireHolds(out, resultOf(steps));
+    for (std::size_t i = 0; i != steps.size(); ++i)
+        if (Edit::NewAttribute const attribute = steps[i].edit->newAttribute(); !isUsedAfter(i, attribute.name, steps))
+            inStep(i + 1, steps[i], [&] { requireAttribute(attribute, out); });
 }
 
 void runSteps(

@@ -2,6 +2,7 @@
 
 #include "Edit.h"
 #include "shell/CommandLine.h"
+#include "shell/Failure.h"
 
 #include <cstddef>
 #include <memory>
@@ -16,6 +17,18 @@ struct Step {
     std::unique_ptr<Edit> edit;
     CommandDescription options; // as declared, with the given values
     std::string help; // to be printed instead of running anything; mostly empty
+};
+
+/// A failure of a step, which the sentence names.
+class StepFailure : public Failure {
+public:
+    StepFailure(std::size_t number, Failure const& failure)
+        : Failure(failure)
+        , step(number)
+    {
+    }
+
+    std::size_t step; // counted from 1
 };
 
 /// "step 2 (subdivide)"
@@ -36,7 +49,12 @@ Step parseStep(std::vector<std::string> const& words, std::size_t number);
 std::vector<Step> parseSteps(std::string const& text);
 
 /// Refuses steps that cannot follow one another, or do not fit the number of files.
+/// \throws StepFailure, Failure
 void requireChain(std::vector<Step> const& steps, std::size_t fileCount);
+
+/// Refuses steps whose options are wrong whatever the geometry is, or whose result the format of the output cannot hold.
+/// \throws StepFailure, Failure
+void requireFit(std::vector<Step> const& steps, Output const& out);
 
 /// Reads the files, runs the steps and writes the last result. The report gets one part per step.
 void runSteps(

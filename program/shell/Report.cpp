@@ -73,6 +73,7 @@ Report Report::ofStep(std::size_t number, std::string const& name) const
     report.document = {{"step", number}, {"do", name}, {"warnings", Json::array()}};
     report.isJson = isJson;
     report.isQuiet = isQuiet;
+    report.isSilent = isSilent;
     report.isStrict = isStrict;
     report.name_ = fmt::format("step {} ({})", number, name);
     report.isOfStep_ = true;
@@ -88,7 +89,8 @@ void Report::warn(std::string const& sentence)
 void Report::warnOfInput(std::string const& sentence)
 {
     document["warnings"].push_back(sentence);
-    printMessage(fmt::format("modeling: warning: {}", isOfStep_ ? titleOf(sentence) : sentence));
+    if (!isSilent)
+        printMessage(fmt::format("modeling: warning: {}", isOfStep_ ? titleOf(sentence) : sentence));
 }
 
 std::string Report::titleOf(std::string const& what) const

@@ -57,6 +57,7 @@ public:
     std::string text; // what is printed without --json
     bool isJson = false; // standard output is reserved for the document
     bool isQuiet = false; // the text is not printed
+    bool isSilent = false; // warnings are only added to the document
     bool isStrict = false; // warnings about the result have an exit code of their own
     bool hasWarned = false; // about the result
     int exitCode = 0; // if the command does not fail

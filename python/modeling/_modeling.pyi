@@ -1,6 +1,7 @@
 """The part of the package that is written in C++."""
 
 from collections.abc import Iterable, Sequence
+from os import PathLike
 from typing import Any, Optional, TypeVar, Union
 
 import numpy as np
@@ -223,3 +224,33 @@ class threads:
     def __init__(self, count: int) -> None: ...
     def __enter__(self) -> threads: ...
     def __exit__(self, *_: object) -> None: ...
+
+# -- Recipes.
+
+library_version: str
+writable_formats: tuple[str, ...]
+requirements: tuple[str, ...]
+
+class RecipeError(ValueError):
+    step: int
+    key: str
+    line: int
+
+class RunError(RuntimeError):
+    exit_code: int
+    reasons: list[str]
+    report: dict[str, Any]
+
+def check_recipe(text: str, format: str = "") -> dict[str, Any]: ...
+def run_recipe(
+    recipe: str,
+    inputs: Sequence[str | PathLike[str]],
+    output: str | PathLike[str],
+    *,
+    force: bool = False,
+    format: str = "",
+    compress: int = 0,
+    threads: int = 0,
+    lenient: bool = False,
+    require: str = "",
+) -> dict[str, Any]: ...

@@ -19,5 +19,6 @@ void bindHalfEdges(pybind11::module_& module);
 void bindGuide(pybind11::module_& module);
 void bindStitch(pybind11::module_& module);
 void bindThreads(pybind11::module_& module);
+void bindRecipes(pybind11::module_& module); // what `modeling run --recipe` does, without its terminal and signals
 
 }

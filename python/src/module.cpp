@@ -19,4 +19,5 @@ PYBIND11_MODULE(_modeling, module)
     bindHalfEdges(module);
     bindStitch(module);
     bindThreads(module);
+    bindRecipes(module);
 }

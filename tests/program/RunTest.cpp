@@ -188,17 +188,20 @@ TEST_F(Run, RefusesRecipesAndSaysWhere)
     auto const step = [](std::string const& text) {
         return R"({"modeling": 1, "steps": [{"do": "triangulate"}, )" + text + "]}";
     };
+    auto const output = [](std::string const& value) {
+        return R"({"modeling": 1, "steps": [{"do": "triangulate"}], "output": )" + value + "}";
+    };
     Case const cases[] = {
         {"", 3, "recipe.json cannot be read: "},
         {"{\"modeling\": 1,}", 3, "recipe.json cannot be read: parse error at line 1, column 16"},
         {"{\"modeling\": 1e999}", 3, "recipe.json cannot be read: number overflow"},
         {step("{\"do\": \"smooth\", \"do\": \"merge\"}"), 3, "the key \"do\" occurs twice"},
         {std::string(1000, '[') + std::string(1000, ']'), 3, "its values are nested too deeply"},
-        {"[]", 2, "recipe.json: it is no recipe of version 1"},
+        {"[]", 2, "recipe.json: line 1: it is no recipe of version 1"},
         {R"({"modeling": 2, "steps": []})", 2, "it is no recipe of version 1"},
         {R"({"modeling": 1, "steps": []})", 2, "\"steps\" has to be a list of at least one step"},
         {R"({"modeling": 1, "stesp": []})", 2, "there is no key \"stesp\"; did you mean steps?"},
-        {step("[]"), 2, "recipe.json: step 2: it has to be an object"},
+        {step("[]"), 2, "recipe.json: line 1: step 2: it has to be an object"},
         {step(R"({"amount": 1})"), 2, "step 2: \"do\" has to name what to do"},
         {step(R"({"do": "smoothe"})"), 2, "step 2: there is no step \"smoothe\"; did you mean smooth?"},
         {step(R"({"do": "smooth", "amuont": 1})"), 2,
@@ -215,6 +218,20 @@ TEST_F(Run, RefusesRecipesAndSaysWhere)
         {step(R"({"do": "stitch", "template": ["a", "b"], "rotate": 1e300})"), 2, "has to be a whole number"},
         {step(R"({"do": "subdivide"})"), 2, "step 2 (subdivide): subdivide needs one of --tolerance, --relative"},
         {step(R"({"do": "subdivide", "relative": 1, "max-memory": []})"), 2, "has to be a number of bytes or a string"},
+        // lines: of the key, of the step if no key is at fault, of the value that is no step
+        {step("\n{\"do\": \"smooth\",\n\"amuont\": 1\n}\n"), 2,
+            "recipe.json: line 3: step 2 (smooth): there is no key"},
+        {step("\n{\"do\": \"smooth\",\n\"amount\":\n-1}"), 2, "recipe.json: line 3: step 2 (smooth): --amount"},
+        {step("{\"do\": \"merge\"},\n\n{\"do\": \"subdivide\"\n}\n"), 2, "recipe.json: line 3: step 3 (subdivide): "},
+        {step("\n17\n"), 2, "recipe.json: line 2: step 2: it has to be an object"},
+        {step("{\"do\":\n\"smooth\",\n\"do\": 1}"), 3,
+            "recipe.json cannot be read: line 3: the key \"do\" occurs twice"},
+        {"{\"modeling\": 1,\n\"stesp\": 1}", 2, "recipe.json: line 2: there is no key \"stesp\""},
+        {output("\n17"), 2, "line 1: \"output\" has to be an object"},
+        {output("{\n\"format\": \"off\"}"), 2, "line 2: \"format\" has to be one of glb, h5, "},
+        {output(R"({"compress": 10})"), 2, "\"compress\" has to be a whole number from 1 to 9"},
+        {output(R"({"compress": 1, "format": "ply"})"), 2, "\"compress\" applies to HDF5 files only"},
+        {output(R"({"formt": "ply"})"), 2, "there is no key \"formt\"; did you mean format?"},
     };
     for (Case const& c : cases) {
         store(folder / "recipe.json", c.recipe);
