@@ -1,5 +1,7 @@
 #include "GeometryBuilder.h"
 
+#include "JoinedArrays.h"
+
 #include <TessaraGeometry/Names.h>
 
 #include <cstdio>
@@ -89,11 +91,16 @@ bool isReservedName(std::string_view name)
     return std::find(std::begin(kReserved), std::end(kReserved), name) != std::end(kReserved);
 }
 
-void GeometryBuilder::expectPoints(std::uint64_t count)
+void GeometryBuilder::expectOtherPoints(std::uint64_t count)
 {
     if (count >= kMostElements)
         scanner_.refuse("there are more points than a mesh can hold");
     pointCount_ = count;
+}
+
+void GeometryBuilder::expectPoints(std::uint64_t count)
+{
+    expectOtherPoints(count);
     raw_.positions.reserve(count);
     if (movesPositions())
         widePositions_.reserve(count);
@@ -113,16 +120,42 @@ void GeometryBuilder::setFaces(Orvan::Array<unsigned int> faceVertex, Orvan::Arr
     raw_.faceOffset = std::move(faceOffset);
 }
 
-void GeometryBuilder::append(GeometryBuilder&& next)
+void GeometryBuilder::join(std::vector<GeometryBuilder*> const& parts)
 {
-    if (raw_.faceVertex.size + next.raw_.faceVertex.size >= kMostElements)
+    std::uint64_t cornerCount = 0;
+    for (GeometryBuilder const* const part : parts) {
+        cornerCount += part->cornerCount();
+        largestLoss_ = std::max(largestLoss_, part->largestLoss_);
+        hasUnusableElements_ = hasUnusableElements_ || part->hasUnusableElements_;
+    }
+    if (cornerCount >= kMostElements)
         scanner_.refuse("there are more face corners than a mesh can hold");
-    appendAll(next.raw_.positions, raw_.positions);
-    appendAll(next.widePositions_, widePositions_);
-    appendAll(next.raw_.faceVertex, raw_.faceVertex);
-    appendOffsets(next.raw_.faceOffset, raw_.faceOffset);
-    largestLoss_ = std::max(largestLoss_, next.largestLoss_);
-    hasUnusableElements_ = hasUnusableElements_ || next.hasUnusableElements_;
+    auto const join = [&](auto RawGeometry::*array) {
+        return joinedArray(
+            parts, [=](GeometryBuilder & part) -> auto& { return part.raw_.*array; });
+    };
+    raw_.positions = join(&RawGeometry::positions);
+    raw_.faceVertex = join(&RawGeometry::faceVertex);
+    raw_.faceOffset =
+        joinedOffsets(parts, [](GeometryBuilder& part) -> Orvan::Array<unsigned int>& { return part.raw_.faceOffset; });
+    widePositions_ = joinedArray(parts, &GeometryBuilder::widePositions_);
+    pointCount_ = std::max(pointCount_, raw_.positions.size);
+}
+
+void GeometryBuilder::keepNewPoints(Orvan::Array<unsigned int> const& numbers, unsigned int first, double largestLoss)
+{
+    auto const keep = [&](auto& values) {
+        std::uint64_t keptCount = 0;
+        for (std::uint64_t point = 0; point < values.size; ++point)
+            if (numbers[point] >= first)
+                values[keptCount++] = values[point];
+        values.resize(keptCount);
+    };
+    keep(raw_.positions);
+    keep(widePositions_);
+    for (unsigned int& corner : raw_.faceVertex)
+        corner = numbers[corner];
+    largestLoss_ = largestLoss;
 }
 
 void GeometryBuilder::makeStrands(Orvan::Array<unsigned int> offsets, Orvan::Array<unsigned int> const& points)

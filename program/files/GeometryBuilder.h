@@ -51,23 +51,6 @@ template <class T> Orvan::Array<T> gathered(Orvan::Array<T> const& values, Orvan
     return result;
 }
 
-template <class T> void appendAll(Orvan::Array<T> const& added, Orvan::Array<T>& values)
-{
-    std::uint64_t const size = values.size;
-    values.resize(size + added.size, Orvan::kUninitialized);
-    std::copy(added.begin(), added.end(), values.begin() + size);
-}
-
-/// Appends the offsets of further runs of elements, which begin at 0, as they follow the runs before.
-inline void appendOffsets(Orvan::Array<unsigned int> const& added, Orvan::Array<unsigned int>& offsets)
-{
-    unsigned int const base = offsets[offsets.size - 1];
-    std::uint64_t const size = offsets.size;
-    offsets.resize(size + added.size - 1, Orvan::kUninitialized);
-    std::transform(
-        added.begin() + 1, added.end(), offsets.begin() + size, [=](unsigned int offset) { return base + offset; });
-}
-
 /// The memory for the values of a new property, to be filled in.
 struct PropertyValues {
     std::byte* data;
@@ -93,8 +76,8 @@ public:
     /// For counts that are known and checked against the size of the file. Corners may then refer to points that come
     /// later.
     void expectPoints(std::uint64_t count);
-    /// The same without room for them, if other builders read the rest of the file.
-    void expectOtherPoints(std::uint64_t count) { pointCount_ = count; }
+    /// The same without room for them, if other builders read them.
+    void expectOtherPoints(std::uint64_t count);
     void expectFaces(std::uint64_t count) { raw_.faceOffset.reserve(count + 1); }
     void expectCorners(std::uint64_t count) { raw_.faceVertex.reserve(count); }
 
@@ -137,8 +120,14 @@ public:
     /// Adds all faces at once instead.
     /// \pre  the faces have at least three corners each, fewer than `kMostElements` in total, and refer to points
     void setFaces(Orvan::Array<unsigned int> faceVertex, Orvan::Array<unsigned int> faceOffset);
-    /// Adds the points and faces of a builder that has read the next part of the file. Properties are not moved.
-    void append(GeometryBuilder&& next);
+    /// Takes the points and faces of builders that have read consecutive parts of the file, all of them. Properties are
+    /// not taken.
+    void join(std::vector<GeometryBuilder*> const& parts);
+    /// Removes all points whose new number is below `first`, and gives the corners the new numbers of their points.
+    /// \param numbers      ascend from `first` on for the points that are kept
+    /// \param largestLoss  of a coordinate of these points
+    void keepNewPoints(Orvan::Array<unsigned int> const& numbers, unsigned int first, double largestLoss);
+
     /// The number of points that corners may refer to.
     std::uint64_t expectedPointCount() const { return pointCount_; }
 
@@ -146,7 +135,13 @@ public:
     /// last. Properties of points that are added later refer to the new points.
     void makeStrands(Orvan::Array<unsigned int> offsets, Orvan::Array<unsigned int> const& points);
 
+    /// Whether there are elements that `finish` leaves out, because reading is lenient.
+    bool hasUnusableElements() const { return hasUnusableElements_; }
+
     std::uint64_t pointCount() const { return raw_.positions.size; }
+    Orvan::Array<float3> const& positions() const { return raw_.positions; }
+    /// In double precision; only if positions are translated.
+    Orvan::Array<Tessara::Math::double3> const& widePositions() const { return widePositions_; }
     std::uint64_t cornerCount() const { return raw_.faceVertex.size; }
     std::uint64_t faceCount() const { return raw_.faceOffset.size - 1; }
     Orvan::Array<unsigned int> const& faceOffset() const { return raw_.faceOffset; }

@@ -13,8 +13,11 @@ namespace ModelingProgram {
 
 namespace {
 
+    using Reader = GeometryFile (*)(InputFile const&, ReadOptions const&);
+    constexpr Reader kReadObj = readObj, kReadPly = readPly, kReadStl = readStl, kReadXyz = readXyz;
+
     struct Format {
-        GeometryFile (*read)(InputFile const&, ReadOptions const&);
+        Reader read;
         void (*write)(WritableGeometry&, std::filesystem::path const&);
     };
 
@@ -71,10 +74,9 @@ GeometryFile readGeometryFile(std::filesystem::path const& file, ReadOptions con
     if (!format.read)
         throw FileError(file.string()
             + " cannot be read: its extension is none of .obj, .ply, .stl, .off, .xyz, .glb, .gltf, .h5 and .hdf5");
-    bool const readsParts = format.read == static_cast<decltype(format.read)>(readPly) || format.read == readStl;
+    bool const readsParts = format.read == kReadPly || format.read == kReadStl;
     InputFile const input(file, readsParts ? InputFile::Loading::Beginning : InputFile::Loading::Whole);
-    if (input.size == 0 && format.read != static_cast<decltype(format.read)>(readObj)
-        && format.read != readXyz) // the others have headers
+    if (input.size == 0 && format.read != kReadObj && format.read != kReadXyz) // the others have headers
         throw FileError(file.string() + " cannot be read: it is empty");
     return format.read(input, options);
 }

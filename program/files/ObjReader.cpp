@@ -1,11 +1,9 @@
 #include "Readers.h"
+#include "TextParts.h"
 #include "Texts.h"
-
-#include "frame/ParallelFor.h"
 
 #include <TessaraGeometry/Names.h>
 
-#include <exception>
 #include <unordered_map>
 
 namespace ModelingProgram {
@@ -171,6 +169,7 @@ namespace {
                 if (!isGeometry(keyword) && isName(keyword))
                     textOfName(keyword, counter_); // which may end in a later line
             }
+            counter_.countWorkLeft();
         }
 
         /// \param before  what precedes this part
@@ -178,16 +177,25 @@ namespace {
         {
             before_ = before;
             total_ = total;
+            builder.expectPoints(counts.points);
             builder.expectOtherPoints(total.points);
             builder.expectFaces(counts.faces);
             textures.reserve(counts.textures);
             normals.reserve(counts.normals);
             for (; !in_.atEnd(); in_.nextLine())
                 readStatement();
+            in_.countWorkLeft();
             // Indices have been checked against what was counted.
             if (builder.pointCount() != counts.points || textures.size != counts.textures
                 || normals.size != counts.normals)
                 in_.refuse("the file has other numbers of v, vt and vn than were counted first");
+        }
+
+        /// Makes points white up to a number of points.
+        void fillColors(std::uint64_t count)
+        {
+            while (colors.size < count)
+                colors.append(kWhite);
         }
 
         struct Naming {
@@ -211,7 +219,7 @@ namespace {
         Orvan::Array<unsigned int> normalOf;
         Orvan::Array<unsigned int> linePoints;
         Orvan::Array<unsigned int> lineOffset{0u};
-        std::uint64_t uncoloredPoints = 0; // among `colors`
+        std::uint64_t coloredPoints = 0;
         std::uint64_t pointElements = 0;
         std::uint64_t weightedPoints = 0;
         std::uint64_t deepTextures = 0;
@@ -280,14 +288,7 @@ namespace {
             float3 const color{first, green, in_.number<float>("a color")};
             fillColors(builder.pointCount() - 1);
             colors.append(color);
-        }
-
-        void fillColors(std::uint64_t count)
-        {
-            while (colors.size < count) {
-                colors.append(kWhite);
-                ++uncoloredPoints;
-            }
+            ++coloredPoints;
         }
 
         void readTexture()
@@ -366,10 +367,8 @@ namespace {
             : file_(file)
             , in_(file, 0, TextScanner::Syntax::CommentsAndJoinedLines)
             , builder_(in_, options)
+            , parts_(file, TextScanner::partsOf(file, 0, partBytes), options)
         {
-            std::vector<std::size_t> const ends = TextScanner::partsOf(file, partBytes);
-            for (std::size_t part = 0; part + 1 < ends.size(); ++part)
-                parts_.push_back(std::make_unique<ObjPart>(file, ends[part], ends[part + 1], options));
         }
 
         GeometryFile read()
@@ -390,27 +389,13 @@ namespace {
         }
 
     private:
-        template <class Visit> void forEachPart(Visit const& visit)
-        {
-            // Each part has its own results.
-            Modeling::parallelFor(tbb::blocked_range<std::size_t>(0, parts_.size(), Modeling::kCoarseGrain),
-                [&](tbb::blocked_range<std::size_t> const& parts) {
-                    for (std::size_t part = parts.begin(); part != parts.end(); ++part)
-                        visit(part);
-                });
-        }
-
         void countStatements()
         {
-            forEachPart([&](std::size_t part) { parts_[part]->count(); });
-            for (auto const& part : parts_)
-                total_ += part->counts;
+            forEachPart(parts_.count(), [&](std::size_t part) { parts_[part].count(); });
+            total_ = parts_.sum(&ObjPart::counts);
             if (std::max({total_.textures, total_.normals, total_.faces}) >= GeometryBuilder::kMostElements)
                 in_.refuse("there are more elements than a mesh can hold");
-            builder_.expectPoints(total_.points);
-            builder_.expectFaces(total_.faces);
-            textures_.reserve(total_.textures);
-            normals_.reserve(total_.normals);
+            builder_.expectOtherPoints(total_.points);
         }
 
         /// A file without points is empty geometry, unless it is not an OBJ file at all.
@@ -423,72 +408,52 @@ namespace {
                 scanner.refuse(TextScanner::quoted(keyword) + " is not a keyword of OBJ files");
         }
 
-        /// If several parts fail, the first one tells what is wrong.
         void readParts()
         {
-            std::vector<ObjCounts> before(parts_.size());
-            for (std::size_t part = 1; part < parts_.size(); ++part)
-                (before[part] = before[part - 1]) += parts_[part - 1]->counts;
-            std::vector<std::exception_ptr> failures(parts_.size());
-            forEachPart([&](std::size_t part) {
-                try {
-                    parts_[part]->read(before[part], total_);
-                } catch (...) {
-                    failures[part] = std::current_exception();
-                }
+            std::vector<ObjCounts> before(parts_.count());
+            for (std::size_t part = 1; part < parts_.count(); ++part)
+                (before[part] = before[part - 1]) += parts_[part - 1].counts;
+            parts_.read([&](ObjPart& part, std::size_t index) {
+                part.read(before[index], total_);
+                return true;
             });
-            for (std::exception_ptr const& failure : failures)
-                if (failure)
-                    std::rethrow_exception(failure);
         }
 
         void joinParts()
         {
-            std::uint64_t cornerCount = 0, linePointCount = 0;
-            for (auto const& part : parts_) {
-                cornerCount += part->builder.cornerCount();
+            std::uint64_t linePointCount = 0;
+            for (ObjPart const* const part : parts_.pointers())
                 linePointCount += part->linePoints.size;
-            }
             if (linePointCount >= GeometryBuilder::kMostElements)
                 in_.refuse("the polylines have more points than a strand set can hold");
-            builder_.expectCorners(cornerCount);
-            textureOf_.reserve(total_.textures != 0 ? cornerCount : 0);
-            normalOf_.reserve(total_.normals != 0 ? cornerCount : 0);
-            for (std::unique_ptr<ObjPart>& part : parts_) {
-                join(*part);
-                part.reset();
+            parts_.releaseText();
+            std::uint64_t faceCount = 0;
+            for (ObjPart const* const part : parts_.pointers()) {
+                for (ObjPart::Naming const& naming : part->namings)
+                    names_[naming.names].begin(naming.text, faceCount + naming.face);
+                faceCount += part->counts.faces;
+                libraries_.add(part->libraries);
+                unknownKeywords_.add(part->unknownKeywords);
             }
+            parts_.joinGeometry(builder_);
+            textures_ = parts_.joined(&ObjPart::textures);
+            normals_ = parts_.joined(&ObjPart::normals);
+            textureOf_ = parts_.joined(&ObjPart::textureOf);
+            normalOf_ = parts_.joined(&ObjPart::normalOf);
+            linePoints_ = parts_.joined(&ObjPart::linePoints);
+            lineOffset_ = joinedOffsets(parts_.pointers(), &ObjPart::lineOffset);
         }
 
-        void join(ObjPart& part)
+        /// If a point has a color, all get one.
+        void joinColors()
         {
-            for (ObjPart::Naming const& naming : part.namings)
-                names_[naming.names].begin(naming.text, builder_.faceCount() + naming.face);
-            if (!part.colors.empty()) {
-                fillColors(builder_.pointCount());
-                appendAll(part.colors, colors_);
-            }
-            builder_.append(std::move(part.builder));
-            appendAll(part.textures, textures_);
-            appendAll(part.normals, normals_);
-            appendAll(part.textureOf, textureOf_);
-            appendAll(part.normalOf, normalOf_);
-            appendAll(part.linePoints, linePoints_);
-            appendOffsets(part.lineOffset, lineOffset_);
-            uncoloredPoints_ += part.uncoloredPoints;
-            pointElements_ += part.pointElements;
-            weightedPoints_ += part.weightedPoints;
-            deepTextures_ += part.deepTextures;
-            libraries_.add(part.libraries);
-            unknownKeywords_.add(part.unknownKeywords);
-        }
-
-        void fillColors(std::uint64_t count)
-        {
-            while (colors_.size < count) {
-                colors_.append(kWhite);
-                ++uncoloredPoints_;
-            }
+            std::uint64_t const coloredPoints = parts_.sum(&ObjPart::coloredPoints);
+            if (coloredPoints == 0)
+                return;
+            forEachPart(parts_.count(), [&](std::size_t part) { parts_[part].fillColors(parts_[part].counts.points); });
+            colors_ = parts_.joined(&ObjPart::colors);
+            if (coloredPoints != total_.points)
+                builder_.note(std::to_string(total_.points - coloredPoints) + " points have no color and become white");
         }
 
         template <class T>
@@ -515,10 +480,7 @@ namespace {
 
         void addPointValues()
         {
-            if (!colors_.empty())
-                fillColors(total_.points);
-            if (uncoloredPoints_ != 0)
-                builder_.note(std::to_string(uncoloredPoints_) + " points have no color and become white");
+            joinColors();
             // Without faces nothing refers to normals, but writers of point clouds write one per point.
             if (builder_.faceCount() != 0 || normals_.size != total_.points) {
                 noteUnused("normals (vn)", normalOf_, normals_.size);
@@ -608,13 +570,13 @@ namespace {
 
         void noteLeftOut()
         {
-            auto const noteCount = [&](std::uint64_t count, char const* what) {
-                if (count != 0)
+            auto const noteCount = [&](std::uint64_t ObjPart::*number, char const* what) {
+                if (std::uint64_t const count = parts_.sum(number))
                     builder_.note(std::to_string(count) + what);
             };
-            noteCount(pointElements_, " lines of point elements (p) are left out: every point is kept anyway");
-            noteCount(weightedPoints_, " weights of points are left out");
-            noteCount(deepTextures_, " third texture coordinates are left out");
+            noteCount(&ObjPart::pointElements, " lines of point elements (p) are left out: every point is kept anyway");
+            noteCount(&ObjPart::weightedPoints, " weights of points are left out");
+            noteCount(&ObjPart::deepTextures, " third texture coordinates are left out");
             if (!unknownKeywords_.empty())
                 builder_.note("lines that begin with " + unknownKeywords_.list() + " are left out");
         }
@@ -622,7 +584,7 @@ namespace {
         InputFile const& file_;
         TextScanner in_;
         GeometryBuilder builder_;
-        std::vector<std::unique_ptr<ObjPart>> parts_;
+        TextParts<ObjPart> parts_;
         ObjCounts total_;
         Orvan::Array<float2> textures_;
         Orvan::Array<float3> normals_;
@@ -631,10 +593,6 @@ namespace {
         Orvan::Array<unsigned int> normalOf_;
         Orvan::Array<unsigned int> linePoints_;
         Orvan::Array<unsigned int> lineOffset_{0u};
-        std::uint64_t uncoloredPoints_ = 0;
-        std::uint64_t pointElements_ = 0;
-        std::uint64_t weightedPoints_ = 0;
-        std::uint64_t deepTextures_ = 0;
         NameRuns names_[std::size(kNames)] = {
             NameRuns(kNames[0]), NameRuns(kNames[1]), NameRuns(kNames[2]), NameRuns(kNames[3])};
         Texts libraries_;
@@ -645,12 +603,12 @@ namespace {
 
 GeometryFile readObj(InputFile const& file, ReadOptions const& options)
 {
-    constexpr std::size_t kPartBytes = std::size_t{1} << 21; // milliseconds of work
-    return readObj(file, options, kPartBytes);
+    return readObj(file, options, kTextPartBytes);
 }
 
 GeometryFile readObj(InputFile const& file, ReadOptions const& options, std::size_t partBytes)
 {
+    file.load();
     return ObjReader(file, options, partBytes).read();
 }
 

@@ -63,7 +63,7 @@ struct PlyProperty {
     std::byte* target = nullptr; // of the next value
     std::size_t stride = 0;
     Orvan::Array<unsigned int> lengths; // of lists; one entry per element
-    std::vector<std::byte> values; // of all lists
+    Orvan::Array<std::byte> values; // of all lists
     std::optional<PlyEqualLists> equalLists; // instead of the two, if they are read later
 };
 

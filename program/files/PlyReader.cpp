@@ -1,7 +1,8 @@
 #include "PlyColumns.h"
-#include "PlyHeader.h"
+#include "PlyElements.h"
 #include "PlyRecords.h"
 #include "Readers.h"
+#include "TextParts.h"
 
 #include <TessaraGeometry/Names.h>
 
@@ -13,33 +14,115 @@ using namespace Tessara::Geometry;
 
 namespace {
 
+    /// Whether each element has a line of a text file.
+    bool hasLines(PlyElement const& element)
+    {
+        return !element.properties.empty();
+    }
+
+    /// Some of the lines after the header of a text file. Values of properties go straight to their targets, those of
+    /// lists are joined later.
+    class PlyPart : public LinePart {
+    public:
+        PlyPart(InputFile const& file, std::size_t begin, std::size_t end, PlyHeader const& header,
+            GeometryBuilder const& whole)
+            : LinePart(file, begin, end, TextScanner::Syntax::Plain)
+            , builder(in, whole.options())
+            , elements(header.elements)
+            , pointCount_(whole.expectedPointCount())
+        {
+        }
+
+        void read(std::uint64_t first, std::uint64_t end)
+        {
+            std::uint64_t firstLine = 0; // of the elements of a kind
+            for (PlyElement& element : elements) {
+                if (!hasLines(element))
+                    continue;
+                auto const indexOf = [&](std::uint64_t line) {
+                    return std::clamp(line, firstLine, firstLine + element.count) - firstLine;
+                };
+                readElements(element, indexOf(first), indexOf(end));
+                firstLine += element.count;
+            }
+        }
+
+        GeometryBuilder builder;
+        std::vector<PlyElement> elements;
+
+    private:
+        void readElements(PlyElement& element, std::uint64_t first, std::uint64_t end)
+        {
+            for (PlyProperty& property : element.properties)
+                if (property.use == PlyProperty::Use::Value)
+                    property.target += first * property.stride;
+            if (element.name == "vertex")
+                builder.expectPoints(end - first);
+            else if (element.name == "face")
+                builder.expectFaces(end - first);
+            builder.expectOtherPoints(pointCount_);
+            PlyElementReader(in, builder).read(element, first, end);
+        }
+
+        std::uint64_t pointCount_;
+    };
+
     /// Reads the elements after a header, with a scanner for their encoding.
     template <class In> class PlyReader {
     public:
-        PlyReader(PlyHeader& header, InputFile const& file, In& in, ReadOptions const& options, PlyPath path)
+        PlyReader(PlyHeader& header, InputFile const& file, In& in, ReadOptions const& options)
             : header_(header)
             , file_(file)
             , in_(in)
-            , path_(path)
             , builder_(in, options)
         {
         }
 
-        GeometryFile read(char const* format)
+        /// \param readElements  `void ()`, reads all elements with one of the functions below
+        template <class ReadElements> GeometryFile read(char const* format, ReadElements const& readElements)
         {
             for (std::string const& file : header_.textureFiles)
                 builder_.note("the name of the texture file " + TextScanner::quoted(file) + " is left out");
             for (PlyElement& element : header_.elements)
                 prepare(element);
-            for (PlyElement& element : header_.elements)
-                if (!element.properties.empty())
-                    readElements(element);
-            if constexpr (kIsText)
-                in_.skipEmptyLines();
+            readElements();
             builder_.noteBytesLeft();
             for (PlyElement& element : header_.elements)
                 addLists(element);
             return std::move(builder_).finish(format);
+        }
+
+        void readRecords(PlyPath path)
+        {
+            for (PlyElement& element : header_.elements) {
+                if (element.properties.empty())
+                    continue;
+                std::size_t const begin = in_.position();
+                auto const end = path == PlyPath::Fastest
+                    ? readPlyRecords(element, begin, in_.swapsBytes(), file_, builder_)
+                    : std::nullopt;
+                if (end) {
+                    in_.skip(*end - begin);
+                    continue;
+                }
+                file_.load();
+                PlyElementReader(in_, builder_).read(element, 0, element.count);
+            }
+        }
+
+        void readLines(std::size_t partBytes)
+        {
+            std::uint64_t lineCount = 0;
+            for (PlyElement const& element : header_.elements)
+                lineCount += hasLines(element) ? element.count : 0;
+            TextParts<PlyPart> parts(file_, TextScanner::partsOf(file_, in_.position(), partBytes), header_, builder_);
+            in_.skipTo(ModelingProgram::readLines(parts, lineCount));
+            in_.skipEmptyLines();
+            parts.releaseText();
+            parts.joinGeometry(builder_);
+            for (std::size_t element = 0; element != header_.elements.size(); ++element)
+                for (std::size_t property = 0; property != header_.elements[element].properties.size(); ++property)
+                    joinLists(parts, element, property);
         }
 
     private:
@@ -57,10 +140,14 @@ namespace {
                 in_.beginElement(element.name.c_str(), 0);
             if (element.name == "vertex") {
                 preparePositions(element);
-                builder_.expectPoints(element.count);
+                if constexpr (kIsText)
+                    builder_.expectOtherPoints(element.count);
+                else
+                    builder_.expectPoints(element.count);
             } else if (element.name == "face") {
                 prepareIndices(element);
-                builder_.expectFaces(element.count);
+                if constexpr (!kIsText)
+                    builder_.expectFaces(element.count);
             } else {
                 builder_.note(
                     "the elements \"" + element.name + "\" are left out (" + std::to_string(element.count) + ")");
@@ -142,85 +229,17 @@ namespace {
             });
         }
 
-        void readElements(PlyElement& element)
+        void joinLists(TextParts<PlyPart> const& parts, std::size_t element, std::size_t property)
         {
-            if constexpr (!kIsText) {
-                if (path_ == PlyPath::Fastest) {
-                    std::size_t const begin = in_.position();
-                    if (auto const end = readPlyRecords(element, begin, in_.swapsBytes(), file_, builder_)) {
-                        in_.skip(*end - begin);
-                        return;
-                    }
-                }
-            }
-            file_.load();
-            for (std::uint64_t index = 0; index < element.count; ++index)
-                readElement(element, index);
-        }
-
-        void readElement(PlyElement& element, std::uint64_t index)
-        {
-            in_.beginElement(element.name.c_str(), index);
-            for (PlyProperty& property : element.properties) {
-                withPlyScalar(property.type, [&]<class T>(std::type_identity<T>) {
-                    if (property.lengthType)
-                        readList<T>(property);
-                    else
-                        readValue<T>(property);
-                });
-            }
-            if (element.name == "vertex")
-                builder_.addPoint(position_[0], position_[1], position_[2]);
-            else if (element.name == "face")
-                builder_.endFace();
-            in_.endElement();
-        }
-
-        template <class T> void readValue(PlyProperty& property)
-        {
-            if constexpr (kIsText && std::is_floating_point_v<T>) {
-                if (property.use == Use::Position) {
-                    position_[property.axis] = in_.coordinate(property.name.c_str());
-                    return;
-                }
-            }
-            T const value = in_.template number<T>(property.name.c_str());
-            if (property.use == Use::Position) {
-                // Beyond the range of float it becomes infinite, which the builder refuses or leaves out.
-                position_[property.axis] = coordinateOf(value);
-            } else if (property.use == Use::Value) {
-                std::memcpy(property.target, &value, sizeof(T));
-                property.target += property.stride;
-            }
-        }
-
-        template <class T> void readList(PlyProperty& property)
-        {
-            std::uint64_t const length = readLength(property);
-            in_.requirePossible(length, "values of a list", kIsText ? 2 : sizeof(T));
-            if (property.use == Use::List)
-                property.lengths.append(static_cast<unsigned int>(length));
-            for (std::uint64_t i = 0; i < length; ++i) {
-                T const value = in_.template number<T>(property.name.c_str());
-                if constexpr (std::is_integral_v<T>) {
-                    if (property.use == Use::Indices)
-                        builder_.addCorner(value);
-                }
-                if (property.use == Use::List) {
-                    auto const* const bytes = reinterpret_cast<std::byte const*>(&value);
-                    property.values.insert(property.values.end(), bytes, bytes + sizeof(T));
-                }
-            }
-        }
-
-        std::uint64_t readLength(PlyProperty const& property)
-        {
-            return withPlyScalar(*property.lengthType, [&]<class T>(std::type_identity<T>) {
-                T const length = in_.template number<T>(property.name.c_str());
-                if (length < 0)
-                    in_.refuse("the list " + TextScanner::quoted(property.name) + " has a negative length");
-                return static_cast<std::uint64_t>(length);
-            });
+            PlyProperty& whole = header_.elements[element].properties[property];
+            auto const join = [&](auto PlyProperty::*array) {
+                whole.*array = joinedArray(
+                    parts.pointers(), [=](PlyPart & part) -> auto& {
+                        return part.elements[element].properties[property].*array;
+                    });
+            };
+            join(&PlyProperty::lengths);
+            join(&PlyProperty::values);
         }
 
         void addLists(PlyElement const& element)
@@ -269,16 +288,14 @@ namespace {
             if (target && property.equalLists)
                 copyEqualLists(property, file_, target->data);
             else if (target)
-                std::memcpy(target->data, property.values.data(), property.values.size());
+                std::copy(property.values.begin(), property.values.end(), target->data);
             return target.has_value();
         }
 
         PlyHeader& header_;
         InputFile const& file_;
         In& in_;
-        PlyPath path_;
         GeometryBuilder builder_;
-        Coordinate position_[3] = {};
     };
 
     /// Whether the part of the file that has been loaded reaches beyond the header.
@@ -294,10 +311,10 @@ namespace {
 
 GeometryFile readPly(InputFile const& file, ReadOptions const& options)
 {
-    return readPly(file, options, PlyPath::Fastest);
+    return readPly(file, options, PlyPath::Fastest, kTextPartBytes);
 }
 
-GeometryFile readPly(InputFile const& file, ReadOptions const& options, PlyPath path)
+GeometryFile readPly(InputFile const& file, ReadOptions const& options, PlyPath path, std::size_t partBytes)
 {
     if (!isHeaderLoaded(file))
         file.load();
@@ -305,12 +322,14 @@ GeometryFile readPly(InputFile const& file, ReadOptions const& options, PlyPath 
     PlyHeader header = readPlyHeader(text);
     if (header.encoding == PlyEncoding::Text) {
         file.load();
-        return PlyReader(header, file, text, options, path).read("PLY (ascii)");
+        PlyReader reader(header, file, text, options);
+        return reader.read("PLY (ascii)", [&] { reader.readLines(partBytes); });
     }
     bool const isLittle = header.encoding == PlyEncoding::LittleEndian;
     BinaryScanner binary(file, text.position(), isLittle != (std::endian::native == std::endian::little));
-    return PlyReader(header, file, binary, options, path)
-        .read(isLittle ? "PLY (binary, little endian)" : "PLY (binary, big endian)");
+    PlyReader reader(header, file, binary, options);
+    return reader.read(
+        isLittle ? "PLY (binary, little endian)" : "PLY (binary, big endian)", [&] { reader.readRecords(path); });
 }
 
 }

@@ -9,6 +9,7 @@
 #include <cerrno>
 
 #include <fcntl.h>
+#include <sys/mman.h>
 #include <unistd.h>
 
 namespace ModelingProgram {
@@ -83,6 +84,17 @@ void InputFile::load() const
     loadTo(size);
 }
 
+void InputFile::unload() const
+{
+    // Scanners keep their positions: the addresses remain valid, only the pages are given back.
+    auto const page = static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
+    auto const address = reinterpret_cast<std::uintptr_t>(bytes.get());
+    std::uintptr_t const first = (address + page - 1) / page * page, end = (address + loadedSize_) / page * page;
+    if (first < end)
+        ::madvise(bytes.get() + (first - address), end - first, MADV_DONTNEED);
+    loadedSize_ = 0;
+}
+
 void InputFile::loadTo(std::size_t end) const
 {
     constexpr std::size_t kPartBytes = std::size_t{1} << 22;
@@ -143,11 +155,11 @@ Coordinate TextScanner::decimalCoordinate(std::string_view digits, double value)
     return {value, std::abs(value - static_cast<double>(rounded)) > leastReportedLoss(digits)};
 }
 
-std::vector<std::size_t> TextScanner::partsOf(InputFile const& file, std::size_t partBytes)
+std::vector<std::size_t> TextScanner::partsOf(InputFile const& file, std::size_t begin, std::size_t partBytes)
 {
     std::string_view const text(file.bytes.get(), file.size);
-    std::vector<std::size_t> parts{0};
-    for (std::size_t at = partBytes; at < text.size();) {
+    std::vector<std::size_t> parts{begin};
+    for (std::size_t at = begin + partBytes; at < text.size();) {
         std::size_t const newline = text.find('\n', at);
         if (newline == std::string_view::npos)
             break;

@@ -30,6 +30,8 @@ struct InputFile {
     explicit InputFile(std::filesystem::path const& file, Loading loading = Loading::Whole);
     /// Reads the rest of the file, if only its beginning has been read. Scanners need the whole file.
     void load() const;
+    /// Gives back the memory of what has been read, which scanners must not read again unless it is loaded again.
+    void unload() const;
 
     /// Null if they have not been loaded.
     char const* loadedBytes(std::size_t offset, std::size_t count) const
@@ -113,6 +115,8 @@ public:
     /// Reading a file counts as its bytes in `workMeter`: half of them when they are loaded, and half when they are
     /// scanned. A reader that scans them twice sets 4 for both scanners.
     void setWorkShare(std::size_t divisor) { workShare_ = divisor; }
+    /// Counts what has been scanned since the last chunk of work.
+    void countWorkLeft() { countChunk(); }
 
     std::size_t position() const { return static_cast<std::size_t>(at_ - file_.bytes.get()); }
     std::size_t remaining() const { return static_cast<std::size_t>(end_ - at_); }
@@ -216,11 +220,20 @@ public:
     }
 
     void skipAll() { at_ = end_; }
+    void skipTo(std::size_t position) { at_ = file_.bytes.get() + position; }
+
+    /// Advances to the end. \return the number of lines that are not empty
+    std::uint64_t countLines()
+    {
+        std::uint64_t count = 0;
+        for (; !atEnd(); at_ = lineEnd())
+            count += !atLineEnd();
+        return count;
+    }
 
     void nextLine()
     {
-        auto const* const newline = static_cast<char const*>(std::memchr(at_, '\n', remaining()));
-        at_ = newline ? newline + 1 : end_;
+        at_ = lineEnd();
         countWork();
     }
 
@@ -334,9 +347,9 @@ public:
     /// Advances past the separator.
     Separator separator();
 
-    /// Cuts a file into parts of about `partBytes` bytes, so that no line, and no line joined to the next one, is in two of
-    /// them. \return where each part begins, and the end of the file
-    static std::vector<std::size_t> partsOf(InputFile const& file, std::size_t partBytes);
+    /// Cuts a file from `begin` on into parts of about `partBytes` bytes, so that no line, and no line joined to the next
+    /// one, is in two of them. \return where each part begins, and the end of the file
+    static std::vector<std::size_t> partsOf(InputFile const& file, std::size_t begin, std::size_t partBytes);
 
     bool atTokenEnd() const { return isTokenEnd(at_); }
 
@@ -360,6 +373,13 @@ private:
             refuse("the text is UTF-16; UTF-8 and ASCII are read");
         if (text.starts_with("\xEF\xBB\xBF"))
             at_ += 3;
+    }
+
+    /// The start of the next line.
+    char const* lineEnd() const
+    {
+        auto const* const newline = static_cast<char const*>(std::memchr(at_, '\n', remaining()));
+        return newline ? newline + 1 : end_;
     }
 
     static bool isBlank(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\v' || c == '\f'; }

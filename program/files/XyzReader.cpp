@@ -1,4 +1,5 @@
 #include "Readers.h"
+#include "TextParts.h"
 
 #include <TessaraGeometry/Names.h>
 
@@ -28,27 +29,138 @@ namespace {
         return std::find(words.begin(), words.end(), word) != words.end();
     }
 
+    /// What all values of a column have in common, over the rows with a finite position.
+    struct Traits {
+        bool areBytes = true;
+        bool fitFloat = true;
+        // Of the vectors that begin in this column:
+        bool areUnit = true;
+        bool areAxes = true; // 0 0 1 and the like, which could also be colors
+
+        void add(Coordinate const& value)
+        {
+            areBytes = areBytes && value.value >= 0 && value.value <= 255 && value.value == std::floor(value.value);
+            fitFloat = fitFloat && !value.losesDigits;
+        }
+        void add(Traits const& others)
+        {
+            areBytes = areBytes && others.areBytes;
+            fitFloat = fitFloat && others.fitFloat;
+            areUnit = areUnit && others.areUnit;
+            areAxes = areAxes && others.areAxes;
+        }
+        void addVector(double x, double y, double z)
+        {
+            double const squaredLength = x * x + y * y + z * z;
+            areUnit = areUnit && ((squaredLength > 0.98 && squaredLength < 1.02) || squaredLength == 0);
+            areAxes = areAxes && squaredLength == 1 && std::max({x, y, z}) == 1;
+        }
+    };
+
+    /// Reads the numbers of a line.
+    void readValues(TextScanner& in, std::vector<Coordinate>& values)
+    {
+        using Separator = TextScanner::Separator;
+        values.clear();
+        bool hasTightComma = false, hasOther = false;
+        for (Separator separator = Separator::Mark; separator != Separator::None;) {
+            values.push_back(in.coordinate(values.size() < 3 ? "a coordinate" : "a value"));
+            separator = in.separator();
+            hasTightComma = hasTightComma || separator == Separator::TightComma;
+            hasOther = hasOther || separator == Separator::Mark || separator == Separator::Blanks;
+        }
+        if (hasTightComma && hasOther)
+            in.refuse("there are commas as well as other separators: decimal commas are not supported");
+    }
+
+    /// Some of the lines after the head.
+    class XyzPart {
+    public:
+        /// \param columnCount  of all lines
+        XyzPart(InputFile const& file, std::size_t begin, std::size_t end, std::size_t columnCount,
+            Columns const& columns, ReadOptions const& options)
+            : in_(file, begin, end, TextScanner::Syntax::CommentsAndMarks)
+            , columns_(columns)
+            , columnCount_(columnCount)
+            , builder(in_, options)
+            , traits(columnCount)
+        {
+        }
+
+        void read()
+        {
+            for (in_.skipEmptyLines(); !in_.atEnd(); in_.skipEmptyLines()) {
+                readRow();
+                in_.nextLine();
+            }
+            in_.countWorkLeft();
+        }
+
+        std::uint64_t rowCount() const { return builder.pointCount(); }
+
+    private:
+        void readRow()
+        {
+            readValues(in_, row_);
+            if (row_.size() != columnCount_)
+                in_.refuse("there are " + std::to_string(row_.size()) + " values, but " + std::to_string(columnCount_)
+                    + " in the lines above");
+            Coordinate const &x = row_[columns_.position[0]], &y = row_[columns_.position[1]],
+                             &z = row_[columns_.position[2]];
+            builder.addPoint(x, y, z);
+            bool const isUsable = std::isfinite(x.value) && std::isfinite(y.value) && std::isfinite(z.value);
+            for (std::size_t column = 0; columnCount_ > 3 && column < columnCount_; ++column) {
+                values.append(row_[column].value);
+                if (isUsable)
+                    traits[column].add(row_[column]);
+            }
+            for (std::size_t column = 3; isUsable && column + 2 < columnCount_; ++column)
+                traits[column].addVector(row_[column].value, row_[column + 1].value, row_[column + 2].value);
+        }
+
+        // Declared first, because the builder refers to it.
+        TextScanner in_;
+        Columns const& columns_;
+        std::size_t columnCount_;
+        std::vector<Coordinate> row_;
+
+    public:
+        GeometryBuilder builder;
+        Orvan::Array<double> values; // of all rows, if there is more than a position
+        std::vector<Traits> traits; // one entry per column
+    };
+
     class XyzReader {
     public:
         XyzReader(InputFile const& file, ReadOptions const& options)
-            : in_(file, 0, TextScanner::Syntax::CommentsAndMarks)
+            : file_(file)
+            , in_(file, 0, TextScanner::Syntax::CommentsAndMarks)
             , builder_(in_, options)
         {
         }
 
-        GeometryFile read()
+        GeometryFile read(std::size_t partBytes)
         {
             readHead();
-            for (in_.skipEmptyLines(); !in_.atEnd(); in_.skipEmptyLines())
-                readRow();
-            if (declaredCount_ && *declaredCount_ != rowCount_)
-                in_.refuse("the file is cut off or damaged: it declares " + std::to_string(*declaredCount_)
-                    + " points and holds " + std::to_string(rowCount_));
-            if (headings_.empty() && rowCount_ != 0)
+            std::size_t const begin = in_.position();
+            countColumns();
+            TextParts<XyzPart> parts(
+                file_, TextScanner::partsOf(file_, begin, partBytes), columnCount_, columns_, builder_.options());
+            parts.read([](XyzPart& part, std::size_t) {
+                part.read();
+                return true;
+            });
+            in_.skipAll();
+            starts_ = startsOf(parts.pointers(), &XyzPart::rowCount);
+            joinTraits(parts);
+            requireDeclaredCount();
+            if (headings_.empty() && rowCount() != 0)
                 columns_ = guessColumns();
             if (headings_.empty() && columns_.normal != kNone && !traits_[columns_.normal].areUnit)
                 noteDoubtfulNormals();
-            addProperties();
+            parts.releaseText();
+            parts.joinGeometry(builder_);
+            addProperties(parts);
             return std::move(builder_).finish("XYZ");
         }
 
@@ -143,79 +255,41 @@ namespace {
             return 0;
         }
 
-        void readRow()
+        /// The columns of the first row, which all others have too.
+        void countColumns()
         {
-            readValues();
-            checkColumnCount();
-            Coordinate const &x = row_[columns_.position[0]], &y = row_[columns_.position[1]],
-                             &z = row_[columns_.position[2]];
-            builder_.addPoint(x, y, z);
-            bool const isUsable = std::isfinite(x.value) && std::isfinite(y.value) && std::isfinite(z.value);
-            for (std::size_t column = 0; columnCount_ > 3 && column < columnCount_; ++column) {
-                values_.append(row_[column].value);
-                if (isUsable)
-                    traits_[column].add(row_[column]);
-            }
-            for (std::size_t column = 3; isUsable && column + 2 < columnCount_; ++column)
-                traits_[column].addVector(row_[column].value, row_[column + 1].value, row_[column + 2].value);
-            ++rowCount_;
-            in_.nextLine();
+            in_.skipEmptyLines();
+            if (in_.atEnd())
+                return;
+            std::vector<Coordinate> row;
+            readValues(in_, row);
+            std::size_t const count = row.size();
+            bool const isKnown = count == 3 || count == 4 || count == 6 || count == 7 || count == 9;
+            if (!headings_.empty() && count != headings_.size())
+                in_.refuse("there are " + std::to_string(count) + " values, but the heading line names "
+                    + std::to_string(headings_.size()) + " columns");
+            if (headings_.empty() && !isKnown)
+                in_.refuse("there are " + std::to_string(count)
+                    + " values; without a heading line that names the columns, 3, 4, 6, 7 or 9 make a point");
+            columnCount_ = count;
         }
 
-        void readValues()
+        std::uint64_t rowCount() const { return starts_.back(); }
+
+        void requireDeclaredCount() const
         {
-            using Separator = TextScanner::Separator;
-            row_.clear();
-            bool hasTightComma = false, hasOther = false;
-            for (Separator separator = Separator::Mark; separator != Separator::None;) {
-                row_.push_back(in_.coordinate(row_.size() < 3 ? "a coordinate" : "a value"));
-                separator = in_.separator();
-                hasTightComma = hasTightComma || separator == Separator::TightComma;
-                hasOther = hasOther || separator == Separator::Mark || separator == Separator::Blanks;
-            }
-            if (hasTightComma && hasOther)
-                in_.refuse("there are commas as well as other separators: decimal commas are not supported");
+            if (declaredCount_ && *declaredCount_ != rowCount())
+                in_.refuse("the file is cut off or damaged: it declares " + std::to_string(*declaredCount_)
+                    + " points and holds " + std::to_string(rowCount()));
         }
 
-        void checkColumnCount()
+        void joinTraits(TextParts<XyzPart> const& parts)
         {
-            std::size_t const count = row_.size();
-            if (rowCount_ == 0) {
-                bool const isKnown = count == 3 || count == 4 || count == 6 || count == 7 || count == 9;
-                if (!headings_.empty() && count != headings_.size())
-                    in_.refuse("there are " + std::to_string(count) + " values, but the heading line names "
-                        + std::to_string(headings_.size()) + " columns");
-                if (headings_.empty() && !isKnown)
-                    in_.refuse("there are " + std::to_string(count)
-                        + " values; without a heading line that names the columns, 3, 4, 6, 7 or 9 make a point");
-                columnCount_ = count;
-                traits_.resize(count);
-            }
-            if (count != columnCount_)
-                in_.refuse("there are " + std::to_string(count) + " values, but " + std::to_string(columnCount_)
-                    + " in the lines above");
+            traits_.resize(std::max(columnCount_, headings_.size())); // there may be no row
+            for (XyzPart const* const part : parts.pointers())
+                for (std::size_t column = 0; column != columnCount_; ++column)
+                    traits_[column].add(part->traits[column]);
         }
-
-        /// What all values of a column have in common, over the rows with a finite position.
-        struct Traits {
-            bool areBytes = true;
-            bool fitFloat = true;
-            // Of the vectors that begin in this column:
-            bool areUnit = true;
-            bool areAxes = true; // 0 0 1 and the like, which could also be colors
-
-            void add(Coordinate const& value)
-            {
-                areBytes = areBytes && value.value >= 0 && value.value <= 255 && value.value == std::floor(value.value);
-                fitFloat = fitFloat && !value.losesDigits;
-            }
-            void addVector(double x, double y, double z)
-            {
-                double const squaredLength = x * x + y * y + z * z;
-                areUnit = areUnit && ((squaredLength > 0.98 && squaredLength < 1.02) || squaredLength == 0);
-                areAxes = areAxes && squaredLength == 1 && std::max({x, y, z}) == 1;
-            }
-        };
 
         bool areColors(std::size_t column) const
         {
@@ -259,47 +333,51 @@ namespace {
                   "g b) has to say so");
         }
 
-        void addProperties()
+        void addProperties(TextParts<XyzPart> const& parts)
         {
             if (std::size_t const column = columns_.color; column != kNone) {
                 if (traits_[column].areBytes && traits_[column + 1].areBytes && traits_[column + 2].areBytes)
-                    addColumns<unsigned char>("color", column, 3);
+                    addColumns<unsigned char>("color", column, 3, parts);
                 else
-                    addColumns<float>("color", column, 3);
+                    addColumns<float>("color", column, 3, parts);
             }
             if (columns_.normal != kNone)
-                addColumns<float>("normal", columns_.normal, 3);
+                addColumns<float>("normal", columns_.normal, 3, parts);
             for (Columns::Named const& other : columns_.others) {
                 if (traits_[other.column].fitFloat)
-                    addColumns<float>(other.name, other.column, 1);
+                    addColumns<float>(other.name, other.column, 1, parts);
                 else
-                    addColumns<double>(other.name, other.column, 1);
+                    addColumns<double>(other.name, other.column, 1, parts);
             }
         }
 
-        template <class Scalar> void addColumns(std::string const& name, std::size_t first, std::size_t count)
+        template <class Scalar>
+        void addColumns(std::string const& name, std::size_t first, std::size_t count, TextParts<XyzPart> const& parts)
         {
-            auto const target = builder_.addProperty<Scalar>(name, sPointComp, count, rowCount_);
-            for (std::uint64_t row = 0; row < rowCount_; ++row) {
-                for (std::size_t i = 0; i < count; ++i) {
-                    // Rows without a finite position, which are left out later, are not covered by the traits.
-                    double const value = values_[row * columnCount_ + first + i];
-                    bool const fits = !std::is_integral_v<Scalar> || (value >= 0 && value <= 255);
-                    auto const scalar = fits ? static_cast<Scalar>(value) : Scalar{};
-                    std::memcpy(target->data + (row * count + i) * sizeof(Scalar), &scalar, sizeof(Scalar));
+            auto const target = builder_.addProperty<Scalar>(name, sPointComp, count, rowCount());
+            forEachPart(parts.count(), [&](std::size_t part) {
+                std::byte* to = target->data + starts_[part] * count * sizeof(Scalar);
+                Orvan::Array<double> const& values = parts[part].values;
+                for (std::uint64_t rowStart = 0; rowStart < values.size; rowStart += columnCount_) {
+                    for (std::size_t i = 0; i < count; ++i, to += sizeof(Scalar)) {
+                        // Rows without a finite position, which are left out later, are not covered by the traits.
+                        double const value = values[rowStart + first + i];
+                        bool const fits = !std::is_integral_v<Scalar> || (value >= 0 && value <= 255);
+                        auto const scalar = fits ? static_cast<Scalar>(value) : Scalar{};
+                        std::memcpy(to, &scalar, sizeof(Scalar));
+                    }
                 }
-            }
+            });
         }
 
+        InputFile const& file_;
         TextScanner in_;
         GeometryBuilder builder_;
         std::optional<std::uint64_t> declaredCount_;
         std::vector<std::string> headings_; // empty if no line names x, y and z
         Columns columns_;
-        std::vector<Coordinate> row_;
-        std::uint64_t rowCount_ = 0;
         std::size_t columnCount_ = 0;
-        Orvan::Array<double> values_; // of all rows, if there is more than a position
+        std::vector<std::uint64_t> starts_; // the first row of each part, and the number of all rows
         std::vector<Traits> traits_; // one entry per column
     };
 
@@ -307,7 +385,13 @@ namespace {
 
 GeometryFile readXyz(InputFile const& file, ReadOptions const& options)
 {
-    return XyzReader(file, options).read();
+    return readXyz(file, options, kTextPartBytes);
+}
+
+GeometryFile readXyz(InputFile const& file, ReadOptions const& options, std::size_t partBytes)
+{
+    file.load();
+    return XyzReader(file, options).read(partBytes);
 }
 
 }

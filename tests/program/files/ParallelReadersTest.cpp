@@ -1,5 +1,6 @@
 #include "FileSupport.h"
 #include "Readers.h"
+#include "TextParts.h"
 
 using namespace std::string_literals;
 
@@ -42,7 +43,9 @@ namespace {
         for (bool const isLenient : {false, true}) {
             ReadOptions const options{.isLenient = isLenient, .isCentered = isLenient};
             auto const read = [&](PlyPath way) {
-                return outcomeOf([&] { return readPly(InputFile(path, InputFile::Loading::Beginning), options, way); });
+                return outcomeOf([&] {
+                    return readPly(InputFile(path, InputFile::Loading::Beginning), options, way, kTextPartBytes);
+                });
             };
             Outcome const expected = read(PlyPath::General);
             expectSame(read(PlyPath::Fastest), expected);
@@ -286,24 +289,165 @@ namespace {
         return text + (random.below(2) == 0 ? "v 1 2 3\n" : "f 1 2 3");
     }
 
-    TEST(ParallelReaders, ObjFilesAreReadInPartsAsInOne)
+    /// A number as programs write them: short, with more digits than a float has, rarely none at all.
+    std::string randomNumber(Random& random)
     {
-        Random random(4);
-        TemporaryFolder const folder;
-        int readCount = 0;
-        for (int i = 0; i != 400; ++i) {
-            std::string const content = randomObj(random);
-            SCOPED_TRACE(content);
-            store(folder / "a.obj", content);
-            InputFile const file(folder / "a.obj");
-            ReadOptions const options{.isLenient = i % 2 == 0, .isCentered = i % 3 == 0};
-            Outcome const whole = outcomeOf([&] { return readObj(file, options, content.size()); });
-            readCount += !!whole.object;
-            for (std::size_t const partBytes : std::initializer_list<std::size_t>{1, 20, 100, 400})
-                expectSame(outcomeOf([&] { return readObj(file, options, partBytes); }), whole);
+        unsigned int const kind = random.below(200);
+        return kind == 0 ? "nan"
+            : kind == 1  ? "1e999"
+            : kind == 2  ? "-"
+            : kind < 60  ? std::to_string(random.below(5))
+            : kind < 120 ? std::to_string(random.coordinate())
+                         : std::to_string(random.below(5)) + ".123456789" + std::to_string(random.below(3));
+    }
+
+    /// Comments, blank lines, and line ends of other systems, between lines and at their ends.
+    std::string randomLineEnd(Random& random, bool hasComments)
+    {
+        static constexpr char const* kEnds[] = {"\r\n", "\n\n", "\n \t\n", " \n", "\n#\n", " # 1 2\n"};
+        return random.below(4) == 0 ? kEnds[random.below(hasComments ? 6 : 4)] : "\n";
+    }
+
+    std::string randomOff(Random& random)
+    {
+        bool const hasNormals = random.below(3) == 0, hasTextures = random.below(3) == 0;
+        unsigned int const pointCount = random.below(30), faceCount = random.below(30), colors = random.below(6);
+        std::string text = random.below(3) == 0 ? "\xEF\xBB\xBF" : "";
+        text += std::string(hasTextures ? "ST" : "") + (hasNormals ? "NOFF\n" : "OFF ") + std::to_string(pointCount)
+            + " " + std::to_string(faceCount + (random.below(9) == 0)) + (random.below(2) == 0 ? " 0\n" : "\n");
+        auto const addColor = [&] {
+            unsigned int const values = random.below(9) != 0 ? 3 : random.below(5);
+            for (unsigned int i = 0; random.below(6) < colors && i != values; ++i)
+                text += " " + std::to_string(random.below(256)) + (random.below(40) == 0 ? ".5" : "");
+        };
+        for (unsigned int point = 0; point != pointCount; ++point) {
+            for (int i = 0; i != (hasNormals ? 6 : 3); ++i)
+                text += randomNumber(random) + " ";
+            addColor();
+            text += (hasTextures ? " 0.5 0.25" : "") + randomLineEnd(random, true);
         }
-        EXPECT_GT(readCount, 100);
-        EXPECT_LT(readCount, 390);
+        for (unsigned int face = 0; face != faceCount; ++face) {
+            unsigned int const corners = random.below(60) == 0 ? 2 : 3 + random.below(3);
+            text += std::to_string(corners);
+            for (unsigned int corner = 0; corner != corners; ++corner)
+                text += " " + std::to_string(random.below(pointCount + (random.below(100) == 0)));
+            addColor();
+            text += randomLineEnd(random, true);
+        }
+        return text + (random.below(9) == 0 ? "3 0 0 0\n" : "");
+    }
+
+    std::string randomTextPly(Random& random)
+    {
+        unsigned int const pointCount = random.below(30), faceCount = random.below(30);
+        bool const hasLists = random.below(3) == 0, hasQuality = random.below(2) == 0;
+        bool const areFacesFirst = random.below(5) == 0;
+        std::string points, faces;
+        for (unsigned int point = 0; point != pointCount; ++point) {
+            if (hasLists)
+                points += random.below(40) == 0 ? "1 5 " : "2 5 6 ";
+            for (int i = 0; i != 3; ++i)
+                points += randomNumber(random) + " ";
+            points += std::to_string(random.below(random.below(60) == 0 ? 300 : 256)) + randomLineEnd(random, false);
+        }
+        for (unsigned int face = 0; face != faceCount; ++face) {
+            unsigned int const corners = random.below(60) == 0 ? 2 : 3 + random.below(3);
+            faces += (hasQuality ? randomNumber(random) + " " : "") + std::to_string(corners);
+            for (unsigned int corner = 0; corner != corners; ++corner)
+                faces += " " + std::to_string(random.below(pointCount + (random.below(100) == 0)));
+            faces += " " + std::to_string(2 * corners);
+            for (unsigned int corner = 0; corner != 2 * corners; ++corner)
+                faces += " 0." + std::to_string(corner);
+            faces += randomLineEnd(random, false);
+        }
+        std::string const ofPoints = "element vertex " + std::to_string(pointCount + (random.below(20) == 0))
+            + (hasLists ? "\nproperty list char short pair" : "")
+            + "\nproperty double x\nproperty float y\nproperty float z\nproperty uchar s\n";
+        std::string const ofFaces = "element face " + std::to_string(faceCount + (random.below(20) == 0))
+            + (hasQuality ? "\nproperty float quality" : "")
+            + "\nproperty list uchar int vertex_indices\nproperty list int float texcoord\n";
+        std::string const others = random.below(2) == 0 ? "" : "7\n8\n";
+        return "ply\nformat ascii 1.0\nelement nothing 1000\n" + (areFacesFirst ? ofFaces : ofPoints)
+            + (others.empty() ? "" : "element other 2\nproperty int a\n") + (areFacesFirst ? ofPoints : ofFaces)
+            + "end_header\n" + (areFacesFirst ? faces : points) + others + (areFacesFirst ? points : faces)
+            + (random.below(9) == 0 ? "1 2\n" : "");
+    }
+
+    std::string randomXyz(Random& random)
+    {
+        unsigned int const columns = random.below(4), kind = random.below(4);
+        unsigned int const columnCount = columns == 0 ? 3 : columns == 1 ? 6 : columns == 2 ? 7 : 9;
+        std::string const separator = kind == 0 ? "," : kind == 1 ? " ; " : " ";
+        std::string text = random.below(5) == 0 ? "x y z r g b nx ny nz\n" : "";
+        unsigned int const rowCount = random.below(30);
+        if (random.below(4) == 0)
+            text = std::to_string(rowCount) + "\n" + text;
+        for (unsigned int row = 0; row != rowCount; ++row) {
+            unsigned int const count = columnCount - (random.below(200) == 0);
+            for (unsigned int column = 0; column != count; ++column)
+                text += (column == 0 ? "" : separator)
+                    + (column < 3             ? randomNumber(random)
+                            : column / 3 == 1 ? std::to_string(random.below(256)) + (random.below(90) == 0 ? ".5" : "")
+                                              : (column % 3 == row % 3 ? "1" : "0"));
+            text += random.below(400) == 0 ? " 1,5\n" : randomLineEnd(random, true);
+        }
+        return text;
+    }
+
+    std::string randomStl(Random& random)
+    {
+        std::string text;
+        auto const end = [&] { return randomLineEnd(random, false); };
+        for (unsigned int solid = random.below(9); solid != 0; --solid) {
+            text += (random.below(3) == 0 ? "solid\n" : "SOLID part " + std::to_string(solid) + "\n");
+            for (unsigned int facet = random.below(8); facet != 0; --facet) {
+                text += " facet normal 0 0 1" + end() + (random.below(40) == 0 ? "" : "outer loop") + end();
+                for (int corner = 0; corner != 3; ++corner)
+                    text += " vertex " + randomNumber(random) + " " + randomNumber(random) + " -0" + end();
+                text += (random.below(9) == 0 ? "endloop " : "endloop\n") + std::string("endfacet ") + end();
+            }
+            text += random.below(30) == 0 ? "" : "endsolid facet" + end();
+        }
+        return text + (random.below(9) == 0 ? "facet\n" : "");
+    }
+
+    using ReadParts = GeometryFile (*)(InputFile const&, ReadOptions const&, std::size_t partBytes);
+
+    GeometryFile readTextPly(InputFile const& file, ReadOptions const& options, std::size_t partBytes)
+    {
+        return readPly(file, options, PlyPath::Fastest, partBytes);
+    }
+
+    struct TextFormat {
+        std::string (*make)(Random&);
+        ReadParts read;
+    };
+    std::map<std::string, TextFormat> const kTextFormats{{"a.obj", {randomObj, readObj}},
+        {"a.off", {randomOff, readOff}}, {"a.ply", {randomTextPly, readTextPly}}, {"a.stl", {randomStl, readStl}},
+        {"a.xyz", {randomXyz, readXyz}}};
+
+    TEST(ParallelReaders, TextsAreReadInPartsAsInOne)
+    {
+        TemporaryFolder const folder;
+        for (auto const& [name, format] : kTextFormats) {
+            Random random(4);
+            int readCount = 0;
+            for (int i = 0; i != 400; ++i) {
+                std::string content = format.make(random);
+                for (unsigned int change = random.below(4) == 0 ? 1 + random.below(3) : 0; change != 0; --change)
+                    content[random.below(content.size())] = "\n 0a-#\r."[random.below(8)];
+                SCOPED_TRACE(name + " " + std::to_string(i) + "\n" + content);
+                store(folder / name, content);
+                InputFile const file(folder / name);
+                ReadOptions const options{.isLenient = i % 2 == 0, .isCentered = i % 3 == 0};
+                Outcome const whole = outcomeOf([&] { return format.read(file, options, content.size()); });
+                readCount += !!whole.object;
+                for (std::size_t const partBytes : std::initializer_list<std::size_t>{1, 20, 100, 400})
+                    expectSame(outcomeOf([&] { return format.read(file, options, partBytes); }), whole);
+            }
+            EXPECT_GT(readCount, 80) << name;
+            EXPECT_LT(readCount, 390) << name;
+        }
     }
 
 }
