@@ -1,5 +1,6 @@
 #include "Edit.h"
 
+#include "geometry/FaceMeasures.h"
 #include "geometry/MeshRequirements.h"
 #include "shell/Failure.h"
 #include "shell/Phase.h"

@@ -1,6 +1,7 @@
 #include "Commands.h"
 #include "Operation.h"
 #include "files/GeometryBuilder.h"
+#include "geometry/FaceMeasures.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshTopology.h"
 #include "shell/Failure.h"

@@ -213,7 +213,7 @@ namespace {
         handleIsolatedPoints(options_, subject, report);
         MeshArrays const arrays = arraysOf(mesh);
         std::optional<EdgeSides> edges;
-        if (report.needsFacts() || options_.pinsBoundary || options_.sharpDegrees)
+        if (options_.pinsBoundary || options_.sharpDegrees)
             edges.emplace(arrays);
         auto const weights = weightsOf(options_, subject, edges, report);
         Positions positions = *arrays.positions;
@@ -235,8 +235,8 @@ namespace {
             return;
         }
         if (!subject.topology || !subject.shape)
-            subject.setKnown(examine(arrays, *edges));
-        change_ = {*subject.shape, examine(arraysOf(mesh), *edges).shape, largestMove(arrays, arraysOf(mesh))};
+            subject.setKnown(examine(arrays));
+        change_ = {*subject.shape, examine(arraysOf(mesh)).shape, largestMove(arrays, arraysOf(mesh))};
         subject.shape = change_.after;
         after_ = describeMesh(mesh);
         addShape(change_, before_, after_);

@@ -64,12 +64,18 @@ EdgeRange squaredEdgeRange(std::span<unsigned int const, kCount> corners, float3
     return {shortest, longest};
 }
 
+/// Whether the shortest edge is so much longer than `ratio` times the longest edge that no rounding matters.
+inline bool isNoSliverByFar(EdgeRange const& squared, float ratio)
+{
+    return (squared.shortest > 1e-30f) & (squared.shortest > squared.longest * ratio * ratio * 1.001f);
+}
+
 /// Whether the shortest edge is shorter than `ratio` times the longest edge, with lengths rounded exactly as in the
 /// library, so that both find the same slivers.
 inline bool isSliver(EdgeRange const& squared, float ratio)
 {
-    if (squared.shortest > 1e-30f && squared.shortest > squared.longest * ratio * ratio * 1.001f)
-        return false; // by far, so that no rounding matters
+    if (isNoSliverByFar(squared, ratio))
+        return false;
     float const shortest = std::min(std::sqrt(squared.shortest), std::numeric_limits<float>::max());
     return std::sqrt(squared.longest) * ratio > shortest;
 }

@@ -1,40 +1,38 @@
 #include "MeshTopology.h"
 
-#include "ClosedFan.h"
+#include "ClosedFans.h"
 #include "Creases.h"
-#include "EdgeSides.h"
+#include "PointBlocks.h"
+#include "PointStar.h"
+#include "TriangleBatch.h"
 #include "connectedComponents.h"
+#include "sumOverBlocks.h"
 
-#include <tbb/blocked_range.h>
-#include <tbb/parallel_reduce.h>
+#include <tbb/enumerable_thread_specific.h>
+#include <tbb/parallel_for.h>
 #include <tbb/parallel_sort.h>
 
 #include <algorithm>
 #include <array>
 #include <bit>
-#include <functional>
-#include <numeric>
+#include <utility>
 #include <vector>
 
 namespace ModelingProgram {
 
 namespace {
 
-    /// Calls `find(element, partial result)` for all elements in parallel, and adds up the partial results. Sums of counts
-    /// and lowest elements do not depend on the order.
-    template <class Result, class Find> Result findInAll(unsigned int count, Find const& find)
+    /// Whether some consecutive faces are triangles with three different points.
+    bool arePlainTriangles(MeshArrays const& mesh, unsigned int begin, unsigned int end)
     {
-        return tbb::parallel_reduce(
-            tbb::blocked_range<unsigned int>(0, count, Modeling::kElementGrain), Result{},
-            [&](auto const& elements, Result result) {
-                for (unsigned int element = elements.begin(); element != elements.end(); ++element)
-                    find(element, result);
-                return result;
-            },
-            [](Result a, Result const& b) {
-                a += b;
-                return a;
-            });
+        if (!areTriangles(mesh, begin, end))
+            return false;
+        unsigned int const* corner = mesh.corners(begin).data();
+        unsigned int repeats = 0;
+        for (unsigned int face = begin; face != end; ++face, corner += 3)
+            repeats += static_cast<unsigned int>(corner[0] == corner[1])
+                + static_cast<unsigned int>(corner[1] == corner[2]) + static_cast<unsigned int>(corner[2] == corner[0]);
+        return repeats == 0;
     }
 
     bool hasRepeatedPoint(std::span<unsigned int const> corners)
@@ -59,123 +57,136 @@ namespace {
             topology.facesWithRepeatedPoints.add(face);
     }
 
-    /// One end of a side, as seen from the point at that end.
-    struct SideEnd {
-        unsigned int otherPoint;
-        unsigned int startCorner; // of the side
-        unsigned int corner; // the one at the point: equal to `startCorner` if the side leads away from it
-        friend auto operator<=>(SideEnd const&, SideEnd const&) = default;
-    };
+    MeshTopology countFaces(MeshArrays const& mesh)
+    {
+        return sumOverBlocks<MeshTopology>(mesh.faceCount(), [&](std::size_t blockBegin, std::size_t blockEnd) {
+            auto const begin = static_cast<unsigned int>(blockBegin), end = static_cast<unsigned int>(blockEnd);
+            MeshTopology topology;
+            if (arePlainTriangles(mesh, begin, end))
+                topology.triangleCount = end - begin;
+            else
+                for (unsigned int face = begin; face != end; ++face)
+                    countFace(mesh, face, topology);
+            return topology;
+        });
+    }
 
-    /// The sides at one point: which edges they form, and how these connect the corners of the faces to fans. Can be used
-    /// for one point after the other, which saves allocations.
-    class PointStar {
+    /// Examines the points of one block after the other, and adds up what it finds.
+    class BlockExaminer {
     public:
-        void examine(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point, MeshTopology& topology)
+        /// \param creases       may be null
+        /// \param lowerInParts  one entry per point, set to a point of the same component that is not higher
+        BlockExaminer(MeshArrays const& mesh, CreasesWithNormals const* creases, unsigned int* lowerInParts)
+            : mesh_(mesh)
+            , creases_(creases)
+            , lowerInParts_(lowerInParts)
         {
-            collect(mesh, edges, point);
-            for (auto first = ends_.begin(); first != ends_.end();) {
-                auto const last = std::find_if(
-                    first, ends_.end(), [=](SideEnd const& end) { return end.otherPoint != first->otherPoint; });
-                if (point < first->otherPoint) // each edge once
-                    examineEdge({first, last}, topology);
-                for (SideEnd const& end : std::span(first, last))
-                    joined_.push_back({first->corner, end.corner});
-                first = last;
-            }
-            if (countFans() > 1)
-                topology.nonManifoldPoints.add(point);
         }
+
+        void examine(PointBlocks const& blocks, unsigned int block)
+        {
+            blocks.list(block, corners_);
+            sortByValence();
+            for (std::size_t const valence : {std::size_t{0}, kMaxValence + 1})
+                for (unsigned int const index : byValence_[valence])
+                    examineStar(index);
+            [this]<std::size_t... kSmaller>(std::index_sequence<kSmaller...>)
+            {
+                (examineFans<kSmaller + 1>(), ...);
+            }
+            (std::make_index_sequence<kMaxValence>());
+        }
+
+        MeshTopology const& found() const { return found_; }
 
     private:
-        void collect(MeshArrays const& mesh, EdgeSides const& edges, unsigned int point)
+        static constexpr std::size_t kMaxValence = 16;
+
+        /// So that branches that depend on the valence are predictable.
+        void sortByValence()
         {
-            corners_.clear();
-            ends_.clear();
-            joined_.clear();
-            unsigned int const* const pointAt = mesh.faceVertex->data;
-            edges.forEachCornerAt(point, [&](CornerNeighbors const& at) {
-                corners_.push_back(at.corner);
-                if (pointAt[at.next] == point)
-                    joined_.push_back({at.corner, at.next}); // equal consecutive points are one vertex of the face
-                else
-                    ends_.push_back({pointAt[at.next], at.corner, at.corner});
-                if (pointAt[at.previous] != point)
-                    ends_.push_back({pointAt[at.previous], at.previous, at.corner});
-            });
-            std::sort(ends_.begin(), ends_.end());
+            for (auto& indices : byValence_)
+                indices.clear();
+            for (unsigned int index = 0; index != corners_.pointCount(); ++index)
+                byValence_[std::min<std::size_t>(corners_.countAt(index), byValence_.size() - 1)].push_back(index);
         }
 
-        static void examineEdge(std::span<SideEnd const> sides, MeshTopology& topology)
+        /// Examines the points with this many faces.
+        template <std::size_t kValence> void examineFans()
         {
-            ++topology.edgeCount;
-            if (sides.size() == 1)
-                topology.boundaryEdges.add(sides[0].startCorner);
-            if (sides.size() > 2)
-                topology.nonManifoldEdges.add(sides[0].startCorner);
-            std::array<Finding, 2> directions; // away from the point, and towards it
-            for (SideEnd const& side : sides)
-                directions[side.startCorner == side.corner ? 0 : 1].add(side.startCorner);
-            for (Finding const& direction : directions) {
-                if (direction.count > 1)
-                    topology.windingConflicts.add(direction.first);
-                if (direction.count == 2 && sides.size() == 2)
-                    topology.flippedEdges.add(direction.first);
+            std::span<unsigned int const> const indices = byValence_[kValence];
+            for (std::size_t i = 0; i < indices.size(); i += kFans)
+                examineFans<kValence>(indices.subspan(i, std::min(kFans, indices.size() - i)));
+        }
+
+        /// Examines up to four of them.
+        template <std::size_t kValence> void examineFans(std::span<unsigned int const> indices)
+        {
+            std::array<unsigned int, kFans> points;
+            std::array<CornerAtPoint const*, kFans> around;
+            for (std::size_t i = 0; i != kFans; ++i) {
+                unsigned int const index = indices[std::min(i, indices.size() - 1)];
+                points[i] = corners_.firstPoint() + index;
+                around[i] = corners_.at(index).data();
             }
+            ClosedFans<kValence> const fans(points, around);
+            auto const areClosed = fans.areClosed();
+            auto const edgeCounts = fans.higherEdgeCounts();
+            auto const lowest = fans.lowestPoints();
+            auto const spreads =
+                creases_ ? squaredSpreads<kValence>(creases_->normals, around) : std::array<int, kFans>();
+            for (std::size_t i = 0; i != indices.size(); ++i)
+                if (areClosed[i] != 0) {
+                    found_.edgeCount += static_cast<unsigned int>(edgeCounts[i]);
+                    lowerInParts_[points[i]] = lowest[i];
+                    if (creases_ && spreads[i] >= creases_->smoothSpread)
+                        countSharpEdges({around[i], kValence}, points[i]);
+                } else
+                    examineStar(indices[i]);
         }
 
-        /// The number of sets of corners that `joined_` connects.
-        std::size_t countFans()
+        /// Counts the sharp edges to higher points in a closed fan.
+        void countSharpEdges(std::span<CornerAtPoint const> around, unsigned int point)
         {
-            parents_.resize(corners_.size());
-            std::iota(parents_.begin(), parents_.end(), std::size_t{0});
-            auto const find = [&](unsigned int corner) {
-                auto i = static_cast<std::size_t>(
-                    std::lower_bound(corners_.begin(), corners_.end(), corner) - corners_.begin());
-                while (parents_[i] != i)
-                    i = parents_[i] = parents_[parents_[i]];
-                return i;
-            };
-            std::size_t count = corners_.size();
-            for (auto const& [a, b] : joined_)
-                if (std::size_t const i = find(a), k = find(b); i != k) {
-                    parents_[std::max(i, k)] = std::min(i, k);
-                    --count;
-                }
-            return count;
+            for (CornerAtPoint const& a : around)
+                if (a.next > point)
+                    for (CornerAtPoint const& b : around)
+                        found_.sharpEdgeCount +=
+                            a.next == b.previous && creases_->creases.isSharp(a.face, b.face, true) ? 1u : 0u;
         }
 
-        std::vector<unsigned int> corners_; // ascending
-        std::vector<SideEnd> ends_;
-        std::vector<std::array<unsigned int, 2>> joined_; // pairs of corners
-        std::vector<std::size_t> parents_; // of the indices of corners, in sets of joined ones
+        void examineStar(unsigned int index)
+        {
+            unsigned int const point = corners_.firstPoint() + index;
+            star_.examine(mesh_, corners_.at(index), point, creases_ ? &creases_->creases : nullptr, found_);
+            lowerInParts_[point] = point;
+        }
+
+        MeshArrays const& mesh_;
+        CreasesWithNormals const* creases_;
+        unsigned int* lowerInParts_;
+        BlockCorners corners_;
+        std::array<std::vector<unsigned int>, kMaxValence + 2> byValence_; // the last one is for all above
+        PointStar star_;
+        MeshTopology found_;
     };
 
-    /// What was found at some points, and scratch memory for the next one.
-    struct PointFindings {
-        MeshTopology topology;
-        PointStar star;
-        PointFindings& operator+=(PointFindings const& other)
-        {
-            topology += other.topology;
-            return *this;
-        }
-    };
-
-    /// \return a point of the same component, not higher than this one
-    unsigned int examinePoint(MeshArrays const& mesh, EdgeSides const& edges, Creases const* creases,
-        unsigned int point, PointFindings& found)
+    /// What the points tell, and their components.
+    MeshTopology examinePoints(MeshArrays const& mesh, CreasesWithNormals const* creases)
     {
-        if (ClosedFan const fan(mesh, edges, point); fan) {
-            found.topology.edgeCount += fan.higherEdgeCount();
-            found.topology.sharpEdgeCount += creases ? creases->countHigherAt(fan) : 0;
-            return std::min(fan.lowestNeighbor(), point);
+        Orvan::Array<unsigned int> lowerInParts(mesh.pointCount(), Orvan::kUninitialized);
+        MeshTopology topology;
+        {
+            PointBlocks const blocks(mesh);
+            tbb::enumerable_thread_specific<BlockExaminer> examiners(mesh, creases, lowerInParts.data);
+            // Each thread adds up what it finds, and each point has its own entry of the array.
+            tbb::parallel_for(
+                0u, blocks.count(), [&](unsigned int block) { examiners.local().examine(blocks, block); });
+            for (BlockExaminer const& examiner : examiners)
+                topology += examiner.found();
         }
-        if (edges.cornersAt(point).empty())
-            found.topology.isolatedPoints.add(point);
-        found.star.examine(mesh, edges, point, found.topology);
-        found.topology.sharpEdgeCount += creases ? creases->countHigherAt(point) : 0;
-        return point;
+        topology.partCount = countConnectedComponents(mesh, std::move(lowerInParts), topology.isolatedPoints.count);
+        return topology;
     }
 
 }
@@ -198,20 +209,12 @@ MeshTopology& MeshTopology::operator+=(MeshTopology const& other)
     return *this;
 }
 
-MeshTopology analyzeTopology(MeshArrays const& mesh)
+MeshTopology analyzeTopology(MeshArrays const& mesh, CreasesWithNormals const* creases)
 {
-    return analyzeTopology(mesh, EdgeSides(mesh));
-}
-
-MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges, Creases const* creases)
-{
-    auto topology = findInAll<MeshTopology>(
-        mesh.faceCount(), [&](unsigned int face, MeshTopology& found) { countFace(mesh, face, found); });
-    Orvan::Array<unsigned int> lowerInParts(mesh.pointCount(), Orvan::kUninitialized);
-    topology += findInAll<PointFindings>(mesh.pointCount(), [&](unsigned int point, PointFindings& found) {
-        lowerInParts.data[point] = examinePoint(mesh, edges, creases, point, found);
-    }).topology;
-    topology.partCount = countConnectedComponents(mesh, edges, std::move(lowerInParts));
+    MeshTopology topology = countFaces(mesh);
+    MeshTopology const atPoints = examinePoints(mesh, creases);
+    topology += atPoints;
+    topology.partCount = atPoints.partCount;
     if (topology.isClosedManifold()) {
         auto const points = static_cast<std::int64_t>(mesh.pointCount() - topology.isolatedPoints.count);
         std::int64_t const eulerCharacteristic =
@@ -238,30 +241,6 @@ Finding findIsolatedPoints(MeshArrays const& mesh)
         if (!isUsed[point])
             isolated.add(point);
     return isolated;
-}
-
-std::vector<std::uint64_t> countSlivers(MeshArrays const& mesh, std::vector<float> const& ratios)
-{
-    struct Counts : std::vector<std::uint64_t> {
-        Counts& operator+=(Counts const& other)
-        {
-            resize(std::max(size(), other.size()));
-            std::transform(other.begin(), other.end(), begin(), begin(), std::plus<>());
-            return *this;
-        }
-    };
-    Counts counts = findInAll<Counts>(mesh.faceCount(), [&](unsigned int face, Counts& found) {
-        std::span<unsigned int const> const corners = mesh.corners(face);
-        EdgeRange const edges = corners.size() == 3 ? squaredEdgeRange(corners.first<3>(), mesh.positions->data)
-                                                    : squaredEdgeRange(corners, mesh.positions->data);
-        for (std::size_t i = 0; i != ratios.size(); ++i)
-            if (isSliver(edges, ratios[i])) {
-                found.resize(ratios.size());
-                ++found[i];
-            }
-    });
-    counts.resize(ratios.size());
-    return counts;
 }
 
 std::uint64_t countCoincidentPoints(MeshArrays const& mesh)

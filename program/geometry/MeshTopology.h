@@ -64,24 +64,19 @@ struct MeshTopology {
     MeshTopology& operator+=(MeshTopology const& other);
 };
 
-class Creases;
-class EdgeSides;
+struct CreasesWithNormals;
 
 /// Accepts any valid mesh. Runs in parallel, with the same result for any number of threads. Linear, except for sorting
-/// the edges at each point; needs up to 8 bytes per corner and per point.
-MeshTopology analyzeTopology(MeshArrays const& mesh);
-/// The same for callers that already have the edges of the mesh. Also counts sharp edges if there are creases.
-MeshTopology analyzeTopology(MeshArrays const& mesh, EdgeSides const& edges, Creases const* creases = nullptr);
+/// the edges at each point. Needs 4 bytes per point if nearby faces use points with nearby numbers, otherwise also up to
+/// 8 per corner and 4 per point.
+/// \param creases  if not null, sharp edges are counted
+MeshTopology analyzeTopology(MeshArrays const& mesh, CreasesWithNormals const* creases = nullptr);
 
 /// Adds the rows "parts" and "genus" to the table of a command.
 void addPartsAndGenus(MeshTopology const& topology, Json& values);
 
 /// The points that no face uses.
 Finding findIsolatedPoints(MeshArrays const& mesh);
-
-/// The numbers of slivers for several ratios. A sliver is a face whose shortest edge is shorter than the ratio times its
-/// longest edge, with edge lengths rounded as in the library.
-std::vector<std::uint64_t> countSlivers(MeshArrays const& mesh, std::vector<float> const& ratios);
 
 /// The number of points at exactly the same position as an earlier point: many of them suggest that the mesh is split
 /// along seams.

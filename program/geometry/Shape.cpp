@@ -1,12 +1,12 @@
 #include "Shape.h"
 
 #include "Creases.h"
+#include "FaceMeasures.h"
 #include "Geometry.h"
 #include "SurfaceTree.h"
+#include "sumOverBlocks.h"
 
 #include <fmt/format.h>
-#include <tbb/blocked_range.h>
-#include <tbb/parallel_for.h>
 
 #include <algorithm>
 #include <array>
@@ -30,22 +30,6 @@ namespace {
     // A plate whose volume is a smaller fraction of area times diagonal is thinner than the resolution of single
     // precision: the measured volume is rounding error, and its sign is meaningless.
     constexpr double kFlatFraction = 1e-7;
-
-    /// Calls `sumOf(begin, end)` for blocks of a fixed size in parallel, and adds the results in the order of the
-    /// blocks.
-    template <class Sum, std::size_t kBlock = 4096, class SumOf>
-    Sum sumOverBlocks(std::size_t count, SumOf const& sumOf)
-    {
-        std::vector<Sum> sums((count + kBlock - 1) / kBlock);
-        tbb::parallel_for(tbb::blocked_range<std::size_t>(0, sums.size(), 1), [&](auto const& blocks) {
-            for (std::size_t block = blocks.begin(); block != blocks.end(); ++block)
-                sums[block] = sumOf(block * kBlock, std::min((block + 1) * kBlock, count));
-        });
-        Sum total{};
-        for (Sum const& sum : sums)
-            total += sum;
-        return total;
-    }
 
     struct Largest {
         double value = 0;
@@ -81,60 +65,6 @@ namespace {
             for (std::size_t point = begin; point != end; ++point)
                 extent.add(inDoubles((*mesh.positions)[point]));
             return extent;
-        });
-    }
-
-    struct Measures {
-        double area = 0;
-        double volume = 0;
-        std::uint64_t sliverCount = 0;
-        Measures& operator+=(Measures const& other)
-        {
-            area += other.area;
-            volume += other.volume;
-            sliverCount += other.sliverCount;
-            return *this;
-        }
-    };
-
-    /// Some faces between two phases: each phase alone runs without waiting for the slow divisions and square roots.
-    struct FaceBatch {
-        static constexpr std::size_t kSize = 64;
-        std::array<double3, kSize> vectors; // area vectors
-        std::array<double, kSize> areas; // twice
-        std::array<double, kSize> volumes; // six times
-    };
-
-    /// Measures the faces and sets their normals.
-    /// \param origin  inside or near the mesh: far away, the signed volumes of faces would suffer from cancellation
-    Measures measure(MeshArrays const& mesh, double3 const& origin, float sliverRatio, CompactNormal* normals)
-    {
-        float3 const* const position = mesh.positions->data;
-        auto const measureFace = [=](auto corners, std::size_t i, FaceBatch& batch, Measures& sum) {
-            batch.vectors[i] = areaVector(corners, position);
-            batch.volumes[i] = corners.empty() ? 0 : dot(inDoubles(position[corners[0]]) - origin, batch.vectors[i]);
-            sum.sliverCount += isSliver(squaredEdgeRange(corners, position), sliverRatio) ? 1u : 0u;
-        };
-        auto const measureBatch = [=, &mesh](std::size_t begin, std::size_t count, FaceBatch& batch, Measures& sum) {
-            for (std::size_t i = 0; i != count; ++i)
-                if (auto const corners = mesh.corners(static_cast<unsigned int>(begin + i)); corners.size() == 3)
-                    measureFace(corners.first<3>(), i, batch, sum);
-                else
-                    measureFace(corners, i, batch, sum);
-            for (std::size_t i = 0; i != count; ++i)
-                batch.areas[i] = length(batch.vectors[i]);
-            for (std::size_t i = 0; i != count; ++i) {
-                normals[begin + i] = CompactNormal(batch.vectors[i], batch.areas[i]);
-                sum.area += batch.areas[i] / 2;
-                sum.volume += batch.volumes[i] / 6;
-            }
-        };
-        return sumOverBlocks<Measures>(mesh.faceCount(), [=](std::size_t begin, std::size_t end) {
-            Measures sum;
-            FaceBatch batch;
-            for (; begin < end; begin += FaceBatch::kSize)
-                measureBatch(begin, std::min(FaceBatch::kSize, end - begin), batch, sum);
-            return sum;
         });
     }
 
@@ -180,16 +110,12 @@ namespace {
 
 ExaminedMesh examine(MeshArrays const& mesh, float sliverRatio)
 {
-    return examine(mesh, EdgeSides(mesh), sliverRatio);
-}
-
-ExaminedMesh examine(MeshArrays const& mesh, EdgeSides const& edges, float sliverRatio)
-{
     Extent const extent = mesh.pointCount() == 0 ? Extent{{}, {}} : extentOf(mesh);
     Orvan::Array<CompactNormal> normals(mesh.faceCount(), Orvan::kUninitialized);
-    Measures const measures = measure(mesh, extent.min, sliverRatio, normals.data);
-    Creases const foldOvers(mesh, edges, kFoldOverDegrees, normals.data);
-    ExaminedMesh result{analyzeTopology(mesh, edges, &foldOvers), {}, measures.sliverCount};
+    FaceMeasures const measures = measureFaces(mesh, extent.min, sliverRatio, normals.data);
+    CreasesWithNormals const foldOvers{
+        {mesh, kFoldOverDegrees}, normals.data, CompactNormal::squaredSpreadBelow(kFoldOverDegrees)};
+    ExaminedMesh result{analyzeTopology(mesh, &foldOvers), {}, measures.sliverCount};
     if (mesh.pointCount() != 0 && result.topology.isClosedManifold())
         result.shape.volume = measures.volume;
     result.shape.area = measures.area;
@@ -200,9 +126,14 @@ ExaminedMesh examine(MeshArrays const& mesh, EdgeSides const& edges, float slive
 
 std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& edges, double degrees)
 {
-    Creases const creases(mesh, edges, degrees);
-    return edges.pointsOfEdges(
-        [&](std::span<Side const> sides) { return sides.size() > 2 || (sides.size() == 2 && creases.isSharp(sides)); });
+    Creases const creases(mesh, degrees);
+    unsigned int const* const pointAt = mesh.faceVertex->data;
+    return edges.pointsOfEdges([&](std::span<Side const> sides) {
+        if (sides.size() != 2)
+            return sides.size() > 2;
+        unsigned int const a = sides[0].corner, b = sides[1].corner;
+        return creases.isSharp(edges.faceOf(a), edges.faceOf(b), pointAt[a] != pointAt[b]);
+    });
 }
 
 double largestMove(MeshArrays const& before, MeshArrays const& after)

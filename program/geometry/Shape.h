@@ -33,8 +33,6 @@ struct ExaminedMesh {
 
 /// All at once, because finding the edges and reading the positions of faces take longest.
 ExaminedMesh examine(MeshArrays const& mesh, float sliverRatio = 0);
-/// The same for callers that already have the edges of the mesh.
-ExaminedMesh examine(MeshArrays const& mesh, EdgeSides const& edges, float sliverRatio = 0);
 
 /// The numbers of elements, and the shape: for operations that do not move points.
 Json countsAndShape(Tessara::Object const& mesh, Shape const& shape);

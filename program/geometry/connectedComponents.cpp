@@ -1,5 +1,7 @@
 #include "connectedComponents.h"
 
+#include "frame/grains.h"
+
 #include <tbb/blocked_range.h>
 #include <tbb/parallel_for.h>
 #include <tbb/parallel_reduce.h>
@@ -7,8 +9,6 @@
 #include <algorithm>
 #include <atomic>
 #include <functional>
-#include <map>
-#include <numeric>
 #include <utility>
 
 namespace ModelingProgram {
@@ -38,8 +38,6 @@ namespace {
             return index;
         }
 
-        bool isRepresentative(unsigned int index) { return parentOf(index) == index; }
-
         void join(unsigned int a, unsigned int b)
         {
             for (;;) {
@@ -54,28 +52,25 @@ namespace {
             }
         }
 
-        /// Calls `visit(index)` for all indices in parallel.
-        template <class Visit> void forEachIndex(Visit const& visit)
+        /// Lets each index refer to the representative of its set, and counts the sets.
+        std::uint64_t flatten()
         {
-            auto const count = static_cast<unsigned int>(parents_.size);
-            tbb::parallel_for(
-                tbb::blocked_range<unsigned int>(0, count, Modeling::kElementGrain), [&](auto const& indices) {
-                    for (unsigned int index = indices.begin(); index != indices.end(); ++index)
-                        visit(index);
-                });
+            return tbb::parallel_reduce(
+                tbb::blocked_range<unsigned int>(0, static_cast<unsigned int>(parents_.size), Modeling::kElementGrain),
+                std::uint64_t{0},
+                [&](auto const& indices, std::uint64_t count) {
+                    for (unsigned int index = indices.begin(); index != indices.end(); ++index) {
+                        unsigned int const representative = find(index);
+                        count += representative == index ? 1u : 0u;
+                        at(index).store(representative, std::memory_order_relaxed);
+                    }
+                    return count;
+                },
+                std::plus<>());
         }
 
-        /// The representative of most of a sample of the indices: that of the largest set, if one is large.
-        unsigned int findLikelyLargest()
-        {
-            constexpr std::size_t kSampleCount = 1024;
-            std::map<unsigned int, unsigned int> counts;
-            for (std::uint64_t i = 0; i < parents_.size; i += std::max<std::uint64_t>(1, parents_.size / kSampleCount))
-                ++counts[find(static_cast<unsigned int>(i))];
-            auto const isRarer = [](auto const& a, auto const& b) { return a.second < b.second; };
-            auto const most = std::max_element(counts.begin(), counts.end(), isRarer);
-            return most == counts.end() ? 0 : most->first;
-        }
+        /// Whether two indices are known to be in the same set, without a search.
+        bool haveSameParent(unsigned int a, unsigned int b) { return parentOf(a) == parentOf(b); }
 
     private:
         std::atomic_ref<unsigned int> at(unsigned int index)
@@ -87,51 +82,34 @@ namespace {
         Orvan::Array<unsigned int> parents_;
     };
 
-}
+    void joinFace(std::span<unsigned int const> corners, DisjointSets& sets)
+    {
+        for (std::size_t i = 1; i < corners.size(); ++i)
+            if (!sets.haveSameParent(corners[i - 1], corners[i]))
+                sets.join(corners[i - 1], corners[i]);
+    }
 
-std::uint64_t countConnectedComponents(MeshArrays const& mesh, EdgeSides const& edges)
-{
-    Orvan::Array<unsigned int> parents(mesh.pointCount(), Orvan::kUninitialized);
-    std::iota(parents.begin(), parents.end(), 0u);
-    return countConnectedComponents(mesh, edges, std::move(parents));
 }
 
 std::uint64_t countConnectedComponents(
-    MeshArrays const& mesh, EdgeSides const& edges, Orvan::Array<unsigned int> lowerInParts)
+    MeshArrays const& mesh, Orvan::Array<unsigned int> lowerInParts, std::uint64_t isolatedPointCount)
 {
+    // One face of several joins most of a mesh.
+    constexpr unsigned int kSampled = 8;
     DisjointSets sets(std::move(lowerInParts));
-    auto const countSets = [&] {
-        return tbb::parallel_reduce(
-            tbb::blocked_range<unsigned int>(0, mesh.pointCount(), Modeling::kElementGrain), std::uint64_t{0},
-            [&](auto const& points, std::uint64_t count) {
-                for (unsigned int point = points.begin(); point != points.end(); ++point)
-                    count += sets.isRepresentative(point) && !edges.cornersAt(point).empty() ? 1u : 0u;
-                return count;
-            },
-            std::plus<>());
-    };
-    if (std::uint64_t const count = countSets(); count <= 1)
-        return count;
-    auto const joinFace = [&](unsigned int point, unsigned int corner) {
-        std::span<unsigned int const> const corners = mesh.corners(edges.faceOf(corner));
-        // The neighbors in the face are enough: its other points do the same.
-        unsigned int const* const at = mesh.faceVertex->data + corner;
-        sets.join(point, at == &corners.back() ? corners.front() : at[1]);
-        sets.join(point, at == &corners.front() ? corners.back() : at[-1]);
-    };
-    // One face of some points joins most of a mesh. What has become one large set need not be joined again: wherever it
-    // meets another set, the points of that set join the two.
-    sets.forEachIndex([&](unsigned int point) {
-        if (std::span<unsigned int const> const corners = edges.cornersAt(point); !corners.empty() && point % 4 == 0)
-            joinFace(point, corners[0]);
-    });
-    unsigned int const largest = sets.findLikelyLargest();
-    sets.forEachIndex([&](unsigned int point) {
-        if (sets.find(point) != sets.find(largest))
-            for (unsigned int const corner : edges.cornersAt(point))
-                joinFace(point, corner);
-    });
-    return countSets();
+    std::uint64_t count = sets.flatten() - isolatedPointCount;
+    for (unsigned int const step : {kSampled, 1u}) {
+        if (count <= 1)
+            return count;
+        tbb::parallel_for(tbb::blocked_range<unsigned int>(0, mesh.faceCount() / step + 1, Modeling::kElementGrain),
+            [&](auto const& range) {
+                for (unsigned int i = range.begin(); i != range.end(); ++i)
+                    if (std::uint64_t const face = std::uint64_t{i} * step; face < mesh.faceCount())
+                        joinFace(mesh.corners(static_cast<unsigned int>(face)), sets);
+            });
+        count = sets.flatten() - isolatedPointCount;
+    }
+    return count;
 }
 
 }

@@ -189,6 +189,52 @@ TEST(MeshTopology, CountsEdgesPointsPartsAndGenus)
             EXPECT_EQ(TestSupport::withThreads(threads, [&] { return countsOf(c.mesh); }), c.expected) << c.name;
 }
 
+TEST(MeshTopology, FindsWhatIsWrongAnywhereInALargeMesh)
+{
+    auto const torus = MeshBuilder::torus(150, 150);
+    auto const build = [&](auto const& change) {
+        Faces faces;
+        for (auto const& face : torus.faces)
+            faces.emplace_back(face.begin(), face.end());
+        return meshOf(22'505, (change(faces), faces));
+    };
+    auto const merge = [](unsigned int point) {
+        return [=](Faces& faces) {
+            for (auto& face : faces)
+                std::replace(face.begin(), face.end(), point, 0u);
+        };
+    };
+    struct Case {
+        char const* name;
+        Mesh mesh;
+        Counts expected;
+    };
+    Case const cases[] = {
+        {"torus", build([](Faces&) {}), {67'500, 0, 0, 0, 0, 5, 1, 1}},
+        {"in random order", MeshBuilder(torus).shuffled(1).build(), {67'500, 0, 0, 0, 0, 0, 1, 1}},
+        {"tori in random order", MeshBuilder(torus).joinedWith(torus, {9, 0, 0}).shuffled(1).build(),
+            {135'000, 0, 0, 0, 0, 0, 2, 2}},
+        {"last face missing", build([](Faces& faces) { faces.pop_back(); }), {67'500, 3, 0, 0, 0, 5, 1, kNone}},
+        {"last face turned", build([](Faces& faces) { std::reverse(faces.back().begin(), faces.back().end()); }),
+            {67'500, 0, 0, 3, 0, 5, 1, kNone}},
+        {"last face twice", build([](Faces& faces) { faces.push_back(faces.back()); }),
+            {67'500, 0, 3, 3, 0, 5, 1, kNone}},
+        {"far points merged", build(merge(11'300)), {67'500, 0, 0, 0, 1, 6, 1, kNone}},
+        {"with two pentagons", build([](Faces& faces) {
+             faces.push_back({22'500, 22'501, 22'502, 22'503, 22'504});
+             faces.emplace_back(faces.back().rbegin(), faces.back().rend());
+         }),
+            {67'505, 0, 0, 0, 0, 0, 2, 1}},
+        {"with an edge", build([](Faces& faces) {
+             faces.insert(faces.begin(), {0, 22'500});
+         }),
+            {67'500, 0, 0, 0, 0, 4, 1, kNone}},
+    };
+    for (Case const& c : cases)
+        for (int const threads : {1, 8})
+            EXPECT_EQ(TestSupport::withThreads(threads, [&] { return countsOf(c.mesh); }), c.expected) << c.name;
+}
+
 TEST(MeshTopology, CountsFacesByCorners)
 {
     Mesh const mesh = meshOf(6, {{}, {0, 1, 2}, {0, 1, 2, 3}, {0}, {0, 1, 2, 3, 4}, {5, 1, 5, 2}, {2, 2, 2}});

@@ -1,5 +1,6 @@
 #include "geometry/Shape.h"
 
+#include "geometry/FaceMeasures.h"
 #include "geometry/SurfaceTree.h"
 
 #include "support/MeshBuilder.h"

@@ -1,0 +1,177 @@
+#include "PointBlocks.h"
+
+#include "TriangleBatch.h"
+#include "sumOverBlocks.h"
+
+#include <tbb/parallel_for.h>
+
+#include <algorithm>
+#include <bit>
+#include <numeric>
+
+namespace ModelingProgram {
+
+namespace {
+
+    // The corners of a block fit the cache of a core.
+    constexpr unsigned int kCornersPerBlock = 1 << 16;
+    // Distributing fewer faces takes no longer than starting a task.
+    constexpr unsigned int kFacesPerPart = 4096;
+
+    // Each block reads all corners of its faces, so there are fewer blocks if large faces would be read more often.
+    constexpr std::uint64_t kMostReads = 64; // of a corner, on average
+
+    std::uint64_t blockCount(MeshArrays const& mesh, unsigned int shift)
+    {
+        return (std::uint64_t{mesh.pointCount()} + (std::uint64_t{1} << shift) - 1) >> shift;
+    }
+
+    /// An upper bound of how often blocks read corners.
+    std::uint64_t countReads(MeshArrays const& mesh, std::uint64_t blocks)
+    {
+        unsigned int const* const offset = mesh.faceOffset->data;
+        return sumOverBlocks<std::uint64_t>(mesh.faceCount(), [=](std::size_t begin, std::size_t end) {
+            std::uint64_t reads = 0;
+            for (std::size_t face = begin; face != end; ++face) {
+                std::uint64_t const corners = offset[face + 1] - offset[face];
+                reads += corners * std::min(corners, blocks);
+            }
+            return reads;
+        });
+    }
+
+    unsigned int shiftOfBlocks(MeshArrays const& mesh)
+    {
+        std::uint64_t const points = std::max(mesh.pointCount(), 1u), corners = std::max(mesh.cornerCount(), 1u);
+        auto shift = static_cast<unsigned int>(std::bit_width(kCornersPerBlock * points / (corners + points) + 1));
+        if (blockCount(mesh, shift) > kMostReads
+            && countReads(mesh, blockCount(mesh, shift)) > kMostReads * mesh.cornerCount())
+            while (blockCount(mesh, shift) > kMostReads)
+                ++shift;
+        return shift;
+    }
+
+}
+
+PointBlocks::PointBlocks(MeshArrays const& mesh)
+    : mesh_(mesh)
+    , shift_(shiftOfBlocks(mesh))
+    , count_(static_cast<unsigned int>(blockCount(mesh, shift_)))
+    , partCount_(std::clamp(mesh.faceCount() / kFacesPerPart, 1u, kMostParts))
+    , offsets_(std::size_t{count_} * partCount_ + 1)
+{
+    // Parts have entries of their own.
+    tbb::parallel_for(std::size_t{0}, partCount_, [this](std::size_t part) { countFaces(part); });
+    std::exclusive_scan(offsets_.begin(), offsets_.end(), offsets_.begin(), 0u);
+    faces_ = Orvan::Array<unsigned int>(offsets_.back(), Orvan::kUninitialized);
+    tbb::parallel_for(std::size_t{0}, partCount_, [this](std::size_t part) { distributeFaces(part); });
+}
+
+void PointBlocks::countFaces(std::size_t part)
+{
+    areTriangles_[part] = areTriangles(mesh_, beginOfPart(part), beginOfPart(part + 1));
+    std::vector<unsigned int> counts(count_);
+    forEachRun(part, [&](unsigned int block, unsigned int faceBegin, unsigned int faceEnd) {
+        counts[block] += faceEnd - faceBegin;
+    });
+    for (unsigned int block = 0; block != count_; ++block)
+        offsets_[std::size_t{block} * partCount_ + part] = counts[block];
+}
+
+void PointBlocks::distributeFaces(std::size_t part)
+{
+    std::vector<unsigned int> places(count_);
+    for (unsigned int block = 0; block != count_; ++block)
+        places[block] = offsets_[std::size_t{block} * partCount_ + part];
+    forEachRun(part, [&](unsigned int block, unsigned int faceBegin, unsigned int faceEnd) {
+        std::iota(faces_.data + places[block], faces_.data + places[block] + (faceEnd - faceBegin), faceBegin);
+        places[block] += faceEnd - faceBegin;
+    });
+}
+
+template <class Visit> void PointBlocks::forEachRun(std::size_t part, Visit const& visit) const
+{
+    unsigned int const* const offset = mesh_.faceOffset->data;
+    unsigned int const* corner = mesh_.faceVertex->data + offset[beginOfPart(part)];
+    unsigned int const begin = beginOfPart(part), end = beginOfPart(part + 1);
+    if (areTriangles_[part]) {
+        for (unsigned int face = begin; face != end;) {
+            // Most faces have all corners in the block of the face before.
+            unsigned int const a = corner[0] >> shift_, firstPoint = a << shift_, firstFace = face;
+            auto const isInside = [=, size = 1u << shift_](unsigned int point) { return point - firstPoint < size; };
+            for (; face != end && isInside(corner[0]) && isInside(corner[1]) && isInside(corner[2]); corner += 3)
+                ++face;
+            if (face != firstFace) {
+                visit(a, firstFace, face);
+                continue;
+            }
+            unsigned int const b = corner[1] >> shift_, c = corner[2] >> shift_;
+            visit(a, face, face + 1);
+            if (b != a)
+                visit(b, face, face + 1);
+            if (c != a && c != b)
+                visit(c, face, face + 1);
+            ++face;
+            corner += 3;
+        }
+        return;
+    }
+    std::vector<unsigned int> lastFaces(count_, end); // that were visited
+    for (unsigned int face = begin; face != end; ++face)
+        for (; corner != mesh_.faceVertex->data + offset[face + 1]; ++corner)
+            if (unsigned int const block = *corner >> shift_; lastFaces[block] != face) {
+                lastFaces[block] = face;
+                visit(block, face, face + 1);
+            }
+}
+
+template <class Visit> void PointBlocks::forEachCorner(unsigned int block, Visit const& visit) const
+{
+    unsigned int const* const pointAt = mesh_.faceVertex->data;
+    unsigned int const* const offset = mesh_.faceOffset->data;
+    for (std::size_t part = 0; part != partCount_; ++part)
+        if (areTriangles_[part]) {
+            unsigned int const begin = beginOfPart(part), firstCorner = offset[begin];
+            for (unsigned int const face : facesOf(block, part)) {
+                unsigned int const corner = firstCorner + 3 * (face - begin);
+                unsigned int const a = pointAt[corner], b = pointAt[corner + 1], c = pointAt[corner + 2];
+                visit(a, CornerAtPoint{b, c, corner, face});
+                visit(b, CornerAtPoint{c, a, corner + 1, face});
+                visit(c, CornerAtPoint{a, b, corner + 2, face});
+            }
+        } else
+            for (unsigned int const face : facesOf(block, part)) {
+                unsigned int const first = offset[face], end = offset[face + 1];
+                bool const hasSides = end - first >= 3;
+                for (unsigned int corner = first; corner != end; ++corner) {
+                    unsigned int const next = !hasSides ? corner : corner + 1 == end ? first : corner + 1;
+                    unsigned int const previous = !hasSides ? corner : corner == first ? end - 1 : corner - 1;
+                    visit(pointAt[corner], CornerAtPoint{pointAt[next], pointAt[previous], corner, face});
+                }
+            }
+}
+
+void PointBlocks::list(unsigned int block, BlockCorners& corners) const
+{
+    unsigned int const first = block << shift_;
+    unsigned int const count = std::min(mesh_.pointCount() - first, 1u << shift_);
+    corners.firstPoint_ = first;
+    corners.pointCount_ = count;
+    corners.offsets_.assign(std::size_t{count} + 2, 0);
+    unsigned int* const place = corners.offsets_.data() + 1;
+    // One unsigned comparison tests first <= point < first + count, here and below.
+    forEachCorner(block, [=](unsigned int point, CornerAtPoint const&) {
+        if (point - first < count)
+            ++place[point - first + 1];
+    });
+    std::inclusive_scan(place, place + count + 1, place);
+    if (corners.corners_.size < place[count])
+        corners.corners_ = Orvan::Array<CornerAtPoint>(place[count] + place[count] / 4, Orvan::kUninitialized);
+    CornerAtPoint* const entry = corners.corners_.data;
+    forEachCorner(block, [=](unsigned int point, CornerAtPoint const& corner) {
+        if (point - first < count)
+            entry[place[point - first]++] = corner;
+    });
+}
+
+}
