@@ -2,6 +2,7 @@
 
 import os
 import pathlib
+import struct
 import threading
 
 import pytest
@@ -68,6 +69,17 @@ def test_files_that_fail_say_why_and_stay(tmp_path: pathlib.Path) -> None:
         modeling.read("a\0.ply")
     with pytest.raises(modeling.FileError):
         modeling.read(tmp_path / "\udce4.ply")
+
+
+def test_invalid_geometry_is_refused_with_the_sentence_of_the_validator(tmp_path: pathlib.Path) -> None:
+    file = tmp_path / "broken.h5"
+    modeling.write(modeling.read(SAMPLES / "stitch-triangle.obj"), file)
+    valid = file.read_bytes()
+    corners = struct.pack("<3I", 0, 1, 2)
+    assert valid.count(corners) == 1
+    file.write_bytes(valid.replace(corners, struct.pack("<3I", 0, 1, 99)))
+    with pytest.raises(modeling.InvalidGeometry, match="broken.h5 does not contain a valid mesh: .*sFaceVertex.*99"):
+        modeling.read(file)
 
 
 def test_a_pipe_is_read_while_python_writes_to_it(tmp_path: pathlib.Path) -> None:

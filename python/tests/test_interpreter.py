@@ -102,6 +102,28 @@ def test_an_interrupt_that_is_handled_does_not_change_the_result() -> None:
     assert signal.getsignal(signal.SIGINT) is signal.default_int_handler
 
 
+EXHAUSTED = """
+import resource, sys
+import modeling
+mesh = modeling.read(sys.argv[1])
+before = modeling.topology(modeling.subdivide(mesh, relative=0.05))
+pages = int(open("/proc/self/statm").read().split()[0])
+resource.setrlimit(resource.RLIMIT_AS, (pages * resource.getpagesize() + 300_000_000,) * 2)
+try:
+    modeling.subdivide(mesh, relative=0.0001)
+except MemoryError:
+    print("MemoryError")
+assert modeling.topology(modeling.subdivide(mesh, relative=0.05)) == before
+"""
+
+
+def test_an_operation_that_runs_out_of_memory_leaves_its_argument() -> None:
+    done = subprocess.run(
+        [sys.executable, "-c", EXHAUSTED, SAMPLES / "cylinder.obj"], capture_output=True, text=True, timeout=120
+    )
+    assert (done.returncode, done.stdout) == (0, "MemoryError\n"), done.stderr
+
+
 def test_threads_are_limited() -> None:
     all_threads = modeling.thread_count()
     with modeling.threads(1) as limit:
