@@ -79,7 +79,7 @@ namespace {
         std::size_t line() const
         {
             // The end of a number is only known after the next character.
-            char const* const last = std::max(text_.data(), position_ - 1);
+            char const* const last = position_ == text_.data() ? position_ : position_ - 1;
             return 1 + static_cast<std::size_t>(std::count(text_.data(), last, '\n'));
         }
 
