@@ -102,6 +102,7 @@ namespace {
             builder.expectPoints(pointCount);
             builder.expectOtherPoints(header_.pointCount);
             builder.expectFaces(faceCount);
+            builder.expectCorners(3 * faceCount);
             for (std::uint64_t point = 0; point < pointCount; ++point) {
                 in.beginElement("point", first + point);
                 readPoint(point);

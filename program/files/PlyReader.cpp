@@ -56,10 +56,12 @@ namespace {
             for (PlyProperty& property : element.properties)
                 if (property.use == PlyProperty::Use::Value)
                     property.target += first * property.stride;
-            if (element.name == "vertex")
+            if (element.name == "vertex") {
                 builder.expectPoints(end - first);
-            else if (element.name == "face")
+            } else if (element.name == "face") {
                 builder.expectFaces(end - first);
+                builder.expectCorners(3 * (end - first));
+            }
             builder.expectOtherPoints(pointCount_);
             PlyElementReader(in, builder).read(element, first, end);
         }

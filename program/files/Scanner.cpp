@@ -155,6 +155,33 @@ Coordinate TextScanner::decimalCoordinate(std::string_view digits, double value)
     return {value, std::abs(value - static_cast<double>(rounded)) > leastReportedLoss(digits)};
 }
 
+/// In most files all lines begin with a character that is neither a blank nor #. As long as that is so, line ends are
+/// counted, which compilers do for many bytes at a time.
+std::uint64_t TextScanner::countLines()
+{
+    constexpr std::ptrdiff_t kBlock = 255; // so that a byte can count the line ends of a block
+    auto const isPlain = [](char c) { return static_cast<unsigned char>(c) > '#'; };
+    std::uint64_t count = atLineEnd() ? 0 : 1;
+    for (char const *block = at_, *next = at_; block != end_; block = next) {
+        next = block + std::min(kBlock, end_ - block);
+        unsigned char lineEnds = 0, plainLines = 0;
+        for (char const* c = block; next != end_ && c != next; ++c) {
+            lineEnds = static_cast<unsigned char>(lineEnds + (*c == '\n'));
+            plainLines = static_cast<unsigned char>(plainLines + ((*c == '\n') & isPlain(c[1])));
+        }
+        if (next != end_ && lineEnds == plainLines) {
+            count += lineEnds;
+            continue;
+        }
+        for (char const* c = std::find(block, next, '\n'); c != next; c = std::find(c + 1, next, '\n')) {
+            at_ = c + 1;
+            count += atLineEnd() ? 0 : 1;
+        }
+    }
+    skipAll();
+    return count;
+}
+
 std::vector<std::size_t> TextScanner::partsOf(InputFile const& file, std::size_t begin, std::size_t partBytes)
 {
     std::string_view const text(file.bytes.get(), file.size);

@@ -223,13 +223,7 @@ public:
     void skipTo(std::size_t position) { at_ = file_.bytes.get() + position; }
 
     /// Advances to the end. \return the number of lines that are not empty
-    std::uint64_t countLines()
-    {
-        std::uint64_t count = 0;
-        for (; !atEnd(); at_ = lineEnd())
-            count += !atLineEnd();
-        return count;
-    }
+    std::uint64_t countLines();
 
     void nextLine()
     {

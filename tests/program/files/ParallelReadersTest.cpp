@@ -292,12 +292,12 @@ namespace {
     /// A number as programs write them: short, with more digits than a float has, rarely none at all.
     std::string randomNumber(Random& random)
     {
-        unsigned int const kind = random.below(200);
+        unsigned int const kind = random.below(1000);
         return kind == 0 ? "nan"
             : kind == 1  ? "1e999"
             : kind == 2  ? "-"
-            : kind < 60  ? std::to_string(random.below(5))
-            : kind < 120 ? std::to_string(random.coordinate())
+            : kind < 300 ? std::to_string(random.below(5))
+            : kind < 600 ? std::to_string(random.coordinate())
                          : std::to_string(random.below(5)) + ".123456789" + std::to_string(random.below(3));
     }
 
@@ -311,13 +311,13 @@ namespace {
     std::string randomOff(Random& random)
     {
         bool const hasNormals = random.below(3) == 0, hasTextures = random.below(3) == 0;
-        unsigned int const pointCount = random.below(30), faceCount = random.below(30), colors = random.below(6);
+        unsigned int const pointCount = 1 + random.below(30), faceCount = random.below(30), colors = random.below(6);
         std::string text = random.below(3) == 0 ? "\xEF\xBB\xBF" : "";
         text += std::string(hasTextures ? "ST" : "") + (hasNormals ? "NOFF\n" : "OFF ") + std::to_string(pointCount)
             + " " + std::to_string(faceCount + (random.below(9) == 0)) + (random.below(2) == 0 ? " 0\n" : "\n");
         auto const addColor = [&] {
-            unsigned int const values = random.below(9) != 0 ? 3 : random.below(5);
-            for (unsigned int i = 0; random.below(6) < colors && i != values; ++i)
+            unsigned int const values = random.below(200) == 0 ? random.below(5) : random.below(6) < colors ? 3 : 0;
+            for (unsigned int i = 0; i != values; ++i)
                 text += " " + std::to_string(random.below(256)) + (random.below(40) == 0 ? ".5" : "");
         };
         for (unsigned int point = 0; point != pointCount; ++point) {
@@ -339,7 +339,7 @@ namespace {
 
     std::string randomTextPly(Random& random)
     {
-        unsigned int const pointCount = random.below(30), faceCount = random.below(30);
+        unsigned int const pointCount = 1 + random.below(30), faceCount = random.below(30);
         bool const hasLists = random.below(3) == 0, hasQuality = random.below(2) == 0;
         bool const areFacesFirst = random.below(5) == 0;
         std::string points, faces;
@@ -433,8 +433,8 @@ namespace {
             Random random(4);
             int readCount = 0;
             for (int i = 0; i != 400; ++i) {
-                std::string content = format.make(random);
-                for (unsigned int change = random.below(4) == 0 ? 1 + random.below(3) : 0; change != 0; --change)
+                std::string content = format.make(random) + "\n";
+                for (unsigned int change = random.below(4) == 0 ? random.below(4) : 0; change != 0; --change)
                     content[random.below(content.size())] = "\n 0a-#\r."[random.below(8)];
                 SCOPED_TRACE(name + " " + std::to_string(i) + "\n" + content);
                 store(folder / name, content);

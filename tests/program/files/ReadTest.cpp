@@ -236,6 +236,7 @@ namespace {
         EXPECT_THAT(readContent(".xyz", "a b c\n1 2 3\n").notes, ElementsAre(HasSubstr("does not name columns x")));
         EXPECT_EQ(valuesOf<double>(*readContent(".xyz", "x y z t\n0 0 0 123456789.125\n").object, "t"),
             std::vector<double>{123456789.125});
+        EXPECT_EQ(refusalOf(".xyz", "x y z r g b nx ny nz\n"), ""); // no points
     }
 
     TEST(ReadGeometryFile, LeavesOutBrokenElementsIfLenient)
