@@ -3,6 +3,7 @@
 #include "Errors.h"
 #include "Facts.h"
 
+#include "geometry/FaceMeasures.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshTopology.h"
 #include "geometry/Shape.h"

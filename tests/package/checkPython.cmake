@@ -6,5 +6,14 @@ set(folder ${BUILD_DIR}/package-test/python)
 file(REMOVE_RECURSE ${folder})
 run(${CMAKE_COMMAND} --install ${BUILD_DIR} --prefix ${folder}/prefix)
 file(RENAME ${folder}/prefix ${folder}/moved)
-run(${CMAKE_COMMAND} -E env PYTHONPATH=${folder}/moved/${LIBDIR}/python3
-    ${PYTHON} -c "import modeling, sys; sys.exit(not modeling.__file__.startswith('${folder}/moved'))")
+# The example of the README reads a sample.
+file(CREATE_LINK ${SOURCE_DIR}/samples ${folder}/samples SYMBOLIC)
+file(READ ${SOURCE_DIR}/README.md readme)
+write_block(python "${readme}" ${folder}/readme.py)
+run(${CMAKE_COMMAND} -E chdir ${folder} ${CMAKE_COMMAND} -E env PYTHONPATH=${folder}/moved/${LIBDIR}/python3
+    ${PYTHON} -c "
+import modeling
+assert modeling.__file__.startswith('${folder}/moved'), modeling.__file__
+exec(open('readme.py').read())
+modeling.write(fine, 'fine.h5')
+assert modeling.read('fine.h5') == fine and fine.face_count > 10000")
