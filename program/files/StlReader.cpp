@@ -80,7 +80,8 @@ namespace {
                     {static_cast<float>(x.value), static_cast<float>(y.value), static_cast<float>(z.value)});
             if (point == builder_.pointCount()) {
                 builder_.addPoint(x, y, z);
-                if (x.losesDigits || y.losesDigits || z.losesDigits)
+                bool const isKept = std::isfinite(x.value) && std::isfinite(y.value) && std::isfinite(z.value);
+                if (isKept && (x.losesDigits || y.losesDigits || z.losesDigits))
                     losses_.push_back({point, std::max({lossOf(x.value), lossOf(y.value), lossOf(z.value)})});
             }
             builder_.addCorner(point);
@@ -93,7 +94,7 @@ namespace {
         {
             double largestLoss = 0;
             for (Loss const& loss : losses_)
-                if (numbers[loss.point] >= first && std::isfinite(loss.value))
+                if (numbers[loss.point] >= first)
                     largestLoss = std::max(largestLoss, loss.value);
             builder_.keepNewPoints(numbers, first, largestLoss);
         }

@@ -19,7 +19,7 @@ namespace {
     constexpr unsigned int kFacesPerPart = 4096;
 
     // Each block reads all corners of its faces, so there are fewer blocks if large faces would be read more often.
-    constexpr std::uint64_t kMostReads = 64; // of a corner, on average
+    constexpr std::uint64_t kMostReads = 8; // of a corner, on average
 
     std::uint64_t blockCount(MeshArrays const& mesh, unsigned int shift)
     {
@@ -166,7 +166,8 @@ void PointBlocks::list(unsigned int block, BlockCorners& corners) const
     });
     std::inclusive_scan(place, place + count + 1, place);
     if (corners.corners_.size < place[count])
-        corners.corners_ = Orvan::Array<CornerAtPoint>(place[count] + place[count] / 4, Orvan::kUninitialized);
+        corners.corners_ =
+            Orvan::Array<CornerAtPoint>(std::uint64_t{place[count]} + place[count] / 4, Orvan::kUninitialized);
     CornerAtPoint* const entry = corners.corners_.data;
     forEachCorner(block, [=](unsigned int point, CornerAtPoint const& corner) {
         if (point - first < count)

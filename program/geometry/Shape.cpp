@@ -52,8 +52,8 @@ namespace {
         }
         Extent& operator+=(Extent const& other)
         {
-            add(other.min);
-            add(other.max);
+            min = lowerCorner(min, other.min);
+            max = upperCorner(max, other.max);
             return *this;
         }
     };

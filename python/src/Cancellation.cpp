@@ -124,7 +124,7 @@ namespace {
         {
             CancelOnInterrupt const cancelling;
             checkSignals(); // those that arrived before
-            py::gil_scoped_release const unlocked;
+            Unlocked const unlocked;
             try {
                 isDone = runOnce(work);
             } catch (...) {
@@ -146,7 +146,7 @@ namespace {
         constexpr std::chrono::milliseconds kPause{1};
         while (Orvan::isJobCancelled()) {
             {
-                py::gil_scoped_release const unlocked;
+                Unlocked const unlocked;
                 std::this_thread::sleep_for(kPause);
             }
             checkSignals();
@@ -160,7 +160,7 @@ void Internal::runCancellable(std::function<void()> const& work)
     auto const run = [&] {
         if (isMainThread())
             return runInterruptibly(work);
-        py::gil_scoped_release const unlocked;
+        Unlocked const unlocked;
         return runOnce(work);
     };
     while (!run())

@@ -7,14 +7,38 @@
 #include <type_traits>
 #include <utility>
 
+#include <cxxabi.h>
+#include <unistd.h>
+
 namespace ModelingPython {
 
 namespace py = pybind11;
 
+/// Gives the interpreter lock back during its lifetime. A daemon thread that is still at work when the interpreter ends never
+/// gets it again: Python would end that thread by unwinding its stack, which does not pass through C++; it waits instead.
+class Unlocked {
+public:
+    Unlocked() = default;
+    Unlocked(Unlocked const&) = delete;
+    Unlocked& operator=(Unlocked const&) = delete;
+    ~Unlocked()
+    {
+        try {
+            PyEval_RestoreThread(state_);
+        } catch (abi::__forced_unwind&) {
+            for (;;)
+                ::pause();
+        }
+    }
+
+private:
+    PyThreadState* state_ = PyEval_SaveThread();
+};
+
 /// Runs `work` without the interpreter lock, so that other Python threads continue. It must not use Python objects.
 template <class Work> auto withoutLock(Work const& work)
 {
-    py::gil_scoped_release const unlocked;
+    Unlocked const unlocked;
     return work();
 }
 

@@ -1,5 +1,7 @@
 #include "Construction.h"
 
+#include "Cancellation.h"
+
 #include "Texts.h"
 #include "Views.h"
 
@@ -181,13 +183,15 @@ namespace {
         auto corners = Orvan::MutablePtr<Orvan::Array<unsigned int>>::make();
         auto offsets = Orvan::MutablePtr<Orvan::Array<unsigned int>>::make();
         offsets->append(0);
-        for (py::handle const face : faces) {
+        for (py::object const face : faces) {
             std::string const name = "face " + std::to_string(offsets->size - 1);
             if (PySequence_Check(face.ptr()) == 0 || PyUnicode_Check(face.ptr()) != 0)
                 raiseTypeError(name + " is not a sequence of point indices");
-            for (py::handle const corner : py::reinterpret_borrow<py::sequence>(face)) {
+            for (py::object const corner : py::reinterpret_borrow<py::sequence>(face)) {
                 auto const index = py::reinterpret_steal<py::object>(PyNumber_Index(corner.ptr()));
                 if (!index) {
+                    if (PyErr_ExceptionMatches(PyExc_TypeError) == 0)
+                        throw py::error_already_set();
                     PyErr_Clear();
                     raiseTypeError(name + " has a corner that is not an integer");
                 }
@@ -248,11 +252,7 @@ namespace {
 
 void requireValid(Object const& object)
 {
-    GeoValidator::Status status;
-    {
-        py::gil_scoped_release const unlocked;
-        status = ModelingProgram::validate(object);
-    }
+    GeoValidator::Status const status = withoutLock([&] { return ModelingProgram::validate(object); });
     if (!status)
         raiseInvalidGeometry(std::string(status.message().view()));
 }

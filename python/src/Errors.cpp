@@ -6,7 +6,8 @@
 #include "shell/Failure.h"
 
 #include <algorithm>
-#include <regex>
+#include <iterator>
+#include <string_view>
 
 namespace ModelingPython {
 
@@ -24,23 +25,47 @@ namespace {
         return py::module_::import(kErrors).attr(name);
     }
 
+    bool isNameCharacter(char c)
+    {
+        return (c >= 'a' && c <= 'z') || c == '-';
+    }
+
+    /// Whether the text ends with a command and a blank: "modeling repair ".
+    bool endsWithCommand(std::string_view text)
+    {
+        constexpr std::string_view program = "modeling ";
+        if (!text.ends_with(' '))
+            return false;
+        text.remove_suffix(1);
+        std::size_t const size = text.size();
+        while (!text.empty() && isNameCharacter(text.back()))
+            text.remove_suffix(1);
+        return text.size() != size && text.ends_with(program);
+    }
+
     /// The sentence with arguments of Python instead of options: "min_value" for "--min-value". Options of a whole command
     /// line, "modeling repair --only fill", stay.
     std::string withArguments(std::string const& sentence)
     {
-        static std::regex const option("(modeling [a-z-]+ )?--([a-z][a-z-]*)");
         std::string text;
-        auto rest = sentence.begin();
-        for (std::sregex_iterator found(sentence.begin(), sentence.end(), option), end; found != end; ++found) {
-            std::smatch const& match = *found;
-            text.append(rest, match[0].first);
-            std::string name = match[1].matched ? match.str() : match[2].str();
-            if (!match[1].matched)
-                std::replace(name.begin(), name.end(), '-', '_');
-            text += name;
-            rest = match[0].second;
+        for (std::size_t i = 0; i != sentence.size();) {
+            std::size_t end = i + 2;
+            bool const isOption = sentence.compare(i, 2, "--") == 0 && end < sentence.size() && sentence[end] != '-'
+                && isNameCharacter(sentence[end]);
+            if (!isOption) {
+                text += sentence[i++];
+                continue;
+            }
+            while (end != sentence.size() && isNameCharacter(sentence[end]))
+                ++end;
+            if (endsWithCommand(std::string_view(sentence).substr(0, i)))
+                text.append(sentence, i, end - i);
+            else
+                std::replace_copy(sentence.begin() + static_cast<std::ptrdiff_t>(i + 2),
+                    sentence.begin() + static_cast<std::ptrdiff_t>(end), std::back_inserter(text), '-', '_');
+            i = end;
         }
-        return text.append(rest, sentence.end());
+        return text;
     }
 
     /// Sets the Python exception for a failure of the program.

@@ -20,6 +20,14 @@ struct Facts {
 /// The facts of a handle, which is given empty ones if it has none.
 Facts& factsOf(Handle& handle);
 
+/// The mesh as it is now: Python code that runs during an operation may give the handle another object. Both share what
+/// becomes known of the object.
+inline Mesh snapshotOf(Mesh& mesh)
+{
+    factsOf(mesh);
+    return mesh;
+}
+
 /// The object. Operations may read and write outside arrays if it is invalid, so all take it from here.
 /// \throws  `InvalidGeometry` with the sentence of the validator
 Orvan::Ptr<Tessara::Object> validObjectOf(Handle& handle);

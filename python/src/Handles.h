@@ -22,7 +22,9 @@ public:
     {
     }
 
-    Orvan::Ptr<Tessara::Object> const& object() const { return object_; }
+    /// A reference of the caller's own: whenever Python code runs, or the interpreter lock is released, the handle may
+    /// get another object.
+    Orvan::Ptr<Tessara::Object> object() const { return object_; }
     void replace(Orvan::Ptr<Tessara::Object> object)
     {
         object_ = std::move(object);

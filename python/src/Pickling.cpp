@@ -175,12 +175,17 @@ namespace {
         {
             if (level > kMostLevels || state.empty())
                 refuseState();
-            auto const known = values_.find(state.ptr());
-            if (known != values_.end())
-                return known->second;
-            PropertyValue value = restoreNew(state, level);
-            values_.emplace(state.ptr(), value);
-            return value;
+            Restored& known = values_[state.ptr()];
+            if (known.levels == 0) {
+                int const outer = std::exchange(levels_, 0);
+                known.value = restoreNew(state, level);
+                known.levels = levels_ + 1;
+                levels_ = outer;
+            }
+            if (level + known.levels > kMostLevels + 1)
+                refuseState();
+            levels_ = std::max(levels_, known.levels);
+            return known.value;
         }
 
         PropertyValue restoreNew(py::tuple const& state, int level)
@@ -197,7 +202,7 @@ namespace {
             if (kind == "strings")
                 return restoreStrings(state);
             if (kind == "locations")
-                return restoreLocations(state[1].cast<py::list>());
+                return restoreLocations(py::tuple(state[1].cast<py::list>()));
             if (kind == "array")
                 return restoreArray(state[1].cast<std::string>(), state[2]);
             return restoreOther(kind, state[1].cast<std::string>(), state);
@@ -252,7 +257,7 @@ namespace {
             return location;
         }
 
-        static PropertyValue restoreLocations(py::list const& states)
+        static PropertyValue restoreLocations(py::tuple const& states)
         {
             auto locations = Orvan::MutablePtr<Orvan::Array<GeoLocation>>::make(states.size());
             for (std::size_t i = 0; i != states.size(); ++i)
@@ -295,7 +300,12 @@ namespace {
             }
         }
 
-        std::map<PyObject*, PropertyValue> values_;
+        struct Restored {
+            PropertyValue value;
+            int levels = 0; // of objects in it, and itself
+        };
+        std::map<PyObject*, Restored> values_;
+        int levels_ = 0; // the most that a value inside the one being restored has
     };
 
     py::object restore(py::object const& type, py::object const& state)

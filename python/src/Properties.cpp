@@ -317,7 +317,8 @@ namespace {
         Orvan::String const target = targetKey(toText(targetText));
         auto values = rangeIndices(indices, what);
         requireTarget(*handle.object(), target);
-        Object const& former = *handle.object();
+        Orvan::Ptr<Object> const held = handle.object();
+        Object const& former = *held;
         if (isComponent(former, target) && values->size != getElementCount(former, target))
             raiseValueError(what + " has " + std::to_string(values->size) + " indices for "
                 + std::to_string(getElementCount(former, target)) + " " + targetName(target));

@@ -224,14 +224,7 @@ namespace {
             if (!py::isinstance<py::array>(base)) {
                 if (memoryIn(base) || PyBytes_Check(base) != 0)
                     return true;
-                py::object const other = py::reinterpret_borrow<py::object>(base);
-                Py_buffer buffer;
-                if (PyObject_GetBuffer(base, &buffer, PyBUF_WRITABLE) == 0) {
-                    PyBuffer_Release(&buffer);
-                    return false;
-                }
-                PyErr_Clear();
-                return PyObject_CheckBuffer(base) != 0;
+                return false; // a buffer may be read-only here and writable elsewhere
             }
             if (isWritable(base) && Py_REFCNT(base) != 1)
                 return false;

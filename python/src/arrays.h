@@ -28,7 +28,12 @@ template <class T, class Number> Orvan::Array<T> arrayOf(Values<Number> const& v
         throw py::value_error("an array has the wrong shape");
     Orvan::Array<T> result(static_cast<std::uint64_t>(values.shape(0)), Orvan::kUninitialized);
     if (values.size() != 0)
-        std::memcpy(result.data, values.data(), static_cast<std::size_t>(values.size()) * sizeof(Number));
+        std::memcpy(
+            static_cast<void*>(result.data), values.data(), static_cast<std::size_t>(values.size()) * sizeof(Number));
+    if constexpr (std::is_same_v<Number, bool>) { // NumPy can view other bytes as bool
+        auto* const byte = reinterpret_cast<unsigned char*>(result.data);
+        std::transform(byte, byte + result.size, byte, [](unsigned char value) { return value != 0 ? 1 : 0; });
+    }
     return result;
 }
 

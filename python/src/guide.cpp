@@ -1,5 +1,6 @@
 #include "Bindings.h"
 #include "Cancellation.h"
+#include "Creation.h"
 #include "Errors.h"
 #include "Facts.h"
 #include "GuideHandle.h"
@@ -201,10 +202,12 @@ namespace {
 
 void bindGuide(py::module_& module)
 {
-    py::class_<Band>(module, "Band").def(py::init(&bandOf));
+    py::class_<Band> band(module, "Band");
+    defineCreation(band, &bandOf);
     module.def("write_volume", &writeVolume);
-    py::class_<Guide>(module, "Guide")
-        .def_static("read", &readGuideFile)
+    py::class_<Guide> guideClass(module, "Guide");
+    refuseCreation(guideClass);
+    guideClass.def_static("read", &readGuideFile)
         .def_static("from_array", &guideOfArray)
         .def_static("from_surface", &guideOfSurface)
         .def("sample", &sample)

@@ -1,5 +1,6 @@
 #include "Bindings.h"
 #include "Cancellation.h"
+#include "Creation.h"
 #include "Facts.h"
 #include "arrays.h"
 
@@ -72,17 +73,19 @@ kept. Building takes linear time; looking up an edge is a short search.
 >>> edges.find(4, 7)   # the face with the edge from point 4 to point 7, and its corner at point 7  # doctest: +SKIP
 (12, 2))";
 
+    std::unique_ptr<HalfEdges> makeHalfEdges(Mesh& mesh)
+    {
+        Orvan::Ptr<Tessara::Object> const object = validObjectOf(mesh);
+        return withoutLock([&] { return std::make_unique<HalfEdges>(object); });
+    }
+
 }
 
 void bindHalfEdges(py::module_& module)
 {
-    py::class_<HalfEdges>(module, "HalfEdges", kDoc)
-        .def(py::init([](Mesh& mesh) {
-            Orvan::Ptr<Tessara::Object> const object = validObjectOf(mesh);
-            return withoutLock([&] { return std::make_unique<HalfEdges>(object); });
-        }),
-            py::arg("mesh"))
-        .def("__len__", &HalfEdges::size, "The number of directed edges.")
+    py::class_<HalfEdges> halfEdges(module, "HalfEdges", kDoc);
+    defineCreation(halfEdges, &makeHalfEdges, py::arg("mesh"));
+    halfEdges.def("__len__", &HalfEdges::size, "The number of directed edges.")
         .def("valence", &HalfEdges::valence, py::arg("point"),
             "The number of directed edges that end at a point: its valence on a closed manifold.")
         .def("find", &HalfEdges::find, py::arg("start"), py::arg("end"),

@@ -1,4 +1,5 @@
 #include "Bindings.h"
+#include "Cancellation.h"
 
 #include "Program.h"
 #include "commands/Operation.h"
@@ -187,7 +188,7 @@ namespace {
         std::optional<py::error_already_set> interrupt;
         for (bool isReady = false; !isReady;) {
             {
-                py::gil_scoped_release const unlocked;
+                Unlocked const unlocked;
                 isReady = work.wait_for(kInterval) == std::future_status::ready;
             }
             if (!isReady && !interrupt && PyErr_CheckSignals() != 0) {

@@ -1,5 +1,6 @@
 #include "Bindings.h"
 #include "Cancellation.h"
+#include "Creation.h"
 #include "Errors.h"
 #include "Facts.h"
 #include "arrays.h"
@@ -113,9 +114,9 @@ namespace {
 
 void bindStitch(py::module_& module)
 {
-    py::class_<StitchTemplate>(module, "StitchTemplate")
-        .def(py::init(&makeTemplate))
-        .def_property_readonly("corner_count", &StitchTemplate::getPolySize)
+    py::class_<StitchTemplate> stitchTemplate(module, "StitchTemplate");
+    defineCreation(stitchTemplate, &makeTemplate);
+    stitchTemplate.def_property_readonly("corner_count", &StitchTemplate::getPolySize)
         .def_property_readonly("tolerance", &StitchTemplate::getTol)
         .def_property_readonly("errors", &messagesOf)
         .def_property_readonly("weights", &weightsOf)

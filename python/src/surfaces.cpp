@@ -137,8 +137,9 @@ namespace {
     }
 
     py::object subdivide(
-        Mesh& mesh, std::optional<float> tolerance, std::optional<float> relative, Guide const* guide, bool checks)
+        Mesh& given, std::optional<float> tolerance, std::optional<float> relative, Guide const* guide, bool checks)
     {
+        Mesh mesh = snapshotOf(given);
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
         char const* const operation = guide ? "subdivide_by_volume" : "subdivide";
         if (checks)
@@ -268,9 +269,10 @@ namespace {
         return dropped;
     }
 
-    py::object smooth(Mesh& mesh, float amount, std::optional<Values<float>> const& factors, bool pinsBoundary,
+    py::object smooth(Mesh& given, float amount, std::optional<Values<float>> const& factors, bool pinsBoundary,
         std::optional<double> sharpDegrees)
     {
+        Mesh mesh = snapshotOf(given);
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
         requireNoIsolatedPoints(mesh, *object);
         MeshArrays const arrays = arraysOf(*object);
@@ -309,8 +311,9 @@ namespace {
 
     // -- Slivers
 
-    py::object removeSlivers(Mesh& mesh, float ratio, bool checks)
+    py::object removeSlivers(Mesh& given, float ratio, bool checks)
     {
+        Mesh mesh = snapshotOf(given);
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
         if (checks)
             requireClosedTriangles("remove_slivers", true, mesh);

@@ -1,4 +1,5 @@
 #include "Bindings.h"
+#include "Creation.h"
 
 #include <tbb/global_control.h>
 #include <tbb/info.h>
@@ -41,14 +42,19 @@ namespace {
 
 Results do not depend on the number of threads. Of several limits in force, the lowest counts.)";
 
+    std::unique_ptr<Threads> makeThreads(py::ssize_t count)
+    {
+        return std::make_unique<Threads>(count);
+    }
+
 }
 
 void bindThreads(py::module_& module)
 {
-    py::class_<Threads>(module, "threads", kDoc)
-        .def(py::init<py::ssize_t>(), py::arg("count"))
-        .def("__enter__", &Threads::enter, py::return_value_policy::reference_internal)
-        .def("__exit__", [](Threads& threads, py::args const&) { threads.exit(); });
+    py::class_<Threads> threads(module, "threads", kDoc);
+    defineCreation(threads, &makeThreads, py::arg("count"));
+    threads.def("__enter__", &Threads::enter, py::return_value_policy::reference_internal)
+        .def("__exit__", [](Threads& limit, py::args const&) { limit.exit(); });
     module.def(
         "thread_count", [] { return tbb::global_control::active_value(tbb::global_control::max_allowed_parallelism); },
         "The number of threads that operations may use now.");

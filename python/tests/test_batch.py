@@ -271,3 +271,13 @@ def test_types() -> None:
         env={**os.environ, "MYPYPATH": os.path.dirname(package)},
     )
     assert result.returncode == 0, result.stdout + result.stderr
+
+
+def test_outputs_stay_in_their_folder_and_replace_only_files(batch: Batch, tmp_path: Path) -> None:
+    pyramid(tmp_path / "a" / "b" / "p.obj")
+    pyramid(tmp_path / "data" / "q.obj")
+    assert main(["recipe.json", "*/../../*/data/*.obj", "--out", "out"]) == 2
+    (tmp_path / "out").mkdir(exist_ok=True)
+    os.mkfifo(tmp_path / "out" / "q.ply")
+    status, statuses = batch("data")
+    assert status == 1 and list(statuses.values()) == ["failed"]

@@ -4,6 +4,7 @@ from __future__ import annotations
 
 import argparse
 import hashlib
+import io
 import json
 import os
 import sys
@@ -120,6 +121,9 @@ def _requirements(text: str) -> str:
 def main(arguments: Sequence[str] | None = None) -> int:
     options = make_parser().parse_args(arguments)
     options.require = options.require or ""
+    for stream in (sys.stdout, sys.stderr):
+        if isinstance(stream, io.TextIOWrapper):
+            stream.reconfigure(errors="backslashreplace")  # names of files need not be text
     try:
         with interruptible():
             return _run(options)

@@ -106,6 +106,9 @@ def _make_job(path: str, relative: str, folder: str, format: str) -> Job:
             raise BatchError(f"{path}: such files cannot be written, so --format or the recipe has to name the format")
     stem = os.path.splitext(relative.rpartition("#")[0] if part else relative)[0]
     name = f"{stem}-{part.replace(os.sep, '-')}.{format}" if part else f"{stem}.{format}"
+    name = os.path.normpath(name)
+    if name.split(os.sep)[0] == "..":
+        raise BatchError(f"{path} would be written outside of {folder}: give its folder as an input of its own")
     return Job(name, path, os.path.join(folder, name), format)
 
 
@@ -129,6 +132,8 @@ def _settle(job: Job, settings: Settings, record: Entry | None, force: bool) -> 
     if not os.path.lexists(job.output):
         return job
     recorded = record["hashes"]["output"] if record else None
+    if not os.path.isfile(job.output):
+        return make_entry(job, "failed", f"{job.output} exists, and is not a file", recorded)
     try:
         present = hash_file(job.output)
     except OSError as error:
@@ -136,16 +141,16 @@ def _settle(job: Job, settings: Settings, record: Entry | None, force: bool) -> 
     if recorded not in (present, UNKNOWN) and not force:
         why = "it has been changed since" if recorded else "no batch has written it"
         return make_entry(job, "failed", f"{job.output} exists, and {why}; --force replaces it", recorded)
-    if record and recorded == present and record["status"] in ("done", "current") and _is_current(job, settings, record):
+    if record and recorded == present and record.get("status") in ("done", "current") and _is_current(job, settings, record):
         return {**record, "status": "current", "input": job.input}
     return replace(job, old_hash=present)
 
 
 def _is_current(job: Job, settings: Settings, record: Entry) -> bool:
     hashes = record["hashes"]
-    if hashes["recipe"] != settings.digest or hashes["library"] != settings.version:
+    if hashes.get("recipe") != settings.digest or hashes.get("library") != settings.version:
         return False
     try:
-        return bool(hashes["input"] == hash_input(job.input))
+        return bool(hashes.get("input") == hash_input(job.input))
     except OSError:
         return False

@@ -51,6 +51,8 @@ def read_recipe(path: str) -> Recipe:
         checked = _modeling.check_recipe(text)
     except tomllib.TOMLDecodeError as error:
         raise BatchError(f"{path} cannot be read: {error}") from None
+    except RecursionError:
+        raise BatchError(f"{path} cannot be read: its values are nested too deeply") from None
     except _modeling.RecipeError as error:
         line = line_in_toml(source, error.step, error.key) if is_toml else error.line
         raise BatchError(f"{path}: {f'line {line}: ' if line else ''}{error}") from None

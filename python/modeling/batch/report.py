@@ -85,7 +85,7 @@ def _read_records(path: str) -> dict[str, Entry]:
         return {}
     except OSError as error:
         raise BatchError(f"{path} cannot be read: {error.strerror}") from None
-    except (ValueError, KeyError, TypeError):
+    except (ValueError, KeyError, TypeError, RecursionError):
         raise BatchError(f"{path} exists, but is no report of a batch: move it away") from None
 
 

@@ -66,7 +66,7 @@ def _buffers_of(file: str) -> Iterator[str]:
         with open(file, "rb") as stream:
             buffers = json.load(stream).get("buffers", [])
         uris = [buffer["uri"] for buffer in buffers if "uri" in buffer]
-    except (ValueError, AttributeError, TypeError):
+    except (ValueError, AttributeError, TypeError, RecursionError):
         return  # the library will say what is wrong with it
     for uri in uris:
         path = os.path.join(os.path.dirname(file), urllib.parse.unquote(str(uri)))

@@ -65,7 +65,10 @@ namespace Internal {
 
     template <class T> void release(ControlBlock<T>* control) noexcept
     {
-        if (control && control->count.fetch_sub(1, std::memory_order_acq_rel) == control->permanent + 1)
+        if (!control)
+            return;
+        std::uint64_t const last = control->permanent + 1; // not read later: another thread may release the block
+        if (control->count.fetch_sub(1, std::memory_order_acq_rel) == last)
             control->dispose();
     }
 
