@@ -17,6 +17,8 @@ set(program_geometry shell files frame) # the library's frame, for its lists of 
 set(program_shell files)
 set(program_files frame) # parallel loops and copies of arrays
 
+set(python_src commands geometry shell files top) # of the program: recipes run its commands as steps
+
 # Headers at the top of a tree that every folder may include.
 set(common_headers Vectors.h)
 
@@ -99,7 +101,7 @@ function(check_public folder file)
     set(wrong ${wrong} PARENT_SCOPE)
 endfunction()
 
-foreach(tree src program)
+foreach(tree src program python)
     file(GLOB_RECURSE files ${SOURCE_DIR}/${tree}/*.h ${SOURCE_DIR}/${tree}/*.cpp)
     foreach(file IN LISTS files)
         check_quoted(${tree} ${file})
