@@ -429,7 +429,9 @@ namespace {
     TEST(ParallelReaders, TextsAreReadInPartsAsInOne)
     {
         TemporaryFolder const folder;
-        for (auto const& [name, format] : kTextFormats) {
+        for (auto const& entry : kTextFormats) {
+            std::string const& name = entry.first;
+            TextFormat const& format = entry.second; // clang 14 cannot capture names of a structured binding
             Random random(4);
             int readCount = 0;
             for (int i = 0; i != 400; ++i) {
