@@ -1,7 +1,8 @@
 """Measures the package beside the library without Python, and beside VTK and meshio if they are installed.
 
     cmake --build build/release --target ModelingPython ModelingPythonReference
-    /usr/bin/python3 python/benchmarks/benchmark.py [--build build/release] [--faces 1000000] [--rounds 9] [--threads 1] [GROUP...]
+    /usr/bin/python3 python/benchmarks/benchmark.py [--build build/release] [--faces 1000000] [--rounds 9]
+        [--threads 1] [GROUP...]
 
 Groups: calls, large, vtk, meshio. All contenders of a row run in turn, round after round, and the least time of each counts:
 processor time (of the thread for calls, of the process otherwise) and wall time. VTK and meshio are the Debian packages
@@ -48,7 +49,9 @@ def import_peer(name: str, package: str) -> Any:
 # -- Measuring
 
 
-def measure(works: dict[str, Work], rounds: int, clock: Callable[[], float] = time.process_time) -> dict[str, tuple[float, float]]:
+def measure(
+    works: dict[str, Work], rounds: int, clock: Callable[[], float] = time.process_time
+) -> dict[str, tuple[float, float]]:
     """The least processor time and the least wall time of each, in seconds."""
     least = {name: (np.inf, np.inf) for name in works}
     for turn in range(rounds + 1):
@@ -111,19 +114,43 @@ def tiny_calls(m: Any, r: Any) -> Iterator[tuple[str, Work, Callable[[int], obje
     point = np.array([[0, 0, 1]], np.float32)
     mask, index = np.array([True, False, False, False]), np.array([0])
     yield "mesh.points", lambda: mesh.points, None
-    yield "add_points_to_point_cloud", lambda: m.add_points_to_point_cloud(cloud, point), lambda n: r.add_points_to_point_cloud(cloud, n)
-    yield "delete_points_in_point_cloud", lambda: m.delete_points_in_point_cloud(cloud, index), lambda n: r.delete_points_in_point_cloud(cloud, index, n)
+    yield (
+        "add_points_to_point_cloud",
+        lambda: m.add_points_to_point_cloud(cloud, point),
+        lambda n: r.add_points_to_point_cloud(cloud, n),
+    )
+    yield (
+        "delete_points_in_point_cloud",
+        lambda: m.delete_points_in_point_cloud(cloud, index),
+        lambda n: r.delete_points_in_point_cloud(cloud, index, n),
+    )
     yield "delete_faces", lambda: m.delete_faces(mesh, mask), lambda n: r.delete_faces(mesh, mask, n)
-    yield "delete_components", lambda: m.delete_components(cloud, "points", mask), lambda n: r.delete_components(cloud, "sPointComp", mask, n)
-    yield "compute_deleted_component_mapping", lambda: m.compute_deleted_component_mapping(mask), lambda n: r.compute_deleted_component_mapping(mask, n)
-    yield "copy_non_geo_properties", lambda: m.copy_non_geo_properties(mesh, [mesh]), lambda n: r.copy_non_geo_properties(mesh, n)
+    yield (
+        "delete_components",
+        lambda: m.delete_components(cloud, "points", mask),
+        lambda n: r.delete_components(cloud, "sPointComp", mask, n),
+    )
+    yield (
+        "compute_deleted_component_mapping",
+        lambda: m.compute_deleted_component_mapping(mask),
+        lambda n: r.compute_deleted_component_mapping(mask, n),
+    )
+    yield (
+        "copy_non_geo_properties",
+        lambda: m.copy_non_geo_properties(mesh, [mesh]),
+        lambda n: r.copy_non_geo_properties(mesh, n),
+    )
     yield "merge", lambda: m.merge([mesh, mesh]), lambda n: r.merge_meshes(mesh, n)
     yield "merge_meshes", lambda: m.merge_meshes([mesh, mesh]), lambda n: r.merge_meshes(mesh, n)
     yield "merge_point_clouds", lambda: m.merge_point_clouds([cloud, cloud]), lambda n: r.merge_point_clouds(cloud, n)
     yield "merge_strands", lambda: m.merge_strands([strands, strands]), lambda n: r.merge_strands(strands, n)
     yield "triangulate", lambda: m.triangulate(mesh), lambda n: r.triangulate(mesh, n)
     yield "subdivide", lambda: m.subdivide(mesh, 10), lambda n: r.subdivide(mesh, 10, n)
-    yield "subdivide_by_volume", lambda: m.subdivide_by_volume(mesh, guide, 10), lambda n: r.subdivide_by_volume(mesh, guide._guide, 10, n)
+    yield (
+        "subdivide_by_volume",
+        lambda: m.subdivide_by_volume(mesh, guide, 10),
+        lambda n: r.subdivide_by_volume(mesh, guide._guide, 10, n),
+    )
     yield "large_faces", lambda: m.large_faces(mesh, 10), lambda n: r.large_faces(mesh, 10, n)
     yield "smooth", lambda: m.smooth(mesh, 0.5), lambda n: r.smooth(mesh, 0.5, n)
     yield "remove_slivers", lambda: m.remove_slivers(mesh), lambda n: r.remove_slivers(mesh, 0.05, n)
@@ -252,15 +279,16 @@ def measure_meshio(m: Any, r: Any, arguments: argparse.Namespace) -> None:
     mesh = m.Mesh(*triangles(arguments.faces // 4))
     rows = []
     with tempfile.TemporaryDirectory() as folder:
-        for name, options in {"mesh.ply": {}, "mesh.stl": {}, "mesh.obj": {}}.items():
+        for name in ("mesh.ply", "mesh.stl", "mesh.obj"):
             file = f"{folder}/{name}"
-            m.write(mesh, file, **options)
+            m.write(mesh, file)
             read = meshio.read(file)
             assert sum(len(block.data) for block in read.cells) == mesh.face_count
             size = Path(file).stat().st_size / 1e6
-            rows.append([f"{name[-3:].upper()}, {size:.0f} MB", *compare(lambda: m.read(file), lambda: meshio.read(file), min(arguments.rounds, 3))])
-    print_table(f"Reading {mesh.face_count:,} triangles, meshio {meshio.__version__}, {arguments.threads} threads: processor / wall time in ms",
-                ["file", "modeling", "meshio", "times as long"], rows)
+            times = compare(lambda: m.read(file), lambda: meshio.read(file), min(arguments.rounds, 3))
+            rows.append([f"{name[-3:].upper()}, {size:.0f} MB", *times])
+    print_table(f"Reading {mesh.face_count:,} triangles, meshio {meshio.__version__}, {arguments.threads} threads: "
+                "processor / wall time in ms", ["file", "modeling", "meshio", "times as long"], rows)
 
 
 GROUPS = {"calls": measure_calls, "large": measure_large, "vtk": measure_vtk, "meshio": measure_meshio}
