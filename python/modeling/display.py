@@ -13,7 +13,7 @@ def text(geometry: _modeling.Geometry) -> str:
     """`<modeling.Mesh: 8 points, 6 faces, 24 corners; points: w (float)>`"""
     parts = [", ".join(f"{count:,} {name}" for name, count in geometry.components.items())]
     parts += [f"{target}: {', '.join(names)}" for target, names in _properties(geometry).items()]
-    return f"<modeling.{type(geometry).__name__}: {'; '.join(parts)}>"
+    return _printable(f"<modeling.{type(geometry).__name__}: {'; '.join(parts)}>")
 
 
 def html(geometry: _modeling.Geometry) -> str:
@@ -31,9 +31,13 @@ def html(geometry: _modeling.Geometry) -> str:
     )
 
 
-def _safe(text: str) -> str:
+def _printable(text: str) -> str:
     """Names may have bytes that are not UTF-8, which cannot be displayed."""
-    return escape(text.encode("utf-8", "replace").decode())
+    return text.encode("utf-8", "replace").decode()
+
+
+def _safe(text: str) -> str:
+    return escape(_printable(text))
 
 
 def _properties(geometry: _modeling.Geometry) -> dict[str, list[str]]:

@@ -26,10 +26,13 @@ AnyGeometry = TypeVar("AnyGeometry", Mesh, PointCloud, StrandSet)
 
 _COMPONENTS = {"points": "sPointComp", "faces": "sFaceComp", "corners": "sFaceVertexComp", "strands": "sStrandComp"}
 
+# Comparing with these takes a tenth of the time that comparing with a class of NumPy does.
+_FLOAT32, _BOOL, _INT64 = np.dtype(np.float32), np.dtype(np.bool_), np.dtype(np.int64)
+
 
 def _numbers(values: ArrayLike, name: str) -> NDArray[np.float32]:
     array = np.asarray(values)
-    if array.dtype == np.float32:
+    if array.dtype == _FLOAT32:
         return array
     if array.dtype.kind not in "fiu" and array.size != 0:
         raise TypeError(f"{name} has to hold real numbers, not {array.dtype}")
@@ -51,7 +54,7 @@ def _selected(elements: ArrayLike, name: str) -> NDArray[np.bool_] | NDArray[np.
     array = np.asarray(elements)
     if array.ndim != 1:
         raise ValueError(f"{name} has to have one dimension, not {array.ndim}")
-    if array.dtype == np.bool_ or array.dtype == np.int64:
+    if array.dtype == _BOOL or array.dtype == _INT64:
         return array
     if array.size == 0:
         return np.empty(0, np.int64)
@@ -141,7 +144,7 @@ def compute_deleted_component_mapping(deleted: ArrayLike) -> NDArray[np.uint32]:
     array([         0, 4294967294,          1], dtype=uint32)
     """
     array = np.asarray(deleted)
-    if array.dtype != np.bool_ or array.ndim != 1:
+    if array.dtype != _BOOL or array.ndim != 1:
         raise TypeError("deleted has to be a mask: booleans in one dimension")
     return _modeling.compute_deleted_component_mapping(array)
 
@@ -361,4 +364,6 @@ def topology(mesh: Mesh) -> Topology:
     >>> facts.closed_manifold, facts.genus, facts.edges
     (True, 0, 384)
     """
-    return Topology(**_modeling.topology(mesh))
+    facts = object.__new__(Topology)
+    facts.__dict__.update(_modeling.topology(mesh))  # not one by one, as frozen classes do
+    return facts

@@ -155,10 +155,10 @@ namespace {
 
 }
 
-void Internal::runCancellable(std::function<void()> const& work)
+void Internal::runCancellable(std::function<void()> const& work, bool isBrief)
 {
     auto const run = [&] {
-        if (isMainThread())
+        if (!isBrief && isMainThread())
             return runInterruptibly(work);
         Unlocked const unlocked;
         return runOnce(work);

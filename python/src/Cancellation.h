@@ -43,20 +43,23 @@ template <class Work> auto withoutLock(Work const& work)
 }
 
 namespace Internal {
-    void runCancellable(std::function<void()> const& work);
+    void runCancellable(std::function<void()> const& work, bool isBrief);
 }
 
 /// Does the same for work that checks whether the job is cancelled. On the main thread, Ctrl-C cancels it, and the
 /// exception that the Python handler of SIGINT raises is thrown. If the handler raises none, or if the job of another
 /// thread was meant, the work starts again: so it must not have side effects if it is cancelled.
-template <class Work> auto runCancellable(Work const& work)
+/// \param isBrief  the work takes milliseconds: Ctrl-C waits for its end, which saves hooking the signal
+template <class Work> auto runCancellable(Work const& work, bool isBrief = false)
 {
     using Result = std::invoke_result_t<Work>;
     std::optional<Result> result;
-    Internal::runCancellable([&] {
-        result.reset();
-        result.emplace(work());
-    });
+    Internal::runCancellable(
+        [&] {
+            result.reset();
+            result.emplace(work());
+        },
+        isBrief);
     return std::move(*result);
 }
 

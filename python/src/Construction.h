@@ -24,4 +24,8 @@ Orvan::Ptr<Tessara::Object> withPositions(Tessara::Object const& object, py::han
 /// \throws `modeling.InvalidGeometry`  with the sentence of the host's validator
 void requireValid(Tessara::Object const& object);
 
+/// A new instance of a class derived from `Handle`, made as its base in this module makes it: `__new__` of a derived class
+/// may take arguments, and `__init__` is not called.
+py::object newInstance(py::handle type);
+
 }

@@ -27,18 +27,6 @@ template <class T> inline constexpr bool kIsRecord =
 template <class T> inline constexpr bool kIsViewable =
     kIsRecord<T> || ModelingProgram::ElementLayout<T>::components != 0;
 
-/// NumPy's text for a scalar type: "f4".
-template <class Scalar> std::string scalarFormat()
-{
-    if constexpr (std::is_same_v<Scalar, bool>)
-        return "?";
-    else
-        return (std::is_floating_point_v<Scalar>  ? "f"
-                       : std::is_signed_v<Scalar> ? "i"
-                                                  : "u")
-            + std::to_string(sizeof(Scalar));
-}
-
 /// The fields of a record.
 py::dtype recordType(Tessara::Geometry::ElementType<Tessara::Geometry::Common::GeometryType>);
 py::dtype recordType(Tessara::Geometry::ElementType<Tessara::Geometry::Mesh::FaceEdge>);
@@ -50,7 +38,7 @@ template <class T> py::dtype numpyType()
     if constexpr (kIsRecord<T>)
         return recordType(Tessara::Geometry::ElementType<T>{});
     else if constexpr (kIsViewable<T>)
-        return py::dtype(scalarFormat<typename ModelingProgram::ElementLayout<T>::Scalar>());
+        return py::dtype::of<typename ModelingProgram::ElementLayout<T>::Scalar>();
     else
         return py::dtype("O");
 }

@@ -132,22 +132,51 @@ namespace {
         type.attr("__init__") = py::cpp_function(initialize, py::name("initialize"), py::is_method(type), extra...);
     }
 
+    /// What a derived class adds: None, its `__dict__`, or a pair of that and of the values in its slots.
+    py::object stateOf(py::handle self)
+    {
+        PyTypeObject* const type = Py_TYPE(self.ptr());
+        bool const isDerived = py::detail::all_type_info(type)[0]->type != type;
+        return isDerived ? py::object(self.attr("__getstate__")()) : py::none();
+    }
+
+    void setState(py::handle self, py::handle state)
+    {
+        if (state.is_none())
+            return;
+        if (py::hasattr(self, "__setstate__")) {
+            self.attr("__setstate__")(state);
+            return;
+        }
+        bool const hasSlots = py::isinstance<py::tuple>(state) && py::len(state) == 2;
+        py::object const attributes =
+            hasSlots ? py::object(state[py::int_(0)]) : py::reinterpret_borrow<py::object>(state);
+        if (!attributes.is_none())
+            self.attr("__dict__").attr("update")(attributes);
+        if (hasSlots)
+            for (auto const& [name, value] : py::dict(state[py::int_(1)]))
+                py::setattr(self, name, value);
+    }
+
+    py::object copyWithoutState(py::handle self)
+    {
+        py::object copy = newInstance(py::type::handle_of(self));
+        copy.cast<Handle&>().replace(self.cast<Handle&>().object());
+        return copy;
+    }
+
     py::object copyOf(py::object const& self)
     {
-        py::object const type = py::type::of(self);
-        py::object copy = type.attr("__new__")(type);
-        copy.cast<Handle&>().replace(self.cast<Handle&>().object());
-        if (py::hasattr(self, "__dict__"))
-            copy.attr("__dict__").attr("update")(self.attr("__dict__"));
+        py::object copy = copyWithoutState(self);
+        setState(copy, stateOf(self));
         return copy;
     }
 
     py::object deepCopyOf(py::object const& self, py::dict const& memo)
     {
-        py::object copy = copyOf(self);
-        if (py::hasattr(self, "__dict__"))
-            copy.attr("__dict__")
-                .attr("update")(py::module_::import("copy").attr("deepcopy")(self.attr("__dict__"), memo));
+        py::object copy = copyWithoutState(self);
+        memo[py::int_(reinterpret_cast<std::uintptr_t>(self.ptr()))] = copy; // attributes may refer to the object
+        setState(copy, py::module_::import("copy").attr("deepcopy")(stateOf(self), memo));
         return copy;
     }
 
@@ -296,6 +325,16 @@ StrandSet([points_of_first, points_of_second, ...])
                 "Properties of strands: a mapping from names to arrays with one row per strand.");
     }
 
+}
+
+py::object newInstance(py::handle type)
+{
+    auto const& classes = py::detail::all_type_info(reinterpret_cast<PyTypeObject*>(type.ptr()));
+    auto instance = py::reinterpret_steal<py::object>(
+        classes.at(0)->type->tp_new(reinterpret_cast<PyTypeObject*>(type.ptr()), py::tuple().ptr(), nullptr));
+    if (!instance)
+        throw py::error_already_set();
+    return instance;
 }
 
 py::object makeHandle(Orvan::Ptr<Object> object)

@@ -1,4 +1,5 @@
 #include "Bindings.h"
+#include "Construction.h"
 #include "ElementForms.h"
 #include "Handles.h"
 #include "Texts.h"
@@ -324,7 +325,7 @@ namespace {
         py::object const expected = py::type::of(makeHandle(object));
         if (PyObject_IsSubclass(type.ptr(), expected.ptr()) != 1)
             refuseState();
-        py::object self = type.attr("__new__")(type);
+        py::object self = newInstance(type);
         self.cast<Handle&>().replace(std::move(object));
         return self;
     }
@@ -332,11 +333,8 @@ namespace {
     py::tuple reduce(py::object const& self, int protocol)
     {
         py::tuple const state = Describer(protocol).describe(*self.cast<Handle&>().object(), "");
-        py::object const attributes = py::hasattr(self, "__dict__") && py::len(self.attr("__dict__")) != 0
-            ? py::object(self.attr("__dict__"))
-            : py::object(py::none());
         return py::make_tuple(py::module_::import("modeling.data").attr("_restore"),
-            py::make_tuple(py::type::of(self), state), attributes);
+            py::make_tuple(py::type::of(self), state), self.attr("__getstate__")());
     }
 
 }

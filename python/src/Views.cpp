@@ -173,14 +173,19 @@ namespace {
             {static_cast<float>(x), static_cast<float>(y), static_cast<float>(z)}};
     }
 
-    /// The exception that is being handled, as the cause of one that also says where.
+    /// Raises the exception that is being handled as the cause of one that also says where, if it is about the value.
     [[noreturn]] void raiseForElement(py::error_already_set& error, std::string const& what, std::uint64_t element)
     {
-        std::string const sentence = toText(py::str(error.value()));
-        py::object const kind = error.type();
-        bool const isText = kind.is(py::handle(PyExc_TypeError));
-        raise(isText ? PyExc_TypeError : PyExc_ValueError,
-            what + ": element " + std::to_string(element) + ": " + sentence);
+        bool const isType = error.matches(PyExc_TypeError);
+        if (!isType && !error.matches(PyExc_ValueError))
+            throw; // KeyboardInterrupt, MemoryError, or what code of the element raised
+        try {
+            raise(isType ? PyExc_TypeError : PyExc_ValueError,
+                what + ": element " + std::to_string(element) + ": " + toText(py::str(error.value())));
+        } catch (py::error_already_set& located) {
+            PyException_SetCause(located.value().ptr(), py::object(error.value()).release().ptr());
+            throw;
+        }
     }
 
     template <class T, class Convert>
@@ -344,13 +349,23 @@ PropertyValue valuesFrom(py::array const& array, std::string const& what)
 }
 
 namespace {
+    /// Whether nobody can write the memory of a view. A buffer that is read-only here, such as that of a mapped file, may
+    /// be writable elsewhere.
+    bool isConstant(py::object const& view)
+    {
+        py::object const exporter = view.attr("obj");
+        if (py::isinstance<py::array>(exporter))
+            return static_cast<bool>(ownerOfConstant(py::reinterpret_borrow<py::array>(exporter)));
+        return PyBytes_Check(exporter.ptr()) != 0;
+    }
+
     template <class T> Orvan::Ptr<Orvan::Array<T>> typedValuesIn(py::buffer_info const& memory, py::object const& owner)
     {
         static_assert(kIsViewable<T>);
         std::uint64_t const bytes = static_cast<std::uint64_t>(memory.size * memory.itemsize),
                             count = bytes / sizeof(T);
         bool const isBroken = std::is_same_v<T, bool> && !areBooleans(memory.ptr, count);
-        if (count != 0 && memory.readonly && !isBroken
+        if (count != 0 && memory.readonly && !isBroken && isConstant(owner)
             && reinterpret_cast<std::uintptr_t>(memory.ptr) % alignof(T) == 0)
             return Orvan::makeForeignArray(static_cast<T const*>(memory.ptr), count, PythonOwner(owner));
         if (isBroken)

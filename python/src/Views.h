@@ -43,8 +43,8 @@ template <class T> Orvan::Ptr<Orvan::Array<T>> valuesFrom(py::array const& array
 /// \throws py::value_error, py::type_error  if none does
 Tessara::PropertyValue valuesFrom(py::array const& array, std::string const& what);
 
-/// Values of the element type with this name in bytes that nobody writes, such as a buffer that was received, kept by
-/// `owner`. They are copied if they are not aligned, or not marked as read-only.
+/// Values of the element type with this name in the memory of `owner`, a `memoryview`. They are copied if they are not
+/// aligned, or if somebody can write them: only `bytes` and views of geometry are certain to stay as they are.
 /// \return empty if there is no viewable type of that name
 Tessara::PropertyValue valuesIn(std::string const& elementType, py::buffer_info const& memory, py::object const& owner);
 

@@ -35,7 +35,6 @@ namespace {
         };
         auto const typical = std::find_if_not(objects.begin(), objects.end(), isEmpty);
         GeometryType const type = typeOf(typical == objects.end() ? *objects[0] : **typical);
-        std::vector<std::string> kinds;
         bool areAlike = true;
         for (std::uint64_t i = 0; i != objects.size; ++i) {
             if (isEmpty(objects[i]) && typeOf(*objects[i]) != type) {
@@ -44,12 +43,14 @@ namespace {
                 objects[i] = std::move(empty);
             }
             areAlike = areAlike && typeOf(*objects[i]) == type;
-            kinds.push_back(fmt::format("object {} is a {}", i, nameOf(typeOf(*objects[i]))));
         }
-        if (!areAlike)
-            refuse("merge joins meshes with meshes, point clouds with point clouds, or strand sets with strand sets",
-                kinds);
-        return type;
+        if (areAlike)
+            return type;
+        std::vector<std::string> kinds;
+        for (std::uint64_t i = 0; i != objects.size; ++i)
+            kinds.push_back(fmt::format("object {} is a {}", i, nameOf(typeOf(*objects[i]))));
+        refuse(
+            "merge joins meshes with meshes, point clouds with point clouds, or strand sets with strand sets", kinds);
     }
 
     /// The objects are validated here: the library would leave out invalid ones silently.

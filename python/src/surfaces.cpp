@@ -79,14 +79,22 @@ namespace {
 
     constexpr char kAdvice[] = "Dividing the tolerance by 3 makes about nine times as many faces.";
 
-    /// Whether the result may be so large that memory has to be watched. There is one limit per process.
-    bool mayBeLarge(float tolerance, Object const& mesh)
+    enum class Extent { Brief, Medium, Large };
+
+    /// How much a refinement may make.
+    /// \return  `Brief` for few faces, `Large` if memory has to be watched
+    Extent extentOf(float tolerance, GuideGrid const* guide, Object const& mesh)
     {
-        constexpr float kManyFaces = 300; // along the diagonal
+        constexpr float kFewFaces = 10, kManyFaces = 300; // along the diagonal
+        constexpr unsigned int kFewPoints = 100;
         auto const box = boundingBoxOf(mesh);
-        return box
-            && std::hypot(box->max.x - box->min.x, box->max.y - box->min.y, box->max.z - box->min.z)
-            > kManyFaces * tolerance;
+        if (!box)
+            return Extent::Medium;
+        float const diagonal = std::hypot(box->max.x - box->min.x, box->max.y - box->min.y, box->max.z - box->min.z);
+        if (diagonal > kManyFaces * tolerance)
+            return Extent::Large;
+        bool const isBrief = diagonal <= kFewFaces * tolerance && getElementCount(mesh, sPointComp) < kFewPoints;
+        return isBrief && !guide ? Extent::Brief : Extent::Medium; // a guide may divide the tolerance by any number
     }
 
     /// Runs a refinement. If it needs more than the free memory, it ends with `Failure` before the system kills the
@@ -146,15 +154,18 @@ namespace {
             requireClosedTriangles(operation, false, mesh);
         GuideGrid const* const grid = guide ? &guide->grid() : nullptr;
         float const size = refinementTolerance(tolerance, relative, *object, grid);
-        Refined refined;
-        runCancellable([&] {
-            auto const work = [&] { refined = refine(size, grid, object); };
-            if (mayBeLarge(size, *object))
-                runWithinMemory(work);
-            else
-                work();
-            return 0;
-        });
+        Extent const extent = extentOf(size, grid, *object);
+        Refined refined = runCancellable(
+            [&] {
+                Refined made;
+                auto const work = [&] { made = refine(size, grid, object); };
+                if (extent == Extent::Large)
+                    runWithinMemory(work);
+                else
+                    work();
+                return made;
+            },
+            extent == Extent::Brief);
         if (!refined.object) {
             requireClosedTriangles(operation, false, mesh);
             refuse(fmt::format("{} failed: the mesh does not meet the requirements of the operation", operation));
@@ -238,15 +249,21 @@ namespace {
         return sum == 0;
     }
 
+    /// Whether all steps together take milliseconds.
+    bool isBrief(float amount, MeshArrays const& mesh)
+    {
+        constexpr double kFewCorners = 100'000; // in all steps
+        return (1.0 + static_cast<double>(amount)) * static_cast<double>(mesh.cornerCount()) < kFewCorners;
+    }
+
     Positions smoothed(float amount, MeshArrays const& mesh, Orvan::Array<float> const* weights)
     {
-        constexpr unsigned int kManyCorners = 100'000; // the steps of smaller meshes take milliseconds
         Positions positions = *mesh.positions;
         auto const run = [&](auto const& logger) {
             Geometry::Mesh::smooth(amount, mesh.pointCount(), mesh.faceCount(), *mesh.faceVertex, *mesh.faceOffset,
                 weights, positions, logger);
         };
-        if (mesh.cornerCount() < kManyCorners)
+        if (isBrief(amount, mesh))
             run(CoreGL::NOPLogger());
         else {
             stopBetweenSteps();
@@ -285,7 +302,7 @@ namespace {
         if (weights && !std::all_of(weights->begin(), weights->end(), [](float w) { return std::isfinite(w); }))
             refuse("the weights are not all finite");
         std::vector<std::string> dropped;
-        Orvan::Ptr<Object> result = runCancellable([&] {
+        auto const work = [&] {
             auto factor = weights;
             if (pinsBoundary || sharpDegrees) {
                 if (!factor)
@@ -303,7 +320,8 @@ namespace {
                 addDataProperty(sPointPosition, sPointComp, std::move(positions), *copy);
             }
             return Orvan::Ptr<Object>(std::move(copy));
-        });
+        };
+        Orvan::Ptr<Object> result = runCancellable(work, isBrief(amount, arrays));
         for (std::string const& name : dropped)
             warn(fmt::format("dropped {}: normals no longer fit the surface", name));
         return makeValid<Mesh>(std::move(result), factsOf(mesh));

@@ -84,6 +84,9 @@ def test_refuses_wrong_recipes_with_the_line(batch: Batch, tmp_path: Path, capsy
             ("modeling = 1\n" + steps + "amount = -1\n", "line 4: step 1 (smooth): --amount: -1 is not"),
             ("modeling = 1\n" + steps + "[output]\nformat = 'off'\n", 'line 5: "format" has to be one of'),
             ("modeling = 1\n" + steps + '[[steps]]\ndo = "subdivide"\n', "line 4: step 2 (subdivide): "),
+            ('modeling = 1\nsteps = [\n  {do = "smooth"}, # a comment\n  {do = "smooth", amuont = 1},\n]\n', "line 4: step 2 (smooth): "),
+            ('modeling = 1\nsteps = [\n{do = "smooth", amount = [\n1,\n2\n]}]\n', 'line 3: step 1 (smooth): "amount"'),
+            ('modeling = 1\nsteps = [\n{do = "delete-faces", box = [\n0, 0, 0, 1, 1, 1\n], amuont = 1}]\n', "line 5: step 1 (delete-faces): "),
             ("modeling = 2\n" + steps, "line 1: it is no recipe of version 1"),
             ("modeling = \n", "(at line 1, column 12)"),
         ],
@@ -201,6 +204,54 @@ def test_replaces_only_what_batches_have_written(batch: Batch, tmp_path: Path, c
     assert main(["recipe.json", "a.obj", "--out", "out", "--in-process"]) == 2
     assert "is no report of a batch" in capsys.readouterr().err
     assert Path("out/report.json").read_text() == "{}"
+
+
+def test_links_in_the_folder_are_followed_as_by_the_program(batch: Batch, tmp_path: Path) -> None:
+    pyramid(tmp_path / "a.obj")
+    pyramid(tmp_path / "b.obj")
+    target = write(tmp_path / "elsewhere/target.ply", "mine")
+    (tmp_path / "out").mkdir()
+    (tmp_path / "out/a.ply").symlink_to(target)
+    (tmp_path / "out/b.ply").symlink_to(tmp_path / "elsewhere/new.ply")
+    assert batch("a.obj", "b.obj") == (1, {"a.ply": "failed", "b.ply": "done"})
+    assert target.read_text() == "mine"
+    assert batch("a.obj", "b.obj", "--force") == (0, {"a.ply": "done", "b.ply": "current"})
+    assert os.path.islink("out/a.ply") and os.path.islink("out/b.ply")
+    program = [os.environ["MODELING_PROGRAM"], "run", "a.obj", "single.ply", "--recipe", "recipe.json"]
+    Path("single.ply").symlink_to("elsewhere/single.ply")
+    subprocess.run(program, check=True)
+    assert os.path.islink("single.ply")
+    for file in ("elsewhere/target.ply", "elsewhere/new.ply"):
+        assert Path(file).read_bytes() == Path("elsewhere/single.ply").read_bytes()
+    Path("out/b.ply").unlink()
+    Path("out/b.ply").symlink_to(target)
+    assert batch("a.obj", "b.obj", "--force")[0] == 2, "two outputs are one file"
+
+
+def test_hdf5_files_are_inputs_and_outputs(batch: Batch, tmp_path: Path) -> None:
+    left, right = (modeling.read(pyramid(tmp_path / "p.obj", height)) for height in (1, 2))
+    (tmp_path / "in").mkdir()
+    for name, mesh in (("left", left), ("right", right)):
+        modeling.write(mesh, f"in/scan.h5#{name}", overwrite=True)
+    output = {"format": "h5", "compress": 9}
+    steps = [{"do": "triangulate"}, {"do": "subdivide", "relative": 0.02}]
+    write(tmp_path / "packed.json", json.dumps({**RECIPE, "steps": steps, "output": output}))
+    write(tmp_path / "plain.json", json.dumps({**RECIPE, "steps": steps, "output": {"format": "h5"}}))
+    both = "in/scan.h5#left", "in/scan.h5#right"
+    names = {"scan-left.h5", "scan-right.h5"}
+    assert batch(*both, recipe="packed.json") == (0, dict.fromkeys(names, "done"))
+    for name, mesh in (("left", left), ("right", right)):
+        expected = modeling.subdivide(modeling.triangulate(mesh, keep_units=False), relative=0.02)
+        assert modeling.read(f"out/scan-{name}.h5") == expected
+        command = [os.environ["MODELING_PROGRAM"], "run", f"in/scan.h5#{name}", f"{name}.h5", "--compress", "9"]
+        subprocess.run([*command, "--recipe", "packed.json"], check=True, stdout=subprocess.DEVNULL)
+        assert Path(f"out/scan-{name}.h5").read_bytes() == Path(f"{name}.h5").read_bytes()
+    packed = os.path.getsize("out/scan-left.h5")
+    assert batch(*both, recipe="packed.json") == (0, dict.fromkeys(names, "current"))
+    assert batch(*both, recipe="plain.json") == (0, dict.fromkeys(names, "done"))
+    assert os.path.getsize("out/scan-left.h5") > packed
+    status, statuses = batch("in", "in/scan.h5#none", recipe="packed.json")
+    assert status == 1 and set(statuses.values()) == {"failed"}, "it has several objects, and none of that name"
 
 
 def test_interrupt_keeps_what_is_finished(batch: Batch, tmp_path: Path) -> None:

@@ -102,6 +102,25 @@ def test_an_interrupt_that_is_handled_does_not_change_the_result() -> None:
     assert signal.getsignal(signal.SIGINT) is signal.default_int_handler
 
 
+SMOOTHING = """
+import os, signal, sys, threading, time
+import modeling
+mesh = modeling.read(sys.argv[1])
+modeling.smooth(mesh, 1)
+threading.Thread(target=lambda: (time.sleep(0.2), os.kill(os.getpid(), signal.SIGINT))).start()
+try:
+    modeling.smooth(mesh, 1e7)
+except KeyboardInterrupt:
+    print("interrupted")
+"""
+
+
+def test_an_interrupt_ends_many_steps_on_a_small_mesh() -> None:
+    command = [sys.executable, "-c", SMOOTHING, SAMPLES / "cylinder.obj"]
+    done = subprocess.run(command, capture_output=True, text=True, timeout=60)  # all steps take much longer
+    assert done.stdout == "interrupted\n", done.stderr
+
+
 EXHAUSTED = """
 import resource, sys
 import modeling

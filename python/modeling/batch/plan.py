@@ -37,6 +37,11 @@ def find_jobs(inputs: list[str], folder: str, format: str) -> list[Job]:
             other = jobs.setdefault(job.name, job)
             if not _is_same(other.input, job.input):
                 raise BatchError(f"{other.input} and {job.input} would both be written to {job.output}")
+    written: dict[str, Job] = {}
+    for job in jobs.values():
+        other = written.setdefault(os.path.realpath(job.output), job)
+        if other is not job:
+            raise BatchError(f"{other.input} and {job.input} would both be written to {os.path.realpath(job.output)}")
     read = {os.path.realpath(split_object(job.input)[0]): job.input for job in jobs.values()}
     for job in jobs.values():
         if os.path.realpath(job.output) in read:
@@ -129,7 +134,7 @@ def make_plan(jobs: list[Job], settings: Settings, records: dict[str, Entry], fo
 
 
 def _settle(job: Job, settings: Settings, record: Entry | None, force: bool) -> Job | Entry:
-    if not os.path.lexists(job.output):
+    if not os.path.exists(job.output):  # a link to nothing is written through, as the program does
         return job
     recorded = record["hashes"]["output"] if record else None
     if not os.path.isfile(job.output):

@@ -95,20 +95,32 @@ def _plain(value: Any) -> Any:
 def line_in_toml(source: str, step: int, key: str) -> int:
     """The line of a key, counted from 1, or 0.
 
-    tomllib does not tell lines. But the shortest beginning of the document that has the key ends with it.
+    tomllib does not tell lines. But the shortest beginning of the document that has the key ends with it. Within an array
+    of steps over several lines, it has to be closed: after a step, or in an array or text that is a value of a step.
     """
     path: list[Any] = ["steps", step - 1, key][: 3 if key else 2] if step else list(key.split("."))
     lines = source.splitlines()
     begin = 0  # of what has been added since the last beginning that is a document
     for end in range(1, len(lines) + 1):
-        try:
-            value: Any = tomllib.loads("\n".join(lines[:end]))
-        except tomllib.TOMLDecodeError:
-            continue
-        try:
-            for part in path:
-                value = value[part]
-            return begin + 1
-        except (KeyError, IndexError, TypeError):
+        has_key = _has_key("\n".join(lines[:end]), path)
+        if has_key:
+            closings = ("\n]", "\n]}\n]", '\n"""', "\n'''") if path[0] == "steps" else ()
+            cuts = ((cut, closing) for cut in range(begin + 1, end) for closing in closings)
+            return next((cut for cut, closing in cuts if _has_key("\n".join(lines[:cut]) + closing, path)), end)
+        if has_key is False:
             begin = end
     return line_in_toml(source, step, "") if step and key else 0
+
+
+def _has_key(text: str, path: list[Any]) -> bool | None:
+    """None if the text is not a document."""
+    try:
+        value: Any = tomllib.loads(text)
+    except tomllib.TOMLDecodeError:
+        return None
+    try:
+        for part in path:
+            value = value[part]
+    except (KeyError, IndexError, TypeError):
+        return False
+    return True
