@@ -77,33 +77,40 @@ namespace {
         return formatTable({{"property"}, {"type"}, {"of"}, {"length", true}}, rows);
     }
 
-    Json countAndDescribe(Input const& input, Report& report)
+    /// What the text needs besides the document.
+    struct Description {
+        Json counts;
+        std::optional<BoundingBox> box;
+        std::vector<Property> properties;
+    };
+
+    Description countAndDescribe(Input const& input, Report& report)
     {
         Phase const phase(report, &Times::report, kReportTitle);
         Tessara::Object const& object = *input.object;
-        Json const counts = countsOf(object);
-        report.document["counts"] = counts;
-        report.document["boundingBox"] = describeBox(boundingBoxOf(object));
+        Description description{countsOf(object), boundingBoxOf(object), propertiesOf(object)};
+        report.document["counts"] = description.counts;
+        report.document["boundingBox"] = describeBox(description.box);
         if (typeOf(object) == GeometryType::Mesh && report.needsFacts()) {
             MeshArrays const mesh = arraysOf(object);
             report.document["topology"] =
                 describeTopology(mesh, input.topology ? *input.topology : analyzeTopology(mesh));
         }
-        report.document["properties"] = describeProperties(propertiesOf(object));
-        return counts;
+        report.document["properties"] = describeProperties(description.properties);
+        return description;
     }
 
     void describeFile(std::filesystem::path const& file, Report& report)
     {
         Input const loaded = loadInput(file, report);
-        Json const counts = countAndDescribe(loaded, report);
+        Description const description = countAndDescribe(loaded, report);
         Json const& input = report.document["inputs"][0];
         report.text = fmt::format("{}: {}, {}\n\n{}bounding box {}\n", printable(file.string()),
-            input["kind"].get<std::string>(), input["format"].get<std::string>(), formatValues({{"", counts}}),
-            formatBox(boundingBoxOf(*loaded.object)));
+            input["kind"].get<std::string>(), input["format"].get<std::string>(),
+            formatValues({{"", description.counts}}), formatBox(description.box));
         if (report.document.contains("topology"))
             report.text += "\n" + formatValues({{"", report.document["topology"]}});
-        report.text += "\n" + formatProperties(propertiesOf(*loaded.object));
+        report.text += "\n" + formatProperties(description.properties);
     }
 
     /// What is most important, in one line.

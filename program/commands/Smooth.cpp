@@ -4,6 +4,7 @@
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
 #include "geometry/Shape.h"
+#include "geometry/sumOverBlocks.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 
@@ -62,8 +63,22 @@ namespace {
 
     /// How far points moved.
     struct Displacement {
-        double mean = 0;
+        double sum = 0;
         double largest = 0;
+        bool areFinite = true; // the points after the move
+
+        void add(float3 const& before, float3 const& after)
+        {
+            double const moved = distance(before, after);
+            *this += {moved, moved, isFinite(after)};
+        }
+        Displacement& operator+=(Displacement const& other)
+        {
+            sum += other.sum;
+            largest = std::max(largest, other.largest);
+            areFinite = areFinite && other.areFinite;
+            return *this;
+        }
     };
 
     class Smooth final : public Edit {
@@ -75,7 +90,8 @@ namespace {
     private:
         Options options_;
         ShapeChange change_;
-        Displacement moved_;
+        double meanDisplacement_ = 0;
+        double largestDisplacement_ = 0;
         Json before_, after_;
         std::vector<std::string> dropped_;
     };
@@ -132,7 +148,8 @@ namespace {
     void handleIsolatedPoints(Options const& options, Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
-        Finding const isolated = findIsolatedPoints(arraysOf(mesh));
+        Finding const isolated =
+            subject.topology ? subject.topology->isolatedPoints : findIsolatedPoints(arraysOf(mesh));
         report.document["droppedPoints"] = isolated.count;
         if (!isolated)
             return;
@@ -149,48 +166,58 @@ namespace {
         subject.setKnown();
     }
 
+    /// Sums over the corners of all faces, of the edges that begin there.
     struct EdgeLengths {
-        double mean = 0;
-        double spread = 0; // standard deviation as a fraction of the mean
+        double sum = 0;
+        double squares = 0;
+
+        EdgeLengths& operator+=(EdgeLengths const& other)
+        {
+            sum += other.sum;
+            squares += other.squares;
+            return *this;
+        }
     };
 
     EdgeLengths edgeLengthsOf(MeshArrays const& mesh)
     {
-        double sum = 0, squares = 0, count = 0;
-        float3 const* const p = mesh.positions->data;
-        for (unsigned int face = 0; face != mesh.faceCount(); ++face) {
-            auto const corners = mesh.corners(face);
-            for (std::size_t i = 0; i != corners.size(); ++i) {
-                double const length = distance(p[corners[i]], p[corners[(i + 1) % corners.size()]]);
-                sum += length;
-                squares += length * length;
-                ++count;
+        float3 const* const position = mesh.positions->data;
+        return sumOverBlocks<EdgeLengths>(mesh.faceCount(), [&](std::size_t begin, std::size_t end) {
+            EdgeLengths block;
+            for (std::size_t face = begin; face != end; ++face) {
+                auto const corners = mesh.corners(static_cast<unsigned int>(face));
+                EdgeLengths own;
+                for (std::size_t i = 0, previous = corners.size() - 1; i < corners.size(); previous = i++) {
+                    double const edge =
+                        length(inDoubles(position[corners[i]]) - inDoubles(position[corners[previous]]));
+                    own += {edge, edge * edge};
+                }
+                block += own;
             }
-        }
-        double const mean = count == 0 ? 0 : sum / count;
-        double const variance = count == 0 ? 0 : std::max(0.0, squares / count - mean * mean);
-        return {mean, mean > 0 ? std::sqrt(variance) / mean : 0};
+            return block;
+        });
     }
 
     Json describeMesh(Object const& mesh)
     {
         MeshArrays const arrays = arraysOf(mesh);
         EdgeLengths const edges = edgeLengthsOf(arrays);
+        double const count = std::max(arrays.cornerCount(), 1u), mean = edges.sum / count;
+        double const variance = std::max(0.0, edges.squares / count - mean * mean);
         Json values = countsOf(mesh);
-        values["meanEdgeLength"] = numberOf(static_cast<float>(edges.mean));
-        values["spreadOfEdgeLengths"] = numberOf(static_cast<float>(edges.spread));
+        values["meanEdgeLength"] = numberOf(static_cast<float>(mean));
+        values["spreadOfEdgeLengths"] = numberOf(static_cast<float>(mean > 0 ? std::sqrt(variance) / mean : 0));
         return values;
     }
 
     Displacement displacementOf(Positions const& before, Positions const& after)
     {
-        double sum = 0, largest = 0;
-        for (std::uint64_t point = 0; point != before.size; ++point) {
-            double const moved = distance(before[point], after[point]);
-            sum += moved;
-            largest = std::max(largest, moved);
-        }
-        return {before.empty() ? 0 : sum / static_cast<double>(before.size), largest};
+        return sumOverBlocks<Displacement>(before.size, [&](std::size_t begin, std::size_t end) {
+            Displacement block;
+            for (std::size_t point = begin; point != end; ++point)
+                block.add(before[point], after[point]);
+            return block;
+        });
     }
 
     /// Removes the normals of points, corners and faces, which no longer fit the surface. \return their names
@@ -223,10 +250,12 @@ namespace {
                 *arrays.faceOffset, weights.get(), positions, CoreGL::OrvanLogger());
         });
 
-        if (!std::all_of(positions.begin(), positions.end(), [](float3 const& p) { return isFinite(p); }))
+        Displacement const displacement = displacementOf(*arrays.positions, positions);
+        if (!displacement.areFinite)
             throw Failure(ExitCode::Refused, "the coordinates are too large to be smoothed in single precision");
-        moved_ = displacementOf(*arrays.positions, positions);
-        dropped_ = moved_.largest != 0 ? dropNormals(mesh) : std::vector<std::string>();
+        meanDisplacement_ = displacement.sum / static_cast<double>(std::max<std::uint64_t>(positions.size, 1));
+        largestDisplacement_ = displacement.largest;
+        dropped_ = displacement.largest != 0 ? dropNormals(mesh) : std::vector<std::string>();
         if (report.needsFacts())
             before_ = describeMesh(mesh);
         addDataProperty(sPointPosition, sPointComp, std::move(positions), mesh);
@@ -234,9 +263,14 @@ namespace {
             subject.shape.reset(); // the topology stays
             return;
         }
-        if (!subject.topology || !subject.shape)
-            subject.setKnown(examine(arrays));
-        change_ = {*subject.shape, examine(arraysOf(mesh)).shape, largestMove(arrays, arraysOf(mesh))};
+        MeshArrays const moved = arraysOf(mesh);
+        if (subject.topology && subject.shape) {
+            change_ = {*subject.shape, examine(moved).shape, displacement.largest};
+        } else {
+            ExaminedMove const facts = examineMove(arrays, moved);
+            subject.topology = facts.topology;
+            change_ = {facts.before, facts.after, displacement.largest};
+        }
         subject.shape = change_.after;
         after_ = describeMesh(mesh);
         addShape(change_, before_, after_);
@@ -253,10 +287,10 @@ namespace {
             report);
         report.document["amount"] = numberOf(options_.amount);
         reportOperation(before_, after_, dropped_, report);
-        report.document["meanDisplacement"] = numberOf(static_cast<float>(moved_.mean));
-        report.document["largestDisplacement"] = numberOf(static_cast<float>(moved_.largest));
-        report.text +=
-            fmt::format("\nPoints moved by {:.4g} on average, by {:.4g} at most.\n", moved_.mean, moved_.largest);
+        report.document["meanDisplacement"] = numberOf(static_cast<float>(meanDisplacement_));
+        report.document["largestDisplacement"] = numberOf(static_cast<float>(largestDisplacement_));
+        report.text += fmt::format(
+            "\nPoints moved by {:.4g} on average, by {:.4g} at most.\n", meanDisplacement_, largestDisplacement_);
     }
 
 }

@@ -144,10 +144,10 @@ namespace {
         std::optional<ExaminedMesh> after;
         if (report.needsFacts()) {
             MeshArrays const arrays = arraysOf(mesh), triangles = arraysOf(result);
-            auto const [topology, shape, slivers] = subject.know();
-            after = examine(triangles);
-            change_ = {shape, after->shape, largestMove(arrays, triangles)};
-            before_ = describeMesh(mesh, topology);
+            ExaminedMesh const before = subject.know();
+            after = areIdentical(arrays, triangles) ? before : examine(triangles); // triangles stay as they are
+            change_ = {before.shape, after->shape, largestMove(arrays, triangles)};
+            before_ = describeMesh(mesh, before.topology);
             after_ = describeMesh(result, after->topology);
             addShape(change_, before_, after_);
             if (checksAreas_)

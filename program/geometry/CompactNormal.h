@@ -1,9 +1,11 @@
 #pragma once
 
-#include "Vectors.h"
+#include "frame/Lanes.h"
 
 #include <cmath>
+#include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <limits>
 #include <numbers>
 
@@ -15,16 +17,26 @@ struct CompactNormal {
     static constexpr int kUnit = 120;
     static constexpr int kZero = 128; // what stands for 0, so that coordinates can be compared as unsigned bytes
 
-    /// \param length  that of the vector
-    static CompactNormal of(double3 const& vector, double length)
+    /// How many normals are computed at a time.
+    static constexpr std::size_t kLanes = 4;
+
+    /// Sets the normals of four faces from vectors along them, of which x, y, z and the lengths are in arrays of their own.
+    static void set(double const* x, double const* y, double const* z, double const* length, CompactNormal* normals)
     {
-        double const scale = kUnit / length;
-        bool const isFinite = (length > 0) & (length < std::numeric_limits<double>::infinity());
-        // Without branches, so that a loop compiles to SIMD instructions.
-        auto const inUnits = [=](double coordinate) {
-            return static_cast<std::uint32_t>(kZero + static_cast<int>(isFinite ? coordinate * scale : 0));
+        using Doubles = double __attribute__((vector_size(kLanes * sizeof(double))));
+        using Bits = std::int64_t __attribute__((vector_size(kLanes * sizeof(double))));
+        Doubles lengths;
+        std::memcpy(&lengths, length, sizeof(lengths));
+        Doubles const scales = double{kUnit} / lengths;
+        Bits const areFinite = (lengths > 0.0) & (lengths < std::numeric_limits<double>::infinity());
+        auto const inUnits = [&](double const* coordinate) {
+            Doubles coordinates;
+            std::memcpy(&coordinates, coordinate, sizeof(coordinates));
+            coordinates = reinterpret_cast<Doubles>(areFinite & reinterpret_cast<Bits>(coordinates * scales));
+            return __builtin_convertvector(coordinates, Modeling::IntLanes) + kZero;
         };
-        return {inUnits(vector.x) | inUnits(vector.y) << 8 | inUnits(vector.z) << 16};
+        Modeling::IntLanes const bytes = inUnits(x) | inUnits(y) << 8 | inUnits(z) << 16;
+        std::memcpy(static_cast<void*>(normals), &bytes, sizeof(bytes));
     }
 
     /// The square of the distance between normals, in units, below which their angle is smaller than this one.

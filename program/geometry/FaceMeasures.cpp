@@ -64,8 +64,10 @@ namespace {
 
         void setNormals(std::size_t count, CompactNormal* normals) const
         {
-            for (std::size_t i = 0; i != count; ++i)
-                normals[i] = CompactNormal::of({x[i], y[i], z[i]}, areas[i]);
+            Values<CompactNormal> batch;
+            for (std::size_t i = 0; i != kBatch; i += CompactNormal::kLanes)
+                CompactNormal::set(&x[i], &y[i], &z[i], &areas[i], &batch[i]);
+            std::copy_n(batch.data(), count, normals);
         }
     };
 

@@ -1,5 +1,7 @@
 #include "Geometry.h"
 
+#include "sumOverBlocks.h"
+
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
@@ -8,6 +10,7 @@
 #include <TessaraGeometry/Prototypes.h>
 
 #include <algorithm>
+#include <limits>
 
 namespace ModelingProgram {
 
@@ -15,6 +18,22 @@ using namespace Tessara::Geometry;
 using Tessara::Object;
 
 namespace {
+
+    /// The box around all boxes that are added.
+    struct GrowingBox : BoundingBox {
+        static constexpr float kFar = std::numeric_limits<float>::infinity();
+
+        GrowingBox()
+            : BoundingBox{{kFar, kFar, kFar}, {-kFar, -kFar, -kFar}}
+        {
+        }
+        GrowingBox& operator+=(BoundingBox const& other)
+        {
+            min = lowerCorner(min, other.min);
+            max = upperCorner(max, other.max);
+            return *this;
+        }
+    };
 
     bool isStandard(Orvan::String const& name)
     {
@@ -101,12 +120,14 @@ std::optional<BoundingBox> boundingBoxOf(Object const& object)
     auto const positions = dataOf<float3>(object, sPointPosition);
     if (!positions || positions->empty())
         return std::nullopt;
-    BoundingBox box{(*positions)[0], (*positions)[0]};
-    for (float3 const& p : *positions) {
-        box.min = lowerCorner(box.min, p);
-        box.max = upperCorner(box.max, p);
-    }
-    return box;
+    GrowingBox const all = sumOverBlocks<GrowingBox>(positions->size, [&](std::size_t begin, std::size_t end) {
+        GrowingBox box;
+        for (std::size_t point = begin; point != end; ++point)
+            box += {(*positions)[point], (*positions)[point]};
+        return box;
+    });
+    float3 const& first = (*positions)[0]; // decides which zero is a corner, and whether it is NaN
+    return BoundingBox{lowerCorner(first, all.min), upperCorner(first, all.max)};
 }
 
 Json countsOf(Object const& object)

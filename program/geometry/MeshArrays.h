@@ -35,6 +35,9 @@ struct MeshArrays {
 /// \pre  the mesh is valid
 MeshArrays arraysOf(Tessara::Object const& mesh);
 
+/// Whether both have the same points at the same positions, bit by bit, and the same faces.
+bool areIdentical(MeshArrays const& a, MeshArrays const& b);
+
 /// The vector area of a polygon times two: it points along the normal, and its length is twice the polygon's area.
 template <std::size_t kCount> double3 areaVector(std::span<unsigned int const, kCount> corners, float3 const* position)
 {

@@ -8,12 +8,16 @@
 #include "connectedComponents.h"
 #include "sumOverBlocks.h"
 
+#include "frame/grains.h"
+
+#include <tbb/blocked_range.h>
 #include <tbb/enumerable_thread_specific.h>
 #include <tbb/parallel_for.h>
 #include <tbb/parallel_sort.h>
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <bit>
 #include <utility>
 #include <vector>
@@ -22,23 +26,8 @@ namespace ModelingProgram {
 
 namespace {
 
-    /// Whether some consecutive faces are triangles with three different points.
-    bool arePlainTriangles(MeshArrays const& mesh, unsigned int begin, unsigned int end)
-    {
-        if (!areTriangles(mesh, begin, end))
-            return false;
-        unsigned int const* corner = mesh.corners(begin).data();
-        unsigned int repeats = 0;
-        for (unsigned int face = begin; face != end; ++face, corner += 3)
-            repeats += static_cast<unsigned int>(corner[0] == corner[1])
-                + static_cast<unsigned int>(corner[1] == corner[2]) + static_cast<unsigned int>(corner[2] == corner[0]);
-        return repeats == 0;
-    }
-
     bool hasRepeatedPoint(std::span<unsigned int const> corners)
     {
-        if (corners.size() == 3)
-            return corners[0] == corners[1] || corners[1] == corners[2] || corners[2] == corners[0];
         std::vector<unsigned int> sorted(corners.begin(), corners.end());
         std::sort(sorted.begin(), sorted.end());
         return std::adjacent_find(sorted.begin(), sorted.end()) != sorted.end();
@@ -53,16 +42,17 @@ namespace {
             ++topology.triangleCount;
         else
             (corners.size() == 4 ? topology.quads : topology.polygons).add(face);
-        if (hasRepeatedPoint(corners))
+        if (corners.size() != 3 && hasRepeatedPoint(corners))
             topology.facesWithRepeatedPoints.add(face);
     }
 
+    /// Without repeated points of triangles, which are found among those that are not closed fans.
     MeshTopology countFaces(MeshArrays const& mesh)
     {
         return sumOverBlocks<MeshTopology>(mesh.faceCount(), [&](std::size_t blockBegin, std::size_t blockEnd) {
             auto const begin = static_cast<unsigned int>(blockBegin), end = static_cast<unsigned int>(blockEnd);
             MeshTopology topology;
-            if (arePlainTriangles(mesh, begin, end))
+            if (areTriangles(mesh, begin, end))
                 topology.triangleCount = end - begin;
             else
                 for (unsigned int face = begin; face != end; ++face)
@@ -74,9 +64,8 @@ namespace {
     /// Examines the points of one block after the other, and adds up what it finds.
     class BlockExaminer {
     public:
-        /// \param creases       may be null
         /// \param lowerInParts  one entry per point, set to a point of the same component that is not higher
-        BlockExaminer(MeshArrays const& mesh, CreasesWithNormals const* creases, unsigned int* lowerInParts)
+        BlockExaminer(MeshArrays const& mesh, std::span<CreasesWithNormals const> creases, unsigned int* lowerInParts)
             : mesh_(mesh)
             , creases_(creases)
             , lowerInParts_(lowerInParts)
@@ -133,37 +122,42 @@ namespace {
             auto const areClosed = fans.areClosed();
             auto const edgeCounts = fans.higherEdgeCounts();
             auto const lowest = fans.lowestPoints();
-            auto const spreads =
-                creases_ ? squaredSpreads<kValence>(creases_->normals, around) : std::array<int, kFans>();
             for (std::size_t i = 0; i != indices.size(); ++i)
                 if (areClosed[i] != 0) {
                     found_.edgeCount += static_cast<unsigned int>(edgeCounts[i]);
                     lowerInParts_[points[i]] = lowest[i];
-                    if (creases_ && spreads[i] >= creases_->smoothSpread)
-                        countSharpEdges({around[i], kValence}, points[i]);
                 } else
                     examineStar(indices[i]);
+            for (std::size_t k = 0; k != creases_.size(); ++k) {
+                auto const spreads = squaredSpreads<kValence>(creases_[k].normals, around);
+                for (std::size_t i = 0; i != indices.size(); ++i)
+                    if (areClosed[i] != 0 && spreads[i] >= creases_[k].smoothSpread)
+                        found_.sharpEdgeCounts[k] +=
+                            countSharpEdges(creases_[k].creases, {around[i], kValence}, points[i]);
+            }
         }
 
-        /// Counts the sharp edges to higher points in a closed fan.
-        void countSharpEdges(std::span<CornerAtPoint const> around, unsigned int point)
+        /// The number of sharp edges to higher points in a closed fan.
+        static unsigned int countSharpEdges(
+            Creases const& creases, std::span<CornerAtPoint const> around, unsigned int point)
         {
+            unsigned int count = 0;
             for (CornerAtPoint const& a : around)
                 if (a.next > point)
                     for (CornerAtPoint const& b : around)
-                        found_.sharpEdgeCount +=
-                            a.next == b.previous && creases_->creases.isSharp(a.face, b.face, true) ? 1u : 0u;
+                        count += a.next == b.previous && creases.isSharp(a.face, b.face, true) ? 1u : 0u;
+            return count;
         }
 
         void examineStar(unsigned int index)
         {
             unsigned int const point = corners_.firstPoint() + index;
-            star_.examine(mesh_, corners_.at(index), point, creases_ ? &creases_->creases : nullptr, found_);
+            star_.examine(mesh_, corners_.at(index), point, creases_, found_);
             lowerInParts_[point] = point;
         }
 
         MeshArrays const& mesh_;
-        CreasesWithNormals const* creases_;
+        std::span<CreasesWithNormals const> creases_;
         unsigned int* lowerInParts_;
         BlockCorners corners_;
         std::array<std::vector<unsigned int>, kMaxValence + 2> byValence_; // the last one is for all above
@@ -172,7 +166,7 @@ namespace {
     };
 
     /// What the points tell, and their components.
-    MeshTopology examinePoints(MeshArrays const& mesh, CreasesWithNormals const* creases)
+    MeshTopology examinePoints(MeshArrays const& mesh, std::span<CreasesWithNormals const> creases)
     {
         Orvan::Array<unsigned int> lowerInParts(mesh.pointCount(), Orvan::kUninitialized);
         MeshTopology topology;
@@ -200,7 +194,8 @@ MeshTopology& MeshTopology::operator+=(MeshTopology const& other)
 {
     triangleCount += other.triangleCount;
     edgeCount += other.edgeCount;
-    sharpEdgeCount += other.sharpEdgeCount;
+    for (std::size_t i = 0; i != sharpEdgeCounts.size(); ++i)
+        sharpEdgeCounts[i] += other.sharpEdgeCounts[i];
     for (Finding MeshTopology::*const finding : {&MeshTopology::facesBelowThreeCorners, &MeshTopology::quads,
              &MeshTopology::polygons, &MeshTopology::facesWithRepeatedPoints, &MeshTopology::boundaryEdges,
              &MeshTopology::nonManifoldEdges, &MeshTopology::windingConflicts, &MeshTopology::flippedEdges,
@@ -209,7 +204,7 @@ MeshTopology& MeshTopology::operator+=(MeshTopology const& other)
     return *this;
 }
 
-MeshTopology analyzeTopology(MeshArrays const& mesh, CreasesWithNormals const* creases)
+MeshTopology analyzeTopology(MeshArrays const& mesh, std::span<CreasesWithNormals const> creases)
 {
     MeshTopology topology = countFaces(mesh);
     MeshTopology const atPoints = examinePoints(mesh, creases);
@@ -232,10 +227,13 @@ void addPartsAndGenus(MeshTopology const& topology, Json& values)
 
 Finding findIsolatedPoints(MeshArrays const& mesh)
 {
-    std::vector<bool> isUsed(mesh.pointCount());
-    for (unsigned int face = 0; face != mesh.faceCount(); ++face)
-        for (unsigned int const point : mesh.corners(face))
-            isUsed[point] = true;
+    Orvan::Array<bool> isUsed(mesh.pointCount());
+    // Threads may set the same entry, but all of them set it to true.
+    tbb::parallel_for(
+        tbb::blocked_range<std::uint64_t>(0, mesh.faceVertex->size, Modeling::kElementGrain), [&](auto const& corners) {
+            for (std::uint64_t corner = corners.begin(); corner != corners.end(); ++corner)
+                std::atomic_ref(isUsed[(*mesh.faceVertex)[corner]]).store(true, std::memory_order_relaxed);
+        });
     Finding isolated;
     for (unsigned int point = 0; point != mesh.pointCount(); ++point)
         if (!isUsed[point])

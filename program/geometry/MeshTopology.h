@@ -6,8 +6,10 @@
 #include <TessaraGeometry/Names.h>
 
 #include <algorithm>
+#include <array>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <vector>
 
 namespace ModelingProgram {
@@ -47,7 +49,7 @@ struct MeshTopology {
     Finding nonManifoldEdges; // edges with more than two sides
     Finding windingConflicts; // edges with two or more sides in the same direction; counted per direction
     Finding flippedEdges; // edges with two sides, both in the same direction
-    std::uint64_t sharpEdgeCount = 0; // edges with two sides that are creases, if they are looked for
+    std::array<std::uint64_t, 2> sharpEdgeCounts{}; // edges with two sides that are creases, of each kind looked for
 
     // `first` is the lowest point.
     Finding nonManifoldPoints; // non-manifold vertices: their faces are not all connected by edges at the point
@@ -69,8 +71,8 @@ struct CreasesWithNormals;
 /// Accepts any valid mesh. Runs in parallel, with the same result for any number of threads. Linear, except for sorting
 /// the edges at each point. Needs 4 bytes per point if nearby faces use points with nearby numbers, otherwise also up to
 /// 8 per corner and 4 per point.
-/// \param creases  if not null, sharp edges are counted
-MeshTopology analyzeTopology(MeshArrays const& mesh, CreasesWithNormals const* creases = nullptr);
+/// \param creases  up to two kinds, whose sharp edges are counted. They may be about other positions than those of the mesh
+MeshTopology analyzeTopology(MeshArrays const& mesh, std::span<CreasesWithNormals const> creases = {});
 
 /// Adds the rows "parts" and "genus" to the table of a command.
 void addPartsAndGenus(MeshTopology const& topology, Json& values);

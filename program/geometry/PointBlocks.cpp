@@ -7,7 +7,10 @@
 
 #include <algorithm>
 #include <bit>
+#include <functional>
 #include <numeric>
+#include <type_traits>
+#include <utility>
 
 namespace ModelingProgram {
 
@@ -40,36 +43,63 @@ namespace {
         });
     }
 
-    unsigned int shiftOfBlocks(MeshArrays const& mesh)
+    unsigned int shiftOfBlocks(MeshArrays const& mesh, bool areTriangles)
     {
         std::uint64_t const points = std::max(mesh.pointCount(), 1u), corners = std::max(mesh.cornerCount(), 1u);
         auto shift = static_cast<unsigned int>(std::bit_width(kCornersPerBlock * points / (corners + points) + 1));
-        if (blockCount(mesh, shift) > kMostReads
+        if (!areTriangles && blockCount(mesh, shift) > kMostReads
             && countReads(mesh, blockCount(mesh, shift)) > kMostReads * mesh.cornerCount())
             while (blockCount(mesh, shift) > kMostReads)
                 ++shift;
         return shift;
     }
 
+    /// How many of the first triangles have all corners in the same block as a point.
+    unsigned int countInside(unsigned int const* corner, unsigned int faceCount, unsigned int point, unsigned int shift)
+    {
+        constexpr unsigned int kChunk = 8; // so many are compared by SIMD instructions
+        auto const areInside = [=]<unsigned int kCount>(
+                                   unsigned int first, std::integral_constant<unsigned int, kCount>) {
+            unsigned int differences = 0;
+            for (unsigned int i = 0; i != 3 * kCount; ++i)
+                differences |= corner[3 * first + i] ^ point;
+            return differences >> shift == 0;
+        };
+        std::integral_constant<unsigned int, kChunk> const aChunk;
+        std::integral_constant<unsigned int, 1> const one;
+        unsigned int inside = 0;
+        if (faceCount == 0 || !areInside(0, one)) // as where blocks alternate
+            return 0;
+        while (inside + kChunk <= faceCount && areInside(inside, aChunk))
+            inside += kChunk;
+        while (inside != faceCount && areInside(inside, one))
+            ++inside;
+        return inside;
+    }
+
 }
 
 PointBlocks::PointBlocks(MeshArrays const& mesh)
     : mesh_(mesh)
-    , shift_(shiftOfBlocks(mesh))
-    , count_(static_cast<unsigned int>(blockCount(mesh, shift_)))
     , partCount_(std::clamp(mesh.faceCount() / kFacesPerPart, 1u, kMostParts))
-    , offsets_(std::size_t{count_} * partCount_ + 1)
 {
-    // Parts have entries of their own.
-    tbb::parallel_for(std::size_t{0}, partCount_, [this](std::size_t part) { countFaces(part); });
+    // Parts have entries of their own, here and below.
+    auto const forEachPart = [this](auto const& work) { tbb::parallel_for(std::size_t{0}, partCount_, work); };
+    forEachPart([this](std::size_t part) {
+        areTriangles_[part] = areTriangles(mesh_, beginOfPart(part), beginOfPart(part + 1));
+    });
+    shift_ =
+        shiftOfBlocks(mesh, std::all_of(areTriangles_.begin(), areTriangles_.begin() + partCount_, std::identity()));
+    count_ = static_cast<unsigned int>(blockCount(mesh, shift_));
+    offsets_.resize(std::size_t{count_} * partCount_ + 1);
+    forEachPart([this](std::size_t part) { countFaces(part); });
     std::exclusive_scan(offsets_.begin(), offsets_.end(), offsets_.begin(), 0u);
     faces_ = Orvan::Array<unsigned int>(offsets_.back(), Orvan::kUninitialized);
-    tbb::parallel_for(std::size_t{0}, partCount_, [this](std::size_t part) { distributeFaces(part); });
+    forEachPart([this](std::size_t part) { distributeFaces(part); });
 }
 
 void PointBlocks::countFaces(std::size_t part)
 {
-    areTriangles_[part] = areTriangles(mesh_, beginOfPart(part), beginOfPart(part + 1));
     std::vector<unsigned int> counts(count_);
     forEachRun(part, [&](unsigned int block, unsigned int faceBegin, unsigned int faceEnd) {
         counts[block] += faceEnd - faceBegin;
@@ -97,15 +127,13 @@ template <class Visit> void PointBlocks::forEachRun(std::size_t part, Visit cons
     if (areTriangles_[part]) {
         for (unsigned int face = begin; face != end;) {
             // Most faces have all corners in the block of the face before.
-            unsigned int const a = corner[0] >> shift_, firstPoint = a << shift_, firstFace = face;
-            auto const isInside = [=, size = 1u << shift_](unsigned int point) { return point - firstPoint < size; };
-            for (; face != end && isInside(corner[0]) && isInside(corner[1]) && isInside(corner[2]); corner += 3)
-                ++face;
-            if (face != firstFace) {
-                visit(a, firstFace, face);
+            unsigned int const a = corner[0] >> shift_, b = corner[1] >> shift_, c = corner[2] >> shift_;
+            if (unsigned int const inside = countInside(corner, end - face, corner[0], shift_); inside != 0) {
+                visit(a, face, face + inside);
+                face += inside;
+                corner += 3 * std::size_t{inside};
                 continue;
             }
-            unsigned int const b = corner[1] >> shift_, c = corner[2] >> shift_;
             visit(a, face, face + 1);
             if (b != a)
                 visit(b, face, face + 1);
@@ -155,24 +183,41 @@ void PointBlocks::list(unsigned int block, BlockCorners& corners) const
 {
     unsigned int const first = block << shift_;
     unsigned int const count = std::min(mesh_.pointCount() - first, 1u << shift_);
-    corners.firstPoint_ = first;
-    corners.pointCount_ = count;
-    corners.offsets_.assign(std::size_t{count} + 2, 0);
-    unsigned int* const place = corners.offsets_.data() + 1;
-    // One unsigned comparison tests first <= point < first + count, here and below.
-    forEachCorner(block, [=](unsigned int point, CornerAtPoint const&) {
-        if (point - first < count)
-            ++place[point - first + 1];
+    corners.clear(first, count);
+    forEachCorner(block, [=, &corners](unsigned int point, CornerAtPoint const& corner) {
+        if (point - first < count) // also false if point < first
+            corners.add(point - first, corner);
     });
-    std::inclusive_scan(place, place + count + 1, place);
-    if (corners.corners_.size < place[count])
-        corners.corners_ =
-            Orvan::Array<CornerAtPoint>(std::uint64_t{place[count]} + place[count] / 4, Orvan::kUninitialized);
-    CornerAtPoint* const entry = corners.corners_.data;
-    forEachCorner(block, [=](unsigned int point, CornerAtPoint const& corner) {
-        if (point - first < count)
-            entry[place[point - first]++] = corner;
-    });
+    corners.joinLists();
+}
+
+void BlockCorners::clear(unsigned int firstPoint, unsigned int pointCount)
+{
+    firstPoint_ = firstPoint;
+    counts_.assign(pointCount, 0);
+    if (slots_.size < std::size_t{pointCount} * kSlots)
+        slots_ = Orvan::Array<CornerAtPoint>(std::size_t{pointCount} * kSlots, Orvan::kUninitialized);
+    late_.clear();
+}
+
+void BlockCorners::joinLists()
+{
+    if (late_.empty())
+        return;
+    longPlaces_.resize(counts_.size());
+    unsigned int total = 0;
+    for (unsigned int index = 0; index != counts_.size(); ++index)
+        if (counts_[index] > kSlots)
+            longPlaces_[index] = std::exchange(total, total + counts_[index]);
+    long_.resize(total);
+    // Each place is moved along the list, and back to its beginning.
+    for (LateCorner const& late : late_)
+        long_[longPlaces_[late.index]++ + kSlots] = late.corner;
+    for (unsigned int index = 0; index != counts_.size(); ++index)
+        if (counts_[index] > kSlots) {
+            longPlaces_[index] -= counts_[index] - kSlots;
+            std::copy_n(slots_.data + std::size_t{index} * kSlots, kSlots, long_.data() + longPlaces_[index]);
+        }
 }
 
 }

@@ -22,23 +22,45 @@ struct CornerAtPoint {
 class BlockCorners {
 public:
     unsigned int firstPoint() const { return firstPoint_; }
-    unsigned int pointCount() const { return pointCount_; }
-    unsigned int countAt(unsigned int index) const { return offsets_[index + 1] - offsets_[index]; }
+    unsigned int pointCount() const { return static_cast<unsigned int>(counts_.size()); }
+    unsigned int countAt(unsigned int index) const { return counts_[index]; }
     /// In ascending order. Points are counted from the first one of the block.
     std::span<CornerAtPoint const> at(unsigned int index) const
     {
-        return {corners_.data + offsets_[index], corners_.data + offsets_[index + 1]};
+        unsigned int const count = counts_[index];
+        return {count <= kSlots ? slots_.data + std::size_t{index} * kSlots : long_.data() + longPlaces_[index], count};
     }
 
 private:
     friend class PointBlocks;
 
+    /// Most points have at most this many corners, which are listed in one pass over the faces.
+    static constexpr unsigned int kSlots = 8;
+
+    struct LateCorner {
+        unsigned int index; // of the point
+        CornerAtPoint corner;
+    };
+
+    void clear(unsigned int firstPoint, unsigned int pointCount);
+    void add(unsigned int index, CornerAtPoint const& corner)
+    {
+        if (unsigned int const count = counts_[index]++; count < kSlots)
+            slots_[std::size_t{index} * kSlots + count] = corner;
+        else
+            addLate({index, corner});
+    }
+    [[gnu::noinline]] void addLate(LateCorner const& corner) { late_.push_back(corner); } // keeps the loop above short
+    /// After all corners have been added.
+    void joinLists();
+
     unsigned int firstPoint_ = 0;
-    unsigned int pointCount_ = 0;
-    // Those of point i are `offsets_[i]` up to `offsets_[i + 1]`. While corners are added, `offsets_[i + 1]` is the place
-    // of the next one; the last entry is used only then.
-    std::vector<unsigned int> offsets_;
-    Orvan::Array<CornerAtPoint> corners_; // may be longer
+    std::vector<unsigned int> counts_; // one entry per point
+    Orvan::Array<CornerAtPoint> slots_; // `kSlots` entries per point; may be longer
+    // The corners that found no slot, and the complete lists of their points. Other points have no place there.
+    std::vector<LateCorner> late_;
+    std::vector<CornerAtPoint> long_;
+    std::vector<unsigned int> longPlaces_;
 };
 
 /// Lists the corners at the points of a mesh block by block, for one pass over all points. First the faces are
@@ -76,10 +98,10 @@ private:
     template <class Visit> void forEachCorner(unsigned int block, Visit const& visit) const;
 
     MeshArrays const& mesh_;
-    unsigned int shift_; // a block has two to the power of this many points
-    unsigned int count_;
     std::size_t partCount_;
     std::array<bool, kMostParts> areTriangles_{};
+    unsigned int shift_ = 0; // a block has two to the power of this many points
+    unsigned int count_ = 0;
     // The faces of part p with corners in block b are those from entry b · parts + p to the next one.
     std::vector<unsigned int> offsets_;
     Orvan::Array<unsigned int> faces_;

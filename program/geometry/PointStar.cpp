@@ -7,11 +7,11 @@
 namespace ModelingProgram {
 
 void PointStar::examine(MeshArrays const& mesh, std::span<CornerAtPoint const> around, unsigned int point,
-    Creases const* creases, MeshTopology& topology)
+    std::span<CreasesWithNormals const> creases, MeshTopology& topology)
 {
     if (around.empty())
         topology.isolatedPoints.add(point);
-    collect(mesh, around, point);
+    collect(mesh, around, point, topology);
     for (auto first = ends_.begin(); first != ends_.end();) {
         auto const last =
             std::find_if(first, ends_.end(), [=](SideEnd const& end) { return end.otherPoint != first->otherPoint; });
@@ -25,7 +25,8 @@ void PointStar::examine(MeshArrays const& mesh, std::span<CornerAtPoint const> a
         topology.nonManifoldPoints.add(point);
 }
 
-void PointStar::collect(MeshArrays const& mesh, std::span<CornerAtPoint const> around, unsigned int point)
+void PointStar::collect(
+    MeshArrays const& mesh, std::span<CornerAtPoint const> around, unsigned int point, MeshTopology& topology)
 {
     ends_.clear();
     parents_.resize(around.size());
@@ -39,6 +40,8 @@ void PointStar::collect(MeshArrays const& mesh, std::span<CornerAtPoint const> a
             continue;
         ++fanCount_;
         if (next == point) { // equal consecutive points are one vertex of the face
+            if (last - first == 2 && (previous != point || corner == first)) // each triangle once
+                topology.facesWithRepeatedPoints.add(face);
             auto const isBefore = [](CornerAtPoint const& a, unsigned int b) { return a.corner < b; };
             auto const other =
                 std::lower_bound(around.begin(), around.end(), corner == last ? first : corner + 1, isBefore);
@@ -52,7 +55,7 @@ void PointStar::collect(MeshArrays const& mesh, std::span<CornerAtPoint const> a
 }
 
 void PointStar::examineEdge(std::span<SideEnd const> sides, std::span<CornerAtPoint const> around,
-    Creases const* creases, MeshTopology& topology)
+    std::span<CreasesWithNormals const> creases, MeshTopology& topology)
 {
     ++topology.edgeCount;
     if (sides.size() == 1)
@@ -68,9 +71,12 @@ void PointStar::examineEdge(std::span<SideEnd const> sides, std::span<CornerAtPo
         if (direction.count == 2 && sides.size() == 2)
             topology.flippedEdges.add(direction.first);
     }
-    if (creases && sides.size() == 2
-        && creases->isSharp(around[sides[0].index].face, around[sides[1].index].face, directions[0].count == 1))
-        ++topology.sharpEdgeCount;
+    if (sides.size() == 2)
+        for (std::size_t k = 0; k != creases.size(); ++k)
+            topology.sharpEdgeCounts[k] += creases[k].creases.isSharp(around[sides[0].index].face,
+                                               around[sides[1].index].face, directions[0].count == 1)
+                ? 1u
+                : 0u;
 }
 
 void PointStar::join(unsigned int index, unsigned int otherIndex)

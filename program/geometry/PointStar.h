@@ -14,10 +14,10 @@ namespace ModelingProgram {
 class PointStar {
 public:
     /// Adds what is found at a point: edges to higher points, and whether the point is isolated or non-manifold.
-    /// \param around   all corners at the point
-    /// \param creases  may be null
+    /// Also triangles with repeated points: at one of these points, at which they have two consecutive corners.
+    /// \param around  all corners at the point
     void examine(MeshArrays const& mesh, std::span<CornerAtPoint const> around, unsigned int point,
-        Creases const* creases, MeshTopology& topology);
+        std::span<CreasesWithNormals const> creases, MeshTopology& topology);
 
 private:
     /// One end of a side, as seen from the point at that end.
@@ -28,9 +28,10 @@ private:
         friend auto operator<=>(SideEnd const&, SideEnd const&) = default;
     };
 
-    void collect(MeshArrays const& mesh, std::span<CornerAtPoint const> around, unsigned int point);
+    void collect(
+        MeshArrays const& mesh, std::span<CornerAtPoint const> around, unsigned int point, MeshTopology& topology);
     static void examineEdge(std::span<SideEnd const> sides, std::span<CornerAtPoint const> around,
-        Creases const* creases, MeshTopology& topology);
+        std::span<CreasesWithNormals const> creases, MeshTopology& topology);
     void join(unsigned int index, unsigned int otherIndex);
 
     std::vector<SideEnd> ends_;

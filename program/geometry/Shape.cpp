@@ -68,6 +68,38 @@ namespace {
         });
     }
 
+    /// What the faces of a mesh tell, and what finding its fold-overs needs.
+    class MeasuredMesh {
+    public:
+        /// The mesh must outlive it.
+        explicit MeasuredMesh(MeshArrays const& mesh, float sliverRatio = 0)
+            : mesh_(mesh)
+            , extent_(mesh.pointCount() == 0 ? Extent{{}, {}} : extentOf(mesh))
+            , normals_(mesh.faceCount(), Orvan::kUninitialized)
+            , measures_(measureFaces(mesh, extent_.min, sliverRatio, normals_.data))
+        {
+        }
+
+        CreasesWithNormals foldOvers() const
+        {
+            return {{mesh_, kFoldOverDegrees}, normals_.data, CompactNormal::squaredSpreadBelow(kFoldOverDegrees)};
+        }
+        std::uint64_t sliverCount() const { return measures_.sliverCount; }
+        Shape shape(MeshTopology const& topology, std::uint64_t foldOverCount) const
+        {
+            Shape shape{{}, measures_.area, foldOverCount, length(extent_.max - extent_.min)};
+            if (mesh_.pointCount() != 0 && topology.isClosedManifold())
+                shape.volume = measures_.volume;
+            return shape;
+        }
+
+    private:
+        MeshArrays const& mesh_;
+        Extent extent_;
+        Orvan::Array<CompactNormal> normals_;
+        FaceMeasures measures_;
+    };
+
     /// The relative change of a positive quantity; 0 if it was not positive.
     double relativeChange(double before, double after)
     {
@@ -110,18 +142,18 @@ namespace {
 
 ExaminedMesh examine(MeshArrays const& mesh, float sliverRatio)
 {
-    Extent const extent = mesh.pointCount() == 0 ? Extent{{}, {}} : extentOf(mesh);
-    Orvan::Array<CompactNormal> normals(mesh.faceCount(), Orvan::kUninitialized);
-    FaceMeasures const measures = measureFaces(mesh, extent.min, sliverRatio, normals.data);
-    CreasesWithNormals const foldOvers{
-        {mesh, kFoldOverDegrees}, normals.data, CompactNormal::squaredSpreadBelow(kFoldOverDegrees)};
-    ExaminedMesh result{analyzeTopology(mesh, &foldOvers), {}, measures.sliverCount};
-    if (mesh.pointCount() != 0 && result.topology.isClosedManifold())
-        result.shape.volume = measures.volume;
-    result.shape.area = measures.area;
-    result.shape.foldOvers = result.topology.sharpEdgeCount;
-    result.shape.diagonal = length(extent.max - extent.min);
-    return result;
+    MeasuredMesh const measured(mesh, sliverRatio);
+    MeshTopology const topology = analyzeTopology(mesh, std::array{measured.foldOvers()});
+    return {topology, measured.shape(topology, topology.sharpEdgeCounts[0]), measured.sliverCount()};
+}
+
+ExaminedMove examineMove(MeshArrays const& before, MeshArrays const& after)
+{
+    MeasuredMesh const measuredBefore(before), measuredAfter(after);
+    MeshTopology const topology =
+        analyzeTopology(before, std::array{measuredBefore.foldOvers(), measuredAfter.foldOvers()});
+    return {topology, measuredBefore.shape(topology, topology.sharpEdgeCounts[0]),
+        measuredAfter.shape(topology, topology.sharpEdgeCounts[1])};
 }
 
 std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& edges, double degrees)
@@ -138,6 +170,8 @@ std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& e
 
 double largestMove(MeshArrays const& before, MeshArrays const& after)
 {
+    if (before.positions == after.positions)
+        return 0;
     std::size_t const count = std::min(before.pointCount(), after.pointCount());
     return sumOverBlocks<Largest>(count, [&](std::size_t begin, std::size_t end) {
         Largest largest;

@@ -34,6 +34,15 @@ struct ExaminedMesh {
 /// All at once, because finding the edges and reading the positions of faces take longest.
 ExaminedMesh examine(MeshArrays const& mesh, float sliverRatio = 0);
 
+struct ExaminedMove {
+    MeshTopology topology; // before and after
+    Shape before;
+    Shape after;
+};
+
+/// The same as to examine a mesh before and after its points have moved, but its faces are connected only once.
+ExaminedMove examineMove(MeshArrays const& before, MeshArrays const& after);
+
 /// The numbers of elements, and the shape: for operations that do not move points.
 Json countsAndShape(Tessara::Object const& mesh, Shape const& shape);
 

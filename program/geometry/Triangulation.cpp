@@ -5,7 +5,12 @@
 #include <Modeling/triangulate.h>
 #include <TessaraGeometry/Makers.h>
 
+#include "frame/grains.h"
+
 #include <fmt/format.h>
+
+#include <tbb/blocked_range.h>
+#include <tbb/parallel_for.h>
 
 #include <algorithm>
 #include <array>
@@ -103,8 +108,15 @@ Object inFineUnits(Object const& mesh)
     float const size = std::max({box->max.x - box->min.x, box->max.y - box->min.y, box->max.z - box->min.z});
     int const shift = std::isnormal(size) ? kExponent - std::ilogb(size) : 0;
     Orvan::Array<float3> scaled = *dataOf<float3>(mesh, sPointPosition);
-    for (float3& p : scaled)
-        p = {std::ldexp(p.x, shift), std::ldexp(p.y, shift), std::ldexp(p.z, shift)};
+    double const scale = std::ldexp(1.0, shift);
+    auto const scaledBy = [scale](float coordinate) { return static_cast<float>(coordinate * scale); };
+    tbb::parallel_for(
+        tbb::blocked_range<std::uint64_t>(0, scaled.size, Modeling::kElementGrain), [&](auto const& points) {
+            for (std::uint64_t point = points.begin(); point != points.end(); ++point) {
+                float3& p = scaled[point];
+                p = {scaledBy(p.x), scaledBy(p.y), scaledBy(p.z)};
+            }
+        });
     Object fine = mesh;
     addDataProperty(sPointPosition, sPointComp, std::move(scaled), fine);
     return fine;

@@ -1,5 +1,7 @@
 #include "connectedComponents.h"
 
+#include "sumOverBlocks.h"
+
 #include "frame/grains.h"
 
 #include <tbb/blocked_range.h>
@@ -52,6 +54,17 @@ namespace {
             }
         }
 
+        /// The number of indices that represent a set.
+        std::uint64_t count() const
+        {
+            return sumOverBlocks<std::uint64_t>(parents_.size, [this](std::size_t begin, std::size_t end) {
+                std::uint64_t count = 0;
+                for (std::size_t index = begin; index != end; ++index)
+                    count += parents_[index] == index ? 1u : 0u;
+                return count;
+            });
+        }
+
         /// Lets each index refer to the representative of its set, and counts the sets.
         std::uint64_t flatten()
         {
@@ -97,7 +110,9 @@ std::uint64_t countConnectedComponents(
     // One face of several joins most of a mesh.
     constexpr unsigned int kSampled = 8;
     DisjointSets sets(std::move(lowerInParts));
-    std::uint64_t count = sets.flatten() - isolatedPointCount;
+    std::uint64_t count = sets.count() - isolatedPointCount;
+    if (count > 1)
+        sets.flatten();
     for (unsigned int const step : {kSampled, 1u}) {
         if (count <= 1)
             return count;

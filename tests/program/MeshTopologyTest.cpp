@@ -244,6 +244,38 @@ TEST(MeshTopology, CountsFacesByCorners)
     EXPECT_THAT(found, ElementsAre(2, 2, 2, 1, 4, 2, 2, 5));
 }
 
+TEST(MeshTopology, CountsTrianglesWithRepeatedPointsOnce)
+{
+    for (std::vector<unsigned int> const& triangle :
+        {std::vector<unsigned int>{4, 4, 5}, {4, 5, 4}, {5, 4, 4}, {4, 4, 4}}) {
+        Faces faces = kTetrahedron;
+        faces.push_back(triangle);
+        Mesh const mesh = meshOf(6, faces);
+        Finding const found = analyzeTopology(arraysOf(*mesh)).facesWithRepeatedPoints;
+        EXPECT_EQ(found.count, 1);
+        EXPECT_EQ(found.first, 4);
+    }
+}
+
+TEST(MeshTopology, ConnectsAnyNumberOfFacesAtAPoint)
+{
+    for (unsigned int const count : {3u, 7u, 8u, 9u, 10u, 16u, 17u, 40u}) {
+        Faces faces; // of a double pyramid with apexes 0 and 1
+        for (unsigned int i = 0; i != count; ++i) {
+            unsigned int const a = 2 + i, b = 2 + (i + 1) % count;
+            faces.push_back({0, a, b});
+            faces.push_back({1, b, a});
+        }
+        Mesh const mesh = meshOf(2 + count, faces);
+        MeshTopology const closed = analyzeTopology(arraysOf(*mesh));
+        EXPECT_TRUE(closed.isClosedManifold()) << count;
+        EXPECT_EQ(closed.edgeCount, 3 * count);
+        faces.pop_back();
+        Mesh const open = meshOf(2 + count, faces);
+        EXPECT_EQ(analyzeTopology(arraysOf(*open)).boundaryEdges.count, 3) << count;
+    }
+}
+
 TEST(MeshRequirements, NamesFaultsWithTheirFirstOccurrence)
 {
     auto const faultsOf = [](Mesh const& mesh) {

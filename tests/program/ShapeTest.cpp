@@ -13,6 +13,7 @@
 
 #include <cmath>
 #include <limits>
+#include <tuple>
 
 namespace ModelingProgram {
 
@@ -54,6 +55,37 @@ namespace {
             {{0, 0, 0}, {0, 1, 0}, {1, 0.5f, 0}, end}, {0, 2, 1, 0, isTurned ? 3u : 1u, isTurned ? 1u : 3u}, {0, 3, 6});
     }
 
+}
+
+TEST(Shape, OfAMoveEqualsThoseBeforeAndAfter)
+{
+    MeshBuilder const smooth = MeshBuilder::torus(60, 40);
+    Mesh const before = smooth.build(), after = MeshBuilder(smooth).withNoise(0.1f, 3).build();
+    MeshArrays const a = arraysOf(*before), b = arraysOf(*after);
+    ExaminedMove const move = examineMove(a, b);
+    auto const valuesOf = [](Shape const& shape) {
+        return std::tuple(shape.volume, shape.area, shape.foldOvers, shape.diagonal);
+    };
+    EXPECT_EQ(valuesOf(move.before), valuesOf(examine(a).shape));
+    EXPECT_EQ(valuesOf(move.after), valuesOf(examine(b).shape));
+    EXPECT_NE(move.after.foldOvers, move.before.foldOvers);
+    EXPECT_EQ(move.topology.edgeCount, examine(b).topology.edgeCount);
+    EXPECT_EQ(move.topology.genus, 1);
+}
+
+TEST(Shape, MeshesAreIdenticalIfAllBitsAre)
+{
+    auto const triangle = [](float x, std::initializer_list<unsigned int> corners) {
+        return Tessara::Geometry::makeMesh({{x, 0, 0}, {1, 0, 0}, {0, 1, 0}}, corners, {0, 3});
+    };
+    auto const isIdentical = [&](Mesh const& mesh) {
+        return areIdentical(arraysOf(*triangle(0, {0, 1, 2})), arraysOf(*mesh));
+    };
+    EXPECT_TRUE(isIdentical(triangle(0, {0, 1, 2})));
+    EXPECT_FALSE(isIdentical(triangle(-0.0f, {0, 1, 2})));
+    EXPECT_FALSE(isIdentical(triangle(0, {0, 2, 1})));
+    EXPECT_FALSE(
+        isIdentical(Tessara::Geometry::makeMesh({{0, 0, 0}, {1, 0, 0}, {0, 1, 0}}, {0, 1, 2, 0, 1, 2}, {0, 3, 6})));
 }
 
 TEST(Shape, MeasuresVolumeAreaAndFoldOvers)
