@@ -218,10 +218,17 @@ TEST(Subject, IsExaminedOnce)
     subject.topology->partCount = 99; // which nobody finds a second time
     EXPECT_EQ(subject.know().topology.partCount, 99);
     Report report("test");
-    kTriangulate.create()->run(subject, report);
+    kTriangulate.create()->run(subject, report); // triangles stay as they are
     ASSERT_TRUE(subject.topology && subject.shape); // the next step takes them over
-    EXPECT_EQ(subject.topology->partCount, 1);
+    EXPECT_EQ(subject.topology->partCount, 99);
     EXPECT_EQ(subject.shape->area, examine(arraysOf(*subject.object)).shape.area);
+
+    Subject quad{"quad", readGeometryFile(MODELING_SAMPLES "/stitch-quad.obj").object};
+    EXPECT_EQ(quad.know().topology.quads.count, 1);
+    kTriangulate.create()->run(quad, report);
+    ASSERT_TRUE(quad.topology && quad.shape);
+    EXPECT_EQ(quad.topology->triangleCount, 2);
+    EXPECT_EQ(quad.shape->area, examine(arraysOf(*quad.object)).shape.area);
 
     // What a requirement needs is computed for the report too, since finding the edges takes longer than the rest.
     report.requirements = {"closed"};
