@@ -11,7 +11,6 @@
 #include <Modeling/mergePointClouds.h>
 #include <Modeling/mergeStrands.h>
 #include <TessaraGeometry/Elements.h>
-#include <TessaraGeometry/Makers.h>
 
 #include <fmt/format.h>
 
@@ -116,24 +115,12 @@ namespace {
                 std::move(kinds));
     }
 
-    char const* elementsOf(GeometryType type)
-    {
-        using namespace Tessara::Geometry;
-        return type == GeometryType::Mesh ? sFaceComp : type == GeometryType::Strands ? sStrandComp : sPointComp;
-    }
-
     /// Stores, for each face, strand, or point of a cloud, the number of its input.
     void numberSources(std::string const& attribute, Sources& sources)
     {
-        using namespace Tessara::Geometry;
         for (std::size_t i = 0; i != sources.files.size(); ++i) {
             Orvan::MutablePtr<Object> object = makeMutable(std::move(sources.objects[i]));
-            if (object->hasProperty(attribute.c_str()))
-                throw Failure(ExitCode::Refused,
-                    fmt::format("--source-attribute: {} already has a property \"{}\"", sources.files[i], attribute));
-            Orvan::String const component = elementsOf(sources.type);
-            std::uint64_t const count = getElementCount(*object, component);
-            addDataProperty(attribute.c_str(), component, Orvan::Array<int>(count, static_cast<int>(i)), *object);
+            numberElements(attribute, static_cast<int>(i), sources.files[i], *object);
             sources.objects[i] = std::move(object);
         }
     }

@@ -3,13 +3,9 @@
 #include "geometry/MeshRequirements.h"
 #include "geometry/Shape.h"
 #include "geometry/Triangulation.h"
-#include "shell/Failure.h"
-
-#include <TessaraGeometryVolume/ChannelParser.h>
 
 #include <fmt/format.h>
 
-#include <algorithm>
 #include <optional>
 
 namespace ModelingProgram {
@@ -45,43 +41,9 @@ namespace {
             "--check", checksAreas_, "Compare the area of each face with that of its triangles, and count the fans");
     }
 
-    constexpr char kSeparators[] = " \t\n\v\f\r,";
-
     void Triangulate::checkOptions() const
     {
-        if (channels_.find_first_not_of(kSeparators) == std::string::npos)
-            throw Failure(ExitCode::CommandLine, "--channels: the list has no entry; \"^*\" keeps no properties");
-        TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels_.c_str());
-        if (!status)
-            throw Failure(ExitCode::CommandLine, fmt::format("--channels: {}", status.message().view()));
-    }
-
-    /// Refuses a name or an including pattern that matches no property of faces or corners. Excluding patterns and *
-    /// may match nothing.
-    void requireMatches(std::string const& channels, Object const& mesh)
-    {
-        std::vector<std::string> names;
-        for (Property const& property : propertiesOf(mesh))
-            if (!property.isStandard && !property.component.empty()
-                && property.component != Tessara::Geometry::sPointComp)
-                names.push_back(property.name);
-        std::size_t start = channels.find_first_not_of(kSeparators);
-        while (start != std::string::npos) {
-            std::size_t const end = std::min(channels.find_first_of(kSeparators, start), channels.size());
-            bool const excludes = channels[start] == '^' || channels[start] == '-';
-            std::string const pattern = channels.substr(start + (excludes ? 1 : 0), end - start - (excludes ? 1 : 0));
-            start = channels.find_first_not_of(kSeparators, end);
-            bool const isPattern = pattern.find_first_of("*?") != std::string::npos;
-            if (isPattern && (excludes || pattern.find_first_not_of('*') == std::string::npos))
-                continue;
-            TSR::Utils::ChannelParser parser;
-            static_cast<void>(parser.parses(pattern.c_str()));
-            if (std::none_of(
-                    names.begin(), names.end(), [&](std::string const& name) { return parser.accepts(name.c_str()); }))
-                throw Failure(ExitCode::Refused,
-                    fmt::format("--channels: no property of faces or corners matches \"{}\". There are: {}", pattern,
-                        listOf(names)));
-        }
+        requireChannelList(channels_);
     }
 
     Json describeMesh(Object const& mesh, MeshTopology const& topology)
@@ -127,7 +89,7 @@ namespace {
     void Triangulate::run(Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
-        requireMatches(channels_, mesh);
+        requireMatchingChannels(channels_, mesh);
         std::optional<Object> measured(keepsUnits_ ? mesh : inFineUnits(mesh));
         Object result;
         runOperation(report, [&] { result = triangulatedAs(*measured, channels_, mesh); });

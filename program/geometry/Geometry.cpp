@@ -1,4 +1,5 @@
 #include "Geometry.h"
+#include "shell/Failure.h"
 
 #include "sumOverBlocks.h"
 
@@ -8,6 +9,8 @@
 #include <TessaraGeometry/Makers.h>
 #include <TessaraGeometry/Names.h>
 #include <TessaraGeometry/Prototypes.h>
+
+#include <fmt/format.h>
 
 #include <algorithm>
 #include <limits>
@@ -98,6 +101,19 @@ void makeEmpty(GeometryType type, Object& object)
         if (!property.isStandard && property.component == sPointComp)
             empty->setProperty(property.name.c_str(), object.getProperty(property.name.c_str()));
     object = *empty;
+}
+
+void numberElements(std::string const& attribute, int number, std::string const& source, Object& object)
+{
+    if (object.hasProperty(attribute.c_str()))
+        throw Failure(
+            ExitCode::Refused, fmt::format("--source-attribute: {} already has a property \"{}\"", source, attribute));
+    GeometryType const type = typeOf(object);
+    Orvan::String const component = type == GeometryType::Mesh ? sFaceComp
+        : type == GeometryType::Strands                        ? sStrandComp
+                                                               : sPointComp;
+    addDataProperty(
+        attribute.c_str(), component, Orvan::Array<int>(getElementCount(object, component), number), object);
 }
 
 GeoValidator::Status validate(Object const& object)

@@ -24,6 +24,11 @@ std::string nameOf(GeometryType type);
 /// points does not determine its type.
 void makeEmpty(GeometryType type, Tessara::Object& object);
 
+/// Gives each face, strand, or point of a cloud the number of its source, as a new attribute. Refuses an object that has
+/// a property of this name.
+/// \param source  where the object comes from: a file in most cases
+void numberElements(std::string const& attribute, int number, std::string const& source, Tessara::Object& object);
+
 /// Validates the object with the host's validator for its type.
 Tessara::Geometry::GeoValidator::Status validate(Tessara::Object const& object);
 

@@ -1,9 +1,12 @@
 #include "Triangulation.h"
 
 #include "Geometry.h"
+#include "shell/Failure.h"
 
 #include <Modeling/triangulate.h>
 #include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Names.h>
+#include <TessaraGeometryVolume/ChannelParser.h>
 
 #include "frame/grains.h"
 
@@ -24,6 +27,7 @@ using Corners = std::span<unsigned int const>;
 
 namespace {
 
+    constexpr char kSeparators[] = " \t\n\v\f\r,"; // of lists of channels
     constexpr double kLossy = 1e-5; // positions in single precision leave differences of about 1e-7
 
     /// The difference between the areas of the triangles and of the polygon, as a fraction; 0 for a polygon without
@@ -97,6 +101,40 @@ namespace {
         return kind;
     }
 
+}
+
+void requireChannelList(std::string const& channels)
+{
+    if (channels.find_first_not_of(kSeparators) == std::string::npos)
+        throw Failure(ExitCode::CommandLine, "--channels: the list has no entry; \"^*\" keeps no properties");
+    TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels.c_str());
+    if (!status)
+        throw Failure(ExitCode::CommandLine, fmt::format("--channels: {}", status.message().view()));
+}
+
+void requireMatchingChannels(std::string const& channels, Object const& mesh)
+{
+    std::vector<std::string> names;
+    for (Property const& property : propertiesOf(mesh))
+        if (!property.isStandard && !property.component.empty() && property.component != sPointComp)
+            names.push_back(property.name);
+    std::size_t start = channels.find_first_not_of(kSeparators);
+    while (start != std::string::npos) {
+        std::size_t const end = std::min(channels.find_first_of(kSeparators, start), channels.size());
+        bool const excludes = channels[start] == '^' || channels[start] == '-';
+        std::string const pattern = channels.substr(start + (excludes ? 1 : 0), end - start - (excludes ? 1 : 0));
+        start = channels.find_first_not_of(kSeparators, end);
+        bool const isPattern = pattern.find_first_of("*?") != std::string::npos;
+        if (isPattern && (excludes || pattern.find_first_not_of('*') == std::string::npos))
+            continue;
+        TSR::Utils::ChannelParser parser;
+        static_cast<void>(parser.parses(pattern.c_str()));
+        if (std::none_of(
+                names.begin(), names.end(), [&](std::string const& name) { return parser.accepts(name.c_str()); }))
+            throw Failure(ExitCode::Refused,
+                fmt::format("--channels: no property of faces or corners matches \"{}\". There are: {}", pattern,
+                    listOf(names)));
+    }
 }
 
 Object inFineUnits(Object const& mesh)

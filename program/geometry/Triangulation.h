@@ -7,6 +7,12 @@
 
 namespace ModelingProgram {
 
+/// Refuses a list of channels that cannot be parsed or has no entry.
+void requireChannelList(std::string const& channels);
+/// Refuses a name or an including pattern that matches no property of faces or corners. Excluding patterns and * may
+/// match nothing.
+void requireMatchingChannels(std::string const& channels, Tessara::Object const& mesh);
+
 /// The mesh scaled to a length of about a million units, because the library cuts faces below 5e-5 square units poorly.
 /// The factor is a power of two, so nothing is rounded.
 Tessara::Object inFineUnits(Tessara::Object const& mesh);

@@ -377,7 +377,7 @@ namespace {
     }
 }
 
-py::array adopt(py::handle values)
+py::array adopt(py::handle values, bool checks)
 {
     if (!py::isinstance<py::array>(values))
         raiseTypeError("adopt takes a NumPy array, not " + std::string(Py_TYPE(values.ptr())->tp_name));
@@ -392,7 +392,8 @@ py::array adopt(py::handle values)
         return array;
     std::vector<py::object> chain;
     auto const alignment = array.dtype().attr("alignment").cast<std::size_t>();
-    if (!isPlain(array, alignment) || !canBecomeConstant(array, chain))
+    bool const isConstant = canBecomeConstant(array, chain);
+    if (!isPlain(array, alignment) || (checks && !isConstant))
         return privateCopy(array);
     Memory memory;
     memory.owner = array;
@@ -423,7 +424,7 @@ PropertyValue valuesIn(std::string const& elementType, py::buffer_info const& me
 
 void bindViews(py::module_& module)
 {
-    module.def("adopt", &adopt, py::arg("array"),
+    module.def("adopt", &adopt, py::arg("array"), py::kw_only(), py::arg("check") = true,
         R"(Hand the memory of a NumPy array over, so that geometry uses it without a copy.
 
 Returns a read-only array over the same memory: assign that, or pass it to a constructor. `array` itself becomes
@@ -432,7 +433,11 @@ read-only, and so does the array that it is a view of if nothing else refers to 
 
 The memory is copied instead if it is not contiguous or not aligned for its type, if its byte order is not this
 machine's, or if others can write it: a writable base array, a bytearray, an object that does not say that it is
-read-only. `numpy.shares_memory(array, adopted)` tells which it was.)");
+read-only. `numpy.shares_memory(array, adopted)` tells which it was.
+
+check
+    With False, memory that others can write is handed over too, such as that of another library. Then nobody may write,
+    resize or free it as long as there are geometry or views that share it: this would crash the process.)");
 }
 
 }

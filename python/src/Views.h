@@ -49,6 +49,6 @@ Tessara::PropertyValue valuesFrom(py::array const& array, std::string const& wha
 Tessara::PropertyValue valuesIn(std::string const& elementType, py::buffer_info const& memory, py::object const& owner);
 
 /// Makes an array's memory one that nobody can write, if that is possible: see the docstring.
-py::array adopt(py::handle values);
+py::array adopt(py::handle values, bool checks);
 
 }

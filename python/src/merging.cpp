@@ -84,11 +84,23 @@ namespace {
         return mergeWith<Kind>(merge, objectsOf({handles.begin(), handles.end()}));
     }
 
-    py::object mergeAny(std::vector<Handle*> const& handles)
+    void numberSources(std::string const& attribute, Objects& objects)
+    {
+        for (std::uint64_t i = 0; i != objects.size; ++i) {
+            Orvan::MutablePtr<Object> numbered = copyOf(objects[i]);
+            numberElements(attribute, static_cast<int>(i), fmt::format("object {}", i), *numbered);
+            objects[i] = std::move(numbered);
+        }
+    }
+
+    py::object mergeAny(std::vector<Handle*> const& handles, std::string const& sourceAttribute)
     {
         using namespace Tessara::GeometryAlgorithms;
         Objects objects = objectsOf(handles);
-        switch (giveOneKind(objects)) {
+        GeometryType const type = giveOneKind(objects);
+        if (!sourceAttribute.empty())
+            withoutLock([&] { numberSources(sourceAttribute, objects); });
+        switch (type) {
         case GeometryType::Mesh:
             return mergeWith<Mesh>(mergeMeshes, objects);
         case GeometryType::PointCloud:

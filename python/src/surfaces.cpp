@@ -25,7 +25,6 @@
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
 #include <TessaraGeometry/Names.h>
-#include <TessaraGeometryVolume/ChannelParser.h>
 #include <TessaraMathSupport/Loggers.h>
 
 #include <pybind11/stl.h>
@@ -47,18 +46,13 @@ namespace {
 
     // -- Triangulation
 
-    void requireChannels(std::string const& channels)
-    {
-        TSR::Utils::ChannelParser::Status const status = TSR::Utils::ChannelParser().parses(channels.c_str());
-        if (!status)
-            refuse(fmt::format("channels: {}", status.message().view()));
-    }
-
     py::object triangulate(Mesh& mesh, std::string const& channels, bool keepsUnits)
     {
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
-        if (channels != "*")
-            requireChannels(channels);
+        if (channels != "*") {
+            requireChannelList(channels);
+            requireMatchingChannels(channels, *object);
+        }
         std::vector<std::string> outdated;
         Orvan::Ptr<Object> result = withoutLock([&] {
             Orvan::MutablePtr<Object> triangles = copyOf(object);

@@ -246,6 +246,10 @@ def test_memory_that_others_can_write_is_copied():
         assert address(m.point_data["w"]) == address(adopted), "copied once only"
         assert m.point_data["w"].tolist() == given.tolist()
     assert base.flags.writeable
+    m.point_data["w"] = adopt(base[:6], check=False)  # the caller knows that nobody writes it
+    assert address(m.point_data["w"]) == address(base)
+    m.point_data["w"] = adopt(base[::2], check=False)
+    assert not np.shares_memory(m.point_data["w"], base)
     m.point_data["b"] = adopt(not_boolean.view(bool))
     assert m.point_data["b"].view(np.uint8).tolist() == [1] * 6, "a boolean has one bit"
     for wrong in ([1, 2], np.array(["a"], object), np.zeros(3, complex), np.ma.masked_array([1.0], [True])):

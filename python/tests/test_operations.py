@@ -2,13 +2,14 @@
 
 import json
 import math
+import subprocess
 import warnings
 
 import numpy as np
 import pytest
 
 import modeling
-from operation_support import (SAMPLES, cloud, contents, faces_of, made_by_program, positions_of, run, scratch, torus)
+from operation_support import (PROGRAM, SAMPLES, cloud, contents, faces_of, made_by_program, positions_of, run, scratch, torus)
 
 pytestmark = pytest.mark.filterwarnings("ignore::modeling.GeometryWarning")
 
@@ -91,6 +92,11 @@ def test_merged_objects_are_those_of_the_program() -> None:
         objects = [modeling.read(file) for file in files]
         expected = made_by_program("merge", *files)
         assert contents(merge(objects)) == contents(modeling.merge(objects)) == expected
+        numbered = modeling.merge(objects, source_attribute="file")
+        assert contents(numbered) == made_by_program("merge", "--source-attribute", "file", inputs=tuple(files))
+        assert contents(objects[0]) == contents(modeling.read(files[0]))
+        with pytest.raises(modeling.Refusal, match='^source_attribute: object 0 already has a property "file"$'):
+            modeling.merge([numbered, objects[0]], source_attribute="file")
     with pytest.raises(modeling.Refusal, match="merge joins meshes with meshes") as refusal:
         modeling.merge([modeling.read(torus(11)), modeling.read(cloud(1))])
     assert refusal.value.reasons == ("object 0 is a mesh", "object 1 is a point cloud")
@@ -184,6 +190,31 @@ def test_half_edges_lead_to_the_faces() -> None:
         assert edges.neighbors(start).tolist() == starts and edges.valence(start) == len(starts)
         for end in range(20):
             assert edges.find(start, end) == found.get((start, end))
+
+
+WRONG_ARGUMENTS = {
+    ("triangulate", "--channels", names): lambda mesh, names=names: modeling.triangulate(mesh, channels=names)
+    for names in ("uv", "^uv", "mat* u?", "material -uv", " , ")
+} | {
+    ("smooth", "--amount", amount): lambda mesh, amount=amount: modeling.smooth(mesh, amount)
+    for amount in (math.nan, math.inf, -1, 1000.5)
+}
+
+
+@pytest.mark.parametrize("arguments", WRONG_ARGUMENTS, ids=str)
+def test_arguments_are_refused_with_the_sentences_of_the_program(arguments: tuple) -> None:
+    command, option, value = arguments
+    file = torus(18)
+    told = subprocess.run([PROGRAM, command, file, scratch(".ply"), f"{option}={value}"], capture_output=True, text=True)
+    with pytest.raises(ValueError) as refusal:
+        WRONG_ARGUMENTS[arguments](modeling.read(file))
+    assert "--" + str(refusal.value) == told.stderr.splitlines()[0].removeprefix("modeling: ")
+
+
+def test_patterns_that_exclude_may_match_nothing() -> None:
+    mesh = modeling.read(torus(18, quads=True))
+    for channels, kept in {"* ^tmp*": ["material"], "**": ["material"], "^m*": [], "mat?rial": ["material"]}.items():
+        assert list(modeling.triangulate(mesh, channels=channels).face_data) == kept
 
 
 def test_refusals_say_why() -> None:

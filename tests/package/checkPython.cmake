@@ -17,3 +17,15 @@ assert modeling.__file__.startswith('${folder}/moved'), modeling.__file__
 exec(open('readme.py').read())
 modeling.write(fine, 'fine.h5')
 assert modeling.read('fine.h5') == fine and fine.face_count > 10000")
+
+# So do the installed examples, with the installed samples. VTK is optional; the tests of Python run that example.
+file(GLOB examples ${folder}/moved/${DATADIR}/Modeling/examples/python/*.py)
+list(FILTER examples EXCLUDE REGEX "drawing|vtk_round_trip")
+list(LENGTH examples count)
+if(NOT count EQUAL 5)
+    message(FATAL_ERROR "examples are missing: ${examples}")
+endif()
+foreach(example ${examples})
+    run(${CMAKE_COMMAND} -E chdir ${folder} ${CMAKE_COMMAND} -E env PYTHONPATH=${folder}/moved/${LIBDIR}/python3
+        PYTHONDONTWRITEBYTECODE=1 ${PYTHON} ${example})
+endforeach()
