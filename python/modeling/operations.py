@@ -276,7 +276,7 @@ def smooth(
     corners. Normals no longer fit and are dropped, with a `GeometryWarning`.
 
     amount
-        Dimensionless; divided into steps of at most 0.9. 1 removes most noise, 10 converges.
+        Dimensionless, 0 to 1000; divided into steps of at most 0.9. 1 removes most noise, 10 converges.
     weights
         Shape (points,), float32: a factor for the moves of each point, clamped to [0, 1]. 0 pins the point.
     pin_boundary
@@ -287,6 +287,8 @@ def smooth(
     >>> smooth(read(samples / "bunny.obj"), 2, pin_boundary=True)    # doctest: +ELLIPSIS
     <...Mesh...>
     """
+    if not 0 <= amount <= 1000:
+        raise ValueError(f"amount has to be 0 to 1000, not {amount}")
     factors = None if weights is None else _numbers(weights, "weights")
     if factors is not None and factors.ndim != 1:
         raise ValueError(f"weights has to have one dimension, not {factors.ndim}")
