@@ -4,6 +4,7 @@
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
 #include "geometry/Shape.h"
+#include "geometry/replacePositions.h"
 #include "geometry/sumOverBlocks.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
@@ -12,7 +13,6 @@
 #include <Modeling/smooth.h>
 #include <TessaraGeometry/ElementTypes.h>
 #include <TessaraGeometry/Lookup.h>
-#include <TessaraGeometry/Makers.h>
 #include <TessaraMathSupport/Stepper.h>
 
 #include <fmt/format.h>
@@ -258,7 +258,7 @@ namespace {
         dropped_ = displacement.largest != 0 ? dropNormals(mesh) : std::vector<std::string>();
         if (report.needsFacts())
             before_ = describeMesh(mesh);
-        addDataProperty(sPointPosition, sPointComp, std::move(positions), mesh);
+        replacePositions(std::move(positions), mesh);
         if (!report.needsFacts()) {
             subject.shape.reset(); // the topology stays
             return;

@@ -1,6 +1,7 @@
 #include "GuideGrid.h"
 
 #include "LargeFaces.h"
+#include "replacePositions.h"
 #include "shell/Failure.h"
 
 #include <Modeling/subdivideByVolume.h>
@@ -188,7 +189,7 @@ std::uint64_t GuideGrid::refine(float tolerance, Tessara::Object& mesh) const
         Orvan::Array<float3> positions = *dataOf<float3>(mesh, sPointPosition);
         for (float3& p : positions)
             p = {p.x + sign * shift_.x, p.y + sign * shift_.y, p.z + sign * shift_.z};
-        addDataProperty(sPointPosition, sPointComp, positions, mesh);
+        replacePositions(std::move(positions), mesh);
     };
     std::uint64_t largeFaces = 0;
     movePoints(-1);

@@ -11,6 +11,7 @@
 #include "geometry/Refinement.h"
 #include "geometry/Shape.h"
 #include "geometry/Triangulation.h"
+#include "geometry/replacePositions.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 #include "shell/MemoryLimit.h"
@@ -23,7 +24,6 @@
 #include <Modeling/triangulate.h>
 #include <OrvanCppOpSDK/Job.h>
 #include <TessaraGeometry/Elements.h>
-#include <TessaraGeometry/Makers.h>
 #include <TessaraGeometry/Names.h>
 #include <TessaraMathSupport/Loggers.h>
 
@@ -311,7 +311,7 @@ namespace {
             if (!(positions == *arrays.positions)) {
                 if (!isBare(*copy))
                     dropped = dropNormals(*copy);
-                addDataProperty(sPointPosition, sPointComp, std::move(positions), *copy);
+                replacePositions(std::move(positions), *copy);
             }
             return Orvan::Ptr<Object>(std::move(copy));
         };

@@ -207,12 +207,12 @@ void addRandomProperties(Orvan::String const& component, Random& random, Object&
     }
 }
 
-void addAllTypes(Orvan::String const& component, Random& random, Object& object)
+void addAllTypes(Orvan::String const& component, Random& random, Object& object, bool withDefaults)
 {
     forEachElementTypeName([&]<class T>(ElementType<T> type) {
         Orvan::String name = component;
         name += type.name;
-        addData<T>(name, component, getElementCount(object, component), false, random, object);
+        addData<T>(name, component, getElementCount(object, component), withDefaults, random, object);
     });
 }
 

@@ -31,7 +31,7 @@ void cutToElements(Orvan::String const& name, Tessara::Object& object);
 void addRandomProperties(Orvan::String const& component, Random& random, Tessara::Object& object);
 
 /// One data property of each of the forty element types, as long as the component and named after it and the type.
-void addAllTypes(Orvan::String const& component, Random& random, Tessara::Object& object);
+void addAllTypes(Orvan::String const& component, Random& random, Tessara::Object& object, bool withDefaults = false);
 
 Orvan::Array<Tessara::Math::float3> randomPositions(std::size_t count, Random& random);
 
