@@ -27,7 +27,7 @@ namespace {
 
     constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addConvert, addAddPoints,
         addDeletePoints, addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth,
-        addRemoveSlivers, addRepair, addStitch, addRun, addHelp, addCompletion, addManual};
+        addRemoveSlivers, addRepair, addStitch, addRun, addPage, addHelp, addCompletion, addManual};
 
     constexpr char kFooter[] =
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz .glb .gltf .h5;

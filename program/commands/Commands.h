@@ -64,6 +64,7 @@ void addDeletePoints(CommandLine& program, Invocation& invocation);
 void addDeleteFaces(CommandLine& program, Invocation& invocation);
 void addMakeVolume(CommandLine& program, Invocation& invocation);
 void addMerge(CommandLine& program, Invocation& invocation);
+void addPage(CommandLine& program, Invocation& invocation);
 void addRemoveSlivers(CommandLine& program, Invocation& invocation);
 void addRepair(CommandLine& program, Invocation& invocation);
 void addRun(CommandLine& program, Invocation& invocation);

@@ -1,0 +1,114 @@
+// How a view is looked at. Cameras are linked: what one shows is told to the others as it is relative to their frames.
+const Cameras = (() => {
+    const kAngle = 32; // vertical, in degrees
+    const kKeyStep = Math.PI / 24;
+
+    // Directions from which axes are seen from in front, and what is up then.
+    const kSides = { front: [0, 0, 1], right: [1, 0, 0], top: [0, 1, 0.0001], oblique: [0.55, 0.38, 0.85] };
+
+    class Camera {
+        // \param frame  {center, radius}: what fits the view
+        constructor(canvas, frame, onChange) {
+            this.frame = frame;
+            this.camera = new THREE.PerspectiveCamera(kAngle, 1, 0.01, 100);
+            this.controls = new THREE.OrbitControls(this.camera, canvas);
+            this.controls.zoomSpeed = 1.5;
+            this.look("oblique");
+            this.controls.addEventListener("change", () => onChange(this));
+            canvas.addEventListener("keydown", event => this.onKey(event));
+        }
+
+        look(side) {
+            const { center, radius } = this.frame;
+            const direction = new THREE.Vector3(...kSides[side]).normalize();
+            this.controls.target.set(...center);
+            const fit = radius / Math.sin(kAngle / 2 * Math.PI / 180) / Math.min(1, this.camera.aspect);
+            this.camera.position.copy(direction.multiplyScalar(fit * 1.02)).add(this.controls.target);
+            this.controls.update();
+        }
+
+        setAspect(aspect) {
+            this.camera.aspect = aspect;
+        }
+
+        // The planes that just enclose the frame keep the depth precise.
+        prepare() {
+            const { center, radius } = this.frame;
+            const distance = this.camera.position.distanceTo(new THREE.Vector3(...center));
+            this.camera.far = distance + radius * 1.5;
+            this.camera.near = Math.max(distance - radius * 1.5, this.camera.far / 2000);
+            this.camera.updateProjectionMatrix();
+            return this.camera;
+        }
+
+        get pose() {
+            const { center, radius } = this.frame;
+            const relative = v => v.clone().sub(new THREE.Vector3(...center)).divideScalar(radius);
+            return { position: relative(this.camera.position), target: relative(this.controls.target) };
+        }
+
+        set pose({ position, target }) {
+            const { center, radius } = this.frame;
+            const absolute = v => v.clone().multiplyScalar(radius).add(new THREE.Vector3(...center));
+            this.camera.position.copy(absolute(position));
+            this.controls.target.copy(absolute(target));
+            this.controls.update();
+        }
+
+        turn(right, up) {
+            const offset = this.camera.position.clone().sub(this.controls.target);
+            const spherical = new THREE.Spherical().setFromVector3(offset);
+            spherical.theta += right * kKeyStep;
+            spherical.phi -= up * kKeyStep;
+            spherical.makeSafe();
+            this.camera.position.setFromSpherical(spherical).add(this.controls.target);
+            this.controls.update();
+        }
+
+        move(right, up) {
+            const step = 0.08 * this.camera.position.distanceTo(this.controls.target);
+            const shift = new THREE.Vector3(right * step, up * step, 0).applyQuaternion(this.camera.quaternion);
+            this.camera.position.add(shift);
+            this.controls.target.add(shift);
+            this.controls.update();
+        }
+
+        zoom(factor) {
+            this.camera.position.sub(this.controls.target).multiplyScalar(factor).add(this.controls.target);
+            this.controls.update();
+        }
+
+        onKey(event) {
+            if (event.ctrlKey || event.metaKey || event.altKey)
+                return;
+            const move = (right, up) => event.shiftKey ? this.move(right, up) : this.turn(right, up);
+            const actions = { ArrowLeft: () => move(-1, 0), ArrowRight: () => move(1, 0), ArrowUp: () => move(0, 1),
+                ArrowDown: () => move(0, -1), "+": () => this.zoom(1 / 1.15), "=": () => this.zoom(1 / 1.15),
+                "-": () => this.zoom(1.15), Home: () => this.look("oblique"), 0: () => this.look("oblique") };
+            const action = actions[event.key];
+            if (!action)
+                return;
+            event.preventDefault();
+            action();
+        }
+    }
+
+    // The frame around boxes.
+    function frameOf(boxes) {
+        const corner = (name, pick) => [0, 1, 2].map(c => pick(...boxes.map(box => box[name][c])));
+        const min = corner("min", Math.min);
+        const max = corner("max", Math.max);
+        const center = min.map((value, c) => Number.isFinite(value) ? (value + max[c]) / 2 : 0);
+        const radius = Math.hypot(...min.map((value, c) => max[c] - value)) / 2;
+        return { center, radius: Number.isFinite(radius) && radius > 0 ? radius : 1 };
+    }
+
+    // One frame for boxes that lie in the same place, as before and after an operation; otherwise one for each.
+    function framesOf(boxes) {
+        const common = frameOf(boxes);
+        const isAlike = box => frameOf([box]).radius > 0.4 * common.radius;
+        return boxes.every(isAlike) ? boxes.map(() => common) : boxes.map(box => frameOf([box]));
+    }
+
+    return { Camera, framesOf };
+})();
