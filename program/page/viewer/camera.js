@@ -2,6 +2,7 @@
 const Cameras = (() => {
     const kAngle = 32; // vertical, in degrees
     const kKeyStep = Math.PI / 24;
+    const kFill = 0.84; // models seldom fill the sphere around their box
 
     // Directions from which axes are seen from in front, and what is up then.
     const kSides = { front: [0, 0, 1], right: [1, 0, 0], top: [0, 1, 0.0001], oblique: [0.55, 0.38, 0.85] };
@@ -23,7 +24,7 @@ const Cameras = (() => {
             const direction = new THREE.Vector3(...kSides[side]).normalize();
             this.controls.target.set(...center);
             const fit = radius / Math.sin(kAngle / 2 * Math.PI / 180) / Math.min(1, this.camera.aspect);
-            this.camera.position.copy(direction.multiplyScalar(fit * 1.02)).add(this.controls.target);
+            this.camera.position.copy(direction.multiplyScalar(fit * kFill)).add(this.controls.target);
             this.controls.update();
         }
 

@@ -48,11 +48,11 @@ const Charts = (() => {
         });
     }
 
-    // The facts of a view. Those that differ from the reference stand out.
-    function factsTable({ counts, topology, boundingBox }, reference) {
+    // The facts of a view, and further rows of a report. Those that differ from the reference stand out.
+    function factsTable({ counts, topology, boundingBox }, reference, further = {}) {
         const box = boundingBox && { "box from": boundingBox.min.map(format).join(", "), "box to": boundingBox.max.map(format).join(", ") };
         return element("table", { class: "facts" }, element("tbody", {},
-            ...rowsOf({ ...counts, ...topology, ...box }, reference && { ...reference.counts, ...reference.topology })));
+            ...rowsOf({ ...counts, ...topology, ...further, ...box }, reference && { ...reference.counts, ...reference.topology })));
     }
 
     function path(heights, isClosed) {

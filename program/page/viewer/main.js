@@ -223,13 +223,22 @@
         return [element("section", { class: "run", "aria-label": "What was run" },
             element("pre", {}, element("code", {}, run.commandLine)),
             element("dl", {}, ...facts.flatMap(([name, value]) => [element("dt", {}, name), element("dd", {}, value)])),
+            ...(run.notes || []).map(text => element("p", { class: "note" }, text)),
             ...(run.warnings || []).map(text => element("p", { class: "note" }, "Warning: " + text)))];
+    }
+
+    // What the report says of the geometry before or after, beyond its facts. Of several inputs it has sums only.
+    function rowsOfReport({ role, facts }) {
+        const isOnly = page.views.filter(view => view.role === role).length === 1;
+        const known = { ...facts.counts, ...facts.topology };
+        const rows = page.run && isOnly && page.run[role] || {};
+        return Object.fromEntries(Object.entries(rows).filter(([name, value]) => !(name in known) && value !== null));
     }
 
     function build() {
         document.title = shorten(page.title);
         for (const data of page.views)
-            views.push(new Views.View(data, page.views, renderer));
+            views.push(new Views.View(data, page.views, renderer, rowsOfReport(data)));
         const frames = Cameras.framesOf(views.map(view => view.geometry.box));
         views.forEach((view, i) => {
             view.camera = new Cameras.Camera(view.canvas, frames[i], follow);

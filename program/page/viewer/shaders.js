@@ -35,7 +35,7 @@ const Shaders = (() => {
             float key = max(dot(normal, normalize(vec3(-0.45, 0.65, 0.75))), 0.0);
             float fill = max(dot(normal, normalize(vec3(0.8, -0.1, 0.5))), 0.0);
             float rim = pow(1.0 - clamp(normal.z, 0.0, 1.0), 3.0);
-            float ambient = mode == 0 ? 0.3 : 0.55;
+            float ambient = mode == 0 ? 0.42 : 0.6;
             return color * (ambient + (1.0 - ambient) * (0.78 * key + 0.28 * fill) + 0.06) + 0.05 * rim;
         }
     `;
@@ -84,11 +84,11 @@ const Shaders = (() => {
                 color = lit(color, normal.z < 0.0 ? -normal : normal);
                 if (showsEdges) {
                     vec3 width = fwidth(barycentric);
-                    vec3 off = smoothstep(width * 0.3, width * 1.3, barycentric);
+                    vec3 off = smoothstep(width * 0.1, width * 1.0, barycentric);
                     float line = 1.0 - min(min((edges & 2u) != 0u ? off.x : 1.0, (edges & 4u) != 0u ? off.y : 1.0),
                         (edges & 1u) != 0u ? off.z : 1.0);
                     float widest = max(width.x, max(width.y, width.z));
-                    color = mix(color, vec3(0.08, 0.1, 0.13), line * 0.72 * (1.0 - 0.85 * smoothstep(0.15, 0.7, widest)));
+                    color = mix(color, vec3(0.08, 0.1, 0.13), line * 0.62 * (1.0 - 0.9 * smoothstep(0.12, 0.6, widest)));
                 }
                 fragment = vec4(color, 1.0);
             }

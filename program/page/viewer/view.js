@@ -16,7 +16,8 @@ const Views = (() => {
     }
 
     class View {
-        constructor(data, views, renderer) {
+        // \param further  rows for the table of facts
+        constructor(data, views, renderer, further) {
             this.data = data;
             this.renderer = renderer;
             this.canvas = element("canvas", { tabindex: "0", role: "img", "aria-label": describe(data) });
@@ -25,7 +26,7 @@ const Views = (() => {
             this.element = element("article", { class: "view" }, this.heading(), element("div", { class: "stage" }, this.canvas),
                 ...data.notes.map(note => element("p", { class: "note" }, note)),
                 element("div", { class: "beside" },
-                    element("div", {}, Charts.factsTable(data.facts, this.reference && this.reference.facts),
+                    element("div", {}, Charts.factsTable(data.facts, this.reference && this.reference.facts, further),
                         ...Charts.attributesTable(data.facts.properties)),
                     element("div", {}, ...Charts.histograms(data, views))));
         }
