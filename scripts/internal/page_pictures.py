@@ -28,7 +28,14 @@ PREPARE = """
     setTimeout(() => document.getElementById("oblique").click(), 100);"""
 # The attribute that shows what a page is about.
 COLORS = {"merge": "file", "attributes": "height", "add-points": "isCylinder", "delete-points": "isCylinder"}
-SWITCHES = {"remove-slivers": {"slivers": True, "sliverRatio": 3}, "run": {"slivers": True, "sliverRatio": 3}} # below 0.2
+SWITCHES = {
+    "triangulate": {"boundary": False},
+    "recipe": {"boundary": False},
+    "merge": {"slivers": False, "boundary": False},
+    "subdivide": {"wireframe": True},
+    "remove-slivers": {"slivers": True, "sliverRatio": 3},  # below 0.2
+    "run": {"slivers": True, "sliverRatio": 3},
+}
 
 
 def main(folder, pages):

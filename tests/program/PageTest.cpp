@@ -22,7 +22,7 @@ using namespace Tessara::Geometry;
 using testing::ElementsAre;
 using testing::HasSubstr;
 
-std::string contentOf(std::filesystem::path const& file)
+std::string textOfPage(std::filesystem::path const& file)
 {
     std::ostringstream text;
     text << std::ifstream(file, std::ios::binary).rdbuf();
@@ -30,14 +30,14 @@ std::string contentOf(std::filesystem::path const& file)
 }
 
 /// The document of a page, and the bytes of a block.
-Json documentOf(std::string const& page)
+Json documentOfPage(std::string const& page)
 {
     std::string const tag = "id=\"data\">";
     std::size_t const begin = page.find(tag) + tag.size();
     return Json::parse(page.substr(begin, page.find("</script>", begin) - begin));
 }
 
-std::string decoded(std::string const& page, Json const& array)
+std::string decodedBlock(std::string const& page, Json const& array)
 {
     std::string const tag = "id=\"" + array["block"].get<std::string>() + "\">";
     std::size_t const begin = page.find(tag) + tag.size();
@@ -54,7 +54,7 @@ std::string decoded(std::string const& page, Json const& array)
 }
 
 /// A square of n by n quads.
-Orvan::MutablePtr<Tessara::Object> makeGrid(unsigned int n)
+Orvan::MutablePtr<Tessara::Object> gridOfQuads(unsigned int n)
 {
     Orvan::Array<Tessara::Math::float3> points;
     Orvan::Array<unsigned int> corners, offsets{0};
@@ -81,18 +81,18 @@ TEST(Page, HoldsTheArraysBitForBit)
     Result const result =
         run({"page", (folder / "a.html").string(), (folder / "a.ply").string(), "--title", "</title>"});
     ASSERT_EQ(result.exitCode, 0) << result.messages;
-    std::string const page = contentOf(folder / "a.html");
-    Json const document = documentOf(page);
+    std::string const page = textOfPage(folder / "a.html");
+    Json const document = documentOfPage(page);
     EXPECT_EQ(document["title"], "</title>");
     Json const& view = document["views"][0];
-    std::string const positions = decoded(page, view["arrays"]["positions"]);
+    std::string const positions = decodedBlock(page, view["arrays"]["positions"]);
     ASSERT_EQ(positions.size(), 4 * sizeof(float3));
     float z = 0;
     std::memcpy(&z, positions.data() + 8, sizeof(z));
     EXPECT_EQ(z, 0.1f);
-    EXPECT_EQ(decoded(page, view["attributes"][0]["array"]), "\x01\x02\x03\xFA");
-    EXPECT_EQ(decoded(page, view["arrays"]["triangles"]).size(), 6 * sizeof(unsigned int));
-    EXPECT_EQ(decoded(page, view["arrays"]["boundaryEdges"]).size(), 8 * sizeof(unsigned int));
+    EXPECT_EQ(decodedBlock(page, view["attributes"][0]["array"]), "\x01\x02\x03\xFA");
+    EXPECT_EQ(decodedBlock(page, view["arrays"]["triangles"]).size(), 6 * sizeof(unsigned int));
+    EXPECT_EQ(decodedBlock(page, view["arrays"]["boundaryEdges"]).size(), 8 * sizeof(unsigned int));
     EXPECT_EQ(view["facts"]["topology"]["openEdges"], 4);
     EXPECT_THAT(page, HasSubstr("default-src 'none'"));
 }
@@ -103,7 +103,7 @@ TEST(Page, CommandsShowBeforeAndAfter)
     std::string const page = (folder / "a.html").string(), out = (folder / "a b.obj").string();
     Result const result = run({"run", MODELING_SAMPLES "/mixed.obj", out, "--do", "triangulate", "--page", page, "-q"});
     ASSERT_EQ(result.exitCode, 0) << result.messages;
-    Json const document = documentOf(contentOf(page));
+    Json const document = documentOfPage(textOfPage(page));
     ASSERT_EQ(document["views"].size(), 2u);
     EXPECT_EQ(document["views"][0]["role"], "before");
     EXPECT_EQ(document["views"][0]["facts"]["counts"]["faces"], 6);
@@ -118,7 +118,7 @@ TEST(Page, CommandsShowBeforeAndAfter)
 
 TEST(Page, LargeGeometryIsDrawnWithFewerElements)
 {
-    auto mesh = makeGrid(60);
+    auto mesh = gridOfQuads(60);
     DrawnGeometry const all = chooseDrawn(*mesh, 7200, true);
     EXPECT_TRUE(all.notes.empty());
     EXPECT_EQ(all.triangles->size, 3 * 7200u);
@@ -140,7 +140,7 @@ TEST(Page, LargeGeometryIsDrawnWithFewerElements)
 
 TEST(Page, HistogramsCountFacesAndTheirEdges)
 {
-    auto const grid = makeGrid(2);
+    auto const grid = gridOfQuads(2);
     Histograms const found = measureHistograms(arraysOf(*grid));
     std::size_t const one = -Histograms::kLowestExponent * Histograms::kBinsPerOctave; // lengths from 1 to 2^0.25
     EXPECT_EQ(found.edgeLengths[one], 16u);

@@ -15,7 +15,10 @@ const Cameras = (() => {
             this.controls = new THREE.OrbitControls(this.camera, canvas);
             this.controls.zoomSpeed = 1.5;
             this.look("oblique");
-            this.controls.addEventListener("change", () => onChange(this));
+            this.controls.addEventListener("change", () => {
+                if (!this.isResizing)
+                    onChange(this);
+            });
             canvas.addEventListener("keydown", event => this.onKey(event));
         }
 
@@ -28,8 +31,13 @@ const Cameras = (() => {
             this.controls.update();
         }
 
+        // Narrow views see the same from farther away. This concerns one view only, so others do not follow.
         setAspect(aspect) {
+            const farther = Math.min(1, this.camera.aspect) / Math.min(1, aspect);
             this.camera.aspect = aspect;
+            this.isResizing = true;
+            this.zoom(farther);
+            this.isResizing = false;
         }
 
         // The planes that just enclose the frame keep the depth precise.
@@ -104,11 +112,12 @@ const Cameras = (() => {
         return { center, radius: Number.isFinite(radius) && radius > 0 ? radius : 1 };
     }
 
-    // One frame for boxes that lie in the same place, as before and after an operation; otherwise one for each.
-    function framesOf(boxes) {
+    // One frame for boxes that lie in the same place; otherwise one for each.
+    // \param isOneModel  as before and after an operation
+    function framesOf(boxes, isOneModel) {
         const common = frameOf(boxes);
         const isAlike = box => frameOf([box]).radius > 0.4 * common.radius;
-        return boxes.every(isAlike) ? boxes.map(() => common) : boxes.map(box => frameOf([box]));
+        return isOneModel || boxes.every(isAlike) ? boxes.map(() => common) : boxes.map(box => frameOf([box]));
     }
 
     return { Camera, framesOf };

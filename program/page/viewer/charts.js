@@ -110,7 +110,7 @@ const Charts = (() => {
         const before = view.role === "after" ? views.find(other => other.role === "before" && other.histograms) : null;
         return [
             ...edgeLengths(view, views, before),
-            histogram("Face quality (shortest over longest edge)", view.histograms.qualities,
+            histogram("Face quality (shortest / longest edge)", view.histograms.qualities,
                 before && before.histograms.qualities, ["0", "1"]),
         ];
     }

@@ -239,7 +239,8 @@
         document.title = shorten(page.title);
         for (const data of page.views)
             views.push(new Views.View(data, page.views, renderer, rowsOfReport(data)));
-        const frames = Cameras.framesOf(views.map(view => view.geometry.box));
+        const frames = Cameras.framesOf(views.map(view => view.geometry.box),
+            views.length === 2 && page.views[1].role === "after");
         views.forEach((view, i) => {
             view.camera = new Cameras.Camera(view.canvas, frames[i], follow);
         });
