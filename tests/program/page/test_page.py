@@ -121,13 +121,13 @@ def write_ply(path, points, faces, columns=()):
     path.write_bytes(head.encode() + rows.tobytes() + lists.tobytes())
 
 
-def write_grid(path, n, columns=lambda x, y: ()):
-    """A square of n by n quads, each cut into two triangles, from -1 to 1."""
+def write_grid(path, n, columns=lambda x, y: (), shift=0):
+    """A square of n by n quads, each cut into two triangles, from -1 to 1, moved along x."""
     x, y = (axis.ravel() for axis in numpy.meshgrid(numpy.linspace(-1, 1, n + 1), numpy.linspace(-1, 1, n + 1)))
     first = (numpy.arange(n)[:, None] * (n + 1) + numpy.arange(n)).ravel()
     faces = numpy.concatenate([numpy.column_stack([first, first + 1, first + n + 2]),
                                numpy.column_stack([first, first + n + 2, first + n + 1])])
-    write_ply(path, numpy.column_stack([x, y, 0.1 * x * x]), faces, columns(x, y))
+    write_ply(path, numpy.column_stack([x + shift, y, 0.1 * x * x]), faces, columns(x, y))
 
 
 def test_views_draw_the_model_where_it_is(open_page, tmp_path):
@@ -231,7 +231,9 @@ def test_two_million_faces_open(open_page, tmp_path):
 
 def test_before_and_after(driver, tmp_path):
     out, file = tmp_path / "merged.ply", tmp_path / "run.html"
-    command = [PROGRAM, "merge", SAMPLES / "bunny.obj", SAMPLES / "cylinder.obj", "-o", out, "--source-attribute", "from",
+    write_grid(tmp_path / "left.ply", 4)
+    write_grid(tmp_path / "right.ply", 4, shift=2.5)
+    command = [PROGRAM, "merge", tmp_path / "left.ply", tmp_path / "right.ply", "-o", out, "--source-attribute", "from",
                "--page", file, "-q"]
     subprocess.run(command, check=True)
     page = Page(driver, file)
@@ -239,5 +241,7 @@ def test_before_and_after(driver, tmp_path):
     assert page.run("return document.querySelector('.run code').textContent").startswith("modeling merge ")
     page.color_by("from (faces)")
     assert page.legend() == ["0", "1"] and len(page.driver.find_elements("class name", "category")) == 2
-    assert near(page.image(2), (0x00, 0x72, 0xB2), 40) > 100 and near(page.image(2), (0xE6, 0x9F, 0x00), 40) > 100
+    blue, orange = (near(page.image(2), color, 40) for color in ((0x00, 0x72, 0xB2), (0xE6, 0x9F, 0x00)))
+    assert blue > 500 and 0.5 < orange / blue < 2
+    assert page.driver.find_elements("css selector", ".changed")  # counts after that differ from those before
     page.close()
