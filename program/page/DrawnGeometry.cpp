@@ -169,10 +169,11 @@ namespace {
             cells[face] = mesh.faceOf(corners[3 * face]);
         moveToClusters(clusters, drawn.boundaryEdges);
         moveToClusters(clusters, drawn.nonManifoldEdges);
-        drawn.notes.push_back(
-            fmt::format("Drawn with {} of {} faces: points that are too close to be told apart are drawn "
-                        "as one. Facts and histograms are those of all faces.",
-                groupDigits(cells.size), groupDigits(drawn.all.cellCount())));
+        drawn.notes.push_back(fmt::format(
+            "Drawn with {} of {} faces: points that are too close to be told apart are drawn "
+            "as one. Facts and histograms are those of all faces, colors by quality and slivers those of the "
+            "drawn ones.",
+            groupDigits(cells.size), groupDigits(drawn.all.cellCount())));
         drawn.triangles.reset();
         drawn.points = arrayOf(clusters.points);
         drawn.corners = arrayOf(corners);
