@@ -2,13 +2,13 @@
 const Cameras = (() => {
     const kAngle = 32; // vertical, in degrees
     const kKeyStep = Math.PI / 24;
-    const kFill = 0.84; // models seldom fill the sphere around their box
+    const kMargin = 1.1; // balls and tubes reach beyond their points
 
     // Directions from which axes are seen from in front, and what is up then.
     const kSides = { front: [0, 0, 1], right: [1, 0, 0], top: [0, 1, 0.0001], oblique: [0.55, 0.38, 0.85] };
 
     class Camera {
-        // \param frame  {center, radius}: what fits the view
+        // \param frame  what fits the view, as frameOf() returns it
         constructor(canvas, frame, onChange) {
             this.frame = frame;
             this.camera = new THREE.PerspectiveCamera(kAngle, 1, 0.01, 100);
@@ -23,12 +23,24 @@ const Cameras = (() => {
         }
 
         look(side) {
-            const { center, radius } = this.frame;
             const direction = new THREE.Vector3(...kSides[side]).normalize();
-            this.controls.target.set(...center);
-            const fit = radius / Math.sin(kAngle / 2 * Math.PI / 180) / Math.min(1, this.camera.aspect);
-            this.camera.position.copy(direction.multiplyScalar(fit * kFill)).add(this.controls.target);
+            this.controls.target.set(...this.frame.center);
+            this.camera.position.copy(direction).multiplyScalar(this.fittingDistance(direction)).add(this.controls.target);
             this.controls.update();
+        }
+
+        // From where all corners of the frame's box are seen.
+        fittingDistance(direction) {
+            const right = new THREE.Vector3(0, 1, 0).cross(direction).normalize();
+            const up = direction.clone().cross(right);
+            const slope = Math.tan(kAngle / 2 * Math.PI / 180);
+            let distance = 0;
+            for (let i = 0; i < 8; ++i) {
+                const corner = new THREE.Vector3(...this.frame.half.map((value, c) => i >> c & 1 ? value : -value));
+                const aside = Math.max(Math.abs(corner.dot(up)), Math.abs(corner.dot(right)) / this.camera.aspect);
+                distance = Math.max(distance, corner.dot(direction) + aside / slope);
+            }
+            return (distance || this.frame.radius / slope) * kMargin;
         }
 
         // Narrow views see the same from farther away. This concerns one view only, so others do not follow.
@@ -36,7 +48,11 @@ const Cameras = (() => {
             const farther = Math.min(1, this.camera.aspect) / Math.min(1, aspect);
             this.camera.aspect = aspect;
             this.isResizing = true;
-            this.zoom(farther);
+            if (this.hasAspect)
+                this.zoom(farther);
+            else
+                this.look("oblique");
+            this.hasAspect = true;
             this.isResizing = false;
         }
 
@@ -108,8 +124,9 @@ const Cameras = (() => {
         const min = corner("min", Math.min);
         const max = corner("max", Math.max);
         const center = min.map((value, c) => Number.isFinite(value) ? (value + max[c]) / 2 : 0);
-        const radius = Math.hypot(...min.map((value, c) => max[c] - value)) / 2;
-        return { center, radius: Number.isFinite(radius) && radius > 0 ? radius : 1 };
+        const half = min.map((value, c) => Number.isFinite(value) ? (max[c] - value) / 2 : 0);
+        const radius = Math.hypot(...half);
+        return { center, half, radius: radius > 0 ? radius : 1 };
     }
 
     // One frame for boxes that lie in the same place; otherwise one for each.
