@@ -9,6 +9,7 @@
 #include "shell/Failure.h"
 #include "shell/MemoryLimit.h"
 #include "shell/Progress.h"
+#include "shell/ShellWords.h"
 
 #include <fmt/format.h>
 #include <tbb/global_control.h>
@@ -27,7 +28,7 @@ namespace {
 
     constexpr void (*kCommands[])(CommandLine&, Invocation&) = {addInfo, addValidate, addConvert, addAddPoints,
         addDeletePoints, addDeleteFaces, addMerge, addTriangulate, addSubdivide, addMakeVolume, addSmooth,
-        addRemoveSlivers, addRepair, addStitch, addRun, addHelp, addCompletion, addManual};
+        addRemoveSlivers, addRepair, addStitch, addRun, addPage, addHelp, addCompletion, addManual};
 
     constexpr char kFooter[] =
         R"(The file name extension determines the format. Read: .obj .ply .stl .off .xyz .glb .gltf .h5;
@@ -104,6 +105,7 @@ Exit codes:
             threadLimit.emplace(tbb::global_control::max_allowed_parallelism, invocation.threads);
         prepareOutput(invocation);
         Report report(invocation.command);
+        report.commandLine = invocation.commandLine;
         report.isJson = invocation.asJson;
         report.isQuiet = invocation.isQuiet;
         report.isStrict = invocation.isStrict;
@@ -145,6 +147,9 @@ Exit codes:
     int parseAndRun(int argumentCount, char const* const* arguments)
     {
         Invocation invocation;
+        std::vector<std::string> words{"modeling"};
+        words.insert(words.end(), arguments + std::min(1, argumentCount), arguments + argumentCount);
+        invocation.commandLine = quotedCommand(words);
         CommandLine program("modeling", "modeling " MODELING_VERSION,
             "Geometry algorithms for meshes, point clouds and strands, run on files.", kFooter);
         for (auto const add : kCommands)

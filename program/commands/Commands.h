@@ -26,6 +26,7 @@ struct Invocation {
     std::vector<double> center; // three numbers, or empty
     std::string format; // of files whose names do not tell it; empty if it is not given
     std::string inFormat; // the same, of files that are read
+    std::string commandLine;
     std::function<void(Report&)> run;
     // What each command writes: a file, or the last one of a list.
     std::map<std::string, Output*> outputs;
@@ -64,6 +65,7 @@ void addDeletePoints(CommandLine& program, Invocation& invocation);
 void addDeleteFaces(CommandLine& program, Invocation& invocation);
 void addMakeVolume(CommandLine& program, Invocation& invocation);
 void addMerge(CommandLine& program, Invocation& invocation);
+void addPage(CommandLine& program, Invocation& invocation);
 void addRemoveSlivers(CommandLine& program, Invocation& invocation);
 void addRepair(CommandLine& program, Invocation& invocation);
 void addRun(CommandLine& program, Invocation& invocation);

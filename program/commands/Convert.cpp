@@ -1,5 +1,6 @@
 #include "Commands.h"
 #include "Operation.h"
+#include "PageOfRun.h"
 #include "geometry/Geometry.h"
 
 #include <memory>
@@ -16,13 +17,17 @@ namespace {
     void convert(Options const& options, Report& report)
     {
         requireWritable(options.out, GeometryType::None);
+        PageOfRun page(options.out, 1, report);
         Orvan::MutablePtr<Tessara::Object> const object = loadInput(options.in, report).object;
+        page.addBefore(*object, options.in.string());
         requireHolds(options.out, *object);
         saveGeometry(*object, options.out, report);
+        page.addAfter(*object);
         Json const counts = countsOf(*object);
         report.document["counts"] = counts;
         report.text += formatValues({{"", counts}});
         reportRun(report);
+        page.finish();
     }
 
 }
@@ -38,6 +43,7 @@ and the geometry cannot hold, and what the second format cannot: then it is left
     Command command = addCommand(kHelp, program, invocation);
     addFile("IN", "File to read", options->in, command);
     addOutput("File to write", options->out, command, invocation);
+    addPageOption(options->out, command);
     onSelected(command, invocation, [options](Report& report) { convert(*options, report); });
 }
 

@@ -1,5 +1,6 @@
 #include "Edit.h"
 
+#include "PageOfRun.h"
 #include "geometry/FaceMeasures.h"
 #include "geometry/MeshRequirements.h"
 #include "shell/Failure.h"
@@ -60,6 +61,11 @@ Subject Edit::readSubject(std::vector<std::filesystem::path> const& files, Repor
     return subject;
 }
 
+void Edit::forEachInput(Subject const& subject, VisitInput const& visit) const
+{
+    visit(*subject.object, subject.name, subject.topology ? &*subject.topology : nullptr);
+}
+
 void addEditCommand(EditKind const& kind, CommandLine& program, Invocation& invocation)
 {
     struct Files {
@@ -72,6 +78,7 @@ void addEditCommand(EditKind const& kind, CommandLine& program, Invocation& invo
     addFile("IN", describeFile(kind.takes, "read"), files->in[0], command);
     edit->declareFiles(command);
     addOutput(describeFile(kind.gives, "write"), files->out, command, invocation);
+    addPageOption(files->out, command);
     edit->declareOptions(command);
     onSelected(command, invocation,
         [&kind, edit, files](Report& report) { runOnFiles(kind, *edit, files->in, files->out, report); });
@@ -84,6 +91,7 @@ void runOnFiles(EditKind const& kind, Edit& edit, std::vector<std::filesystem::p
         edit.checkOptions();
         requireWritable(out, kind.gives);
         requireAttribute(edit.newAttribute(), out);
+        PageOfRun page(out, files.size(), report);
         edit.readFiles(report);
         Subject subject = edit.readSubject(files, report);
         {
@@ -91,12 +99,17 @@ void runOnFiles(EditKind const& kind, Edit& edit, std::vector<std::filesystem::p
             requireSubject(kind, subject);
             if (kind.gives == GeometryType::None || kind.keepsFaces)
                 requireHolds(out, *subject.object);
+            page.addBefore(edit, subject);
             edit.run(subject, report);
             requireHolds(out, *subject.object);
         }
         saveGeometry(*subject.object, out, report);
-        Phase const phase(report, &Times::report, kReportTitle);
-        edit.report(report);
+        page.addAfter(*subject.object, subject.topology ? &*subject.topology : nullptr);
+        {
+            Phase const phase(report, &Times::report, kReportTitle);
+            edit.report(report);
+        }
+        page.finish();
     });
 }
 

@@ -61,6 +61,11 @@ public:
     /// Reads and validates the geometry. By default this is one file.
     virtual Subject readSubject(std::vector<std::filesystem::path> const& files, Report& report);
 
+    /// Calls `visit` with each input, its name, and its topology if that is known, before the edit runs. By default this
+    /// is the subject.
+    using VisitInput = std::function<void(Tessara::Object const&, std::string const& name, MeshTopology const*)>;
+    virtual void forEachInput(Subject const& subject, VisitInput const& visit) const;
+
     /// Refuses the geometry if the operation cannot handle it, otherwise edits it, and what is known of it. Facts that
     /// only the report needs are omitted unless `report.needsFacts()`.
     /// \pre  it is valid and has the type that `EditKind` requires

@@ -1,9 +1,7 @@
 #include "Commands.h"
 #include "Operation.h"
 #include "files/GeometryBuilder.h"
-#include "geometry/FaceMeasures.h"
-#include "geometry/Geometry.h"
-#include "geometry/MeshTopology.h"
+#include "geometry/Facts.h"
 #include "shell/Failure.h"
 #include "shell/Phase.h"
 #include "shell/Progress.h"
@@ -16,55 +14,12 @@ namespace ModelingProgram {
 
 namespace {
 
-    Json describeTopology(MeshArrays const& mesh, MeshTopology const& topology)
-    {
-        Json values;
-        values["triangles"] = topology.triangleCount;
-        values["quads"] = topology.quads.count;
-        values["polygons"] = topology.polygons.count;
-        values["facesBelowThreeCorners"] = topology.facesBelowThreeCorners.count;
-        values["facesWithRepeatedPoints"] = topology.facesWithRepeatedPoints.count;
-        values["edges"] = topology.edgeCount;
-        values["parts"] = topology.partCount;
-        values["openEdges"] = topology.boundaryEdges.count;
-        values["nonManifoldEdges"] = topology.nonManifoldEdges.count;
-        values["windingConflicts"] = topology.windingConflicts.count;
-        values["pinchedPoints"] = topology.nonManifoldPoints.count;
-        values["isolatedPoints"] = topology.isolatedPoints.count;
-        values["closedManifold"] = topology.isClosedManifold();
-        values["genus"] = topology.genus ? Json(static_cast<std::uint64_t>(*topology.genus)) : Json();
-        auto const slivers = countSlivers(mesh, {0.1f, 0.05f, 0.01f});
-        values["sliversBelow0.1"] = slivers[0];
-        values["sliversBelow0.05"] = slivers[1];
-        values["sliversBelow0.01"] = slivers[2];
-        return values;
-    }
-
-    Json describeBox(std::optional<BoundingBox> const& box)
-    {
-        if (!box)
-            return {};
-        auto const numbersOf = [](float3 const& p) { return Json{numberOf(p.x), numberOf(p.y), numberOf(p.z)}; };
-        return {{"min", numbersOf(box->min)}, {"max", numbersOf(box->max)}};
-    }
-
     std::string formatBox(std::optional<BoundingBox> const& box)
     {
         if (!box)
             return "empty";
         return fmt::format(
             "({}, {}, {}) to ({}, {}, {})", box->min.x, box->min.y, box->min.z, box->max.x, box->max.y, box->max.z);
-    }
-
-    Json describeProperties(std::vector<Property> const& properties)
-    {
-        Json list = Json::array();
-        for (Property const& property : properties)
-            list.push_back({{"name", property.name}, {"type", property.type},
-                {"component", elementNames(property.component.c_str())},
-                {"range", property.range.empty() ? Json() : Json(property.range)}, {"length", property.length},
-                {"standard", property.isStandard}});
-        return list;
     }
 
     std::string formatProperties(std::vector<Property> const& properties)

@@ -1,4 +1,5 @@
 #include "Edit.h"
+#include "PageOfRun.h"
 #include "files/GeometryBuilder.h"
 #include "files/WorkMeter.h"
 #include "geometry/Geometry.h"
@@ -44,6 +45,7 @@ namespace {
         void declareOptions(Command& command) override;
         NewAttribute newAttribute() const override { return {"--source-attribute", sourceAttribute_}; }
         Subject readSubject(std::vector<std::filesystem::path> const& files, Report& report) override;
+        void forEachInput(Subject const& subject, VisitInput const& visit) const override;
         void run(Subject& subject, Report& report) override;
         void report(Report& report) override;
 
@@ -218,6 +220,12 @@ namespace {
         return {sources_.files[0], makeMutable(Orvan::Ptr<Object>(sources_.objects[0]))};
     }
 
+    void Merge::forEachInput(Subject const&, VisitInput const& visit) const
+    {
+        for (std::size_t i = 0; i != sources_.files.size(); ++i)
+            visit(*sources_.objects[i], sources_.files[i], nullptr);
+    }
+
     void Merge::run(Subject& subject, Report& report)
     {
         if (!sourceAttribute_.empty())
@@ -263,6 +271,7 @@ void addMerge(CommandLine& program, Invocation& invocation)
     std::shared_ptr<Edit> const edit = kMerge.create();
     Command command = addCommand(kMerge.help, program, invocation);
     addFiles(*files, command, invocation);
+    addPageOption(files->out, command);
     edit->declareOptions(command);
     onSelected(command, invocation, [files, edit](Report& report) {
         chooseOutput("merge", *files);

@@ -32,6 +32,7 @@ struct Output {
     std::string format = {}; // if the name does not tell it, as an extension: ".ply"
     bool replaces = false; // otherwise an existing file is refused
     unsigned int compression = 0; // of an HDF5 file, 1 to 9
+    std::filesystem::path page = {}; // that shows the geometry before and after; mostly empty
 
     Existing existing() const { return replaces ? Existing::Replace : Existing::Keep; }
 };

@@ -1,5 +1,6 @@
 #include "Commands.h"
 #include "Operation.h"
+#include "PageOfRun.h"
 #include "Recipe.h"
 #include "Steps.h"
 #include "shell/Failure.h"
@@ -73,6 +74,7 @@ A recipe is a JSON file of steps, such as {{"modeling": 1, "steps": [{{"do": "tr
         "  modeling run part.obj part.vtp --recipe clean.json"};
     Command command = addCommand(help, program, invocation);
     addFiles(options->files, command, invocation, Needed::Sometimes);
+    addPageOption(options->files.out, command);
     Command steps = command.addChoice("Steps", "one of these is required");
     steps.addOption("--do", options->steps, "Steps, separated by semicolons").valueName("STEPS");
     steps.addOption("--recipe", options->recipe, "A JSON file of steps").valueName("FILE");

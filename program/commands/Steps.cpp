@@ -1,5 +1,6 @@
 #include "Steps.h"
 
+#include "PageOfRun.h"
 #include "shell/Cancellation.h"
 #include "shell/Failure.h"
 #include "shell/Phase.h"
@@ -245,14 +246,18 @@ void runSteps(
     requireChain(steps, files.size());
     Chain chain(steps, report);
     chain.checkBefore(out);
+    PageOfRun page(out, files.size(), report);
     Subject subject = chain.read(files);
+    page.addBefore(*steps[0].edit, subject);
     if (std::all_of(steps.begin(), steps.end(), [](Step const& step) { return step.kind->keepsFaces; }))
         requireHolds(out, *subject.object);
     chain.run(subject);
     requireHolds(out, *subject.object);
     saveGeometry(*subject.object, out, report);
+    page.addAfter(*subject.object, subject.topology ? &*subject.topology : nullptr);
     report.text.pop_back(); // the table begins with an empty line too
     reportRun(report);
+    page.finish();
 }
 
 }

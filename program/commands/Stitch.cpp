@@ -1,4 +1,5 @@
 #include "Edit.h"
+#include "PageOfRun.h"
 #include "geometry/Geometry.h"
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
@@ -413,6 +414,7 @@ void addStitch(CommandLine& program, Invocation& invocation)
     edit->declareFiles(command);
     command.addOption("--on", files->on[0], "Mesh to lay the template on").synopsis("MESH");
     addOutput("File of strands to write", files->out, command, invocation, Needed::Sometimes);
+    addPageOption(files->out, command);
     edit->declareOptions(command);
     command.addFlag("--check", files->checkOnly, "Only report whether the template is usable");
     onSelected(command, invocation, [files, edit](Report& report) {

@@ -138,23 +138,29 @@ void leaveOut(Attribute const& attribute, std::string const& why, std::vector<st
         + elementNames(attribute.component) + ") is left out: " + why);
 }
 
-WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file)
+WritableGeometry takeApartUnchecked(Tessara::Object const& object)
 {
     WritableGeometry geometry;
     geometry.kind = kindOf(object);
-    if (GeoValidator::Status const status = validateGeometry(object); !status)
-        refuse(file, "the geometry is invalid: " + std::string(status.message().view()));
     geometry.positions = dataOf<float3>(object, sPointPosition);
     geometry.faceVertex = dataOf<unsigned int>(object, sFaceVertex);
     if (geometry.kind != WritableGeometry::Kind::PointCloud)
         geometry.offsets =
             dataOf<unsigned int>(object, geometry.kind == WritableGeometry::Kind::Mesh ? sFaceOffset : sStrandOffset);
-    checkValues(geometry, file);
     auto const names = getGeoPropNamesByPrototype(object, *getDataGeoPropPrototype(sGenericDataGeoProp));
     for (Orvan::String const& name : names) {
         if (!isReservedName(name.view()))
             addAttribute(object, name, geometry);
     }
+    return geometry;
+}
+
+WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file)
+{
+    if (GeoValidator::Status const status = validateGeometry(object); !status)
+        refuse(file, "the geometry is invalid: " + std::string(status.message().view()));
+    WritableGeometry geometry = takeApartUnchecked(object);
+    checkValues(geometry, file);
     return geometry;
 }
 

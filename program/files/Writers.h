@@ -69,6 +69,9 @@ std::uint64_t estimateFileBytes(WritableGeometry const& geometry, std::string_vi
 /// Checks what all formats require: a valid object, finite positions, at least three corners per face.
 /// \throws FileError, which names the file
 WritableGeometry takeApart(Tessara::Object const& object, std::filesystem::path const& file);
+/// The same without checks, for what can show any values.
+/// \pre  the object is valid
+WritableGeometry takeApartUnchecked(Tessara::Object const& object);
 
 /// The text with U+FFFD in place of bytes that are not UTF-8, for formats that have to be.
 std::string validUtf8(std::string_view text);

@@ -62,6 +62,7 @@ public:
     bool hasWarned = false; // about the result
     int exitCode = 0; // if the command does not fail
     std::vector<std::string> requirements; // what inputs have to be, as `parseRequirements` returns it
+    std::string commandLine; // as it could be typed
     ReadOptions reading; // of all files; the first file read determines the center to subtract
     Times times; // of the phases that have ended
     Phase* phase = nullptr; // the innermost one

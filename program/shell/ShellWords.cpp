@@ -53,4 +53,22 @@ std::vector<std::vector<std::string>> splitCommands(std::string_view text)
     return commands;
 }
 
+std::string quotedCommand(std::vector<std::string> const& words)
+{
+    constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789_-+=./,:@%^#";
+    std::string line;
+    for (std::string const& word : words) {
+        line += line.empty() ? "" : " ";
+        if (!word.empty() && word.find_first_not_of(kPlain) == std::string::npos && word[0] != '#') {
+            line += word;
+            continue;
+        }
+        line += '\'';
+        for (char const c : word)
+            c == '\'' ? line += "'\\''" : line += c;
+        line += '\'';
+    }
+    return line;
+}
+
 }

@@ -12,4 +12,7 @@ namespace ModelingProgram {
 /// \throws Failure  if a quotation has no end
 std::vector<std::vector<std::string>> splitCommands(std::string_view text);
 
+/// The words as they can be typed: quoted where a shell would take them for something else.
+std::string quotedCommand(std::vector<std::string> const& words);
+
 }

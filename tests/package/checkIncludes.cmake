@@ -11,7 +11,8 @@ foreach(subsystem cleanup editing merging stitch subdivision triangulation volum
 endforeach()
 
 set(program_top commands files geometry shell)
-set(program_commands top files geometry repair shell)
+set(program_commands top files geometry page repair shell)
+set(program_page files geometry shell)
 set(program_repair geometry frame)
 set(program_geometry shell files frame) # the library's frame, for its lists of the corners at each point and its lanes
 set(program_shell files)
