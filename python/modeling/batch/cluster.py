@@ -45,6 +45,7 @@ def local_client(workers: int) -> Iterator[Client]:
             processes=True,
             memory_limit=0,  # workers with large meshes are left alone
             dashboard_address=None,
+            scheduler_kwargs={"dashboard_address": "127.0.0.1:0"},  # its health page opens any free port, not 8787
             local_directory=folder,
             silence_logs=logging.CRITICAL,
             preload=[MODULE_OF_WORKERS],
