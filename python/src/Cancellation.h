@@ -7,7 +7,6 @@
 #include <type_traits>
 #include <utility>
 
-#include <cxxabi.h>
 #include <unistd.h>
 
 namespace ModelingPython {
@@ -25,7 +24,7 @@ public:
     {
         try {
             PyEval_RestoreThread(state_);
-        } catch (abi::__forced_unwind&) {
+        } catch (...) { // nothing but that unwinding
             for (;;)
                 ::pause();
         }
