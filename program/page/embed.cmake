@@ -23,14 +23,15 @@ function(hash_of text result)
     set(${result} "${encoded}=" PARENT_SCOPE)
 endfunction()
 
-# Literals of at most 16,000 characters.
+# Literals of at most 16,000 characters, whose suffix takes their length from the compiler: counting it in constant expressions
+# exceeds the number of steps that clang allows.
 function(parts_of text result)
     string(LENGTH "${text}" length)
     set(parts "")
     set(first 0)
     while(first LESS length)
         string(SUBSTRING "${text}" ${first} 16000 part)
-        string(APPEND parts "    R\"viewer(${part})viewer\",\n")
+        string(APPEND parts "    R\"viewer(${part})viewer\"sv,\n")
         math(EXPR first "${first} + 16000")
     endwhile()
     set(${result} "${parts}" PARENT_SCOPE)
@@ -56,6 +57,8 @@ file(WRITE ${OUTPUT} "#include \"page/Viewer.h\"
 namespace ModelingProgram {
 
 namespace {
+
+using namespace std::string_view_literals;
 
 constexpr std::string_view kStyle[] = {
 ${style_parts}};
