@@ -30,10 +30,10 @@ struct CompactNormal {
         Doubles const scales = double{kUnit} / lengths;
         Bits const areFinite = (lengths > 0.0) & (lengths < std::numeric_limits<double>::infinity());
         auto const inUnits = [&](double const* coordinate) {
-            Doubles coordinates;
-            std::memcpy(&coordinates, coordinate, sizeof(coordinates));
-            coordinates = reinterpret_cast<Doubles>(areFinite & reinterpret_cast<Bits>(coordinates * scales));
-            return __builtin_convertvector(coordinates, Modeling::IntLanes) + kZero;
+            Doubles values;
+            std::memcpy(&values, coordinate, sizeof(values));
+            values = reinterpret_cast<Doubles>(areFinite & reinterpret_cast<Bits>(values * scales));
+            return __builtin_convertvector(values, Modeling::IntLanes) + kZero;
         };
         Modeling::IntLanes const bytes = inUnits(x) | inUnits(y) << 8 | inUnits(z) << 16;
         std::memcpy(static_cast<void*>(normals), &bytes, sizeof(bytes));
