@@ -182,7 +182,8 @@ namespace {
             arraysOf(mesh), topology, faultsOfIsolatedPoints(arraysOf(mesh), topology), "subdivide", subject.name);
 
         std::optional<GuideGrid> const guide = readGuide(mesh, report);
-        tolerance_ = refinementTolerance(options_.tolerance, options_.relative, mesh, guide ? &*guide : nullptr);
+        tolerance_ =
+            refinementTolerance(options_.tolerance, options_.relative, boundingBoxOf(mesh), guide ? &*guide : nullptr);
         Object result = mesh;
         std::uint64_t largeFaces = 0;
         runOperation(report, [&] { largeFaces = refine(guide, tolerance_, result); });

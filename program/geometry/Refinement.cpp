@@ -1,6 +1,5 @@
 #include "Refinement.h"
 
-#include "Geometry.h"
 #include "LargeFaces.h"
 #include "shell/Failure.h"
 #include "shell/Report.h"
@@ -31,12 +30,12 @@ namespace {
 
 }
 
-float refinementTolerance(
-    std::optional<float> absolute, std::optional<float> relative, Object const& mesh, GuideGrid const* guide)
+float refinementTolerance(std::optional<float> absolute, std::optional<float> relative,
+    std::optional<BoundingBox> const& boundingBox, GuideGrid const* guide)
 {
-    if (!boundingBoxOf(mesh))
+    if (!boundingBox)
         return absolute.value_or(0); // not used for an empty mesh
-    BoundingBox const box = *boundingBoxOf(mesh);
+    BoundingBox const& box = *boundingBox;
     float3 const size{box.max.x - box.min.x, box.max.y - box.min.y, box.max.z - box.min.z};
     float const tolerance = absolute ? *absolute : *relative * std::hypot(size.x, size.y, size.z);
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "Geometry.h"
 #include "GuideGrid.h"
 
 #include <TessaraObject/Object.h>
@@ -12,11 +13,12 @@
 namespace ModelingProgram {
 
 /// The tolerance of a refinement.
-/// \param absolute  in model units; if it is missing, `relative` times the diagonal of the bounding box is used
-/// \param guide     scales it; may be null
-/// \throws Failure  if single precision cannot represent faces that small
-float refinementTolerance(
-    std::optional<float> absolute, std::optional<float> relative, Tessara::Object const& mesh, GuideGrid const* guide);
+/// \param absolute     in model units; if it is missing, `relative` times the diagonal of the bounding box is used
+/// \param boundingBox  of the mesh; none for an empty mesh
+/// \param guide        scales it; may be null
+/// \throws Failure     if single precision cannot represent faces that small
+float refinementTolerance(std::optional<float> absolute, std::optional<float> relative,
+    std::optional<BoundingBox> const& boundingBox, GuideGrid const* guide);
 
 /// The number of faces of a refined mesh that the tolerance would still split.
 std::uint64_t countFacesAbove(float tolerance, Tessara::Object const& refined);

@@ -64,11 +64,17 @@ namespace {
         return py::detail::array_proxy(array.ptr())->base;
     }
 
+    /// Calls NumPy itself, because the constructors of `py::array` allocate strides, and views are made all the time.
     py::array readOnlyView(
-        py::dtype const& type, std::vector<py::ssize_t> const& shape, void const* data, py::object const& base)
+        py::dtype type, std::vector<py::ssize_t> const& shape, void const* data, py::object const& base)
     {
-        py::array view(type, shape, data, base);
-        makeReadOnly(view);
+        auto const& numpy = py::detail::npy_api::get();
+        constexpr int kFlags = 0; // not writable; NumPy finds out the others
+        auto view =
+            py::reinterpret_steal<py::array>(numpy.PyArray_NewFromDescr_(numpy.PyArray_Type_, type.release().ptr(),
+                static_cast<int>(shape.size()), shape.data(), nullptr, const_cast<void*>(data), kFlags, nullptr));
+        if (!view || numpy.PyArray_SetBaseObject_(view.ptr(), base.inc_ref().ptr()) != 0)
+            throw py::error_already_set();
         return view;
     }
 

@@ -8,8 +8,10 @@
 #include <fmt/format.h>
 
 #include <cstring>
+#include <memory>
 #include <stdexcept>
 #include <string>
+#include <utility>
 
 namespace ModelingPython {
 
@@ -42,16 +44,19 @@ inline Orvan::Array<Tessara::Math::float3> pointsOf(Values<float> const& values)
     return arrayOf<Tessara::Math::float3>(values);
 }
 
-/// A NumPy array of these values.
-template <class T> py::array_t<T> numbersOf(Orvan::Array<T> const& values)
+/// A NumPy array that has taken over the memory of these values: of `Number`s, one or three per value.
+template <class Number, class T> py::array_t<Number> numbersOf(Orvan::Array<T> values)
 {
-    return py::array_t<T>(static_cast<py::ssize_t>(values.size), values.data);
-}
-
-inline py::array_t<float> numbersOf(Orvan::Array<Tessara::Math::float3> const& values)
-{
-    return py::array_t<float>(
-        {static_cast<py::ssize_t>(values.size), py::ssize_t{3}}, reinterpret_cast<float const*>(values.data));
+    constexpr auto kColumns = static_cast<py::ssize_t>(sizeof(T) / sizeof(Number));
+    auto held = std::make_unique<Orvan::Array<T>>(std::move(values));
+    py::capsule const owner(held.get(), [](void* dying) { delete static_cast<Orvan::Array<T>*>(dying); });
+    Orvan::Array<T> const& kept = *held.release();
+    auto const* const data = reinterpret_cast<Number const*>(kept.data);
+    auto const count = static_cast<py::ssize_t>(kept.size);
+    if constexpr (kColumns == 1)
+        return py::array_t<Number>(count, data, owner);
+    else
+        return py::array_t<Number>({count, kColumns}, data, owner);
 }
 
 /// Calls `visit(index)` for each index of an array of integers from 0 up to but excluding `count`.

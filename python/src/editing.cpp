@@ -127,7 +127,7 @@ namespace {
     py::array_t<unsigned int> computeMapping(Values<bool> const& mask)
     {
         auto const deleted = arrayOf<bool>(mask);
-        return numbersOf(withoutLock([&] { return computeDeletedComponentMapping(deleted); }));
+        return numbersOf<unsigned int>(withoutLock([&] { return computeDeletedComponentMapping(deleted); }));
     }
 
     py::object copyProperties(Handle& handle, std::vector<Handle*> const& from)

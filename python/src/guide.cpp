@@ -183,7 +183,7 @@ namespace {
         auto const at = pointsOf(points);
         Orvan::Array<float> values(at.size, Orvan::kUninitialized);
         withoutLock([&] { guide.grid().sample({at.data, at.size}, {values.data, values.size}); });
-        return numbersOf(values);
+        return numbersOf<float>(std::move(values));
     }
 
     std::uint64_t countCovered(Guide const& guide, Mesh& mesh)

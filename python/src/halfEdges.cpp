@@ -44,7 +44,7 @@ namespace {
             Orvan::Array<unsigned int> points;
             for (auto const& [other, edge] : edges_.neighbors(checked(point)))
                 points.append(other);
-            return numbersOf(points);
+            return numbersOf<unsigned int>(std::move(points));
         }
 
     private:

@@ -30,25 +30,29 @@ namespace {
     /// Nobody sees an object without points as one of a certain kind: it becomes an empty one of the kind of the others.
     GeometryType giveOneKind(Objects& objects)
     {
+        std::vector<GeometryType> types;
+        for (auto const& object : objects)
+            types.push_back(typeOf(*object));
+        if (std::all_of(types.begin(), types.end(), [&](GeometryType type) { return type == types.front(); }))
+            return types.front();
         auto const isEmpty = [](auto const& object) {
             return Tessara::Geometry::getElementCount(*object, Tessara::Geometry::sPointComp) == 0;
         };
         auto const typical = std::find_if_not(objects.begin(), objects.end(), isEmpty);
-        GeometryType const type = typeOf(typical == objects.end() ? *objects[0] : **typical);
-        bool areAlike = true;
+        GeometryType const type = typical == objects.end() ? types.front() : typeOf(**typical);
         for (std::uint64_t i = 0; i != objects.size; ++i) {
-            if (isEmpty(objects[i]) && typeOf(*objects[i]) != type) {
-                Orvan::MutablePtr<Object> empty = copyOf(objects[i]);
-                makeEmpty(type, *empty);
-                objects[i] = std::move(empty);
-            }
-            areAlike = areAlike && typeOf(*objects[i]) == type;
+            if (types[i] == type || !isEmpty(objects[i]))
+                continue;
+            Orvan::MutablePtr<Object> empty = copyOf(objects[i]);
+            makeEmpty(type, *empty);
+            objects[i] = std::move(empty);
+            types[i] = type;
         }
-        if (areAlike)
+        if (std::all_of(types.begin(), types.end(), [=](GeometryType other) { return other == type; }))
             return type;
         std::vector<std::string> kinds;
         for (std::uint64_t i = 0; i != objects.size; ++i)
-            kinds.push_back(fmt::format("object {} is a {}", i, nameOf(typeOf(*objects[i]))));
+            kinds.push_back(fmt::format("object {} is a {}", i, nameOf(types[i])));
         refuse(
             "merge joins meshes with meshes, point clouds with point clouds, or strand sets with strand sets", kinds);
     }

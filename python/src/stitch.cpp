@@ -67,7 +67,7 @@ namespace {
         offsets.append(0);
         for (LocalStrand const& strand : made.getStrands())
             offsets.append(static_cast<unsigned int>(offset += strand.controlPoints.size));
-        return numbersOf(offsets);
+        return numbersOf<unsigned int>(std::move(offsets));
     }
 
     /// Per edge, the strands that end on it, and at which of their ends.
@@ -107,7 +107,7 @@ namespace {
                 else
                     made.findControlPointPos(corners, weights, scale, flip, *position++);
             }
-        return numbersOf(positions);
+        return numbersOf<float>(std::move(positions));
     }
 
 }

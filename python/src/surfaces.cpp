@@ -10,6 +10,7 @@
 #include "geometry/MeshRequirements.h"
 #include "geometry/Refinement.h"
 #include "geometry/Shape.h"
+#include "geometry/TriangleBatch.h"
 #include "geometry/Triangulation.h"
 #include "geometry/replacePositions.h"
 #include "shell/Cancellation.h"
@@ -77,11 +78,10 @@ namespace {
 
     /// How much a refinement may make.
     /// \return  `Brief` for few faces, `Large` if memory has to be watched
-    Extent extentOf(float tolerance, GuideGrid const* guide, Object const& mesh)
+    Extent extentOf(float tolerance, std::optional<BoundingBox> const& box, GuideGrid const* guide, Object const& mesh)
     {
         constexpr float kFewFaces = 10, kManyFaces = 300; // along the diagonal
         constexpr unsigned int kFewPoints = 100;
-        auto const box = boundingBoxOf(mesh);
         if (!box)
             return Extent::Medium;
         float const diagonal = std::hypot(box->max.x - box->min.x, box->max.y - box->min.y, box->max.z - box->min.z);
@@ -147,8 +147,9 @@ namespace {
         if (checks)
             requireClosedTriangles(operation, false, mesh);
         GuideGrid const* const grid = guide ? &guide->grid() : nullptr;
-        float const size = refinementTolerance(tolerance, relative, *object, grid);
-        Extent const extent = extentOf(size, grid, *object);
+        auto const box = boundingBoxOf(*object);
+        float const size = refinementTolerance(tolerance, relative, box, grid);
+        Extent const extent = extentOf(size, box, grid, *object);
         Refined refined = runCancellable(
             [&] {
                 Refined made;
@@ -174,18 +175,14 @@ namespace {
 
     void requireTriangles(MeshArrays const& mesh)
     {
-        std::uint64_t const corners = mesh.cornerCount();
-        bool areAll = corners == 3 * std::uint64_t{mesh.faceCount()};
-        for (std::uint64_t face = 0; areAll && face != mesh.faceCount(); ++face)
-            areAll = (*mesh.faceOffset)[face] == 3 * face;
-        if (!areAll)
+        if (!areTriangles(mesh, 0, mesh.faceCount()))
             refuse("large_faces needs a mesh of triangles:", faultsOfTriangles(mesh, analyzeTopology(mesh)));
     }
 
     py::array_t<bool> largeFaces(Mesh& mesh, float tolerance)
     {
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
-        return numbersOf(withoutLock([&] {
+        return numbersOf<bool>(withoutLock([&] {
             MeshArrays const arrays = arraysOf(*object);
             requireTriangles(arrays);
             Orvan::Array<bool> marks(arrays.faceCount());
