@@ -47,8 +47,13 @@ namespace {
     }
 
     /// Without repeated points of triangles, which are found among those that are not closed fans.
-    MeshTopology countFaces(MeshArrays const& mesh)
+    MeshTopology countFaces(MeshArrays const& mesh, bool areAllTriangles)
     {
+        if (areAllTriangles) {
+            MeshTopology topology;
+            topology.triangleCount = mesh.faceCount();
+            return topology;
+        }
         return sumOverBlocks<MeshTopology>(mesh.faceCount(), [&](std::size_t blockBegin, std::size_t blockEnd) {
             auto const begin = static_cast<unsigned int>(blockBegin), end = static_cast<unsigned int>(blockEnd);
             MeshTopology topology;
@@ -165,13 +170,14 @@ namespace {
         MeshTopology found_;
     };
 
-    /// What the points tell, and their components.
-    MeshTopology examinePoints(MeshArrays const& mesh, std::span<CreasesWithNormals const> creases)
+    /// Also counts the components.
+    MeshTopology examineFacesAndPoints(MeshArrays const& mesh, std::span<CreasesWithNormals const> creases)
     {
         Orvan::Array<unsigned int> lowerInParts(mesh.pointCount(), Orvan::kUninitialized);
         MeshTopology topology;
         {
             PointBlocks const blocks(mesh);
+            topology = countFaces(mesh, blocks.areAllTriangles());
             tbb::enumerable_thread_specific<BlockExaminer> examiners(mesh, creases, lowerInParts.data);
             // Each thread adds up what it finds, and each point has its own entry of the array.
             tbb::parallel_for(
@@ -206,10 +212,7 @@ MeshTopology& MeshTopology::operator+=(MeshTopology const& other)
 
 MeshTopology analyzeTopology(MeshArrays const& mesh, std::span<CreasesWithNormals const> creases)
 {
-    MeshTopology topology = countFaces(mesh);
-    MeshTopology const atPoints = examinePoints(mesh, creases);
-    topology += atPoints;
-    topology.partCount = atPoints.partCount;
+    MeshTopology topology = examineFacesAndPoints(mesh, creases);
     if (topology.isClosedManifold()) {
         auto const points = static_cast<std::int64_t>(mesh.pointCount() - topology.isolatedPoints.count);
         std::int64_t const eulerCharacteristic =

@@ -88,34 +88,50 @@ PointBlocks::PointBlocks(MeshArrays const& mesh)
     forEachPart([this](std::size_t part) {
         areTriangles_[part] = areTriangles(mesh_, beginOfPart(part), beginOfPart(part + 1));
     });
-    shift_ =
-        shiftOfBlocks(mesh, std::all_of(areTriangles_.begin(), areTriangles_.begin() + partCount_, std::identity()));
+    areAllTriangles_ = std::all_of(areTriangles_.begin(), areTriangles_.begin() + partCount_, std::identity());
+    shift_ = shiftOfBlocks(mesh, areAllTriangles_);
     count_ = static_cast<unsigned int>(blockCount(mesh, shift_));
     offsets_.resize(std::size_t{count_} * partCount_ + 1);
-    forEachPart([this](std::size_t part) { countFaces(part); });
+    forEachPart([this](std::size_t part) { countWords(part); });
     std::exclusive_scan(offsets_.begin(), offsets_.end(), offsets_.begin(), 0u);
-    faces_ = Orvan::Array<unsigned int>(offsets_.back(), Orvan::kUninitialized);
-    forEachPart([this](std::size_t part) { distributeFaces(part); });
+    words_ = Orvan::Array<unsigned int>(offsets_.back(), Orvan::kUninitialized);
+    forEachPart([this](std::size_t part) { writeRuns(part); });
 }
 
-void PointBlocks::countFaces(std::size_t part)
+template <class Put> std::vector<PointBlocks::OpenRun> PointBlocks::encodeRuns(std::size_t part, Put const& put) const
 {
-    std::vector<unsigned int> counts(count_);
+    std::vector<OpenRun> open(count_);
+    unsigned int const firstFace = beginOfPart(part);
     forEachRun(part, [&](unsigned int block, unsigned int faceBegin, unsigned int faceEnd) {
-        counts[block] += faceEnd - faceBegin;
+        unsigned int const begin = faceBegin - firstFace, end = faceEnd - firstFace;
+        OpenRun& run = open[block];
+        if (run.wordCount != 0 && begin == run.end) {
+            if (run.isSingle)
+                put(block, run.wordCount++ - 1, (begin - 1) | kLonger);
+            run.isSingle = false;
+            put(block, run.wordCount - 1, end);
+        } else {
+            run.isSingle = end - begin == 1;
+            put(block, run.wordCount++, begin | (run.isSingle ? 0 : kLonger));
+            if (!run.isSingle)
+                put(block, run.wordCount++, end);
+        }
+        run.end = end;
     });
-    for (unsigned int block = 0; block != count_; ++block)
-        offsets_[std::size_t{block} * partCount_ + part] = counts[block];
+    return open;
 }
 
-void PointBlocks::distributeFaces(std::size_t part)
+void PointBlocks::countWords(std::size_t part)
 {
-    std::vector<unsigned int> places(count_);
+    std::vector<OpenRun> const found = encodeRuns(part, [](unsigned int, unsigned int, unsigned int) {});
     for (unsigned int block = 0; block != count_; ++block)
-        places[block] = offsets_[std::size_t{block} * partCount_ + part];
-    forEachRun(part, [&](unsigned int block, unsigned int faceBegin, unsigned int faceEnd) {
-        std::iota(faces_.data + places[block], faces_.data + places[block] + (faceEnd - faceBegin), faceBegin);
-        places[block] += faceEnd - faceBegin;
+        offsets_[std::size_t{block} * partCount_ + part] = found[block].wordCount;
+}
+
+void PointBlocks::writeRuns(std::size_t part)
+{
+    encodeRuns(part, [=, this](unsigned int block, unsigned int word, unsigned int value) {
+        words_[offsets_[std::size_t{block} * partCount_ + part] + word] = value;
     });
 }
 
@@ -153,22 +169,34 @@ template <class Visit> void PointBlocks::forEachRun(std::size_t part, Visit cons
             }
 }
 
+template <class Visit> void PointBlocks::forEachFace(unsigned int block, std::size_t part, Visit const& visit) const
+{
+    std::size_t const entry = std::size_t{block} * partCount_ + part;
+    for (unsigned int word = offsets_[entry]; word != offsets_[entry + 1];) {
+        unsigned int const first = words_[word++], begin = first & ~kLonger;
+        unsigned int const end = first == begin ? begin + 1 : words_[word++];
+        for (unsigned int face = begin; face != end; ++face)
+            visit(face);
+    }
+}
+
 template <class Visit> void PointBlocks::forEachCorner(unsigned int block, Visit const& visit) const
 {
     unsigned int const* const pointAt = mesh_.faceVertex->data;
     unsigned int const* const offset = mesh_.faceOffset->data;
     for (std::size_t part = 0; part != partCount_; ++part)
         if (areTriangles_[part]) {
-            unsigned int const begin = beginOfPart(part), firstCorner = offset[begin];
-            for (unsigned int const face : facesOf(block, part)) {
-                unsigned int const corner = firstCorner + 3 * (face - begin);
+            unsigned int const firstFace = beginOfPart(part), firstCorner = offset[firstFace];
+            forEachFace(block, part, [=, &visit](unsigned int faceOfPart) {
+                unsigned int const face = firstFace + faceOfPart, corner = firstCorner + 3 * faceOfPart;
                 unsigned int const a = pointAt[corner], b = pointAt[corner + 1], c = pointAt[corner + 2];
                 visit(a, CornerAtPoint{b, c, corner, face});
                 visit(b, CornerAtPoint{c, a, corner + 1, face});
                 visit(c, CornerAtPoint{a, b, corner + 2, face});
-            }
+            });
         } else
-            for (unsigned int const face : facesOf(block, part)) {
+            forEachFace(block, part, [=, this, &visit](unsigned int faceOfPart) {
+                unsigned int const face = beginOfPart(part) + faceOfPart;
                 unsigned int const first = offset[face], end = offset[face + 1];
                 bool const hasSides = end - first >= 3;
                 for (unsigned int corner = first; corner != end; ++corner) {
@@ -176,7 +204,7 @@ template <class Visit> void PointBlocks::forEachCorner(unsigned int block, Visit
                     unsigned int const previous = !hasSides ? corner : corner == first ? end - 1 : corner - 1;
                     visit(pointAt[corner], CornerAtPoint{pointAt[next], pointAt[previous], corner, face});
                 }
-            }
+            });
 }
 
 void PointBlocks::list(unsigned int block, BlockCorners& corners) const

@@ -65,14 +65,17 @@ private:
 
 /// Lists the corners at the points of a mesh block by block, for one pass over all points. First the faces are
 /// distributed to blocks of consecutive points, which writes to few places at a time. Then the corners at the points of
-/// one block fit the cache, whereas lists for the whole mesh would be filled and read at random. Needs 4 bytes per face
-/// and block in which it has corners: little more than 4 per face in most meshes, 12 per triangle at most.
+/// one block fit the cache, whereas lists for the whole mesh would be filled and read at random. Needs 8 bytes per run of
+/// consecutive faces with corners in the same block, 4 if it is one face: nearly nothing in most meshes, 12 per triangle
+/// at most.
 class PointBlocks {
 public:
     /// The mesh must outlive it.
     explicit PointBlocks(MeshArrays const& mesh);
 
     unsigned int count() const { return count_; }
+    /// Whether all faces are triangles.
+    bool areAllTriangles() const { return areAllTriangles_; }
     /// Lists the corners at the points of a block. Memory of earlier lists is used again.
     void list(unsigned int block, BlockCorners& corners) const;
 
@@ -84,27 +87,36 @@ private:
     {
         return static_cast<unsigned int>(std::uint64_t{mesh_.faceCount()} * part / partCount_);
     }
-    std::span<unsigned int const> facesOf(unsigned int block, std::size_t part) const
-    {
-        std::size_t const entry = std::size_t{block} * partCount_ + part;
-        return {faces_.data + offsets_[entry], faces_.data + offsets_[entry + 1]};
-    }
-    void countFaces(std::size_t part);
-    void distributeFaces(std::size_t part);
+    /// What a part has found so far for a block.
+    struct OpenRun {
+        unsigned int end = 0; // of the last run, relative to the part
+        bool isSingle = false; // whether that run is one face
+        unsigned int wordCount = 0; // of all runs
+    };
+    /// Calls `put(block, word, value)` for the words of the runs of a part. Words that are put again are replaced.
+    /// \return  one entry per block
+    template <class Put> std::vector<OpenRun> encodeRuns(std::size_t part, Put const& put) const;
+    void countWords(std::size_t part);
+    void writeRuns(std::size_t part);
     /// Calls `visit(block, first face, end)` for runs of faces of a part that have corners in a block, in ascending
-    /// order. Visits each face and block with corners of it once.
+    /// order. Visits each face and block with corners of it once. Runs may follow each other closely.
     template <class Visit> void forEachRun(std::size_t part, Visit const& visit) const;
+    /// Calls `visit(face)` for the faces of a part with corners in a block in ascending order, relative to the part.
+    template <class Visit> void forEachFace(unsigned int block, std::size_t part, Visit const& visit) const;
     /// Calls `visit(point, CornerAtPoint)` for the corners in a block in ascending order, and for some others.
     template <class Visit> void forEachCorner(unsigned int block, Visit const& visit) const;
 
     MeshArrays const& mesh_;
     std::size_t partCount_;
     std::array<bool, kMostParts> areTriangles_{};
+    bool areAllTriangles_ = false;
     unsigned int shift_ = 0; // a block has two to the power of this many points
     unsigned int count_ = 0;
-    // The faces of part p with corners in block b are those from entry b · parts + p to the next one.
+    // The runs of part p with corners in block b are in the words from entry b · parts + p to the next one: the first
+    // face relative to the part, and also the end if the first word has the bit `kLonger`.
+    static constexpr unsigned int kLonger = 1u << 31; // a part has fewer faces
     std::vector<unsigned int> offsets_;
-    Orvan::Array<unsigned int> faces_;
+    Orvan::Array<unsigned int> words_;
 };
 
 }
