@@ -68,7 +68,7 @@ Row const slivers("removeSlivers", kTriangles, {"", ":memcpy", ":flat passes"}, 
 });
 
 /// The shortest edges of all faces end at one of two hubs.
-Row const sliversAtHubs("removeSlivers:hubs", kTriangles, [](Run& run) {
+Row const sliversAtHubs("removeSlivers at hubs", kTriangles, [](Run& run) {
     auto const source = MeshBuilder::wheel(static_cast<unsigned int>(run.size() / 2)).build();
     timeOnCopies(run, run.size(), *source, [](Object& mesh) { ::Geometry::Mesh::removeSlivers(0.5f, mesh); });
 });
