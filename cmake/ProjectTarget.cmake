@@ -44,10 +44,10 @@ function(modeling_compile_quickly target)
     endif()
 endfunction()
 
-# Adds a test program from SOURCES and LIBRARIES. Each gtest case becomes a CTest test. The target tests_<LABEL> builds all
-# programs of a label.
+# Adds a test program from SOURCES and LIBRARIES. Each gtest case becomes a CTest test, with PREFIX before its name. The target
+# tests_<LABEL> builds all programs of a label.
 function(modeling_add_test name)
-    cmake_parse_arguments(arg "" "LABEL" "SOURCES;LIBRARIES" ${ARGN})
+    cmake_parse_arguments(arg "" "LABEL;PREFIX" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     modeling_use_flags(${name})
     modeling_compile_quickly(${name})
@@ -57,5 +57,5 @@ function(modeling_add_test name)
         add_custom_target(tests_${arg_LABEL})
     endif()
     add_dependencies(tests_${arg_LABEL} ${name})
-    gtest_discover_tests(${name} DISCOVERY_TIMEOUT 60 PROPERTIES LABELS "${arg_LABEL}" TIMEOUT 600)
+    gtest_discover_tests(${name} TEST_PREFIX "${arg_PREFIX}" DISCOVERY_TIMEOUT 60 PROPERTIES LABELS "${arg_LABEL}" TIMEOUT 600)
 endfunction()

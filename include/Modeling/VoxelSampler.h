@@ -26,7 +26,7 @@ inline constexpr int kWorldSpace = 2;
 template <class Traits> class MODELING_EXPORT VoxelSampler<Traits, float, Tessara::Math::float3> {
 public:
     using ContainerType = Container<Traits>;
-    using TileType = typename ContainerType::TileType;
+    using TileType = Internal::TileOf<Traits>;
 
     virtual ~VoxelSampler();
     /// Returns "kNone".

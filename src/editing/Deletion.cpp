@@ -4,6 +4,7 @@
 #include "frame/Assert.h"
 #include "frame/ElementTypes.h"
 #include "host/GeoProperties.h"
+#include "host/OptionalFeatures.h"
 
 #include <Modeling/computeDeletedComponentMapping.h>
 #include <TessaraGeometry/Elements.h>
@@ -89,15 +90,15 @@ namespace {
         });
     }
 
-    /// Whether the array, or the property that holds it, is shared with something outside the object, which would see
-    /// an edit in place.
+    /// Whether the array, or the property that holds it, may be shared with something outside the object, which would
+    /// see an edit in place.
     /// \param localReferences  How many variables of the caller refer to the array.
     template <class T> bool isShared(Object const& object, Orvan::String const& key,
         Orvan::Ptr<Orvan::Array<T>> const& array, std::uint64_t localReferences)
     {
         constexpr std::uint64_t kOwner = 1; // the object holds the property, and the property holds the array
         Orvan::Ptr<Object> const property = objectAt(object, key);
-        return property.useCount() > kOwner + 1 || array.useCount() > kOwner + localReferences;
+        return mayBeShared(property, kOwner + 1) || mayBeShared(array, kOwner + localReferences);
     }
 
     /// Removes the array from a clone of a property, so that the clone's reference does not count as sharing.

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "host/OptionalFeatures.h"
+
 #include <OrvanCore/Array.h>
 #include <OrvanCore/Ptr.h>
 #include <OrvanCore/String.h>
@@ -72,7 +74,7 @@ struct PlainForm {
 template <class Form, class Rule, class... T> void forEachElementType(
     ElementTypeList<T...>, Form, Tessara::PropertyValue const* value, bool* result, Rule const& rule)
 {
-    if (!value || value->empty())
+    if (!value || isKnownToBeEmpty(*value))
         return;
     // A value holds one type, so at most one entry of the list matches.
     auto const tryType = [&]<class Held>(Held const* held) {

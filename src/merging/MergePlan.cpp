@@ -7,6 +7,7 @@
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Names.h>
 
+#include <cstring>
 #include <limits>
 #include <numeric>
 
@@ -25,6 +26,12 @@ namespace {
         if (array && *array)
             found = {(*array)->data, (*array)->size, kPlaceOfElementType<T>};
         return array;
+    }
+
+    /// The host does not order strings.
+    bool isBefore(Orvan::String const& a, Orvan::String const& b)
+    {
+        return std::strcmp(a.c_str(), b.c_str()) < 0;
     }
 
     using FindArray = bool (*)(PropertyValue const&, ArrayView&);
@@ -75,7 +82,7 @@ namespace {
                 likelyTypes_[property] = result.arrays[property].type;
             }
             if (isNewLayout_)
-                layout_ = Orvan::makePtr<PropertyLayout>(roles_);
+                layout_ = std::make_shared<PropertyLayout>(roles_);
             result.layout = layout_;
             return result;
         }
@@ -118,7 +125,7 @@ namespace {
         }
 
         LookupKeys const& keys_;
-        Orvan::Ptr<PropertyLayout> layout_; // of the previous input
+        std::shared_ptr<PropertyLayout const> layout_; // of the previous input
         std::vector<PropertyRole> roles_; // as in `layout_`, until the next input is read over them
         std::vector<unsigned char> likelyTypes_; // element types of the previous input's arrays
         bool isNewLayout_ = true;
@@ -129,7 +136,7 @@ namespace {
 ArrayView ArrayView::of(PropertyValue const& value, unsigned char likelyType)
 {
     ArrayView found;
-    if (value.empty() || (likelyType != kNoType && kArrayFinders[likelyType](value, found)))
+    if (isKnownToBeEmpty(value) || (likelyType != kNoType && kArrayFinders[likelyType](value, found)))
         return found;
     std::any_of(kArrayFinders.begin(), kArrayFinders.end(), [&](FindArray find) { return find(value, found); });
     return found;
@@ -141,13 +148,15 @@ PropertyLayout::PropertyLayout(std::vector<PropertyRole> const& roles)
 {
     std::iota(byName_.begin(), byName_.end(), 0u);
     std::sort(byName_.begin(), byName_.end(),
-        [&](std::uint32_t a, std::uint32_t b) { return roles_[a].name < roles_[b].name; });
+        [&](std::uint32_t a, std::uint32_t b) { return isBefore(roles_[a].name, roles_[b].name); });
 }
 
 std::optional<std::size_t> PropertyLayout::find(Orvan::String const& name) const
 {
-    auto const index = std::lower_bound(byName_.begin(), byName_.end(), name,
-        [&](std::uint32_t candidate, Orvan::String const& sought) { return roles_[candidate].name < sought; });
+    auto index = std::lower_bound(byName_.begin(), byName_.end(), name,
+        [&](std::uint32_t candidate, Orvan::String const& sought) { return isBefore(roles_[candidate].name, sought); });
+    while (index != byName_.end() && roles_[*index].name != name && !isBefore(name, roles_[*index].name))
+        ++index; // names that differ only behind a null character
     if (index == byName_.end() || roles_[*index].name != name)
         return std::nullopt;
     return *index;

@@ -15,6 +15,7 @@
 #include <cstdint>
 #include <functional>
 #include <initializer_list>
+#include <memory>
 #include <optional>
 #include <utility>
 #include <vector>
@@ -75,7 +76,7 @@ struct MergeInput {
     static constexpr std::size_t kMaxComponents = 3;
 
     Tessara::Object const* object = nullptr;
-    Orvan::Ptr<PropertyLayout> layout;
+    std::shared_ptr<PropertyLayout const> layout;
     std::vector<ArrayView> arrays; // the array under `sData` of each property of the layout
     std::array<unsigned int, kMaxComponents> counts{}; // element count of each component of the plan
 };

@@ -44,7 +44,7 @@ bool finishConnectivity(Connectivity const& connectivity, Offsets const& regionO
     MODELING_ASSERT(regionOffsets.size == connectivity.baseOffsets.size);
     if (!connectivity.merged)
         return false;
-    if (readGeoPropData<unsigned int>(output, connectivity.name) == connectivity.merged)
+    if (readGeoPropData<unsigned int>(output, connectivity.name).get() == connectivity.merged.get())
         return true;
     return editGeoPropData<unsigned int>(connectivity.name, output, [&](Orvan::Array<unsigned int>& values) {
         if (connectivity.closingEntry)

@@ -6,6 +6,7 @@
 
 #include <TessaraGeometry/Elements.h>
 
+#include <functional>
 #include <string_view>
 #include <unordered_set>
 
@@ -13,7 +14,14 @@ namespace Modeling::Internal {
 
 namespace {
 
-    using NameSet = std::unordered_set<std::string_view>; // views of names in the plan
+    // The host has no hash of strings. Names that differ behind a null character only have the same one.
+    struct HashOfName {
+        std::size_t operator()(Orvan::String const* name) const { return std::hash<std::string_view>()(name->c_str()); }
+    };
+    struct SameName {
+        bool operator()(Orvan::String const* a, Orvan::String const* b) const { return *a == *b; }
+    };
+    using NameSet = std::unordered_set<Orvan::String const*, HashOfName, SameName>; // names in the plan
 
     std::vector<DataPropertyMergeEntry> collectDataProperties(MergePlan const& plan, Orvan::String const& component)
     {
@@ -21,7 +29,7 @@ namespace {
         NameSet admitted;
         forEachLayout(plan, [&](MergeInput const& input) {
             for (PropertyRole const& role : input.layout->roles())
-                if (isData(role) && role.owner == component && admitted.insert(role.name.view()).second)
+                if (isData(role) && role.owner == component && admitted.insert(&role.name).second)
                     entries.push_back(dataEntry(input, role.name));
         });
         return entries;
@@ -33,13 +41,12 @@ namespace {
         NameSet admitted;
         forEachLayout(plan, [&](MergeInput const& input) {
             for (PropertyRole const& role : input.layout->roles()) {
-                if (role.kind != GeoPropertyKind::Range || role.owner != component
-                    || admitted.contains(role.name.view()))
+                if (role.kind != GeoPropertyKind::Range || role.owner != component || admitted.contains(&role.name))
                     continue;
                 std::vector<DataPropertyMergeEntry> dependents = collectDependentDataProperties(input, role.name);
                 if (dependents.empty())
                     continue; // a later input may still qualify
-                admitted.insert(role.name.view());
+                admitted.insert(&role.name);
                 entries.push_back({role.name, nullptr, std::move(dependents)});
             }
         });

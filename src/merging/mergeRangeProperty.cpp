@@ -144,7 +144,8 @@ void mergeRangeProperty(MergePlan const& plan, Offsets const& elementOffsets, Ra
     Offsets const dependentOffsets = computeDependentOffsets(plan, entry.dependents);
     entry.mergedIndices = Orvan::makePtr<IndexArray>(mergeIndices(sources, elementOffsets, dependentOffsets));
 
-    bool const needsDefaultSlot = std::find(sources.begin(), sources.end(), nullptr) != sources.end();
+    bool const needsDefaultSlot =
+        std::any_of(sources.begin(), sources.end(), [](Orvan::Ptr<IndexArray> const& indices) { return !indices; });
     // Each dependent belongs to one iteration.
     parallelFor(tbb::blocked_range<std::size_t>(0, entry.dependents.size(), kCoarseGrain), [&](auto const& dependents) {
         for (std::size_t dependent = dependents.begin(); dependent != dependents.end(); ++dependent) {

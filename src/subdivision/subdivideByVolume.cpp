@@ -53,7 +53,8 @@ namespace {
                 count = std::min(kAtOnce, points.end() - first);
                 writeMeans(position + first, count, mean);
                 float* const row = limit + first;
-                sampler.sampleAll(mean, count, Traits::kUnitDepth, TSR::TileTree3D::kWorldSpace, row);
+                constexpr int kDepth = TSR::TileTree3D::Internal::TileLayout<Traits>::kUnitDepth;
+                sampler.sampleAll(mean, count, kDepth, TSR::TileTree3D::kWorldSpace, row);
                 for (unsigned int n = 0; n < count; ++n)
                     row[n] = longestSide(row[n] * tolerance);
             }

@@ -3,6 +3,7 @@
 #include "frame/VectorMath.h"
 
 #include <TessaraMathSupport/Types.h>
+#include <TessaraSpatial/SpatialQuery.h>
 
 #include <cmath>
 #include <cstddef>
@@ -88,5 +89,11 @@ inline float sharpnessBetween(float3 const& entering, float3 const& leaving)
 inline constexpr float kNoEar = std::numeric_limits<float>::infinity(); // the sharpness of corners that are not ears
 /// A later ear must be sharper than an earlier one by more than this to be cut first.
 inline constexpr float kSharper = 0.0001f;
+
+/// Whether the path from a via b to c makes a strict counter-clockwise turn, for which the host's answer is 1.
+inline bool isCounterClockwise(float2 const& a, float2 const& b, float2 const& c)
+{
+    return static_cast<int>(Tessara::SpatialQuery::pointEdgeOrientation(a, b, c)) == 1;
+}
 
 }

@@ -54,11 +54,6 @@ namespace {
         return directions;
     }
 
-    bool isCounterClockwise(float2 const& a, float2 const& b, float2 const& c)
-    {
-        return pointEdgeOrientation(a, b, c) == PointEdgeOrientation::CounterClockwise;
-    }
-
     bool isEar(float2 const* projected, unsigned int corner)
     {
         float2 const& a = projected[previous(corner)];

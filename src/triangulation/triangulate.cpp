@@ -179,7 +179,7 @@ namespace {
             &data, &isTransferred, [&]<class T>(Orvan::Ptr<Orvan::Array<T>> const& values) {
                 if (values)
                     writes.writeGeoPropData(name, Orvan::makePtr<Orvan::Array<T>>(transfer(*values)));
-                return values != nullptr;
+                return bool(values);
             });
         return isTransferred;
     }

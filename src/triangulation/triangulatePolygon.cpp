@@ -132,9 +132,7 @@ namespace {
             PolygonStorage::Corner const& corner = corners_[i];
             PolygonStorage::Corner const& before = corners_[corner.previous];
             PolygonStorage::Corner const& after = corners_[corner.next];
-            return pointEdgeOrientation(before.projected, corner.projected, after.projected)
-                == PointEdgeOrientation::CounterClockwise
-                && !containsOtherCorner(i);
+            return isCounterClockwise(before.projected, corner.projected, after.projected) && !containsOtherCorner(i);
         }
 
         /// Whether another live corner is inside the triangle at corner i.

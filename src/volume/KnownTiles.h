@@ -17,7 +17,7 @@ namespace TSR::TileTree3D::Internal {
 template <class Traits> struct KnownTile {
     IJK index{};
     int depth = -1;
-    typename Container<Traits>::TileType tile; // a copy, as repeated tiles are not stored; may be a coarser one
+    TileOf<Traits> tile; // a copy, as repeated tiles are not stored; may be a coarser one
     bool hasData = false;
     // 0: the tile's own values. 1: those with the layer around it, null until they are built. Both are null if the tile
     // is coarser than `depth`.

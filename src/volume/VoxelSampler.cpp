@@ -18,7 +18,7 @@ namespace {
 
     template <class Traits> int readDepth(Internal::LinearSamplerState<Traits> const& state, int depth)
     {
-        return std::min({depth, state.maxDepth, Traits::kDeepest});
+        return std::min({depth, state.maxDepth, Internal::TileLayout<Traits>::kDeepest});
     }
 
     /// Finds the values of a tile that has just been entered. Not inlined: most samples do not need it.
@@ -26,14 +26,14 @@ namespace {
         Internal::TileCursor<Traits> const& cursor, Internal::LinearSamplerState<Traits>& state)
     {
         state.fetchedVisit = cursor.visit;
-        state.values = cursor.hasTile() ? state.valuesOf(cursor.currentTile()) : nullptr;
+        state.values = cursor.hasTile() ? state.valuesOf(cursor.currentTile(), state.copies) : nullptr;
     }
 
     /// In a volume whose halos are on the upper sides only.
-    template <class Traits> float samplePositive(Internal::LinearSamplerState<Traits>& state,
-        typename Container<Traits>::TileType const& tile, Internal::Place const& place)
+    template <class Traits> float samplePositive(
+        Internal::LinearSamplerState<Traits>& state, Internal::TileOf<Traits> const& tile, Internal::Place const& place)
     {
-        constexpr int kSide = Traits::kSide;
+        constexpr int kSide = Internal::TileLayout<Traits>::kSide;
         auto const [i, j, k] = place.voxel;
         if (std::max({i, j, k}) + 1 < kSide)
             return Internal::interpolateFromFirst<kSide>(state.values, place.voxel, place.fraction);
@@ -42,10 +42,10 @@ namespace {
     }
 
     /// In a volume whose halos are all around.
-    template <class Traits> float sampleFull(Internal::LinearSamplerState<Traits>& state,
-        typename Container<Traits>::TileType const& tile, Internal::Place const& place)
+    template <class Traits> float sampleFull(
+        Internal::LinearSamplerState<Traits>& state, Internal::TileOf<Traits> const& tile, Internal::Place const& place)
     {
-        constexpr int kSide = Traits::kSide;
+        constexpr int kSide = Internal::TileLayout<Traits>::kSide;
         auto const [i, j, k] = place.voxel;
         if (std::min({i, j, k}) > 0 && std::max({i, j, k}) + 1 < kSide)
             return Internal::interpolate<kSide>(state.values, i, j, k, place.fraction);
@@ -113,7 +113,8 @@ float VoxelSamplerLinear<Traits, float, 1, float, float3, 0, 0>::sample(float3 c
     if (!state_.values)
         return state_.background;
     if (state_.haloChannel)
-        return Internal::interpolateFromFirst<Traits::kSide + 1>(state_.values, place.voxel, place.fraction);
+        return Internal::interpolateFromFirst<Internal::TileLayout<Traits>::kSide + 1>(
+            state_.values, place.voxel, place.fraction);
     ++state_.stamp;
     return state_.hasPositiveHalos() ? samplePositive(state_, cursor.currentTile(), place)
                                      : sampleFull(state_, cursor.currentTile(), place);

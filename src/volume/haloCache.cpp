@@ -2,6 +2,8 @@
 
 #include "frame/Assert.h"
 
+#include <TessaraGeometryVolume/HaloTile.h>
+
 namespace TSR::TileTree3D::Internal {
 
 namespace {
@@ -11,9 +13,10 @@ namespace {
     template <> constexpr int kNeighborStep<Traits2> = 2;
     template <> constexpr int kNeighborStep<Traits5> = 5;
 
+    constexpr int kTrilinear = 2; // how the host blends values of the parent
+
     /// Whether the parent can supply values around the tile.
-    template <class Traits>
-    bool drawsOnParent(LinearSamplerState<Traits> const& state, typename Container<Traits>::TileType const& tile)
+    template <class Traits> bool drawsOnParent(LinearSamplerState<Traits> const& state, TileOf<Traits> const& tile)
     {
         return tile.depth != 0 && tile.parent >= 0 && tile.depth > state.coarsestDepth;
     }
@@ -21,10 +24,10 @@ namespace {
     /// The data of the tiles of this depth at a fixed distance, which makes a wider tile its own upper neighbor:
     /// existing volumes depend on it.
     template <class Traits>
-    TilesAround<Traits> tilesAround(LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile)
+    TilesAround<Traits> tilesAround(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile)
     {
         auto const contains = [](std::int64_t begin, std::int64_t index, int depth) {
-            return begin <= index && index < begin + Traits::tileWidth(depth);
+            return begin <= index && index < begin + TileLayout<Traits>::tileWidth(depth);
         };
         TilesAround<Traits> around;
         std::size_t number = 0;
@@ -45,23 +48,28 @@ namespace {
 
 }
 
-template <class Traits> void fillHalo(
-    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, PositiveHalo<Traits>& halo)
+template <class Traits>
+void fillHalo(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile, PositiveHalo<Traits>& halo)
 {
-    MODELING_ASSERT(tile.valid && tile.depth < Traits::kDepthCount);
-    if (!drawsOnParent(state, tile)) {
-        setHaloTile<Traits>(tile, nullptr, *state.channel, PositiveHalo<Traits>(), 2, state.neighbors, halo);
-        return;
+    MODELING_ASSERT(tile.valid && tile.depth < TileLayout<Traits>::kDepthCount);
+    auto const fill = [&](TileOf<Traits> const* parent, decltype(halo.voxels) const& parentVoxels) {
+        setHaloTile<Traits>(tile, parent, *state.channel, parentVoxels, kTrilinear, state.neighbors, halo.voxels);
+    };
+    if (drawsOnParent(state, tile)) {
+        auto const& parent = state.container->tile(tile.parentTreeIndex());
+        fill(&parent, haloOf(state, parent, state.positiveHaloCache).voxels);
+    } else {
+        fill(nullptr, {});
     }
-    auto const& parent = state.container->tile(tile.parentTreeIndex());
-    PositiveHalo<Traits> const& parentHalo = haloOf(state, parent, state.positiveHaloCache);
-    setHaloTile<Traits>(tile, &parent, *state.channel, parentHalo, 2, state.neighbors, halo);
+    if constexpr (!LinearSamplerState<Traits>::kReadsInPlace)
+        if (state.channel->tileData(tile.treeIndex()))
+            halo.copyVoxels();
 }
 
-template <class Traits> void fillHalo(
-    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, FullHalo<Traits>& halo)
+template <class Traits>
+void fillHalo(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile, FullHalo<Traits>& halo)
 {
-    MODELING_ASSERT(tile.valid && tile.depth < Traits::kDepthCount);
+    MODELING_ASSERT(tile.valid && tile.depth < TileLayout<Traits>::kDepthCount);
     auto const own = state.channel->tileData(tile.treeIndex());
     if (!own) {
         halo.clear();
@@ -76,9 +84,9 @@ template <class Traits> void fillHalo(
     fillHaloFromNeighbours<Traits>(state.offsetType, halo, tile.childIJK(), tilesAround(state, tile), parentHalo);
 }
 
-template void fillHalo(LinearSamplerState<Traits2>&, Container<Traits2>::TileType const&, PositiveHalo<Traits2>&);
-template void fillHalo(LinearSamplerState<Traits5>&, Container<Traits5>::TileType const&, PositiveHalo<Traits5>&);
-template void fillHalo(LinearSamplerState<Traits2>&, Container<Traits2>::TileType const&, FullHalo<Traits2>&);
-template void fillHalo(LinearSamplerState<Traits5>&, Container<Traits5>::TileType const&, FullHalo<Traits5>&);
+template void fillHalo(LinearSamplerState<Traits2>&, TileOf<Traits2> const&, PositiveHalo<Traits2>&);
+template void fillHalo(LinearSamplerState<Traits5>&, TileOf<Traits5> const&, PositiveHalo<Traits5>&);
+template void fillHalo(LinearSamplerState<Traits2>&, TileOf<Traits2> const&, FullHalo<Traits2>&);
+template void fillHalo(LinearSamplerState<Traits5>&, TileOf<Traits5> const&, FullHalo<Traits5>&);
 
 }

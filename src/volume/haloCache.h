@@ -4,8 +4,6 @@
 
 #include <Modeling/detail/VoxelSamplerState.h>
 
-#include <TessaraGeometryVolume/HaloTile.h>
-
 #include <algorithm>
 #include <cstdint>
 
@@ -19,10 +17,10 @@ inline int clampedIndex(std::int64_t index)
 }
 
 /// Fills the halo of a tile from the volume. A tile whose parent has data needs the parent's halo, which is cached.
-template <class Traits> void fillHalo(
-    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, PositiveHalo<Traits>& halo);
-template <class Traits> void fillHalo(
-    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, FullHalo<Traits>& halo);
+template <class Traits>
+void fillHalo(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile, PositiveHalo<Traits>& halo);
+template <class Traits>
+void fillHalo(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile, FullHalo<Traits>& halo);
 
 /// The slot of the halo with a key; `kNoSlot` if it is not cached.
 template <class Traits, class Cache>
@@ -39,16 +37,16 @@ std::uint32_t findHalo(LinearSamplerState<Traits>& state, std::uint64_t key, int
 }
 
 /// Builds the halo of a tile in place of the last one of its depth. \return its slot
-template <class Traits, class Cache> std::uint32_t buildHalo(
-    LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, Cache& cache)
+template <class Traits, class Cache>
+std::uint32_t buildHalo(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile, Cache& cache)
 {
     if (cache.empty())
-        cache = Cache(Traits::kDepthCount);
+        cache = Cache(TileLayout<Traits>::kDepthCount);
     auto const number = static_cast<std::uint32_t>(tile.depth);
     auto& slot = cache[number];
     slot.stamp = state.stamp;
-    fillHalo(state, tile, slot.values);
-    slot.key = tile.index;
+    fillHalo(state, tile, slot.halo);
+    slot.key = tile.treeIndex().index;
     state.lastKey[number] = slot.key;
     return state.lastSlot[number] = number;
 }
@@ -56,12 +54,12 @@ template <class Traits, class Cache> std::uint32_t buildHalo(
 /// The halo of a tile, built unless it is cached.
 /// \param cache  one of the two of `state`
 template <class Traits, class Cache>
-auto const& haloOf(LinearSamplerState<Traits>& state, typename Container<Traits>::TileType const& tile, Cache& cache)
+auto const& haloOf(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile, Cache& cache)
 {
-    std::uint32_t slot = findHalo(state, tile.index, tile.depth, cache);
+    std::uint32_t slot = findHalo(state, tile.treeIndex().index, tile.depth, cache);
     if (slot == LinearSamplerState<Traits>::kNoSlot)
         slot = buildHalo(state, tile, cache);
-    return cache[slot].values;
+    return cache[slot].halo;
 }
 
 }

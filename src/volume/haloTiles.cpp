@@ -59,7 +59,7 @@ namespace {
     /// The value for a tile, `tile` tiles away from the child, as a blend of voxels of the parent's halo.
     template <class Traits> Blend blendOfParent(bool atLowerSide, int child, int tile)
     {
-        constexpr int kCovered = Traits::kParentVoxels;
+        constexpr int kCovered = TileLayout<Traits>::kParentVoxels;
         static_assert(kCovered <= 2);
         int const first = (child + tile) * kCovered;
         int const last = first + kCovered - 1;
@@ -67,8 +67,8 @@ namespace {
             return {-1, 0, atLowerSide ? -1 : -0.5f};
         if (atLowerSide || kCovered == 1)
             return {first, first, 0};
-        if (last > Traits::kSide)
-            return {Traits::kSide, Traits::kSide - 1, -0.5f};
+        if (last > TileLayout<Traits>::kSide)
+            return {TileLayout<Traits>::kSide, TileLayout<Traits>::kSide - 1, -0.5f};
         return {first, last, 0.5f};
     }
 
@@ -113,19 +113,19 @@ namespace {
     /// -1, 0 or 1: whether a coordinate of a halo tile is below the tile, inside or above it.
     template <class Traits> int sideOf(int coordinate)
     {
-        return coordinate < 0 ? -1 : coordinate >= Traits::kSide ? 1 : 0;
+        return coordinate < 0 ? -1 : coordinate >= TileLayout<Traits>::kSide ? 1 : 0;
     }
 
     template <class Traits> int nearestInside(int coordinate)
     {
-        return std::clamp(coordinate, 0, Traits::kSide - 1);
+        return std::clamp(coordinate, 0, TileLayout<Traits>::kSide - 1);
     }
 
     template <class Traits, class Rule> void forEachHaloVoxel(Rule const& rule)
     {
-        for (int k = -1; k <= Traits::kSide; ++k)
-            for (int j = -1; j <= Traits::kSide; ++j)
-                for (int i = -1; i <= Traits::kSide; ++i)
+        for (int k = -1; k <= TileLayout<Traits>::kSide; ++k)
+            for (int j = -1; j <= TileLayout<Traits>::kSide; ++j)
+                for (int i = -1; i <= TileLayout<Traits>::kSide; ++i)
                     rule(i, j, k, IJK{sideOf<Traits>(i), sideOf<Traits>(j), sideOf<Traits>(k)});
     }
 
@@ -141,7 +141,7 @@ template <class Traits>
 void fillHaloFromTile(unsigned int offsetType, float background, TileValues<Traits> tile, FullHalo<Traits>& out)
 {
     float const twice = background + background;
-    out.reset(-1);
+    out.reset();
     forEachHaloVoxel<Traits>([&](int i, int j, int k, IJK side) {
         // The bits of the axes along which this voxel is outside.
         unsigned int const outside = (side.i ? 1u : 0u) | (side.j ? 2u : 0u) | (side.k ? 4u : 0u);
@@ -159,7 +159,7 @@ void fillHaloFromTile(unsigned int offsetType, float background, TileValues<Trai
 template <class Traits> void fillHaloFromNeighbours(unsigned int offsetType, FullHalo<Traits>& out, IJK child,
     TilesAround<Traits> const& around, FullHalo<Traits> const& parentHalo)
 {
-    constexpr int kSide = Traits::kSide;
+    constexpr int kSide = TileLayout<Traits>::kSide;
     bool const isSurrounded = std::all_of(around.begin(), around.end(), [](TileValues<Traits> tile) { return !!tile; });
     CoarseValues const coarse =
         parentHalo && !isSurrounded ? coarseValues<Traits>(offsetType, child, parentHalo) : CoarseValues{};
@@ -167,7 +167,7 @@ template <class Traits> void fillHaloFromNeighbours(unsigned int offsetType, Ful
         return coarse[static_cast<std::size_t>(indexAround(i, j, k))];
     };
     TileValues<Traits> const own = around[13];
-    out.reset(-1);
+    out.reset();
     forEachHaloVoxel<Traits>([&](int i, int j, int k, IJK side) {
         TileValues<Traits> const tile =
             around[static_cast<std::size_t>(indexAround(side.i + 1, side.j + 1, side.k + 1))];

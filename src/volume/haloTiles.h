@@ -1,7 +1,6 @@
 #pragma once
 
-#include <TessaraGeometryVolume/TileData.h>
-#include <TessaraGeometryVolume/TileTraits.h>
+#include <Modeling/detail/VoxelSamplerState.h>
 
 #include <array>
 
@@ -9,8 +8,7 @@
 /// lower side of the tile.
 namespace TSR::TileTree3D::Internal {
 
-template <class Traits> using FullHalo = TileData<float, Traits::kSide + 2, 0>;
-template <class Traits> using TileValues = ConstTileData<float, Traits::kSide, 0>;
+template <class Traits> using TileValues = ConstTileData<float, TileLayout<Traits>::kSide, 0>;
 
 /// The tile itself and those around it, x fastest: (dx + 1) + (dy + 1) * 3 + (dz + 1) * 9.
 template <class Traits> using TilesAround = std::array<TileValues<Traits>, 27>;

@@ -49,6 +49,15 @@ template <int side> inline Coordinate coordinateOf(float value)
     return {-1, value - std::floor(value)};
 }
 
+/// Whether finer tiles may be inside: true if the host does not tell.
+template <class TileType> bool mayContainFiner(TileType const& tile)
+{
+    if constexpr (requires { tile.hasChildren; })
+        return tile.hasChildren;
+    else
+        return true;
+}
+
 /// Enters the tile that contains the point, if there is one. Not inlined: it would slow down samples in the same tile.
 template <class Traits> [[gnu::noinline]] void enterTile(TileCursor<Traits>& cursor, float3 const& p, int depth)
 {
@@ -61,14 +70,14 @@ template <class Traits> [[gnu::noinline]] void enterTile(TileCursor<Traits>& cur
     cursor.tile = &tile;
     if (!tile.valid)
         return;
-    cursor.voxelsPerUnit = Traits::voxelsPerUnit(tile.depth);
+    cursor.voxelsPerUnit = TileLayout<Traits>::voxelsPerUnit(tile.depth);
 
     // A coarse tile may contain finer ones, and large floats cannot represent where a tile ends: then the next point is
     // looked up again.
     constexpr float kAllExact = 0x1p23f; // floats up to twice this one represent all corners of tiles
-    auto const width = static_cast<float>(Traits::tileWidth(tile.depth));
+    auto const width = static_cast<float>(TileLayout<Traits>::tileWidth(tile.depth));
     bool const isExact = std::max({std::abs(p.x), std::abs(p.y), std::abs(p.z), width}) <= kAllExact;
-    if (isExact && (tile.depth == depth || !tile.hasChildren)) {
+    if (isExact && (tile.depth == depth || !mayContainFiner(tile))) {
         cursor.tileBegin = {static_cast<float>(tile.i), static_cast<float>(tile.j), static_cast<float>(tile.k)};
         cursor.tileEnd = {cursor.tileBegin.x + width, cursor.tileBegin.y + width, cursor.tileBegin.z + width};
     }
@@ -104,7 +113,7 @@ inline Place locate(TileCursor<Traits>& cursor, float3 const& point, int depth, 
     }
     float3 const fromTile = distanceFromTile(cursor, p);
     float3 const& offset = cursor.voxelOffset;
-    constexpr int kSide = Traits::kSide;
+    constexpr int kSide = TileLayout<Traits>::kSide;
     Coordinate const x = coordinateOf<kSide>(fromTile.x * cursor.voxelsPerUnit - offset.x);
     Coordinate const y = coordinateOf<kSide>(fromTile.y * cursor.voxelsPerUnit - offset.y);
     Coordinate const z = coordinateOf<kSide>(fromTile.z * cursor.voxelsPerUnit - offset.z);

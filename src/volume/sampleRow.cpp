@@ -20,7 +20,7 @@ namespace {
     /// Finds the values for each run of a row.
     template <class Traits> class TileFinder {
     public:
-        using TileType = typename Container<Traits>::TileType;
+        using TileType = TileOf<Traits>;
 
         TileFinder(LinearSamplerState<Traits>& state, RowSettings const& settings, float3 const* points, PointRow& row)
             : state_(state)
@@ -81,7 +81,7 @@ namespace {
             KnownTile<Traits>& known = state_.knownTiles->at(index, depth);
             if (!known.isOf(index, depth)) {
                 TileType const& tile = state_.neighbors.tileImpl(index.i, index.j, index.k, depth);
-                float const* const values = state_.valuesOf(tile);
+                float const* const values = state_.valuesOf(tile, state_.copies);
                 known = {index, depth, tile, values != nullptr, {tile.depth == depth ? values : nullptr, nullptr}};
             }
             return known;
@@ -90,9 +90,9 @@ namespace {
         /// Places the points of a run in a tile that is coarser than requested.
         void placeInTile(std::size_t run, TileType const& tile)
         {
-            constexpr int kSide = Traits::kSide;
+            constexpr int kSide = TileLayout<Traits>::kSide;
             bool const isPositive = state_.hasPositiveHalos();
-            float const voxelsPerUnit = Traits::voxelsPerUnit(tile.depth);
+            float const voxelsPerUnit = TileLayout<Traits>::voxelsPerUnit(tile.depth);
             float3 const& offset = settings_.voxelOffset;
             bool isInside = true;
             auto const place = [&](float coordinate, std::int64_t begin, float shift) {
@@ -124,7 +124,7 @@ namespace {
             };
             if (state_.hasPositiveHalos())
                 return build(knownTiles.positiveHalos);
-            return build(knownTiles.fullHalos) + firstInLayer(Traits::kSide + 2);
+            return build(knownTiles.fullHalos) + firstInLayer(TileLayout<Traits>::kSide + 2);
         }
 
         LinearSamplerState<Traits>& state_;
@@ -143,20 +143,21 @@ namespace {
 template <class Traits> bool fitsRows(RowSettings const& settings) noexcept
 {
     float3 const& offset = settings.voxelOffset;
-    return settings.depth >= 0 && static_cast<float>(Traits::tileWidth(settings.depth)) <= kWidestTile
-        && std::isfinite(offset.x) && std::isfinite(offset.y) && std::isfinite(offset.z)
-        && largestCoordinate(offset) <= kLargestOffset;
+    // Rows read many tiles at once, so values that are copied one tile at a time are of no use.
+    return LinearSamplerState<Traits>::kReadsInPlace && settings.depth >= 0
+        && static_cast<float>(TileLayout<Traits>::tileWidth(settings.depth)) <= kWidestTile && std::isfinite(offset.x)
+        && std::isfinite(offset.y) && std::isfinite(offset.z) && largestCoordinate(offset) <= kLargestOffset;
 }
 
 template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSettings const& settings,
     float3 const* points, std::size_t count, float* values)
 {
-    constexpr int kSide = Traits::kSide;
+    constexpr int kSide = TileLayout<Traits>::kSide;
     MODELING_ASSERT(count <= PointRow::kCapacity && count % 4 == 0 && fitsRows<Traits>(settings));
     PointRow row;
     bool const areNear = placePoints(points, count,
-        {settings.scale, static_cast<float>(Traits::tileWidth(settings.depth)), Traits::voxelsPerUnit(settings.depth),
-            settings.voxelOffset},
+        {settings.scale, static_cast<float>(TileLayout<Traits>::tileWidth(settings.depth)),
+            TileLayout<Traits>::voxelsPerUnit(settings.depth), settings.voxelOffset},
         row);
     if (!areNear)
         return false;

@@ -1,4 +1,5 @@
-# The library builds against a host that is installed elsewhere; the stand-ins, installed separately, take its place.
+# The library builds against a host that is installed elsewhere, and so do the tests of hosts; the stand-ins, installed separately,
+# take its place.
 
 include(${CMAKE_CURRENT_LIST_DIR}/consumer.cmake)
 
@@ -16,3 +17,12 @@ if(EXISTS ${folder}/modeling/include/OrvanCore)
     message(FATAL_ERROR "an installation for an external host holds host headers")
 endif()
 run_consumer(${folder}/consumer ${folder}/host/lib ${folder}/modeling ${folder}/host)
+
+run(${CMAKE_COMMAND} -S ${SOURCE_DIR}/tests/host/conformance -B ${folder}/conformance ${flags} -DCMAKE_CXX_FLAGS_RELEASE=-O0
+    "-DCMAKE_PREFIX_PATH=${folder}/host;${folder}/modeling" -DCMAKE_UNITY_BUILD=ON
+    -DHOST_FIXTURE=${SOURCE_DIR}/tests/host/conformance/standinFixture.cpp)
+run(${CMAKE_COMMAND} --build ${folder}/conformance)
+run(${CMAKE_CTEST_COMMAND} --test-dir ${folder}/conformance --no-tests=error -E "^$")
+if(NOT output MATCHES "OperationsByVolume" OR output MATCHES "Skipped")
+    message(FATAL_ERROR "the conformance tests said: ${output}")
+endif()

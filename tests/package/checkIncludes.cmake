@@ -25,6 +25,7 @@ set(common_headers Vectors.h)
 
 # A public header belongs to the subsystem that has the source of its name. These have none, or another one.
 set(owner_subdivisionSteps subdivision)
+set(owner_detail/TileLayout volume)
 set(owner_detail/VoxelSamplerState volume)
 set(no_owner Export Modeling)
 set(public_subdivision volume) # further subsystems whose public headers it may include

@@ -295,7 +295,8 @@ TYPED_TEST(VoxelSampling, ContinuesTheParentIfNeighborsAreMissing)
     for (unsigned int offsetType = 0; offsetType < 8; ++offsetType) {
         float3 const offset = offsetsOf(offsetType);
         // In voxels of the parent, each of which covers `kChildrenPerAxis` of the tile along an axis.
-        FullHalo<TypeParam> parent(-1), halo;
+        FullHalo<TypeParam> parent, halo;
+        parent.reset();
         forEachVoxel(-1, kSide + 1, [&](int i, int j, int k) {
             parent(i, j, k) = linearField(float(i) + offset.x, float(j) + offset.y, float(k) + offset.z);
         });
@@ -331,7 +332,8 @@ TYPED_TEST(VoxelSampling, ContinuesTheParentIfNeighborsAreMissing)
 TEST(HaloTiles, BlendTheParentInQuartersAndEighths)
 {
     // Along x, the parent is 100 before the tile, 10 at the tile, and 1 after it as far as its halo reaches.
-    FullHalo<Traits2> parent(-1), halo;
+    FullHalo<Traits2> parent, halo;
+    parent.reset();
     forEachVoxel(-1, 5, [&](int i, int j, int k) { parent(i, j, k) = i < 2 ? 100 : i < 4 ? 10 : 1; });
     TileData<float, 4, 0> tile(0); // the second child along x: voxels 2 and 3
     forEachVoxel(0, 4, [&](int i, int j, int k) { tile(i, j, k) = 0; });

@@ -1,10 +1,13 @@
 #pragma once
 
+#include <Modeling/detail/TileLayout.h>
 #include <TessaraGeometryVolume/Channel.h>
 #include <TessaraGeometryVolume/Container.h>
+#include <TessaraGeometryVolume/TileData.h>
 #include <TessaraGeometryVolume/VoxelTopology.h>
 #include <TessaraMathSupport/Types.h>
 
+#include <concepts>
 #include <cstdint>
 #include <limits>
 #include <memory>
@@ -18,7 +21,7 @@ template <class Traits> struct KnownTiles;
 
 /// Remembers the tile that contains the last point.
 template <class Traits> struct TileCursor {
-    using TileType = typename Container<Traits>::TileType;
+    using TileType = TileOf<Traits>;
 
     TileCursor(
         Container<Traits> const& container, float indexUnitsPerUnit, Tessara::Math::float3 const& offset) noexcept
@@ -45,8 +48,8 @@ template <class Traits> struct TileCursor {
     typename Container<Traits>::ConstTileAccessor accessor;
     float scale; // index units per unit of length
     Tessara::Math::float3 voxelOffset;
-    TileBinaryNonCompatible<Traits::kChildCount> const* tile;
-    TileBinaryNonCompatible<Traits::kChildCount> noTile;
+    TileBinaryNonCompatible<TileLayout<Traits>::kChildCount> const* tile;
+    TileBinaryNonCompatible<TileLayout<Traits>::kChildCount> noTile;
 
     // The tile's box: points inside are in the tile. Empty if the tile has to be looked up again for the next point.
     Tessara::Math::float3 tileBegin; // in index units
@@ -56,41 +59,134 @@ template <class Traits> struct TileCursor {
     std::uint64_t visit = 0; // incremented for each tile that is entered
 };
 
+template <class Voxels>
+concept HasAddress = requires(Voxels const& voxels)
+{
+    {
+        voxels.values()
+        } -> std::convertible_to<float const*>;
+};
+
+/// Where the values of a cube of voxels are. A host whose views tell where they are is read in place; of other hosts,
+/// which only give single values, it is a copy.
+template <int side, bool isInPlace = HasAddress<ConstTileData<float, side, 0>>> class VoxelValues {
+public:
+    /// Null if there are none. Valid until the next call, and as long as the volume is not modified.
+    float const* read(ConstTileData<float, side, 0> const& voxels) noexcept { return voxels.values(); }
+};
+
+template <int side> class VoxelValues<side, false> {
+public:
+    float const* read(ConstTileData<float, side, 0> const& voxels)
+    {
+        if (!voxels)
+            return nullptr;
+        for (int voxel = 0; voxel != side * side * side; ++voxel)
+            copied_[voxel] = voxels(voxel);
+        return copied_;
+    }
+
+private:
+    float copied_[side * side * side];
+};
+
+/// A tile with an additional layer on its upper sides, which the host fills (`setHaloTile`).
+template <class Traits, bool isInPlace = HasAddress<TileData<float, TileLayout<Traits>::kSide + 1, 0>>>
+struct PositiveHalo {
+    static constexpr int kSide = TileLayout<Traits>::kSide + 1;
+
+    TileData<float, kSide, 0> voxels;
+
+    float const* values() const noexcept { return voxels.values(); }
+};
+
+template <class Traits> struct PositiveHalo<Traits, false> {
+    static constexpr int kSide = TileLayout<Traits>::kSide + 1;
+
+    TileData<float, kSide, 0> voxels;
+    float copied[kSide * kSide * kSide] = {};
+
+    /// To be called once the host has filled the voxels.
+    void copyVoxels()
+    {
+        float* copy = copied;
+        for (int k = 0; k != kSide; ++k)
+            for (int j = 0; j != kSide; ++j)
+                for (int i = 0; i != kSide; ++i)
+                    *copy++ = voxels(i, j, k);
+    }
+    float const* values() const noexcept { return copied; }
+};
+
+/// A tile with a layer all around, coordinates -1 to `TileLayout::kSide`. Empty by default.
+template <class Traits> class FullHalo {
+public:
+    FullHalo() noexcept { } // leaves the storage uninitialized
+
+    explicit operator bool() const noexcept { return hasValues_; }
+    float& operator()(int i, int j, int k) noexcept { return values_[indexOf(i, j, k)]; }
+    float operator()(int i, int j, int k) const noexcept { return values_[indexOf(i, j, k)]; }
+    float const* values() const noexcept { return values_; }
+
+    /// `reset` leaves the values uninitialized, `clear` leaves none.
+    void reset() noexcept { hasValues_ = true; }
+    void clear() noexcept { hasValues_ = false; }
+
+private:
+    static constexpr int kSide = TileLayout<Traits>::kSide + 2;
+    static int indexOf(int i, int j, int k) noexcept { return i + 1 + (j + 1 + (k + 1) * kSide) * kSide; }
+
+    float values_[kSide * kSide * kSide];
+    bool hasValues_ = false;
+};
+
 /// The volume that a linear sampler reads, and what it has built and looked up so far.
 template <class Traits> struct LinearSamplerState {
-    static constexpr int kSide = Traits::kSide;
+    static constexpr int kSide = TileLayout<Traits>::kSide;
     static constexpr unsigned int kAllAxes = 7;
     static constexpr std::uint64_t kNoKey = ~std::uint64_t{0};
     static constexpr std::uint32_t kNoSlot = ~std::uint32_t{0};
 
-    using TileType = typename Container<Traits>::TileType;
+    using TileType = TileOf<Traits>;
 
     /// A tile with its halo, found by the tile's index.
-    template <int side> struct HaloSlot {
+    template <class Halo> struct HaloSlot {
         std::uint64_t key = kNoKey;
-        TileData<float, side, 0> values;
+        Halo halo;
         std::uint64_t stamp = 0; // of the sample that looked it up
     };
-    template <int side> using HaloCache = std::vector<HaloSlot<side>>;
+    template <class Halo> using HaloCache = std::vector<HaloSlot<Halo>>;
+
+    /// Copies of a tile's values, of a host that does not tell where they are.
+    struct TileCopies {
+        [[no_unique_address]] VoxelValues<kSide> plain;
+        [[no_unique_address]] VoxelValues<kSide + 1> padded;
+    };
+
+    /// Whether pointers to values of many tiles remain valid.
+    static constexpr bool kReadsInPlace =
+        HasAddress<ConstTileData<float, kSide,
+            0>> && HasAddress<ConstTileData<float, kSide + 1, 0>> && HasAddress<TileData<float, kSide + 1, 0>>;
 
     bool hasPositiveHalos() const noexcept { return offsetType == kAllAxes; }
 
     /// Null if the tile has no values, or is coarser than `minDepth`.
-    float const* valuesOf(TileType const& tile) const noexcept
+    /// \param room  Where the values are copied to, if need be.
+    float const* valuesOf(TileType const& tile, TileCopies& room) const
     {
         if (!tile.valid || tile.depth < minDepth)
             return nullptr;
-        return haloChannel ? haloChannel->template tileData<kSide + 1>(tile.treeIndex()).values()
-                           : channel->tileData(tile.treeIndex()).values();
+        return haloChannel ? room.padded.read(haloChannel->template tileData<kSide + 1>(tile.treeIndex()))
+                           : room.plain.read(channel->tileData(tile.treeIndex()));
     }
 
     typename Container<Traits>::ConstTileAccessor neighbors; // looks up tiles other than the cursor's
     unsigned int offsetType;
-    HaloCache<kSide + 1> positiveHaloCache = {}; // one slot per depth, once one is needed
-    HaloCache<kSide + 2> fullHaloCache = {};
+    HaloCache<PositiveHalo<Traits>> positiveHaloCache = {}; // one slot per depth, once one is needed
+    HaloCache<FullHalo<Traits>> fullHaloCache = {};
     std::uint64_t stamp = 0; // incremented for each sample
-    std::uint64_t lastKey[Traits::kDepthCount] = {};
-    std::uint32_t lastSlot[Traits::kDepthCount] = {};
+    std::uint64_t lastKey[TileLayout<Traits>::kDepthCount] = {};
+    std::uint32_t lastSlot[TileLayout<Traits>::kDepthCount] = {};
     Container<Traits> const* container;
     Channel<Traits, float> const* channel;
     Channel<Traits, float> const* haloChannel;
@@ -105,6 +201,7 @@ template <class Traits> struct LinearSamplerState {
     // The values of the cursor's tile, and the visit for which they were fetched.
     std::uint64_t fetchedVisit = 0;
     float const* values = nullptr; // null if there are none that may be read
+    [[no_unique_address]] TileCopies copies = {};
 };
 
 }

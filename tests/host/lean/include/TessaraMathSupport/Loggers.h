@@ -1,0 +1,9 @@
+#pragma once
+
+namespace CoreGL {
+
+class OrvanLogger { };
+class ConsoleLogger { };
+class NOPLogger { };
+
+}
