@@ -47,6 +47,34 @@ Row const adding("addPointsToPointCloud", kAdded, {"", ":memcpy", ":copy and fil
             run, count, *cloud.build(), [&](Object& object) { addPointsToPointCloud(positions, {}, object, nullptr); });
 });
 
+/// To a cloud that is not shared and has room; its arrays have doubled before.
+Row const addingInPlace("addPointsToPointCloudInPlace", kAddedInPlace, kBesideCopy, [](Run& run) {
+    std::size_t const added = run.size(1);
+    if (run.copies(added * kPointBytes, added))
+        return;
+    FlatCloud const source{run.size()};
+    Points const positions(added, float3{1, 2, 3});
+    auto const makeRoomy = [&] {
+        auto cloud = source.build();
+        addPointsToPointCloud(Points(1), {}, *cloud, nullptr);
+        return cloud;
+    };
+    timeOnEach(
+        run, added, makeRoomy, [&](auto const& cloud) { addPointsToPointCloud(positions, {}, *cloud, nullptr); });
+});
+
+/// A thousand points at a time.
+Row const addingRepeatedly("addPointsToPointCloudRepeatedly", {{1'000'000, 100}}, [](Run& run) {
+    FlatCloud const source{run.size()};
+    Points const positions(1000, float3{1, 2, 3});
+    timeOnEach(
+        run, run.size(1) * positions.size, [&] { return source.build(); },
+        [&](auto const& cloud) {
+            for (std::size_t call = 0; call != run.size(1); ++call)
+                addPointsToPointCloud(positions, {}, *cloud, nullptr);
+        });
+});
+
 template <class... T> void compact(Orvan::Array<bool> const& deleted, Orvan::Array<T>&... arrays)
 {
     auto const compactOne = [&](auto& array) {
@@ -107,15 +135,18 @@ void deleteFlat(PatchedSphere const& source, PatchedSphere& mesh)
     DoNotOptimize(mesh.points.data);
 }
 
-Row const deletingFaces("deleteFaces", kFaces, {"", ":memcpy", ":flat"}, [](Run& run) {
+Row const deletingFaces("deleteFaces", kFaces, {"", ":memcpy", ":in place", ":flat"}, [](Run& run) {
     PatchedSphere const sphere(run.size());
     if (run.copies(sphere.bytes(), sphere.faceCount()))
         return;
-    if (run.variant == ":flat")
+    auto const edit = [&](Object& object) { deleteFaces(sphere.deleted, object); };
+    if (run.variant == ":in place") // on an object that is not shared
+        timeOnEach(
+            run, sphere.faceCount(), [&] { return sphere.build(); }, [&](auto const& object) { edit(*object); });
+    else if (run.variant == ":flat")
         timeOnCopies(run, sphere.faceCount(), sphere, [&](PatchedSphere& mesh) { deleteFlat(sphere, mesh); });
     else
-        measureEdit(
-            run, sphere.faceCount(), *sphere.build(), [&](Object& object) { deleteFaces(sphere.deleted, object); });
+        measureEdit(run, sphere.faceCount(), *sphere.build(), edit);
 });
 
 /// `elements` and `bytes` are those of each input.

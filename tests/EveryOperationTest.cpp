@@ -311,7 +311,9 @@ TEST(EveryOperation, NeedsNoMoreWorkingMemoryThanItsHeaderSays)
         {"mergeMeshes", [](Sizes const& sizes) { return 0.01 * sizes.resultBytes; }},
         {"edit", // of points, in two steps; the result of the first is released
             [](Sizes const& sizes) {
-                return 9 * (sizes.points + sizes.corners + sizes.faces) + (sizes.faces == 0 ? sizes.resultBytes : 0);
+                double const forProperties = 20'000; // small objects for each of 40 or 120
+                return 5.5 * sizes.points + 0.3 * (sizes.corners + sizes.faces) + forProperties
+                    + (sizes.faces == 0 ? sizes.resultBytes : 0);
             }},
     };
     for (Operation const& operation : operations()) {

@@ -28,8 +28,10 @@ namespace Tessara::GeometryAlgorithms {
 ///                   the tag is named `sPointPosition` and has replaced the positions.
 /// \throws           std::bad_alloc, with the object unchanged. Job cancellation is ignored.
 ///
-/// Linear in the new number of points. Copies one array after another, blocks of large ones in parallel, each into a
-/// new array with spare capacity for later points; the old arrays are released at the end.
+/// Arrays that are not shared and have room for the new points grow in place, so that many calls take time in proportion to
+/// the points that they add, and marking them with a tag takes a byte per point besides. Otherwise one array after another is
+/// copied, blocks of large ones in parallel, into a new array with room for as many points again; the old arrays are
+/// released at the end.
 MODELING_EXPORT bool addPointsToPointCloud(Orvan::Array<Tessara::Math::float3> const& positions,
     Orvan::String const& tag, Tessara::Object& object, Orvan::RuntimeServices const* services);
 

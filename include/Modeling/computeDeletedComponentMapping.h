@@ -15,7 +15,8 @@ namespace Tessara::GeometryAlgorithms {
 ///                 a remap.
 /// \throws         std::bad_alloc.
 ///
-/// One pass on the calling thread; 4 bytes per element.
+/// Linear in the number of entries, blocks of which are counted and then numbered in parallel. Allocates a fifth of a byte
+/// per element besides the result.
 MODELING_EXPORT Orvan::Array<unsigned int> computeDeletedComponentMapping(Orvan::Array<bool> const& deleted);
 
 }

@@ -39,9 +39,9 @@ namespace Tessara::GeometryAlgorithms {
 ///                   was refused have then been changed, while the range itself and what follows it have not.
 /// \throws           std::bad_alloc, with the object unchanged.
 ///
-/// Linear in the number of elements. Shared arrays are compacted concurrently, each on one thread, into memory of the
-/// final size; the others in place, one after another. Allocates 4 bytes per kept element, and up to 9 per value of a
-/// range's data.
+/// Linear in the number of elements. Blocks of large arrays are compacted in parallel: shared arrays into memory of the final
+/// size, the others in place. Allocates a fifth of a byte per element, up to 6 per value of a range's data, and 2 MiB if it
+/// compacts a large array in place.
 MODELING_EXPORT bool deleteComponents(
     Orvan::Array<unsigned int> const& remap, Orvan::String const& component, Tessara::Object& object);
 

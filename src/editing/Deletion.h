@@ -11,6 +11,10 @@
 
 namespace Modeling::Internal {
 
+/// Marks the values, out of `length`, that no kept entry refers to.
+/// \param indices  One per element that `kept` knows, or more; indices of no value are ignored.
+Orvan::Array<bool> findUnused(std::uint64_t length, IndexArray const& indices, KeptElements const& kept);
+
 /// Deletes elements of components of one object. All changes are prepared first, so that an operation that runs out of
 /// memory leaves the object unchanged.
 class Deletion {
@@ -55,7 +59,6 @@ private:
     template <class Types> bool prepareArray(Orvan::String const& key, char const* arrayKey,
         Orvan::MutablePtr<Tessara::Object>&& property, KeptElements const& kept);
     ArrayCompaction* arrayAt(Orvan::String const& key);
-    void fillArrays();
 
     Tessara::Object& object_;
     GeoPropertyClassifier const classifier_;
@@ -64,6 +67,7 @@ private:
     // Owned here because the changes refer to them.
     std::vector<std::unique_ptr<KeptElements>> kept_;
     std::vector<std::unique_ptr<IndexArray>> remaps_;
+    CompactionBuffer buffer_; // of arrays that are compacted in place
 };
 
 }

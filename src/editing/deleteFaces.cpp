@@ -5,13 +5,14 @@
 #include "frame/Assert.h"
 #include "host/MeshArrays.h"
 
-#include <Modeling/computeDeletedComponentMapping.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometry/Prototypes.h>
 
 #include <algorithm>
+#include <atomic>
 #include <optional>
+#include <utility>
 
 namespace Tessara::GeometryAlgorithms {
 
@@ -22,10 +23,12 @@ using Modeling::Internal::KeptElements;
 
 namespace {
 
-    /// What the deletion of faces means for the other elements: the corners that are kept, and the points that are not.
+    /// A run of a few faces takes nanoseconds.
+    constexpr std::size_t kFaceWordGrain = kElementGrain / 8;
+
+    /// What the deletion of faces means for all elements.
     struct FaceElements {
-        KeptElements corners;
-        Orvan::Array<bool> unusedPoints;
+        KeptElements faces, corners, points;
     };
 
     bool fitsCounts(MeshArrays const& arrays, Object const& mesh)
@@ -35,56 +38,62 @@ namespace {
             && getGeoPropTargetName(mesh, sFaceVertex) == sFaceVertexComp;
     }
 
-    /// Calls `visit(first, end)` for the corners of each kept face. The ranges ascend and do not overlap, even if the
-    /// offsets do.
-    template <class Visit> void forEachCornerRange(
-        Orvan::Array<bool> const& deleted, IndexArray const& faceOffset, unsigned int cornerCount, Visit const& visit)
-    {
-        unsigned int lastEnd = 0;
-        for (std::uint64_t face = 0; face != deleted.size; ++face) {
-            if (deleted[face])
-                continue;
-            unsigned int const first = std::max(faceOffset[face], lastEnd);
-            unsigned int const end = std::min(faceOffset[face + 1], cornerCount);
-            if (first < end) {
-                visit(first, end);
-                lastEnd = end;
+    /// Sets ranges of bits that other threads may set too. Ascending ranges in one word need one access to it.
+    class BitSetter {
+    public:
+        explicit BitSetter(std::uint64_t* words)
+            : words_(words)
+        {
+        }
+        BitSetter(BitSetter const&) = delete;
+        BitSetter& operator=(BitSetter const&) = delete;
+        ~BitSetter() { store(); }
+
+        void set(std::uint64_t first, std::uint64_t end)
+        {
+            for (std::uint64_t bit = first; bit < end;) {
+                if (bit / kBits != word_) {
+                    store();
+                    word_ = bit / kBits;
+                }
+                std::uint64_t const wordEnd = std::min(end, (word_ + 1) * kBits), count = wordEnd - bit;
+                bits_ |= (~std::uint64_t{0} >> (kBits - count)) << bit % kBits;
+                bit = wordEnd;
             }
         }
-    }
 
-    KeptElements findKeptCorners(
-        Orvan::Array<bool> const& deleted, IndexArray const& faceOffset, unsigned int cornerCount)
+    private:
+        static constexpr std::uint64_t kBits = KeptElements::kWordBits;
+
+        void store()
+        {
+            if (bits_ != 0)
+                std::atomic_ref<std::uint64_t>(words_[word_]).fetch_or(bits_, std::memory_order_relaxed);
+            bits_ = 0;
+        }
+
+        std::uint64_t* words_;
+        std::uint64_t word_ = 0;
+        std::uint64_t bits_ = 0; // of that word, not stored yet
+    };
+
+    /// The corners of kept faces. Offsets may decrease or lead too far.
+    KeptElements findKeptCorners(KeptElements const& faces, IndexArray const& faceOffset, unsigned int cornerCount)
     {
-        std::uint64_t keptCount = 0;
-        forEachCornerRange(
-            deleted, faceOffset, cornerCount, [&](unsigned int first, unsigned int end) { keptCount += end - first; });
-        KeptElements kept{cornerCount, uninitializedArray<unsigned int>(keptCount)};
-        unsigned int* source = kept.sources.data;
-        forEachCornerRange(deleted, faceOffset, cornerCount, [&](unsigned int first, unsigned int end) {
-            for (unsigned int corner = first; corner != end; ++corner)
-                *source++ = corner;
+        auto bits = zeroedArray<std::uint64_t>(KeptElements::wordsFor(cornerCount));
+        unsigned int const* const offset = faceOffset.data;
+        // Words that two threads share are set atomically.
+        parallelFor(tbb::blocked_range<std::size_t>(0, faces.wordCount(), kFaceWordGrain), [&](auto const& words) {
+            BitSetter corners(bits.data);
+            faces.visitRuns(words.begin(), words.end(), [&](std::uint64_t first, std::uint64_t, std::uint64_t count) {
+                if (isNonDecreasing(offset + first, count + 1))
+                    corners.set(offset[first], std::min(offset[first + count], cornerCount));
+                else
+                    for (std::uint64_t face = first; face != first + count; ++face)
+                        corners.set(offset[face], std::min(offset[face + 1], cornerCount));
+            });
         });
-        return kept;
-    }
-
-    /// Marks the points that no kept corner uses.
-    Orvan::Array<bool> findUnusedPoints(
-        KeptElements const& corners, IndexArray const& faceVertex, unsigned int pointCount)
-    {
-        Orvan::Array<bool> isUnused = filledArray<bool>(pointCount, true);
-        for (unsigned int const corner : corners.sources)
-            if (faceVertex[corner] < pointCount)
-                isUnused[faceVertex[corner]] = false;
-        return isUnused;
-    }
-
-    /// Whether the point of every kept corner is kept.
-    [[maybe_unused]] bool keepsPointsOfCorners(FaceElements const& elements, IndexArray const& faceVertex)
-    {
-        Orvan::Array<bool> const& isUnused = elements.unusedPoints;
-        return std::all_of(elements.corners.sources.begin(), elements.corners.sources.end(),
-            [&](unsigned int corner) { return faceVertex[corner] >= isUnused.size || !isUnused[faceVertex[corner]]; });
+        return KeptElements(cornerCount, std::move(bits));
     }
 
     /// Returns nullopt if the index arrays do not fit the mesh.
@@ -93,23 +102,20 @@ namespace {
         MeshArrays const arrays = readMeshArrays(mesh); // released before the deletion, which may then edit in place
         if (!fitsCounts(arrays, mesh))
             return std::nullopt;
-        FaceElements elements;
-        elements.corners = findKeptCorners(deleted, *arrays.faceOffset, arrays.cornerCount);
-        elements.unusedPoints = findUnusedPoints(elements.corners, *arrays.faceVertex, arrays.pointCount);
-        MODELING_ASSERT(keepsPointsOfCorners(elements, *arrays.faceVertex));
-        return elements;
+        KeptElements faces(deleted);
+        KeptElements corners = findKeptCorners(faces, *arrays.faceOffset, arrays.cornerCount);
+        KeptElements points(findUnused(arrays.pointCount, *arrays.faceVertex, corners));
+        return FaceElements{std::move(faces), std::move(corners), std::move(points)};
     }
 
     /// Prepares points, then corners, then faces. An index array is renumbered only after its whole component has been
     /// prepared: if that is refused, the array keeps its old indices.
-    bool prepareDeletion(Orvan::Array<bool> const& deleted, FaceElements const& elements, IndexArray const& pointRemap,
-        Deletion& deletion)
+    bool prepareDeletion(FaceElements const& elements, IndexArray const& pointRemap, Deletion& deletion)
     {
-        if (!deletion.prepare(sPointComp, elements.unusedPoints)
-            || !deletion.prepare(sFaceVertexComp, elements.corners))
+        if (!deletion.prepare(sPointComp, elements.points) || !deletion.prepare(sFaceVertexComp, elements.corners))
             return false;
         deletion.renumber(sFaceVertex, pointRemap);
-        if (!deletion.prepare(sFaceComp, deleted))
+        if (!deletion.prepare(sFaceComp, elements.faces))
             return false;
         deletion.renumberOffsets(sFaceOffset, elements.corners);
         return true;
@@ -124,9 +130,9 @@ bool deleteFaces(Orvan::Array<bool> const& deleted, Object& mesh)
     std::optional<FaceElements> const elements = findFaceElements(deleted, mesh);
     if (!elements)
         return false;
-    IndexArray const pointRemap = computeDeletedComponentMapping(elements->unusedPoints);
+    IndexArray const pointRemap = elements->points.remap();
     Deletion deletion(mesh);
-    bool const isDone = prepareDeletion(deleted, *elements, pointRemap, deletion);
+    bool const isDone = prepareDeletion(*elements, pointRemap, deletion);
     deletion.commit();
     return isDone;
 }

@@ -1,5 +1,6 @@
 #include "extendComponent.h"
 
+#include "ArrayEdit.h"
 #include "frame/Arrays.h"
 #include "frame/Assert.h"
 #include "frame/ElementTypes.h"
@@ -13,7 +14,10 @@
 
 #include <algorithm>
 #include <limits>
+#include <memory>
 #include <type_traits>
+#include <utility>
+#include <vector>
 
 namespace Modeling::Internal {
 
@@ -26,109 +30,148 @@ namespace {
 
     struct Extension {
         Orvan::String const& component;
+        Orvan::String const& tag; // a property of this name is replaced in the end, and not extended
         std::uint64_t oldCount;
         std::uint64_t newCount;
         NewValues const& given;
     };
 
-    /// A copy of `source`, trimmed or extended to `newCount` elements, with the capacity that appending would give. The
-    /// added elements are uninitialized.
-    template <class T> Orvan::Array<T> grownCopy(Orvan::Array<T> const& source, std::uint64_t newCount)
+    /// A property that is to be replaced by a clone with another array.
+    struct Change {
+        Orvan::String key;
+        char const* arrayKey; // `sData` or `sIndices`
+        Orvan::MutablePtr<Object> property; // has no array before the commit
+        std::unique_ptr<ArrayEdit> array; // null: the property loses its array
+    };
+
+    /// Trims or extends an array to another length. An array that may be edited and has room for the new elements gets
+    /// them behind its end, where nobody sees them before the commit. Otherwise they are in a copy, with the capacity
+    /// that appending would give.
+    template <class T> class Growth final : public ArrayEdit {
+        static constexpr bool kTrivial = std::is_trivially_copyable_v<T>;
+        static_assert(!kTrivial || std::is_trivially_default_constructible_v<T>, "resizing must not write");
+
+    public:
+        Growth(Orvan::Ptr<Orvan::Array<T>> source, std::uint64_t newCount, bool mayEdit)
+            : source_(std::move(source))
+            , newCount_(newCount)
+        {
+            std::uint64_t const capacity = mayEdit ? source_->capacity : source_->size;
+            if (mayEdit && capacity >= newCount)
+                return;
+            std::uint64_t const added = newCount - std::min(source_->size, newCount);
+            target_ = Orvan::MutablePtr<Orvan::Array<T>>::make();
+            target_->reserve(added == 0 ? newCount : capacity + std::max(capacity, added));
+            target_->resize(newCount, Orvan::kUninitialized);
+            copyElements(source_->data, newCount - added, target_->data);
+        }
+
+        /// Sets all elements that the source does not have.
+        void fill(T const& value)
+        {
+            if (source_->size >= newCount_)
+                return;
+            std::uint64_t const count = newCount_ - source_->size;
+            if (kTrivial || target_)
+                fillElements(values() + source_->size, count, value);
+            else
+                added_ = Orvan::Array<T>(count, value);
+        }
+
+        /// Sets elements, in a copy or behind the end of the source.
+        void write(std::uint64_t first, Orvan::Array<T> const& elements) requires kTrivial
+        {
+            MODELING_ASSERT(target_ || source_->size <= first);
+            copyElements(elements.data, elements.size, values() + first);
+        }
+
+        PropertyValue finish() override
+        {
+            if (!target_) {
+                std::uint64_t const oldSize = source_->size;
+                target_ = makeMutable(std::move(source_)); // does not copy: this is the last reference
+                target_->resize(newCount_, Orvan::kUninitialized); // does not allocate: there is room
+                std::move(added_.begin(), added_.end(), target_->data + oldSize);
+            }
+            MODELING_ASSERT(target_->size == newCount_);
+            return Orvan::Ptr<Orvan::Array<T>>(std::move(target_));
+        }
+
+    private:
+        T* values() { return target_ ? target_->data : source_->data; }
+
+        Orvan::Ptr<Orvan::Array<T>> source_;
+        std::uint64_t newCount_;
+        Orvan::MutablePtr<Orvan::Array<T>> target_; // if in place, null until `finish`
+        Orvan::Array<T> added_; // if in place and not trivial: elements behind the end would have to be destroyed
+    };
+
+    /// Extends one array of the object by its default, or by the given values.
+    /// \param source  Besides this reference, the caller has one more.
+    template <class T> std::unique_ptr<ArrayEdit> extended(Orvan::String const& name,
+        Orvan::Ptr<Orvan::Array<T>> source, T const& fallback, Extension const& extension, Object const& object)
     {
-        std::uint64_t const added = newCount - std::min(source.size, newCount);
-        Orvan::Array<T> copy;
-        copy.reserve(added == 0 ? newCount : source.size + std::max(source.size, added));
-        copy.resize(newCount, Orvan::kUninitialized);
-        std::uint64_t const copied = newCount - added;
-        copyElements(source.data, copied, copy.data);
-        return copy;
+        bool const isGiven = std::is_same_v<T, Math::float3> && name == extension.given.property;
+        // Given values replace elements beyond the old count, which must not happen before the commit.
+        bool const isOverwritten = isGiven && source->size > extension.oldCount;
+        bool const isPadded = !isGiven || source->size < extension.oldCount;
+        bool const mayEdit = !isOverwritten && !isShared(object, name, source, 2);
+        auto growth = std::make_unique<Growth<T>>(std::move(source), extension.newCount, mayEdit);
+        if (isPadded)
+            growth->fill(fallback);
+        if constexpr (std::is_same_v<T, Math::float3>)
+            if (isGiven)
+                growth->write(extension.oldCount, extension.given.values);
+        return growth;
     }
 
-    template <class T> void fillFrom(std::uint64_t first, T const& value, Orvan::Array<T>& array)
+    /// Null if the value is no array of a core type: an array that cannot be extended is dropped.
+    std::unique_ptr<ArrayEdit> extendedData(Orvan::String const& name, PropertyValue const& data,
+        PropertyValue const& defaultValue, Extension const& extension, Object const& object)
     {
-        if (first < array.size)
-            fillElements(array.data + first, array.size - first, value);
-    }
-
-    template <class T>
-    Orvan::Array<T> extended(Orvan::Array<T> const& source, Object const& property, std::uint64_t newCount)
-    {
-        Orvan::Array<T> array = grownCopy(source, newCount);
-        PropertyValue const defaultValue = property.getProperty(sDefault);
-        T const* const fallback = defaultValue.get<T>();
-        fillFrom(source.size, fallback ? *fallback : T{}, array);
-        MODELING_ASSERT(array.size == newCount);
-        return array;
-    }
-
-    /// As `extended`, but the new elements get the given values.
-    Orvan::Array<Math::float3> extendedByGiven(
-        Orvan::Array<Math::float3> const& source, Object const& property, Extension const& extension)
-    {
-        std::uint64_t const oldCount = extension.oldCount;
-        Orvan::Array<Math::float3> array = source.size < oldCount
-            ? extended(source, property, extension.newCount) // some old elements have no value either
-            : grownCopy(source, extension.newCount);
-        copyElements(extension.given.values.data, extension.newCount - oldCount, array.data + oldCount);
-        return array;
-    }
-
-    /// The value of `sData` for the new count. Empty if the property has no array of a core type: an array that cannot
-    /// be extended is dropped.
-    PropertyValue extendedData(Orvan::String const& name, Object const& property, Extension const& extension)
-    {
-        PropertyValue const data = property.getProperty(sData);
-        PropertyValue result;
+        std::unique_ptr<ArrayEdit> result;
         bool matched = false;
         forEachElementType<CoreElementTypes, ArrayForm>(
-            &data, &matched, [&]<class T>(Orvan::Ptr<Orvan::Array<T>> const& source) {
+            &data, &matched, [&]<class T>(Orvan::Ptr<Orvan::Array<T>>& source) {
                 if (!source)
                     return false;
-                if constexpr (std::is_same_v<T, Math::float3>) {
-                    if (name == extension.given.property) {
-                        result = Orvan::makePtr<Orvan::Array<T>>(extendedByGiven(*source, property, extension));
-                        return true;
-                    }
-                }
-                result = Orvan::makePtr<Orvan::Array<T>>(extended(*source, property, extension.newCount));
+                T const* const fallback = defaultValue.get<T>();
+                result = extended(name, std::move(source), fallback ? *fallback : T{}, extension, object);
                 return true;
             });
         return result;
     }
 
-    /// Visits the geo properties of a kind that target the component: `visit(name, property)`.
-    template <class Visit> void forEachProperty(
-        Object const& object, Object const& prototype, Orvan::String const& component, Visit const& visit)
+    /// Visits clones of the geo properties of a kind that target the component: `visit(name, property)`.
+    template <class Visit>
+    void forEachProperty(Object const& object, Object const& prototype, Extension const& extension, Visit const& visit)
     {
         Orvan::Array<Orvan::String> const names = getGeoPropNamesByPrototype(object, prototype);
         for (Orvan::String const& name : names)
-            if (getGeoPropTargetName(object, name) == component)
-                visit(name, objectAt(object, name));
+            if (!name.empty() && name != extension.tag && getGeoPropTargetName(object, name) == extension.component)
+                visit(name, makeMutable(objectAt(object, name)));
     }
 
-    void prepareData(Extension const& extension, Object const& object, PreparedWrites& writes)
+    void prepareData(Extension const& extension, Object const& object, std::vector<Change>& changes)
     {
-        forEachProperty(object, *getDataGeoPropPrototype(sGenericDataGeoProp), extension.component,
-            [&](Orvan::String const& name, Orvan::Ptr<Object> property) {
-                PropertyValue data = extendedData(name, *property, extension);
-                Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
-                changed->setProperty(sData, std::move(data));
-                writes.setProperty(name, Orvan::Ptr<Object>(std::move(changed)));
+        forEachProperty(object, *getDataGeoPropPrototype(sGenericDataGeoProp), extension,
+            [&](Orvan::String const& name, Orvan::MutablePtr<Object>&& property) {
+                PropertyValue const data = takeArray(sData, *property);
+                auto array = extendedData(name, data, property->getProperty(sDefault), extension, object);
+                changes.push_back({name, sData, std::move(property), std::move(array)});
             });
     }
 
-    void prepareRanges(Extension const& extension, Object const& object, PreparedWrites& writes)
+    void prepareRanges(Extension const& extension, Object const& object, std::vector<Change>& changes)
     {
-        forEachProperty(object, *getRangeGeoPropPrototype(), extension.component,
-            [&](Orvan::String const& name, Orvan::Ptr<Object> property) {
-                Orvan::Ptr<IndexArray> const source = getRangeGeoPropIndices(*property);
-                if (!source)
+        forEachProperty(object, *getRangeGeoPropPrototype(), extension,
+            [&](Orvan::String const& name, Orvan::MutablePtr<Object>&& property) {
+                Orvan::Ptr<IndexArray> indices = getRangeGeoPropIndices(*property);
+                if (!indices)
                     return;
-                IndexArray indices = grownCopy(*source, extension.newCount);
-                fillFrom(source->size, kInvalidIndex, indices);
-                Orvan::MutablePtr<Object> changed = makeMutable(std::move(property));
-                changed->setProperty(sIndices, Orvan::makePtr<IndexArray>(std::move(indices)));
-                writes.setProperty(name, Orvan::Ptr<Object>(std::move(changed)));
+                PropertyValue const taken = takeArray(sIndices, *property);
+                auto array = extended(name, std::move(indices), kInvalidIndex, extension, object);
+                changes.push_back({name, sIndices, std::move(property), std::move(array)});
             });
     }
 
@@ -152,17 +195,20 @@ bool extendComponent(Orvan::String const& component, std::uint64_t addCount, Orv
     if (addCount > std::numeric_limits<unsigned int>::max() - oldCount)
         return false;
     MODELING_ASSERT(given.values.size == addCount);
-    Extension const extension{component, oldCount, oldCount + addCount, given};
+    Extension const extension{component, tag, oldCount, oldCount + addCount, given};
 
     // The arguments may be stored in the object itself, so all of them are read before the object changes.
     PreparedWrites writes(object);
     if (!writes.setElementCount(component, static_cast<unsigned int>(extension.newCount)))
         return false;
-    prepareData(extension, object, writes);
-    prepareRanges(extension, object, writes);
-    if (!tag.empty()) // last, so that the tag replaces any other property of that name
+    std::vector<Change> changes;
+    prepareData(extension, object, changes);
+    prepareRanges(extension, object, changes);
+    if (!tag.empty())
         writes.setProperty(tag, Orvan::Ptr<Object>(makeTag(extension)));
     writes.commit();
+    for (Change& change : changes)
+        replaceProperty(change.key, change.arrayKey, std::move(change.property), change.array.get(), object);
     return true;
 }
 

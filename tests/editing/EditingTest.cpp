@@ -4,9 +4,13 @@
 #include <Modeling/deleteFaces.h>
 #include <Modeling/deletePointsInPointCloud.h>
 
+#include "editing/compactArray.h"
+#include "support/AllocationHooks.h"
 #include "support/Testing.h"
 
 #include <TessaraGeometry/Validators.h>
+
+#include <numeric>
 
 using namespace Tessara::GeometryAlgorithms;
 using namespace TestSupport;
@@ -278,6 +282,162 @@ TEST(Editing, EditsInPlaceAndReadsArgumentsStoredInTheObject)
     Flags const& isDeleted = *dataOf<bool>(*mesh, "deleted");
     ASSERT_TRUE(deleteFaces(isDeleted, *mesh));
     EXPECT_EQ(countsOf(*mesh), (Counts{3, 3, 1}));
+}
+
+namespace {
+
+constexpr char kLong[] = "a default that is too long to be stored without an allocation";
+
+Orvan::MutablePtr<Object> makeCloudToGrow(unsigned int count)
+{
+    Random random(3);
+    auto cloud = makePointCloud(randomPositions(count, random));
+    addDataProperty<double>("weight", sPointComp, Orvan::Array<double>(count, 2.0), *cloud, 0.5);
+    addDataProperty<Orvan::String>("text", sPointComp, Orvan::Array<Orvan::String>(count, "x"), *cloud, kLong);
+    addRangeProperty("range", sPointComp, IndexList(count, 0u), *cloud);
+    addDataProperty<int>("of range", "range", {5}, *cloud);
+    return cloud;
+}
+
+/// Where the arrays of such a cloud are.
+std::array<void const*, 4> arraysOf(Object const& cloud)
+{
+    return {dataOf<float3>(cloud, sPointPosition)->data, dataOf<double>(cloud, "weight")->data,
+        dataOf<Orvan::String>(cloud, "text")->data, getRangeGeoPropIndices(cloud, "range")->data};
+}
+
+}
+
+TEST(Editing, AppendsInPlaceWhereNobodySharesTheArrays)
+{
+    Random random(4);
+    auto const cloud = makeCloudToGrow(1000), expected = deepCopy(*cloud);
+    auto before = arraysOf(*cloud);
+    unsigned int moves = 0;
+    for (int call = 0; call != 64; ++call) {
+        auto const positions = randomPositions(100, random);
+        ASSERT_TRUE(addPointsToPointCloud(positions, "isNew", *cloud, nullptr));
+        ASSERT_TRUE(Plain::addPoints(positions, "isNew", *expected));
+        moves += arraysOf(*cloud) != before ? 1 : 0;
+        before = arraysOf(*cloud);
+    }
+    EXPECT_TRUE(sameContents(*cloud, *expected));
+    EXPECT_EQ(moves, 3u) << "to 2000, 4000 and 8000 points";
+
+    IndexList most(7000);
+    std::iota(most.begin(), most.end(), 0u);
+    ASSERT_TRUE(deletePointsInPointCloud(most, *cloud, nullptr));
+    for (unsigned int const count : {400u, 800u, 1600u, 3200u, 6400u}) { // has room until the last
+        Positions const& own = *dataOf<float3>(*cloud, sPointPosition);
+        Positions const copy = own;
+        ASSERT_TRUE(addPointsToPointCloud(own, "", *cloud, nullptr));
+        Positions const& doubled = *dataOf<float3>(*cloud, sPointPosition);
+        EXPECT_EQ(copy.size, count);
+        EXPECT_EQ(doubled.data == before[0], count < 6400);
+        EXPECT_TRUE(std::equal(copy.begin(), copy.end(), doubled.begin()));
+        EXPECT_TRUE(std::equal(copy.begin(), copy.end(), doubled.begin() + count));
+    }
+}
+
+TEST(Editing, CopiesASharedArrayOnceToAppendToIt)
+{
+    constexpr unsigned int kCount = 100'000;
+    auto const cloud = makePointCloud(Positions(kCount));
+    auto const held = dataOf<float3>(*cloud, sPointPosition);
+    auto const memory = memoryOf([&] { addPointsToPointCloud({{1, 2, 3}}, "", *cloud, nullptr); });
+    EXPECT_LT(memory.peak, 2 * kCount * 12 + 10'000) << "room for as many points, and no second copy";
+    EXPECT_EQ(held->size, kCount);
+    EXPECT_EQ(dataOf<float3>(*cloud, sPointPosition)->capacity, 2 * kCount);
+}
+
+TEST(Editing, LeavesArraysWithRoomAsTheyWereWhenMemoryRunsOut)
+{
+    auto const source = makeCloudToGrow(5);
+    Positions const first(1), second{{1, 2, 3}, {4, 5, 6}};
+    auto const before = deepCopy(*source), expected = deepCopy(*source);
+    ASSERT_TRUE(addPointsToPointCloud(first, "", *before, nullptr) && Plain::addPoints(first, "", *expected));
+    ASSERT_TRUE(Plain::addPoints(second, "isNew", *expected));
+    sweepFailingAllocations([&](Attempt const& attempt) {
+        auto const cloud = deepCopy(*source);
+        ASSERT_TRUE(addPointsToPointCloud(first, "", *cloud, nullptr)); // doubles
+        auto const arrays = arraysOf(*cloud);
+        bool const isDone = attempt([&] { addPointsToPointCloud(second, "isNew", *cloud, nullptr); });
+        EXPECT_TRUE(sameContents(*cloud, isDone ? *expected : *before));
+        EXPECT_EQ(arraysOf(*cloud), arrays);
+    });
+}
+
+namespace {
+
+/// Patterns of deleted elements, from none to all.
+std::vector<Flags> deletionPatterns(std::size_t count, Random& random)
+{
+    auto const flags = [&](auto const& isDeleted) {
+        Flags made(count);
+        for (std::size_t i = 0; i != count; ++i)
+            made[i] = isDeleted(i);
+        return made;
+    };
+    return {flags([](std::size_t) { return false; }), flags([](std::size_t) { return true; }),
+        flags([&](std::size_t) { return random.below(2) == 0; }), flags([](std::size_t i) { return i / 100 % 2 == 1; }),
+        flags([&](std::size_t) { return random.below(10'000) == 0; }),
+        flags([=](std::size_t i) { return i == count / 2; }), flags([=](std::size_t i) { return i < count / 3; }),
+        flags([&](std::size_t i) { return i > 1000 && random.below(100) != 0; })};
+}
+
+}
+
+TEST(Editing, CompactsLargeArraysInPlaceAsItCopiesThem)
+{
+    Random random(11);
+    constexpr std::size_t kCount = 50'001;
+    auto const cloud = makePointCloud(randomPositions(kCount, random));
+    addAllTypes(sPointComp, random, *cloud);
+    addRangeProperty("range", sPointComp, IndexList(kCount, 1u), *cloud);
+    addDataProperty<int>("of range", "range", {5, 6}, *cloud);
+    for (Flags const& deleted : deletionPatterns(kCount, random)) {
+        IndexList const remap = computeDeletedComponentMapping(deleted);
+        EXPECT_EQ(remap, Plain::mapping(deleted));
+        auto const expected = deepCopy(*cloud);
+        ASSERT_TRUE(Plain::deleteComponents(remap, sPointComp, *expected));
+        for (int const threads : {1, 8}) {
+            Object shared = *cloud;
+            auto const own = deepCopy(*cloud);
+            float3 const* const place = dataOf<float3>(*own, sPointPosition)->data;
+            withThreads(threads, [&] {
+                EXPECT_TRUE(deleteComponents(remap, sPointComp, shared));
+                EXPECT_TRUE(deleteComponents(remap, sPointComp, *own));
+            });
+            EXPECT_TRUE(sameContents(shared, *expected)) << threads << " threads";
+            EXPECT_TRUE(sameContents(*own, *expected)) << threads << " threads, in place";
+            EXPECT_EQ(dataOf<float3>(*own, sPointPosition)->data, place);
+        }
+    }
+}
+
+TEST(Editing, CompactsInPlaceEvenIfLoopsFail)
+{
+    using namespace Modeling::Internal;
+    Random random(12);
+    constexpr std::size_t kCount = 1'000'000;
+    for (Flags const& deleted : deletionPatterns(kCount, random)) {
+        KeptElements const kept(deleted);
+        IndexList values(kCount, Orvan::kUninitialized), expected;
+        for (unsigned int i = 0; i != kCount; ++i)
+            values[i] = i;
+        for (unsigned int i = 0; i != kCount; ++i)
+            if (!deleted[i])
+                expected.append(i + 7);
+        CompactionBuffer buffer(kCompactionBufferBytes);
+        // oneTBB may fail in the middle of a loop.
+        auto const transfer = RenumberingTransfer{[](unsigned int i) { return i + 7; }};
+        {
+            ExhaustedMemory const exhausted;
+            compactInPlace(kept, transfer, values.data, buffer);
+        }
+        values.resize(kept.count());
+        EXPECT_EQ(values, expected);
+    }
 }
 
 TEST(Editing, RefusesBeforeTheFirstChange)
