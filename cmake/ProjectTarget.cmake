@@ -1,8 +1,10 @@
 # What every target of this project has in common.
 
 include_guard()
+include(${CMAKE_CURRENT_LIST_DIR}/Hardening.cmake)
 
 add_library(modeling_flags INTERFACE)
+target_link_libraries(modeling_flags INTERFACE modeling_hardening)
 target_compile_features(modeling_flags INTERFACE cxx_std_20)
 target_compile_options(modeling_flags INTERFACE
     # Fused multiply-adds round differently: results would depend on the compiler and the machine.
@@ -28,7 +30,7 @@ if(MODELING_SANITIZE)
     endif()
 endif()
 
-# Gives a target the project's language level, warnings and sanitizers. Only the language level propagates to its users.
+# Gives a target the project's language level, warnings, sanitizers and hardening. Only the language level propagates to its users.
 function(modeling_use_flags target)
     target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:modeling_flags>)
     target_compile_features(${target} PUBLIC cxx_std_20)

@@ -59,7 +59,8 @@ test_preset() {
 
 build_packages=(g++ cmake ninja-build git ca-certificates libtbb-dev)
 program_packages=(libcli11-dev libfmt-dev nlohmann-json3-dev libopenvdb-dev libboost-dev libhdf5-dev zlib1g-dev)
-test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev clang clang-format clang-tidy)
+test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev clang clang-format clang-tidy abigail-tools binutils pkgconf)
 python_packages=(python3 python3-dev pybind11-dev python3-numpy python3-distributed python3-rich python3-matplotlib)
 python_test_packages=(python3-pytest mypy python3-vtk9)
+package_packages=(dpkg-dev file lintian mmdebstrap)
 page_test_packages=(chromium chromium-driver python3-selenium python3-numpy)

@@ -5,7 +5,9 @@ include(${CMAKE_CURRENT_LIST_DIR}/consumer.cmake)
 
 set(folder ${BUILD_DIR}/package-test/apart)
 file(REMOVE_RECURSE ${folder})
-run(${CMAKE_COMMAND} --install ${BUILD_DIR} --component TessaraHost --prefix ${folder}/host)
+foreach(component TessaraHost TessaraHostDevelopment)
+    run(${CMAKE_COMMAND} --install ${BUILD_DIR} --component ${component} --prefix ${folder}/host)
+endforeach()
 # Whether it can be built and linked does not depend on the optimization level.
 run(${CMAKE_COMMAND} -S ${SOURCE_DIR} -B ${folder}/build ${flags} -DMODELING_HOST=external
     -DCMAKE_CXX_FLAGS_RELEASE=-O1

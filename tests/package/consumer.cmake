@@ -29,6 +29,14 @@ function(write_block language text file)
     file(WRITE ${file} "${text}")
 endfunction()
 
+# Runs the README's example program.
+function(run_program)
+    run(${ARGN})
+    if(NOT output MATCHES "6 points, 8 faces")
+        message(FATAL_ERROR "the program said: ${output}")
+    endif()
+endfunction()
+
 # The README and the other documents are those installed below the first prefix. `library_path` is where a host that is
 # installed elsewhere has its libraries; empty if everything is in one place.
 function(run_consumer folder library_path)
@@ -43,8 +51,5 @@ function(run_consumer folder library_path)
     list(JOIN ARGN ":" prefixes)
     run(${CMAKE_COMMAND} -E env CMAKE_PREFIX_PATH=${prefixes} ${CMAKE_COMMAND} -S ${folder} -B ${folder}/build ${flags})
     run(${CMAKE_COMMAND} --build ${folder}/build)
-    run(${CMAKE_COMMAND} -E env LD_LIBRARY_PATH=${library_path} ${folder}/build/app)
-    if(NOT output MATCHES "6 points, 8 faces")
-        message(FATAL_ERROR "the program said: ${output}")
-    endif()
+    run_program(${CMAKE_COMMAND} -E env LD_LIBRARY_PATH=${library_path} ${folder}/build/app)
 endfunction()
