@@ -62,4 +62,6 @@ program_packages=(libcli11-dev libfmt-dev nlohmann-json3-dev libopenvdb-dev libb
 test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev clang clang-format clang-tidy)
 python_packages=(python3 python3-dev pybind11-dev python3-numpy python3-distributed python3-rich python3-matplotlib)
 python_test_packages=(python3-pytest mypy python3-vtk9)
+fuzz_packages=(clang libclang-rt-14-dev libgtest-dev)
+coverage_packages=(clang llvm python3)
 page_test_packages=(chromium chromium-driver python3-selenium python3-numpy)
