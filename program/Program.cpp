@@ -152,8 +152,7 @@ Exit codes:
         invocation.commandLine = quotedCommand(words);
         CommandLine program("modeling", "modeling " MODELING_VERSION,
             "Geometry algorithms for meshes, point clouds and strands, run on files.", kFooter);
-        for (auto const add : kCommands)
-            add(program, invocation);
+        addCommands(program, invocation);
         CommandLine::Parsed const parsed =
             program.parse({arguments + std::min(1, argumentCount), arguments + argumentCount});
         if (!parsed.mistake.empty()) {
@@ -174,6 +173,12 @@ Exit codes:
                 static_cast<void>(::open("/dev/null", O_RDONLY));
     }
 
+}
+
+void addCommands(CommandLine& program, Invocation& invocation)
+{
+    for (auto const add : kCommands)
+        add(program, invocation);
 }
 
 Failure currentFailure()

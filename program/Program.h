@@ -4,6 +4,12 @@
 
 namespace ModelingProgram {
 
+class CommandLine;
+struct Invocation;
+
+/// Adds all commands. Both arguments have to outlive what the invocation runs after parsing.
+void addCommands(CommandLine& program, Invocation& invocation);
+
 /// Parses the command line, runs the command and prints its report. \return the exit code
 int runProgram(int argumentCount, char const* const* arguments);
 

@@ -244,7 +244,7 @@ Orvan::MutablePtr<Tessara::Object> GeometryBuilder::makeObject()
         for (std::string& sentence : unusable->describe())
             note(std::move(sentence));
         if (!unusable->anyPointRemains())
-            scanner_.refuse("no point is left");
+            scanner_.refuseWhole("no point is left");
         whole = raw_;
     }
     bool const isMesh = unusable ? unusable->anyFaceRemains() : faceCount() != 0;

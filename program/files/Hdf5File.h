@@ -6,6 +6,7 @@
 #include <functional>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace ModelingProgram {
@@ -42,6 +43,10 @@ enum class Hdf5Selection { All, Named, Only };
 /// \throws FileError  which names the file, the path in the file, and the element if there is one
 std::vector<Hdf5Object> readHdf5Objects(std::filesystem::path const& file, Hdf5Selection selection,
     std::string const& name = {}, std::function<void(std::uint64_t)> const& onSize = {});
+
+/// The second half of it: reads the objects that an outline (`Hdf5Outline.h`) describes, which may be nonsense.
+std::vector<Hdf5Object> readOutlinedObjects(
+    std::string_view outline, std::filesystem::path const& file, std::function<void(std::uint64_t)> const& onSize);
 
 /// Writes a file with these objects. Values that several keys share are stored once, and are shared when they are read.
 /// \param options.compression  0 to 9; arrays are stored in one piece if it is 0

@@ -517,19 +517,24 @@ namespace {
 
 }
 
-std::vector<Hdf5Object> readHdf5Objects(std::filesystem::path const& file, Hdf5Selection selection,
-    std::string const& name, std::function<void(std::uint64_t)> const& onSize)
+std::vector<Hdf5Object> readOutlinedObjects(
+    std::string_view outline, std::filesystem::path const& file, std::function<void(std::uint64_t)> const& onSize)
 {
     RawFile const raw(file);
-    Place const root{file, ""};
-    std::string const outline = outlineOf(file, selection, name, raw.size);
     try {
         return Reader(
             raw, outline, onSize ? onSize : [](std::uint64_t) {})
-            .readAll(root);
+            .readAll({file, ""});
     } catch (Hdf5OutlineError const& error) {
         throw FileError(file.string() + " cannot be read: " + error.what());
     }
+}
+
+std::vector<Hdf5Object> readHdf5Objects(std::filesystem::path const& file, Hdf5Selection selection,
+    std::string const& name, std::function<void(std::uint64_t)> const& onSize)
+{
+    std::uint64_t const fileBytes = RawFile(file).size;
+    return readOutlinedObjects(outlineOf(file, selection, name, fileBytes), file, onSize);
 }
 
 }

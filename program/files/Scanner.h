@@ -103,6 +103,12 @@ public:
         throw FileError(file_.path.string() + ", " + location() + ": " + why);
     }
 
+    /// Refuses the file as a whole, without the position.
+    [[noreturn]] void refuseWhole(std::string const& why) const
+    {
+        throw FileError(file_.path.string() + " cannot be read: " + why);
+    }
+
     /// Refuses a declared number of elements that cannot fit in the rest of the file.
     void requirePossible(std::uint64_t count, char const* elements, std::uint64_t leastBytesEach) const
     {

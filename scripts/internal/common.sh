@@ -63,4 +63,6 @@ test_packages=(libgtest-dev libgmock-dev libbenchmark-dev libtinyobjloader-dev c
 python_packages=(python3 python3-dev pybind11-dev python3-numpy python3-distributed python3-rich python3-matplotlib)
 python_test_packages=(python3-pytest mypy python3-vtk9)
 package_packages=(dpkg-dev file lintian mmdebstrap)
+fuzz_packages=(clang libclang-rt-14-dev libgtest-dev)
+coverage_packages=(clang llvm python3)
 page_test_packages=(chromium chromium-driver python3-selenium python3-numpy)

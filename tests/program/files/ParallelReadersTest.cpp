@@ -172,6 +172,16 @@ namespace {
         EXPECT_GT(readCount, 200);
     }
 
+    TEST(ParallelReaders, PlyFilesWithoutUsablePointsAreRefusedAsElementByElement)
+    {
+        TemporaryFolder const folder;
+        store(folder / "a.ply",
+            "ply\nformat binary_little_endian 1.0\nelement vertex 1\nproperty float x\nproperty float y\n"
+            "property float z\nelement edge 1\nproperty int vertex1\nproperty int vertex2\nend_header\n"
+                + bytesOf(std::endian::little, kNan, kNan, kNan, 0, 0));
+        EXPECT_FALSE(readBothWays(folder / "a.ply"));
+    }
+
     /// A file of many blocks, with faces of 3 or of 3 to 6 corners.
     std::string largePly(std::endian order, bool areTriangles)
     {
