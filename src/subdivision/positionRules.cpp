@@ -7,6 +7,8 @@
 #include "frame/VectorMath.h"
 
 #include <algorithm>
+#include <array>
+#include <atomic>
 #include <cmath>
 
 namespace Geometry::Mesh {
@@ -51,17 +53,58 @@ namespace Internal {
             return std::pow(lambda, static_cast<float>(steps));
         }
 
+        /// Values that are computed when they are first needed, because cosines and powers take longer than everything
+        /// else at a point. Threads share a table: all of them would store the same bits.
+        template <std::size_t kSize> class LazyTable {
+        public:
+            LazyTable()
+            {
+                for (std::atomic<float>& value : values_)
+                    value.store(kUnknown, std::memory_order_relaxed);
+            }
+
+            template <class Compute> float at(std::size_t index, Compute const& compute)
+            {
+                float value = values_[index].load(std::memory_order_relaxed);
+                if (value == kUnknown) {
+                    value = compute();
+                    values_[index].store(value, std::memory_order_relaxed);
+                }
+                return value;
+            }
+
+        private:
+            static constexpr float kUnknown = 2; // no weight exceeds 1
+            std::array<std::atomic<float>, kSize> values_;
+        };
+
+        /// `remainingWeight`, from a table for usual valences.
+        class RemainingWeights {
+        public:
+            float at(std::uint64_t valence, unsigned int steps)
+            {
+                if (valence >= kValences || steps >= kSteps)
+                    return remainingWeight(valence, steps);
+                return table_.at(valence * kSteps + steps, [=] { return remainingWeight(valence, steps); });
+            }
+
+        private:
+            static constexpr std::size_t kValences = 16, kSteps = 32;
+            LazyTable<kValences * kSteps> table_;
+        };
+
         /// Points at any step, from their base and limit positions.
         struct PointsInTime {
             HalfEdgeDataStructure const& halfEdges;
             float3 const* basePositions;
             float3 const* limitPositions;
             unsigned char const* levels;
+            RemainingWeights& weights;
 
             /// The position a number of steps after the point was created.
             float3 after(unsigned int point, unsigned int steps) const
             {
-                float const weight = remainingWeight(halfEdges.valence(point), steps);
+                float const weight = weights.at(halfEdges.valence(point), steps);
                 return limitPositions[point] * (1 - weight) + basePositions[point] * weight;
             }
             /// Unsigned, so that it wraps around: see `remainingWeight`.
@@ -127,7 +170,9 @@ namespace Internal {
 
     void computeNewPoints(SettledFaces const& faces, RefinedPoints const& refined)
     {
-        PointsInTime const points{faces.halfEdges, refined.basePositions, refined.limitPositions, refined.levels};
+        RemainingWeights weights;
+        PointsInTime const points{
+            faces.halfEdges, refined.basePositions, refined.limitPositions, refined.levels, weights};
         forEachSplitFace(faces, [&](unsigned int face) {
             refined.basePositions[faces.newPoint(face)] =
                 points.center(faces.corners(face), stepOf(faces.states[face]));
@@ -152,6 +197,12 @@ namespace Internal {
         limitPositions.resize(numPoints, Orvan::kUninitialized);
         float3 const* const position = positions.data;
         float3* const limit = limitPositions.data;
+        constexpr std::size_t kValences = 32;
+        LazyTable<kValences> weights;
+        auto const weightOf = [&](std::uint64_t valence) {
+            auto const compute = [=] { return limitWeight(cosineOfSector(static_cast<float>(valence))); };
+            return valence < kValences ? weights.at(valence, compute) : compute();
+        };
         // Each point writes its own entry.
         parallelFor(
             tbb::blocked_range<unsigned int>(0, numPoints, kOneRingGrain), [&, position, limit](auto const& range) {
@@ -159,9 +210,9 @@ namespace Internal {
                     float3 sum{0, 0, 0};
                     for (auto const& neighbor : halfEdges.neighbors(point))
                         sum = sum + position[neighbor.point];
-                    auto const valence = static_cast<float>(halfEdges.valence(point));
-                    float const weight = limitWeight(cosineOfSector(valence));
-                    limit[point] = position[point] * (1 - weight) + sum * (weight / valence);
+                    std::uint64_t const valence = halfEdges.valence(point);
+                    float const weight = weightOf(valence);
+                    limit[point] = position[point] * (1 - weight) + sum * (weight / static_cast<float>(valence));
                 }
             });
     }
@@ -174,7 +225,8 @@ namespace Internal {
         MODELING_ASSERT(basePositions.size >= numPoints && limitPositions.size >= numPoints);
         MODELING_ASSERT(vertexLevels.size >= numPoints);
         positions.resize(numPoints, Orvan::kUninitialized);
-        PointsInTime const points{halfEdges, basePositions.data, limitPositions.data, vertexLevels.data};
+        RemainingWeights weights;
+        PointsInTime const points{halfEdges, basePositions.data, limitPositions.data, vertexLevels.data, weights};
         unsigned char const* const state = faceStates.data;
         float3* const position = positions.data;
         // Each point writes its own entry.
