@@ -95,18 +95,19 @@ namespace Internal {
 
         /// Points at any step, from their base and limit positions.
         struct PointsInTime {
-            HalfEdgeDataStructure const& halfEdges;
+            unsigned int const* valences; // null if they are passed
             float3 const* basePositions;
             float3 const* limitPositions;
             unsigned char const* levels;
             RemainingWeights& weights;
 
             /// The position a number of steps after the point was created.
-            float3 after(unsigned int point, unsigned int steps) const
+            float3 after(unsigned int point, std::uint64_t valence, unsigned int steps) const
             {
-                float const weight = weights.at(halfEdges.valence(point), steps);
+                float const weight = weights.at(valence, steps);
                 return limitPositions[point] * (1 - weight) + basePositions[point] * weight;
             }
+            float3 after(unsigned int point, unsigned int steps) const { return after(point, valences[point], steps); }
             /// Unsigned, so that it wraps around: see `remainingWeight`.
             unsigned int stepsAt(unsigned int point, unsigned int step) const { return step - levels[point]; }
             float3 at(unsigned int point, unsigned int step) const { return after(point, stepsAt(point, step)); }
@@ -134,9 +135,10 @@ namespace Internal {
             for (unsigned int k = 0; k != 3; ++k) {
                 unsigned int const point = faces.corners(face)[k];
                 sum = sum + points.after(point, points.stepsAt(point, step) + 1);
-                unsigned int const across = faces.neighbors[face][k];
-                if (across == kInvalidIndex)
+                unsigned int const twin = faces.twins[face][k];
+                if (twin == kInvalidIndex)
                     continue;
+                unsigned int const across = faceOfTwin(twin);
                 if (isThird(faces.states[across]))
                     sum = sum + points.at(faces.pointAcross(face, k), step);
                 else if (splitsAtStep(faces.states[across], step))
@@ -155,38 +157,49 @@ namespace Internal {
             return limitWeight(std::cos(sector));
         }
 
-        /// Calls `work(face)` for the faces that get a new point.
+        /// Calls `work(face, newPoint)` for the faces that get a new point.
         template <class Work> void forEachSplitFace(SettledFaces const& faces, Work const& work)
         {
             // Each face writes the entries of its own new point.
-            parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [&](auto const& range) {
-                for (unsigned int face = range.begin(); face != range.end(); ++face)
-                    if (isSplitAroundPoint(faces.states[face]))
-                        work(face);
+            parallelFor(tbb::blocked_range<unsigned int>(0, faces.newPointCount(), kFaceGrain), [&](auto const& ranks) {
+                for (unsigned int rank = ranks.begin(); rank != ranks.end(); ++rank)
+                    work(faces.splitFaces[rank], faces.pointCount + rank);
             });
         }
 
     }
 
-    void computeNewPoints(SettledFaces const& faces, RefinedPoints const& refined)
+    void computeNewPoints(SettledFaces const& faces, unsigned int const* valences, RefinedPoints const& refined)
     {
         RemainingWeights weights;
-        PointsInTime const points{
-            faces.halfEdges, refined.basePositions, refined.limitPositions, refined.levels, weights};
-        forEachSplitFace(faces, [&](unsigned int face) {
-            refined.basePositions[faces.newPoint(face)] =
-                points.center(faces.corners(face), stepOf(faces.states[face]));
+        PointsInTime const points{valences, refined.basePositions, refined.limitPositions, refined.levels, weights};
+        forEachSplitFace(faces, [&](unsigned int face, unsigned int newPoint) {
+            refined.basePositions[newPoint] = points.center(faces.corners(face), stepOf(faces.states[face]));
         });
 
         // Limit positions need the base positions of adjacent new points, so they take a second loop.
         float const weight = limitWeightOfNewPoint();
-        forEachSplitFace(faces, [&](unsigned int face) {
+        forEachSplitFace(faces, [&](unsigned int face, unsigned int newPoint) {
             unsigned int const* const c = faces.corners(face);
-            unsigned int const newPoint = faces.newPoint(face);
             refined.limitPositions[newPoint] = refined.basePositions[newPoint] * (1 - weight)
                 + sumOfFutureNeighbors(faces, points, face) * (weight / 6);
             unsigned int const newest = std::max({refined.levels[c[0]], refined.levels[c[1]], refined.levels[c[2]]});
             refined.levels[newPoint] = static_cast<unsigned char>(newest + 1);
+        });
+    }
+
+    void computePositions(unsigned int numPoints, unsigned int const* valences, unsigned char const* finestSteps,
+        Orvan::Array<float3> const& basePositions, Orvan::Array<float3> const& limitPositions,
+        Orvan::Array<unsigned char> const& vertexLevels, Orvan::Array<float3>& positions)
+    {
+        positions.resize(numPoints, Orvan::kUninitialized);
+        RemainingWeights weights;
+        PointsInTime const points{valences, basePositions.data, limitPositions.data, vertexLevels.data, weights};
+        float3* const position = positions.data;
+        // Each point writes its own entry.
+        parallelFor(tbb::blocked_range<unsigned int>(0, numPoints, kElementGrain), [&, position](auto const& range) {
+            for (unsigned int point = range.begin(); point != range.end(); ++point)
+                position[point] = points.at(point, finestSteps[point]);
         });
     }
 
@@ -226,7 +239,7 @@ namespace Internal {
         MODELING_ASSERT(vertexLevels.size >= numPoints);
         positions.resize(numPoints, Orvan::kUninitialized);
         RemainingWeights weights;
-        PointsInTime const points{halfEdges, basePositions.data, limitPositions.data, vertexLevels.data, weights};
+        PointsInTime const points{nullptr, basePositions.data, limitPositions.data, vertexLevels.data, weights};
         unsigned char const* const state = faceStates.data;
         float3* const position = positions.data;
         // Each point writes its own entry.
@@ -236,7 +249,7 @@ namespace Internal {
                     unsigned int finestStep = 0;
                     for (auto const& neighbor : halfEdges.neighbors(point))
                         finestStep = std::max(finestStep, stepOf(state[neighbor.halfEdge.face]));
-                    position[point] = points.at(point, finestStep);
+                    position[point] = points.after(point, halfEdges.valence(point), points.stepsAt(point, finestStep));
                 }
             });
     }
