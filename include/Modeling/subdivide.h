@@ -57,8 +57,8 @@ namespace Geometry::Mesh {
 ///                   have another length.
 ///
 /// Runs in parallel over faces and points, with the same result for any number of threads. Each pass is linear in its
-/// number of faces, so the run is linear in the size of the result if faces split evenly. Memory peaks at about 130
-/// bytes per face of the result, including the result itself.
+/// number of faces, so the run is linear in the size of the result if faces split evenly. Memory peaks at about 100
+/// bytes per face of the result, including the result itself, or 130 if the mesh is not a closed manifold.
 ///
 /// Method: Kobbelt, "√3-subdivision", 2000, with points evaluated at any step in closed form.
 MODELING_EXPORT bool subdivide(float tolerance, Tessara::Object& object);

@@ -57,8 +57,15 @@ namespace {
         }
     };
 
+    /// Whether three points are in the same bucket, as is usual if faces are stored in an order that follows the surface.
+    bool areTogether(Layout const& layout, unsigned int a, unsigned int b, unsigned int c)
+    {
+        return ((a ^ b) | (a ^ c)) >> layout.bucketBits == 0;
+    }
+
     /// Calls `visit(start, end, corner)` for the directed edges of a block of faces. `corner` is the corner at the end
-    /// of the edge; the calls are in ascending order of it.
+    /// of the edge; the calls are in ascending order of it. `visit.together(a, b, c, corner)` is called instead for all
+    /// edges of a triangle whose points are in the same bucket.
     template <class Visit>
     void forEachEdge(Faces const& faces, Layout const& layout, std::size_t block, Visit const& visit)
     {
@@ -69,6 +76,10 @@ namespace {
                 auto const corner = static_cast<unsigned int>(3 * face);
                 unsigned int const a = faces.faceVertex[corner], b = faces.faceVertex[corner + 1],
                                    c = faces.faceVertex[corner + 2];
+                if (areTogether(layout, a, b, c)) {
+                    visit.together(a, b, c, corner);
+                    continue;
+                }
                 visit(c, a, corner);
                 visit(a, b, corner + 1);
                 visit(b, c, corner + 2);
@@ -92,6 +103,50 @@ namespace {
         });
     }
 
+    /// Where a bucket goes on is known long before its next cache line is reached, but the processor cannot follow so many.
+    void prefetchNextLine(std::uint64_t const* place)
+    {
+        constexpr std::uintptr_t kLine = 64; // perhaps past the end of the array, so not by arithmetic of pointers
+        __builtin_prefetch(reinterpret_cast<void const*>(reinterpret_cast<std::uintptr_t>(place) + kLine), 1);
+    }
+
+    // Both count the edges of a triangle at once if they can. One by one, each would wait for the count of the one before.
+
+    struct CountEdges {
+        std::size_t* count; // per bucket
+        unsigned int bits;
+
+        void operator()(unsigned int, unsigned int end, unsigned int) const { ++count[end >> bits]; }
+        void together(unsigned int a, unsigned int, unsigned int, unsigned int) const { count[a >> bits] += 3; }
+    };
+
+    struct MoveEdges {
+        std::size_t* cursor; // per bucket
+        unsigned int bits;
+        std::uint64_t* entries;
+        std::uint16_t* pointInBucket;
+
+        void operator()(unsigned int start, unsigned int end, unsigned int corner) const
+        {
+            std::size_t const place = cursor[end >> bits]++;
+            prefetchNextLine(entries + place);
+            write(place, start, end, corner);
+        }
+        void together(unsigned int a, unsigned int b, unsigned int c, unsigned int corner) const
+        {
+            std::size_t const place = cursor[a >> bits];
+            cursor[a >> bits] = place + 3;
+            write(place, c, a, corner);
+            write(place + 1, a, b, corner + 1);
+            write(place + 2, b, c, corner + 2);
+        }
+        void write(std::size_t place, unsigned int start, unsigned int end, unsigned int corner) const
+        {
+            entries[place] = std::uint64_t{start} << 32 | corner;
+            pointInBucket[place] = static_cast<std::uint16_t>(end & ((1u << bits) - 1));
+        }
+    };
+
     /// One row per block: where it writes its first edge of each bucket. An additional last row holds where the buckets
     /// begin, and after that the number of edges.
     std::vector<std::size_t> findBlockStarts(Faces const& faces, Layout const& layout)
@@ -99,9 +154,7 @@ namespace {
         std::size_t const width = layout.bucketCount + 1;
         std::vector<std::size_t> starts((layout.blockCount + 1) * width);
         forEachBlock(layout, [&](std::size_t block) {
-            std::size_t* const count = starts.data() + block * width;
-            forEachEdge(faces, layout, block,
-                [=, bits = layout.bucketBits](unsigned int, unsigned int end, unsigned int) { ++count[end >> bits]; });
+            forEachEdge(faces, layout, block, CountEdges{starts.data() + block * width, layout.bucketBits});
         });
         std::size_t sum = 0;
         for (std::size_t bucket = 0; bucket != width; ++bucket) {
@@ -113,18 +166,28 @@ namespace {
     }
 
     /// Sorts the edges that end at one point.
-    void sortEdges(std::uint64_t* first, std::uint64_t* last)
+    /// \return whether two have the same start
+    bool sortEdges(std::uint64_t const* edges, std::size_t count, std::uint64_t* sorted)
     {
-        constexpr std::ptrdiff_t kFew = 32; // up to here, insertion sort is faster
-        if (last - first > kFew)
-            return std::sort(first, last);
-        for (std::uint64_t* next = first; next != last; ++next) {
-            std::uint64_t const entry = *next;
-            std::uint64_t* hole = next;
-            for (; hole != first && hole[-1] > entry; --hole)
-                *hole = hole[-1];
-            *hole = entry;
+        auto const startOf = [](std::uint64_t edge) { return edge >> 32 << 32; };
+        constexpr std::size_t kFew = 16; // up to here, comparing all with all is faster, as no branch is unpredictable
+        if (count <= kFew) {
+            std::size_t sumOfRanks = 0;
+            for (std::size_t edge = 0; edge != count; ++edge) {
+                std::size_t rank = 0;
+                for (std::size_t other = 0; other != count; ++other)
+                    rank += edges[other] < startOf(edges[edge]);
+                sorted[rank] = edges[edge];
+                sumOfRanks += rank;
+            }
+            if (2 * sumOfRanks == count * (count - 1)) // each pair counts, unless both have the same start
+                return false;
         }
+        std::copy_n(edges, count, sorted);
+        std::sort(sorted, sorted + count);
+        return std::adjacent_find(sorted, sorted + count, [=](std::uint64_t a, std::uint64_t b) {
+            return startOf(a) == startOf(b);
+        }) != sorted + count;
     }
 
     /// Sorts the edges of a bucket by the point at which they end, and in ascending order at each point.
@@ -144,17 +207,16 @@ namespace {
                 offset[point] = bucketStart + cursors_[point];
                 cursors_[point + 1] += cursors_[point];
             }
-            copy_.assign(entries, entries + edgeCount);
+            if (byPoint_.size() < edgeCount)
+                byPoint_.resize(edgeCount);
             for (std::size_t edge = 0; edge != edgeCount; ++edge)
-                entries[cursors_[pointOf[edge]]++] = copy_[edge];
+                byPoint_[cursors_[pointOf[edge]]++] = entries[edge];
 
             bool hasRepeats = false;
             std::size_t first = 0;
             for (std::size_t point = 0; point != pointCount; ++point) {
                 std::size_t const last = cursors_[point];
-                sortEdges(entries + first, entries + last);
-                for (std::size_t edge = first; edge + 1 < last; ++edge)
-                    hasRepeats |= entries[edge] >> 32 == entries[edge + 1] >> 32;
+                hasRepeats |= sortEdges(byPoint_.data() + first, last - first, entries + first);
                 first = last;
             }
             return hasRepeats;
@@ -162,7 +224,7 @@ namespace {
 
     private:
         std::vector<unsigned int> cursors_;
-        std::vector<std::uint64_t> copy_;
+        std::vector<std::uint64_t> byPoint_;
     };
 
     /// Lists the directed edges by the points at which they end, ascending.
@@ -182,13 +244,8 @@ namespace {
         std::uint64_t* const entry = entries.data;
         std::uint16_t* const pointInBucket = pointsInBuckets.data;
         forEachBlock(layout, [&](std::size_t block) {
-            std::size_t* const cursor = starts.data() + block * width;
-            unsigned int const bits = layout.bucketBits, mask = (1u << bits) - 1;
-            forEachEdge(faces, layout, block, [=](unsigned int start, unsigned int end, unsigned int corner) {
-                std::size_t const place = cursor[end >> bits]++;
-                entry[place] = std::uint64_t{start} << 32 | corner;
-                pointInBucket[place] = static_cast<std::uint16_t>(end & mask);
-            });
+            forEachEdge(faces, layout, block,
+                MoveEdges{starts.data() + block * width, layout.bucketBits, entry, pointInBucket});
         });
 
         std::atomic<bool> hasRepeats = false;

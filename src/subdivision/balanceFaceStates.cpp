@@ -24,16 +24,15 @@ namespace {
 
     /// The new state of a face, from its own state and those of its neighbors. Bits are only ever set, so the sweeps
     /// terminate.
-    unsigned char settledState(
-        unsigned char state, std::array<unsigned int, 3> const& across, unsigned char const* states)
+    unsigned char settledState(unsigned char state, Twins const& twins, unsigned char const* states)
     {
         unsigned int const level = levelOf(state);
         unsigned int marked = isMarked(state), split = isSplit(state);
         unsigned int lowestLevel = std::numeric_limits<unsigned int>::max(); // above any level
-        for (unsigned int const neighbor : across) {
-            if (neighbor == kInvalidIndex)
+        for (unsigned int const twin : twins) {
+            if (twin == kInvalidIndex)
                 continue;
-            unsigned char const other = states[neighbor];
+            unsigned char const other = states[faceOfTwin(twin)];
             unsigned int const otherLevel = levelOf(other);
             lowestLevel = std::min(lowestLevel, otherLevel);
             // A whole face takes over the marks of finer neighbors only; a third must flip together with the face at
@@ -49,12 +48,6 @@ namespace {
         return static_cast<unsigned char>(level << 2 | split << 1 | marked);
     }
 
-    std::array<unsigned int, 3> facesAcross(HalfEdgeDataStructure const& halfEdges, unsigned int const* c)
-    {
-        return {halfEdges.halfEdge(c[0], c[1]).face, halfEdges.halfEdge(c[1], c[2]).face,
-            halfEdges.halfEdge(c[2], c[0]).face};
-    }
-
     void announceCancelPlace()
     {
         TSR::Canceller::ID place{kCancelPlace};
@@ -67,19 +60,14 @@ namespace {
     public:
         /// \param areMutual  whether each face is a neighbor of its neighbors. If not, a face whose state changes
         ///                   cannot tell which faces read it, so each sweep visits all faces.
-        Balance(HalfEdgeDataStructure const& halfEdges, bool areMutual, unsigned int faceCount,
-            unsigned int const* faceVertex, unsigned int const* faceOffset, unsigned char* states)
-            : halfEdges_(halfEdges)
-            , faceVertex_(faceVertex)
-            , faceOffset_(faceOffset)
+        Balance(TwinTable& twins, bool areMutual, unsigned int faceCount, unsigned char* states)
+            : twins_(twins)
             , faceCount_(faceCount)
             , settled_(states)
             , isAlwaysDue_(!areMutual)
-            , current_(uninitializedArray<unsigned char>(faceCount))
-            , isDue_(filledArray<unsigned char>(faceCount, isAlwaysDue_))
-            , isDueNext_(filledArray<unsigned char>(faceCount, isAlwaysDue_))
-            , hasNeighbors_(zeroedArray<unsigned char>(faceCount))
-            , neighbors_(uninitializedArray<std::array<unsigned int, 3>>(faceCount))
+            , current_(uninitializedArray<unsigned char>(faceCount_))
+            , isDue_(filledArray<unsigned char>(faceCount_, isAlwaysDue_))
+            , isDueNext_(filledArray<unsigned char>(faceCount_, isAlwaysDue_))
         {
             copyElements(settled_, faceCount_, current_.data);
         }
@@ -114,16 +102,13 @@ namespace {
             return isChanged.load(std::memory_order_relaxed);
         }
 
-        /// What `takeNeighbors` promises.
-        [[maybe_unused]] bool knowsNeighborsOfSplitFaces() const
+        [[maybe_unused]] bool knowsTwinsOfSplitFaces() const
         {
             for (unsigned int face = 0; face != faceCount_; ++face)
-                if (isSplit(settled_[face]) && !hasNeighbors_[face])
+                if (isSplit(settled_[face]) && !twins_.knows(face))
                     return false;
             return true;
         }
-
-        FaceAdjacency takeNeighbors() { return std::move(neighbors_); }
 
     private:
         bool settleFaces(unsigned int first, unsigned int last)
@@ -133,8 +118,7 @@ namespace {
                 if (!isDue_[face])
                     continue;
                 isDue_[face] = isAlwaysDue_; // `isDue_` becomes `isDueNext_` of the next sweep
-                findNeighbors(face);
-                unsigned char const state = settledState(current_[face], neighbors_[face], current_.data);
+                unsigned char const state = settledState(current_[face], twins_.of(face), current_.data);
                 if (state == current_[face])
                     continue;
                 settled_[face] = state;
@@ -144,22 +128,13 @@ namespace {
             return isChanged;
         }
 
-        void findNeighbors(unsigned int face)
-        {
-            if (hasNeighbors_[face])
-                return;
-            hasNeighbors_[face] = true;
-            neighbors_[face] = facesAcross(halfEdges_, faceVertex_ + faceOffset_[face]);
-        }
-
         /// Makes a face and its neighbors due.
         void markDue(unsigned int face, unsigned char* isDue)
         {
-            findNeighbors(face);
             setFlag(isDue[face]);
-            for (unsigned int const neighbor : neighbors_[face])
-                if (neighbor != kInvalidIndex)
-                    setFlag(isDue[neighbor]);
+            for (unsigned int const twin : twins_.of(face))
+                if (twin != kInvalidIndex)
+                    setFlag(isDue[faceOfTwin(twin)]);
         }
 
         static void setFlag(unsigned char& isDue)
@@ -169,50 +144,28 @@ namespace {
                 flag.store(true, std::memory_order_relaxed);
         }
 
-        HalfEdgeDataStructure const& halfEdges_;
-        unsigned int const* faceVertex_;
-        unsigned int const* faceOffset_;
+        TwinTable& twins_;
         unsigned int faceCount_;
         unsigned char* settled_;
         bool isAlwaysDue_;
         Orvan::Array<unsigned char> current_; // of the previous sweep
         Orvan::Array<unsigned char> isDue_, isDueNext_; // faces to visit
-        Orvan::Array<unsigned char> hasNeighbors_;
-        FaceAdjacency neighbors_;
     };
-
-    /// True if all faces are triangles and no directed edge is repeated, as on closed manifolds; judged by the counts.
-    bool areNeighborsMutual(
-        HalfEdgeDataStructure const& halfEdges, unsigned int faceCount, Orvan::Array<unsigned int> const& faceOffset)
-    {
-        std::uint64_t const corners = std::uint64_t{3} * faceCount;
-        return faceOffset[faceCount] == corners && halfEdges.size() == corners;
-    }
-
-    bool isAnyRequested(Orvan::Array<unsigned char> const& states, unsigned int faceCount)
-    {
-        return std::any_of(states.data, states.data + faceCount, isRequested);
-    }
 
 }
 
-FaceAdjacency balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
-    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
-    Orvan::Array<unsigned char>& faceStates)
+void balanceFaceStates(TwinTable& twins, bool areMutual, unsigned int numFaces, unsigned char* faceStates)
 {
-    if (!isAnyRequested(faceStates, numFaces)) {
-        // Nothing to spread, but this loop is where a pass can be cancelled.
-        parallelFor(
-            tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [](auto const&) { announceCancelPlace(); },
-            false);
-        return {};
-    }
-    Balance balance(halfEdges, areNeighborsMutual(halfEdges, numFaces, faceOffset), numFaces, faceVertex.data,
-        faceOffset.data, faceStates.data);
+    Balance balance(twins, areMutual, numFaces, faceStates);
     balance.prepare();
     while (balance.sweep()) { }
-    MODELING_ASSERT(balance.knowsNeighborsOfSplitFaces());
-    return balance.takeNeighbors();
+    MODELING_ASSERT(balance.knowsTwinsOfSplitFaces());
+}
+
+void checkForCancellation(unsigned int numFaces)
+{
+    parallelFor(
+        tbb::blocked_range<unsigned int>(0, numFaces, kFaceGrain), [](auto const&) { announceCancelPlace(); }, false);
 }
 
 bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
@@ -222,10 +175,10 @@ bool isBalanced(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
     auto const largestDifference = [&](tbb::blocked_range<unsigned int> const& faces, unsigned int largest) {
         for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
             unsigned int const level = levelOf(faceStates[face]);
-            for (unsigned int const neighbor : facesAcross(halfEdges, faceVertex.data + faceOffset[face])) {
-                if (neighbor == kInvalidIndex)
+            for (unsigned int const twin : findTwins(halfEdges, faceVertex.data + faceOffset[face])) {
+                if (twin == kInvalidIndex)
                     continue;
-                unsigned int const other = levelOf(faceStates[neighbor]);
+                unsigned int const other = levelOf(faceStates[faceOfTwin(twin)]);
                 largest = std::max(largest, level < other ? other - level : level - other);
             }
         }

@@ -1,8 +1,7 @@
 #pragma once
 
-#include "frame/FaceAdjacency.h"
+#include "Twins.h"
 
-#include <Modeling/HalfEdgeDataStructure.h>
 #include <OrvanCore/Array.h>
 
 namespace Geometry::Mesh::Internal {
@@ -65,12 +64,12 @@ constexpr unsigned char stateOfLevel(unsigned int level)
 }
 
 /// Spreads requests until neighbors agree on which faces split in this pass. The only place that checks for
-/// cancellation: at the end of each sweep over the faces.
-/// \return the neighbors of all faces that split. Entries of other faces may be uninitialized, and the array is empty
-///         if no face is requested.
+/// cancellation: at the end of each sweep over the faces. Asks for the twins of all faces that split.
+/// \param areMutual  whether each face is a neighbor of its neighbors
 /// \throws std::runtime_error  if the job is cancelled; `faceStates` may then be partly balanced
-Modeling::FaceAdjacency balanceFaceStates(HalfEdgeDataStructure const& halfEdges, unsigned int numFaces,
-    Orvan::Array<unsigned int> const& faceVertex, Orvan::Array<unsigned int> const& faceOffset,
-    Orvan::Array<unsigned char>& faceStates);
+void balanceFaceStates(TwinTable& twins, bool areMutual, unsigned int numFaces, unsigned char* faceStates);
+
+/// The check for cancellation of a pass in which no face is requested.
+void checkForCancellation(unsigned int numFaces);
 
 }

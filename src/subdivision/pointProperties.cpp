@@ -80,14 +80,13 @@ namespace {
         values.resize(numPoints, Orvan::kUninitialized);
         T* const value = values.data;
         // Each face reads values of old points and writes that of its own new point.
-        parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [&, value](auto const& range) {
-            for (unsigned int face = range.begin(); face != range.end(); ++face) {
-                if (!isSplitAroundPoint(faces.states[face]))
-                    continue;
-                unsigned int const* const c = faces.corners(face);
-                value[faces.newPoint(face)] = meanOf(value[c[0]], value[c[1]], value[c[2]]);
-            }
-        });
+        parallelFor(
+            tbb::blocked_range<unsigned int>(0, faces.newPointCount(), kFaceGrain), [&, value](auto const& ranks) {
+                for (unsigned int rank = ranks.begin(); rank != ranks.end(); ++rank) {
+                    unsigned int const* const c = faces.corners(faces.splitFaces[rank]);
+                    value[faces.pointCount + rank] = meanOf(value[c[0]], value[c[1]], value[c[2]]);
+                }
+            });
     }
 
     /// \return false if the property has another type

@@ -7,6 +7,8 @@
 #include "frame/VectorMath.h"
 
 #include <algorithm>
+#include <array>
+#include <atomic>
 #include <cmath>
 
 namespace Geometry::Mesh {
@@ -51,19 +53,61 @@ namespace Internal {
             return std::pow(lambda, static_cast<float>(steps));
         }
 
+        /// Values that are computed when they are first needed, because cosines and powers take longer than everything
+        /// else at a point. Threads share a table: all of them would store the same bits.
+        template <std::size_t kSize> class LazyTable {
+        public:
+            LazyTable()
+            {
+                for (std::atomic<float>& value : values_)
+                    value.store(kUnknown, std::memory_order_relaxed);
+            }
+
+            template <class Compute> float at(std::size_t index, Compute const& compute)
+            {
+                float value = values_[index].load(std::memory_order_relaxed);
+                if (value == kUnknown) {
+                    value = compute();
+                    values_[index].store(value, std::memory_order_relaxed);
+                }
+                return value;
+            }
+
+        private:
+            static constexpr float kUnknown = 2; // no weight exceeds 1
+            std::array<std::atomic<float>, kSize> values_;
+        };
+
+        /// `remainingWeight`, from a table for usual valences.
+        class RemainingWeights {
+        public:
+            float at(std::uint64_t valence, unsigned int steps)
+            {
+                if (valence >= kValences || steps >= kSteps)
+                    return remainingWeight(valence, steps);
+                return table_.at(valence * kSteps + steps, [=] { return remainingWeight(valence, steps); });
+            }
+
+        private:
+            static constexpr std::size_t kValences = 16, kSteps = 32;
+            LazyTable<kValences * kSteps> table_;
+        };
+
         /// Points at any step, from their base and limit positions.
         struct PointsInTime {
-            HalfEdgeDataStructure const& halfEdges;
+            unsigned int const* valences; // null if they are passed
             float3 const* basePositions;
             float3 const* limitPositions;
             unsigned char const* levels;
+            RemainingWeights& weights;
 
             /// The position a number of steps after the point was created.
-            float3 after(unsigned int point, unsigned int steps) const
+            float3 after(unsigned int point, std::uint64_t valence, unsigned int steps) const
             {
-                float const weight = remainingWeight(halfEdges.valence(point), steps);
+                float const weight = weights.at(valence, steps);
                 return limitPositions[point] * (1 - weight) + basePositions[point] * weight;
             }
+            float3 after(unsigned int point, unsigned int steps) const { return after(point, valences[point], steps); }
             /// Unsigned, so that it wraps around: see `remainingWeight`.
             unsigned int stepsAt(unsigned int point, unsigned int step) const { return step - levels[point]; }
             float3 at(unsigned int point, unsigned int step) const { return after(point, stepsAt(point, step)); }
@@ -91,9 +135,10 @@ namespace Internal {
             for (unsigned int k = 0; k != 3; ++k) {
                 unsigned int const point = faces.corners(face)[k];
                 sum = sum + points.after(point, points.stepsAt(point, step) + 1);
-                unsigned int const across = faces.neighbors[face][k];
-                if (across == kInvalidIndex)
+                unsigned int const twin = faces.twins[face][k];
+                if (twin == kInvalidIndex)
                     continue;
+                unsigned int const across = faceOfTwin(twin);
                 if (isThird(faces.states[across]))
                     sum = sum + points.at(faces.pointAcross(face, k), step);
                 else if (splitsAtStep(faces.states[across], step))
@@ -112,36 +157,49 @@ namespace Internal {
             return limitWeight(std::cos(sector));
         }
 
-        /// Calls `work(face)` for the faces that get a new point.
+        /// Calls `work(face, newPoint)` for the faces that get a new point.
         template <class Work> void forEachSplitFace(SettledFaces const& faces, Work const& work)
         {
             // Each face writes the entries of its own new point.
-            parallelFor(tbb::blocked_range<unsigned int>(0, faces.count, kFaceGrain), [&](auto const& range) {
-                for (unsigned int face = range.begin(); face != range.end(); ++face)
-                    if (isSplitAroundPoint(faces.states[face]))
-                        work(face);
+            parallelFor(tbb::blocked_range<unsigned int>(0, faces.newPointCount(), kFaceGrain), [&](auto const& ranks) {
+                for (unsigned int rank = ranks.begin(); rank != ranks.end(); ++rank)
+                    work(faces.splitFaces[rank], faces.pointCount + rank);
             });
         }
 
     }
 
-    void computeNewPoints(SettledFaces const& faces, RefinedPoints const& refined)
+    void computeNewPoints(SettledFaces const& faces, unsigned int const* valences, RefinedPoints const& refined)
     {
-        PointsInTime const points{faces.halfEdges, refined.basePositions, refined.limitPositions, refined.levels};
-        forEachSplitFace(faces, [&](unsigned int face) {
-            refined.basePositions[faces.newPoint(face)] =
-                points.center(faces.corners(face), stepOf(faces.states[face]));
+        RemainingWeights weights;
+        PointsInTime const points{valences, refined.basePositions, refined.limitPositions, refined.levels, weights};
+        forEachSplitFace(faces, [&](unsigned int face, unsigned int newPoint) {
+            refined.basePositions[newPoint] = points.center(faces.corners(face), stepOf(faces.states[face]));
         });
 
         // Limit positions need the base positions of adjacent new points, so they take a second loop.
         float const weight = limitWeightOfNewPoint();
-        forEachSplitFace(faces, [&](unsigned int face) {
+        forEachSplitFace(faces, [&](unsigned int face, unsigned int newPoint) {
             unsigned int const* const c = faces.corners(face);
-            unsigned int const newPoint = faces.newPoint(face);
             refined.limitPositions[newPoint] = refined.basePositions[newPoint] * (1 - weight)
                 + sumOfFutureNeighbors(faces, points, face) * (weight / 6);
             unsigned int const newest = std::max({refined.levels[c[0]], refined.levels[c[1]], refined.levels[c[2]]});
             refined.levels[newPoint] = static_cast<unsigned char>(newest + 1);
+        });
+    }
+
+    void computePositions(unsigned int numPoints, unsigned int const* valences, unsigned char const* finestSteps,
+        Orvan::Array<float3> const& basePositions, Orvan::Array<float3> const& limitPositions,
+        Orvan::Array<unsigned char> const& vertexLevels, Orvan::Array<float3>& positions)
+    {
+        positions.resize(numPoints, Orvan::kUninitialized);
+        RemainingWeights weights;
+        PointsInTime const points{valences, basePositions.data, limitPositions.data, vertexLevels.data, weights};
+        float3* const position = positions.data;
+        // Each point writes its own entry.
+        parallelFor(tbb::blocked_range<unsigned int>(0, numPoints, kElementGrain), [&, position](auto const& range) {
+            for (unsigned int point = range.begin(); point != range.end(); ++point)
+                position[point] = points.at(point, finestSteps[point]);
         });
     }
 
@@ -152,6 +210,12 @@ namespace Internal {
         limitPositions.resize(numPoints, Orvan::kUninitialized);
         float3 const* const position = positions.data;
         float3* const limit = limitPositions.data;
+        constexpr std::size_t kValences = 32;
+        LazyTable<kValences> weights;
+        auto const weightOf = [&](std::uint64_t valence) {
+            auto const compute = [=] { return limitWeight(cosineOfSector(static_cast<float>(valence))); };
+            return valence < kValences ? weights.at(valence, compute) : compute();
+        };
         // Each point writes its own entry.
         parallelFor(
             tbb::blocked_range<unsigned int>(0, numPoints, kOneRingGrain), [&, position, limit](auto const& range) {
@@ -159,9 +223,9 @@ namespace Internal {
                     float3 sum{0, 0, 0};
                     for (auto const& neighbor : halfEdges.neighbors(point))
                         sum = sum + position[neighbor.point];
-                    auto const valence = static_cast<float>(halfEdges.valence(point));
-                    float const weight = limitWeight(cosineOfSector(valence));
-                    limit[point] = position[point] * (1 - weight) + sum * (weight / valence);
+                    std::uint64_t const valence = halfEdges.valence(point);
+                    float const weight = weightOf(valence);
+                    limit[point] = position[point] * (1 - weight) + sum * (weight / static_cast<float>(valence));
                 }
             });
     }
@@ -174,7 +238,8 @@ namespace Internal {
         MODELING_ASSERT(basePositions.size >= numPoints && limitPositions.size >= numPoints);
         MODELING_ASSERT(vertexLevels.size >= numPoints);
         positions.resize(numPoints, Orvan::kUninitialized);
-        PointsInTime const points{halfEdges, basePositions.data, limitPositions.data, vertexLevels.data};
+        RemainingWeights weights;
+        PointsInTime const points{nullptr, basePositions.data, limitPositions.data, vertexLevels.data, weights};
         unsigned char const* const state = faceStates.data;
         float3* const position = positions.data;
         // Each point writes its own entry.
@@ -184,7 +249,7 @@ namespace Internal {
                     unsigned int finestStep = 0;
                     for (auto const& neighbor : halfEdges.neighbors(point))
                         finestStep = std::max(finestStep, stepOf(state[neighbor.halfEdge.face]));
-                    position[point] = points.at(point, finestStep);
+                    position[point] = points.after(point, halfEdges.valence(point), points.stepsAt(point, finestStep));
                 }
             });
     }

@@ -14,6 +14,12 @@ struct RefinedPoints {
 };
 
 /// Fills the entries of the new points.
-void computeNewPoints(SettledFaces const& faces, RefinedPoints const& points);
+/// \param valences  of the points before the pass
+void computeNewPoints(SettledFaces const& faces, unsigned int const* valences, RefinedPoints const& points);
+
+/// `computePositions` of subdivisionSteps.h for valences and steps that are known.
+void computePositions(unsigned int numPoints, unsigned int const* valences, unsigned char const* finestSteps,
+    Orvan::Array<Tessara::Math::float3> const& basePositions, Orvan::Array<Tessara::Math::float3> const& limitPositions,
+    Orvan::Array<unsigned char> const& vertexLevels, Orvan::Array<Tessara::Math::float3>& positions);
 
 }

@@ -1,6 +1,8 @@
 #include "refineMesh.h"
 
 #include "pointProperties.h"
+#include "positionRules.h"
+#include "refineTopology.h"
 
 #include "frame/Arrays.h"
 #include "frame/Assert.h"
@@ -57,50 +59,80 @@ namespace {
         mesh.faceStates = zeroedArray<unsigned char>(mesh.numFaces);
     }
 
-    void refineFaces(
-        MarkFaces const& markFaces, HalfEdgeDataStructure const& halfEdges, RefinedMesh& mesh, Tessara::Object& object)
+    /// What is known of how faces are connected: the adjacency that follows from the pass before or, if the mesh allows
+    /// none, half-edges, which are found anew.
+    struct Connections {
+        std::optional<ClosedAdjacency> adjacency;
+        std::optional<HalfEdgeDataStructure> halfEdges;
+    };
+
+    Connections findConnections(RefinedMesh const& mesh)
+    {
+        Connections connections;
+        connections.halfEdges.emplace(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
+        if (isTriangleMesh(mesh.numFaces, mesh.faceOffset))
+            connections.adjacency = findClosedAdjacency(
+                *connections.halfEdges, {mesh.faceVertex.data, mesh.faceOffset, mesh.numFaces}, mesh.numPoints);
+        return connections;
+    }
+
+    void refineFaces(MarkFaces const& markFaces, Connections& connections, RefinedMesh& mesh, Tessara::Object& object)
     {
         Orvan::Array<bool> marks = zeroedArray<bool>(mesh.numFaces);
         markFaces({mesh.numFaces, mesh.positions, mesh.faceVertex, mesh.faceOffset}, marks);
-        subdivide(marks, halfEdges, mesh.numPoints, mesh.numFaceVertices, mesh.numFaces, mesh.basePositions,
-            mesh.limitPositions, mesh.vertexLevels, mesh.faceVertex, mesh.faceOffset, mesh.faceStates, object);
+        if (connections.adjacency)
+            subdivide(marks, *connections.adjacency,
+                {mesh.numPoints, mesh.numFaceVertices, mesh.numFaces, mesh.basePositions, mesh.limitPositions,
+                    mesh.vertexLevels, mesh.faceVertex, mesh.faceOffset, mesh.faceStates},
+                object);
+        else
+            subdivide(marks, *connections.halfEdges, mesh.numPoints, mesh.numFaceVertices, mesh.numFaces,
+                mesh.basePositions, mesh.limitPositions, mesh.vertexLevels, mesh.faceVertex, mesh.faceOffset,
+                mesh.faceStates, object);
     }
 
-    void rebuild(HalfEdgeDataStructure& halfEdges, RefinedMesh& mesh)
+    void placePoints(Connections const& connections, RefinedMesh& mesh)
     {
-        // First release what is no longer needed: a third of the memory in use.
-        halfEdges.clear();
-        mesh.positions = {};
-        HalfEdgeDataStructure rebuilt(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
-        halfEdges.swap(rebuilt);
+        if (auto const& adjacency = connections.adjacency)
+            computePositions(mesh.numPoints, adjacency->valences.data, adjacency->finestSteps.data, mesh.basePositions,
+                mesh.limitPositions, mesh.vertexLevels, mesh.positions);
+        else
+            computePositions(*connections.halfEdges, mesh.numPoints, mesh.basePositions, mesh.limitPositions,
+                mesh.vertexLevels, mesh.faceStates, mesh.positions);
     }
 
     /// What each pass preserves if no two faces have the same directed edge.
-    [[maybe_unused]] bool isClosedAndBalanced(HalfEdgeDataStructure const& halfEdges, RefinedMesh const& mesh)
+    [[maybe_unused]] bool isClosedAndBalanced(RefinedMesh const& mesh)
     {
+        HalfEdgeDataStructure const halfEdges(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
         return !halfEdges.hasBoundary(mesh.numFaces, mesh.faceVertex, mesh.faceOffset)
             && isBalanced(halfEdges, mesh.numFaces, mesh.faceVertex, mesh.faceOffset, mesh.faceStates);
     }
 
     /// Runs passes until the number of faces no longer changes.
-    void runPasses(
-        MarkFaces const& markFaces, HalfEdgeDataStructure& halfEdges, RefinedMesh& mesh, Tessara::Object& object)
+    void runPasses(MarkFaces const& markFaces, Connections& connections, RefinedMesh& mesh, Tessara::Object& object)
     {
         bool hasMore = mesh.numFaces != 0;
-        [[maybe_unused]] bool const isClosed = halfEdges.size() == std::uint64_t{3} * mesh.numFaces;
+        [[maybe_unused]] bool const isClosed = connections.halfEdges->size() == std::uint64_t{3} * mesh.numFaces;
+        if (connections.adjacency)
+            connections.halfEdges.reset();
         for (bool isFirst = true; hasMore; isFirst = false) {
             unsigned int const facesBefore = mesh.numFaces, pointsBefore = mesh.numPoints;
-            refineFaces(markFaces, halfEdges, mesh, object);
+            refineFaces(markFaces, connections, mesh, object);
             hasMore = mesh.numFaces != facesBefore;
             // The counts are the same: no face has split, and nothing has changed since the pass before.
             bool const isUnchanged = !hasMore && mesh.numPoints == pointsBefore;
-            if (!isUnchanged)
-                rebuild(halfEdges, mesh);
-            MODELING_ASSERT(!isClosed || isClosedAndBalanced(halfEdges, mesh));
+            if (!isUnchanged) {
+                // First release what is no longer needed.
+                mesh.positions = {};
+                connections.halfEdges.reset();
+                if (!connections.adjacency)
+                    connections.halfEdges.emplace(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
+            }
+            MODELING_ASSERT(!isClosed || isClosedAndBalanced(mesh));
             // Also if the first pass splits nothing: points without a face become NaN in all cases.
             if (!isUnchanged || isFirst)
-                computePositions(halfEdges, mesh.numPoints, mesh.basePositions, mesh.limitPositions, mesh.vertexLevels,
-                    mesh.faceStates, mesh.positions);
+                placePoints(connections, mesh);
         }
     }
 
@@ -126,12 +158,13 @@ bool refineMesh(MarkFaces const& markFaces, Tessara::Object& object)
     MODELING_ASSERT(mesh->positions.size >= mesh->numPoints && mesh->faceOffset.size > mesh->numFaces);
     MODELING_ASSERT(areOffsets(mesh->faceOffset.data, mesh->numFaces, mesh->faceVertex.size));
     MODELING_ASSERT(areBelow(mesh->numPoints, mesh->faceVertex.data, mesh->faceVertex.size));
-    HalfEdgeDataStructure halfEdges(mesh->numPoints, mesh->numFaces, mesh->faceVertex, mesh->faceOffset);
-    if (halfEdges.hasBoundary(mesh->numFaces, mesh->faceVertex, mesh->faceOffset))
+    Connections connections = findConnections(*mesh);
+    if (!connections.adjacency
+        && connections.halfEdges->hasBoundary(mesh->numFaces, mesh->faceVertex, mesh->faceOffset))
         return false;
 
-    startAtLevelZero(halfEdges, *mesh);
-    runPasses(markFaces, halfEdges, *mesh, object);
+    startAtLevelZero(*connections.halfEdges, *mesh);
+    runPasses(markFaces, connections, *mesh, object);
     writeMesh(std::move(*mesh), object);
     return true;
 }

@@ -165,6 +165,42 @@ TEST(Subdivide, StaysBalancedForAnyMarks)
     }
 }
 
+TEST(Subdivide, FollowsTheAdjacencyThatTheStepsFindAnew)
+{
+    auto meshes = closedMeshes();
+    std::vector<float3> const corners{{0, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0, 1}, {-1, 0, 0}, {0, -1, 0}, {0, 0, -1}};
+    MeshBuilder const tetrahedron = MeshBuilder::tetrahedron();
+    auto const add = [&](char const* name, std::vector<std::array<unsigned int, 3>> const& faces) {
+        meshes[name] = {MeshBuilder::of(corners, faces).joinedWith(tetrahedron, {3, 0, 0}), 0, 0};
+    };
+    add("tetrahedra with a common point",
+        {{0, 1, 2}, {0, 2, 3}, {0, 3, 1}, {3, 2, 1}, {0, 4, 5}, {0, 5, 6}, {0, 6, 4}, {6, 5, 4}});
+    add("two faces share three edges", {{0, 1, 2}, {2, 1, 0}});
+    add("a point twice in a face", {{0, 0, 1}, {1, 0, 2}, {2, 0, 1}});
+    add("repeated edges", {{0, 1, 2}, {2, 1, 0}, {0, 1, 3}, {3, 1, 0}});
+    add("tetrahedra back to back",
+        {{0, 1, 2}, {0, 2, 3}, {0, 3, 1}, {3, 2, 1}, {2, 1, 0}, {3, 2, 0}, {1, 3, 0}, {1, 2, 3}});
+    for (auto const& [name, closed] : meshes)
+        for (unsigned int const oneOf : {1u, 3u, 20u}) {
+            unsigned int pass = 0;
+            auto const mark = [&](Orvan::Array<bool>& marks) {
+                Random random(++pass);
+                for (std::uint64_t face = 0; face != marks.size && pass < (oneOf == 1 ? 5 : 9); ++face)
+                    marks[face] = random.below(oneOf) == 0;
+            };
+            auto const mesh = meshOf(closed.builder);
+            ASSERT_TRUE(Steps::refineMesh([&](auto const&, auto& marks) { mark(marks); }, *mesh)) << name;
+            unsigned int const passCount = std::exchange(pass, 0);
+            Passes steps(closed.builder);
+            while (pass != passCount) {
+                Orvan::Array<bool> marks(steps.numFaces);
+                mark(marks);
+                steps.pass(marks);
+            }
+            EXPECT_EQ(fingerprintOf(*mesh, *mesh), steps.fingerprint()) << name << ", one of " << oneOf;
+        }
+}
+
 TEST(Subdivide, RelaxesStepByStepOnUniformMeshes)
 {
     // By symmetry, a corner of a solid moves along its own direction: to this fraction of its distance from the center
