@@ -61,7 +61,7 @@ void fillHalo(LinearSamplerState<Traits>& state, TileOf<Traits> const& tile, Pos
     } else {
         fill(nullptr, {});
     }
-    if constexpr (!LinearSamplerState<Traits>::kReadsInPlace)
+    if constexpr (!HasAddress<decltype(halo.voxels)>)
         if (state.channel->tileData(tile.treeIndex()))
             halo.copyVoxels();
 }

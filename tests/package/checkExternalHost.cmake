@@ -24,7 +24,7 @@ run(${CMAKE_COMMAND} -S ${SOURCE_DIR}/tests/host/conformance -B ${folder}/confor
     "-DCMAKE_PREFIX_PATH=${folder}/host;${folder}/modeling" -DCMAKE_UNITY_BUILD=ON
     -DHOST_FIXTURE=${SOURCE_DIR}/tests/host/conformance/standinFixture.cpp)
 run(${CMAKE_COMMAND} --build ${folder}/conformance)
-run(${CMAKE_CTEST_COMMAND} --test-dir ${folder}/conformance --no-tests=error -E "^$")
+run(${CMAKE_CTEST_COMMAND} --test-dir ${folder}/conformance --no-tests=error)
 if(NOT output MATCHES "OperationsByVolume" OR output MATCHES "Skipped")
     message(FATAL_ERROR "the conformance tests said: ${output}")
 endif()

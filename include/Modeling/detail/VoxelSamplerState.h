@@ -67,6 +67,8 @@ concept HasAddress = requires(Voxels const& voxels)
         } -> std::convertible_to<float const*>;
 };
 
+template <class... Voxels> inline constexpr bool kHaveAddresses = (HasAddress<Voxels> && ...);
+
 /// Where the values of a cube of voxels are. A host whose views tell where they are is read in place; of other hosts,
 /// which only give single values, it is a copy.
 template <int side, bool isInPlace = HasAddress<ConstTileData<float, side, 0>>> class VoxelValues {
@@ -95,9 +97,11 @@ template <class Traits, bool isInPlace = HasAddress<TileData<float, TileLayout<T
 struct PositiveHalo {
     static constexpr int kSide = TileLayout<Traits>::kSide + 1;
 
-    TileData<float, kSide, 0> voxels;
+    PositiveHalo() noexcept { } // leaves the storage uninitialized
 
     float const* values() const noexcept { return voxels.values(); }
+
+    TileData<float, kSide, 0> voxels;
 };
 
 template <class Traits> struct PositiveHalo<Traits, false> {
@@ -163,10 +167,9 @@ template <class Traits> struct LinearSamplerState {
         [[no_unique_address]] VoxelValues<kSide + 1> padded;
     };
 
-    /// Whether pointers to values of many tiles remain valid.
-    static constexpr bool kReadsInPlace =
-        HasAddress<ConstTileData<float, kSide,
-            0>> && HasAddress<ConstTileData<float, kSide + 1, 0>> && HasAddress<TileData<float, kSide + 1, 0>>;
+    /// Whether pointers to the values of many tiles can be kept.
+    static constexpr bool kReadsInPlace = kHaveAddresses<ConstTileData<float, kSide, 0>,
+        ConstTileData<float, kSide + 1, 0>, TileData<float, kSide + 1, 0>>;
 
     bool hasPositiveHalos() const noexcept { return offsetType == kAllAxes; }
 
