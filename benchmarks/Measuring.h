@@ -3,6 +3,7 @@
 #include "support/AllocationHooks.h"
 
 #include <OrvanCore/Array.h>
+#include <OrvanCore/CachedBlocks.h>
 #include <TessaraObject/Object.h>
 
 #include <benchmark/benchmark.h>
@@ -19,7 +20,16 @@ namespace Benchmarks {
 
 using benchmark::DoNotOptimize;
 using Tessara::Object;
-using TestSupport::memoryOf;
+
+/// What work allocates; blocks that the allocator keeps are part of the peak only.
+template <class Work> TestSupport::Memory memoryOf(Work const& work)
+{
+    Orvan::releaseCachedBlocks();
+    return TestSupport::memoryOf([&] {
+        work();
+        Orvan::releaseCachedBlocks();
+    });
+}
 
 /// The arguments of each run of a row; most rows have one, the number of elements.
 using Sizes = std::vector<std::vector<std::int64_t>>;
@@ -91,7 +101,7 @@ template <class Edit> void measureEdit(Run& run, std::size_t elements, Object co
 {
     timeOnCopies(run, elements, source, edit);
     Object object = source;
-    TestSupport::Memory const memory = memoryOf([&] { edit(object); });
+    auto const memory = memoryOf([&] { edit(object); });
     run.reportWorkingBytes(elements, memory.peak - memory.kept);
 }
 

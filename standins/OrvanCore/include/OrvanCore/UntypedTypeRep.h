@@ -19,7 +19,7 @@ struct ORVANCORE_EXPORT UntypedTypeRep {
     /// \throws std::bad_alloc  also if the byte count exceeds PTRDIFF_MAX
     void* allocate(std::uint64_t count) const;
 
-    /// Frees what `allocate` returned for the same count. Does nothing for null.
+    /// Frees what `allocate` returned for the same count, or keeps it (CachedBlocks.h). Does nothing for null.
     void deallocate(void* pointer, std::uint64_t count) const noexcept;
 
     template <class T> static constexpr UntypedTypeRep of() noexcept
