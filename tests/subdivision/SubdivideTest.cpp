@@ -7,6 +7,11 @@
 #include <Modeling/subdivisionSteps.h>
 #include <OrvanCppOpSDK/Job.h>
 
+#include <tbb/task_group.h>
+
+#include <chrono>
+#include <thread>
+
 using namespace Modeling;
 using namespace Tessara::Math;
 using namespace TestSupport;
@@ -386,4 +391,26 @@ TEST(Subdivide, CanBeCancelledInEveryPass)
         ++last;
     EXPECT_GT(last, 3);
     EXPECT_EQ(last, pass) << "in each pass, even if nothing splits";
+}
+
+TEST(Subdivide, LeavesAClosedMeshIfAnEnclosingGroupIsCancelled)
+{
+    auto const builder = MeshBuilder::sphere(12).graded();
+    for (unsigned int delay = 0; delay != 12; ++delay) { // mostly in the middle of a pass
+        auto const mesh = meshOf(builder);
+        tbb::task_group_context context;
+        tbb::task_group group(context);
+        std::jthread canceller;
+        unsigned int pass = 0;
+        auto const mark = [&](Steps::MarkableMesh const& m, Orvan::Array<bool>& marks) {
+            Steps::markForSubdivision(0.02f, m.faceCount, m.positions, m.faceVertex, m.faceOffset, marks);
+            if (pass++ == 2)
+                canceller = std::jthread([&context, delay] {
+                    std::this_thread::sleep_for(std::chrono::microseconds(10 * delay));
+                    context.cancel_group_execution();
+                });
+        };
+        group.run_and_wait([&] { EXPECT_TRUE(Steps::refineMesh(mark, *mesh)); });
+        EXPECT_TRUE(isClosedManifold(*mesh)) << delay;
+    }
 }
