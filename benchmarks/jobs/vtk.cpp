@@ -28,7 +28,8 @@ int main(int argc, char** argv)
     merge->AddInputConnection(reader->GetOutputPort());
     merge->AddInputConnection(second->GetOutputPort());
     vtkNew<vtkPLYWriter> writer;
-    writer->SetInputConnection(argv[1] == std::string_view(kMerge) ? merge->GetOutputPort() : triangulate->GetOutputPort());
+    writer->SetInputConnection(
+        argv[1] == std::string_view(kMerge) ? merge->GetOutputPort() : triangulate->GetOutputPort());
     writer->SetFileName(argv[3]);
     writer->SetFileTypeToBinary();
     return writer->Write() != 0 ? 0 : 1;
