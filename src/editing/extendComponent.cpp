@@ -75,7 +75,7 @@ namespace {
             if (kTrivial || target_)
                 fillElements(values() + source_->size, count, value);
             else
-                added_ = Orvan::Array<T>(count, value);
+                added_ = filledArray(count, value);
         }
 
         /// Sets elements, in a copy or behind the end of the source.
