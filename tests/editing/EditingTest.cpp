@@ -10,6 +10,8 @@
 
 #include <TessaraGeometry/Validators.h>
 
+#include <tbb/global_control.h>
+
 #include <numeric>
 
 using namespace Tessara::GeometryAlgorithms;
@@ -420,6 +422,8 @@ TEST(Editing, CompactsInPlaceEvenIfLoopsFail)
     using namespace Modeling::Internal;
     Random random(12);
     constexpr std::size_t kCount = 1'000'000;
+    // Threads of oneTBB that begin to work while there is no memory end the process.
+    tbb::global_control const alone(tbb::global_control::max_allowed_parallelism, 1);
     for (Flags const& deleted : deletionPatterns(kCount, random)) {
         KeptElements const kept(deleted);
         IndexList values(kCount, Orvan::kUninitialized), expected;

@@ -21,7 +21,7 @@ endif()
 run_consumer(${folder}/consumer ${folder}/host/lib ${folder}/modeling ${folder}/host)
 
 run(${CMAKE_COMMAND} -S ${SOURCE_DIR}/tests/host/conformance -B ${folder}/conformance ${flags} -DCMAKE_CXX_FLAGS_RELEASE=-O0
-    "-DCMAKE_PREFIX_PATH=${folder}/host;${folder}/modeling" -DCMAKE_UNITY_BUILD=ON
+    -DCMAKE_PREFIX_PATH=${folder}/host -DModeling_ROOT=${folder}/modeling -DCMAKE_UNITY_BUILD=ON
     -DHOST_FIXTURE=${SOURCE_DIR}/tests/host/conformance/standinFixture.cpp)
 run(${CMAKE_COMMAND} --build ${folder}/conformance)
 run(${CMAKE_CTEST_COMMAND} --test-dir ${folder}/conformance --no-tests=error)
