@@ -101,7 +101,7 @@ namespace {
                 mesh.vertexLevels, mesh.faceStates, mesh.positions);
     }
 
-    /// What each pass preserves if no two faces have the same directed edge.
+    /// What each pass preserves if the adjacency is known.
     [[maybe_unused]] bool isClosedAndBalanced(RefinedMesh const& mesh)
     {
         HalfEdgeDataStructure const halfEdges(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
@@ -113,7 +113,6 @@ namespace {
     void runPasses(MarkFaces const& markFaces, Connections& connections, RefinedMesh& mesh, Tessara::Object& object)
     {
         bool hasMore = mesh.numFaces != 0;
-        [[maybe_unused]] bool const isClosed = connections.halfEdges->size() == std::uint64_t{3} * mesh.numFaces;
         if (connections.adjacency)
             connections.halfEdges.reset();
         for (bool isFirst = true; hasMore; isFirst = false) {
@@ -129,7 +128,7 @@ namespace {
                 if (!connections.adjacency)
                     connections.halfEdges.emplace(mesh.numPoints, mesh.numFaces, mesh.faceVertex, mesh.faceOffset);
             }
-            MODELING_ASSERT(!isClosed || isClosedAndBalanced(mesh));
+            MODELING_ASSERT(!connections.adjacency || isClosedAndBalanced(mesh));
             // Also if the first pass splits nothing: points without a face become NaN in all cases.
             if (!isUnchanged || isFirst)
                 placePoints(connections, mesh);
