@@ -80,6 +80,16 @@ void* operator new(std::size_t bytes, std::align_val_t alignment)
     return TestSupport::allocateBlock(bytes, static_cast<std::size_t>(alignment));
 }
 
+// The allocator of arrays asks this way. A sanitizer has one of its own, whose blocks `std::free` does not take.
+void* operator new(std::size_t bytes, std::align_val_t alignment, std::nothrow_t const&) noexcept
+{
+    try {
+        return operator new(bytes, alignment);
+    } catch (std::bad_alloc const&) {
+        return nullptr;
+    }
+}
+
 void operator delete(void* block) noexcept
 {
     TestSupport::freeBlock(block);
