@@ -116,9 +116,9 @@ void numberElements(std::string const& attribute, int number, std::string const&
         attribute.c_str(), component, Orvan::Array<int>(getElementCount(object, component), number), object);
 }
 
-GeoValidator::Status validate(Object const& object)
+GeoValidator::Status validateAs(GeometryType type, Object const& object)
 {
-    switch (typeOf(object)) {
+    switch (type) {
     case GeometryType::Mesh:
         return validateMesh(object);
     case GeometryType::PointCloud:
@@ -129,6 +129,11 @@ GeoValidator::Status validate(Object const& object)
         break;
     }
     return GeoValidator::Status("it lacks the components and standard properties of any kind of geometry");
+}
+
+GeoValidator::Status validate(Object const& object)
+{
+    return validateAs(typeOf(object), object);
 }
 
 std::optional<BoundingBox> boundingBoxOf(Object const& object)

@@ -31,6 +31,8 @@ void numberElements(std::string const& attribute, int number, std::string const&
 
 /// Validates the object with the host's validator for its type.
 Tessara::Geometry::GeoValidator::Status validate(Tessara::Object const& object);
+/// The same if its type is known.
+Tessara::Geometry::GeoValidator::Status validateAs(GeometryType type, Tessara::Object const& object);
 
 struct BoundingBox {
     float3 min;

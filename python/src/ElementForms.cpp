@@ -2,6 +2,8 @@
 
 #include "Texts.h"
 
+#include <span>
+
 namespace ModelingPython {
 
 using namespace Tessara::Geometry;
@@ -13,7 +15,7 @@ namespace {
         return py::dtype::from_args(fields);
     }
 
-    std::string shapeText(std::vector<py::ssize_t> const& shape)
+    std::string shapeText(std::span<py::ssize_t const> shape)
     {
         std::string text = "(n,";
         for (std::size_t i = 0; i != shape.size(); ++i)

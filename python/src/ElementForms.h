@@ -6,9 +6,10 @@
 
 #include <pybind11/numpy.h>
 
+#include <algorithm>
+#include <array>
 #include <string>
 #include <type_traits>
-#include <vector>
 
 namespace ModelingPython {
 
@@ -44,20 +45,20 @@ template <class T> py::dtype numpyType()
 }
 
 /// The dimensions after the first one.
-template <class T> std::vector<py::ssize_t> elementShape()
+template <class T> constexpr auto elementShape()
 {
     if constexpr (requires(T matrix) { matrix.rows; })
-        return {std::extent_v<decltype(T::rows), 0>, std::extent_v<decltype(T::rows), 1>};
+        return std::array<py::ssize_t, 2>{std::extent_v<decltype(T::rows), 0>, std::extent_v<decltype(T::rows), 1>};
     else if constexpr (ModelingProgram::ElementLayout<T>::components > 1)
-        return {ModelingProgram::ElementLayout<T>::components};
+        return std::array<py::ssize_t, 1>{ModelingProgram::ElementLayout<T>::components};
     else
-        return {};
+        return std::array<py::ssize_t, 0>{};
 }
 
 /// Whether an array has elements of this type, in any byte order and with any strides.
 template <class T> bool hasElements(py::array const& array)
 {
-    std::vector<py::ssize_t> const shape = elementShape<T>();
+    constexpr auto shape = elementShape<T>();
     if (array.ndim() != static_cast<py::ssize_t>(shape.size()) + 1
         || !std::equal(shape.begin(), shape.end(), array.shape() + 1))
         return false;

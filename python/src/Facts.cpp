@@ -55,18 +55,39 @@ void requireClosedTriangles(char const* operation, bool acceptsIsolatedPoints, M
     factsOf(mesh).hasNoIsolatedPoints = hasNoIsolatedPoints;
 }
 
-py::object makeValidHandle(Orvan::Ptr<Tessara::Object> object, Facts facts)
+py::object makeValidHandle(ModelingProgram::GeometryType type, Orvan::Ptr<Tessara::Object> object)
 {
-    py::object handle = makeHandle(std::move(object));
-    facts.isValid = true;
-    handle.cast<Handle&>().setFacts(std::make_shared<Facts>(facts));
-    return handle;
+    using ModelingProgram::GeometryType;
+    switch (type) {
+    case GeometryType::Mesh:
+        return makeValid<Mesh>(std::move(object));
+    case GeometryType::PointCloud:
+        return makeValid<PointCloud>(std::move(object));
+    default:
+        return makeValid<StrandSet>(std::move(object));
+    }
 }
 
 bool isBare(Tessara::Object const& mesh)
 {
     constexpr std::uint64_t kStandardKeys = 6; // of a valid mesh, which has all of them
     return mesh.keys()->size == kStandardKeys;
+}
+
+bool isBare(Mesh& mesh)
+{
+    Facts& facts = factsOf(mesh);
+    if (!facts.isBare)
+        facts.isBare = isBare(*mesh.object());
+    return *facts.isBare;
+}
+
+ModelingProgram::GeometryType typeOf(Handle& handle)
+{
+    Facts& facts = factsOf(handle);
+    if (!facts.type)
+        facts.type = ModelingProgram::typeOf(*handle.object());
+    return *facts.type;
 }
 
 }

@@ -2,6 +2,7 @@
 
 #include "Handles.h"
 
+#include "geometry/Geometry.h"
 #include "geometry/MeshTopology.h"
 
 #include <optional>
@@ -15,17 +16,20 @@ struct Facts {
     // For meshes. Known facts survive operations that keep the faces.
     bool isClosedTriangles = false; // closed, manifold, consistently oriented, triangles only
     bool hasNoIsolatedPoints = false;
+    std::optional<ModelingProgram::GeometryType> type = {};
+    std::optional<bool> isBare =
+        {}; // whether a mesh has nothing but its three components and three standard properties
 };
 
 /// The facts of a handle, which is given empty ones if it has none.
 Facts& factsOf(Handle& handle);
 
-/// The mesh as it is now: Python code that runs during an operation may give the handle another object. Both share what
+/// The geometry as it is now: Python code that runs during an operation may give the handle another object. Both share what
 /// becomes known of the object.
-inline Mesh snapshotOf(Mesh& mesh)
+template <class Kind> Kind snapshotOf(Kind& handle)
 {
-    factsOf(mesh);
-    return mesh;
+    factsOf(handle);
+    return handle;
 }
 
 /// The object. Operations may read and write outside arrays if it is invalid, so all take it from here.
@@ -37,9 +41,8 @@ Orvan::Ptr<Tessara::Object> validObjectOf(Handle& handle);
 /// \param topology   of the mesh, if it is known
 void requireClosedTriangles(char const* operation, bool acceptsIsolatedPoints, Mesh& mesh);
 
-/// A new handle for the result of an operation.
-py::object makeValidHandle(Orvan::Ptr<Tessara::Object> object, Facts facts = {});
-/// The same for a result of known kind: finding the kind takes as long as an operation on a few faces.
+/// A new handle for the result of an operation. Its kind is given, because finding it takes as long as an operation on a few
+/// faces.
 template <class Kind> py::object makeValid(Orvan::Ptr<Tessara::Object> object, Facts facts = {})
 {
     facts.isValid = true;
@@ -47,9 +50,14 @@ template <class Kind> py::object makeValid(Orvan::Ptr<Tessara::Object> object, F
     handle.setFacts(std::make_shared<Facts>(facts));
     return py::cast(std::move(handle));
 }
+py::object makeValidHandle(ModelingProgram::GeometryType type, Orvan::Ptr<Tessara::Object> object);
+
+/// Finding it takes as long as an operation on a few faces.
+ModelingProgram::GeometryType typeOf(Handle& handle);
 
 /// Whether a mesh has nothing but its three components and three standard properties.
 bool isBare(Tessara::Object const& mesh);
+bool isBare(Mesh& mesh);
 
 /// A copy of the object, which shares its arrays: what an operation edits.
 inline Orvan::MutablePtr<Tessara::Object> copyOf(Orvan::Ptr<Tessara::Object> const& object)

@@ -24,17 +24,18 @@ using Indices = Orvan::Ptr<Orvan::Array<unsigned int>>;
 
 namespace {
 
-    template <class T> Orvan::Ptr<Orvan::Array<T>> standardData(Handle const& handle, char const* name)
+    template <class T> Orvan::Ptr<Orvan::Array<T>> standardData(Handle const& handle, Orvan::String const& name)
     {
         auto values = dataOf<T>(*handle.object(), name);
         if (!values)
-            raiseInvalidGeometry("the data property " + std::string(name) + " is missing");
+            raiseInvalidGeometry("the data property " + std::string(name.view()) + " is missing");
         return values;
     }
 
     py::array pointsOf(Handle const& handle)
     {
-        return viewOf(standardData<float3>(handle, sPointPosition));
+        static Orvan::String const name(sPointPosition); // views of points are made all the time
+        return viewOf(standardData<float3>(handle, name));
     }
 
     void setPoints(Handle& handle, py::handle points)

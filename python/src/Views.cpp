@@ -8,9 +8,11 @@
 #include <OrvanCore/ForeignArray.h>
 
 #include <algorithm>
+#include <array>
 #include <cstring>
 #include <memory>
 #include <optional>
+#include <span>
 
 namespace ModelingPython {
 
@@ -65,8 +67,7 @@ namespace {
     }
 
     /// Calls NumPy itself, because the constructors of `py::array` allocate strides, and views are made all the time.
-    py::array readOnlyView(
-        py::dtype type, std::vector<py::ssize_t> const& shape, void const* data, py::object const& base)
+    py::array readOnlyView(py::dtype type, std::span<py::ssize_t const> shape, void const* data, py::object const& base)
     {
         auto const& numpy = py::detail::npy_api::get();
         constexpr int kFlags = 0; // not writable; NumPy finds out the others
@@ -102,10 +103,17 @@ namespace {
         return std::all_of(bytes, bytes + count, [](unsigned char byte) { return byte <= 1; });
     }
 
-    template <class T> std::vector<py::ssize_t> shapeOf(std::uint64_t count)
+    std::span<py::ssize_t const> shapeOf(py::array const& array)
     {
-        std::vector<py::ssize_t> shape = elementShape<T>();
-        shape.insert(shape.begin(), static_cast<py::ssize_t>(count));
+        return {array.shape(), static_cast<std::size_t>(array.ndim())};
+    }
+
+    /// Of an array of the library: no vector, because views are made all the time.
+    template <class T> auto shapeOf(std::uint64_t count)
+    {
+        constexpr auto element = elementShape<T>();
+        std::array<py::ssize_t, element.size() + 1> shape{static_cast<py::ssize_t>(count)};
+        std::copy(element.begin(), element.end(), shape.begin() + 1);
         return shape;
     }
 
@@ -259,17 +267,20 @@ namespace {
         py::array const base = copy.attr("view")(py::module_::import("numpy").attr("ndarray"));
         Memory memory;
         memory.owner = base;
-        return readOnlyView(base.dtype(), {base.shape(), base.shape() + base.ndim()}, base.data(), capsuleOf(memory));
+        return readOnlyView(base.dtype(), shapeOf(base), base.data(), capsuleOf(memory));
     }
 
 }
 
-template <class T> py::array viewOf(Orvan::Ptr<Orvan::Array<T>> const& values)
+template <class T> py::array viewOf(Orvan::Ptr<Orvan::Array<T>> values)
 {
-    if constexpr (kIsViewable<T>)
-        return readOnlyView(numpyType<T>(), shapeOf<T>(values->size), values->data, capsuleOf({values}));
-    else
+    if constexpr (kIsViewable<T>) {
+        auto const shape = shapeOf<T>(values->size);
+        T const* const data = values->data;
+        return readOnlyView(numpyType<T>(), shape, data, capsuleOf({std::move(values)}));
+    } else {
         return objectsOf(*values);
+    }
 }
 
 py::object viewOf(PropertyValue const& values)
@@ -288,12 +299,12 @@ py::array bytesOf(PropertyValue const& values)
     std::optional<py::array> view;
     visitArray(values, [&]<class T>(Orvan::Array<T> const& array, ElementType<T>) {
         view = readOnlyView(
-            py::dtype("u1"), {static_cast<py::ssize_t>(array.size * sizeof(T))}, array.data, capsuleOf({values}));
+            py::dtype("u1"), shapeOf<unsigned char>(array.size * sizeof(T)), array.data, capsuleOf({values}));
     });
     return *view;
 }
 
-py::array viewWithShape(Orvan::Ptr<Orvan::Array<unsigned int>> const& values, std::vector<py::ssize_t> const& shape)
+py::array viewWithShape(Orvan::Ptr<Orvan::Array<unsigned int>> const& values, std::array<py::ssize_t, 2> const& shape)
 {
     return readOnlyView(numpyType<unsigned int>(), shape, values->data, capsuleOf({values}));
 }
@@ -404,16 +415,15 @@ py::array adopt(py::handle values, bool checks)
     Memory memory;
     memory.owner = array;
     memory.guards = guardsOf(chain);
-    py::array view = readOnlyView(
-        array.dtype(), {array.shape(), array.shape() + array.ndim()}, array.data(), capsuleOf(std::move(memory)));
+    py::array view = readOnlyView(array.dtype(), shapeOf(array), array.data(), capsuleOf(std::move(memory)));
     for (py::object const& shared : chain)
         makeReadOnly(shared);
     return view;
 }
 
 // The types that other sources use by name.
-template py::array viewOf(Orvan::Ptr<Orvan::Array<Tessara::Math::float3>> const&);
-template py::array viewOf(Orvan::Ptr<Orvan::Array<unsigned int>> const&);
+template py::array viewOf(Orvan::Ptr<Orvan::Array<Tessara::Math::float3>>);
+template py::array viewOf(Orvan::Ptr<Orvan::Array<unsigned int>>);
 template Orvan::Ptr<Orvan::Array<Tessara::Math::float3>> valuesFrom(py::array const&);
 template Orvan::Ptr<Orvan::Array<unsigned int>> valuesFrom(py::array const&);
 

@@ -22,7 +22,7 @@ namespace py = pybind11;
 // back in without a copy. So do arrays over `bytes`, and all that `adopt` returns.
 
 /// A read-only view of an array, with the shape of its element type.
-template <class T> py::array viewOf(Orvan::Ptr<Orvan::Array<T>> const& values);
+template <class T> py::array viewOf(Orvan::Ptr<Orvan::Array<T>> values);
 /// The same for an array of any of the forty types; strings and locations are copied.
 /// \return None for other values
 py::object viewOf(Tessara::PropertyValue const& values);
@@ -30,7 +30,7 @@ py::object viewOf(Tessara::PropertyValue const& values);
 py::array bytesOf(Tessara::PropertyValue const& values);
 
 /// A view with other dimensions. The array must have as many scalars.
-py::array viewWithShape(Orvan::Ptr<Orvan::Array<unsigned int>> const& values, std::vector<py::ssize_t> const& shape);
+py::array viewWithShape(Orvan::Ptr<Orvan::Array<unsigned int>> const& values, std::array<py::ssize_t, 2> const& shape);
 
 /// NumPy's array of what the user passed: an array, a list, anything that `numpy.asarray` takes.
 /// \param what  names the values in messages: "property \"w\" of points"

@@ -6,6 +6,7 @@
 
 #include "geometry/Geometry.h"
 #include "geometry/MeshArrays.h"
+#include "geometry/TriangleBatch.h"
 
 #include <Modeling/addPointsToPointCloud.h>
 #include <Modeling/computeDeletedComponentMapping.h>
@@ -92,6 +93,8 @@ namespace {
         ModelingProgram::MeshArrays const mesh = ModelingProgram::arraysOf(object);
         unsigned int const* const offset = mesh.faceOffset->data;
         unsigned int const count = mesh.faceCount();
+        if (ModelingProgram::areTriangles(mesh, 0, count))
+            return;
         for (unsigned int face = 0; face != count; ++face)
             if (offset[face] == offset[face + 1])
                 refuse(fmt::format(
@@ -109,19 +112,21 @@ namespace {
         return makeValid<Mesh>(std::move(result), {.hasNoIsolatedPoints = !deleted.empty()});
     }
 
-    py::object deleteElements(Handle& handle, std::string const& component, py::array const& elements)
+    py::object deleteElements(Handle& given, std::string const& component, py::array const& elements)
     {
+        Handle handle = snapshotOf(given);
         Orvan::Ptr<Object> const object = validObjectOf(handle);
         auto const deleted = maskOf(elements, getElementCount(*object, component.c_str()));
         Orvan::Ptr<Object> const result = edited("delete_components", object, [&](Object& copy) {
             return deleted.empty()
                 || deleteComponents(computeDeletedComponentMapping(deleted), component.c_str(), copy);
         });
-        if (auto const status = withoutLock([&] { return ModelingProgram::validate(*result); }); !status)
+        auto const type = typeOf(handle); // a deletion removes no component and no property
+        if (auto const status = withoutLock([&] { return ModelingProgram::validateAs(type, *result); }); !status)
             refuse(fmt::format("delete_components cannot delete elements of {} here, because other properties refer to "
                                "them: {}",
                 component, status.message().view()));
-        return makeValidHandle(result);
+        return makeValidHandle(type, result);
     }
 
     py::array_t<unsigned int> computeMapping(Values<bool> const& mask)
@@ -141,6 +146,7 @@ namespace {
         py::object copy = makeHandle(std::move(result));
         if (handle.facts())
             copy.cast<Handle&>().setFacts(std::make_shared<Facts>(*handle.facts()));
+        factsOf(copy.cast<Handle&>()).isBare.reset();
         return copy;
     }
 

@@ -78,11 +78,11 @@ namespace {
         Orvan::Ptr<Tessara::Object> const object = std::move(geometry.object);
         auto const status = withoutLock([&] { return validate(*object); });
         if (!status)
-            refuseInvalid(fmt::format(
-                "{} does not contain a valid {}: {}", path.string(), nameOf(typeOf(*object)), status.message().view()));
+            refuseInvalid(fmt::format("{} does not contain a valid {}: {}", path.string(),
+                nameOf(ModelingProgram::typeOf(*object)), status.message().view()));
         for (std::string const& note : geometry.notes)
             warn(fmt::format("{}: {}", path.string(), note));
-        return py::make_tuple(makeValidHandle(object), center);
+        return py::make_tuple(makeValidHandle(ModelingProgram::typeOf(*object), object), center);
     }
 
     void write(Handle& handle, py::bytes const& file, bool overwrites, unsigned int compression,

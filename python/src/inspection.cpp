@@ -10,7 +10,9 @@
 
 #include <pybind11/stl.h>
 
+#include <algorithm>
 #include <array>
+#include <cstddef>
 #include <vector>
 
 namespace ModelingPython {
@@ -30,6 +32,20 @@ namespace {
         return py::make_tuple(textOf(std::string(status.message().view())), suspicious);
     }
 
+    template <std::size_t kSize> struct Literal {
+        char text[kSize];
+        constexpr Literal(char const (&literal)[kSize]) { std::copy_n(literal, kSize, text); }
+    };
+
+    /// A string that is made once per process: for a few faces, making the names of all facts takes longest.
+    template <Literal kName> py::handle interned()
+    {
+        static PyObject* const string = PyUnicode_InternFromString(kName.text);
+        if (!string)
+            throw py::error_already_set();
+        return string;
+    }
+
     struct MeshFacts {
         ExaminedMesh mesh;
         std::vector<std::uint64_t> slivers;
@@ -46,26 +62,26 @@ namespace {
         });
         MeshTopology const& topology = facts.topology;
         py::dict values;
-        values["triangles"] = topology.triangleCount;
-        values["quads"] = topology.quads.count;
-        values["polygons"] = topology.polygons.count;
-        values["faces_below_three_corners"] = topology.facesBelowThreeCorners.count;
-        values["faces_with_repeated_points"] = topology.facesWithRepeatedPoints.count;
-        values["edges"] = topology.edgeCount;
-        values["parts"] = topology.partCount;
-        values["open_edges"] = topology.boundaryEdges.count;
-        values["non_manifold_edges"] = topology.nonManifoldEdges.count;
-        values["winding_conflicts"] = topology.windingConflicts.count;
-        values["pinched_points"] = topology.nonManifoldPoints.count;
-        values["isolated_points"] = topology.isolatedPoints.count;
-        values["coincident_points"] = coincidentPoints;
-        values["closed_manifold"] = topology.isClosedManifold();
-        values["genus"] = topology.genus;
-        values["slivers"] = py::make_tuple(slivers[0], slivers[1], slivers[2]);
-        values["volume"] = facts.shape.volume;
-        values["area"] = facts.shape.area;
-        values["fold_overs"] = facts.shape.foldOvers;
-        values["diagonal"] = facts.shape.diagonal;
+        values[interned<"triangles">()] = topology.triangleCount;
+        values[interned<"quads">()] = topology.quads.count;
+        values[interned<"polygons">()] = topology.polygons.count;
+        values[interned<"faces_below_three_corners">()] = topology.facesBelowThreeCorners.count;
+        values[interned<"faces_with_repeated_points">()] = topology.facesWithRepeatedPoints.count;
+        values[interned<"edges">()] = topology.edgeCount;
+        values[interned<"parts">()] = topology.partCount;
+        values[interned<"open_edges">()] = topology.boundaryEdges.count;
+        values[interned<"non_manifold_edges">()] = topology.nonManifoldEdges.count;
+        values[interned<"winding_conflicts">()] = topology.windingConflicts.count;
+        values[interned<"pinched_points">()] = topology.nonManifoldPoints.count;
+        values[interned<"isolated_points">()] = topology.isolatedPoints.count;
+        values[interned<"coincident_points">()] = coincidentPoints;
+        values[interned<"closed_manifold">()] = topology.isClosedManifold();
+        values[interned<"genus">()] = topology.genus;
+        values[interned<"slivers">()] = py::make_tuple(slivers[0], slivers[1], slivers[2]);
+        values[interned<"volume">()] = facts.shape.volume;
+        values[interned<"area">()] = facts.shape.area;
+        values[interned<"fold_overs">()] = facts.shape.foldOvers;
+        values[interned<"diagonal">()] = facts.shape.diagonal;
         return values;
     }
 

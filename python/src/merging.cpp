@@ -28,18 +28,16 @@ namespace {
     using MergeObjects = bool (*)(Objects const&, Object&, Orvan::RuntimeServices const*);
 
     /// Nobody sees an object without points as one of a certain kind: it becomes an empty one of the kind of the others.
-    GeometryType giveOneKind(Objects& objects)
+    GeometryType giveOneKind(std::vector<GeometryType> types, Objects& objects)
     {
-        std::vector<GeometryType> types;
-        for (auto const& object : objects)
-            types.push_back(typeOf(*object));
         if (std::all_of(types.begin(), types.end(), [&](GeometryType type) { return type == types.front(); }))
             return types.front();
         auto const isEmpty = [](auto const& object) {
             return Tessara::Geometry::getElementCount(*object, Tessara::Geometry::sPointComp) == 0;
         };
         auto const typical = std::find_if_not(objects.begin(), objects.end(), isEmpty);
-        GeometryType const type = typical == objects.end() ? types.front() : typeOf(**typical);
+        GeometryType const type =
+            types[typical == objects.end() ? 0 : static_cast<std::size_t>(typical - objects.begin())];
         for (std::uint64_t i = 0; i != objects.size; ++i) {
             if (types[i] == type || !isEmpty(objects[i]))
                 continue;
@@ -58,7 +56,8 @@ namespace {
     }
 
     /// The objects are validated here: the library would leave out invalid ones silently.
-    Objects objectsOf(std::vector<Handle*> const& handles)
+    /// \param types  if given, the type of each is added
+    Objects objectsOf(std::vector<Handle*> const& handles, std::vector<GeometryType>* types = nullptr)
     {
         if (handles.empty())
             refuse("there is nothing to merge");
@@ -67,7 +66,10 @@ namespace {
             if (!handles[i])
                 throw py::type_error("merging needs objects, not None");
             try {
-                objects.append(validObjectOf(*handles[i]));
+                Handle handle = snapshotOf(*handles[i]);
+                objects.append(validObjectOf(handle));
+                if (types)
+                    types->push_back(typeOf(handle));
             } catch (Failure const& failure) {
                 refuseInvalid(fmt::format("object {}: {}", i, failure.what()));
             }
@@ -100,8 +102,9 @@ namespace {
     py::object mergeAny(std::vector<Handle*> const& handles, std::string const& sourceAttribute)
     {
         using namespace Tessara::GeometryAlgorithms;
-        Objects objects = objectsOf(handles);
-        GeometryType const type = giveOneKind(objects);
+        std::vector<GeometryType> types;
+        Objects objects = objectsOf(handles, &types);
+        GeometryType const type = giveOneKind(std::move(types), objects);
         if (!sourceAttribute.empty())
             withoutLock([&] { numberSources(sourceAttribute, objects); });
         switch (type) {

@@ -85,10 +85,12 @@ namespace {
         if (!box)
             return Extent::Medium;
         float const diagonal = std::hypot(box->max.x - box->min.x, box->max.y - box->min.y, box->max.z - box->min.z);
-        if (diagonal > kManyFaces * tolerance)
+        // Between voxels with and without values, a guide has any value above 0.
+        float const finest = guide ? tolerance * std::max(guide->range().leastOfAll, 0.0f) : tolerance;
+        if (diagonal > kManyFaces * finest)
             return Extent::Large;
-        bool const isBrief = diagonal <= kFewFaces * tolerance && getElementCount(mesh, sPointComp) < kFewPoints;
-        return isBrief && !guide ? Extent::Brief : Extent::Medium; // a guide may divide the tolerance by any number
+        bool const isBrief = diagonal <= kFewFaces * finest && getElementCount(mesh, sPointComp) < kFewPoints;
+        return isBrief ? Extent::Brief : Extent::Medium;
     }
 
     /// Runs a refinement. If it needs more than the free memory, it ends with `Failure` before the system kills the
@@ -165,7 +167,7 @@ namespace {
             requireClosedTriangles(operation, false, mesh);
             refuse(fmt::format("{} failed: the mesh does not meet the requirements of the operation", operation));
         }
-        if (!isBare(*object))
+        if (!isBare(mesh))
             for (DroppedByRefinement const& dropped : droppedByRefinement(*object, *refined.object))
                 warn(dropped.sentence());
         if (refined.largeFaces != 0)

@@ -59,7 +59,8 @@ template <class T> Orvan::Ptr<Orvan::Array<T>> dataOf(Object const& object, Orva
     auto const* const geoProperty = property.get<Orvan::Ptr<Object>>();
     if (!geoProperty || !*geoProperty)
         return nullptr;
-    PropertyValue const data = (*geoProperty)->getProperty(sData);
+    static Orvan::String const dataKey(sData);
+    PropertyValue const data = (*geoProperty)->getProperty(dataKey);
     auto const* const values = data.get<Orvan::Ptr<Orvan::Array<T>>>();
     return values ? *values : nullptr;
 }
