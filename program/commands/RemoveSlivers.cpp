@@ -3,6 +3,7 @@
 #include "geometry/MeshRequirements.h"
 #include "geometry/MeshTopology.h"
 #include "geometry/Shape.h"
+#include "geometry/largestDistance.h"
 
 #include <Modeling/removeSlivers.h>
 #include <TessaraGeometry/Elements.h>

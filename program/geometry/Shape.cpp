@@ -3,7 +3,6 @@
 #include "Creases.h"
 #include "FaceMeasures.h"
 #include "Geometry.h"
-#include "SurfaceTree.h"
 #include "sumOverBlocks.h"
 
 #include <fmt/format.h>
@@ -179,29 +178,6 @@ double largestMove(MeshArrays const& before, MeshArrays const& after)
             largest += {length(inDoubles((*after.positions)[point]) - inDoubles((*before.positions)[point]))};
         return largest;
     }).value;
-}
-
-double largestDistance(MeshArrays const& before, MeshArrays const& after)
-{
-    // Most points keep their positions and numbers; the others are looked up in the surface.
-    auto const isSame = [](float3 const& a, float3 const& b) { return a.x == b.x && a.y == b.y && a.z == b.z; };
-    std::vector<bool> isSettled(before.pointCount(), true); // isolated points are not part of the surface
-    for (unsigned int const point : *before.faceVertex)
-        isSettled[point] = false;
-    std::vector<unsigned int> moved;
-    for (unsigned int point = 0; point != before.pointCount(); ++point)
-        if (!isSettled[point]
-            && !(point < after.pointCount() && isSame((*before.positions)[point], (*after.positions)[point])))
-            moved.push_back(point);
-    if (moved.empty())
-        return 0;
-    SurfaceTree const tree(after);
-    return std::sqrt(sumOverBlocks<Largest, 64>(moved.size(), [&](std::size_t begin, std::size_t end) {
-        Largest largest;
-        for (std::size_t i = begin; i != end; ++i)
-            largest += {tree.squaredDistance(inDoubles((*before.positions)[moved[i]]))};
-        return largest;
-    }).value);
 }
 
 Json countsAndShape(Tessara::Object const& mesh, Shape const& shape)

@@ -53,10 +53,6 @@ std::vector<unsigned int> sharpPoints(MeshArrays const& mesh, EdgeSides const& e
 /// The largest move of a point of `before`, for operations that keep the numbers of points and may append more.
 double largestMove(MeshArrays const& before, MeshArrays const& after);
 
-/// The largest distance from a point of `before` that a face uses to the surface `after`, for operations that renumber
-/// points.
-double largestDistance(MeshArrays const& before, MeshArrays const& after);
-
 /// Shapes before and after an operation, and the largest move or distance.
 struct ShapeChange {
     Shape before;

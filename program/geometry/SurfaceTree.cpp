@@ -58,20 +58,38 @@ namespace {
 SurfaceTree::SurfaceTree(MeshArrays const& surface)
     : surface_(surface)
 {
-    listTriangles();
-    if (!triangles_.empty())
-        buildBoxes();
+    triangles_.reserve(surface_.cornerCount());
+    for (unsigned int face = 0; face != surface_.faceCount(); ++face)
+        addFan(face);
+    build();
 }
 
-void SurfaceTree::listTriangles()
+SurfaceTree::SurfaceTree(MeshArrays const& surface, std::span<unsigned int const> faces)
+    : surface_(surface)
 {
-    std::vector<Corners> unordered;
-    unordered.reserve(surface_.cornerCount());
-    for (unsigned int face = 0; face != surface_.faceCount(); ++face) {
-        auto const corners = surface_.corners(face);
-        for (std::size_t i = 2; i < corners.size(); ++i)
-            unordered.push_back({corners[0], corners[i - 1], corners[i]});
-    }
+    for (unsigned int const face : faces)
+        addFan(face);
+    build();
+}
+
+void SurfaceTree::addFan(unsigned int face)
+{
+    auto const corners = surface_.corners(face);
+    for (std::size_t i = 2; i < corners.size(); ++i)
+        triangles_.push_back({corners[0], corners[i - 1], corners[i]});
+}
+
+void SurfaceTree::build()
+{
+    if (triangles_.empty())
+        return;
+    sortTriangles();
+    buildBoxes();
+}
+
+void SurfaceTree::sortTriangles()
+{
+    std::vector<Corners> const unordered = std::move(triangles_);
     Box all{{kInfinity, kInfinity, kInfinity}, {-kInfinity, -kInfinity, -kInfinity}};
     for (float3 const& p : *surface_.positions)
         all = {lowerCorner(all.min, p), upperCorner(all.max, p)};
@@ -87,7 +105,7 @@ void SurfaceTree::listTriangles()
             static_cast<unsigned int>(i)};
     });
     tbb::parallel_sort(order.begin(), order.end());
-    triangles_.resize(unordered.size());
+    triangles_ = std::vector<Corners>(unordered.size());
     parallelFor(0, order.size(), [&](std::size_t i) { triangles_[i] = unordered[order[i].second]; });
 }
 

@@ -3,6 +3,7 @@
 #include "MeshArrays.h"
 #include "NearestPoint.h"
 
+#include <span>
 #include <vector>
 
 namespace ModelingProgram {
@@ -14,6 +15,8 @@ namespace ModelingProgram {
 class SurfaceTree {
 public:
     explicit SurfaceTree(MeshArrays const& surface);
+    /// Of some faces of the surface.
+    SurfaceTree(MeshArrays const& surface, std::span<unsigned int const> faces);
 
     /// The squared distance to the nearest point of the surface; infinite if there are no triangles.
     double squaredDistance(double3 const& point) const;
@@ -24,7 +27,9 @@ private:
         float3 min, max;
     };
 
-    void listTriangles();
+    void addFan(unsigned int face);
+    void build();
+    void sortTriangles();
     void buildBoxes();
     Box boxOfLeaf(std::size_t leaf) const;
     double squaredDistanceInLeaf(std::size_t leaf, double3 const& point) const;

@@ -1,7 +1,8 @@
 #include "geometry/Shape.h"
 
 #include "geometry/FaceMeasures.h"
-#include "geometry/SurfaceTree.h"
+#include "geometry/NearestPoint.h"
+#include "geometry/largestDistance.h"
 
 #include "support/MeshBuilder.h"
 #include "support/Testing.h"
@@ -11,7 +12,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cmath>
+#include <functional>
 #include <limits>
 #include <tuple>
 
@@ -53,6 +56,22 @@ namespace {
         Tessara::Math::float3 const end{-std::cos(angle), 0.5f, std::sin(angle)};
         return Tessara::Geometry::makeMesh(
             {{0, 0, 0}, {0, 1, 0}, {1, 0.5f, 0}, end}, {0, 2, 1, 0, isTurned ? 3u : 1u, isTurned ? 1u : 3u}, {0, 3, 6});
+    }
+
+    double largestDistanceByBruteForce(MeshArrays const& points, MeshArrays const& surface)
+    {
+        double largest = 0;
+        for (auto const& p : *points.positions) {
+            double nearest = std::numeric_limits<double>::infinity();
+            for (unsigned int face = 0; face != surface.faceCount(); ++face) {
+                auto const corners = surface.corners(face);
+                auto const at = [&](std::size_t i) { return Corner{inDoubles((*surface.positions)[corners[i]]), 0}; };
+                nearest =
+                    std::min(nearest, length(nearestOf({at(0), at(1), at(2)}, inDoubles(p)).position - inDoubles(p)));
+            }
+            largest = std::max(largest, nearest);
+        }
+        return largest;
     }
 
 }
@@ -131,21 +150,77 @@ TEST(Shape, FindsFoldOversAndSliversAtAnyScale)
     EXPECT_EQ(examine(needle, above).sliverCount, 1);
 }
 
+TEST(Shape, FindsTheLargestDistanceOfFewPointsAmongTheFacesNearThem)
+{
+    MeshBuilder const sphere = MeshBuilder::sphere(40);
+    std::size_t const last = sphere.points.size() - 1;
+    struct Case {
+        char const* what;
+        std::function<void(MeshBuilder&)> change;
+    };
+    Case const cases[] = {
+        {"a point moves far",
+            [](MeshBuilder& m) {
+                m.points[700] = {3, 0, 0};
+            }},
+        {"a point moves through the surface",
+            [](MeshBuilder& m) {
+                m.points[700] = {-m.points[700].x, 0, 0};
+            }},
+        {"neighbors move",
+            [](MeshBuilder& m) {
+                for (std::size_t i = 700; i != 703; ++i)
+                    m.points[i].z += 0.1f;
+            }},
+        {"all neighbors of a point move too",
+            [](MeshBuilder& m) {
+                for (std::size_t i = 640; i != 760; ++i)
+                    m.points[i].z += 0.05f;
+            }},
+        {"two points swap their numbers",
+            [=](MeshBuilder& m) {
+                std::swap(m.points[5], m.points[last]);
+                for (auto& face : m.faces)
+                    for (unsigned int& point : face)
+                        point = point == 5 ? static_cast<unsigned int>(last) : point == last ? 5u : point;
+                m.points[300].x += 0.01f;
+            }},
+        {"the faces around a point are gone",
+            [](MeshBuilder& m) {
+                std::erase_if(
+                    m.faces, [](auto const& face) { return std::find(face.begin(), face.end(), 700u) != face.end(); });
+                m.points[800].y += 1e-4f;
+            }},
+        {"only faces far away are left",
+            [](MeshBuilder& m) {
+                m.faces.resize(20);
+                m.points[700].y += 1e-4f;
+            }},
+    };
+    auto const before = sphere.build();
+    for (Case const& c : cases) {
+        MeshBuilder changed = sphere;
+        c.change(changed);
+        auto const after = changed.build();
+        // Points that did not move are taken to be on the surface, whether a face uses them or not.
+        MeshBuilder moved = sphere;
+        moved.points.clear();
+        for (std::size_t i = 0; i != sphere.points.size(); ++i)
+            if (auto const& a = sphere.points[i], &b = changed.points[i]; a.x != b.x || a.y != b.y || a.z != b.z)
+                moved.points.push_back(sphere.points[i]);
+        moved.faces = {{0, 0, 0}};
+        EXPECT_EQ(largestDistance(arraysOf(*before), arraysOf(*after)),
+            largestDistanceByBruteForce(arraysOf(*moved.build()), arraysOf(*after)))
+            << c.what;
+    }
+}
+
 TEST(Shape, FindsTheSameLargestDistanceAsBruteForce)
 {
     auto const before = MeshBuilder::sphere(12).withNoise(0.05f, 1).build();
     auto after = MeshBuilder::sphere(10).withNoise(0.1f, 2).shuffled(3).build();
     MeshArrays const points = arraysOf(*before), surface = arraysOf(*after);
-    double expected = 0;
-    for (auto const& p : *points.positions) {
-        double nearest = std::numeric_limits<double>::infinity();
-        for (unsigned int face = 0; face != surface.faceCount(); ++face) {
-            auto const corners = surface.corners(face);
-            auto const at = [&](std::size_t i) { return Corner{inDoubles((*surface.positions)[corners[i]]), 0}; };
-            nearest = std::min(nearest, length(nearestOf({at(0), at(1), at(2)}, inDoubles(p)).position - inDoubles(p)));
-        }
-        expected = std::max(expected, nearest);
-    }
+    double const expected = largestDistanceByBruteForce(points, surface);
     auto const measures = [&] {
         Shape const shape = examined(before).shape;
         return std::vector<double>{largestDistance(points, surface), largestMove(points, surface), *shape.volume,
