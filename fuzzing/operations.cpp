@@ -1,5 +1,8 @@
 #include "Bags.h"
 
+#include "geometry/MeshTopology.h"
+#include "repair/repairMesh.h"
+
 #include <Modeling/Modeling.h>
 #include <OrvanCppOpSDK/Job.h>
 #include <TessaraGeometryVolume/VolumeBuilder.h>
@@ -9,7 +12,7 @@
 #include <new>
 #include <stdexcept>
 
-// Every operation on objects that the validators accept. The result is valid again where the operation promises it, the
+// Every operation, and the repair of meshes, on objects that the validators accept. The result is valid again where the operation promises it, the
 // same whether others share the object or not, and the others see no change.
 
 namespace Fuzzing {
@@ -211,9 +214,33 @@ namespace {
         };
     }
 
+    Operation repair(Bytes& bytes)
+    {
+        using ModelingProgram::RepairSteps;
+        ModelingProgram::RepairOptions options;
+        for (auto const step : {&RepairSteps::weld, &RepairSteps::degenerate, &RepairSteps::doubled,
+                 &RepairSteps::orient, &RepairSteps::fill, &RepairSteps::split, &RepairSteps::unused})
+            options.steps.*step = bytes.ConsumeIntegralInRange(0, 7) != 0;
+        float const distance = anyNumber(bytes);
+        if (distance > 0 && distance <= 1e30f)
+            options.weldDistance = distance;
+        if (bytes.ConsumeBool())
+            options.mostHoleEdges = bytes.ConsumeIntegralInRange<std::size_t>(0, 9);
+        return [=](Object& mesh) {
+            repairMesh(options, mesh);
+            auto const topology = ModelingProgram::analyzeTopology(ModelingProgram::arraysOf(mesh));
+            RepairSteps const& steps = options.steps;
+            require(
+                !steps.split || !(topology.nonManifoldEdges || topology.nonManifoldPoints), "splitting separates all");
+            require(!(steps.split && steps.orient) || !topology.windingConflicts, "the surface is oriented");
+            require(!steps.unused || !topology.isolatedPoints, "unused points are removed");
+            return Outcome::Valid;
+        };
+    }
+
     Operation meshOperation(Bytes& bytes)
     {
-        switch (bytes.ConsumeIntegralInRange(0, 7)) {
+        switch (bytes.ConsumeIntegralInRange(0, 8)) {
         case 0: {
             std::string const channels = bytes.ConsumeRandomLengthString(16);
             return [=](Object& mesh) {
@@ -239,6 +266,8 @@ namespace {
         case 6:
             return componentDeletion(
                 bytes.PickValueInArray({sPointComp, sFaceComp, sFaceVertexComp}), Kind::Mesh, bytes);
+        case 7:
+            return repair(bytes);
         default:
             return [](Object& mesh) {
                 Object other;

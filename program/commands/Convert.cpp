@@ -9,12 +9,12 @@ namespace ModelingProgram {
 
 namespace {
 
-    struct Options {
+    struct ConvertOptions {
         std::filesystem::path in;
         Output out;
     };
 
-    void convert(Options const& options, Report& report)
+    void convert(ConvertOptions const& options, Report& report)
     {
         requireWritable(options.out, GeometryType::None);
         PageOfRun page(options.out, 1, report);
@@ -34,7 +34,7 @@ namespace {
 
 void addConvert(CommandLine& program, Invocation& invocation)
 {
-    auto const options = std::make_shared<Options>();
+    auto const options = std::make_shared<ConvertOptions>();
     constexpr CommandHelp kHelp = {"convert", "Write the geometry of a file in another format",
         R"(Elements, their order and their values are kept. A warning lists what the file of the first format contains
 and the geometry cannot hold, and what the second format cannot: then it is left out.)",

@@ -25,7 +25,7 @@ namespace {
 
     using Tessara::Object;
 
-    struct Options {
+    struct MakeVolumeOptions {
         std::filesystem::path in;
         Output out;
         std::string attribute;
@@ -40,7 +40,8 @@ namespace {
         std::uint64_t maxMemory = 0;
     };
 
-    constexpr char kAdvice[] = "Doubling the voxel size makes a quarter as many voxels; a narrower --band helps too.";
+    constexpr char kVoxelAdvice[] =
+        "Doubling the voxel size makes a quarter as many voxels; a narrower --band helps too.";
 
     void requireVdb(Output const& out)
     {
@@ -50,7 +51,7 @@ namespace {
         requirePlace(out);
     }
 
-    SurfaceValue surfaceValueOf(Options const& options, Object const& mesh)
+    SurfaceValue surfaceValueOf(MakeVolumeOptions const& options, Object const& mesh)
     {
         SurfaceValue value;
         if (!options.distanceTo.empty()) {
@@ -69,10 +70,10 @@ namespace {
         limit.require(static_cast<std::uint64_t>(std::min(size.bytes, kMost)),
             fmt::format("a band of about {} of size {:.4g}",
                 countOf(static_cast<std::uint64_t>(std::min(size.voxels, kMost)), "voxel"), voxelSize),
-            kAdvice);
+            kVoxelAdvice);
     }
 
-    void makeVolume(Options const& options, MemoryLimit const& limit, Report& report)
+    void makeVolume(MakeVolumeOptions const& options, MemoryLimit const& limit, Report& report)
     {
         requireVdb(options.out);
         Orvan::MutablePtr<Object> const mesh = loadInput(options.in, report).object;
@@ -102,7 +103,7 @@ namespace {
         reportRun(report);
     }
 
-    void addValueOptions(Options& options, Command& command)
+    void addValueOptions(MakeVolumeOptions& options, Command& command)
     {
         Command value = command.addChoice("Values", "one of these is required");
         value.addOption("--attribute", options.attribute, "A number per point, interpolated over faces")
@@ -123,7 +124,7 @@ namespace {
 
 void addMakeVolume(CommandLine& program, Invocation& invocation)
 {
-    auto const options = std::make_shared<Options>();
+    auto const options = std::make_shared<MakeVolumeOptions>();
     constexpr CommandHelp kHelp = {"make-volume", "Make a volume around a mesh that controls its refinement",
         R"(The volume is a float grid in an OpenVDB file, with voxels in a band around the surface. Each voxel
 gets the value at the nearest point of the surface: an attribute of the points, interpolated over the
@@ -153,7 +154,7 @@ face, or the distance to a given point. Faces may have any number of corners.
     addMemoryLimit(options->maxMemory, command);
     onSelected(command, invocation, [options](Report& report) {
         MemoryLimit const limit(options->maxMemory);
-        limit.run([&] { makeVolume(*options, limit, report); }, kAdvice);
+        limit.run([&] { makeVolume(*options, limit, report); }, kVoxelAdvice);
     });
 }
 

@@ -12,14 +12,14 @@ namespace ModelingProgram {
 
 namespace {
 
-    struct Options {
+    struct PageOptions {
         std::filesystem::path page;
         std::vector<std::filesystem::path> files;
         std::string title;
         bool replaces = false;
     };
 
-    std::string titleOf(Options const& options)
+    std::string pageTitle(PageOptions const& options)
     {
         if (!options.title.empty())
             return options.title;
@@ -28,7 +28,7 @@ namespace {
                                          : fmt::format("{} and {}", first, countOf(options.files.size() - 1, "other"));
     }
 
-    void writePage(Options const& options, Report& report)
+    void writePage(PageOptions const& options, Report& report)
     {
         Existing const existing = options.replaces ? Existing::Replace : Existing::Keep;
         PageWriter::checkWritable(options.page, existing);
@@ -40,7 +40,7 @@ namespace {
             stopIfCancelled();
         }
         Phase const phase(report, &Times::writing, fmt::format("writing {}", options.page.filename().string()));
-        page.finish(titleOf(options), {});
+        page.finish(pageTitle(options), {});
         report.document["output"] = options.page.string();
         reportRun(report);
     }
@@ -49,7 +49,7 @@ namespace {
 
 void addPage(CommandLine& program, Invocation& invocation)
 {
-    auto const options = std::make_shared<Options>();
+    auto const options = std::make_shared<PageOptions>();
     constexpr CommandHelp kHelp = {"page", "Write an HTML page that shows files side by side",
         R"(The page is one file, which any browser opens without a server, a network or an installation. It has a view for
 each file, with its facts as "modeling info" shows them, and histograms of edge lengths and face quality: the

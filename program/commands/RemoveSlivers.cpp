@@ -35,7 +35,7 @@ namespace {
             .showDefault();
     }
 
-    Json describeMesh(Object const& object, ExaminedMesh const& mesh)
+    Json describeSlivers(Object const& object, ExaminedMesh const& mesh)
     {
         Json values = countsOf(object);
         addPartsAndGenus(mesh.topology, values);
@@ -65,8 +65,8 @@ namespace {
         if (report.needsFacts()) {
             after = examine(arraysOf(result), ratio_);
             change_ = {before.shape, after->shape, largestDistance(arraysOf(mesh), arraysOf(result))};
-            before_ = describeMesh(mesh, before);
-            after_ = describeMesh(result, *after);
+            before_ = describeSlivers(mesh, before);
+            after_ = describeSlivers(result, *after);
             addShape(change_, before_, after_);
         }
         mesh = std::move(result);

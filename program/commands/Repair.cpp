@@ -95,7 +95,7 @@ namespace {
         return steps;
     }
 
-    Json describeMesh(Object const& mesh, ExaminedMesh const& examined)
+    Json describeFaults(Object const& mesh, ExaminedMesh const& examined)
     {
         auto const& [topology, shape, slivers] = examined;
         Json values = countsOf(mesh);
@@ -114,14 +114,14 @@ namespace {
     {
         Object& mesh = *subject.object;
         if (report.needsFacts())
-            before_ = describeMesh(mesh, subject.know());
+            before_ = describeFaults(mesh, subject.know());
         RepairOptions const options{chosenSteps(), weldDistance_, mostHoleEdges_};
         Object result = mesh;
         runOperation(report, [&] { counts_ = repairMesh(options, result); });
         dropped_ = dropOutdatedProperties(result);
         result_ = examine(arraysOf(result)); // also for the warnings
         if (report.needsFacts())
-            after_ = describeMesh(result, result_);
+            after_ = describeFaults(result, result_);
         mesh = std::move(result);
         subject.setKnown(result_);
     }

@@ -13,7 +13,7 @@ namespace ModelingProgram {
 
 namespace {
 
-    struct Options {
+    struct RunOptions {
         FileList files;
         std::string steps;
         std::filesystem::path recipe;
@@ -27,7 +27,7 @@ namespace {
         report.text = toText(document) + "\n";
     }
 
-    void run(Options& options, Report& report)
+    void run(RunOptions& options, Report& report)
     {
         std::vector<Step> steps = options.recipe.empty() ? parseSteps(options.steps) : readRecipe(options.recipe);
         for (Step const& step : steps)
@@ -66,7 +66,7 @@ If a step fails, nothing is written, and the message names the step. --do "smoot
 A recipe is a JSON file of steps, such as {{"modeling": 1, "steps": [{{"do": "triangulate"}}, {{"do": "smooth", "amount": 2,
 "pin-boundary": true}}]}}. The keys are the long names of the options.)",
         listOfSteps());
-    auto const options = std::make_shared<Options>();
+    auto const options = std::make_shared<RunOptions>();
     CommandHelp const help = {"run", "Run several steps on files without writing what is between them", details.c_str(),
         "  modeling run cad.obj fine.stl --do \"triangulate; subdivide --relative 0.01; smooth --amount 1\"\n"
         "  modeling run a.ply b.ply all.ply --do \"merge; delete-points --attribute outlier\"\n"

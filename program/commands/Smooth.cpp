@@ -30,7 +30,7 @@ namespace {
     using Tessara::Object;
     using Positions = Orvan::Array<float3>;
 
-    struct Options {
+    struct SmoothOptions {
         float amount = 1;
         std::string weights;
         std::string pins;
@@ -88,7 +88,7 @@ namespace {
         void report(Report& report) override;
 
     private:
-        Options options_;
+        SmoothOptions options_;
         ShapeChange change_;
         double meanDisplacement_ = 0;
         double largestDisplacement_ = 0;
@@ -114,7 +114,7 @@ namespace {
 
     /// Null if no point is weighted or pinned.
     std::unique_ptr<Orvan::Array<float>> weightsOf(
-        Options const& options, Subject const& subject, std::optional<EdgeSides> const& edges, Report& report)
+        SmoothOptions const& options, Subject const& subject, std::optional<EdgeSides> const& edges, Report& report)
     {
         if (options.weights.empty() && options.pins.empty() && !options.pinsBoundary && !options.sharpDegrees)
             return nullptr;
@@ -145,7 +145,7 @@ namespace {
     }
 
     /// Refuses points without a face, which smoothing cannot move, or removes them.
-    void handleIsolatedPoints(Options const& options, Subject& subject, Report& report)
+    void handleIsolatedPoints(SmoothOptions const& options, Subject& subject, Report& report)
     {
         Object& mesh = *subject.object;
         Finding const isolated =
@@ -198,7 +198,7 @@ namespace {
         });
     }
 
-    Json describeMesh(Object const& mesh)
+    Json describeSurface(Object const& mesh)
     {
         MeshArrays const arrays = arraysOf(mesh);
         EdgeLengths const edges = edgeLengthsOf(arrays);
@@ -257,7 +257,7 @@ namespace {
         largestDisplacement_ = displacement.largest;
         dropped_ = displacement.largest != 0 ? dropNormals(mesh) : std::vector<std::string>();
         if (report.needsFacts())
-            before_ = describeMesh(mesh);
+            before_ = describeSurface(mesh);
         replacePositions(std::move(positions), mesh);
         if (!report.needsFacts()) {
             subject.shape.reset(); // the topology stays
@@ -272,7 +272,7 @@ namespace {
             change_ = {facts.before, facts.after, displacement.largest};
         }
         subject.shape = change_.after;
-        after_ = describeMesh(mesh);
+        after_ = describeSurface(mesh);
         addShape(change_, before_, after_);
     }
 

@@ -31,7 +31,7 @@ namespace {
     using Points = Orvan::Array<float3>;
     using Indices = Orvan::Array<unsigned int>;
 
-    struct Options {
+    struct StitchOptions {
         std::vector<std::filesystem::path> drawing; // the polygon and the strands
         std::string normals = "points";
         unsigned int rotate = 0;
@@ -146,7 +146,7 @@ namespace {
     }
 
     /// Refuses a template with faults, unless --allow-faults accepts the rest of it.
-    StitchTemplate readTemplate(Options const& options, Report& report)
+    StitchTemplate readTemplate(StitchOptions const& options, Report& report)
     {
         std::filesystem::path const &polygonFile = options.drawing[0], &strandFile = options.drawing[1];
         // A template has coordinates of its own: --center translates only the mesh.
@@ -254,7 +254,7 @@ namespace {
         std::size_t flatCount = 0;
     };
 
-    LaidStrands layOnFaces(StitchTemplate const& made, Target const& target, Options const& options)
+    LaidStrands layOnFaces(StitchTemplate const& made, Target const& target, StitchOptions const& options)
     {
         std::uint64_t const perFace = controlPointCountOf(made);
         unsigned int const polySize = made.getPolySize();
@@ -316,7 +316,7 @@ namespace {
         void reportTemplate(Report& report);
 
     private:
-        Options options_;
+        StitchOptions options_;
         std::optional<StitchTemplate> template_;
         std::uint64_t coveredCount_ = 0, otherCount_ = 0; // faces
         Json before_, after_;

@@ -28,7 +28,7 @@ namespace {
 
     using Tessara::Object;
 
-    struct Options {
+    struct SubdivideOptions {
         std::optional<float> tolerance;
         std::optional<float> relative;
         std::uint64_t maxMemory = 0;
@@ -110,7 +110,7 @@ namespace {
             report.warn(warningOfLargeFaces(count) + (isGuided ? " --min-value keeps the tolerance away from 0." : ""));
     }
 
-    constexpr char kAdvice[] = "Dividing the tolerance by 3 makes about nine times as many faces.";
+    constexpr char kToleranceAdvice[] = "Dividing the tolerance by 3 makes about nine times as many faces.";
 
     /// Warns of the properties that were dropped, and why. \return their names
     std::vector<std::string> explainDropped(Object const& before, Object const& after, Report& report)
@@ -130,7 +130,7 @@ namespace {
     private:
         std::optional<GuideGrid> readGuide(Object const& mesh, Report& report) const;
 
-        Options options_;
+        SubdivideOptions options_;
         MemoryLimit const* limit_ = nullptr; // while it applies
         float tolerance_ = 0;
         ShapeChange change_;
@@ -155,7 +155,7 @@ namespace {
     {
         MemoryLimit const limit(options_.maxMemory);
         limit_ = &limit;
-        limit.run(work, kAdvice);
+        limit.run(work, kToleranceAdvice);
     }
 
     std::optional<GuideGrid> Subdivide::readGuide(Object const& mesh, Report& report) const

@@ -46,7 +46,7 @@ namespace {
         requireChannelList(channels_);
     }
 
-    Json describeMesh(Object const& mesh, MeshTopology const& topology)
+    Json describeFaces(Object const& mesh, MeshTopology const& topology)
     {
         Json values = countsOf(mesh);
         values["triangles"] = topology.triangleCount;
@@ -109,8 +109,8 @@ namespace {
             ExaminedMesh const before = subject.know();
             after = areIdentical(arrays, triangles) ? before : examine(triangles); // triangles stay as they are
             change_ = {before.shape, after->shape, largestMove(arrays, triangles)};
-            before_ = describeMesh(mesh, before.topology);
-            after_ = describeMesh(result, after->topology);
+            before_ = describeFaces(mesh, before.topology);
+            after_ = describeFaces(result, after->topology);
             addShape(change_, before_, after_);
             if (checksAreas_)
                 check_ = checkTriangulation(arraysOf(*measured), triangles);

@@ -11,7 +11,7 @@ namespace ModelingProgram {
 namespace {
 
     constexpr std::size_t kBatch = TriangleBatch::kSize;
-    template <class T> using Values = TriangleBatch::Values<T>;
+    template <class T> using BatchValues = TriangleBatch::Values<T>;
 
     /// Calls `measure(face, count)` for batches of some faces.
     template <class Measure> void forEachBatch(std::size_t begin, std::size_t end, Measure const& measure)
@@ -22,9 +22,9 @@ namespace {
 
     /// Some faces between phases: each phase alone runs without waiting for the slow divisions and square roots.
     struct MeasuredBatch {
-        Values<double> x, y, z; // of the area vectors
-        Values<double> areas; // twice
-        Values<double> volumes; // six times
+        BatchValues<double> x, y, z; // of the area vectors
+        BatchValues<double> areas; // twice
+        BatchValues<double> volumes; // six times
 
         void set(std::size_t i, double3 const& vector, double volume)
         {
@@ -64,7 +64,7 @@ namespace {
 
         void setNormals(std::size_t count, CompactNormal* normals) const
         {
-            Values<CompactNormal> batch;
+            BatchValues<CompactNormal> batch;
             for (std::size_t i = 0; i != kBatch; i += CompactNormal::kLanes)
                 CompactNormal::set(&x[i], &y[i], &z[i], &areas[i], &batch[i]);
             std::copy_n(batch.data(), count, normals);
@@ -75,7 +75,7 @@ namespace {
     template <class Visit>
     void forEachPossibleSliver(TriangleBatch const& triangles, std::size_t count, float ratio, Visit const& visit)
     {
-        Values<float> shortest, longest;
+        BatchValues<float> shortest, longest;
         triangles.findEdgeRanges(shortest, longest);
         int any = 0;
         for (std::size_t i = 0; i != kBatch; ++i)

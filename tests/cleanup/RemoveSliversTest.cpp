@@ -208,16 +208,19 @@ TEST(RemoveSlivers, SurvivesSoupsAndPositionsThatAreNotFinite)
     Random random(1);
     for (unsigned int run = 0; run != 3000; ++run) {
         SCOPED_TRACE(run);
-        bool const isSphere = run % 2;
-        MeshBuilder soup =
-            MeshBuilder::of(std::vector<float3>(6 + random.below(20)), std::vector<MeshBuilder::Triangle>(30));
-        if (isSphere)
-            soup = MeshBuilder::sphere(2);
+        unsigned int const kind = run % 3, changedOneIn = kind == 0 ? 1 : kind == 1 ? 16 : 60; // of the corners
+        MeshBuilder soup = kind == 1 ? MeshBuilder::sphere(2) : MeshBuilder::wheel(60); // which has hubs
+        if (kind == 0)
+            soup = MeshBuilder::of(std::vector<float3>(6 + random.below(20)), std::vector<MeshBuilder::Triangle>(30));
         soup = std::move(soup).withNoise(1, run);
         std::size_t const pointCount = soup.points.size();
+        bool const isPinched = run % 6 == 5; // two points become one, which hubs have as a neighbor twice
+        unsigned int const replaced = random.below(pointCount), other = random.below(pointCount);
         for (auto& face : soup.faces)
             for (unsigned int& corner : face)
-                if (!isSphere || random.below(16) == 0)
+                if (isPinched)
+                    corner = corner == replaced ? other : corner;
+                else if (random.below(changedOneIn) == 0)
                     corner = random.below(pointCount);
         auto const mesh = withoutSlivers(soup, 0.7f);
         EXPECT_TRUE(isValid(*mesh));

@@ -163,6 +163,25 @@ TEST(Merge, RefusesWithoutChangingTheOutput)
             EXPECT_FALSE(merge(kind, inputs, *output));
             EXPECT_TRUE(sameContents(*output, *before));
         }
+
+    // 2^32 points or values in all, of one input that occurs 1024 times.
+    constexpr unsigned int kCount = 1u << 22, kTimes = 1u << 10;
+    Orvan::Array<float3> const points(kCount);
+    auto const ofRange = cloudOf(1), output = cloudOf(2);
+    addRangeProperty("range", sPointComp, {0}, *ofRange);
+    addDataProperty<bool>("of range", "range", Orvan::Array<bool>(kCount), *ofRange);
+    auto const before = deepCopy(*output);
+    auto const mergeMany = [&](Kind kind, Orvan::Ptr<Object> const& input) {
+        Inputs inputs;
+        for (unsigned int i = 0; i != kTimes; ++i)
+            inputs.append(input);
+        return merge(kind, inputs, *output);
+    };
+    EXPECT_FALSE(mergeMany(Kind::Meshes, makeMesh(points, {}, {0})));
+    EXPECT_FALSE(mergeMany(Kind::PointClouds, makePointCloud(points)));
+    EXPECT_FALSE(mergeMany(Kind::Strands, makeStrands(points, {0})));
+    EXPECT_THROW(mergeMany(Kind::PointClouds, deepCopy(*ofRange)), std::bad_alloc);
+    EXPECT_TRUE(sameContents(*output, *before));
 }
 
 TEST(Merge, CopiesOtherPropertiesFromTheFirstInputThatHasThem)

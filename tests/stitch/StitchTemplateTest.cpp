@@ -227,6 +227,13 @@ TEST(StitchTemplate, AddsToWhatItHoldsWhenFilled)
     fill({{0, 0, 0}, {2, 0, 0}, {3, 1, 0}, {2, 2, 0}, {0, 2, 0}}, {{1, 0, 0}, {1, 1, 0}});
     EXPECT_EQ(made.getPolySize(), 5);
     EXPECT_EQ(made.getEdgeEndpoints()[3], (Ends{{2, true}}));
+
+    // A weight that is NaN is sorted as 0.
+    auto const withWeight = [](float second) { return Tessara::Modeling::LocalStrand{3, {Weights{0, second, 0, 0}}}; };
+    made.setStrands({withWeight(kNan), withWeight(0.5f), withWeight(-0.5f)});
+    made.setEdgeEndpoints({{{1, false}, {0, false}, {2, false}}, {}, {}});
+    fill({{0, 0, 0}, {90, 0, 0}, {0, 90, 0}}, {{30, 30, 0}, {31, 31, 0}});
+    EXPECT_EQ(made.getEdgeEndpoints()[0], (Ends{{2, false}, {0, false}, {1, false}}));
 }
 
 TEST(StitchTemplate, ComputesMeanValueCoordinates)
@@ -288,6 +295,10 @@ TEST(StitchTemplate, ExcludesTolerancesAndRightAnglesFromEdges)
     EXPECT_EQ(made.computeMeanValueCoordinates(square(), {0.25f, 0.25f, 0}, weights, 0.5f), 0xFFFFFFFF);
     made.findControlPointPos(square(), weights, 0.5f, false, found);
     EXPECT_LT(length(found - float3{0.25f, 0.25f, 0}), 1e-6f);
+    StitchTemplate withoutCorners;
+    Weights height(1);
+    EXPECT_EQ(withoutCorners.computeMeanValueCoordinates({}, {1, 2, 3}, height, 2), 0xFFFFFFFF);
+    EXPECT_EQ(height, Weights{1.5f});
     // A short edge subtends a right angle at the point, in a triangle smaller than the tolerance.
     EXPECT_EQ(made.computeMeanValueCoordinates({{0.25f, 0, 0}, {1, 0, 0}, {0, 1, 0}, {0, 0.25f, 0}}, {}, weights, 0.5f),
         0xFFFFFFFF);

@@ -93,4 +93,8 @@ TEST(HalfEdgeDataStructure, ClearsSwapsAndStartsEmpty)
     tetrahedron.clear();
     EXPECT_EQ(edges.halfEdge(3, 0), (HalfEdge{1, 1, 3}));
     EXPECT_EQ(tetrahedron.size(), 0);
+    auto neighbor = edges.neighbors(3).begin();
+    auto const first = neighbor++;
+    EXPECT_EQ((*first).point, 0);
+    EXPECT_EQ((*neighbor).point, 1);
 }

@@ -209,6 +209,8 @@ TYPED_TEST(VoxelSampling, GivesTheSameValuesInRows)
             if (offsetType == 7)
                 expectSameInRows(samplerOf(volume, {offset, offset, 0}, &padded), 6 * TypeParam::kSide);
         }
+        for (float3 const odd : {float3{0, kNan, 0}, {0, 0, kNan}, {0, -1000, 0}, {0, 0, 77}})
+            expectSameInRows(samplerOf(volume, odd), 6 * TypeParam::kSide);
     }
 }
 
@@ -359,8 +361,10 @@ TYPED_TEST(VoxelSampling, FindsBackgroundOutside)
         {kNan, std::numeric_limits<float>::infinity(), -3e9f, 2147483648.0f, 1e30f, -2147483648.0f, 100.0f})
         for (float3 const p : {float3{far, 0, 0}, {0, far, 0}, {0, 0, far}})
             EXPECT_EQ(sampled(sampler, p), kBackground) << far;
-    for (int const depth : {TypeParam::kUnitDepth - 1, -5})
+    for (int const depth : {TypeParam::kUnitDepth - 1, 0, -5}) {
         EXPECT_EQ(sampled(sampler, {0, 0, 0}, depth), kBackground) << "no data at that depth";
+        EXPECT_EQ(sampledInRows(sampler, std::vector<float3>(9), depth), std::vector<float>(9, kBackground));
+    }
 }
 
 TYPED_TEST(VoxelSampling, ReadsCoarseAndFineTilesInAnyOrder)

@@ -143,6 +143,13 @@ namespace {
             Orvan::String dataName = name;
             dataName += std::to_string(data).c_str();
             addDataOfAnyType(dataName, name, random.below(8) == 0 ? 0 : dataLength, random, object);
+            if (random.below(12) == 0)
+                replaceIn(dataName, sData, Orvan::Ptr<Orvan::Array<float>>(), object);
+        }
+        if (random.below(12) == 0) {
+            Orvan::String rangeName = name;
+            rangeName += "range";
+            addRangeProperty(rangeName, name, {0}, object); // a range of a range
         }
     }
 

@@ -231,7 +231,17 @@ TEST(Validators, ReportSuspiciousProperties)
     addDataProperty<float>("tint", "range", {1, 2}, *mesh);
     addRangeProperty("fine", sFaceComp, {kInvalidIndex, 0}, *mesh);
     addDataProperty<float>("fineData", "fine", {1}, *mesh);
+    addDataProperty<float>("other", "weight", {1}, *mesh);
+    addDataProperty<float>("hollow", sPointComp, {1}, *mesh);
+    addRangeProperty("bare", sFaceComp, {0, 0}, *mesh);
+    for (auto const& [name, key] : {std::pair{"hollow", sData}, {"bare", sIndices}}) {
+        Object property = **mesh->getProperty(name).get<Orvan::Ptr<Object>>();
+        property.setProperty(key, 1.5f);
+        mesh->setProperty(name, Orvan::makePtr<Object>(property));
+    }
     EXPECT_THAT(toStrings(reportProperties(*mesh)),
         ElementsAre("\"weight\" has 2 entries for 4 elements of sPointComp",
-            "\"astray\" targets \"nowhere\", which does not exist", "\"range\"[1] is 2, but \"tint\" has 2 values"));
+            "\"astray\" targets \"nowhere\", which does not exist",
+            "\"other\" targets \"weight\", which does not exist", "\"hollow\" holds no array of a known element type",
+            "\"range\"[1] is 2, but \"tint\" has 2 values", "\"bare\" holds no indices"));
 }
