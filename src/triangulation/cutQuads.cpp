@@ -79,15 +79,14 @@ namespace {
         float2 operator[](unsigned int quad) const { return {x[quad], y[quad]}; }
     };
 
-    /// The quads in which the path from a via b to c makes a strict counter-clockwise turn.
-    IntLanes areCounterClockwise(StoredPoints const& a, StoredPoints const& b, StoredPoints const& c)
+    /// The sharpness of corners b if the path from a via b to c makes a strict counter-clockwise turn, otherwise `kNoEar`.
+    Lanes sharpnessOfTurns(Lanes sharpness, StoredPoints const& a, StoredPoints const& b, StoredPoints const& c)
     {
-        std::int32_t masks[4];
-        for (unsigned int quad = 0; quad != 4; ++quad) // without branches if the predicate is inline
-            masks[quad] = -static_cast<std::int32_t>(isCounterClockwise(a[quad], b[quad], c[quad]));
-        IntLanes lanes;
-        std::memcpy(&lanes, masks, sizeof(lanes));
-        return lanes;
+        float values[4];
+        store(sharpness, values);
+        for (unsigned int quad = 0; quad != 4; ++quad) // compilers use lanes if the host's predicate is inline
+            values[quad] = isCounterClockwise(a[quad], b[quad], c[quad]) ? values[quad] : kNoEar;
+        return load(values);
     }
 
     /// The quads in which p is in the bounding box of the triangle a, b, c.
@@ -164,8 +163,8 @@ namespace {
                 StoredPoints(projected_[2]), StoredPoints(projected_[3])};
             PerCorner<Lanes> sharpness;
             for (unsigned int i = 0; i != 4; ++i)
-                sharpness[i] = sharpnessIf(areCounterClockwise(points[previous(i)], points[i], points[next(i)]),
-                    directions_[previous(i)], directions_[i]);
+                sharpness[i] = sharpnessOfTurns(sharpnessBetween(directions_[previous(i)], directions_[i]),
+                    points[previous(i)], points[i], points[next(i)]);
             return sharpness;
         }
 
@@ -177,9 +176,9 @@ namespace {
             StoredPoints const after(valueAfter(ear, 1, projected_)), across(valueAfter(ear, 2, projected_)),
                 before(valueAfter(ear, 3, projected_));
             Lanes const sharpnessBefore =
-                sharpnessIf(areCounterClockwise(across, before, after), valueAfter(ear, 2, directions_), cut);
+                sharpnessOfTurns(sharpnessBetween(valueAfter(ear, 2, directions_), cut), across, before, after);
             Lanes const sharpnessAfter =
-                sharpnessIf(areCounterClockwise(before, after, across), cut, valueAfter(ear, 1, directions_));
+                sharpnessOfTurns(sharpnessBetween(cut, valueAfter(ear, 1, directions_)), before, after, across);
             PerCorner<Lanes> rest;
             for (unsigned int i = 0; i != 4; ++i) {
                 Lanes const ofNeighbors = ear == lanesOf(next(i)) ? sharpnessBefore : sharpnessAfter;
@@ -187,11 +186,6 @@ namespace {
                 rest[i] = (ear & 1) == lanesOf(i % 2) ? ofEarAndOpposite : ofNeighbors;
             }
             return rest;
-        }
-
-        static Lanes sharpnessIf(IntLanes isTurn, LaneVectors const& entering, LaneVectors const& leaving)
-        {
-            return isTurn ? sharpnessBetween(entering, leaving) : broadcast(kNoEar);
         }
 
         /// Bit q is set if in quad q, a corner that has influenced the result contains its opposite, and so is no ear.
