@@ -4,12 +4,54 @@
 
 #include <TessaraGeometry/Names.h>
 
+#include <array>
 #include <bit>
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <type_traits>
 
 namespace Modeling::Internal {
+
+/// The positions of the set bits of a word, in ascending order. Found without branches, for words with many runs of bits:
+/// the end of each run would be mispredicted.
+class SetBits {
+public:
+    explicit SetBits(std::uint64_t bits)
+    {
+        // The sums of the bits of each two, four and eight; then, in each byte, the sum of all bytes up to it.
+        std::uint64_t counts = bits - ((bits >> 1) & 0x5555555555555555u);
+        counts = (counts & 0x3333333333333333u) + ((counts >> 2) & 0x3333333333333333u);
+        counts = (counts + (counts >> 4)) & 0x0F0F0F0F0F0F0F0Fu;
+        counts *= kEachByte;
+        unsigned int offset = 0;
+        for (unsigned int byte = 0; byte != 8; ++byte) {
+            std::uint64_t const positions = kPositionsInByte[bits >> 8 * byte & 0xFF] + 8 * byte * kEachByte;
+            std::memcpy(positions_ + offset, &positions, sizeof(positions)); // the next byte overwrites the excess
+            offset = static_cast<unsigned int>(counts >> 8 * byte & 0xFF);
+        }
+        count_ = offset;
+    }
+
+    unsigned int count() const { return count_; }
+    unsigned int operator[](unsigned int i) const { return positions_[i]; }
+
+private:
+    static constexpr std::uint64_t kEachByte = 0x0101010101010101u;
+
+    /// For each value of a byte, the positions of its set bits, one per byte from the lowest.
+    static constexpr std::array<std::uint64_t, 256> kPositionsInByte = [] {
+        std::array<std::uint64_t, 256> table{};
+        for (unsigned int value = 0; value != 256; ++value)
+            for (unsigned int bit = 8; bit-- != 0;)
+                if ((value >> bit & 1) != 0)
+                    table[value] = table[value] << 8 | bit;
+        return table;
+    }();
+
+    std::uint8_t positions_[64];
+    unsigned int count_;
+};
 
 /// The elements of a component that a deletion keeps, in a fifth of a byte per element: a bit for each, and for each
 /// word of bits the number of elements kept before it. So any range of words can be compacted on its own.
@@ -46,7 +88,7 @@ public:
     /// Visits the kept elements of a range of words, in ascending order: `visit(source, target, count)` for `count`
     /// successive elements from the old index `source`, whose new indices begin at `target`. The count is a
     /// `std::uint64_t`, or `One` where runs are short.
-    template <class Visit> void visitRuns(std::size_t firstWord, std::size_t endWord, Visit const& visit) const;
+    template <class Visit> void visitRuns(std::size_t firstWord, std::size_t endWord, Visit visit) const;
 
 private:
     static constexpr std::uint64_t kAll = ~std::uint64_t{0};
@@ -55,7 +97,10 @@ private:
     static bool hasManyRuns(std::uint64_t bits)
     {
         constexpr int kManyRuns = 6;
-        return std::popcount(bits & ~(bits << 1)) > kManyRuns;
+        std::uint64_t starts = bits & ~(bits << 1);
+        for (int run = 0; run != kManyRuns; ++run)
+            starts &= starts - 1; // clears the lowest
+        return starts != 0;
     }
 
     std::uint64_t oldCount_;
@@ -63,8 +108,7 @@ private:
     IndexArray ranks_; // of each word, and the number of kept elements
 };
 
-template <class Visit>
-void KeptElements::visitRuns(std::size_t firstWord, std::size_t endWord, Visit const& visit) const
+template <class Visit> void KeptElements::visitRuns(std::size_t firstWord, std::size_t endWord, Visit visit) const
 {
     std::uint64_t const* const words = bits_.data;
     std::uint64_t target = ranks_[firstWord];
@@ -78,19 +122,17 @@ void KeptElements::visitRuns(std::size_t firstWord, std::size_t endWord, Visit c
             visit(base, target, count);
             target += count;
         } else if (hasManyRuns(bits)) {
-            auto const visitLowest = [&](std::uint64_t newIndex) {
-                visit(base + static_cast<unsigned int>(std::countr_zero(bits)), newIndex, One());
-                bits &= bits - 1;
-            };
-            std::uint64_t const end = target + static_cast<unsigned int>(std::popcount(bits));
-            for (; target + 4 <= end; target += 4) { // a quarter of the jumps
-                visitLowest(target);
-                visitLowest(target + 1);
-                visitLowest(target + 2);
-                visitLowest(target + 3);
+            SetBits const kept(bits);
+            unsigned int i = 0;
+            for (; i + 4 <= kept.count(); i += 4) { // a quarter of the jumps
+                visit(base + kept[i], target + i, One());
+                visit(base + kept[i + 1], target + i + 1, One());
+                visit(base + kept[i + 2], target + i + 2, One());
+                visit(base + kept[i + 3], target + i + 3, One());
             }
-            for (; target != end; ++target)
-                visitLowest(target);
+            for (; i != kept.count(); ++i)
+                visit(base + kept[i], target + i, One());
+            target += kept.count();
         } else {
             while (bits != 0) {
                 auto const first = static_cast<unsigned int>(std::countr_zero(bits));

@@ -2,6 +2,7 @@
 
 #include <TessaraMathSupport/Types.h>
 
+#include <cmath>
 #include <cstdint>
 #include <cstring>
 
@@ -56,6 +57,15 @@ inline Lanes max(Lanes a, Lanes b)
     return a > b ? a : b;
 }
 
+inline Lanes squareRoot(Lanes lanes)
+{
+    float roots[4]; // compilers turn the loop into one instruction
+    store(lanes, roots);
+    for (float& root : roots)
+        root = std::sqrt(root);
+    return load(roots);
+}
+
 /// The absolute value of each lane; NaN remains NaN.
 inline Lanes abs(Lanes lanes)
 {
@@ -66,6 +76,16 @@ inline Lanes abs(Lanes lanes)
 inline Lanes selectOrZero(IntLanes mask, Lanes lanes)
 {
     return reinterpret_cast<Lanes>(mask & reinterpret_cast<IntLanes>(lanes));
+}
+
+/// Bit i is set if lane i of the mask is.
+inline unsigned int bitsOf(IntLanes mask)
+{
+    std::uint64_t halves[2];
+    IntLanes const bits = mask & IntLanes{1, 2, 4, 8};
+    std::memcpy(halves, &bits, sizeof(halves));
+    std::uint64_t const both = halves[0] | halves[1];
+    return static_cast<unsigned int>(both | both >> 32);
 }
 
 /// Whether all lanes of a mask are set.

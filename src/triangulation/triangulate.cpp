@@ -1,5 +1,6 @@
 #include <Modeling/triangulate.h>
 
+#include "cutQuads.h"
 #include "frame/Arrays.h"
 #include "frame/Assert.h"
 #include "frame/ElementTypes.h"
@@ -9,6 +10,7 @@
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometryVolume/ChannelParser.h>
 
+#include <array>
 #include <limits>
 #include <new>
 #include <numeric>
@@ -48,26 +50,92 @@ namespace {
         return OffsetView(*mesh.faceOffset).sizeWithin(mesh.faceVertex->size, face);
     }
 
-    /// Cuts one face: `source` receives, for each corner of its triangles, the corner of the mesh that it comes from.
-    void cutFace(MeshArrays const& mesh, unsigned int face, std::span<unsigned int> source,
-        Modeling::Internal::PolygonStorage& storage)
-    {
-        unsigned int const firstCorner = mesh.faceOffset->data[face];
-        unsigned int const cornerCount = cornerCountOf(mesh, face);
-        unsigned int const* const vertex = mesh.faceVertex->data + firstCorner;
-        float3 const* const position = mesh.positions->data;
-        MODELING_ASSERT(areBelow(mesh.positions->size, vertex, cornerCount));
-        if (cornerCount > 3) {
-            float3* const corners = storage.positions.take(cornerCount);
-            for (unsigned int i = 0; i != cornerCount; ++i)
-                corners[i] = position[vertex[i]];
-            Modeling::Internal::triangulatePolygon({corners, cornerCount}, source, storage);
-        } else {
-            std::iota(source.begin(), source.end(), 0u);
+    /// Cuts the faces of a range, quads four at once.
+    class FaceCutter {
+    public:
+        /// \param triangulation  Its `sourceCorner` receives the corners of the triangles.
+        FaceCutter(MeshArrays const& mesh, Triangulation& triangulation)
+            : mesh_(mesh)
+            , offset_(mesh.faceOffset->data)
+            , triangleOffset_(triangulation.triangleOffset.data)
+            , sourceCorner_(triangulation.sourceCorner.data)
+        {
         }
-        for (unsigned int& corner : source)
-            corner += firstCorner;
-    }
+
+        /// Quads may be delayed.
+        void cut(unsigned int face)
+        {
+            unsigned int const triangleCount = triangleOffset_[face + 1] - triangleOffset_[face];
+            if (triangleCount == 0)
+                return;
+            MODELING_ASSERT(areBelow(mesh_.positions->size, verticesOf(face), triangleCount + 2));
+            if (triangleCount == 2) {
+                quads_[quadCount_++] = face;
+                if (quadCount_ == quads_.size())
+                    cutFourQuads();
+            } else if (triangleCount == 1) {
+                std::iota(sourcesOf(face), sourcesOf(face) + 3, offset_[face]);
+            } else {
+                cutAlone(face, triangleCount);
+            }
+        }
+
+        void finish()
+        {
+            for (unsigned int quad = 0; quad != quadCount_; ++quad)
+                cutAlone(quads_[quad], 2);
+            quadCount_ = 0;
+        }
+
+    private:
+        void cutFourQuads()
+        {
+            std::array<float3, 16> corners;
+            for (unsigned int quad = 0; quad != 4; ++quad)
+                gather(quads_[quad], {&corners[4 * quad], 4});
+            std::array<unsigned int, 24> triangles;
+            unsigned int const cut = Modeling::Internal::cutQuads(corners, triangles);
+            for (unsigned int quad = 0; quad != 4; ++quad)
+                if ((cut >> quad & 1) != 0)
+                    for (unsigned int i = 0; i != 6; ++i)
+                        sourcesOf(quads_[quad])[i] = offset_[quads_[quad]] + triangles[6 * quad + i];
+                else
+                    cutAlone(quads_[quad], 2);
+            quadCount_ = 0;
+        }
+
+        void cutAlone(unsigned int face, unsigned int triangleCount)
+        {
+            std::span<float3> const corners(storage_.positions.take(triangleCount + 2), triangleCount + 2);
+            gather(face, corners);
+            std::span<unsigned int> const sources(sourcesOf(face), std::size_t{3} * triangleCount);
+            Modeling::Internal::triangulatePolygon(corners, sources, storage_);
+            for (unsigned int& corner : sources)
+                corner += offset_[face];
+        }
+
+        void gather(unsigned int face, std::span<float3> corners) const
+        {
+            unsigned int const* const vertex = verticesOf(face);
+            float3 const* const position = mesh_.positions->data;
+            for (std::size_t i = 0; i != corners.size(); ++i)
+                corners[i] = position[vertex[i]];
+        }
+
+        unsigned int const* verticesOf(unsigned int face) const { return mesh_.faceVertex->data + offset_[face]; }
+        unsigned int* sourcesOf(unsigned int face) const
+        {
+            return sourceCorner_ + std::size_t{3} * triangleOffset_[face];
+        }
+
+        MeshArrays const& mesh_;
+        unsigned int const* const offset_;
+        unsigned int const* const triangleOffset_;
+        unsigned int* const sourceCorner_;
+        Modeling::Internal::PolygonStorage storage_;
+        std::array<unsigned int, 4> quads_; // faces
+        unsigned int quadCount_ = 0;
+    };
 
     Triangulation cutFaces(MeshArrays const& mesh)
     {
@@ -81,20 +149,17 @@ namespace {
             throw std::bad_alloc();
         triangulation.sourceCorner = uninitializedArray<unsigned int>(cornerCount);
 
-        unsigned int const* const triangleOffset = triangulation.triangleOffset.data;
-        unsigned int* const sourceCorner = triangulation.sourceCorner.data;
         // Each face writes its own triangles.
         parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [&](auto const& faces) {
-            Modeling::Internal::PolygonStorage storage;
-            for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
-                std::size_t const begin = std::size_t{3} * triangleOffset[face];
-                std::size_t const end = std::size_t{3} * triangleOffset[face + 1];
-                if (begin != end)
-                    cutFace(mesh, face, {sourceCorner + begin, end - begin}, storage);
-            }
+            FaceCutter cutter(mesh, triangulation);
+            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
+                cutter.cut(face);
+            cutter.finish();
         });
-        MODELING_ASSERT(areOffsets(triangleOffset, mesh.faceCount, triangulation.sourceCorner.size / 3));
-        MODELING_ASSERT(areBelow(mesh.faceVertex->size, sourceCorner, triangulation.sourceCorner.size));
+        MODELING_ASSERT(
+            areOffsets(triangulation.triangleOffset.data, mesh.faceCount, triangulation.sourceCorner.size / 3));
+        MODELING_ASSERT(
+            areBelow(mesh.faceVertex->size, triangulation.sourceCorner.data, triangulation.sourceCorner.size));
         return triangulation;
     }
 

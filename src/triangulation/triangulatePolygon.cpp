@@ -1,7 +1,7 @@
 #include "triangulatePolygon.h"
 
 #include "PolygonPlane.h"
-#include "cutQuad.h"
+#include "clipSmallPolygon.h"
 
 #include "frame/Assert.h"
 
@@ -91,7 +91,7 @@ namespace {
             auto const count = static_cast<unsigned int>(positions_.size());
             for (unsigned int i = 0; i != count; ++i) {
                 PolygonStorage::Corner& corner = corners_[i];
-                corner.projected = rotateAndDropZ(rotation, positions_[i]);
+                corner.projected = rotateAndDropZ<float2>(rotation, positions_[i]);
                 corner.previous = (i == 0 ? count : i) - 1;
                 corner.next = i + 1 == count ? 0 : i + 1;
                 corner.toNext = directionBetween(i, corner.next);
@@ -207,8 +207,8 @@ void triangulatePolygon(std::span<float3 const> corners, std::span<unsigned int>
     bool isCut = false;
     if (corners.size() > 3)
         if (std::optional<Quaternion> const rotation = findPlane(corners))
-            isCut = corners.size() == 4 ? cutQuad(corners.first<4>(), *rotation, triangles.first<6>())
-                                        : EarClipping(corners, storage).run(*rotation, triangles);
+            isCut = corners.size() <= kSmallPolygon ? clipSmallPolygon(corners, *rotation, triangles)
+                                                    : EarClipping(corners, storage).run(*rotation, triangles);
     if (!isCut)
         writeFan(triangles);
     MODELING_ASSERT(areBelow(corners.size(), triangles.data(), triangles.size()));

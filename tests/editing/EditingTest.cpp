@@ -382,7 +382,7 @@ std::vector<Flags> deletionPatterns(std::size_t count, Random& random)
     };
     return {flags([](std::size_t) { return false; }), flags([](std::size_t) { return true; }),
         flags([&](std::size_t) { return random.below(2) == 0; }), flags([](std::size_t i) { return i / 100 % 2 == 1; }),
-        flags([&](std::size_t) { return random.below(10'000) == 0; }),
+        flags([](std::size_t i) { return i % 7 == 0; }), flags([&](std::size_t) { return random.below(10'000) == 0; }),
         flags([=](std::size_t i) { return i == count / 2; }), flags([=](std::size_t i) { return i < count / 3; }),
         flags([&](std::size_t i) { return i > 1000 && random.below(100) != 0; })};
 }

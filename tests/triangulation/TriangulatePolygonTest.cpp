@@ -1,4 +1,5 @@
 #include "triangulation/triangulatePolygon.h"
+#include "triangulation/cutQuads.h"
 
 #include "frame/VectorMath.h"
 #include "support/Testing.h"
@@ -114,4 +115,28 @@ TEST(TriangulatePolygon, GivesTheSameTrianglesInAllBuilds)
     for (int run = 0; run != 20'000; ++run)
         add(soup(5 + random.below(run % 50 ? 12 : 150), random));
     EXPECT_EQ(hash, 547060884204956746u) << "polygons";
+}
+
+TEST(TriangulatePolygon, CutsFourQuadsAtOnceAsItCutsEach)
+{
+    Random random(2);
+    std::size_t cutCount = 0;
+    for (int run = 0; run != 100'000; ++run) {
+        Corners corners;
+        for (int quad = 0; quad != 4; ++quad)
+            for (float3 const& corner :
+                run % 2 == 0 ? soup(4, random) : PolygonMesh::stars(1, 4, 4, random.below(1000)).points)
+                corners.push_back(corner);
+        unsigned int triangles[24];
+        unsigned int const cut = Modeling::Internal::cutQuads(std::span<float3 const, 16>(corners), triangles);
+        ASSERT_LT(cut, 16u);
+        for (int quad = 0; quad != 4; ++quad) {
+            if ((cut >> quad & 1) == 0)
+                continue;
+            ++cutCount;
+            Triangles const expected = triangulated({corners.begin() + 4 * quad, corners.begin() + 4 * quad + 4});
+            ASSERT_EQ(Triangles(triangles + 6 * quad, triangles + 6 * quad + 6), expected) << run << ", quad " << quad;
+        }
+    }
+    EXPECT_GT(cutCount, 150'000u); // of 400,000: many are flat or have a corner in an ear
 }

@@ -1,6 +1,7 @@
 #include <Modeling/triangulate.h>
 
 #include "support/Testing.h"
+#include "triangulation/triangulatePolygon.h"
 
 using namespace TestSupport;
 using Geometry::Mesh::triangulate;
@@ -47,6 +48,32 @@ TEST(Triangulate, GivesTrianglesTheValuesOfTheirFacesAndCorners)
     EXPECT_EQ(dataOf<int>(*mesh, "color"), dataOf<int>(other, "color"));
     auto const seam = getRangeGeoPropIndices(*mesh, "seam");
     EXPECT_EQ(IndexList(seam->begin(), seam->end()), (IndexList{5, 8, 7, 5, 7, 6, 2, 1, 0}));
+}
+
+TEST(Triangulate, CutsEachFaceOfMixedOnesAsIfItWereAlone)
+{
+    PolygonMesh mesh;
+    IndexList expected;
+    Random random(3);
+    Modeling::Internal::PolygonStorage storage;
+    for (unsigned int run = 0; run != 600; ++run) { // runs of quads of any length, some of them flat
+        unsigned int const cornerCount = run % 3 == 0 ? 3 + random.below(20) : 4;
+        std::vector<float3> corners = PolygonMesh::stars(1, cornerCount, cornerCount, run).points;
+        if (run % 50 == 0)
+            corners.assign(cornerCount, {1, 2, 3});
+        auto const firstCorner = static_cast<unsigned int>(mesh.faceVertex.size());
+        mesh.addPolygon(corners);
+        IndexList triangles(3 * (cornerCount - 2));
+        Modeling::Internal::triangulatePolygon(corners, triangles, storage);
+        for (unsigned int const corner : triangles)
+            expected.push_back(mesh.faceVertex[firstCorner + corner]);
+    }
+    expectSameForThreads({1, 2, 8}, [&] {
+        auto object = mesh.build();
+        triangulate("*", *object);
+        EXPECT_EQ(valuesOf<unsigned int>(*object, sFaceVertex), expected);
+        return object;
+    });
 }
 
 TEST(Triangulate, RemovesPropertiesThatTheChannelsExcludeAndTheirDependents)
