@@ -24,6 +24,11 @@ struct LaneVectors {
     Lanes x, y, z;
 };
 
+/// Four points in a plane, one per lane.
+struct LanePoints {
+    Lanes x, y;
+};
+
 inline LaneVectors operator-(LaneVectors const& a, LaneVectors const& b)
 {
     return {a.x - b.x, a.y - b.y, a.z - b.z};

@@ -2,6 +2,7 @@
 
 #include "frame/Assert.h"
 
+#include <TessaraGeometry/Names.h>
 #include <TessaraSpatial/SpatialQuery.h>
 
 #include <algorithm>
@@ -10,9 +11,9 @@
 
 namespace Modeling::Internal {
 
-namespace {
+using Tessara::Geometry::kInvalidIndex;
 
-    constexpr unsigned int kNone = kSmallPolygon;
+namespace {
 
     /// A set of corners: bit i for corner i.
     using Corners = std::uint32_t;
@@ -53,10 +54,6 @@ namespace {
         return {load(x), load(y), load(z)};
     }
 
-    struct LanePoints {
-        Lanes x, y;
-    };
-
     class SmallPolygon {
     public:
         SmallPolygon(std::span<float3 const> positions, Quaternion const& rotation)
@@ -77,7 +74,7 @@ namespace {
         {
             for (std::size_t triangle = 0;; ++triangle) {
                 unsigned int const ear = nextEar();
-                if (ear == kNone)
+                if (ear == kInvalidIndex)
                     return false;
                 triangles[3 * triangle] = previous_[ear];
                 triangles[3 * triangle + 1] = ear;
@@ -135,16 +132,16 @@ namespace {
             std::fill(sharpness_ + count_, sharpness_ + kSmallPolygon, kNoEar);
         }
 
-        /// The sharpest ear, up to `kSharper` in favor of earlier ones; `kNone` if there is none.
+        /// The sharpest ear, up to `kSharper` in favor of earlier ones; `kInvalidIndex` if there is none.
         unsigned int nextEar()
         {
             for (;;) {
                 float const sharpest = lowestSharpness();
                 if (sharpest == kNoEar)
-                    return kNone;
+                    return kInvalidIndex;
                 // The search in order ends at the sharpest ear if all others are displaced by it.
                 Corners const candidates = cornersUpTo(sharpest + kSharper);
-                if (!std::has_single_bit(candidates))
+                if ((candidates & (candidates - 1)) != 0) // more than one
                     return nextEarInOrder();
                 auto const corner = static_cast<unsigned int>(std::countr_zero(candidates));
                 if (isEar(corner))
@@ -154,7 +151,7 @@ namespace {
 
         unsigned int nextEarInOrder()
         {
-            unsigned int best = kNone;
+            unsigned int best = kInvalidIndex;
             float sharpest = kNoEar;
             for (unsigned int i = 0; i != count_; ++i)
                 // Corners that are not sharper would not change the result, whether they are ears or not.

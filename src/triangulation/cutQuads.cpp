@@ -33,10 +33,6 @@ namespace {
         return IntLanes{} + static_cast<std::int32_t>(value);
     }
 
-    struct LanePoints {
-        Lanes x, y;
-    };
-
     // One value per corner; each lane belongs to one quad.
     template <class T> using PerCorner = std::array<T, 4>;
 
