@@ -136,8 +136,8 @@ inline Sizes withoutLargest(Sizes sizes)
 inline Sizes const kTriangles{{5'000}, {50'000}, {500'000}}; // for cleaning up
 inline Sizes const kPoints{{1'000}, {100'000}, {10'000'000}}, kFaces{{1'000}, {100'000}, {1'000'000}}; // for deleting
 // Points there, points added.
-inline Sizes const kAdded{{1'000, 1'000}, {1'000'000, 1'000}, {1'000'000, 9'000'000}, {9'000'000, 1'000'000}};
-inline Sizes const kAddedInPlace{{1'000, 1'000}, {1'000'000, 1'000}, {10'000'000, 1'000'000}};
+inline Sizes const kAdded{{1'000, 1'000}, {1'000'000, 1'000}, {9'000'000, 1'000'000}};
+inline Sizes const kAddedInPlace{{1'000, 1'000}, {1'000'000, 100'000}, {10'000'000, 1'000'000}};
 inline Sizes const kQuads{{10'000}, {102'400}, {1'000'000}}, kPolygons{{2'000}, {20'000}, {200'000}};
 inline Sizes const kHalfEdges{{100'000}, {2'000'000}, {10'000'000}};
 inline Sizes const kUniform{{1'280}, {20'480}, {81'920}}; // faces of the coarse mesh

@@ -10,19 +10,17 @@
 #include <vtkPoints.h>
 #include <vtkPolyData.h>
 #include <vtkPolygon.h>
-#include <vtkSMPTools.h>
 #include <vtkThreshold.h>
 #include <vtkThresholdPoints.h>
 #include <vtkTriangleFilter.h>
 #include <vtkUnstructuredGrid.h>
 #include <vtkWindowedSincPolyDataFilter.h>
 
+// Some filters use several threads if the environment says VTK_SMP_BACKEND_IN_USE=TBB.
+
 using namespace Benchmarks;
 
 namespace {
-
-/// Filters use one thread unless they are told.
-bool const isParallel = vtkSMPTools::SetBackend("TBB");
 
 template <class T> auto addArray(char const* name, int components, std::size_t count, vtkFieldData* data)
 {

@@ -15,7 +15,7 @@ from benchmark_jobs import measure_jobs
 from benchmark_report import INTRODUCTION, OPERATIONS, OWN, Results, describe_machine, details, draw, overview, quote
 from benchmark_runs import Program, Record, Row, Sample, Setting, count_of, groups_of, in_turns, least
 
-LONG_ENOUGH = 15.0  # seconds: a row that has taken so long in one setting is not measured again
+LONG_ENOUGH = 6.0  # seconds: a row that has taken so long in one setting is not measured again
 TOLERANCE = {"result": 1e-4, "similar_result": 0.2}  # how far results may be apart, as fractions
 
 
@@ -60,7 +60,7 @@ def main() -> None:
     parser.add_argument("output", type=Path, help="the document; the plot goes beside it")
     parser.add_argument("--filter", help="of rows; by default those of operations, and whole jobs")
     parser.add_argument("--rounds", type=int, default=3)
-    parser.add_argument("--seconds", type=float, default=0.1, help="how long each warm run takes at least")
+    parser.add_argument("--seconds", type=float, default=0.05, help="how long each warm run takes at least")
     parser.add_argument("--quote", type=Path, help="a document with lines of the overview, which are replaced")
     parser.add_argument("--packages", nargs="*", default=[], help="whose versions are told")
     options = parser.parse_args()

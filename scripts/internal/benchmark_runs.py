@@ -14,6 +14,7 @@ import time
 from collections.abc import Callable, Iterable
 from pathlib import Path
 
+ENVIRONMENT = {**os.environ, "VTK_SMP_BACKEND_IN_USE": "TBB"}  # else VTK uses one thread
 UNITS = {"ns": 1e-9, "us": 1e-6, "ms": 1e-3, "s": 1.0}
 
 
@@ -62,7 +63,9 @@ def run_process(command: list[str], threads: int) -> tuple[str, float, int]:
     cores = ",".join(str(core) for core in sorted(os.sched_getaffinity(0))[:threads])
     command = ["taskset", "-c", cores, *command]
     start = time.perf_counter()
-    with tempfile.TemporaryFile("w+") as errors, subprocess.Popen(command, stdout=subprocess.PIPE, stderr=errors, text=True) as process:
+    with tempfile.TemporaryFile("w+") as errors, subprocess.Popen(
+        command, stdout=subprocess.PIPE, stderr=errors, text=True, env=ENVIRONMENT
+    ) as process:
         assert process.stdout
         output = process.stdout.read()
         _, status, usage = os.wait4(process.pid, 0)
