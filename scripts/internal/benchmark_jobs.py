@@ -4,6 +4,7 @@ from __future__ import annotations
 
 import dataclasses
 import math
+import multiprocessing
 import statistics
 import subprocess
 import sys
@@ -11,7 +12,6 @@ import tempfile
 from collections.abc import Callable, Iterator
 from pathlib import Path
 
-import numpy as np
 from benchmark_runs import Record, count_of, run_process
 
 Command = Callable[[str, str], list[str]]  # from input and output
@@ -36,6 +36,8 @@ JOBS = [
 
 def write_torus(job: Job, path: Path) -> None:
     """A binary PLY file with a torus of quads that are almost square but not planar, or of halves of them."""
+    import numpy as np
+
     quads = job.faces // (5 - job.corners)
     sides = math.isqrt(quads // 3)
     rings = quads // sides
@@ -96,7 +98,10 @@ def measure_job(job: Job, own: str, programs: Path, rounds: int, threads: list[i
     times: dict[tuple[str, int], list[float]] = {}
     with tempfile.TemporaryDirectory() as folder:
         source, result = Path(folder, "in.ply"), Path(folder, "out.ply")
-        write_torus(job, source)
+        # The peak memory of a process is at least the memory of the one that starts it, so that one has to stay small.
+        writer = multiprocessing.get_context("fork").Process(target=write_torus, args=(job, source))
+        writer.start()
+        writer.join()
         for turn in range(rounds):
             for name in contenders if turn % 2 == 0 else reversed(contenders):
                 for count in threads:

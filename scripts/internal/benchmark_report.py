@@ -76,7 +76,7 @@ OPERATIONS = {
     "triangulate comb": Operation("triangulate one polygon", "triangle"),
     "triangulate attributes": Operation("triangulate bent quads with four attributes", "triangle"),
     "smooth triangles": Operation(
-        "smooth jittered triangles", "face and step",
+        "smooth jittered triangles", "face and step", shown=("500000",),
         note="Methods differ: VTK uses a windowed sinc filter, OpenMesh the tangential component, Open3D weights by distance.",
     ),
     "smooth quads, a corner": Operation("smooth quads", "corner and step"),
