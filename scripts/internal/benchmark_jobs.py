@@ -67,9 +67,11 @@ def face_count(path: Path) -> int:
     sys.exit(f"{path} has no faces")
 
 
-def contenders_of(job: Job, own: str, programs: Path) -> dict[str, Command]:
-    commands: dict[str, Command] = {own: lambda *files: [str(programs / "modeling"), *job.arguments(*files), "--quiet"]}
-    for peer in sorted(programs.glob("modelingJobs-*")):
+def contenders_of(job: Job, own: tuple[str, Path], peers: list[Path]) -> dict[str, Command]:
+    """The library's name and program, and those of peers that know the job."""
+    name, program = own
+    commands: dict[str, Command] = {name: lambda *files: [str(program), *job.arguments(*files), "--quiet"]}
+    for peer in peers:
         known = subprocess.run([peer, "--list"], capture_output=True, text=True, check=True).stdout.split("\n")
         if job.name in known:
             commands[peer.name.partition("-")[2]] = lambda *files, peer=peer: [str(peer), job.name, *files]
@@ -91,9 +93,9 @@ def check_results(job: Job, runs: dict[str, list[dict[str, float]]], own: str) -
             sys.exit(f"{job.name}: the result of {name} has {values[0]['faces']:,} faces, that of the library {expected:,}")
 
 
-def measure_job(job: Job, own: str, programs: Path, rounds: int, threads: list[int], record: Record) -> Iterator[str]:
+def measure_job(job: Job, own: tuple[str, Path], peers: list[Path], rounds: int, threads: list[int], record: Record) -> Iterator[str]:
     """The lines of the table."""
-    contenders = contenders_of(job, own, programs)
+    contenders = contenders_of(job, own, peers)
     runs: dict[str, list[dict[str, float]]] = {}
     times: dict[tuple[str, int], list[float]] = {}
     with tempfile.TemporaryDirectory() as folder:
@@ -108,18 +110,18 @@ def measure_job(job: Job, own: str, programs: Path, rounds: int, threads: list[i
                     run = record.get([job.name, name, count, turn], lambda: run_job(contenders[name], count, source, result))
                     runs.setdefault(name, []).append(run)
                     times.setdefault((name, count), []).append(run["seconds"])
-    check_results(job, runs, own)
+    check_results(job, runs, own[0])
     for name in contenders:
         cells = [f"{min(times[name, count]):.3g}" for count in threads]
-        cells.append(f"{min(times[name, threads[-1]]) / min(times[own, threads[-1]]):.2f}")
+        cells.append(f"{min(times[name, threads[-1]]) / min(times[own[0], threads[-1]]):.2f}")
         cells.append(f"{statistics.median(run['peak'] for run in runs[name]) / 1e6:,.0f}")
         cells.append(f"{runs[name][0]['faces']:,}")
         yield f"| {job.name}, {job.faces:,} faces | {name} | {' | '.join(cells)} |"
 
 
-def measure_jobs(own: str, programs: Path, rounds: int, threads: list[int], record: Record) -> Iterator[str]:
-    headings = ["job", "by", *(f"s, {count_of(count, 'thread')}" for count in threads), f"compared with {own}", "peak MB", "faces written"]
+def measure_jobs(own: tuple[str, Path], peers: list[Path], rounds: int, threads: list[int], record: Record) -> Iterator[str]:
+    headings = ["job", "by", *(f"s, {count_of(count, 'thread')}" for count in threads), "compared", "peak MB", "faces written"]
     yield f"| {' | '.join(headings)} |"
     yield f"|{' --- |' * len(headings)}"
     for job in JOBS:
-        yield from measure_job(job, own, programs, rounds, threads, record)
+        yield from measure_job(job, own, peers, rounds, threads, record)

@@ -19,11 +19,6 @@ LONG_ENOUGH = 6.0  # seconds: a row that has taken so long in one setting is not
 TOLERANCE = {"result": 1e-4, "similar_result": 0.2}  # how far results may be apart, as fractions
 
 
-def programs_in(folder: Path, seconds: float) -> list[Program]:
-    paths = [folder / "modelingBenchmarks", *sorted(folder.glob("modelingPeer-*"))]
-    return [Program(path, seconds) for path in paths]
-
-
 def check_results(group: list[Row], samples: dict[Row, Sample]) -> None:
     """Compares what the contenders got with what the library got."""
     own = next((row for row in group if row in samples and not row.contender), None)
@@ -38,7 +33,9 @@ def check_results(group: list[Row], samples: dict[Row, Sample]) -> None:
 def measure_rows(programs: dict[Row, Program], settings: list[Setting], rounds: int, record: Record) -> Results:
     samples: dict[tuple[Row, Setting], list[Sample]] = {}
     spent: dict[tuple[Row, Setting], float] = {}
+    fresh: dict[Row, Sample] = {}
     groups = groups_of(programs)
+    group_of = {row: group for group in groups for row in group}
     for turn, row in in_turns(rounds, groups):
         for setting in settings:
             if spent.get((row, setting), 0) < LONG_ENOUGH:
@@ -47,11 +44,10 @@ def measure_rows(programs: dict[Row, Program], settings: list[Setting], rounds: 
                 )
                 samples.setdefault((row, setting), []).append(Sample(**run))
                 spent[row, setting] = spent.get((row, setting), 0) + run["process_seconds"]
-    results = {key: least(values) for key, values in samples.items()}
-    fresh = {row: sample for (row, setting), sample in results.items() if setting.is_fresh}
-    for group in groups:
-        check_results(group, fresh)
-    return results
+                if setting.is_fresh and row not in fresh:
+                    fresh[row] = samples[row, setting][0]
+                    check_results(group_of[row], fresh)
+    return {key: least(values) for key, values in samples.items()}
 
 
 def main() -> None:
@@ -61,6 +57,7 @@ def main() -> None:
     parser.add_argument("--filter", help="of rows; by default those of operations, and whole jobs")
     parser.add_argument("--rounds", type=int, default=3)
     parser.add_argument("--seconds", type=float, default=0.05, help="how long each warm run takes at least")
+    parser.add_argument("--peers", action="store_true", help="measure the programs of peers too")
     parser.add_argument("--quote", type=Path, help="a document with lines of the overview, which are replaced")
     parser.add_argument("--packages", nargs="*", default=[], help="whose versions are told")
     options = parser.parse_args()
@@ -70,18 +67,22 @@ def main() -> None:
     warm = settings[len(threads) - 1]
     is_whole = options.filter is None
 
-    programs = programs_in(options.programs, options.seconds)
+    peers = sorted(options.programs.glob("modelingPeer-*")) if options.peers else []
+    peer_jobs = sorted(options.programs.glob("modelingJobs-*")) if options.peers else []
+    programs = [Program(path, options.seconds) for path in [options.programs / "modelingBenchmarks", *peers]]
     by_row = {row: program for program in programs for row in program.rows(options.filter or "")}
     if is_whole:
         by_row = {row: program for row, program in by_row.items() if row.operation in OPERATIONS}
-    files = [*(program.path for program in programs), options.programs / "modeling", *sorted(options.programs.glob("modelingJobs-*"))]
+    files = [*(program.path for program in programs), options.programs / "modeling", *peer_jobs]
     record = Record(options.programs.parent / "runs.jsonl", files, f"{options.seconds} s")
 
     results = measure_rows(by_row, settings, options.rounds, record)
-    jobs = list(measure_jobs(OWN, options.programs, options.rounds, threads, record)) if is_whole else []
+    own = (OWN, options.programs / "modeling")
+    jobs = list(measure_jobs(own, peer_jobs, options.rounds, threads, record)) if is_whole else []
     plot = options.output.with_suffix(".svg")
     summary = list(overview(results, settings, warm))
-    lines = [INTRODUCTION.format(machine=describe_machine(processors, options.packages), rounds=count_of(options.rounds, "round"), seconds=options.seconds)]
+    machine, rounds = describe_machine(processors, options.packages), count_of(options.rounds, "round")
+    lines = [INTRODUCTION.format(machine=machine, rounds=rounds, seconds=options.seconds)]
     lines += ["## Overview\n", *summary]
     if jobs:
         lines += ["\n## Whole jobs\n", "Binary PLY in, binary PLY out: a process from its start to its end.\n", *jobs]
@@ -96,4 +97,7 @@ def main() -> None:
 
 
 if __name__ == "__main__":
-    main()
+    try:
+        main()
+    except KeyboardInterrupt:
+        sys.exit("\nstopped; the same command continues here")
