@@ -83,6 +83,7 @@ def main() -> None:
     summary = list(overview(results, settings, warm))
     machine, rounds = describe_machine(processors, options.packages), count_of(options.rounds, "round")
     lines = [INTRODUCTION.format(machine=machine, rounds=rounds, seconds=options.seconds)]
+    lines += [] if is_whole else ["This run is not a whole one: rows and jobs were left out.\n"]
     lines += ["## Overview\n", *summary]
     if jobs:
         lines += ["\n## Whole jobs\n", "Binary PLY in, binary PLY out: a process from its start to its end.\n", *jobs]

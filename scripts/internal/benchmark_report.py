@@ -194,7 +194,7 @@ def order_of(operations: set[str]) -> list[str]:
 
 def overview(results: Results, settings: list[Setting], warm: Setting) -> Iterator[str]:
     """A line per operation."""
-    yield "| operation, size | ns per | time | in terms of memcpy | peak bytes | peers in terms of that |"
+    yield f"| operation, size | element | ns | ns / {COPY} | peak bytes | peers / {OWN} |"
     yield "| --- | --- | --- | --- | --- | --- |"
     fresh = next(setting for setting in settings if setting.is_fresh)
     groups = [group for group in groups_of(dict.fromkeys(row for row, _ in results)) if not group[0].contender]
@@ -217,7 +217,7 @@ def overview(results: Results, settings: list[Setting], warm: Setting) -> Iterat
 
 def quote(lines: list[str], readme: Path) -> None:
     """Replaces the lines of the README that begin like these."""
-    by_title = {line.split("|")[1]: line for line in lines}
+    by_title = {line.split("|")[1]: line for line in lines if not line.startswith("| ---")}
     text = readme.read_text(encoding="utf-8").split("\n")
     readme.write_text("\n".join(by_title.get(line.split("|")[1], line) if line.startswith("| ") else line for line in text), encoding="utf-8")
 
