@@ -110,7 +110,9 @@ OPERATIONS = {
 INTRODUCTION = """# Benchmarks
 
 Written by `scripts/benchmark --peers`, which installs the peers, builds everything, runs it and checks the results; repeat it on your
-machine. {machine}
+machine.
+
+{machine}
 
 All contenders get the same input. Every case runs in a process of its own, and the contenders of a row take turns, for up to
 {rounds}; the fastest run counts. "Fresh" is the only run of a new process, which includes the first use of memory; the other
@@ -139,8 +141,9 @@ def describe_machine(threads: int, packages: list[str]) -> str:
     compiler = subprocess.run(["g++", "--version"], capture_output=True, text=True, check=True).stdout.splitlines()[0]
     listing = subprocess.run(["dpkg-query", "-W", "-f=${Package} ${Version}\\n", *packages], capture_output=True, text=True).stdout
     versions = [line for line in listing.splitlines() if packages and not line.endswith(" ")]
-    machine = f"{model or platform.machine()}, {count_of(threads, 'processor')}, {memory:.0f} GB, {platform.system()} {platform.release()}"
-    return f"Machine: {machine}; {compiler}{'; ' if versions else ''}{', '.join(versions)}."
+    machine = f"{model or platform.machine()}, {count_of(threads, 'processor')}, {memory:.0f} GB"
+    lines = [f"- Machine: {machine}, {platform.system()} {platform.release()}", f"- Compiler: {compiler}"]
+    return "\n".join(lines + ([f"- Peers: {', '.join(versions)}"] if versions else []))
 
 
 def short(value: float) -> str:
