@@ -50,6 +50,22 @@ Indices everySecondAtRandom(std::size_t points)
     return order;
 }
 
+double areaOf(std::size_t triangles, float3 const* points, unsigned int const* corners)
+{
+    double area = 0;
+    for (unsigned int const* c = corners; c != corners + 3 * triangles; c += 3)
+        area += static_cast<double>(length(cross(points[c[1]] - points[c[0]], points[c[2]] - points[c[0]]))) / 2;
+    return area;
+}
+
+double meanRadius(Points const& points)
+{
+    double sum = 0;
+    for (float3 const point : points)
+        sum += static_cast<double>(length(point));
+    return sum / static_cast<double>(points.size);
+}
+
 std::vector<DrawnPolygon> drawnPolygons(std::size_t pointCount)
 {
     auto const onCircle = [](float turn, float radius) {

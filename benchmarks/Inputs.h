@@ -112,6 +112,11 @@ std::vector<Voxel> bandOfVoxels(std::size_t radius);
 /// The second corners of the faces of a unit sphere, in order of the faces, that are in the band.
 std::vector<float3> pointsInBand(std::size_t faces, float scale);
 
+/// Of the triangles that come first in the corners, which are indices into the points.
+double areaOf(std::size_t triangles, float3 const* points, unsigned int const* corners);
+/// How far points are from the origin on average.
+double meanRadius(Points const& points);
+
 constexpr float kSliverRatio = 0.05f;
 constexpr int kSmoothingSteps = 10;
 constexpr unsigned int kUniformSteps = 4; // give 81 times as many faces
@@ -131,15 +136,15 @@ inline Sizes withoutLargest(Sizes sizes)
 inline Sizes const kTriangles{{5'000}, {50'000}, {500'000}}; // for cleaning up
 inline Sizes const kPoints{{1'000}, {100'000}, {10'000'000}}, kFaces{{1'000}, {100'000}, {1'000'000}}; // for deleting
 // Points there, points added.
-inline Sizes const kAdded{{1'000, 1'000}, {1'000'000, 1'000}, {1'000'000, 9'000'000}, {9'000'000, 1'000'000}};
-inline Sizes const kAddedInPlace{{1'000, 1'000}, {1'000'000, 1'000}, {10'000'000, 1'000'000}};
+inline Sizes const kAdded{{1'000, 1'000}, {1'000'000, 1'000}, {9'000'000, 1'000'000}};
+inline Sizes const kAddedInPlace{{1'000, 1'000}, {1'000'000, 100'000}, {10'000'000, 1'000'000}};
 inline Sizes const kQuads{{10'000}, {102'400}, {1'000'000}}, kPolygons{{2'000}, {20'000}, {200'000}};
 inline Sizes const kHalfEdges{{100'000}, {2'000'000}, {10'000'000}};
 inline Sizes const kUniform{{1'280}, {20'480}, {81'920}}; // faces of the coarse mesh
-inline Sizes const kAdaptive{{5'120}, {81'920}, {1'310'720}};
+inline Sizes const kAdaptive{{5'120}, {81'920}, {640'000}};
 inline Sizes const kSampled{{20'000}, {200'000}, {2'000'000}}, kRadii{{kRadius}, {122}};
 // The number of inputs to merge, and about how many elements each has.
-inline Sizes const kMeshes{{2, 1'000'000}, {10, 200'000}, {100, 20'480}, {3'000, 500}};
+inline Sizes const kMeshes{{2, 1'000'000}, {100, 20'480}, {3'000, 500}};
 inline Sizes const kClouds{{10, 10'000}, {10, 100'000}, {10, 1'000'000}};
 
 }

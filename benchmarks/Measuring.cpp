@@ -1,8 +1,46 @@
 #include "Measuring.h"
 
 #include <cstring>
+#include <fstream>
+#include <string>
+#include <utility>
+
+#include <malloc.h>
 
 namespace Benchmarks {
+
+namespace {
+
+    /// VmRSS or VmHWM, in bytes; 0 if the system does not tell.
+    std::int64_t statusOfProcess(std::string const& name)
+    {
+        std::ifstream status("/proc/self/status");
+        for (std::string line; std::getline(status, line);)
+            if (line.starts_with(name))
+                return 1024 * std::stoll(line.substr(name.size() + 1));
+        return 0;
+    }
+
+}
+
+void PeakMemory::start()
+{
+    static bool isFirst = true;
+    if (!std::exchange(isFirst, false))
+        return;
+    isStarted_ = true;
+    Orvan::releaseCachedBlocks();
+    ::malloc_trim(0);
+    std::ofstream("/proc/self/clear_refs") << 5; // sets VmHWM to VmRSS
+    before_ = statusOfProcess("VmRSS");
+}
+
+void PeakMemory::report(Run const& run, std::size_t elements) const
+{
+    if (isStarted_ && before_ != 0)
+        run.report("peak bytes/element",
+            static_cast<double>(statusOfProcess("VmHWM") - before_) / static_cast<double>(elements));
+}
 
 Row::Row(std::string const& name, Sizes const& sizes, std::vector<std::string> const& variants, Measure const& measure)
 {
@@ -27,7 +65,9 @@ bool Run::copies(std::size_t bytes, std::size_t elements) const
 {
     if (variant != ":memcpy")
         return false;
-    Orvan::Array<unsigned char> const source(bytes);
+    Orvan::Array<unsigned char> const source(bytes, static_cast<unsigned char>(1)); // resident, unlike zeros
+    PeakMemory peak;
+    peak.start();
     for (auto _ : state) {
         Orvan::Array<unsigned char> target(bytes, Orvan::kUninitialized); // by the allocator of the library's arrays
         std::memcpy(target.data, source.data, bytes);
@@ -35,8 +75,10 @@ bool Run::copies(std::size_t bytes, std::size_t elements) const
         benchmark::ClobberMemory();
     }
     state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * static_cast<std::int64_t>(bytes));
-    if (elements != 0)
+    if (elements != 0) {
+        peak.report(*this, elements);
         reportTimePerElement(elements);
+    }
     return true;
 }
 

@@ -46,6 +46,10 @@ struct Run {
     {
         report("working bytes/element", static_cast<double>(bytes) / static_cast<double>(elements));
     }
+    /// A number that all contenders of a row must get, but for rounding: the first run of each process is compared.
+    void reportResult(double value) const { report("result", value); }
+    /// The same if contenders use different methods: the numbers must differ by less than a fifth.
+    void reportSimilarResult(double value) const { report("similar result", value); }
     /// False, unless this is the variant `:memcpy`: then copies that much, and reports no time per element if there are none.
     bool copies(std::size_t bytes, std::size_t elements = 0) const;
 };
@@ -61,23 +65,40 @@ struct Row {
 };
 inline std::vector<std::string> const kBesideCopy{"", ":memcpy"}; // `measure` returns if `run.copies()`
 
+/// How much more memory is resident at the peak than when this is started, in the first run of a process; later runs leave it
+/// alone, because starting returns free memory to the system.
+class PeakMemory {
+public:
+    void start();
+    void report(Run const& run, std::size_t elements) const;
+
+private:
+    bool isStarted_ = false;
+    std::int64_t before_ = 0;
+};
+
 /// Times `work()`, and reports the wall time per element as all of these do. The number of elements may be known only then.
 template <class Work> void timeRuns(Run& run, std::size_t const& elements, Work const& work)
 {
+    PeakMemory peak;
+    peak.start();
     for (auto _ : run.state) {
         work();
         benchmark::ClobberMemory();
     }
+    peak.report(run, elements);
     run.reportTimePerElement(elements);
 }
 
 /// Times `work(made)`. Making and releasing what it works on is not timed.
 template <class Make, class Work> void timeOnEach(Run& run, std::size_t elements, Make const& make, Work const& work)
 {
+    PeakMemory peak;
     for (auto _ : run.state) {
         run.state.PauseTiming();
         {
             auto made = make();
+            peak.start();
             run.state.ResumeTiming();
             work(made);
             benchmark::ClobberMemory();
@@ -85,6 +106,7 @@ template <class Make, class Work> void timeOnEach(Run& run, std::size_t elements
         }
         run.state.ResumeTiming();
     }
+    peak.report(run, elements);
     run.reportTimePerElement(elements);
 }
 
@@ -96,13 +118,14 @@ void timeOnCopies(Run& run, std::size_t elements, Source const& source, Work con
         run, elements, [&] { return source; }, work);
 }
 
-/// Times `edit(copy)` on copies of the source, and reports what it allocates beyond what the result keeps.
-template <class Edit> void measureEdit(Run& run, std::size_t elements, Object const& source, Edit const& edit)
+/// Times `edit(copy)` on copies of the source, and reports what it allocates beyond what the result keeps. Returns one result.
+template <class Edit> Object measureEdit(Run& run, std::size_t elements, Object const& source, Edit const& edit)
 {
     timeOnCopies(run, elements, source, edit);
     Object object = source;
     auto const memory = memoryOf([&] { edit(object); });
     run.reportWorkingBytes(elements, memory.peak - memory.kept);
+    return object;
 }
 
 /// Times `refine()`, which makes a mesh from arrays or shared ones and returns its number of faces: these are the elements.
@@ -112,7 +135,7 @@ template <class Refine> void measureRefinement(Run& run, Refine const& refine)
     auto const work = [&] { faces = refine(); };
     timeRuns(run, faces, work);
     run.reportWorkingBytes(faces, memoryOf(work).peak);
-    run.report("result faces", static_cast<double>(faces));
+    run.reportSimilarResult(static_cast<double>(faces));
 }
 
 }

@@ -8,6 +8,7 @@
 #include <Modeling/deletePointsInPointCloud.h>
 #include <Modeling/mergeMeshes.h>
 #include <Modeling/mergePointClouds.h>
+#include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
 
 #include <algorithm>
@@ -19,6 +20,11 @@ using namespace Tessara::GeometryAlgorithms;
 namespace {
 
 constexpr std::size_t kPointBytes = 32; // in the clouds that are edited and merged
+
+void reportCount(Run& run, char const* component, Object const& result)
+{
+    run.reportResult(getElementCount(result, component));
+}
 
 /// The source and an added value, repeated, in fresh memory.
 template <class T> Orvan::Array<T> extended(Orvan::Array<T> const& source, std::size_t added, T const& value = {})
@@ -43,8 +49,9 @@ Row const adding("addPointsToPointCloud", kAdded, {"", ":memcpy", ":copy and fil
             DoNotOptimize(result.positions.data);
         });
     else
-        measureEdit(
-            run, count, *cloud.build(), [&](Object& object) { addPointsToPointCloud(positions, {}, object, nullptr); });
+        reportCount(run, sPointComp, measureEdit(run, count, *cloud.build(), [&](Object& object) {
+            addPointsToPointCloud(positions, {}, object, nullptr);
+        }));
 });
 
 /// To a cloud that is not shared and has room; its arrays have doubled before.
@@ -106,7 +113,7 @@ Row const deletingPoints("deletePointsInPointCloud", kPoints, {"", ":memcpy", ":
             DoNotOptimize(cloud.positions.data);
         });
     else
-        measureEdit(run, points, *source.build(), edit);
+        reportCount(run, sPointComp, measureEdit(run, points, *source.build(), edit));
 });
 
 /// Marks, numbers and compacts.
@@ -146,30 +153,31 @@ Row const deletingFaces("deleteFaces", kFaces, {"", ":memcpy", ":in place", ":fl
     else if (run.variant == ":flat")
         timeOnCopies(run, sphere.faceCount(), sphere, [&](PatchedSphere& mesh) { deleteFlat(sphere, mesh); });
     else
-        measureEdit(run, sphere.faceCount(), *sphere.build(), edit);
+        reportCount(run, sFaceComp, measureEdit(run, sphere.faceCount(), *sphere.build(), edit));
 });
 
-/// `elements` and `bytes` are those of each input.
-void measureMerging(Run& run, std::size_t elements, std::size_t bytes, decltype(&mergeMeshes) merge,
-    std::function<Orvan::MutablePtr<Object>()> const& makeInput)
+/// `elements` and `bytes` are those of each input, which is made of that component.
+void measureMerging(Run& run, char const* component, std::size_t elements, std::size_t bytes,
+    decltype(&mergeMeshes) merge, std::function<Orvan::MutablePtr<Object>()> const& makeInput)
 {
     if (run.copies(run.size() * bytes, run.size() * elements))
         return;
     Orvan::Array<Orvan::Ptr<Object>> inputs;
     while (inputs.size != run.size())
         inputs.append(makeInput());
-    measureEdit(run, run.size() * elements, Object(), [&](Object& output) { merge(inputs, output, nullptr); });
+    auto const mergeInto = [&](Object& output) { merge(inputs, output, nullptr); };
+    reportCount(run, component, measureEdit(run, run.size() * elements, Object(), mergeInto));
 }
 
 Row const mergingMeshes("mergeMeshes", kMeshes, kBesideCopy, [](Run& run) {
     PatchedSphere const sphere(run.size(1));
     std::size_t const bytes = sphere.bytes() - sizeof(unsigned int); // the offset behind the last face
-    measureMerging(run, sphere.faceCount(), bytes, mergeMeshes, [&] { return sphere.build(); });
+    measureMerging(run, sFaceComp, sphere.faceCount(), bytes, mergeMeshes, [&] { return sphere.build(); });
 });
 
 Row const mergingClouds("mergePointClouds", kClouds, kBesideCopy, [](Run& run) {
     std::size_t const points = run.size(1);
-    measureMerging(run, points, points * kPointBytes, mergePointClouds, [=] {
+    measureMerging(run, sPointComp, points, points * kPointBytes, mergePointClouds, [=] {
         auto cloud = makePointCloud(Points(points, float3{1, 2, 3}));
         addDataProperty("color", sPointComp, Orvan::Array<int>(points, 1), *cloud);
         addDataProperty("weight", sPointComp, Orvan::Array<double>(points, 0.5), *cloud);

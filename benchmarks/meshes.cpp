@@ -63,8 +63,10 @@ Row const slivers("removeSlivers", kTriangles, {"", ":memcpy", ":flat passes"}, 
     if (run.variant == ":flat passes")
         timeRuns(run, run.size(), [mesh = FlatMesh(Meshes::needled, run.size())] { measureFaces(mesh); });
     else
-        measureEdit(run, run.size(), *needled.build(),
-            [](Object& mesh) { ::Geometry::Mesh::removeSlivers(kSliverRatio, mesh); });
+        run.reportSimilarResult(
+            getElementCount(measureEdit(run, run.size(), *needled.build(),
+                                [](Object& mesh) { ::Geometry::Mesh::removeSlivers(kSliverRatio, mesh); }),
+                sFaceComp));
 });
 
 /// The shortest edges of all faces end at one of two hubs.
@@ -81,6 +83,7 @@ void measureSmoothing(Run& run, FlatMesh mesh, std::size_t elementsPerStep)
             mesh.points, CoreGL::NOPLogger());
     };
     timeRuns(run, elementsPerStep * kSmoothingSteps, smooth);
+    run.reportSimilarResult(meanRadius(mesh.points));
     run.reportWorkingBytes(elementsPerStep, memoryOf(smooth).peak);
 }
 
@@ -116,8 +119,13 @@ template <auto make> void measureTriangulation(Run& run)
 {
     PolygonMesh const& mesh = made(make, run.size());
     std::size_t const triangles = mesh.triangleCount();
-    if (!run.copies(triangles * kTriangleBytes, triangles))
-        measureEdit(run, triangles, *mesh.build(), triangulateAll);
+    if (run.copies(triangles * kTriangleBytes, triangles))
+        return;
+    Object const result = measureEdit(run, triangles, *mesh.build(), triangulateAll);
+    auto const points = dataOf<float3>(result, sPointPosition);
+    auto const corners = dataOf<unsigned int>(result, sFaceVertex);
+    run.reportResult(getElementCount(result, sFaceComp));
+    run.reportSimilarResult(areaOf(corners->size / 3, points->data, corners->data));
 }
 Row const quads("triangulate quads", kQuads, kBesideCopy, measureTriangulation<Meshes::bentQuads>);
 Row const polygons("triangulate polygons", kPolygons, kBesideCopy, measureTriangulation<Meshes::concave>);

@@ -4,6 +4,7 @@
 #include <Modeling/subdivisionSteps.h>
 
 #include <algorithm>
+#include <numeric>
 #include <random>
 
 using namespace Benchmarks;
@@ -67,6 +68,19 @@ template <class Traits, Layers layers> void measureSampling(Run& run)
                 values[n] = sampler.sample(points[n], Traits::kUnitDepth, kWorldSpace);
         DoNotOptimize(values.data());
     });
+    run.reportResult(std::accumulate(values.begin(), values.end(), 0.0));
+}
+
+/// At all of these voxels.
+template <class Traits> double sumOfValues(Volume<Traits> const& volume, std::vector<Voxel> const& voxels)
+{
+    LinearSampler<Traits> sampler(
+        volume.container, volume.channel, volume.topology, {.scale = 1, .background = volume.background});
+    double sum = 0;
+    for (auto const& [i, j, k, value] : voxels)
+        sum += static_cast<double>(sampler.sample(
+            {static_cast<float>(i), static_cast<float>(j), static_cast<float>(k)}, Traits::kUnitDepth, kWorldSpace));
+    return sum;
 }
 
 template <class Traits> bool addRows(std::string const& suffix, std::vector<std::string> const& variantsOfBuilding)
@@ -79,10 +93,10 @@ template <class Traits> bool addRows(std::string const& suffix, std::vector<std:
     Row("sampleCenteredVolume" + suffix, kSampled, sampling, measureSampling<Traits, Layers::full>);
     Row("buildVolume" + suffix, kRadii, variantsOfBuilding, [](Run& run) {
         std::vector<Voxel> const voxels = bandOfVoxels(run.size());
-        if (run.copies(voxels.size() * sizeof(Voxel)))
+        if (run.copies(voxels.size() * sizeof(Voxel), voxels.size()))
             return;
         timeRuns(run, voxels.size(), [&] { DoNotOptimize(volumeOf<Traits>(voxels)); });
-        run.report("voxels", static_cast<double>(voxels.size()));
+        run.reportResult(sumOfValues(volumeOf<Traits>(voxels), voxels));
     });
     return true;
 }

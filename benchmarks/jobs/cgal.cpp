@@ -19,9 +19,9 @@ int main(int argc, char** argv)
 {
     std::map<std::string, std::function<void(Mesh&)>> const jobs{
         {"triangulate quads", [](Mesh& mesh) { CGAL::Polygon_mesh_processing::triangulate_faces(mesh); }},
-        {"two √3 steps",
+        {"one √3 step",
             [](Mesh& mesh) {
-                CGAL::Subdivision_method_3::Sqrt3_subdivision(mesh, CGAL::parameters::number_of_iterations(2));
+                CGAL::Subdivision_method_3::Sqrt3_subdivision(mesh, CGAL::parameters::number_of_iterations(1));
             }},
     };
     if (argc == 2)

@@ -2,6 +2,7 @@
 
 #include <CGAL/Barycentric_coordinates_2/Mean_value_coordinates_2.h>
 #include <CGAL/Exact_predicates_inexact_constructions_kernel.h>
+#include <CGAL/Polygon_mesh_processing/measure.h>
 #include <CGAL/Polygon_mesh_processing/polygon_soup_to_polygon_mesh.h>
 #include <CGAL/Polygon_mesh_processing/repair_degeneracies.h>
 #include <CGAL/Polygon_mesh_processing/triangulate_faces.h>
@@ -39,10 +40,13 @@ template <class Kernel> Surface<Kernel> surfaceOf(PolygonMesh const& mesh)
 /// gives new ones.
 Row const needles("removeSlivers:CGAL", kTriangles, [](Run& run) {
     constexpr double noCaps = -1; // a cosine that no angle is below
-    timeOnCopies(run, run.size(), surfaceOf<InDouble>(made(Meshes::needled, run.size())), [](auto& mesh) {
+    std::size_t remaining = 0;
+    timeOnCopies(run, run.size(), surfaceOf<InDouble>(made(Meshes::needled, run.size())), [&](auto& mesh) {
         Processing::experimental::remove_almost_degenerate_faces(mesh, noCaps, 1 / kSliverRatio, 0.0);
         mesh.collect_garbage();
+        remaining = mesh.number_of_faces();
     });
+    run.reportSimilarResult(static_cast<double>(remaining));
 });
 
 Row const deletion("deleteFaces:CGAL", kFaces, [](Run& run) {
@@ -60,14 +64,18 @@ Row const deletion("deleteFaces:CGAL", kFaces, [](Run& run) {
         mesh.collect_garbage();
         remaining = mesh.number_of_faces();
     });
-    run.report("remaining", static_cast<double>(remaining));
+    run.reportResult(static_cast<double>(remaining));
 });
 
 template <auto make> void measureTriangulation(Run& run)
 {
     PolygonMesh const& mesh = made(make, run.size());
-    timeOnCopies(run, mesh.triangleCount(), surfaceOf<CGAL::Exact_predicates_inexact_constructions_kernel>(mesh),
-        [](auto& surface) { Processing::triangulate_faces(surface); });
+    auto const source = surfaceOf<CGAL::Exact_predicates_inexact_constructions_kernel>(mesh);
+    timeOnCopies(run, mesh.triangleCount(), source, [](auto& surface) { Processing::triangulate_faces(surface); });
+    auto triangles = source;
+    Processing::triangulate_faces(triangles);
+    run.reportResult(static_cast<double>(triangles.number_of_faces()));
+    run.reportSimilarResult(Processing::area(triangles));
 }
 Row const quads("triangulate quads:CGAL", kQuads, measureTriangulation<Meshes::bentQuads>);
 Row const polygons("triangulate polygons:CGAL", kPolygons, measureTriangulation<Meshes::concave>);
@@ -122,11 +130,17 @@ template <class Kernel> void measureCoordinates(Run& run)
             corners.emplace_back(inPlane(polygon.corners)), CGAL::Barycentric_coordinates::Computation_policy_2::FAST);
     }
     std::vector<typename Kernel::FT> weights(64);
-    timeRuns(run, run.size(), [&] {
+    auto const forEachPoint = [&](auto const& use) {
         for (std::size_t i = 0; i != points.size(); ++i)
-            for (auto const& point : points[i])
+            for (auto const& point : points[i]) {
                 coordinates[i](point, weights.begin());
-    });
+                use();
+            }
+    };
+    timeRuns(run, run.size(), [&] { forEachPoint([] {}); });
+    double sum = 0;
+    forEachPoint([&] { sum += static_cast<double>(weights[0] + 2 * weights[1]); });
+    run.reportResult(sum);
 }
 Row const inFloat("stitch coordinates:CGAL in float", {{200'000}}, measureCoordinates<InFloat>);
 Row const inDouble("stitch coordinates:CGAL in double", {{200'000}}, measureCoordinates<InDouble>);

@@ -38,6 +38,10 @@ Row const smoothing("smooth triangles:OpenMesh", kTriangles, [](Run& run) {
         smoother.initialize(Smoother::Tangential, Smoother::C1);
         smoother.smooth(kSmoothingSteps);
     });
+    Points points;
+    for (auto const point : mesh.vertices())
+        points.append({mesh.point(point)[0], mesh.point(point)[1], mesh.point(point)[2]});
+    run.reportSimilarResult(meanRadius(points));
 });
 
 template <auto make> void measureHalfEdges(Run& run)

@@ -7,9 +7,9 @@ using namespace Benchmarks;
 
 namespace {
 
-/// A point has 48 bytes here, as its vectors are padded.
+using Cloud = pcl::PointCloud<pcl::PointXYZRGBNormal>; // a point has 48 bytes, as its vectors are padded
+
 Row const deletion("deletePointsInPointCloud:PCL", kPoints, [](Run& run) {
-    using Cloud = pcl::PointCloud<pcl::PointXYZRGBNormal>;
     Cloud::Ptr const cloud(new Cloud);
     cloud->resize(run.size());
     pcl::PointIndices::Ptr const picked(new pcl::PointIndices);
@@ -24,7 +24,34 @@ Row const deletion("deletePointsInPointCloud:PCL", kPoints, [](Run& run) {
         filter.filter(result);
         remaining = result.size();
     });
-    run.report("remaining", static_cast<double>(remaining));
+    run.reportResult(static_cast<double>(remaining));
+});
+
+Cloud cloudOf(std::size_t count)
+{
+    Cloud cloud;
+    cloud.resize(count);
+    return cloud;
+}
+
+Row const adding("addPointsToPointCloud:PCL", kAdded, [](Run& run) {
+    Cloud source = cloudOf(run.size()), added = cloudOf(run.size(1));
+    std::size_t count = 0;
+    timeOnCopies(run, run.size() + run.size(1), Cloud(), [&](Cloud& result) {
+        result = source + added;
+        count = result.size();
+    });
+    run.reportResult(static_cast<double>(count));
+});
+
+Row const addingInPlace("addPointsToPointCloudInPlace:PCL", kAddedInPlace, [](Run& run) {
+    Cloud const added = cloudOf(run.size(1));
+    auto const makeRoomy = [&] {
+        Cloud cloud = cloudOf(run.size());
+        cloud.reserve(run.size() + run.size(1));
+        return cloud;
+    };
+    timeOnEach(run, run.size(1), makeRoomy, [&](Cloud& cloud) { cloud += added; });
 });
 
 }

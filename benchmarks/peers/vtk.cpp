@@ -3,16 +3,20 @@
 #include <vtkAOSDataArrayTemplate.h>
 #include <vtkAppendPolyData.h>
 #include <vtkCellArray.h>
+#include <vtkCellArrayIterator.h>
 #include <vtkCellData.h>
 #include <vtkNew.h>
 #include <vtkPointData.h>
 #include <vtkPoints.h>
 #include <vtkPolyData.h>
+#include <vtkPolygon.h>
 #include <vtkThreshold.h>
 #include <vtkThresholdPoints.h>
 #include <vtkTriangleFilter.h>
 #include <vtkUnstructuredGrid.h>
 #include <vtkWindowedSincPolyDataFilter.h>
+
+// Some filters use several threads if the environment says VTK_SMP_BACKEND_IN_USE=TBB.
 
 using namespace Benchmarks;
 
@@ -60,6 +64,14 @@ vtkSmartPointer<vtkPolyData> cloudOf(std::size_t count)
     return polyDataOf({std::vector<float3>(count), {}});
 }
 
+Points pointsOf(vtkPolyData& data)
+{
+    return arrayOf(static_cast<std::size_t>(data.GetNumberOfPoints()), [&](std::size_t i) {
+        double const* const p = data.GetPoint(static_cast<vtkIdType>(i));
+        return float3{static_cast<float>(p[0]), static_cast<float>(p[1]), static_cast<float>(p[2])};
+    });
+}
+
 /// Runs a filter anew each time.
 template <class Filter> void timeFilter(Run& run, std::size_t elements, Filter* filter)
 {
@@ -78,6 +90,7 @@ Row const smoothing("smooth triangles:VTK", kTriangles, [](Run& run) {
     filter->SetInputData(polyDataOf(mesh));
     filter->SetNumberOfIterations(kSmoothingSteps);
     timeFilter(run, mesh.faceCount() * kSmoothingSteps, filter.Get());
+    run.reportSimilarResult(meanRadius(pointsOf(*filter->GetOutput())));
 });
 
 template <auto make> void measureTriangulation(Run& run)
@@ -85,6 +98,13 @@ template <auto make> void measureTriangulation(Run& run)
     vtkNew<vtkTriangleFilter> filter;
     filter->SetInputData(polyDataOf(made(make, run.size())));
     timeFilter(run, made(make, run.size()).triangleCount(), filter.Get());
+    Indices corners;
+    auto const cells = vtk::TakeSmartPointer(filter->GetOutput()->GetPolys()->NewIterator());
+    for (cells->GoToFirstCell(); !cells->IsDoneWithTraversal(); cells->GoToNextCell())
+        for (vtkIdType k = 0; k != 3; ++k)
+            corners.append(static_cast<unsigned int>(cells->GetCurrentCell()->GetId(k)));
+    run.reportResult(static_cast<double>(filter->GetOutput()->GetNumberOfPolys()));
+    run.reportSimilarResult(areaOf(corners.size / 3, pointsOf(*filter->GetOutput()).data, corners.data));
 }
 Row const quads("triangulate quads:VTK", kQuads, measureTriangulation<Meshes::bentQuads>);
 Row const polygons("triangulate polygons:VTK", kPolygons, measureTriangulation<Meshes::concave>);
@@ -96,6 +116,9 @@ template <class MakeInput> void measureAppending(Run& run, std::size_t elements,
     for (std::size_t i = 0; i != run.size(); ++i)
         append->AddInputData(makeInput());
     timeFilter(run, run.size() * elements, append.Get());
+    auto* const result = append->GetOutput();
+    run.reportResult(
+        static_cast<double>(result->GetNumberOfCells() ? result->GetNumberOfCells() : result->GetNumberOfPoints()));
 }
 
 Row const appendingMeshes("mergeMeshes:VTK", kMeshes, [](Run& run) {
@@ -128,7 +151,7 @@ Row const deletingPoints("deletePointsInPointCloud:VTK", kPoints, [](Run& run) {
     filter->SetInputData(cloud);
     filter->ThresholdByLower(0.5);
     timeFilter(run, run.size(), filter.Get());
-    run.report("remaining", static_cast<double>(filter->GetOutput()->GetNumberOfPoints()));
+    run.reportResult(static_cast<double>(filter->GetOutput()->GetNumberOfPoints()));
 });
 
 Row const deletingFaces("deleteFaces:VTK", kFaces, [](Run& run) {
@@ -144,7 +167,33 @@ Row const deletingFaces("deleteFaces:VTK", kFaces, [](Run& run) {
     filter->SetThresholdFunction(vtkThreshold::THRESHOLD_LOWER);
     filter->SetLowerThreshold(0.5);
     timeFilter(run, sphere.faceCount(), filter.Get());
-    run.report("remaining", static_cast<double>(filter->GetOutput()->GetNumberOfCells()));
+    run.reportResult(static_cast<double>(filter->GetOutput()->GetNumberOfCells()));
+});
+
+/// In double precision, by the polygons that VTK has for cells.
+Row const coordinates("stitch coordinates:VTK", {{200'000}}, [](Run& run) {
+    auto const polygons = drawnPolygons(run.size());
+    std::vector<vtkSmartPointer<vtkPolygon>> cells;
+    for (auto const& [corners, points] : polygons) {
+        auto& cell = cells.emplace_back(vtkSmartPointer<vtkPolygon>::New());
+        cell->GetPoints()->SetDataTypeToDouble();
+        for (auto const& p : corners)
+            cell->GetPointIds()->InsertNextId(cell->GetPoints()->InsertNextPoint(p.x, p.y, 0));
+        cell->SetUseMVCInterpolation(true);
+    }
+    double weights[16];
+    auto const forEachPoint = [&](auto const& use) {
+        for (std::size_t i = 0; i != polygons.size(); ++i)
+            for (auto const& p : polygons[i].points) {
+                double const point[3] = {p.x, p.y, 0};
+                cells[i]->InterpolateFunctions(point, weights);
+                use();
+            }
+    };
+    timeRuns(run, run.size(), [&] { forEachPoint([] {}); });
+    double sum = 0;
+    forEachPoint([&] { sum += weights[0] + 2 * weights[1]; });
+    run.reportResult(sum);
 });
 
 }

@@ -13,9 +13,10 @@ import statistics
 import sys
 from pathlib import Path
 
-from benchmark_runs import Program, Row, Setting, in_turns
+from benchmark_runs import Program, Row, Setting, count_of, in_turns
 
 LEAST_CHANGE = 1.03
+FLOORS = ("memcpy", "flat", "copy and fill")  # contenders that are not the library
 
 
 def typical(ratios: list[float]) -> float:
@@ -46,7 +47,7 @@ def print_rows(title: str, rows: list[tuple[Row, float, float]]) -> None:
         print("| row | size | new / old | noise |\n| --- | --- | --- | --- |")
     for row, change, noise in rows:
         name = f"{row.operation}: {row.contender}" if row.contender else row.operation
-        print(f"| {name} | {row.size} | {change:.2f} | {noise:.2f} |")
+        print(f"| {name} | {row.size.replace('/', ' × ')} | {change:.2f} | {noise:.2f} |")
 
 
 def main() -> int:
@@ -61,7 +62,9 @@ def main() -> int:
     old, new = Program(options.old, options.seconds), Program(options.new, options.seconds)
     known = {row.name for row in old.rows(options.filter)}
     here = new.rows(options.filter)
-    rows = [row for row in here if row.name in known and row.contender != "memcpy"]
+    rows = [row for row in here if row.name in known and not row.contender.startswith(FLOORS)]
+    if not rows:
+        sys.exit("no row that both revisions have matches the filter")
     compared = compare(old, new, rows, options.threads, options.rounds)
     # With many rows some exceed the noise by chance, so those that seem slower are measured once more.
     suspects = [row for row, change, noise in compared if change > max(LEAST_CHANGE, noise)]
@@ -72,8 +75,10 @@ def main() -> int:
     print_rows("Slower", slower)
     print_rows("Faster", faster)
     print_rows("Within the noise", [entry for entry in compared if entry not in slower and entry not in faster])
-    if len(rows) < len(here):
-        print("\nOnly one of the builds has:", ", ".join(row.name for row in here if row.name not in known) or "nothing else")
+    added = [row.name for row in here if row.name not in known]
+    if added:
+        print("\nOnly the new revision has:", ", ".join(added))
+    print(f"\n{count_of(len(slower), 'row')} of {len(rows)} became slower")
     return 1 if slower else 0
 
 
