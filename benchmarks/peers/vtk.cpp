@@ -103,7 +103,7 @@ template <auto make> void measureTriangulation(Run& run)
     for (cells->GoToFirstCell(); !cells->IsDoneWithTraversal(); cells->GoToNextCell())
         for (vtkIdType k = 0; k != 3; ++k)
             corners.append(static_cast<unsigned int>(cells->GetCurrentCell()->GetId(k)));
-    run.reportResult(static_cast<double>(filter->GetOutput()->GetNumberOfPolys()));
+    // Not the number of triangles: VTK gives up on some concave polygons (199 of 12,046 triangles are missing).
     run.reportSimilarResult(areaOf(corners.size / 3, pointsOf(*filter->GetOutput()).data, corners.data));
 }
 Row const quads("triangulate quads:VTK", kQuads, measureTriangulation<Meshes::bentQuads>);
