@@ -40,8 +40,8 @@ namespace Geometry::Mesh {
 /// of threads. Linear in the number of faces, plus the valences of both ends for each collapse: many collapses at one
 /// point with many faces take quadratic time. A refused collapse mostly costs the smaller of the two valences, because
 /// the neighbors of such a point, and the faces that refused there, are remembered. Allocates about 30 bytes per face
-/// in addition to the arrays that are written, and 40 to a few hundred bytes per face around such points. If nothing
-/// collapses, nothing is written.
+/// in addition to the arrays that are written (40 if collapses spread beyond the neighbors of needles), and 40 to a few
+/// hundred bytes per face around such points. If nothing collapses, nothing is written.
 ///
 /// Link condition: Dey, Edelsbrunner, Guha, Nekhayev, "Topology preserving edge contraction", 1999.
 MODELING_EXPORT bool removeSlivers(float ratio, Tessara::Object& mesh);

@@ -41,10 +41,12 @@ namespace Geometry::Mesh {
 /// \throws             std::bad_alloc, with the positions unchanged unless oneTBB itself runs out of memory during a
 ///                     step; what the logger throws, after a whole step. Job cancellation is ignored.
 ///
-/// Runs in parallel over faces and points. Sums are taken over ascending faces, so the result is the same for any
-/// number of threads. Each step is linear in the number of corners; a face that visits a point m times costs m times
-/// its corners. Allocates about 32 bytes per point, 8 per corner (12 at first) and 24 per face, whatever the number of
-/// steps.
+/// Runs in parallel over parts of the points: ranges of consecutive indices, several per thread. Sums are taken over
+/// ascending faces, so the result is the same for any number of threads. Each step is linear in the number of corners,
+/// times the number of parts in which a face has points: 1 for most faces if neighboring points have similar indices,
+/// up to 3 for triangles otherwise. A face that visits a point m times costs m times its corners more. Allocates about
+/// 40 bytes per point and 4 per face and part, and 1 per corner if there are faces other than triangles, whatever the
+/// number of steps.
 ///
 /// Tangential smoothing: Botsch, Kobbelt, "A remeshing approach to multiresolution modeling", 2004.
 template <class Logger> void smooth(float amount, unsigned int pointCount, unsigned int faceCount,

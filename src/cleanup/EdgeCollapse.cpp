@@ -2,11 +2,14 @@
 
 #include "frame/Arrays.h"
 #include "frame/Assert.h"
+#include "frame/Lanes.h"
 #include "frame/VectorMath.h"
 
 #include <algorithm>
 #include <array>
+#include <cmath>
 #include <iterator>
+#include <limits>
 #include <optional>
 #include <utility>
 
@@ -109,6 +112,27 @@ namespace {
         float3 opposite; // from the next corner to the one after it
     };
 
+    /// Four vectors, one per lane.
+    struct FourVectors {
+        Lanes x, y, z;
+
+        float3 operator[](int lane) const { return {x[lane], y[lane], z[lane]}; }
+    };
+
+    FourVectors fourVectors(float3 const& a, float3 const& b, float3 const& c, float3 const& d)
+    {
+        return {Lanes{a.x, b.x, c.x, d.x}, Lanes{a.y, b.y, c.y, d.y}, Lanes{a.z, b.z, c.z, d.z}};
+    }
+
+    /// `safeNormalize` for each, at hardly the cost of one.
+    FourVectors normalizeEach(FourVectors const& v)
+    {
+        Lanes const squares = (v.x * v.x + v.y * v.y) + v.z * v.z;
+        Lanes const norms{std::sqrt(squares[0]), std::sqrt(squares[1]), std::sqrt(squares[2]), std::sqrt(squares[3])};
+        Lanes const factors = norms > broadcast(std::numeric_limits<float>::min()) ? 1.0f / norms : broadcast(1);
+        return {v.x * factors, v.y * factors, v.z * factors};
+    }
+
     /// The normal that a face had before the first collapse: the cross product of the directions from its first corner
     /// to the other two. It is not normalized; its length is the sine of the angle between them.
     float3 originalNormal(
@@ -135,14 +159,15 @@ namespace {
         float3 const p0 = mesh.positions[c[around.entry]]; // the point that moves
         float3 const p1 = mesh.positions[c[nextCorner(around.entry)]];
         float3 const p2 = mesh.positions[c[previousCorner(around.entry)]];
-        FaceDirections const now{safeNormalize(p1 - p0), safeNormalize(p2 - p0), safeNormalize(p2 - p1)};
+        FourVectors const directions = normalizeEach(fourVectors(p1 - p0, p2 - p0, p2 - p1, p1 - midpoint));
+        FaceDirections const now{directions[0], directions[1], directions[2]};
 
         // The midpoint must be strictly on the inner side of the opposite edge.
         float3 const normal = cross(now.toFirst, now.toSecond);
         if (dot(cross(normal, now.opposite), midpoint - p1) <= 0)
             return false;
         // The angle between the new normal and the original one must be less than 90 degrees.
-        float3 const newNormal = cross(safeNormalize(p1 - midpoint), safeNormalize(p2 - midpoint));
+        float3 const newNormal = cross(directions[3], safeNormalize(p2 - midpoint));
         return !(dot(newNormal, originalNormal(original, mesh, around, now)) <= 0);
     }
 
@@ -352,18 +377,18 @@ namespace {
 
 }
 
-CollapsingMesh prepareCollapses(MeshArrays const& mesh, Orvan::Array<FaceVisit>&& slivers)
+CollapsingMesh prepareCollapses(MeshArrays const& mesh, Slivers&& slivers)
 {
     CollapsingMesh collapsing;
     {
         PointCorners const around =
             cornersByPoint(mesh.pointCount, mesh.faceVertex->data, std::size_t{3} * mesh.faceCount);
-        collapsing.adjacency = buildFaceAdjacency(mesh.faces(), around);
+        collapsing.adjacency = PartialAdjacency(mesh, slivers.isEnd, around);
         collapsing.valence = countFacesAround(around);
     }
     collapsing.positions = copyOfFirst(mesh.pointCount, *mesh.positions);
     collapsing.faceVertex = copyOfFirst(std::uint64_t{3} * mesh.faceCount, *mesh.faceVertex);
-    collapsing.visits = std::move(slivers);
+    collapsing.visits = std::move(slivers.visits);
     return collapsing;
 }
 

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "frame/FaceAdjacency.h"
+#include "PartialAdjacency.h"
 
 #include <TessaraGeometry/Names.h>
 
@@ -15,6 +15,12 @@ using Tessara::Math::float3;
 
 /// Whether the sweep over the faces must visit a face: only slivers, and faces changed by a collapse, can collapse.
 enum class FaceVisit : unsigned char { None = 0, Sliver = 1, Changed = 2 };
+
+/// The faces that are slivers before the first collapse.
+struct Slivers {
+    Orvan::Array<FaceVisit> visits; // one per face
+    Orvan::Array<unsigned char> isEnd; // for each point whether the shortest edge of a sliver ends there: 1 or 0
+};
 
 /// What a walk around a point with many faces has found. All spokes of such a hub may be the shortest edges of slivers,
 /// and one walk per spoke would take quadratic time.
@@ -34,7 +40,7 @@ struct Hub {
 struct CollapsingMesh {
     Orvan::Array<float3> positions;
     IndexArray faceVertex;
-    FaceAdjacency adjacency;
+    PartialAdjacency adjacency; // known at first around the ends of the slivers' shortest edges
     IndexArray valence; // number of faces around each point; if a closed fan has fewer, the point has other fans
     Orvan::Array<FaceVisit> visits; // one per face
     std::unordered_map<unsigned int, Hub> hubs; // by point; collapses keep them up to date
@@ -70,9 +76,9 @@ struct CollapsingEdge {
 };
 
 /// Copies the mesh and finds its adjacency.
-/// \param mesh     triangles; `pointCount` positions
+/// \param mesh     triangles; `pointCount` positions. Must outlive the result.
 /// \param slivers  which faces the sweep must visit
-CollapsingMesh prepareCollapses(MeshArrays const& mesh, Orvan::Array<FaceVisit>&& slivers);
+CollapsingMesh prepareCollapses(MeshArrays const& mesh, Slivers&& slivers);
 
 /// Whether edge `entry` of the face can collapse: it has a face on both sides, both ends have closed fans, no face
 /// around them turns over, and the surface remains manifold. Takes time linear in the valences of both ends; if the

@@ -7,6 +7,7 @@
 #include "frame/VectorMath.h"
 
 #include <algorithm>
+#include <atomic>
 #include <cstring>
 #include <functional>
 #include <limits>
@@ -61,21 +62,62 @@ namespace {
         return lengths.longest * ratio > lengths.shortest;
     }
 
-    /// Finds the faces that are slivers before the first collapse.
-    Orvan::Array<FaceVisit> findSlivers(MeshArrays const& mesh, float ratio)
+    /// Recognizes most faces that are no slivers by their squared lengths, without square roots.
+    ///
+    /// Let D and s be the longest and the shortest squared length and r the ratio. If the sum of the squares is finite
+    /// and s >= D * limit, `isSliver` is false:
+    /// - No square is NaN or infinite, so that the lengths are the rounded roots of D and s.
+    /// - r is finite, because the limit is NaN or infinite otherwise, and no finite s reaches D times that.
+    /// - If r <= 0 or D = 0, the product longest * r is not positive.
+    /// - Otherwise D * limit is a normal double, so that s > 0 and sqrt(s) >= sqrt(D) * r * (1 + 2^-22). Each root is a
+    ///   normal float, rounded by a factor within 1 +- 2^-24. The product does not overflow, because it is about
+    ///   sqrt(s) at most. If it is a normal float, it is rounded by such a factor too: all three together stay within
+    ///   the margin. If not, it is at most 2^-126, and the shortest length is at least 2^-75.
+    class PlainFaces {
+    public:
+        explicit PlainFaces(float ratio)
+            : limit_(double{ratio} * double{ratio} * (1 + 0x1p-20))
+        {
+        }
+
+        bool contain(unsigned int const* corners, float3 const* position) const
+        {
+            float3 const &a = position[corners[0]], &b = position[corners[1]], &c = position[corners[2]];
+            float const ab = squaredLength(b - a), bc = squaredLength(c - b), ca = squaredLength(a - c);
+            float const shortest = std::min(ab, std::min(bc, ca)), longest = std::max(ab, std::max(bc, ca));
+            return (ab + bc) + ca < std::numeric_limits<float>::infinity()
+                && double{shortest} >= double{longest} * limit_;
+        }
+
+    private:
+        static float squaredLength(float3 const& v) { return dot(v, v); }
+
+        double limit_;
+    };
+
+    Slivers findSlivers(MeshArrays const& mesh, float ratio)
     {
-        Orvan::Array<FaceVisit> visits = uninitializedArray<FaceVisit>(mesh.faceCount);
-        FaceVisit* const visit = visits.data;
+        Slivers slivers{uninitializedArray<FaceVisit>(mesh.faceCount), zeroedArray<unsigned char>(mesh.pointCount)};
         unsigned int const* const corner = mesh.faceVertex->data;
         float3 const* const position = mesh.positions->data;
-        // Each face writes its own entry.
-        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [=](auto const& faces) {
-            for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
-                bool const isFound = isSliver(measureEdges(corner + std::size_t{3} * face, position), ratio);
-                visit[face] = isFound ? FaceVisit::Sliver : FaceVisit::None;
-            }
-        });
-        return visits;
+        PlainFaces const plainFaces(ratio);
+        // Each face writes its own entry. Several may mark a point, with the same value.
+        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain),
+            [=, visit = slivers.visits.data, isEnd = slivers.isEnd.data](auto const& faces) {
+                for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
+                    unsigned int const* const corners = corner + std::size_t{3} * face;
+                    visit[face] = FaceVisit::None;
+                    if (plainFaces.contain(corners, position))
+                        continue;
+                    EdgeLengths const lengths = measureEdges(corners, position);
+                    if (!isSliver(lengths, ratio))
+                        continue;
+                    visit[face] = FaceVisit::Sliver;
+                    for (unsigned int const end : {lengths.shortestEdge, nextCorner(lengths.shortestEdge)})
+                        std::atomic_ref(isEnd[corners[end]]).store(1, std::memory_order_relaxed);
+                }
+            });
+        return slivers;
     }
 
     /// The first face from `face` on that must be visited; the face count if there is none.
@@ -92,12 +134,19 @@ namespace {
         return static_cast<unsigned int>(face);
     }
 
+    /// On one thread, because each collapse changes what later faces are measured and judged by. Collapses whose faces
+    /// share no point commute, so independent ones could run in parallel with the same result, but it is not worth it:
+    /// a needle may go ahead only if no earlier face that is still to be visited can reach its fans, and each collapse
+    /// adds a dozen changed faces to visit. Finding the independent ones takes walks around both ends of all that are
+    /// left, round after round, which is about what a collapse itself costs, and around hubs a round has one. Measuring
+    /// and adjacency, which are the larger part, run in parallel anyway.
     void collapseSlivers(MeshArrays const& original, float ratio, CollapsingMesh& mesh)
     {
         CollapsingEdge edge;
+        PlainFaces const plainFaces(ratio);
         for (unsigned int face = nextVisit(mesh.visits, 0); face != original.faceCount;
              face = nextVisit(mesh.visits, std::uint64_t{face} + 1)) {
-            if (mesh.isRemoved(face))
+            if (mesh.isRemoved(face) || plainFaces.contain(mesh.corners(face), mesh.positions.data))
                 continue;
             EdgeLengths const lengths = measureEdges(mesh.corners(face), mesh.positions.data);
             if (isSliver(lengths, ratio) && canCollapse(original, {face, lengths.shortestEdge}, mesh, edge))
@@ -185,8 +234,8 @@ bool removeSlivers(float ratio, Tessara::Object& mesh)
     if (!original)
         return true;
     MODELING_ASSERT(areBelow(original->pointCount, original->faceVertex->data, std::size_t{3} * original->faceCount));
-    Orvan::Array<FaceVisit> slivers = findSlivers(*original, ratio);
-    if (nextVisit(slivers, 0) == original->faceCount)
+    Slivers slivers = findSlivers(*original, ratio);
+    if (nextVisit(slivers.visits, 0) == original->faceCount)
         return true;
 
     CollapsingMesh collapsing = prepareCollapses(*original, std::move(slivers));

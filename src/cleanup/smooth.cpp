@@ -1,53 +1,53 @@
 #include <Modeling/smooth.h>
 
+#include "PointParts.h"
+
 #include "frame/Arrays.h"
 #include "frame/Assert.h"
-#include "frame/PointCorners.h"
-#include "frame/VectorMath.h"
+#include "frame/Lanes.h"
 #include "host/MeshArrays.h"
 
 #include <TessaraMathSupport/Stepper.h>
 
-#include <utility>
+#include <algorithm>
+#include <atomic>
+#include <cmath>
+#include <limits>
+#include <span>
+#include <vector>
 
 namespace Geometry::Mesh {
 
 using namespace Modeling;
+using namespace Modeling::Internal;
+using Tessara::Math::float3;
 
 namespace {
 
-    /// The faces around each point, ascending; a face is listed once for each of its corners at the point.
-    struct PointFaces {
-        IndexArray offsets; // point count + 1
-        IndexArray faces;
-        IndexArray corners; // which corner of the face is at the point: 0 for its first one
-    };
-
-    /// What a face contributes to its points in a step.
-    struct FaceTerms {
-        float3 normal; // of a triangle, not normalized; zero for other faces
-        float3 middle; // the centroid of a triangle, the mean of the corners of another face
+    /// What a triangle contributes to a point in a step.
+    struct Sample {
+        Lanes normal; // not normalized
+        Lanes centroid;
     };
 
     /// Never reset between steps: targets and normals are means over all steps so far, and existing scenes depend on
     /// it.
     struct PointSums {
-        float3 normals{0, 0, 0};
-        float3 centroids{0, 0, 0};
-        unsigned int count = 0;
-
-        void add(float3 const& normal, float3 const& centroid)
-        {
-            normals = normals + normal;
-            centroids = centroids + centroid;
-            ++count;
-        }
+        Lanes normals{};
+        Lanes centroids{};
     };
 
-    float3 operator/(float3 const& v, float divisor)
-    {
-        return {v.x / divisor, v.y / divisor, v.z / divisor};
-    }
+    /// What is found before the first step, and what the steps add up. Each part has entries for its points, and one
+    /// behind them for all other points.
+    struct Smoothing {
+        FaceView mesh;
+        PointParts parts;
+        Orvan::Array<unsigned char> isRepeated; // see `findRepeatedCorners`
+        Orvan::Array<PointSums> sums;
+        IndexArray sampleCounts;
+
+        static std::size_t entryOf(unsigned int point, std::size_t part) { return point + part; }
+    };
 
     [[maybe_unused]] bool hasFaces(unsigned int faceCount, IndexArray const& faceVertex, IndexArray const& faceOffset)
     {
@@ -55,155 +55,222 @@ namespace {
             && faceOffset[faceCount] <= faceVertex.size;
     }
 
-    PointFaces findPointFaces(FaceView const& mesh, unsigned int pointCount)
+    bool hasOnlyTriangles(FaceView const& mesh)
     {
-        // Corners before the first face and after the last one are ignored.
-        unsigned int const firstCorner = mesh.count == 0 ? 0 : mesh.offsets.begin(0);
-        unsigned int const cornerCount = mesh.count == 0 ? 0 : mesh.offsets.begin(mesh.count) - firstCorner;
-        MODELING_ASSERT(areBelow(pointCount, mesh.faceVertex + firstCorner, cornerCount));
-        IndexArray faceOfCorner = uninitializedArray<unsigned int>(cornerCount);
-        unsigned int* const faceOf = faceOfCorner.data;
-        // Each face writes the entries of its corners.
-        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.count, kElementGrain), [=](auto const& faces) {
+        std::atomic<bool> areTriangles = true;
+        // Any thread may clear the flag, which is read after the loop.
+        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.count, kElementGrain), [&](auto const& faces) {
             for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                std::fill(faceOf + (mesh.offsets.begin(face) - firstCorner),
-                    faceOf + (mesh.offsets.end(face) - firstCorner), face);
+                if (mesh.size(face) != 3)
+                    return areTriangles.store(false, std::memory_order_relaxed);
         });
-
-        PointCorners around = cornersByPoint(pointCount, mesh.faceVertex + firstCorner, cornerCount);
-        MODELING_ASSERT(areOffsets(around.offsets.data, pointCount, cornerCount));
-        IndexArray faces = uninitializedArray<unsigned int>(around.corners.size);
-        // Each entry is written once.
-        parallelFor(tbb::blocked_range<std::size_t>(0, faces.size, kElementGrain),
-            [=, face = faces.data, corner = around.corners.data](auto const& entries) {
-                for (std::size_t entry = entries.begin(); entry != entries.end(); ++entry) {
-                    face[entry] = faceOf[corner[entry]];
-                    corner[entry] -= mesh.offsets.begin(face[entry]) - firstCorner;
-                }
-            });
-        return {std::move(around.offsets), std::move(faces), std::move(around.corners)};
+        return areTriangles.load(std::memory_order_relaxed);
     }
 
-    FaceTerms termsOf(unsigned int const* corner, unsigned int size, float3 const* position)
+    void markRepeated(
+        std::span<unsigned int const> points, std::vector<unsigned int>& sorted, unsigned char* isRepeated)
     {
-        if (size == 3) {
-            float3 const &a = position[corner[0]], &b = position[corner[1]], &c = position[corner[2]];
-            return {cross(b - a, c - a), ((b + a) + c) / 3};
+        sorted.assign(points.begin(), points.end());
+        std::sort(sorted.begin(), sorted.end());
+        std::fill_n(isRepeated, points.size(), points.size() == 1);
+        if (std::adjacent_find(sorted.begin(), sorted.end()) == sorted.end())
+            return;
+        for (std::size_t k = 0; k != points.size(); ++k) {
+            auto const [first, last] = std::equal_range(sorted.begin(), sorted.end(), points[k]);
+            isRepeated[k] = last - first > 1;
         }
-        float3 mean{0, 0, 0};
-        for (unsigned int k = 0; k != size; ++k)
-            mean = mean + position[corner[k]] / static_cast<float>(size);
-        return {{0, 0, 0}, mean};
     }
 
-    void measureFaces(FaceView const& mesh, float3 const* position, Orvan::Array<FaceTerms>& terms)
+    /// Tells for each corner whether its face has the point at another corner too, or no other corner: then the point
+    /// is not simply at two edges of the face. Empty if all faces are triangles, whose points need no distinction.
+    Orvan::Array<unsigned char> findRepeatedCorners(FaceView const& mesh)
     {
-        // Each face writes its own entry.
-        parallelFor(
-            tbb::blocked_range<unsigned int>(0, mesh.count, kFaceGrain), [=, term = terms.data](auto const& faces) {
-                for (unsigned int face = faces.begin(); face != faces.end(); ++face)
-                    term[face] = termsOf(mesh.corners(face), mesh.size(face), position);
-            });
+        if (hasOnlyTriangles(mesh))
+            return {};
+        Orvan::Array<unsigned char> isRepeated = uninitializedArray<unsigned char>(mesh.offsets.begin(mesh.count));
+        // Each face writes the entries of its corners.
+        parallelFor(tbb::blocked_range<unsigned int>(0, mesh.count, kFaceGrain), [&](auto const& faces) {
+            std::vector<unsigned int> sorted;
+            for (unsigned int face = faces.begin(); face != faces.end(); ++face)
+                markRepeated(
+                    mesh.offsets.part(face, mesh.faceVertex), sorted, isRepeated.data + mesh.offsets.begin(face));
+        });
+        return isRepeated;
     }
 
-    /// A polygon as the fan of triangles between its edges and the mean of its corners. Adds the triangles at a point
-    /// to the sums of that point.
-    class FanOfPolygon {
+    Smoothing prepareSmoothing(FaceView const& mesh, unsigned int pointCount)
+    {
+        Smoothing smoothing{mesh, dividePoints(mesh, pointCount), findRepeatedCorners(mesh), {}, {}};
+        std::uint64_t const entryCount = pointCount + smoothing.parts.count();
+        smoothing.sums = filledArray(entryCount, PointSums{});
+        smoothing.sampleCounts = zeroedArray<unsigned int>(entryCount);
+        return smoothing;
+    }
+
+    // The arithmetic of `VectorMath.h` in the lanes of a register.
+
+    Lanes cross(Lanes a, Lanes b)
+    {
+        auto const yzx = [](Lanes v) { return __builtin_shufflevector(v, v, 1, 2, 0, 3); };
+        auto const zxy = [](Lanes v) { return __builtin_shufflevector(v, v, 2, 0, 1, 3); };
+        return yzx(a) * zxy(b) - zxy(a) * yzx(b);
+    }
+
+    float dot(Lanes a, Lanes b)
+    {
+        Lanes const products = a * b;
+        return (products[0] + products[1]) + products[2];
+    }
+
+    Lanes safeNormalize(Lanes v)
+    {
+        float const norm = std::sqrt(dot(v, v));
+        return norm > std::numeric_limits<float>::min() ? v * (1.0f / norm) : v;
+    }
+
+    Sample sampleOf(Lanes a, Lanes b, Lanes c)
+    {
+        return {cross(b - a, c - a), ((b + a) + c) / 3.0f};
+    }
+
+    /// Adds samples to the points of one part. Those of other points go to the entry behind, which nobody reads, so
+    /// that the faces between two parts need no branch.
+    class PartAdder {
     public:
-        FanOfPolygon(FaceView const& mesh, unsigned int face, float3 const& mean, float3 const* position)
-            : corner_(mesh.corners(face))
-            , size_(mesh.size(face))
-            , mean_(mean)
-            , position_(position)
+        PartAdder(Smoothing const& smoothing, std::size_t part)
+            : firstPoint_(smoothing.parts.firstPoint(part))
+            , pointCount_(smoothing.parts.endPoint(part) - firstPoint_)
+            , sums_(smoothing.sums.data + Smoothing::entryOf(firstPoint_, part))
+            , sampleCounts_(smoothing.sampleCounts.data + Smoothing::entryOf(firstPoint_, part))
         {
         }
 
-        /// For a point that is at corner k only: the triangles of the edges before and after it, in ascending order.
-        void addAround(unsigned int k, PointSums& sums) const
-        {
-            unsigned int const before = k == 0 ? size_ - 1 : k - 1;
-            addTriangle(std::min(before, k), sums);
-            if (before != k)
-                addTriangle(std::max(before, k), sums);
-        }
+        bool contains(unsigned int point) const { return point - firstPoint_ < pointCount_; }
 
-        /// For a point that may be at several corners.
-        void addAllAt(unsigned int point, PointSums& sums) const
+        void add(unsigned int point, Sample const& sample) const
         {
-            for (unsigned int k = 0; k != size_; ++k)
-                if (corner_[k] == point || corner_[next(k)] == point)
-                    addTriangle(k, sums);
+            unsigned int const entry = std::min(point - firstPoint_, pointCount_);
+            sums_[entry].normals += sample.normal;
+            sums_[entry].centroids += sample.centroid;
+            ++sampleCounts_[entry];
         }
 
     private:
-        unsigned int next(unsigned int k) const { return k + 1 == size_ ? 0 : k + 1; }
-
-        void addTriangle(unsigned int k, PointSums& sums) const
-        {
-            float3 const &u = position_[corner_[k]], &w = position_[corner_[next(k)]];
-            sums.add(cross(u - mean_, w - mean_), ((mean_ + u) + w) / 3);
-        }
-
-        unsigned int const* corner_;
-        unsigned int size_;
-        float3 mean_;
-        float3 const* position_;
+        unsigned int firstPoint_;
+        unsigned int pointCount_;
+        PointSums* sums_;
+        unsigned int* sampleCounts_;
     };
 
-    void addFacesAround(unsigned int point, FaceView const& mesh, PointFaces const& around, FaceTerms const* terms,
-        float3 const* position, PointSums& sums)
+    void addTriangle(unsigned int const* corner, float3 const* position, PartAdder const& adder)
     {
-        unsigned int const* const face = around.faces.data;
-        unsigned int const begin = around.offsets[point];
-        unsigned int const end = around.offsets[point + 1];
-        for (unsigned int entry = begin; entry != end; ++entry) {
-            FaceTerms const& term = terms[face[entry]];
-            if (mesh.size(face[entry]) == 3) {
-                sums.add(term.normal, term.middle);
+        Sample const sample = sampleOf(load(position[corner[0]]), load(position[corner[1]]), load(position[corner[2]]));
+        adder.add(corner[0], sample);
+        adder.add(corner[1], sample);
+        adder.add(corner[2], sample);
+    }
+
+    /// A polygon as the fan of triangles between its edges and the mean of its corners.
+    class FanOfPolygon {
+    public:
+        FanOfPolygon(std::span<unsigned int const> corners, unsigned char const* isRepeated, float3 const* position)
+            : corners_(corners)
+            , isRepeated_(isRepeated)
+            , position_(position)
+        {
+            for (unsigned int const point : corners)
+                mean_ += load(position[point]) / static_cast<float>(corners.size());
+        }
+
+        /// Adds each triangle to the two points at its edge, but for repeated ones.
+        /// \return whether there are repeated points
+        bool addToSinglePoints(PartAdder const& adder) const
+        {
+            bool hasRepeated = false;
+            for (std::size_t k = 0; k != corners_.size(); ++k) {
+                Sample const sample = sampleAt(k);
+                hasRepeated = hasRepeated || isRepeated_[k];
+                for (std::size_t const end : {k, next(k)})
+                    if (!isRepeated_[end])
+                        adder.add(corners_[end], sample);
+            }
+            return hasRepeated;
+        }
+
+        /// Adds to each repeated point, as often as it is repeated, all triangles at it.
+        void addToRepeatedPoints(PartAdder const& adder) const
+        {
+            for (std::size_t k = 0; k != corners_.size(); ++k) {
+                unsigned int const point = corners_[k];
+                if (!isRepeated_[k] || !adder.contains(point))
+                    continue;
+                for (std::size_t edge = 0; edge != corners_.size(); ++edge)
+                    if (corners_[edge] == point || corners_[next(edge)] == point)
+                        adder.add(point, sampleAt(edge));
+            }
+        }
+
+    private:
+        std::size_t next(std::size_t k) const { return k + 1 == corners_.size() ? 0 : k + 1; }
+
+        Sample sampleAt(std::size_t edge) const
+        {
+            return sampleOf(mean_, load(position_[corners_[edge]]), load(position_[corners_[next(edge)]]));
+        }
+
+        std::span<unsigned int const> corners_;
+        unsigned char const* isRepeated_;
+        float3 const* position_;
+        Lanes mean_{};
+    };
+
+    void addFacesOfPart(Smoothing const& smoothing, std::size_t part, float3 const* position)
+    {
+        FaceView const& mesh = smoothing.mesh;
+        PartAdder const adder(smoothing, part);
+        for (unsigned int const face : smoothing.parts.facesOf(part)) {
+            if (mesh.size(face) == 3) {
+                addTriangle(mesh.corners(face), position, adder);
                 continue;
             }
-            FanOfPolygon const fan(mesh, face[entry], term.middle, position);
-            bool const isAlone = (entry == begin || face[entry - 1] != face[entry])
-                && (entry + 1 == end || face[entry + 1] != face[entry]);
-            if (isAlone)
-                fan.addAround(around.corners[entry], sums);
-            else
-                fan.addAllAt(point, sums);
+            FanOfPolygon const fan(mesh.offsets.part(face, mesh.faceVertex),
+                smoothing.isRepeated.data + mesh.offsets.begin(face), position);
+            if (fan.addToSinglePoints(adder))
+                fan.addToRepeatedPoints(adder);
         }
     }
 
-    void accumulate(FaceView const& mesh, PointFaces const& around, Orvan::Array<FaceTerms> const& terms,
-        float3 const* position, Orvan::Array<PointSums>& sums)
+    Lanes moveOf(PointSums const& sums, unsigned int sampleCount, Lanes position, float increment)
     {
-        auto const pointCount = static_cast<unsigned int>(sums.size);
-        // Each point adds to its own sums; positions do not change meanwhile.
-        parallelFor(tbb::blocked_range<unsigned int>(0, pointCount, kOneRingGrain), [&](auto const& points) {
-            for (unsigned int point = points.begin(); point != points.end(); ++point)
-                addFacesAround(point, mesh, around, terms.data, position, sums[point]);
-        });
-    }
-
-    float3 moveOf(PointSums const& sums, float3 const& position, float increment)
-    {
-        float3 const normal = safeNormalize(sums.normals);
-        float3 const target = sums.centroids / static_cast<float>(sums.count);
-        float3 const move = (target - position) * increment;
+        Lanes const normal = safeNormalize(sums.normals);
+        Lanes const target = sums.centroids / static_cast<float>(sampleCount);
+        Lanes const move = (target - position) * increment;
         return move - normal * dot(normal, move);
     }
 
-    void movePoints(Orvan::Array<PointSums> const& sums, Tessara::Math::Stepper const& stepper, float const* weight,
-        float3* position)
+    void movePointsOfPart(Smoothing const& smoothing, std::size_t part, Tessara::Math::Stepper const& stepper,
+        float const* weight, float3* position)
     {
-        // Each point reads and writes only its own position.
-        parallelFor(tbb::blocked_range<std::size_t>(0, sums.size, kElementGrain), [&](auto const& points) {
-            for (std::size_t point = points.begin(); point != points.end(); ++point) {
-                float3 move = moveOf(sums[point], position[point], stepper.increment());
-                if (weight) {
-                    float const atLeast0 = 0.0f > weight[point] ? 0.0f : weight[point];
-                    move = move * (atLeast0 > 1.0f ? 1.0f : atLeast0);
-                }
-                position[point] = position[point] + move;
+        for (unsigned int point = smoothing.parts.firstPoint(part); point != smoothing.parts.endPoint(part); ++point) {
+            std::size_t const entry = Smoothing::entryOf(point, part);
+            Lanes const old = load(position[point]);
+            Lanes move = moveOf(smoothing.sums[entry], smoothing.sampleCounts[entry], old, stepper.increment());
+            if (weight) {
+                float const atLeast0 = 0.0f > weight[point] ? 0.0f : weight[point];
+                move *= atLeast0 > 1.0f ? 1.0f : atLeast0;
             }
+            Lanes const moved = old + move;
+            position[point] = {moved[0], moved[1], moved[2]};
+        }
+    }
+
+    /// Calls `work(part)` for each part of the points.
+    template <class Work> void forEachPart(Smoothing const& smoothing, Work const& work)
+    {
+        tbb::blocked_range<std::size_t> const all(0, smoothing.parts.count(), kCoarseGrain);
+        parallelFor(all, [&](auto const& parts) {
+            for (std::size_t part = parts.begin(); part != parts.end(); ++part)
+                work(part);
         });
     }
 
@@ -219,13 +286,13 @@ template <class Logger> void smooth(float amount, unsigned int pointCount, unsig
     MODELING_ASSERT(positions.size >= pointCount && (!weights || weights->size >= pointCount));
     MODELING_ASSERT(faceCount == 0 || hasFaces(faceCount, faceVertex, faceOffset));
     FaceView const mesh{faceVertex.data, faceOffset, faceCount};
-    PointFaces const around = findPointFaces(mesh, pointCount);
-    Orvan::Array<FaceTerms> terms = uninitializedArray<FaceTerms>(faceCount);
-    Orvan::Array<PointSums> sums = filledArray(pointCount, PointSums{});
+    Smoothing const smoothing = prepareSmoothing(mesh, pointCount);
+    float const* const weight = weights ? weights->data : nullptr;
     for (; stepper; stepper.step(logger)) {
-        measureFaces(mesh, positions.data, terms);
-        accumulate(mesh, around, terms, positions.data, sums);
-        movePoints(sums, stepper, weights ? weights->data : nullptr, positions.data);
+        // Each part adds to the sums of its own points while positions do not change, then moves these points.
+        forEachPart(smoothing, [&](std::size_t part) { addFacesOfPart(smoothing, part, positions.data); });
+        forEachPart(
+            smoothing, [&](std::size_t part) { movePointsOfPart(smoothing, part, stepper, weight, positions.data); });
     }
 }
 

@@ -3,6 +3,7 @@
 #include "frame/VectorMath.h"
 #include "support/Testing.h"
 
+#include <bit>
 #include <set>
 
 using namespace Modeling;
@@ -38,13 +39,15 @@ private:
         Triangle const face = faces_[f];
         if (face == kRemoved)
             return;
-        std::array<float, 3> lengths;
-        for (unsigned int k = 0; k != 3; ++k)
-            lengths[k] = length(points_[face[(k + 1) % 3]] - points_[face[k]]);
-        auto const [shortest, longest] =
-            std::pair(std::ranges::min_element(lengths), std::ranges::max_element(lengths));
-        auto const e = static_cast<unsigned int>(shortest - lengths.begin());
-        if (*longest * ratio > *shortest)
+        float shortest = std::numeric_limits<float>::max(), longest = -shortest; // count if a length is infinite or NaN
+        unsigned int e = 0;
+        for (unsigned int k = 0; k != 3; ++k) {
+            float const edge = length(points_[face[(k + 1) % 3]] - points_[face[k]]);
+            e = shortest > edge ? k : e;
+            shortest = shortest > edge ? edge : shortest;
+            longest = longest < edge ? edge : longest;
+        }
+        if (longest * ratio > shortest)
             collapseIfAllowed(face[e], face[(e + 1) % 3]);
     }
 
@@ -82,7 +85,7 @@ private:
             std::ranges::find_if(face, [=](unsigned int p) { return p == a || p == b; }) - face.begin());
         float3 const p0 = points_[face[i]], p1 = points_[face[(i + 1) % 3]], p2 = points_[face[(i + 2) % 3]];
         float3 const inward = cross(normalOf(p0, p1, p2), safeNormalize(p2 - p1));
-        return dot(inward, middle - p1) > 0 && dot(normalOf(middle, p1, p2), normals_[f]) > 0;
+        return !(dot(inward, middle - p1) <= 0) && !(dot(normalOf(middle, p1, p2), normals_[f]) <= 0); // NaN passes
     }
 
     std::vector<float3> points_, normals_;
@@ -119,20 +122,26 @@ MeshBuilder dependentNeedlesAtHubs()
     return mesh;
 }
 
+/// The bits of a position; the same for every NaN, because those depend on the compiler.
+std::array<unsigned int, 3> bitsOf(float3 const& p)
+{
+    auto const bits = [](float c) { return c == c ? std::bit_cast<unsigned int>(c) : ~0u; };
+    return {bits(p.x), bits(p.y), bits(p.z)};
+}
+
 /// The directed edges by the positions of their ends, and how often each occurs.
-std::map<std::array<float, 6>, int> edgesOf(Object const& mesh, bool onlyOdd = false)
+auto edgesOf(Object const& mesh, bool onlyOdd = false)
 {
     auto const corners = valuesOf<unsigned int>(mesh, sFaceVertex);
     auto const positions = valuesOf<float3>(mesh, sPointPosition);
-    std::map<std::array<float, 6>, int> edges;
+    std::map<std::array<std::array<unsigned int, 3>, 2>, int> edges;
     for (std::size_t corner = 0; corner != corners.size(); ++corner) {
-        float3 const a = positions[corners[corner]], b = positions[corners[corner % 3 == 2 ? corner - 2 : corner + 1]];
-        ++edges[{a.x, a.y, a.z, b.x, b.y, b.z}];
+        std::size_t const next = corner % 3 == 2 ? corner - 2 : corner + 1;
+        ++edges[{bitsOf(positions[corners[corner]]), bitsOf(positions[corners[next]])}];
     }
     auto const all = edges;
     std::erase_if(edges, [&](auto const& edge) { // which is neither at a boundary nor non-manifold
-        auto const [ax, ay, az, bx, by, bz] = edge.first;
-        auto const opposite = all.find({bx, by, bz, ax, ay, az});
+        auto const opposite = all.find({edge.first[1], edge.first[0]});
         return onlyOdd && edge.second == 1 && opposite != all.end() && opposite->second == 1;
     });
     return edges;
@@ -148,6 +157,8 @@ TEST(RemoveSlivers, AgreesWithThePlainReferenceAndKeepsClosedSurfaces)
         {"needles", MeshBuilder::sphere(8).withNeedles(40)},
         {"noise", MeshBuilder::sphere(12).withNoise(0.05f, 3).shuffled(4)},
         {"shuffled needles", MeshBuilder::sphere(10).withNeedles(150, 0.02f).withNoise(0.004f, 1).shuffled(2)},
+        {"few needles in noise", MeshBuilder::sphere(20).withNeedles(60).withNoise(0.012f, 3)},
+        {"few needles, shuffled", MeshBuilder::torus(60, 24).withNeedles(80, 0.002f).withNoise(0.02f, 5).shuffled(6)},
         {"torus", MeshBuilder::torus(24, 16).withNeedles(60).shuffled(9)},
         {"thin torus", MeshBuilder::torus(100, 3).withNoise(0.01f, 8)},
         {"bipyramid", MeshBuilder::bipyramid(300).withNoise(0.001f, 7)},
@@ -178,6 +189,34 @@ TEST(RemoveSlivers, AgreesWithThePlainReferenceAndKeepsClosedSurfaces)
             EXPECT_EQ(countsOf(*mesh).eulerCharacteristic(), countsOf(*builder.build()).eulerCharacteristic());
         }
     EXPECT_EQ(countsOf(*withoutSlivers(meshes.at("needles"), 0.03f)), countsOf(*MeshBuilder::sphere(8).build()));
+}
+
+TEST(RemoveSlivers, MeasuresFacesExactlyAtTheRatioAndAtTheLimitsOfFloats)
+{
+    constexpr float kMax = std::numeric_limits<float>::max(), kLeast = std::numeric_limits<float>::denorm_min();
+    constexpr float kInfinity = std::numeric_limits<float>::infinity();
+    // Squares underflow, are not normal, or overflow; and so do lengths times ratios.
+    for (float const scale : {1.0f, 1e-19f, 1e-21f, 1e-23f, 1e-30f, kLeast, 1e18f, 2e19f, 1e30f, kMax})
+        for (unsigned int seed = 0; seed != 4; ++seed) {
+            MeshBuilder builder = MeshBuilder::sphere(2).withNeedles(4, 0.3f).withNoise(0.1f, seed);
+            for (float3& p : builder.points)
+                p = p * scale;
+            builder.points[seed].x = seed == 3 ? kNan : builder.points[seed].x;
+            std::vector<float> ratios{0, -1, -2, kNan, kInfinity, -kInfinity, kMax, kLeast, 1e-20f, 1e20f};
+            for (auto const& [a, b, c] : builder.faces) {
+                float const ab = length(builder.points[b] - builder.points[a]);
+                float const bc = length(builder.points[c] - builder.points[b]);
+                float const atLimit = ab / bc;
+                ratios.insert(ratios.end(),
+                    {std::nextafter(atLimit, 0.0f), atLimit, std::nextafter(atLimit, 2.0f), atLimit * (1 + 1e-6f)});
+            }
+            for (float const ratio : ratios) {
+                SCOPED_TRACE(scale);
+                SCOPED_TRACE(ratio);
+                EXPECT_EQ(
+                    edgesOf(*withoutSlivers(builder, ratio)), edgesOf(*PlainRemoval(builder, ratio).result().build()));
+            }
+        }
 }
 
 TEST(RemoveSlivers, LeavesOtherInputUnchanged)

@@ -6,6 +6,7 @@
 #include <TessaraMathSupport/Stepper.h>
 
 #include <bit>
+#include <map>
 #include <optional>
 
 using namespace Modeling;
@@ -114,6 +115,29 @@ TEST(Smooth, AgreesWithPlainSmoothingToTheBit)
     for (auto const& mesh : {MeshBuilder::torus(20, 30).withNoise(0.05f, 1).shuffled(2).polygons(),
              PolygonMesh::quads(30).withNoise(0.2f, 3), PolygonMesh::stars(300, 2, 40, 4)})
         EXPECT_TRUE(bitsOf(smoothed(mesh, 4.0f)) == bitsOf(smoothedPlainly(mesh, 4.0f, {})));
+}
+
+TEST(Smooth, AgreesWithPlainSmoothingForAnyDivisionOfThePoints)
+{
+    Random random(1);
+    PolygonMesh const sphere = MeshBuilder::sphere(50).withNoise(0.005f, 1).polygons();
+    std::map<std::string, PolygonMesh> const meshes{
+        {"triangles in order", sphere},
+        {"triangles in random order", MeshBuilder::sphere(50).withNoise(0.005f, 1).shuffled(2).polygons()},
+        {"triangles of random points", PolygonMesh::soup(9'000, 20'000, 3, 3, random)},
+        {"faces of random points", PolygonMesh::soup(9'000, 9'000, 0, 7, random)},
+        {"large faces with repeated points", PolygonMesh::soup(5'000, 4, 900, 1'100, random)},
+        {"mixed",
+            PolygonMesh(sphere)
+                .joinedWith(PolygonMesh::quads(60).withNoise(0.2f, 3))
+                .joinedWith(PolygonMesh::soup(40, 30, 0, 90, random))},
+    };
+    for (auto const& [name, mesh] : meshes) {
+        auto const expected = bitsOf(smoothedPlainly(mesh, 2.0f, {}));
+        for (int const threads : {1, 2, 8, 200})
+            EXPECT_TRUE(withThreads(threads, [&] { return bitsOf(smoothed(mesh, 2.0f)); }) == expected)
+                << name << ", " << threads << " threads";
+    }
 }
 
 TEST(Smooth, MovesPointsWithinTheSurfaceWhereverItsFacesBegin)
