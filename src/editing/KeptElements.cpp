@@ -40,7 +40,7 @@ namespace {
         return bits;
     }
 
-    template <class Entries> KeptElements::Words bitsOf(Entries const& entries)
+    template <class Entries> KeptElements::Words wordsOf(Entries const& entries)
     {
         auto words = uninitializedArray<std::uint64_t>(KeptElements::wordsFor(entries.size));
         // Each word is computed from its own entries.
@@ -57,12 +57,12 @@ namespace {
 }
 
 KeptElements::KeptElements(Orvan::Array<bool> const& deleted)
-    : KeptElements(deleted.size, bitsOf(deleted))
+    : KeptElements(deleted.size, wordsOf(deleted))
 {
 }
 
 KeptElements::KeptElements(IndexArray const& remap)
-    : KeptElements(remap.size, bitsOf(remap))
+    : KeptElements(remap.size, wordsOf(remap))
 {
 }
 
