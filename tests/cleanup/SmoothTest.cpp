@@ -135,7 +135,7 @@ TEST(Smooth, AgreesWithPlainSmoothingForAnyDivisionOfThePoints)
     for (auto const& [name, mesh] : meshes) {
         auto const expected = bitsOf(smoothedPlainly(mesh, 2.0f, {}));
         for (int const threads : {1, 2, 8, 200})
-            EXPECT_TRUE(withThreads(threads, [&] { return bitsOf(smoothed(mesh, 2.0f)); }) == expected)
+            EXPECT_TRUE(withThreads(threads, [&, &given = mesh] { return bitsOf(smoothed(given, 2.0f)); }) == expected)
                 << name << ", " << threads << " threads";
     }
 }
