@@ -30,10 +30,17 @@ class ClusterError(ConnectionError):
     """Why the cluster cannot be used, or no longer."""
 
 
+def silence_dask() -> None:
+    """What matters is in the entries. Dask logs errors in the name of the caller, which may be asyncio: for example when a
+    worker process is replaced at the moment at which the cluster closes."""
+    for name in ("distributed", "asyncio"):
+        logging.getLogger(name).setLevel(logging.CRITICAL)
+
+
 @contextmanager
 def local_client(workers: int) -> Iterator[Client]:
     """Starts worker processes on this machine. One that dies is replaced."""
-    logging.getLogger("distributed").setLevel(logging.CRITICAL)
+    silence_dask()
     settings = {
         "distributed.scheduler.allowed-failures": 1,  # after two deaths a job is suspected
         "distributed.nanny.pre-spawn-environ": {"DASK_LOGGING__DISTRIBUTED": "critical"},
@@ -56,7 +63,7 @@ def local_client(workers: int) -> Iterator[Client]:
 @contextmanager
 def remote_client(address: str, seconds: float) -> Iterator[Client]:
     """Connects to a scheduler, and waits for its first worker."""
-    logging.getLogger("distributed").setLevel(logging.CRITICAL)
+    silence_dask()
     try:
         client = dask_types.Client(address, timeout=seconds)
     except (OSError, ValueError, TimeoutError) as error:
