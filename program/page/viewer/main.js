@@ -7,17 +7,18 @@
     const root = document.getElementById("page");
     const renderer = Views.createRenderer();
     const views = [];
-    let isDrawPlanned = false;
+    // For scripts that look at the page: how often it was drawn, and whether it will be once more.
+    const state = document.documentElement.dataset;
 
     function drawSoon() {
-        if (isDrawPlanned || !renderer)
+        if (state.planned || !renderer)
             return;
-        isDrawPlanned = true;
+        state.planned = "true";
         requestAnimationFrame(() => {
-            isDrawPlanned = false;
+            delete state.planned;
             for (const view of views)
                 view.draw();
-            document.documentElement.dataset.drawn = String(Number(document.documentElement.dataset.drawn || 0) + 1);
+            state.drawn = String(Number(state.drawn || 0) + 1);
         });
     }
 

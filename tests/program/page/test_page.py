@@ -39,7 +39,7 @@ class Page:
     def __init__(self, driver, file):
         self.driver = driver
         driver.get("file://" + urllib.parse.quote(str(file)))
-        self.wait(lambda: self.run("return document.documentElement.dataset.drawn"))
+        self.wait_until_drawn(None)
 
     def run(self, script, *arguments):
         return self.driver.execute_script(script, *arguments)
@@ -52,9 +52,17 @@ class Page:
 
     def act(self, action):
         """Does something that makes the views be drawn again."""
-        drawn = self.run("return document.documentElement.dataset.drawn")
+        drawn = self.drawn()
         action()
-        self.wait(lambda: self.run("return document.documentElement.dataset.drawn") != drawn)
+        self.wait_until_drawn(drawn)
+
+    def drawn(self):
+        """How often the views were drawn, or None."""
+        return self.run("return document.documentElement.dataset.drawn")
+
+    def wait_until_drawn(self, before):
+        """Waits for a drawing with nothing planned after it: a new size may draw the views between a count and an action."""
+        self.wait(lambda: self.drawn() != before and not self.run("return document.documentElement.dataset.planned"))
 
     def click(self, name):
         self.act(lambda: self.run("document.getElementById(arguments[0]).click()", name))
