@@ -51,8 +51,10 @@ void requireClosedTriangles(char const* operation, bool acceptsIsolatedPoints, M
     });
     if (!(mesh.object() == object))
         return;
-    factsOf(mesh).isClosedTriangles = true;
-    factsOf(mesh).hasNoIsolatedPoints = hasNoIsolatedPoints;
+    Facts& facts = factsOf(mesh);
+    facts.isClosedTriangles = true;
+    facts.hasOnlyTriangles = true;
+    facts.hasNoIsolatedPoints = hasNoIsolatedPoints;
 }
 
 py::object makeValidHandle(ModelingProgram::GeometryType type, Orvan::Ptr<Tessara::Object> object)

@@ -15,6 +15,7 @@ struct Facts {
     bool isValid = false;
     // For meshes. Known facts survive operations that keep the faces.
     bool isClosedTriangles = false; // closed, manifold, consistently oriented, triangles only
+    bool hasOnlyTriangles = false;
     bool hasNoIsolatedPoints = false;
     std::optional<ModelingProgram::GeometryType> type = {};
     std::optional<bool> isBare =

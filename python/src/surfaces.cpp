@@ -175,18 +175,24 @@ namespace {
         return makeValid<Mesh>(std::move(refined.object));
     }
 
-    void requireTriangles(MeshArrays const& mesh)
+    void requireTriangles(Mesh& mesh, Object const& object)
     {
-        if (!areTriangles(mesh, 0, mesh.faceCount()))
-            refuse("large_faces needs a mesh of triangles:", faultsOfTriangles(mesh, analyzeTopology(mesh)));
+        if (factsOf(mesh).hasOnlyTriangles)
+            return;
+        withoutLock([arrays = arraysOf(object)] {
+            if (!areTriangles(arrays, 0, arrays.faceCount()))
+                refuse("large_faces needs a mesh of triangles:", faultsOfTriangles(arrays, analyzeTopology(arrays)));
+        });
+        factsOf(mesh).hasOnlyTriangles = true;
     }
 
-    py::array_t<bool> largeFaces(Mesh& mesh, float tolerance)
+    py::array_t<bool> largeFaces(Mesh& given, float tolerance)
     {
+        Mesh mesh = snapshotOf(given);
         Orvan::Ptr<Object> const object = validObjectOf(mesh);
+        requireTriangles(mesh, *object);
         return numbersOf<bool>(withoutLock([&] {
             MeshArrays const arrays = arraysOf(*object);
-            requireTriangles(arrays);
             Orvan::Array<bool> marks(arrays.faceCount());
             Geometry::Mesh::Internal::markForSubdivision(
                 tolerance, arrays.faceCount(), *arrays.positions, *arrays.faceVertex, *arrays.faceOffset, marks);
@@ -213,8 +219,7 @@ namespace {
                                "(counted from 0). delete_faces removes such points, also if it deletes no face.",
                 groupDigits(isolated.count), countOf(arrays.pointCount(), "point"),
                 isolated.count == 1 ? "belongs" : "belong", isolated.count == 1 ? "it" : "them", isolated.first));
-        if (mesh.object().get() == &object)
-            factsOf(mesh).hasNoIsolatedPoints = true;
+        factsOf(mesh).hasNoIsolatedPoints = true;
     }
 
     struct Pins {
