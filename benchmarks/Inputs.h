@@ -133,6 +133,13 @@ inline Sizes withoutLargest(Sizes sizes)
     return sizes;
 }
 
+/// What is measured of the library only.
+inline Sizes with(std::int64_t size, Sizes sizes)
+{
+    sizes.push_back({size});
+    return sizes;
+}
+
 inline Sizes const kTriangles{{5'000}, {50'000}, {500'000}}; // for cleaning up
 inline Sizes const kPoints{{1'000}, {100'000}, {10'000'000}}, kFaces{{1'000}, {100'000}, {1'000'000}}; // for deleting
 // Points there, points added.

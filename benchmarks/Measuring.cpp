@@ -6,6 +6,7 @@
 #include <utility>
 
 #include <malloc.h>
+#include <time.h>
 
 namespace Benchmarks {
 
@@ -19,6 +20,13 @@ namespace {
             if (line.starts_with(name))
                 return 1024 * std::stoll(line.substr(name.size() + 1));
         return 0;
+    }
+
+    double secondsOf(clockid_t clock)
+    {
+        timespec now{};
+        ::clock_gettime(clock, &now);
+        return static_cast<double>(now.tv_sec) + 1e-9 * static_cast<double>(now.tv_nsec);
     }
 
 }
@@ -40,6 +48,18 @@ void PeakMemory::report(Run const& run, std::size_t elements) const
     if (isStarted_ && before_ != 0)
         run.report("peak bytes/element",
             static_cast<double>(statusOfProcess("VmHWM") - before_) / static_cast<double>(elements));
+}
+
+void BusyThreads::start()
+{
+    processorSeconds_ -= secondsOf(CLOCK_PROCESS_CPUTIME_ID);
+    wallSeconds_ -= secondsOf(CLOCK_MONOTONIC);
+}
+
+void BusyThreads::stop()
+{
+    processorSeconds_ += secondsOf(CLOCK_PROCESS_CPUTIME_ID);
+    wallSeconds_ += secondsOf(CLOCK_MONOTONIC);
 }
 
 Row::Row(std::string const& name, Sizes const& sizes, std::vector<std::string> const& variants, Measure const& measure)

@@ -77,16 +77,31 @@ private:
     std::int64_t before_ = 0;
 };
 
+/// How many threads work on average while it is started: processor time of the process over wall time.
+class BusyThreads {
+public:
+    void start();
+    void stop();
+    void report(Run const& run) const { run.report("busy threads", processorSeconds_ / wallSeconds_); }
+
+private:
+    double processorSeconds_ = 0, wallSeconds_ = 0;
+};
+
 /// Times `work()`, and reports the wall time per element as all of these do. The number of elements may be known only then.
 template <class Work> void timeRuns(Run& run, std::size_t const& elements, Work const& work)
 {
     PeakMemory peak;
+    BusyThreads busy;
     peak.start();
+    busy.start();
     for (auto _ : run.state) {
         work();
         benchmark::ClobberMemory();
     }
+    busy.stop();
     peak.report(run, elements);
+    busy.report(run);
     run.reportTimePerElement(elements);
 }
 
@@ -94,19 +109,23 @@ template <class Work> void timeRuns(Run& run, std::size_t const& elements, Work 
 template <class Make, class Work> void timeOnEach(Run& run, std::size_t elements, Make const& make, Work const& work)
 {
     PeakMemory peak;
+    BusyThreads busy;
     for (auto _ : run.state) {
         run.state.PauseTiming();
         {
             auto made = make();
             peak.start();
+            busy.start();
             run.state.ResumeTiming();
             work(made);
             benchmark::ClobberMemory();
             run.state.PauseTiming();
+            busy.stop();
         }
         run.state.ResumeTiming();
     }
     peak.report(run, elements);
+    busy.report(run);
     run.reportTimePerElement(elements);
 }
 

@@ -142,7 +142,7 @@ void deleteFlat(PatchedSphere const& source, PatchedSphere& mesh)
     DoNotOptimize(mesh.points.data);
 }
 
-Row const deletingFaces("deleteFaces", kFaces, {"", ":memcpy", ":in place", ":flat"}, [](Run& run) {
+Row const deletingFaces("deleteFaces", with(10'000'000, kFaces), {"", ":memcpy", ":in place", ":flat"}, [](Run& run) {
     PatchedSphere const sphere(run.size());
     if (run.copies(sphere.bytes(), sphere.faceCount()))
         return;

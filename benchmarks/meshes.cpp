@@ -56,7 +56,7 @@ void measureFaces(FlatMesh const& mesh)
     DoNotOptimize(ratios.data);
 }
 
-Row const slivers("removeSlivers", kTriangles, {"", ":memcpy", ":flat passes"}, [](Run& run) {
+Row const slivers("removeSlivers", with(10'000'000, kTriangles), {"", ":memcpy", ":flat passes"}, [](Run& run) {
     PolygonMesh const& needled = made(Meshes::needled, run.size());
     if (run.copies(needled.points.size() * sizeof(float3) + needled.faceCount() * kTriangleBytes, run.size()))
         return;
@@ -87,13 +87,19 @@ void measureSmoothing(Run& run, FlatMesh mesh, std::size_t elementsPerStep)
     run.reportWorkingBytes(elementsPerStep, memoryOf(smooth).peak);
 }
 
-Row const smoothing("smooth triangles", kTriangles, kBesideCopy, [](Run& run) {
+Row const smoothing("smooth triangles", with(10'000'000, kTriangles), kBesideCopy, [](Run& run) {
     FlatMesh const mesh(Meshes::noisy, run.size());
     if (!run.copies(mesh.points.size * sizeof(float3), mesh.faceCount())) // once per step
         measureSmoothing(run, mesh, mesh.faceCount());
 });
 
-Row const smoothingQuads("smooth quads, a corner", kTriangles, [](Run& run) {
+/// Consecutive faces have no points in common.
+Row const smoothingShuffled("smooth shuffled triangles", kTriangles, [](Run& run) {
+    FlatMesh const mesh(Meshes::shuffled, run.size());
+    measureSmoothing(run, mesh, mesh.faceCount());
+});
+
+Row const smoothingQuads("smooth quads, a corner", with(2'500'000, kTriangles), [](Run& run) {
     FlatMesh const mesh(Meshes::bentQuads, run.size());
     measureSmoothing(run, mesh, mesh.faceVertex.size);
 });
@@ -127,12 +133,13 @@ template <auto make> void measureTriangulation(Run& run)
     run.reportResult(getElementCount(result, sFaceComp));
     run.reportSimilarResult(areaOf(corners->size / 3, points->data, corners->data));
 }
-Row const quads("triangulate quads", kQuads, kBesideCopy, measureTriangulation<Meshes::bentQuads>);
-Row const polygons("triangulate polygons", kPolygons, kBesideCopy, measureTriangulation<Meshes::concave>);
+Row const quads("triangulate quads", with(5'000'000, kQuads), kBesideCopy, measureTriangulation<Meshes::bentQuads>);
+Row const polygons(
+    "triangulate polygons", with(1'600'000, kPolygons), kBesideCopy, measureTriangulation<Meshes::concave>);
 Row const combs("triangulate comb", {{100}, {1'000}, {10'000}}, measureTriangulation<comb>);
 
 /// Normals, texture coordinates and weights at the corners, and numbers of faces.
-Row const attributes("triangulate attributes", kQuads, kBesideCopy, [](Run& run) {
+Row const attributes("triangulate attributes", with(5'000'000, kQuads), kBesideCopy, [](Run& run) {
     PolygonMesh const& mesh = made(Meshes::bentQuads, run.size());
     std::size_t const triangles = mesh.triangleCount(), corners = mesh.faceVertex.size();
     if (run.copies(triangles * (kTriangleBytes + 3 * (12 + 8 + 8) + 4), triangles))
@@ -202,7 +209,7 @@ void subdivideOnce(Points& points, Indices& corners, Indices const& offsets)
     corners.swap(newCorners);
 }
 
-Row const uniform("subdivide uniform", kUniform, {"", ":memcpy", ":flat kernel"}, [](Run& run) {
+Row const uniform("subdivide uniform", with(327'680, kUniform), {"", ":memcpy", ":flat kernel"}, [](Run& run) {
     FlatMesh const mesh(Meshes::sphere, run.size());
     std::size_t const faces = std::size_t{81} * mesh.faceCount();
     if (run.copies(faces * kTriangleBytes + faces * sizeof(float3) / 2, faces))

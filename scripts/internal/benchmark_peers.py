@@ -12,7 +12,9 @@ import sys
 from pathlib import Path
 
 from benchmark_jobs import measure_jobs
-from benchmark_report import INTRODUCTION, OPERATIONS, OWN, Results, describe_machine, details, draw, overview, quote
+from benchmark_report import (
+    INTRODUCTION, OPERATIONS, OWN, THREADS, Results, describe_machine, details, draw, overview, quote, threads_table,
+)
 from benchmark_runs import Program, Record, Row, Sample, Setting, count_of, groups_of, in_turns, least
 
 LONG_ENOUGH = 6.0  # seconds: a row that has taken so long in one setting is not measured again
@@ -87,6 +89,8 @@ def main() -> None:
     lines += ["## Overview\n", *summary]
     if jobs:
         lines += ["\n## Whole jobs\n", "Binary PLY in, binary PLY out: a process from its start to its end.\n", *jobs]
+    if warm.threads > 1:
+        lines += [THREADS.format(threads=warm), *threads_table(results, settings, warm)]
     lines += ["\n## Operations"]
     if draw(results, warm, plot):
         lines += [f"\n![Time per element against size, warm, with all threads]({plot.name})"]

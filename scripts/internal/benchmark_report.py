@@ -82,6 +82,7 @@ OPERATIONS = {
         "smooth jittered triangles", "face and step", shown=("500000",),
         note="Methods differ: VTK uses a windowed sinc filter, OpenMesh the tangential component, Open3D weights by distance.",
     ),
+    "smooth shuffled triangles": Operation("smooth shuffled triangles", "face and step"),
     "smooth quads, a corner": Operation("smooth quads", "corner and step"),
     "removeSlivers": Operation(
         "remove needles", "face",
@@ -130,6 +131,15 @@ or similar if methods differ, else the run fails.
 """
 
 
+THREADS = """
+## Threads
+
+Time in ns per element at the largest size, repeated. The serial share is the part of the work that one thread does while the others
+wait, from the processor time and the wall time of the runs with {threads}, so waiting for memory counts as work. By Amdahl's law
+it allows the speed-ups in the last columns, if memory is fast enough for that many threads.
+"""
+
+
 def size_of(row: Row) -> str:
     return operation_of(row).between.join(f"{int(part):,}" if part.isdigit() else part for part in row.size.split("/"))
 
@@ -173,6 +183,28 @@ def ratio(results: Results, row: Row, own: Row, setting: Setting) -> str:
     if mine.per_element and other.per_element:
         return short(mine.per_element / other.per_element)
     return short(mine.seconds / other.seconds)
+
+
+def serial_share(sample: Sample, threads: int) -> float:
+    """The part of the processor time that one thread spends while the others wait.
+
+    A second and b seconds of it on one and on all threads take a + b of processor time and a + b / threads of wall time.
+    """
+    assert sample.busy_threads
+    return min(max((1 / sample.busy_threads - 1 / threads) / (1 - 1 / threads), 0), 1)
+
+
+def threads_table(results: Results, settings: list[Setting], warm: Setting) -> Iterator[str]:
+    """A line per operation at its largest size."""
+    yield f"| operation, size | {' | '.join(str(setting) for setting in settings if not setting.is_fresh)} | serial share | 16 threads | 64 threads |"
+    yield "| --- | --- | --- | --- | --- | --- |"
+    own_rows = [row for row, setting in results if setting == warm and not row.contender and results[row, setting].busy_threads]
+    for operation in order_of({row.operation for row in own_rows}):
+        row = max((row for row in own_rows if row.operation == operation), key=lambda row: elements_of(results[row, warm]))
+        times = [nanoseconds(results[row, setting]) for setting in settings if not setting.is_fresh]
+        share = serial_share(results[row, warm], warm.threads)
+        speedups = [f"{1 / (share + (1 - share) / count):.1f}" for count in (16, 64)]
+        yield f"| {operation_of(row).title}, {size_of(row)} | {' | '.join(times)} | {100 * share:.1f} % | {' | '.join(speedups)} |"
 
 
 def details(results: Results, settings: list[Setting], warm: Setting) -> Iterator[str]:

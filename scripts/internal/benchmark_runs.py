@@ -51,6 +51,7 @@ class Sample:
     working_bytes: float | None = None  # per element, beyond the result
     result: float | None = None  # the same for all contenders
     similar_result: float | None = None
+    busy_threads: float | None = None  # on average
     process_seconds: float = 0  # of the whole process
 
 
@@ -106,6 +107,7 @@ class Program:
             run.get("working bytes/element"),
             run.get("result"),
             run.get("similar result"),
+            run.get("busy threads"),
             process_seconds,
         )
 

@@ -15,8 +15,10 @@ namespace Modeling::Internal {
 
 namespace {
 
-    constexpr unsigned int kMostParts = 256;
-    constexpr unsigned int kPartsPerThread = 4; // evens out delays of a thread; more parts share more faces
+    constexpr unsigned int kMostParts = 1024;
+    constexpr unsigned int kPartsPerThread =
+        16; // at least half of it: few leave threads idle at the end, many share more faces
+    constexpr unsigned int kLeastPointBits = 10;
     constexpr unsigned int kMostRuns = 256;
     constexpr unsigned int kShortRun = 4096; // takes a few microseconds to list
 
@@ -25,7 +27,8 @@ namespace {
         auto const threads = static_cast<unsigned int>(tbb::this_task_arena::max_concurrency());
         bool const isOnePart = pointCount <= kFewPoints || threads == 1;
         unsigned int const mostParts = isOnePart ? 1 : std::min(threads * kPartsPerThread, kMostParts);
-        return static_cast<unsigned int>(std::bit_width((std::max(pointCount, 1U) - 1) / mostParts));
+        return std::max(isOnePart ? 0 : kLeastPointBits,
+            static_cast<unsigned int>(std::bit_width((std::max(pointCount, 1U) - 1) / mostParts)));
     }
 
     /// Consecutive faces. All runs but the last one have the same length.
