@@ -141,7 +141,7 @@ namespace {
                 low_ = lowerCorner(low_, inDoubles(p));
                 high = upperCorner(high, inDoubles(p));
             }
-            for (int axis = 0; axis != 3; ++axis)
+            for (std::size_t axis = 0; axis != 3; ++axis)
                 scale_[axis] = kSide / (coordinate(high, axis) - coordinate(low_, axis));
         }
 
@@ -189,10 +189,10 @@ namespace {
             }
         };
 
-        static double coordinate(double3 const& p, int axis) { return axis == 0 ? p.x : axis == 1 ? p.y : p.z; }
+        static double coordinate(double3 const& p, std::size_t axis) { return axis == 0 ? p.x : axis == 1 ? p.y : p.z; }
 
         /// Monotonic, so that boxes that meet have a common cell.
-        std::size_t cellOf(double3 const& p, int axis) const
+        std::size_t cellOf(double3 const& p, std::size_t axis) const
         {
             double const cell = (coordinate(p, axis) - coordinate(low_, axis)) * scale_[axis];
             return cell > 0 ? static_cast<std::size_t>(std::min(cell, kSide - 1.0)) : 0;
@@ -200,7 +200,7 @@ namespace {
         Cells cellsOf(double3 const& min, double3 const& max) const
         {
             Cells cells;
-            for (int axis = 0; axis != 3; ++axis) {
+            for (std::size_t axis = 0; axis != 3; ++axis) {
                 cells.first[axis] = cellOf(min, axis);
                 cells.last[axis] = std::max(cells.first[axis], cellOf(max, axis));
             }
