@@ -61,10 +61,11 @@ template <class Number, class T> py::array_t<Number> numbersOf(Orvan::Array<T> v
 
 /// Calls `visit(index)` for each index of an array of integers from 0 up to but excluding `count`.
 /// \throws IndexError  before which some indices may have been visited
-template <class Visit> void forEachIndex(Values<long long> const& indices, unsigned int count, Visit const& visit)
+template <class Visit> void forEachIndex(Values<long long> const& indices, unsigned int count, Visit visit)
 {
     long long const* const index = indices.data();
-    for (py::ssize_t i = 0; i != indices.size(); ++i) {
+    py::ssize_t const size = indices.size();
+    for (py::ssize_t i = 0; i != size; ++i) {
         if (index[i] < 0 || index[i] >= count)
             throw py::index_error(
                 fmt::format("index {} is out of range: there are {} elements, counted from 0", index[i], count));

@@ -65,13 +65,13 @@ namespace {
     /// The indices of the elements that a mask or indices select.
     Orvan::Array<unsigned int> indicesOf(py::array const& selected, unsigned int count)
     {
-        Orvan::Array<unsigned int> indices;
         if (selected.ndim() == 1 && !py::isinstance<Values<bool>>(selected)) {
-            indices.reserve(static_cast<std::uint64_t>(selected.size()));
-            forEachIndex(
-                py::cast<Values<long long>>(selected), count, [&](unsigned int element) { indices.append(element); });
+            Orvan::Array<unsigned int> indices(static_cast<std::uint64_t>(selected.size()), Orvan::kUninitialized);
+            forEachIndex(py::cast<Values<long long>>(selected), count,
+                [next = indices.data](unsigned int element) mutable { *next++ = element; });
             return indices;
         }
+        Orvan::Array<unsigned int> indices;
         auto const mask = maskOf(selected, count);
         for (unsigned int element = 0; element != count; ++element)
             if (mask[element])
