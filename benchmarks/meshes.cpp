@@ -1,5 +1,5 @@
-// Cleaning up, triangulating and refining meshes. The rows `:flat passes` and `:flat kernel` are what that costs at least:
-// loops over plain arrays, without objects, checks or exceptions to rules.
+// Cleaning up, triangulating and refining meshes. The rows `:flat passes`, `:flat diagonals` and `:flat kernel` are what that costs
+// at least: loops over plain arrays, without objects, checks or exceptions to rules.
 
 #include "Inputs.h"
 
@@ -133,7 +133,44 @@ template <auto make> void measureTriangulation(Run& run)
     run.reportResult(getElementCount(result, sFaceComp));
     run.reportSimilarResult(areaOf(corners->size / 3, points->data, corners->data));
 }
-Row const quads("triangulate quads", with(5'000'000, kQuads), kBesideCopy, measureTriangulation<Meshes::bentQuads>);
+
+struct FlatTriangles {
+    Indices faceVertex, faceOffset;
+};
+
+/// Cuts each quad along its shorter diagonal: reads and writes what triangulating does, with little arithmetic.
+void cutAlongDiagonals(FlatMesh const& quads, FlatTriangles& triangles)
+{
+    std::size_t const count = 2 * std::size_t{quads.faceCount()};
+    triangles.faceVertex = uninitializedArray<unsigned int>(3 * count);
+    triangles.faceOffset = uninitializedArray<unsigned int>(count + 1);
+    unsigned int* corner = triangles.faceVertex.data;
+    auto const squaredDistance = [&](unsigned int a, unsigned int b) {
+        float3 const &p = quads.points[a], &q = quads.points[b];
+        return (p.x - q.x) * (p.x - q.x) + (p.y - q.y) * (p.y - q.y) + (p.z - q.z) * (p.z - q.z);
+    };
+    for (std::size_t quad = 0; quad != quads.faceCount(); ++quad) {
+        unsigned int const* const v = quads.faceVertex.data + quads.faceOffset[quad];
+        bool const isFirstShorter = squaredDistance(v[0], v[2]) < squaredDistance(v[1], v[3]);
+        unsigned int const start = isFirstShorter ? 0 : 1; // no branch: it would be unpredictable
+        for (unsigned int const i : {0u, 1u, 2u, 0u, 2u, 3u})
+            *corner++ = v[(start + i) % 4];
+    }
+    for (std::size_t triangle = 0; triangle <= count; ++triangle)
+        triangles.faceOffset[triangle] = static_cast<unsigned int>(3 * triangle);
+}
+
+Row const quads("triangulate quads", with(5'000'000, kQuads), {"", ":memcpy", ":flat diagonals"}, [](Run& run) {
+    if (run.variant != ":flat diagonals")
+        return measureTriangulation<Meshes::bentQuads>(run);
+    FlatMesh const mesh(Meshes::bentQuads, run.size());
+    auto const cut = [&](FlatTriangles& triangles) { cutAlongDiagonals(mesh, triangles); };
+    timeOnCopies(run, 2 * std::size_t{mesh.faceCount()}, FlatTriangles{}, cut);
+    FlatTriangles triangles;
+    cut(triangles);
+    run.reportResult(static_cast<double>(triangles.faceOffset.size - 1));
+    run.reportSimilarResult(areaOf(triangles.faceVertex.size / 3, mesh.points.data, triangles.faceVertex.data));
+});
 Row const polygons(
     "triangulate polygons", with(1'600'000, kPolygons), kBesideCopy, measureTriangulation<Meshes::concave>);
 Row const combs("triangulate comb", {{100}, {1'000}, {10'000}}, measureTriangulation<comb>);

@@ -55,7 +55,8 @@ OPERATIONS = {
     ),
     "addPointsToPointCloud": Operation(
         "append points to a copy", "point of the result", " + ", ("9000000/1000000",),
-        note="PCL stores 48 bytes per point and Open3D 72, Modeling 32.",
+        note="PCL stores 48 bytes per point and Open3D 72, Modeling 32."
+        ' "Copy and fill" writes the same arrays on one thread.',
     ),
     "addPointsToPointCloudInPlace": Operation(
         "append points in place", "added point", " + ",
@@ -71,7 +72,10 @@ OPERATIONS = {
         "delete half of the points", "point",
         note="PCL stores 48 bytes per point and Open3D 72, Modeling 32.",
     ),
-    "triangulate quads": Operation("triangulate bent quads", "triangle"),
+    "triangulate quads": Operation(
+        "triangulate bent quads", "triangle",
+        note='"Flat diagonals" reads and writes the same arrays on one thread, with little arithmetic.',
+    ),
     "triangulate polygons": Operation(
         "triangulate concave polygons of 4 to 12 corners", "triangle",
         note="VTK gives up on some polygons, which leaves out about one of 60 triangles.",

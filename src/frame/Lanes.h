@@ -6,6 +6,10 @@
 #include <cstdint>
 #include <cstring>
 
+#ifdef __SSE__
+#include <xmmintrin.h>
+#endif
+
 namespace Modeling {
 
 /// Four floats in a SIMD register. Each lane gives the same bits as scalar arithmetic.
@@ -81,27 +85,27 @@ inline Lanes selectOrZero(IntLanes mask, Lanes lanes)
 /// Bit i is set if lane i of the mask is.
 inline unsigned int bitsOf(IntLanes mask)
 {
+#ifdef __SSE__
+    return static_cast<unsigned int>(_mm_movemask_ps(reinterpret_cast<__m128>(mask)));
+#else
     std::uint64_t halves[2];
     IntLanes const bits = mask & IntLanes{1, 2, 4, 8};
     std::memcpy(halves, &bits, sizeof(halves));
     std::uint64_t const both = halves[0] | halves[1];
     return static_cast<unsigned int>(both | both >> 32);
+#endif
 }
 
 /// Whether all lanes of a mask are set.
 inline bool all(IntLanes mask)
 {
-    std::uint64_t halves[2];
-    std::memcpy(halves, &mask, sizeof(halves));
-    return (halves[0] & halves[1]) == ~std::uint64_t{0};
+    return bitsOf(mask) == 15;
 }
 
 /// Whether some lane of a mask is set.
 inline bool any(IntLanes mask)
 {
-    std::uint64_t halves[2];
-    std::memcpy(halves, &mask, sizeof(halves));
-    return (halves[0] | halves[1]) != 0;
+    return bitsOf(mask) != 0;
 }
 
 }

@@ -1,9 +1,9 @@
 #include <Modeling/StitchTemplate.h>
 
 #include "frame/Assert.h"
-#include "frame/CornerArray.h"
 #include "frame/VectorMath.h"
 #include "host/MeshArrays.h"
+#include "weighCorners.h"
 
 #include <algorithm>
 #include <cmath>
@@ -21,75 +21,11 @@ namespace {
     using Points = Orvan::Array<float3>;
     using Weights = Orvan::Array<float>;
 
-    constexpr unsigned int kNoEdge = 0xFFFFFFFF;
-    constexpr float kLowestWeight = -0.2f; // a point with a lower weight is too far outside
+    using ::Modeling::Internal::kNoEdge;
 
     constexpr unsigned int nextCorner(unsigned int corner, unsigned int polySize)
     {
         return corner + 1 == polySize ? 0 : corner + 1;
-    }
-
-    /// A corner and the edge that starts there, relative to a point in the plane.
-    struct CornerView {
-        float x, y; // vector from the point to the corner
-        float r; // its length
-        float area; // signed area of the triangle of the point and the edge
-        float dot; // dot product of the vectors to the ends of the edge
-    };
-
-    /// Computes the vectors to the corners. \return the first corner that is closer than the tolerance, or `polySize`
-    unsigned int findCloseCorner(
-        Points const& polygon, float3 const& point, unsigned int polySize, float tolerance, CornerView* corners)
-    {
-        for (unsigned int i = 0; i != polySize; ++i) {
-            CornerView& corner = corners[i];
-            corner.x = polygon[i].x - point.x;
-            corner.y = polygon[i].y - point.y;
-            corner.r = std::sqrt(corner.x * corner.x + corner.y * corner.y);
-            if (tolerance > corner.r)
-                return i;
-        }
-        return polySize;
-    }
-
-    /// Measures the triangles of the point and the edges. \return the first edge with the point on it: the triangle is
-    /// flat, and the ends of the edge are on opposite sides of the point
-    unsigned int findEdge(unsigned int polySize, float areaTol, CornerView* corners)
-    {
-        for (unsigned int i = 0; i != polySize; ++i) {
-            CornerView& corner = corners[i];
-            CornerView const& next = corners[nextCorner(i, polySize)];
-            corner.area = (next.y * corner.x - corner.y * next.x) * 0.5f;
-            corner.dot = corner.y * next.y + corner.x * next.x;
-            if (areaTol > std::fabs(corner.area) && 0.0f > corner.dot)
-                return i;
-        }
-        return kNoEdge;
-    }
-
-    /// Adds the mean value weights of a point off the edges to `weights`, and normalizes them: in triangles with the
-    /// angles α and β at the point, a corner at distance r has the weight 2 (tan(α / 2) + tan(β / 2)) / r.
-    /// \return how many weights are below `kLowestWeight`
-    unsigned int weighCorners(unsigned int polySize, float areaTol, CornerView const* corners, float* weights)
-    {
-        float sum = 0;
-        CornerView const* previous = &corners[polySize - 1];
-        for (unsigned int i = 0; i != polySize; ++i) {
-            CornerView const& corner = corners[i];
-            // Near-flat triangles have no term: the point is on the line through the edge, beyond its ends.
-            if (std::fabs(previous->area) >= areaTol)
-                weights[i] += (previous->r - previous->dot / corner.r) / previous->area;
-            if (std::fabs(corner.area) >= areaTol)
-                weights[i] += (corners[nextCorner(i, polySize)].r - corner.dot / corner.r) / corner.area;
-            sum += weights[i];
-            previous = &corner;
-        }
-        unsigned int outside = 0;
-        for (unsigned int i = 0; i != polySize; ++i) {
-            weights[i] /= sum;
-            outside += kLowestWeight > weights[i];
-        }
-        return outside;
     }
 
     float meanEdgeLength(Points const& polygon, unsigned int polySize)
@@ -306,29 +242,16 @@ unsigned int StitchTemplate::computeMeanValueCoordinates(
     if (polySize_ == 0)
         return kNoEdge;
 
-    CornerArray<CornerView, 16> views;
-    CornerView* const corners = views.take(polySize_);
-    unsigned int const close = findCloseCorner(polygon, point, polySize_, tol_, corners);
-    if (close != polySize_) {
-        weights[close] = 1.0f;
+    auto const place =
+        ::Modeling::Internal::weighCorners({polygon.data, polySize_}, point, tol_, tol_ * scale, weights.data);
+    if (place.isAtCorner)
         errors_ += "---control point too close to polygon vertex---";
-        return kNoEdge;
-    }
-
-    float const areaTol = tol_ * scale; // an area; the corners above were compared with a length
-    unsigned int const edge = findEdge(polySize_, areaTol, corners);
-    if (edge != kNoEdge) {
-        unsigned int const next = nextCorner(edge, polySize_);
-        weights[edge] = corners[next].r / (corners[next].r + corners[edge].r);
-        weights[next] = 1.0f - weights[edge];
-        if (kLowestWeight > weights[edge] || kLowestWeight > weights[next])
-            errors_ += "---point lies along polygon edge but too far out side of polygon---";
-        return edge;
-    }
-
-    for (unsigned int outside = weighCorners(polySize_, areaTol, corners, weights.data); outside != 0; --outside)
-        errors_ += "---point lies too far out side of polygon---";
-    return kNoEdge;
+    else if (place.edge != kNoEdge && place.tooFarOutside != 0)
+        errors_ += "---point lies along polygon edge but too far out side of polygon---";
+    else
+        for (std::size_t corner = 0; corner != place.tooFarOutside; ++corner)
+            errors_ += "---point lies too far out side of polygon---";
+    return place.edge;
 }
 
 void StitchTemplate::findControlPointPos(Points const& polygon, Weights const& weights, float scale,

@@ -132,10 +132,11 @@ namespace {
             Lanes const squaredLength = dot(normal, normal);
             isFlat_ = broadcast(kFlat) > squaredLength;
             BasicQuaternion<Lanes> const rotation = rotationOf(normal, squaredLength);
-            for (unsigned int i = 0; i != 4; ++i) {
-                projected_[i] = rotateAndDropZ<LanePoints>(rotation, positions_[i]);
+            // The processor computes the directions while it waits for the roots and quotients of the rotation.
+            for (unsigned int i = 0; i != 4; ++i)
                 directions_[i] = safeNormalize(positions_[next(i)] - positions_[i]);
-            }
+            for (unsigned int i = 0; i != 4; ++i)
+                projected_[i] = rotateAndDropZ<LanePoints>(rotation, positions_[i]);
         }
 
         unsigned int cut(std::span<unsigned int, 24> triangles) const

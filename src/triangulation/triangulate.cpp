@@ -10,10 +10,10 @@
 #include <TessaraGeometry/Lookup.h>
 #include <TessaraGeometryVolume/ChannelParser.h>
 
+#include <algorithm>
 #include <array>
 #include <limits>
 #include <new>
-#include <numeric>
 #include <optional>
 #include <span>
 #include <utility>
@@ -26,7 +26,8 @@ namespace {
 
     struct Triangulation {
         IndexArray triangleOffset; // the first triangle of each face, and the end of the last one
-        IndexArray sourceCorner; // for each corner of the triangles, the corner of the mesh that it comes from
+        IndexArray faceVertex; // the point of each corner of the triangles
+        IndexArray sourceCorner; // the corner of the mesh that each comes from; empty unless a property needs it
 
         unsigned int triangleCount() const { return triangleOffset.data[triangleOffset.size - 1]; }
     };
@@ -53,12 +54,14 @@ namespace {
     /// Cuts the faces of a range, quads four at once.
     class FaceCutter {
     public:
-        /// \param triangulation  Its `sourceCorner` receives the corners of the triangles.
+        /// \param triangulation  Its `faceVertex` receives the points of the corners of the triangles, and its
+        ///                       `sourceCorner`, unless empty, the corners of the mesh.
         FaceCutter(MeshArrays const& mesh, Triangulation& triangulation)
             : mesh_(mesh)
             , offset_(mesh.faceOffset->data)
             , triangleOffset_(triangulation.triangleOffset.data)
-            , sourceCorner_(triangulation.sourceCorner.data)
+            , faceVertex_(triangulation.faceVertex.data)
+            , sourceCorner_(triangulation.sourceCorner.empty() ? nullptr : triangulation.sourceCorner.data)
         {
         }
 
@@ -74,7 +77,7 @@ namespace {
                 if (quadCount_ == quads_.size())
                     cutFourQuads();
             } else if (triangleCount == 1) {
-                std::iota(sourcesOf(face), sourcesOf(face) + 3, offset_[face]);
+                writeCorners(face, std::span<unsigned int const, 3>(kTriangle));
             } else {
                 cutAlone(face, triangleCount);
             }
@@ -97,8 +100,7 @@ namespace {
             unsigned int const cut = Modeling::Internal::cutQuads(corners, triangles);
             for (unsigned int quad = 0; quad != 4; ++quad)
                 if ((cut >> quad & 1) != 0)
-                    for (unsigned int i = 0; i != 6; ++i)
-                        sourcesOf(quads_[quad])[i] = offset_[quads_[quad]] + triangles[6 * quad + i];
+                    writeCorners(quads_[quad], std::span<unsigned int const, 6>(&triangles[6 * quad], 6));
                 else
                     cutAlone(quads_[quad], 2);
             quadCount_ = 0;
@@ -108,10 +110,23 @@ namespace {
         {
             std::span<float3> const corners(storage_.positions.take(triangleCount + 2), triangleCount + 2);
             gather(face, corners);
-            std::span<unsigned int> const sources(sourcesOf(face), std::size_t{3} * triangleCount);
-            Modeling::Internal::triangulatePolygon(corners, sources, storage_);
-            for (unsigned int& corner : sources)
-                corner += offset_[face];
+            std::span<unsigned int> const triangles(
+                faceVertex_ + std::size_t{3} * triangleOffset_[face], std::size_t{3} * triangleCount);
+            Modeling::Internal::triangulatePolygon(corners, triangles, storage_);
+            writeCorners(face, std::span<unsigned int const>(triangles));
+        }
+
+        /// Turns the corner numbers of a face's triangles into points, possibly in place.
+        template <std::size_t kExtent>
+        void writeCorners(unsigned int face, std::span<unsigned int const, kExtent> numbers)
+        {
+            std::size_t const first = std::size_t{3} * triangleOffset_[face];
+            unsigned int const* const vertex = verticesOf(face);
+            if (sourceCorner_)
+                for (std::size_t i = 0; i != numbers.size(); ++i)
+                    sourceCorner_[first + i] = offset_[face] + numbers[i];
+            for (std::size_t i = 0; i != numbers.size(); ++i)
+                faceVertex_[first + i] = vertex[numbers[i]];
         }
 
         void gather(unsigned int face, std::span<float3> corners) const
@@ -123,21 +138,20 @@ namespace {
         }
 
         unsigned int const* verticesOf(unsigned int face) const { return mesh_.faceVertex->data + offset_[face]; }
-        unsigned int* sourcesOf(unsigned int face) const
-        {
-            return sourceCorner_ + std::size_t{3} * triangleOffset_[face];
-        }
+
+        static constexpr std::array<unsigned int, 3> kTriangle{0, 1, 2}; // its own corner numbers
 
         MeshArrays const& mesh_;
         unsigned int const* const offset_;
         unsigned int const* const triangleOffset_;
-        unsigned int* const sourceCorner_;
+        unsigned int* const faceVertex_;
+        unsigned int* const sourceCorner_; // null if not needed
         Modeling::Internal::PolygonStorage storage_;
         std::array<unsigned int, 4> quads_; // faces
         unsigned int quadCount_ = 0;
     };
 
-    Triangulation cutFaces(MeshArrays const& mesh)
+    Triangulation cutFaces(MeshArrays const& mesh, bool needsSources)
     {
         Triangulation triangulation;
         triangulation.triangleOffset = offsetsFromCounts(mesh.faceCount, [&](std::size_t face) {
@@ -147,7 +161,9 @@ namespace {
         std::uint64_t const cornerCount = std::uint64_t{3} * triangulation.triangleCount();
         if (cornerCount > std::numeric_limits<unsigned int>::max())
             throw std::bad_alloc();
-        triangulation.sourceCorner = uninitializedArray<unsigned int>(cornerCount);
+        triangulation.faceVertex = uninitializedArray<unsigned int>(cornerCount);
+        if (needsSources)
+            triangulation.sourceCorner = uninitializedArray<unsigned int>(cornerCount);
 
         // Each face writes its own triangles.
         parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount, kFaceGrain), [&](auto const& faces) {
@@ -157,7 +173,7 @@ namespace {
             cutter.finish();
         });
         MODELING_ASSERT(
-            areOffsets(triangulation.triangleOffset.data, mesh.faceCount, triangulation.sourceCorner.size / 3));
+            areOffsets(triangulation.triangleOffset.data, mesh.faceCount, triangulation.faceVertex.size / 3));
         MODELING_ASSERT(
             areBelow(mesh.faceVertex->size, triangulation.sourceCorner.data, triangulation.sourceCorner.size));
         return triangulation;
@@ -207,14 +223,13 @@ namespace {
         return faceOffset;
     }
 
-    void writeTriangles(MeshArrays const& mesh, Triangulation const& triangulation, PreparedWrites& writes)
+    void writeTriangles(Triangulation& triangulation, PreparedWrites& writes)
     {
         MeshArrays triangles; // without points, which are kept
         triangles.faceCount = triangulation.triangleCount();
         triangles.cornerCount = 3 * triangles.faceCount;
         triangles.faceOffset = Orvan::makePtr<IndexArray>(offsetsOfTriangles(triangles.faceCount));
-        triangles.faceVertex =
-            Orvan::makePtr<IndexArray>(transferToCorners(*mesh.faceVertex, triangulation.sourceCorner));
+        triangles.faceVertex = Orvan::makePtr<IndexArray>(std::move(triangulation.faceVertex));
         writeMeshArrays(std::move(triangles), writes);
     }
 
@@ -249,6 +264,15 @@ namespace {
         return isTransferred;
     }
 
+    /// Whether a property of the corners, besides their points, is to be kept.
+    bool keepsCornerProperties(TSR::Utils::ChannelParser const& channels, Tessara::Object const& mesh)
+    {
+        using namespace Tessara::Geometry;
+        Orvan::Array<Orvan::String> const names = getGeoPropNamesByTarget(mesh, sFaceVertexComp);
+        return std::any_of(names.begin(), names.end(),
+            [&](Orvan::String const& name) { return name != sFaceVertex && channels.accepts(name); });
+    }
+
     /// Transfers or removes the properties that target a component, except its standard property. Properties that are
     /// neither data of a core type nor ranges are kept as they are.
     void carryProperties(Orvan::String const& component, Orvan::String const& standardProperty,
@@ -281,12 +305,12 @@ void triangulate(Orvan::String const& channels, Tessara::Object& mesh)
     std::optional<MeshArrays> const polygons = readPolygonMesh(mesh);
     if (!polygons)
         return;
-    Triangulation const triangulation = cutFaces(*polygons);
-
-    PreparedWrites writes(mesh);
-    writeTriangles(*polygons, triangulation, writes);
     TSR::Utils::ChannelParser parser;
     parser.parses(channels); // false if an entry is malformed; such entries are ignored
+    Triangulation triangulation = cutFaces(*polygons, keepsCornerProperties(parser, mesh));
+
+    PreparedWrites writes(mesh);
+    writeTriangles(triangulation, writes);
     carryProperties(sFaceVertexComp, sFaceVertex, parser, Transfer{triangulation, true}, mesh, writes);
     carryProperties(sFaceComp, sFaceOffset, parser, Transfer{triangulation, false}, mesh, writes);
     writes.commit();

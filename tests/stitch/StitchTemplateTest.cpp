@@ -3,7 +3,11 @@
 #include "frame/VectorMath.h"
 #include "support/Testing.h"
 
+#include <algorithm>
 #include <bit>
+#include <limits>
+#include <string>
+#include <vector>
 
 using namespace Modeling;
 using namespace TestSupport;
@@ -282,6 +286,93 @@ TEST(StitchTemplate, ComputesMeanValueCoordinates)
             bool const isUp = cross(polygon[1] - polygon[0], polygon[2] - polygon[0]).z > 0;
             EXPECT_LT(length(found[0] - float3{there.x, there.y, isUp ? there.z : -there.z}), 2e-5f);
         }
+    }
+}
+
+struct Weighed {
+    unsigned int edge = 0xFFFFFFFF;
+    std::string errors = {};
+};
+
+/// Mean value coordinates corner by corner, in the order of operations that results depend on.
+Weighed weighOneByOne(Points const& polygon, float3 const& point, float tolerance, float scale, Weights& weights)
+{
+    unsigned int const corners = static_cast<unsigned int>(polygon.size);
+    auto const next = [=](unsigned int i) { return (i + 1) % corners; };
+    std::vector<float> x, y, r, area, dot;
+    weights[corners] = point.z / scale;
+    for (unsigned int i = 0; i != corners; ++i) {
+        x.push_back(polygon[i].x - point.x);
+        y.push_back(polygon[i].y - point.y);
+        r.push_back(std::sqrt(x[i] * x[i] + y[i] * y[i]));
+        if (tolerance > r[i]) {
+            weights[i] = 1;
+            return {.errors = "---control point too close to polygon vertex---"};
+        }
+    }
+    float const areaTolerance = tolerance * scale;
+    for (unsigned int i = 0; i != corners; ++i) {
+        area.push_back((y[next(i)] * x[i] - y[i] * x[next(i)]) * 0.5f);
+        dot.push_back(y[i] * y[next(i)] + x[i] * x[next(i)]);
+        if (areaTolerance > std::abs(area[i]) && 0 > dot[i]) {
+            weights[i] = r[next(i)] / (r[next(i)] + r[i]);
+            weights[next(i)] = 1 - weights[i];
+            return {.edge = i};
+        }
+    }
+    float sum = 0;
+    for (unsigned int i = 0; i != corners; ++i) {
+        unsigned int const previous = (i + corners - 1) % corners;
+        if (std::abs(area[previous]) >= areaTolerance)
+            weights[i] += (r[previous] - dot[previous] / r[i]) / area[previous];
+        if (std::abs(area[i]) >= areaTolerance)
+            weights[i] += (r[next(i)] - dot[i] / r[i]) / area[i];
+        sum += weights[i];
+    }
+    Weighed weighed;
+    for (unsigned int i = 0; i != corners; ++i) {
+        weights[i] /= sum;
+        if (-0.2f > weights[i])
+            weighed.errors += "---point lies too far out side of polygon---";
+    }
+    return weighed;
+}
+
+/// The bits of weights; all NaN are one, because compilers may swap operands.
+std::vector<std::uint32_t> bitsOf(Weights const& weights)
+{
+    std::vector<std::uint32_t> bits;
+    for (float const weight : weights)
+        bits.push_back(std::bit_cast<std::uint32_t>(std::isnan(weight) ? kNan : weight));
+    return bits;
+}
+
+TEST(StitchTemplate, KeepsTheOrderOfOperations)
+{
+    float const infinity = std::numeric_limits<float>::infinity();
+    for (unsigned int seed = 0; seed != 20'000; ++seed) {
+        SCOPED_TRACE(seed);
+        Random random(seed);
+        unsigned int const corners = 1 + random.below(18); // any number in the last group of four
+        Points polygon = randomPolygon(corners, random.below(2) == 0, random.below(2) == 0, random);
+        float3 point = randomPoint(polygon, random);
+        for (float* const value : {&polygon[random.below(corners)].y, &point.x})
+            if (random.below(40) == 0)
+                *value = std::vector<float>{kNan, infinity, -infinity, 1e20f, -1e-30f}[random.below(5)];
+        Weights weights(corners + 1);
+        if (random.below(4) == 0) // sums start from what is there
+            std::generate(
+                weights.begin(), weights.end(), [&] { return random.below(3) == 0 ? -0.0f : random.coordinate(); });
+        Weights expected = weights;
+        StitchTemplate made;
+        made.setErrors("");
+        made.setPolySize(corners);
+        made.setTol(std::vector<float>{0.02f, 0.02f, 1e-4f, 0, -1}[random.below(5)]);
+        float const scale = random.below(4) == 0 ? random.coordinate() : 1;
+        auto const [edge, errors] = weighOneByOne(polygon, point, made.getTol(), scale, expected);
+        EXPECT_EQ(made.computeMeanValueCoordinates(polygon, point, weights, scale), edge);
+        EXPECT_EQ(bitsOf(weights), bitsOf(expected));
+        EXPECT_EQ(made.getErrors(), errors.c_str());
     }
 }
 
