@@ -13,9 +13,11 @@ namespace TSR::TileTree3D::Internal {
 /// The number of the tile that contains a voxel of its depth. \pre  coordinates are at most 2^33 from 0
 template <int side> Index tileOfVoxel(Index const& voxel)
 {
-    // Unsigned division by a constant takes a few cycles; the bias keeps it from rounding towards zero.
-    constexpr std::int64_t kBias = std::int64_t{1} << 33;
     auto const divided = [](std::int64_t coordinate) {
+        if constexpr (std::has_single_bit(static_cast<unsigned int>(side)))
+            return coordinate >> std::countr_zero(static_cast<unsigned int>(side));
+        // Unsigned division by a constant takes a few cycles; the bias keeps it from rounding towards zero.
+        constexpr std::int64_t kBias = std::int64_t{1} << 33;
         return static_cast<std::int64_t>(static_cast<std::uint64_t>(coordinate + kBias * side) / side) - kBias;
     };
     return {divided(voxel.i), divided(voxel.j), divided(voxel.k)};

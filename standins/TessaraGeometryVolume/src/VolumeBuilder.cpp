@@ -112,8 +112,9 @@ namespace {
         bool hasValues(TreeIndex tile) const { return valuesAt(tile) != nullptr; }
         float const* valuesAt(TreeIndex tile) const { return volume_.channel.tileData(tile).values(); }
 
-        /// The values of a tile with a source, initialized from a coarser one.
-        float* valuesOfTile(Index const& number, int depth)
+        /// The values of a tile with a source, initialized from a coarser one. Not inlined: it would slow down the loops
+        /// over voxels, most of which are in a recent tile.
+        [[gnu::noinline]] float* valuesOfTile(Index const& number, int depth)
         {
             TreeIndex const tile = insertTile(number, depth);
             bool const isNew = !hasValues(tile);
@@ -154,7 +155,7 @@ namespace {
                 });
                 return;
             }
-            forEachVoxelOfTile([&](int i, int j, int k) { values[linearIndex(kSide, i, j, k)] = source_.background; });
+            std::fill_n(values, Traits::kVoxelCount, source_.background);
         }
 
         // ---- Listed voxels
