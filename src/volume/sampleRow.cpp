@@ -170,11 +170,11 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
         row);
     if (!areNear)
         return false;
-    std::size_t const runCount = findRuns(count, row);
     bool const isPadded = state.haloChannel, isPositive = isPadded || state.hasPositiveHalos();
     // If layers are on the upper sides only, places below the tile read its first voxels.
-    if (!isPadded)
-        findLayers(count, isPositive ? -kLargestOffset : 1, kSide - 1, row);
+    float const begin = isPositive ? -kLargestOffset : 1, end = kSide - 1;
+    std::size_t const runCount =
+        isPadded ? findRuns<false>(count, begin, end, row) : findRuns<true>(count, begin, end, row);
     std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
     MODELING_ASSERT(std::find(row.values, row.values + runCount, nullptr) == row.values + runCount);
     MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);
