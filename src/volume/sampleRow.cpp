@@ -49,7 +49,7 @@ namespace {
                 row_.values[run] = values;
                 row_.open[openCount] = row_.empty[emptyCount] = static_cast<std::uint32_t>(run);
                 openCount += isFound ? 0 : 1;
-                emptyCount += isFound & (values == kNothing) ? 1 : 0;
+                emptyCount += (isFound & (values == kNothing)) ? 1 : 0;
             }
             for (std::size_t n = 0; n < openCount; ++n) {
                 std::uint32_t const run = row_.open[n];
