@@ -1,4 +1,11 @@
+// Building, sampling and marking by volumes. The rows `:flat kernel` are what marking costs at least: the arithmetic of a
+// sample at each point and of the sides of each face, without looking up any tile.
+
 #include "Inputs.h"
+
+#include "frame/ParallelFor.h"
+#include "subdivision/faceSize.h"
+#include "volume/PointRow.h"
 
 #include <Modeling/subdivideByVolume.h>
 #include <Modeling/subdivisionSteps.h>
@@ -36,6 +43,33 @@ template <class Traits, Layers layers> LinearSampler<Traits> samplerWith()
         layers == Layers::padded ? &padded : nullptr};
 }
 
+/// Blends values of a single tile for all points, and compares the sides of all faces with them.
+template <class Traits> void markByOneTile(FlatMesh const& mesh, Orvan::Array<float>& limits, Orvan::Array<bool>& marks)
+{
+    using namespace Internal;
+    constexpr int kSide = Traits::kSide + 1;
+    std::vector<float> const tile(kSide * kSide * kSide);
+    tbb::blocked_range<std::size_t> const fours(0, mesh.points.size / 4, PointRow::kCapacity);
+    Modeling::parallelFor(fours, [&](auto const& range) {
+        PointRow row = {};
+        row.values[0] = tile.data();
+        for (std::size_t first = 4 * range.begin(), count; first < 4 * range.end(); first += count) {
+            count = std::min(PointRow::kCapacity, 4 * range.end() - first);
+            placePoints(mesh.points.data + first, count, {kRadius, Traits::kSide, 1, {0, 0, 0}}, row);
+            interpolateRow<kSide>(count, {{kSide, kSide}, 0, Traits::kSide - 1}, row, limits.data + first);
+        }
+    });
+    Modeling::parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount(), 1), [&](auto const& faces) {
+        float3 const* const p = mesh.points.data;
+        for (unsigned int face = faces.begin(); face != faces.end(); ++face) {
+            unsigned int const* const c = mesh.faceVertex.data + mesh.faceOffset.data[face];
+            if (Geometry::Mesh::Internal::isBoxLonger(
+                    p[c[0]], p[c[1]], p[c[2]], Modeling::broadcast(limits.data[c[1]])))
+                marks.data[face] = true;
+        }
+    });
+}
+
 template <class Traits, Layers layers> void measureMarking(Run& run)
 {
     using Geometry::Mesh::Internal::markForSubdivision;
@@ -43,11 +77,14 @@ template <class Traits, Layers layers> void measureMarking(Run& run)
     FlatMesh const mesh(Meshes::sphere, run.size());
     auto const& [points, faceVertex, faceOffset] = mesh;
     Orvan::Array<bool> marks(mesh.faceCount());
-    timeRuns(run, mesh.faceCount(), [&, isByVolume = run.variant.empty()] {
-        if (isByVolume)
-            markForSubdivision(sampler, mesh.faceCount(), points, faceVertex, faceOffset, marks, kTolerance);
-        else
+    Orvan::Array<float> limits(mesh.pointCount());
+    timeRuns(run, mesh.faceCount(), [&] {
+        if (run.variant == ":flat kernel")
+            markByOneTile<Traits>(mesh, limits, marks);
+        else if (run.variant == ":length")
             markForSubdivision(kTolerance, mesh.faceCount(), points, faceVertex, faceOffset, marks);
+        else
+            markForSubdivision(sampler, mesh.faceCount(), points, faceVertex, faceOffset, marks, kTolerance);
         DoNotOptimize(marks.data);
     });
 }
@@ -85,7 +122,8 @@ template <class Traits> double sumOfValues(Volume<Traits> const& volume, std::ve
 
 template <class Traits> bool addRows(std::string const& suffix, std::vector<std::string> const& variantsOfBuilding)
 {
-    std::vector<std::string> const marking{"", ":length"}, sampling{"", ":single", "AtRandom", "AtRandom:single"};
+    std::vector<std::string> const marking{"", ":length", ":flat kernel"},
+        sampling{"", ":single", "AtRandom", "AtRandom:single"};
     Row("markByPaddedVolume" + suffix, kSampled, marking, measureMarking<Traits, Layers::padded>);
     Row("markByVolume" + suffix, kSampled, marking, measureMarking<Traits, Layers::positive>);
     Row("samplePaddedVolume" + suffix, kSampled, sampling, measureSampling<Traits, Layers::padded>);

@@ -91,7 +91,7 @@ public:
 
     /// Samples `count` points; each value equals that of `sample` to the bit. Faster than `sample`, most of all if
     /// consecutive points are mostly in the same tile; no faster if points are beyond 2^22 index units, or if an offset
-    /// is greater than 1. The first call on a copy allocates 48 kilobytes. Without `haloChannel`, calls allocate 0.5 to
+    /// is greater than 1. The first call on a copy allocates 40 kilobytes. Without `haloChannel`, calls allocate 0.5 to
     /// 1.4 kilobytes for each tile that they build a halo around, up to 512 tiles, which they keep.
     /// \throws std::bad_alloc  Some of `values` may have been written; the sampler remains usable.
     void sampleAll(Tessara::Math::float3 const* points, std::size_t count, int depth, int space, float* values);

@@ -49,6 +49,11 @@ inline void store(IntLanes lanes, std::int32_t* values)
     std::memcpy(values, &lanes, sizeof(lanes));
 }
 
+inline void store(IntLanes lanes, std::uint32_t* values)
+{
+    std::memcpy(values, &lanes, sizeof(lanes));
+}
+
 /// The lower value in each lane; that of `b` if either is NaN.
 inline Lanes min(Lanes a, Lanes b)
 {

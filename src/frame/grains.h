@@ -26,7 +26,7 @@ inline constexpr unsigned int kOneRingGrain = 1;
 /// An input, a property, or a part of an array: microseconds to seconds each, and often few of them.
 inline constexpr std::size_t kCoarseGrain = 1;
 /// Sampling a volume at a point takes some nanoseconds once the tiles around it are known. But each task copies the
-/// sampler, whose tables begin empty: 48 kilobytes to set up, and tens of tiles to look up.
+/// sampler, whose tables begin empty: 40 kilobytes to set up, and tens of tiles to look up.
 inline constexpr unsigned int kSampledPointGrain = 4096;
 
 /// Up to this many points, the calling thread has listed the corners by point before a second thread has woken up.

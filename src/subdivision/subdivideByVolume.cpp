@@ -33,7 +33,8 @@ namespace {
     float longestSide(float tolerance)
     {
         constexpr float kNoLimit = std::numeric_limits<float>::infinity();
-        return tolerance > std::numeric_limits<float>::epsilon() ? tolerance + tolerance : kNoLimit;
+        float const twice = tolerance + tolerance; // computed in any case, so that loops need no branch
+        return tolerance > std::numeric_limits<float>::epsilon() ? twice : kNoLimit;
     }
 
     /// A loop body. Each call has its own copy of the sampler, because cursors and caches must not be shared by tasks.

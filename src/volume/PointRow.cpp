@@ -91,37 +91,35 @@ bool placePoints(float3 const* points, std::size_t count, Placing const& placing
     return all(areNear);
 }
 
-std::size_t findRuns(std::size_t count, PointRow& row)
+template <bool canNeedLayer> std::size_t findRuns(std::size_t count, float begin, float end, PointRow& row)
 {
     constexpr std::size_t kFirst = PointRow::kFirstTile;
     row.tileX[kFirst - 1] = std::numeric_limits<float>::quiet_NaN(); // differs from all
     row.tileY[kFirst - 1] = row.tileZ[kFirst - 1] = 0;
-    std::uint32_t run = ~std::uint32_t{0};
+    std::uint32_t run = ~std::uint32_t{0}, needsLayer = 0;
     for (std::size_t n = 0; n < count; n += 4) {
         auto const differs = [n](float const* tile) { return load(tile + kFirst + n - 1) != load(tile + kFirst + n); };
-        std::int32_t isNew[4]; // -1 if it is
-        store(differs(row.tileX) | differs(row.tileY) | differs(row.tileZ), isNew);
+        std::uint32_t isSame[4], isOutside[4] = {}; // all bits are set if it is, and 1 if it is
+        store(~(differs(row.tileX) | differs(row.tileY) | differs(row.tileZ)), isSame);
+        if constexpr (canNeedLayer) {
+            Lanes const x = load(row.x + n), y = load(row.y + n), z = load(row.z + n);
+            IntLanes const isInside = (min(min(x, y), z) >= broadcast(begin)) & (max(max(x, y), z) < broadcast(end));
+            store(isInside + 1, isOutside);
+        }
         for (std::size_t k = 0; k < 4; ++k) {
-            run -= static_cast<std::uint32_t>(isNew[k]);
+            run += isSame[k] + 1;
+            needsLayer = (needsLayer & isSame[k]) | isOutside[k];
             row.run[n + k] = run;
+            // The last point of the run writes last.
             row.last[run] = static_cast<std::uint32_t>(n + k);
-            row.needsLayer[run] = 0;
+            row.needsLayer[run] = needsLayer;
         }
     }
     return run + 1;
 }
 
-void findLayers(std::size_t count, float begin, float end, PointRow& row)
-{
-    for (std::size_t n = 0; n < count; n += 4) {
-        Lanes const x = load(row.x + n), y = load(row.y + n), z = load(row.z + n);
-        IntLanes const isInside = (min(min(x, y), z) >= broadcast(begin)) & (max(max(x, y), z) < broadcast(end));
-        std::int32_t isOutside[4];
-        store(isInside + 1, isOutside);
-        for (std::size_t k = 0; k < 4; ++k)
-            row.needsLayer[row.run[n + k]] |= static_cast<std::uint32_t>(isOutside[k]);
-    }
-}
+template std::size_t findRuns<true>(std::size_t, float, float, PointRow&);
+template std::size_t findRuns<false>(std::size_t, float, float, PointRow&);
 
 template <int onlySide>
 void interpolateRow(std::size_t count, TileArrays const& arrays, PointRow const& row, float* values)

@@ -62,11 +62,11 @@ struct TileArrays {
 /// \return  false if some point is NaN, or too far away for exact steps
 bool placePoints(Tessara::Math::float3 const* points, std::size_t count, Placing const& placing, PointRow& row);
 
-/// Starts a run at each point whose tile differs from the one before. \return the number of runs
-std::size_t findRuns(std::size_t count, PointRow& row);
-
-/// Finds the runs that need the layer: those with a place outside of [begin, end) along some axis.
-void findLayers(std::size_t count, float begin, float end, PointRow& row);
+/// Starts a run at each point whose tile differs from the one before. Runs with a place outside of [begin, end) along
+/// some axis need the layer.
+/// \tparam canNeedLayer  If it is false, none does.
+/// \return  the number of runs
+template <bool canNeedLayer> std::size_t findRuns(std::size_t count, float begin, float end, PointRow& row);
 
 /// Blends the values of all points.
 /// \tparam onlySide  The side of all arrays, if no place is below its tile; otherwise 0, which reads `arrays.side`.

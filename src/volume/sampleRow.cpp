@@ -38,17 +38,19 @@ namespace {
         {
             KnownTiles<Traits>& knownTiles = *state_.knownTiles;
             int const depth = settings_.depth;
+            CornerHash const hash = knownTiles.hashAt(depth);
             knownTiles.makeRoomForHalos(runCount);
-            std::size_t openCount = 0;
+            std::size_t openCount = 0, emptyCount = 0;
             for (std::size_t run = 0; run < runCount; ++run) {
                 IJK const index = row_.tileOfRun(run);
-                KnownTile<Traits> const& known = knownTiles.at(index, depth);
-                row_.values[run] = known.values[row_.needsLayer[run]];
-                row_.open[openCount] = static_cast<std::uint32_t>(run);
-                bool const isFound = known.isOf(index, depth) & (row_.values[run] != nullptr);
+                KnownTile const& known = knownTiles.known[hash(index)];
+                float const* const values = known.values[row_.needsLayer[run]];
+                bool const isFound = known.isOf(index, depth) & (values != nullptr);
+                row_.values[run] = values;
+                row_.open[openCount] = row_.empty[emptyCount] = static_cast<std::uint32_t>(run);
                 openCount += isFound ? 0 : 1;
+                emptyCount += (isFound & (values == kNothing)) ? 1 : 0;
             }
-            std::size_t emptyCount = 0;
             for (std::size_t n = 0; n < openCount; ++n) {
                 std::uint32_t const run = row_.open[n];
                 row_.values[run] = findValues(run);
@@ -61,30 +63,37 @@ namespace {
     private:
         float const* findValues(std::size_t run)
         {
-            KnownTile<Traits>* known = &knownTile(row_.tileOfRun(run), settings_.depth);
-            if (!known->hasData)
+            std::size_t place = placeOfTile(row_.tileOfRun(run), settings_.depth);
+            KnownTiles<Traits>& knownTiles = *state_.knownTiles;
+            if (knownTiles.known[place].values[0] == kNothing)
                 return kNothing;
-            TileType const tile = known->tile; // a copy, because the entry may be replaced
+            TileType const tile = knownTiles.tiles[place]; // a copy, because the entry may be replaced
             if (tile.depth != settings_.depth) {
                 placeInTile(run, tile);
                 // The outermost tiles begin below 32-bit indices.
-                known = &knownTile({clampedIndex(tile.i), clampedIndex(tile.j), clampedIndex(tile.k)}, tile.depth);
+                place = placeOfTile({clampedIndex(tile.i), clampedIndex(tile.j), clampedIndex(tile.k)}, tile.depth);
             }
-            float const*& values = known->values[row_.needsLayer[run]];
+            float const*& values = knownTiles.known[place].values[row_.needsLayer[run]];
             if (!values)
                 values = buildLayeredValues(tile);
             return values;
         }
 
-        KnownTile<Traits>& knownTile(IJK index, int depth)
+        /// The place of a tile in the table, where it is entered unless it is known.
+        std::size_t placeOfTile(IJK index, int depth)
         {
-            KnownTile<Traits>& known = state_.knownTiles->at(index, depth);
-            if (!known.isOf(index, depth)) {
+            KnownTiles<Traits>& knownTiles = *state_.knownTiles;
+            std::size_t const place = knownTiles.hashAt(depth)(index);
+            if (!knownTiles.known[place].isOf(index, depth)) {
                 TileType const& tile = state_.neighbors.tileImpl(index.i, index.j, index.k, depth);
-                float const* const values = state_.valuesOf(tile, state_.copies);
-                known = {index, depth, tile, values != nullptr, {tile.depth == depth ? values : nullptr, nullptr}};
+                float const* const own = state_.valuesOf(tile, state_.copies);
+                knownTiles.tiles[place] = tile;
+                if (!own)
+                    knownTiles.known[place] = {index, depth, {kNothing, kNothing}};
+                else
+                    knownTiles.known[place] = {index, depth, {tile.depth == depth ? own : nullptr, nullptr}};
             }
-            return known;
+            return place;
         }
 
         /// Places the points of a run in a tile that is coarser than requested.
@@ -161,11 +170,11 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
         row);
     if (!areNear)
         return false;
-    std::size_t const runCount = findRuns(count, row);
     bool const isPadded = state.haloChannel, isPositive = isPadded || state.hasPositiveHalos();
     // If layers are on the upper sides only, places below the tile read its first voxels.
-    if (!isPadded)
-        findLayers(count, isPositive ? -kLargestOffset : 1, kSide - 1, row);
+    float const begin = isPositive ? -kLargestOffset : 1, end = kSide - 1;
+    std::size_t const runCount =
+        isPadded ? findRuns<false>(count, begin, end, row) : findRuns<true>(count, begin, end, row);
     std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
     MODELING_ASSERT(std::find(row.values, row.values + runCount, nullptr) == row.values + runCount);
     MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);

@@ -38,10 +38,19 @@ template <class Traits> auto Container<Traits>::noTile() -> TileType const&
     return kNone;
 }
 
+/// The slot of the tile with this lower corner, or the free one where it would be.
+/// \pre  the level has slots
 template <class Traits>
-std::size_t Container<Traits>::firstSlot(Level const& level, std::int64_t i, std::int64_t j, std::int64_t k)
+std::size_t Container<Traits>::slotOf(Level const& level, std::int64_t i, std::int64_t j, std::int64_t k)
 {
-    return static_cast<std::size_t>(hashOf(i, j, k)) & (level.slots.size() - 1);
+    std::size_t const mask = level.slots.size() - 1;
+    for (std::size_t slot = static_cast<std::size_t>(hashOf(i, j, k)) & mask;; slot = (slot + 1) & mask) {
+        if (level.slots[slot] == kNoTile)
+            return slot;
+        TileType const& tile = level.tiles[level.slots[slot]];
+        if (tile.i == i && tile.j == j && tile.k == k)
+            return slot;
+    }
 }
 
 template <class Traits> auto Container<Traits>::find(std::int64_t i, std::int64_t j, std::int64_t k, int depth) const
@@ -50,57 +59,47 @@ template <class Traits> auto Container<Traits>::find(std::int64_t i, std::int64_
     Level const& level = levels_[static_cast<std::size_t>(depth)];
     if (level.tiles.empty())
         return noTile();
-    i = tileOrigin<Traits>(i, depth);
-    j = tileOrigin<Traits>(j, depth);
-    k = tileOrigin<Traits>(k, depth);
-    for (std::size_t slot = firstSlot(level, i, j, k);; slot = (slot + 1) & (level.slots.size() - 1)) {
-        if (level.slots[slot] == kNoTile)
-            return noTile();
-        TileType const& tile = level.tiles[level.slots[slot]];
-        if (tile.i == i && tile.j == j && tile.k == k)
-            return tile;
-    }
+    std::size_t const slot =
+        slotOf(level, tileOrigin<Traits>(i, depth), tileOrigin<Traits>(j, depth), tileOrigin<Traits>(k, depth));
+    return level.slots[slot] == kNoTile ? noTile() : level.tiles[level.slots[slot]];
 }
 
-/// Keeps at least half of the slots free, so that searches are short.
-template <class Traits> void Container<Traits>::growSlots(Level& level)
+template <class Traits> void Container<Traits>::doubleSlots(Level& level)
 {
-    if (2 * (level.tiles.size() + 1) <= level.slots.size())
-        return;
-    Level grown;
-    grown.slots.assign(level.slots.empty() ? 8 : 2 * level.slots.size(), kNoTile);
+    level.slots = std::vector<std::uint32_t>(std::max<std::size_t>(8, 2 * level.slots.size()), kNoTile);
+    std::size_t const mask = level.slots.size() - 1;
     for (TileType const& tile : level.tiles) {
-        std::size_t slot = firstSlot(grown, tile.i, tile.j, tile.k);
-        while (grown.slots[slot] != kNoTile)
-            slot = (slot + 1) & (grown.slots.size() - 1);
-        grown.slots[slot] = tile.index;
+        auto slot = static_cast<std::size_t>(hashOf(tile.i, tile.j, tile.k)) & mask;
+        while (level.slots[slot] != kNoTile) // no other tile is equal, so there is no need to compare
+            slot = (slot + 1) & mask;
+        level.slots[slot] = tile.index;
     }
-    level.slots = std::move(grown.slots);
 }
 
 template <class Traits>
 std::uint32_t Container<Traits>::findOrInsert(std::int64_t i, std::int64_t j, std::int64_t k, int depth, bool& isNew)
 {
-    TileType const& known = find(i, j, k, depth);
-    isNew = !known.valid;
-    if (!isNew)
-        return known.index;
-
-    Level& level = levels_[static_cast<std::size_t>(depth)];
-    if (level.tiles.size() >= kFirstRepeated)
-        throw std::bad_alloc();
-    growSlots(level);
     TileType tile;
     tile.i = tileOrigin<Traits>(i, depth);
     tile.j = tileOrigin<Traits>(j, depth);
     tile.k = tileOrigin<Traits>(k, depth);
+    Level& level = levels_[static_cast<std::size_t>(depth)];
+    auto const slotOfTile = [&] { return slotOf(level, tile.i, tile.j, tile.k); };
+    std::size_t slot = level.slots.empty() ? 0 : slotOfTile();
+    isNew = level.slots.empty() || level.slots[slot] == kNoTile;
+    if (!isNew)
+        return level.slots[slot];
+    if (level.tiles.size() >= kFirstRepeated)
+        throw std::bad_alloc();
+    // At least half of the slots remain free, so that searches are short.
+    if (2 * (level.tiles.size() + 1) > level.slots.size()) {
+        doubleSlots(level);
+        slot = slotOfTile();
+    }
     tile.index = static_cast<std::uint32_t>(level.tiles.size());
     tile.depth = depth;
     tile.valid = true;
     level.tiles.push_back(tile);
-    std::size_t slot = firstSlot(level, tile.i, tile.j, tile.k);
-    while (level.slots[slot] != kNoTile)
-        slot = (slot + 1) & (level.slots.size() - 1);
     level.slots[slot] = tile.index;
     return tile.index;
 }
@@ -115,9 +114,11 @@ template <class Traits> void Container<Traits>::completeParents()
 {
     for (int depth = Traits::kDeepest; depth > 0; --depth) {
         std::vector<TileType>& parents = levels_[static_cast<std::size_t>(depth - 1)].tiles;
+        std::uint32_t parent = kNoTile; // of the previous tile, which mostly is the next one's as well
         for (TileType& tile : levels_[static_cast<std::size_t>(depth)].tiles) {
             bool isNew = false;
-            std::uint32_t const parent = findOrInsert(tile.i, tile.j, tile.k, depth - 1, isNew);
+            if (parent == kNoTile || !contains(parents[parent], tile.i, tile.j, tile.k))
+                parent = findOrInsert(tile.i, tile.j, tile.k, depth - 1, isNew);
             parents[parent].hasChildren = true;
             tile.parent = parent;
         }

@@ -1,6 +1,7 @@
 #include <TessaraGeometryVolume/HaloTile.h>
 
 #include <algorithm>
+#include <utility>
 
 namespace TSR::TileTree3D {
 
@@ -39,34 +40,26 @@ namespace {
         return blend(alongY(z.voxel), alongY(nextZ), z.fraction);
     }
 
-    template <class Traits> void copyInterior(ConstTileData<float, Traits::kSide, 0> from, PositiveHalo<Traits>& out)
-    {
-        for (int k = 0; k < Traits::kSide; ++k)
-            for (int j = 0; j < Traits::kSide; ++j)
-                for (int i = 0; i < Traits::kSide; ++i)
-                    out(i, j, k) = from(i, j, k);
-    }
-
-    /// The voxels across a face, an edge or the corner: along each axis either the one after the end, or all inside.
-    struct Region {
-        IJK first, end;
+    /// Which of the upper neighbors: 0 or 1 along each axis. A type, so that loops over regions have constant bounds.
+    template <int across> struct Direction {
+        static constexpr int i = across & 1, j = across >> 1 & 1, k = across >> 2 & 1;
     };
 
-    template <class Traits> Region regionAcross(IJK direction)
+    template <class Visit, int... numbers>
+    void visitDirections(Visit const& visit, std::integer_sequence<int, numbers...>)
     {
-        constexpr int kSide = Traits::kSide;
-        auto const first = [](int step) { return step * kSide; };
-        auto const end = [](int step) { return kSide + step; };
-        return {{first(direction.i), first(direction.j), first(direction.k)},
-            {end(direction.i), end(direction.j), end(direction.k)}};
+        (visit(Direction<numbers + 1>()), ...);
     }
 
-    template <class Rule> void forEachVoxel(Region const& region, Rule const& rule)
+    /// Calls `rule(i, j, k)` for the voxels of a halo across a face, an edge or the corner: along each axis either the
+    /// one after the end, or all inside.
+    template <class Traits, int across, class Rule> void forEachVoxelAcross(Direction<across> step, Rule const& rule)
     {
-        for (int k = region.first.k; k < region.end.k; ++k)
-            for (int j = region.first.j; j < region.end.j; ++j)
-                for (int i = region.first.i; i < region.end.i; ++i)
-                    rule(IJK{i, j, k});
+        constexpr int kSide = Traits::kSide;
+        for (int k = step.k * kSide; k < kSide + step.k; ++k)
+            for (int j = step.j * kSide; j < kSide + step.j; ++j)
+                for (int i = step.i * kSide; i < kSide + step.i; ++i)
+                    rule(i, j, k);
     }
 
     template <class Traits>
@@ -100,26 +93,31 @@ template <class Traits> void setHaloTile(typename Container<Traits>::TileType co
         return;
     }
     out.reset(0);
-    copyInterior<Traits>(own, out);
+    float* const halo = &out(0);
+    auto const outAt = [=](int i, int j, int k) -> float& { return halo[i + (j + k * (kSide + 1)) * (kSide + 1)]; };
+    auto const valueOf = [](float const* values, int i, int j, int k) { return values[i + (j + k * kSide) * kSide]; };
+    forEachVoxelAcross<Traits>(
+        Direction<0>(), [&](int i, int j, int k) { outAt(i, j, k) = valueOf(own.values(), i, j, k); });
     bool const hasParent = parentTile && parentHalo;
     IJK const child = tile.childIJK();
-    for (int across = 1; across < 8; ++across) {
-        IJK const direction{across & 1, across >> 1 & 1, across >> 2 & 1};
-        auto const& found = tileAcross<Traits>(tile, direction, accessor);
+    auto const fillAcross = [&]<int across>(Direction<across> step) {
+        auto const& found = tileAcross<Traits>(tile, {step.i, step.j, step.k}, accessor);
         auto const data = channel.tileData(found.treeIndex());
-        bool const isNeighbor = data && found.depth == tile.depth;
-        bool const isInCoarser = data && found.depth < tile.depth && hasParent;
-        forEachVoxel(regionAcross<Traits>(direction), [&](IJK voxel) {
-            float& value = out(voxel.i, voxel.j, voxel.k);
-            if (isNeighbor)
-                value =
-                    data(voxel.i - direction.i * kSide, voxel.j - direction.j * kSide, voxel.k - direction.k * kSide);
-            else if (isInCoarser)
-                value = valueOfParent<Traits>(parentHalo, child, voxel, order);
-            else
-                value = own(std::min(voxel.i, kSide - 1), std::min(voxel.j, kSide - 1), std::min(voxel.k, kSide - 1));
-        });
-    }
+        if (data && found.depth == tile.depth)
+            forEachVoxelAcross<Traits>(step, [&](int i, int j, int k) {
+                outAt(i, j, k) = valueOf(data.values(), i - step.i * kSide, j - step.j * kSide, k - step.k * kSide);
+            });
+        else if (data && found.depth < tile.depth && hasParent)
+            forEachVoxelAcross<Traits>(step, [&](int i, int j, int k) {
+                outAt(i, j, k) = valueOfParent<Traits>(parentHalo, child, {i, j, k}, order);
+            });
+        else
+            forEachVoxelAcross<Traits>(step, [&](int i, int j, int k) {
+                outAt(i, j, k) =
+                    valueOf(own.values(), std::min(i, kSide - 1), std::min(j, kSide - 1), std::min(k, kSide - 1));
+            });
+    };
+    visitDirections(fillAcross, std::make_integer_sequence<int, 7>());
 }
 
 template void setHaloTile<Traits2>(Container<Traits2>::TileType const&, Container<Traits2>::TileType const*,

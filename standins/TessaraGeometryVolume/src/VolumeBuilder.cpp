@@ -1,5 +1,6 @@
 #include <TessaraGeometryVolume/VolumeBuilder.h>
 
+#include "RecentTiles.h"
 #include "boxParts.h"
 
 #include <TessaraGeometryVolume/HaloTile.h>
@@ -15,6 +16,8 @@ namespace TSR::TileTree3D {
 using Internal::floorDivide;
 using Internal::Index;
 using Internal::rangeOf;
+using Internal::RecentTiles;
+using Internal::tileOfVoxel;
 using Internal::VoxelRange;
 
 namespace {
@@ -109,8 +112,9 @@ namespace {
         bool hasValues(TreeIndex tile) const { return valuesAt(tile) != nullptr; }
         float const* valuesAt(TreeIndex tile) const { return volume_.channel.tileData(tile).values(); }
 
-        /// The values of a tile with a source, initialized from a coarser one.
-        float* valuesOfTile(Index const& number, int depth)
+        /// The values of a tile with a source, initialized from a coarser one. Not inlined: it would slow down the loops
+        /// over voxels, most of which are in a recent tile.
+        [[gnu::noinline]] float* valuesOfTile(Index const& number, int depth)
         {
             TreeIndex const tile = insertTile(number, depth);
             bool const isNew = !hasValues(tile);
@@ -151,30 +155,19 @@ namespace {
                 });
                 return;
             }
-            forEachVoxelOfTile([&](int i, int j, int k) { values[linearIndex(kSide, i, j, k)] = source_.background; });
+            std::fill_n(values, Traits::kVoxelCount, source_.background);
         }
 
         // ---- Listed voxels
 
-        /// The tile of the previous voxel: consecutive voxels are mostly in the same one.
-        struct TileOfVoxel {
-            Index number{};
-            float* values = nullptr;
-        };
-
-        static Index tileOfVoxel(Index const& voxel)
+        float& valueOfVoxel(Index const& voxel, int depth, RecentTiles& recent)
         {
-            return {floorDivide(voxel.i, kSide), floorDivide(voxel.j, kSide), floorDivide(voxel.k, kSide)};
-        }
-
-        float& valueOfVoxel(std::int64_t i, std::int64_t j, std::int64_t k, int depth, TileOfVoxel& current)
-        {
-            Index const tile = tileOfVoxel({i, j, k});
-            if (!current.values || tile.i != current.number.i || tile.j != current.number.j
-                || tile.k != current.number.k)
-                current = {tile, valuesOfTile(tile, depth)};
-            return current.values[linearIndex(kSide, static_cast<int>(i - tile.i * kSide),
-                static_cast<int>(j - tile.j * kSide), static_cast<int>(k - tile.k * kSide))];
+            Index const tile = tileOfVoxel<kSide>(voxel);
+            RecentTiles::Entry& entry = recent.at(tile);
+            if (!entry.isOf(tile)) [[unlikely]]
+                entry = {tile, valuesOfTile(tile, depth)};
+            return entry.values[linearIndex(kSide, static_cast<int>(voxel.i - tile.i * kSide),
+                static_cast<int>(voxel.j - tile.j * kSide), static_cast<int>(voxel.k - tile.k * kSide))];
         }
 
         /// Adds lists in the order from coarse to fine.
@@ -185,9 +178,9 @@ namespace {
             std::stable_sort(
                 lists.begin(), lists.end(), [](VoxelList const& a, VoxelList const& b) { return a.depth < b.depth; });
             for (VoxelList const& list : lists) {
-                TileOfVoxel current;
+                RecentTiles recent(list.voxels.size());
                 for (Voxel const& voxel : list.voxels)
-                    valueOfVoxel(voxel.i, voxel.j, voxel.k, list.depth, current) = voxel.value;
+                    valueOfVoxel({voxel.i, voxel.j, voxel.k}, list.depth, recent) = voxel.value;
             }
         }
 
@@ -207,9 +200,9 @@ namespace {
 
         void addCubes()
         {
-            TileOfVoxel current;
+            RecentTiles recent(source_.cubeValues.size());
             forEachVoxelOfCubes([&](std::int64_t i, std::int64_t j, std::int64_t k, float value) {
-                valueOfVoxel(i, j, k, source_.depth, current) = value;
+                valueOfVoxel({i, j, k}, source_.depth, recent) = value;
             });
         }
 
@@ -220,12 +213,12 @@ namespace {
             if (source_.boxes.empty())
                 return;
             auto const inserter = [&](int depth) {
-                return [this, depth, current = Index{INT64_MAX, 0, 0}](
+                return [this, depth, current = RecentTiles::Entry()](
                            std::int64_t i, std::int64_t j, std::int64_t k) mutable {
-                    Index const tile = tileOfVoxel({i, j, k});
-                    if (tile.i != current.i || tile.j != current.j || tile.k != current.k)
+                    Index const tile = tileOfVoxel<kSide>({i, j, k});
+                    if (!current.isOf(tile))
                         insertTile(tile, depth);
-                    current = tile;
+                    current.tile = tile;
                 };
             };
             for (VoxelList const& list : source_.lists) {
@@ -308,7 +301,7 @@ namespace {
                 if (rangeOf(box).isEmpty())
                     continue;
                 for (Index const& corner : {first, Index{end.i - 1, end.j - 1, end.k - 1}})
-                    originOf(tileOfVoxel(corner), source_.depth); // throws if it is out of range
+                    originOf(tileOfVoxel<kSide>(corner), source_.depth); // throws if it is out of range
                 boxes_.push_back(&box);
             }
         }
@@ -446,7 +439,7 @@ namespace {
             if (auto const value = commonValue(boxes, withUpperNeighbors(tile))) {
                 auto const [known, isNew] = constantDivisions_.try_emplace(std::bit_cast<std::uint32_t>(*value), 0);
                 if (isNew) {
-                    std::uint32_t const repeated = addRepeated(tileOfVoxel(tile.first));
+                    std::uint32_t const repeated = addRepeated(tileOfVoxel<kSide>(tile.first));
                     shareConstant(treeIndex(repeated, source_.depth), *value);
                     known->second = volume_.container.addDivision({{{{0}, {0}, {0}}}, {repeated}});
                 }
@@ -460,7 +453,7 @@ namespace {
                 double const along = static_cast<double>(voxelsOfTile(depth) / kSide);
                 if (partCount > kMostParts || static_cast<double>(kWorthwhile * partCount) > along * along * along)
                     return false;
-                fillParts(tileOfVoxel(tile.first), boxes, parts);
+                fillParts(tileOfVoxel<kSide>(tile.first), boxes, parts);
                 division = volume_.container.addDivision(std::move(parts));
             }
             TreeIndex const divided = insertTile(number, depth);

@@ -73,10 +73,17 @@ private:
     };
 
     static TileType const& noTile();
+    static bool contains(TileType const& tile, std::int64_t i, std::int64_t j, std::int64_t k) noexcept
+    {
+        // A negative distance becomes a large unsigned one.
+        auto const width = static_cast<std::uint64_t>(Traits::tileWidth(tile.depth));
+        return static_cast<std::uint64_t>(i - tile.i) < width && static_cast<std::uint64_t>(j - tile.j) < width
+            && static_cast<std::uint64_t>(k - tile.k) < width;
+    }
     TileType const& repeatedTile(
         TileType const& divided, std::int64_t i, std::int64_t j, std::int64_t k, TileType& room) const;
-    static std::size_t firstSlot(Level const& level, std::int64_t i, std::int64_t j, std::int64_t k);
-    static void growSlots(Level& level);
+    static std::size_t slotOf(Level const& level, std::int64_t i, std::int64_t j, std::int64_t k);
+    static void doubleSlots(Level& level);
 
     std::array<Level, Traits::kDepthCount> levels_;
     std::uint32_t terminalDepths_ = 0; // bit d: some tile of depth d has values of its own, or a division
@@ -122,13 +129,6 @@ private:
         return tile_->valid && depth <= Traits::kDeepest
             && (tile_->depth == depth
                 || (tile_->depth < depth && tile_->isTerminal && !tile_->hasChildren && tile_->division < 0));
-    }
-    static bool contains(TileType const& tile, std::int64_t i, std::int64_t j, std::int64_t k) noexcept
-    {
-        // A negative distance becomes a large unsigned one.
-        auto const width = static_cast<std::uint64_t>(Traits::tileWidth(tile.depth));
-        return static_cast<std::uint64_t>(i - tile.i) < width && static_cast<std::uint64_t>(j - tile.j) < width
-            && static_cast<std::uint64_t>(k - tile.k) < width;
     }
     TileType const& lookUp(int i, int j, int k, int depth);
 
