@@ -224,7 +224,8 @@ namespace {
                 for (std::size_t i = 0; target && i < count; ++i) {
                     PlyProperty& property = element.properties[first + i];
                     property.use = Use::Value;
-                    property.target = target->data + i * sizeof(T);
+                    property.target =
+                        element.count == 0 ? nullptr : target->data + i * sizeof(T); // no values, no array
                     property.stride = target->elementBytes;
                 }
                 return target.has_value();

@@ -70,6 +70,12 @@ namespace {
             {"a list of faces in front",
                 {".ply", plyHead + plyFace + plyPoints + "end_header\r\n3 0 1 2\n\n0 0 0\n1 0 0\n0 1 0", 3, {0, 1, 2},
                     {0, 3}}},
+            {"colors of no faces",
+                {".ply",
+                    plyHead + plyPoints
+                        + "element face 0\nproperty list uchar int vertex_index\nproperty uchar red\n"
+                          "property uchar green\nproperty uchar blue\nend_header\n0 0 0\n1 0 0\n0 1 0\n",
+                    3, {}, {}}},
             {"the name of a texture file",
                 {".ply", plyHead + "comment TextureFile a b.png\n" + plyPoints + "end_header\n0 0 0\n1 0 0\n0 1 0\n", 3,
                     {}, {}, "the texture file \"a b.png\""}},
