@@ -140,7 +140,8 @@ THREADS = """
 
 Time in ns per element at the largest size, repeated. The serial share is the part of the work that one thread does while the others
 wait, from the processor time and the wall time of the runs with {threads}, so waiting for memory counts as work. By Amdahl's law
-it allows the speed-ups in the last columns, if memory is fast enough for that many threads.
+it allows the speed-ups in the last columns, if memory is fast enough for that many threads. Calls for one point, polygon, volume or
+pattern run on the thread of the caller, who may make many at a time: their share is 100 %.
 """
 
 
@@ -208,7 +209,8 @@ def threads_table(results: Results, settings: list[Setting], warm: Setting) -> I
         times = [nanoseconds(results[row, setting]) for setting in settings if not setting.is_fresh]
         share = serial_share(results[row, warm], warm.threads)
         speedups = [f"{1 / (share + (1 - share) / count):.1f}" for count in (16, 64)]
-        yield f"| {operation_of(row).title}, {size_of(row)} | {' | '.join(times)} | {100 * share:.1f} % | {' | '.join(speedups)} |"
+        title = ", ".join(filter(None, [operation_of(row).title, size_of(row)]))
+        yield f"| {title} | {' | '.join(times)} | {100 * share:.1f} % | {' | '.join(speedups)} |"
 
 
 def details(results: Results, settings: list[Setting], warm: Setting) -> Iterator[str]:
