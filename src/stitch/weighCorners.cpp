@@ -15,7 +15,7 @@ namespace Modeling::Internal {
 namespace {
 
     constexpr float kLowestWeight = -0.2f; // a point with a lower weight is too far outside
-    constexpr std::size_t kBlockSize = 4; // lanes
+    constexpr std::size_t kCornersPerBlock = 4; // lanes
 
     /// Four consecutive corners and the edges that start there, relative to a point in the plane. Lanes beyond the last
     /// corner of the polygon repeat corner 0, which comes after it.
@@ -28,11 +28,11 @@ namespace {
     };
     /// Polygons of up to eight corners have spans of fixed extent, so that their loops are unrolled.
     template <std::size_t kExtent> using Blocks = std::span<CornerBlock, kExtent>;
-    using Corners = std::span<float3 const>;
+    using Polygon = std::span<float3 const>;
 
     constexpr std::size_t blockCountOf(std::size_t cornerCount)
     {
-        return (cornerCount + kBlockSize - 1) / kBlockSize;
+        return (cornerCount + kCornersPerBlock - 1) / kCornersPerBlock;
     }
 
     /// The lanes that come one after those of `lanes`, of which the last is in `following`.
@@ -59,7 +59,7 @@ namespace {
     template <std::size_t kExtent>
     std::size_t cornersIn(std::size_t block, std::size_t cornerCount, Blocks<kExtent> blocks)
     {
-        return block + 1 == blocks.size() ? cornerCount - kBlockSize * block : kBlockSize;
+        return block + 1 == blocks.size() ? cornerCount - kCornersPerBlock * block : kCornersPerBlock;
     }
 
     /// The first values, at least one and at most four; the other lanes are -0. Reads value by value: callers have often
@@ -72,7 +72,7 @@ namespace {
 
     void storeFirst(std::size_t count, Lanes lanes, float* values)
     {
-        if (count == kBlockSize)
+        if (count == kCornersPerBlock)
             return store(lanes, values);
         values[0] = lanes[0];
         if (count > 1)
@@ -84,21 +84,22 @@ namespace {
     /// A mask of the first lanes, at most four.
     IntLanes firstLanes(std::size_t count)
     {
-        static constexpr std::int32_t kMasks[2 * kBlockSize] = {-1, -1, -1, -1};
+        static constexpr std::int32_t kMasks[2 * kCornersPerBlock] = {-1, -1, -1, -1};
         IntLanes mask;
-        std::memcpy(&mask, kMasks + kBlockSize - count, sizeof(mask));
+        std::memcpy(&mask, kMasks + kCornersPerBlock - count, sizeof(mask));
         return mask;
     }
 
     /// Computes the vectors to the corners.
-    template <std::size_t kExtent> void viewCorners(Corners polygon, float3 const& point, Blocks<kExtent> blocks)
+    template <std::size_t kExtent> void viewCorners(Polygon polygon, float3 const& point, Blocks<kExtent> blocks)
     {
         using Pairs = double __attribute__((vector_size(16)));
         for (std::size_t i = 0; i != blocks.size(); ++i) {
             std::size_t const count = cornersIn(i, polygon.size(), blocks);
-            double xy[kBlockSize];
-            for (std::size_t lane = 0; lane != kBlockSize; ++lane)
-                std::memcpy(&xy[lane], &polygon[lane == 0 || lane < count ? kBlockSize * i + lane : 0], sizeof(double));
+            double xy[kCornersPerBlock];
+            for (std::size_t lane = 0; lane != kCornersPerBlock; ++lane)
+                std::memcpy(
+                    &xy[lane], &polygon[lane == 0 || lane < count ? kCornersPerBlock * i + lane : 0], sizeof(double));
             auto const front = reinterpret_cast<Lanes>(Pairs{xy[0], xy[1]});
             auto const back = reinterpret_cast<Lanes>(Pairs{xy[2], xy[3]});
             CornerBlock& block = blocks[i];
@@ -118,7 +119,7 @@ namespace {
         if (any(found))
             for (std::size_t i = 0; i != blocks.size(); ++i)
                 if (unsigned int const bits = bitsOf(rule(blocks[i])))
-                    return kBlockSize * i + static_cast<std::size_t>(std::countr_zero(bits));
+                    return kCornersPerBlock * i + static_cast<std::size_t>(std::countr_zero(bits));
         return std::nullopt;
     }
 
@@ -145,7 +146,9 @@ namespace {
     std::size_t weighEdge(std::size_t edge, std::size_t cornerCount, CornerBlock const* blocks, float* weights)
     {
         std::size_t const next = edge + 1 == cornerCount ? 0 : edge + 1;
-        auto const distanceTo = [=](std::size_t corner) { return blocks[corner / kBlockSize].r[corner % kBlockSize]; };
+        auto const distanceTo = [=](std::size_t corner) {
+            return blocks[corner / kCornersPerBlock].r[corner % kCornersPerBlock];
+        };
         weights[edge] = distanceTo(next) / (distanceTo(next) + distanceTo(edge));
         weights[next] = 1.0f - weights[edge];
         return std::size_t{kLowestWeight > weights[edge]} + std::size_t{kLowestWeight > weights[next]};
@@ -155,13 +158,14 @@ namespace {
     template <std::size_t kExtent> float addTerms(std::size_t cornerCount, float const* weights, Blocks<kExtent> blocks)
     {
         float sum = 0;
-        Lanes preceding = broadcast(blocks.back().endTerm[(cornerCount - 1) % kBlockSize]);
+        Lanes preceding = broadcast(blocks.back().endTerm[(cornerCount - 1) % kCornersPerBlock]);
         for (std::size_t i = 0; i != blocks.size(); ++i) {
             CornerBlock& block = blocks[i];
             std::size_t const count = cornersIn(i, cornerCount, blocks);
-            Lanes const started = loadFirst(count, weights + kBlockSize * i) + lanesBefore(preceding, block.endTerm);
+            Lanes const started =
+                loadFirst(count, weights + kCornersPerBlock * i) + lanesBefore(preceding, block.endTerm);
             block.weight = selectTerms(firstLanes(count), started + block.startTerm);
-            for (std::size_t lane = 0; lane != kBlockSize; ++lane)
+            for (std::size_t lane = 0; lane != kCornersPerBlock; ++lane)
                 sum += block.weight[lane];
             preceding = block.endTerm;
         }
@@ -176,13 +180,13 @@ namespace {
         for (std::size_t i = 0; i != blocks.size(); ++i) {
             std::size_t const count = cornersIn(i, cornerCount, blocks);
             Lanes const weight = blocks[i].weight / sum;
-            storeFirst(count, weight, weights + kBlockSize * i);
+            storeFirst(count, weight, weights + kCornersPerBlock * i);
             tooLow += (broadcast(kLowestWeight) > weight) & firstLanes(count); // -1 for each
         }
         return any(tooLow) ? static_cast<std::size_t>(-(tooLow[0] + tooLow[1] + tooLow[2] + tooLow[3])) : 0;
     }
 
-    template <std::size_t kExtent> PlaceInPolygon weighCornersIn(Blocks<kExtent> blocks, Corners polygon,
+    template <std::size_t kExtent> PlaceInPolygon weighCornersIn(Blocks<kExtent> blocks, Polygon polygon,
         float3 const& point, float tolerance, float areaTolerance, float* weights)
     {
         viewCorners(polygon, point, blocks);
@@ -201,7 +205,7 @@ namespace {
 
 }
 
-PlaceInPolygon weighCorners(Corners polygon, float3 const& point, float tolerance, float areaTolerance, float* weights)
+PlaceInPolygon weighCorners(Polygon polygon, float3 const& point, float tolerance, float areaTolerance, float* weights)
 {
     MODELING_ASSERT(!polygon.empty());
     auto const weighIn = [&](auto blocks) {
