@@ -122,6 +122,19 @@ MeshBuilder dependentNeedlesAtHubs()
     return mesh;
 }
 
+/// A sphere with a few needles whose collapses at ratio 0.3 make short edges to points that no needle had.
+MeshBuilder needlesThatReachFurther()
+{
+    MeshBuilder mesh = MeshBuilder::sphere(20);
+    float fraction = 0.35f;
+    for (std::size_t face = 40; face < mesh.faces.size(); face += 120, fraction += 0.004f) {
+        auto const [a, b, c] = mesh.faces[face];
+        mesh.points[b] = mesh.points[a] + (mesh.points[b] - mesh.points[a]) * 0.25f;
+        mesh.points[c] = mesh.points[a] + (mesh.points[c] - mesh.points[a]) * fraction;
+    }
+    return mesh;
+}
+
 /// The bits of a position; the same for every NaN, because those depend on the compiler.
 std::array<unsigned int, 3> bitsOf(float3 const& p)
 {
@@ -166,6 +179,8 @@ TEST(RemoveSlivers, AgreesWithThePlainReferenceAndKeepsClosedSurfaces)
         {"wheel with three radii", MeshBuilder::wheel(300, {0.02f, 1, 0.5f}).shuffled(3)},
         {"hubs with needles", MeshBuilder::wheel(90).withNeedles(150).withNoise(0.0002f, 3).shuffled(5)},
         {"dependent needles at hubs", dependentNeedlesAtHubs()},
+        {"needles that reach further", needlesThatReachFurther()},
+        {"needles that reach further, shuffled", needlesThatReachFurther().shuffled(8)},
         {"equal points", MeshBuilder::sphere(6).withNeedles(30, 0.0f)},
         {"two parts",
             MeshBuilder::sphere(5).withNeedles(9).joinedWith(MeshBuilder::torus(9, 9).withNeedles(5), {9, 0, 0})},
