@@ -36,8 +36,9 @@ struct HalfEdge {
 /// Any number of threads may read a structure concurrently. Building runs in parallel with the same result for any
 /// number of threads. It takes linear time however the points are numbered, plus the time to sort the edges at each
 /// point. Looking up an edge is a short linear search, or a binary search at points of high valence. Memory: 8 bytes
-/// per corner and 4 per point, and 8 more per corner if not all faces are triangles. During construction: 2 more per
-/// corner, and up to 8 more for points of high valence and repeated edges.
+/// per corner and 4 per point, and 8 more per corner if not all faces are triangles. During construction: about 4 more
+/// per point if faces that are stored close together have points that are, otherwise 2 per corner; and up to 8 more per
+/// corner for points of high valence and repeated edges.
 class HalfEdgeDataStructure {
 public:
     struct Neighbor {

@@ -49,9 +49,13 @@ TEST(HalfEdgeDataStructure, AgreesWithAMapForEachPoint)
         {"a face twice", {std::vector<float3>(3), {0, 1, 2, 0, 1, 2}, {0, 3, 6}}},
         {"a triangle and a quad", {std::vector<float3>(4), {0, 1, 2, 3, 2, 1, 0}, {0, 3, 7}}},
         {"sphere", MeshBuilder::sphere(40).shuffled(1).polygons()},
+        {"large sphere", MeshBuilder::sphere(100).polygons()},
+        {"large sphere, shuffled", MeshBuilder::sphere(128).shuffled(1).polygons()},
+        {"quads", PolygonMesh::quads(180)},
         {"hub", MeshBuilder::bipyramid(3000).polygons()},
         {"triangles at random", PolygonMesh::soup(40, 30'000, 3, 3, random)},
         {"polygons at random", PolygonMesh::soup(300, 500, 0, 7, random)},
+        {"many polygons at random", PolygonMesh::soup(85'000, 85'000, 0, 5, random)},
         {"large polygons", PolygonMesh::soup(4000, 3, 300, 300, random)},
     };
     for (auto const& [name, mesh] : meshes) {
