@@ -56,7 +56,7 @@ template <class Traits> void markByOneTile(FlatMesh const& mesh, Orvan::Array<fl
         for (std::size_t first = 4 * range.begin(), count; first < 4 * range.end(); first += count) {
             count = std::min(PointRow::kCapacity, 4 * range.end() - first);
             placePoints(mesh.points.data + first, count, {kRadius, Traits::kSide, 1, {0, 0, 0}}, row);
-            interpolateRow<kSide>(count, {{kSide, kSide}, 0, Traits::kSide - 1}, row, limits.data + first);
+            interpolateRow<kSide, kSide, false>(count, 1, {0, Traits::kSide - 1}, row, limits.data + first);
         }
     });
     Modeling::parallelFor(tbb::blocked_range<unsigned int>(0, mesh.faceCount(), 1), [&](auto const& faces) {

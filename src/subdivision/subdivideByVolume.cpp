@@ -29,12 +29,20 @@ namespace {
             mean[n] = (0 + coordinate[n] + coordinate[n] + coordinate[n]) / 3.0f;
     }
 
-    /// The limit on the sides of a face's bounding box; infinite if the tolerance is too small or NaN.
-    float longestSide(float tolerance)
+    /// Turns values of the volume into limits on the sides of a face's bounding box; infinite if the local tolerance is
+    /// too small or NaN.
+    void turnIntoLimits(float tolerance, std::size_t count, float* values)
     {
-        constexpr float kNoLimit = std::numeric_limits<float>::infinity();
-        float const twice = tolerance + tolerance; // computed in any case, so that loops need no branch
-        return tolerance > std::numeric_limits<float>::epsilon() ? twice : kNoLimit;
+        auto const limitsOf = [=](Lanes four) {
+            Lanes const local = four * broadcast(tolerance);
+            constexpr float kNoLimit = std::numeric_limits<float>::infinity();
+            return local > broadcast(std::numeric_limits<float>::epsilon()) ? local + local : broadcast(kNoLimit);
+        };
+        std::size_t const inFours = count & ~std::size_t{3};
+        for (std::size_t n = 0; n < inFours; n += 4)
+            store(limitsOf(load(values + n)), values + n);
+        for (std::size_t n = inFours; n < count; ++n)
+            values[n] = limitsOf(broadcast(values[n]))[0];
     }
 
     /// A loop body. Each call has its own copy of the sampler, because cursors and caches must not be shared by tasks.
@@ -56,8 +64,7 @@ namespace {
                 float* const row = limit + first;
                 constexpr int kDepth = TSR::TileTree3D::Internal::TileLayout<Traits>::kUnitDepth;
                 sampler.sampleAll(mean, count, kDepth, TSR::TileTree3D::kWorldSpace, row);
-                for (unsigned int n = 0; n < count; ++n)
-                    row[n] = longestSide(row[n] * tolerance);
+                turnIntoLimits(tolerance, count, row);
             }
         }
     };

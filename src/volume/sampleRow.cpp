@@ -112,7 +112,7 @@ namespace {
                 isInside &= inTile < kSide - 1 && (isPositive || inTile >= 1);
                 return inTile;
             };
-            for (std::size_t n = row_.first(run); n <= row_.last[run]; ++n) {
+            for (std::size_t n = row_.first[run]; n != row_.first[run + 1]; ++n) {
                 row_.x[n] = place(points_[n].x, tile.i, offset.x);
                 row_.y[n] = place(points_[n].y, tile.j, offset.y);
                 row_.z[n] = place(points_[n].z, tile.k, offset.z);
@@ -142,6 +142,17 @@ namespace {
         PointRow& row_;
     };
 
+    template <int side, bool canBeBelow, class State>
+    void interpolateIn(State const& state, std::size_t count, std::size_t runCount, PointRow const& row, float* values)
+    {
+        if (state.haloChannel)
+            interpolateRow<side + 1, side + 1, canBeBelow>(count, runCount, {0, side - 1}, row, values);
+        else if (state.hasPositiveHalos())
+            interpolateRow<side, side + 1, canBeBelow>(count, runCount, {0, side - 1}, row, values);
+        else
+            interpolateRow<side, side + 2, canBeBelow>(count, runCount, {-1, side - 1}, row, values);
+    }
+
     float largestCoordinate(float3 const& v)
     {
         return std::max({v.x, v.y, v.z});
@@ -170,24 +181,23 @@ template <class Traits> bool sampleRow(LinearSamplerState<Traits>& state, RowSet
         row);
     if (!areNear)
         return false;
-    bool const isPadded = state.haloChannel, isPositive = isPadded || state.hasPositiveHalos();
+    std::size_t const runCount = findRuns(count, row);
     // If layers are on the upper sides only, places below the tile read its first voxels.
-    float const begin = isPositive ? -kLargestOffset : 1, end = kSide - 1;
-    std::size_t const runCount =
-        isPadded ? findRuns<false>(count, begin, end, row) : findRuns<true>(count, begin, end, row);
+    if (state.haloChannel)
+        std::fill_n(row.needsLayer, runCount, 0u);
+    else
+        findLayers(count, runCount, state.hasPositiveHalos() ? -kLargestOffset : 1, kSide - 1, row);
     std::size_t const emptyCount = TileFinder<Traits>(state, settings, points, row).findTiles(runCount);
     MODELING_ASSERT(std::find(row.values, row.values + runCount, nullptr) == row.values + runCount);
-    MODELING_ASSERT(runCount != 0 && row.last[runCount - 1] == count - 1);
-    int const padded = kSide + (isPositive ? 1 : 2);
-    TileArrays const arrays{{isPadded ? padded : kSide, padded}, isPositive ? 0 : -1, kSide - 1};
+    MODELING_ASSERT(runCount != 0 && row.first[0] == 0 && row.first[runCount] == count);
     // No place is below its tile if no offset is positive.
-    if (isPadded && largestCoordinate(settings.voxelOffset) <= 0)
-        interpolateRow<kSide + 1>(count, arrays, row, values);
+    if (largestCoordinate(settings.voxelOffset) <= 0)
+        interpolateIn<kSide, false>(state, count, runCount, row, values);
     else
-        interpolateRow<0>(count, arrays, row, values);
+        interpolateIn<kSide, true>(state, count, runCount, row, values);
     for (std::size_t n = 0; n < emptyCount; ++n) {
         std::uint32_t const run = row.empty[n];
-        std::fill(values + row.first(run), values + row.last[run] + 1, state.background);
+        std::fill(values + row.first[run], values + row.first[run + 1], state.background);
     }
     return true;
 }

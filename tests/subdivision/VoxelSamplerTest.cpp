@@ -50,18 +50,20 @@ template <class Traits> std::vector<float> sampledInRows(
 }
 
 /// Rows give the same values as single samples. Points are on short lines from random points; half of the lines are at
-/// multiples of a quarter, and so at the sides of tiles and voxels.
+/// multiples of a quarter, and so at the sides of tiles and voxels. On the last lines, points are so dense that a row has
+/// few tiles.
 template <class Traits> void expectSameInRows(LinearSampler<Traits> sampler, float reach)
 {
     Random random(9);
     std::vector<float3> points;
-    for (int n = 0; n < 400; ++n) {
-        bool const isSnapped = n % 2;
+    for (int n = 0; n < 440; ++n) {
+        bool const isSnapped = n % 2, isDense = n >= 400;
+        float const stride = isDense ? 0.05f : 1;
         auto const snapped = [&](float c) { return isSnapped ? std::floor(4 * c) / 4 : c; };
         float3 const from = random.point(reach);
-        for (int step = 0; step < 10; ++step)
-            points.push_back({snapped(from.x) + (isSnapped ? 0.25f : 0.3f) * float(step), snapped(from.y),
-                snapped(from.z) - (isSnapped ? 0.25f : 0.1f) * float(step)});
+        for (int step = 0; step < (isDense ? 200 : 10); ++step)
+            points.push_back({snapped(from.x) + (isSnapped ? 0.25f : 0.3f) * stride * float(step), snapped(from.y),
+                snapped(from.z) - (isSnapped ? 0.25f : 0.1f) * stride * float(step)});
     }
     points[5].y = kNan;
     std::vector<float> const values = sampledInRows(sampler, points);
