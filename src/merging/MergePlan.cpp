@@ -65,19 +65,19 @@ namespace {
         {
         }
 
-        MergeInput read(Object const& input)
+        /// \param names  The keys of the input.
+        MergeInput read(Object const& input, Orvan::Array<Orvan::String> const& names)
         {
             MergeInput result;
             result.object = &input;
             for (std::size_t component = 0; component != keys_.components.size(); ++component)
                 result.counts[component] = getElementCount(input, keys_.components[component]);
-            Orvan::Ptr<Orvan::Array<Orvan::String>> const names = input.keys();
-            isNewLayout_ = !layout_ || roles_.size() != names->size;
-            roles_.resize(names->size);
-            likelyTypes_.resize(names->size, ArrayView::kNoType);
-            result.arrays.resize(names->size);
-            for (std::size_t property = 0; property != names->size; ++property) {
-                update(roles_[property].name, names->data[property]);
+            isNewLayout_ = !layout_ || roles_.size() != names.size;
+            roles_.resize(names.size);
+            likelyTypes_.resize(names.size, ArrayView::kNoType);
+            result.arrays.resize(names.size);
+            for (std::size_t property = 0; property != names.size; ++property) {
+                update(roles_[property].name, names[property]);
                 result.arrays[property] = readProperty(input, likelyTypes_[property], roles_[property]);
                 likelyTypes_[property] = result.arrays[property].type;
             }
@@ -172,9 +172,14 @@ MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*
     // Each input writes its own entry.
     parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), kCoarseGrain), [&](auto const& range) {
         InputReader reader(keys);
-        for (std::size_t input = range.begin(); input != range.end(); ++input)
+        for (std::size_t input = range.begin(); input != range.end(); ++input) {
+            if (input + 1 != range.end())
+                __builtin_prefetch(inputs[input + 1]); // small inputs are scattered in memory
+            // Before all other look-ups: a host can start loading what is under the keys.
+            Orvan::Ptr<Orvan::Array<Orvan::String>> const names = inputs[input]->keys();
             if (accepts(*inputs[input]))
-                plan.inputs[input] = reader.read(*inputs[input]);
+                plan.inputs[input] = reader.read(*inputs[input], *names);
+        }
     });
     std::erase_if(plan.inputs, [](MergeInput const& input) { return !input.object; });
     return plan;

@@ -1,6 +1,7 @@
 #include <TessaraObject/Object.h>
 
 #include <algorithm>
+#include <array>
 #include <functional>
 #include <string_view>
 
@@ -92,8 +93,36 @@ void Object::eraseAllProperties()
     slots_.clear();
 }
 
+// Level by level: first all objects, then their entries, then what these refer to. The cache misses of a level overlap.
+void Object::prefetchHeldObjects() const
+{
+    std::array<Object const*, kFewKeys> objects;
+    std::size_t count = 0;
+    for (Entry const& entry : entries_) {
+        auto const* const held = entry.value.get<Orvan::Ptr<Object>>();
+        if (!held || !*held)
+            continue;
+        if (count == objects.size())
+            break;
+        held->prefetch();
+        objects[count++] = held->get();
+    }
+    auto const forEachEntry = [&](auto const& visit) {
+        for (std::size_t object = 0; object != count; ++object) {
+            std::vector<Entry> const& entries = objects[object]->entries_;
+            std::for_each_n(entries.begin(), std::min(entries.size(), kFewKeys), visit);
+        }
+    };
+    forEachEntry([](Entry const& entry) {
+        __builtin_prefetch(&entry.key);
+        __builtin_prefetch(&entry.value);
+    });
+    forEachEntry([](Entry const& entry) { entry.value.prefetch(); });
+}
+
 Orvan::Ptr<Orvan::Array<Orvan::String>> Object::keys() const
 {
+    prefetchHeldObjects();
     auto names = Orvan::MutablePtr<Orvan::Array<Orvan::String>>::make(entries_.size());
     for (std::size_t entry = 0; entry < entries_.size(); ++entry)
         (*names)[entry] = entries_[entry].key;

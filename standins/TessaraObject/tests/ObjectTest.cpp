@@ -62,6 +62,23 @@ TEST(Object, BehavesLikeAListInInsertionOrder)
     }
 }
 
+// Listing keys reads ahead in held objects, whatever they hold and however many they are.
+TEST(Object, ListsKeysOfHeldObjectsWithoutChangingThem)
+{
+    for (unsigned int const keyCount : {1u, 15u, 16u, 17u, 40u}) {
+        Ptr<Object> const held = objectOf({{"array", Orvan::makePtr<Array<int>>(2u)}, {"no array", Ptr<Array<int>>()},
+            {"no object", Ptr<Object>()}, {"text", String("text")}, {"nothing", PropertyValue()}});
+        MutablePtr<Object> const object = createObject();
+        for (unsigned int key = 0; key != keyCount; ++key) {
+            object->setProperty(std::to_string(key).c_str(), held);
+            object->setProperty(("null " + std::to_string(key)).c_str(), Ptr<Object>());
+            object->setProperty(("empty " + std::to_string(key)).c_str(), Ptr<Object>(createObject()));
+        }
+        EXPECT_EQ(object->keys()->size, 3 * keyCount);
+        EXPECT_EQ(held.useCount(), 1 + keyCount);
+    }
+}
+
 TEST(Object, ClonesShallowly)
 {
     Ptr<Array<int>> const array = Orvan::makePtr<Array<int>>(2u);

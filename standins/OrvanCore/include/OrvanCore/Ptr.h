@@ -110,6 +110,16 @@ public:
     /// The number of references; 0 for null. Exact only while no other thread copies or releases one.
     std::uint64_t useCount() const noexcept { return control_ ? control_->count.load(std::memory_order_acquire) : 0; }
 
+    /// Starts loading the value and the count into the caches, without waiting for them.
+    void prefetch() const noexcept
+    {
+        if (!value_)
+            return;
+        __builtin_prefetch(control_);
+        __builtin_prefetch(value_);
+        __builtin_prefetch(reinterpret_cast<char const*>(value_ + 1) - 1);
+    }
+
     /// Compares identity, not values.
     friend bool operator==(Ptr const& a, Ptr const& b) noexcept { return a.value_ == b.value_; }
 

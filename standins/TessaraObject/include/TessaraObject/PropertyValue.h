@@ -71,6 +71,13 @@ public:
     /// The type of the held value, `typeid(void)` if empty.
     std::type_info const& type() const noexcept { return operations_ ? *operations_->type : typeid(void); }
 
+    /// If it holds an `Orvan::Ptr`, starts loading what that refers to into the caches, without waiting for it.
+    void prefetch() const noexcept
+    {
+        if (operations_)
+            operations_->prefetch(storage_);
+    }
+
 private:
     struct Operations {
         std::type_info const* type;
@@ -78,6 +85,7 @@ private:
         void (*move)(std::byte* from, std::byte* to) noexcept; // leaves nothing to destroy in `from`
         void (*destroy)(std::byte* value) noexcept;
         void const* (*address)(std::byte const* value) noexcept;
+        void (*prefetch)(std::byte const* value) noexcept;
     };
 
     template <class T> static T* held(std::byte const* storage) noexcept
@@ -117,8 +125,14 @@ private:
 
     template <class T> static void const* addressOfHeld(std::byte const* value) noexcept { return held<T>(value); }
 
+    template <class T> static void prefetchHeld(std::byte const* value) noexcept
+    {
+        if constexpr (requires { held<T>(value)->prefetch(); })
+            held<T>(value)->prefetch();
+    }
+
     template <class T> static constexpr Operations kOperationsOf{
-        &typeid(T), &copyHeld<T>, &moveHeld<T>, &destroyHeld<T>, &addressOfHeld<T>};
+        &typeid(T), &copyHeld<T>, &moveHeld<T>, &destroyHeld<T>, &addressOfHeld<T>, &prefetchHeld<T>};
 
     void takeFrom(PropertyValue& other) noexcept
     {
