@@ -83,6 +83,21 @@ template <class Filter> void timeFilter(Run& run, std::size_t elements, Filter* 
     timeOnEach(run, elements, prepare, [](Filter* prepared) { prepared->Update(); });
 }
 
+/// The faces at each point, without the faces across edges. VTK uses several threads only for grids.
+template <auto make> void measureLinks(Run& run)
+{
+    auto const mesh = polyDataOf(made(make, run.size()));
+    vtkNew<vtkUnstructuredGrid> grid;
+    grid->SetPoints(mesh->GetPoints());
+    grid->SetCells(VTK_TRIANGLE, mesh->GetPolys());
+    measureRefinement(run, [&] {
+        grid->BuildLinks();
+        return static_cast<std::size_t>(grid->GetNumberOfCells());
+    });
+}
+Row const links("halfEdges:VTK", withoutLargest(kHalfEdges), measureLinks<Meshes::sphere>);
+Row const shuffledLinks("halfEdges shuffled:VTK", withoutLargest(kHalfEdges), measureLinks<Meshes::shuffled>);
+
 /// Moves points along their normals too.
 Row const smoothing("smooth triangles:VTK", kTriangles, [](Run& run) {
     PolygonMesh const& mesh = made(Meshes::noisy, run.size());

@@ -39,11 +39,13 @@ OPERATIONS = {
     ),
     "halfEdges": Operation(
         "adjacency of a mesh in order", "face",
-        note="CGAL and OpenMesh build their meshes from arrays; meshoptimizer finds the point across each edge only.",
+        note="CGAL and OpenMesh build their meshes from arrays. meshoptimizer finds only the point across each edge, VTK only the "
+        "faces at each point.",
     ),
     "halfEdges shuffled": Operation(
         "adjacency of a shuffled mesh", "face",
-        note="CGAL and OpenMesh build their meshes from arrays; meshoptimizer finds the point across each edge only.",
+        note="CGAL and OpenMesh build their meshes from arrays. meshoptimizer finds only the point across each edge, VTK only the "
+        "faces at each point.",
     ),
     "mergeMeshes": Operation(
         "merge meshes", "face", shown=("2/1000000", "3000/500"),
