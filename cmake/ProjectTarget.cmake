@@ -27,6 +27,10 @@ if(MODELING_SANITIZE)
     target_link_options(modeling_flags INTERFACE -fsanitize=${MODELING_SANITIZE})
     if(MODELING_SANITIZE MATCHES "undefined")
         target_compile_options(modeling_flags INTERFACE -fno-sanitize-recover=undefined)
+        if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+            target_compile_options(modeling_flags INTERFACE
+                -fsanitize-ignorelist=${PROJECT_SOURCE_DIR}/cmake/sanitizers.ignore)
+        endif()
     endif()
 endif()
 

@@ -369,7 +369,7 @@ namespace {
             schema["exclusiveMinimum"] = 0;
         auto const addBound = [&](char const* key, std::optional<double> const& bound) {
             if (bound)
-                schema[key] = *bound == static_cast<double>(static_cast<std::int64_t>(*bound))
+                schema[key] = std::abs(*bound) < 0x1p53 && *bound == std::trunc(*bound)
                     ? Json(static_cast<std::int64_t>(*bound))
                     : Json(*bound);
         };

@@ -147,7 +147,7 @@ void addNonGeoProperties(Random& random, Object& object)
     inner.setProperty("text", Orvan::String("inside"));
     inner.setProperty("nothing", Tessara::PropertyValue());
     Tessara::PropertyValue const values[] = {1.5f + float(random.below(9)), Orvan::String("text"), random.below(99),
-        Orvan::makePtr<Object>(inner), Orvan::makePtr<Orvan::Array<Orvan::String>>(2),
+        Orvan::makePtr<Object>(inner), Orvan::makePtr<Orvan::Array<Orvan::String>>(2U),
         Orvan::Ptr<Orvan::Array<float>>(), Common::DataInterpolationMode::Linear, Common::GeometryType::Strands,
         Tessara::Math::double4x4{}};
     for (std::size_t i = 0; i != std::size(values); ++i)

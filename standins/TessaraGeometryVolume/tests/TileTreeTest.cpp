@@ -58,7 +58,7 @@ TYPED_TEST(TileTree, HoldsWhatItWasBuiltFromAndBackgroundElsewhere)
 {
     std::vector<Voxel> voxels = randomVoxels(3000, 40, 1);
     for (int const far : {INT_MIN, INT_MIN + 3, -1'000'000'007, INT_MAX - 3, INT_MAX})
-        voxels.push_back({far, -far / 2, far, 1234.5f});
+        voxels.push_back({far, far / -2, far, 1234.5f});
     std::map<std::tuple<int, int, int>, float> expected;
     for (Voxel const& voxel : voxels)
         expected[{voxel.i, voxel.j, voxel.k}] = voxel.value;
