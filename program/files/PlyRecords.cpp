@@ -41,7 +41,11 @@ namespace {
                     return records_.startOf(records_.count);
                 }
             }
-            bool const hasOnlyIndices = lists_.size() == 1 && lists_[0].property->use == Use::Indices;
+            auto const isOtherList = [](PlyProperty const& p) { return p.lengthType && p.use != Use::Indices; };
+            auto const isIndices = [](PlyProperty const& p) { return p.use == Use::Indices; };
+            bool const hasOnlyIndices =
+                std::none_of(element_.properties.begin(), element_.properties.end(), isOtherList)
+                && std::any_of(element_.properties.begin(), element_.properties.end(), isIndices);
             if (hasOnlyIndices && layOut(Lists::Different) && findLists() && readElements())
                 return records_.startOf(records_.count);
             return std::nullopt;

@@ -188,6 +188,12 @@ namespace {
             " cannot be read: neither its name nor its first bytes tell the format; --format names it");
         EXPECT_EQ(refusalOf(".stl", std::string(90, '\0')),
             ", byte 80: the file is cut off or damaged: 0 triangles take 84 bytes, but it has 90");
+        EXPECT_EQ(refusalOf(".ply",
+                      "ply\nformat binary_little_endian 1.0\nelement vertex 1\nproperty float x\nproperty float y\n"
+                      "property float z\nelement face 1\nproperty list uchar int vertex_indices\n"
+                      "property list uchar float texcoord\nend_header\n"
+                          + bytesOf(std::endian::little, 0.0f, 0.0f, 0.0f, '\3', 0, 0, 0, '\377', 0.5f)),
+            ", face 0: the file is cut off: it declares 255 values of a list, but only 4 bytes follow");
 
         TemporaryFolder const folder;
         EXPECT_THROW(readGeometryFile(folder / "none.obj"), FileError);
