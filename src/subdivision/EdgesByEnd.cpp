@@ -1,10 +1,13 @@
 #include "EdgesByEnd.h"
 
+#include "OrderedEdgesByEnd.h"
+#include "sortEdges.h"
+
 #include "frame/Arrays.h"
 
-#include <array>
 #include <atomic>
 #include <bit>
+#include <optional>
 #include <utility>
 #include <vector>
 
@@ -111,78 +114,6 @@ namespace {
         return starts;
     }
 
-    bool haveSameStart(std::uint64_t a, std::uint64_t b)
-    {
-        return (a ^ b) >> 32 == 0;
-    }
-
-    struct Exchange {
-        std::size_t low, high;
-    };
-
-    /// Calls `visit(exchange)` for Batcher's merge exchange, a sorting network.
-    template <class Visit> constexpr void forEachExchange(std::size_t count, Visit const& visit)
-    {
-        std::size_t const top = std::bit_ceil(count) / 2;
-        for (std::size_t p = top; p > 0; p /= 2) {
-            std::size_t distance = p, remainder = 0;
-            for (std::size_t q = top;; q /= 2) {
-                for (std::size_t i = 0; i + distance < count; ++i)
-                    if ((i & p) == remainder)
-                        visit(Exchange{i, i + distance});
-                if (q == p)
-                    break;
-                distance = q - p;
-                remainder = p;
-            }
-        }
-    }
-
-    template <std::size_t kCount> constexpr auto sortingNetwork()
-    {
-        constexpr std::size_t kSize = [] {
-            std::size_t size = 0;
-            forEachExchange(kCount, [&](Exchange) { ++size; });
-            return size;
-        }();
-        std::array<Exchange, kSize> network{};
-        std::size_t size = 0;
-        forEachExchange(kCount, [&](Exchange exchange) { network[size++] = exchange; });
-        return network;
-    }
-
-    /// The value itself. Compilers would move two values at a time through memory, where the processor has to wait until both
-    /// have been written.
-    std::uint64_t inRegister(std::uint64_t value)
-    {
-        asm("" : "+r"(value));
-        return value;
-    }
-
-    template <std::size_t kCount> bool sortFew(std::uint64_t const* edges, std::uint64_t* sorted)
-    {
-        static constexpr auto kNetwork = sortingNetwork<kCount>();
-        std::array<std::uint64_t, kCount> edge;
-        for (std::size_t i = 0; i != kCount; ++i)
-            edge[i] = inRegister(edges[i]);
-        auto const exchange = [&](std::uint64_t& low, std::uint64_t& high) {
-            std::uint64_t const a = low, b = high;
-            low = a < b ? a : b;
-            high = a < b ? b : a;
-        };
-        [&]<std::size_t... kStep>(std::index_sequence<kStep...>)
-        {
-            (exchange(edge[kNetwork[kStep].low], edge[kNetwork[kStep].high]), ...);
-        }
-        (std::make_index_sequence<kNetwork.size()>());
-        bool hasRepeats = false;
-        for (std::size_t i = 0; i + 1 < kCount; ++i)
-            hasRepeats |= haveSameStart(edge[i], edge[i + 1]);
-        for (std::size_t i = 0; i != kCount; ++i)
-            sorted[i] = inRegister(edge[i]);
-        return hasRepeats;
-    }
-
     /// Sorts the edges of a bucket by the point at which they end, and in ascending order at each point.
     class BucketSorter {
     public:
@@ -254,35 +185,6 @@ namespace {
         return hasRepeats.load(std::memory_order_relaxed);
     }
 
-}
-
-bool sortEdges(std::uint64_t const* edges, std::size_t count, std::uint64_t* sorted)
-{
-    switch (count) {
-    case 0:
-        return false;
-    case 1:
-        return sortFew<1>(edges, sorted);
-    case 2:
-        return sortFew<2>(edges, sorted);
-    case 3:
-        return sortFew<3>(edges, sorted);
-    case 4:
-        return sortFew<4>(edges, sorted);
-    case 5:
-        return sortFew<5>(edges, sorted);
-    case 6:
-        return sortFew<6>(edges, sorted);
-    case 7:
-        return sortFew<7>(edges, sorted);
-    case 8:
-        return sortFew<8>(edges, sorted);
-    default:
-        if (edges != sorted)
-            std::copy_n(edges, count, sorted);
-        std::sort(sorted, sorted + count);
-        return std::adjacent_find(sorted, sorted + count, haveSameStart) != sorted + count;
-    }
 }
 
 bool listEdgesByEnd(

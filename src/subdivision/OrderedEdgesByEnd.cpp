@@ -1,4 +1,6 @@
-#include "EdgesByEnd.h"
+#include "OrderedEdgesByEnd.h"
+
+#include "sortEdges.h"
 
 #include "frame/Arrays.h"
 
