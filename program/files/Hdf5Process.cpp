@@ -50,12 +50,7 @@ namespace {
         ::setrlimit(resource, &limits);
     }
 
-    // Sanitizers reserve terabytes of address space.
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-    constexpr bool kLimitsMemory = false;
-#else
-    constexpr bool kLimitsMemory = true;
-#endif
+    constexpr bool kLimitsMemory = !MODELING_IS_SANITIZED; // sanitizers reserve terabytes of address space
 
     /// Limits a process that reads the structure of a file.
     void limitUse(std::uint64_t fileBytes)

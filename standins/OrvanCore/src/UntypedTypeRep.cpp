@@ -24,11 +24,7 @@ namespace Internal {
         // For smaller blocks, aligning to huge pages costs more than it gains.
         constexpr std::size_t kHugeBlock = 2 * kHugePage;
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-        constexpr bool kMayCache = false; // reused blocks would hide errors
-#else
-        constexpr bool kMayCache = true;
-#endif
+        constexpr bool kMayCache = !MODELING_IS_SANITIZED; // reused blocks would hide errors
 
         constexpr std::size_t kDefaultMebibytes = 256;
 

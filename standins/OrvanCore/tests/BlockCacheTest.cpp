@@ -16,11 +16,7 @@ using TestSupport::memoryOf;
 
 namespace {
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kKeepsBlocks = false;
-#else
-constexpr bool kKeepsBlocks = true;
-#endif
+constexpr bool kKeepsBlocks = !MODELING_IS_SANITIZED;
 
 constexpr std::uint64_t kMebibyte = 1 << 20;
 constexpr auto kBytes = UntypedTypeRep::of<char>();
