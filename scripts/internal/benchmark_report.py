@@ -141,9 +141,10 @@ THREADS = """
 ## Threads
 
 Time in ns per element at the largest size, repeated. The serial share is the part of the work that one thread does while the others
-wait, from the processor time and the wall time of the runs with {threads}, so waiting for memory counts as work. By Amdahl's law
-it allows the speed-ups in the last columns, if memory is fast enough for that many threads. Calls for one point, polygon, volume or
-pattern run on the thread of the caller, who may make many at a time: their share is 100 %.
+wait, from the processor time and the wall time of the run with {threads} that waited least, because whatever interrupts a run makes
+threads wait. Waiting for memory counts as work. By Amdahl's law the share allows the speed-ups in the last columns, if memory is
+fast enough for that many threads. Calls for one point, polygon, volume or pattern run on the thread of the caller, who may make
+many at a time: their share is 100 %.
 """
 
 
