@@ -1,6 +1,6 @@
-// A process that is forked inherits the locks that other threads hold. The address sanitizer of clang takes the locks of its
-// allocator before forks from version 19 on; with those before it, a new process could wait forever for a thread that only
-// its parent has. So this does what the later ones do.
+// A process that is forked inherits the locks that other threads hold. Older address sanitizers of clang do not take the locks
+// of their allocator before a fork, so that the new process could wait forever for a thread that only its parent has. This does
+// it for them. Newer ones do it themselves, and would wait forever if it were done twice.
 
 #include <pthread.h>
 
