@@ -1,5 +1,7 @@
 #include "Measuring.h"
 
+#include <algorithm>
+#include <cstddef>
 #include <cstring>
 #include <fstream>
 #include <string>
@@ -52,14 +54,22 @@ void PeakMemory::report(Run const& run, std::size_t elements) const
 
 void BusyThreads::start()
 {
-    processorSeconds_ -= secondsOf(CLOCK_PROCESS_CPUTIME_ID);
-    wallSeconds_ -= secondsOf(CLOCK_MONOTONIC);
+    processorSeconds_ = secondsOf(CLOCK_PROCESS_CPUTIME_ID);
+    wallSeconds_ = secondsOf(CLOCK_MONOTONIC);
 }
 
 void BusyThreads::stop()
 {
-    processorSeconds_ += secondsOf(CLOCK_PROCESS_CPUTIME_ID);
-    wallSeconds_ += secondsOf(CLOCK_MONOTONIC);
+    double const processorSeconds = secondsOf(CLOCK_PROCESS_CPUTIME_ID) - processorSeconds_;
+    counts_.push_back(processorSeconds / (secondsOf(CLOCK_MONOTONIC) - wallSeconds_));
+}
+
+void BusyThreads::report(Run const& run) const
+{
+    auto counts = counts_;
+    auto const middle = counts.begin() + static_cast<std::ptrdiff_t>(counts.size() / 2);
+    std::nth_element(counts.begin(), middle, counts.end());
+    run.report("busy threads", *middle);
 }
 
 Row::Row(std::string const& name, Sizes const& sizes, std::vector<std::string> const& variants, Measure const& measure)

@@ -77,15 +77,17 @@ private:
     std::int64_t before_ = 0;
 };
 
-/// How many threads work on average while it is started: processor time of the process over wall time.
+/// How many threads work while it is started: processor time of the process over wall time. If it is started several times,
+/// the median counts: in single runs all threads wait for a virtual machine to get memory or a processor from its host.
 class BusyThreads {
 public:
     void start();
     void stop();
-    void report(Run const& run) const { run.report("busy threads", processorSeconds_ / wallSeconds_); }
+    void report(Run const& run) const;
 
 private:
-    double processorSeconds_ = 0, wallSeconds_ = 0;
+    double processorSeconds_ = 0, wallSeconds_ = 0; // of the clocks at the start
+    std::vector<double> counts_;
 };
 
 /// Times `work()`, and reports the wall time per element as all of these do. The number of elements may be known only then.

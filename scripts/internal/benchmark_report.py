@@ -141,10 +141,12 @@ THREADS = """
 ## Threads
 
 Time in ns per element at the largest size, repeated. The serial share is the part of the work that one thread does while the others
-wait, from the processor time and the wall time of the run with {threads} that waited least, because whatever interrupts a run makes
-threads wait. Waiting for memory counts as work. By Amdahl's law the share allows the speed-ups in the last columns, if memory is
-fast enough for that many threads. Calls for one point, polygon, volume or pattern run on the thread of the caller, who may make
-many at a time: their share is 100 %.
+wait, from the processor time and the wall time of runs with {threads}. If each run gets a new input, the median of the runs counts:
+in some of them all threads wait for the host of a virtual machine, most of all for memory that is used for the first time, several
+times as long as the work takes. Of several rounds, the one that waited least counts. Waiting for the memory itself counts as work.
+By Amdahl's law the share allows the speed-ups in the last columns, if memory is fast enough for that many threads. Calls for one
+point, polygon, volume or pattern run on the thread of the caller, who may make many at a time: their share is 100 %. Calls that
+append a thousand points do so too, except the one that finds no room and copies the arrays.
 """
 
 

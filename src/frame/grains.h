@@ -31,8 +31,6 @@ inline constexpr unsigned int kSampledPointGrain = 4096;
 
 /// Up to this many points, the calling thread has listed the corners by point before a second thread has woken up.
 inline constexpr unsigned int kFewPoints = 4096;
-/// The same for filling several arrays with this many elements in total.
-inline constexpr std::uint64_t kFewElements = 1 << 16;
 /// The maximum number of parts of the points if each part has to read all corners: more of them gain little.
 inline constexpr unsigned int kMostPointParts = 8;
 
