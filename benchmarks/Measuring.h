@@ -93,6 +93,9 @@ private:
 /// Times `work()`, and reports the wall time per element as all of these do. The number of elements may be known only then.
 template <class Work> void timeRuns(Run& run, std::size_t const& elements, Work const& work)
 {
+    constexpr benchmark::IterationCount kMany =
+        1000; // of so many, reading clocks for each would cost time, and none is long
+    bool const areFew = run.state.max_iterations < kMany;
     PeakMemory peak;
     BusyThreads busy;
     peak.start();
@@ -100,8 +103,13 @@ template <class Work> void timeRuns(Run& run, std::size_t const& elements, Work 
     for (auto _ : run.state) {
         work();
         benchmark::ClobberMemory();
+        if (areFew) {
+            busy.stop();
+            busy.start();
+        }
     }
-    busy.stop();
+    if (!areFew)
+        busy.stop();
     peak.report(run, elements);
     busy.report(run);
     run.reportTimePerElement(elements);

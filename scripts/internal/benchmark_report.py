@@ -184,7 +184,12 @@ def peak(sample: Sample) -> str:
 
 
 def elements_of(sample: Sample) -> float:
-    return sample.seconds / sample.per_element if sample.per_element else 0
+    return round(sample.seconds / sample.per_element) if sample.per_element else 0
+
+
+def extent(row: Row, sample: Sample) -> tuple[float, list[int]]:
+    """By which rows of an operation are large; the other arguments decide between equally many elements."""
+    return elements_of(sample), [int(part) for part in row.size.split("/") if part.isdigit()]
 
 
 def ratio(results: Results, row: Row, own: Row, setting: Setting) -> str:
@@ -210,7 +215,7 @@ def threads_table(results: Results, settings: list[Setting], warm: Setting) -> I
     yield "| --- | --- | --- | --- | --- | --- |"
     own_rows = [row for row, setting in results if setting == warm and not row.contender and results[row, setting].busy_threads]
     for operation in order_of({row.operation for row in own_rows}):
-        row = max((row for row in own_rows if row.operation == operation), key=lambda row: elements_of(results[row, warm]))
+        row = max((row for row in own_rows if row.operation == operation), key=lambda row: extent(row, results[row, warm]))
         times = [nanoseconds(results[row, setting]) for setting in settings if not setting.is_fresh]
         share = serial_share(results[row, warm], warm.threads)
         speedups = [f"{1 / (share + (1 - share) / count):.1f}" for count in (16, 64)]
@@ -249,7 +254,7 @@ def overview(results: Results, settings: list[Setting], warm: Setting) -> Iterat
     groups = [group for group in groups_of(dict.fromkeys(row for row, _ in results)) if not group[0].contender]
     for operation in order_of({group[0].operation for group in groups}):
         sizes = [group for group in groups if group[0].operation == operation]
-        largest = max(sizes, key=lambda rows: (len(rows), elements_of(results[rows[0], warm])))
+        largest = max(sizes, key=lambda rows: (len(rows), extent(rows[0], results[rows[0], warm])))
         for own, *others in [group for group in sizes if group[0].size in operation_of(group[0]).shown] or [largest]:
             copy = next((row for row in others if row.contender == COPY), None)
             peers = [row for row in others if row != copy and not row.contender.startswith(OWN_LOOPS)]
