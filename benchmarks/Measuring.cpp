@@ -66,6 +66,8 @@ void BusyThreads::stop()
 
 void BusyThreads::report(Run const& run) const
 {
+    if (counts_.empty()) // the row was skipped
+        return;
     auto counts = counts_;
     auto const middle = counts.begin() + static_cast<std::ptrdiff_t>(counts.size() / 2);
     std::nth_element(counts.begin(), middle, counts.end());

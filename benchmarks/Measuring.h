@@ -78,7 +78,7 @@ private:
 };
 
 /// How many threads work while it is started: processor time of the process over wall time. If it is started several times,
-/// the median counts: in single runs all threads wait for a virtual machine to get memory or a processor from its host.
+/// the median counts: in single runs all threads of a virtual machine wait for memory or processors of its host.
 class BusyThreads {
 public:
     void start();
@@ -93,9 +93,7 @@ private:
 /// Times `work()`, and reports the wall time per element as all of these do. The number of elements may be known only then.
 template <class Work> void timeRuns(Run& run, std::size_t const& elements, Work const& work)
 {
-    constexpr benchmark::IterationCount kMany =
-        1000; // of so many, reading clocks for each would cost time, and none is long
-    bool const areFew = run.state.max_iterations < kMany;
+    bool const areFew = run.state.max_iterations < 1000; // else they are short, and reading clocks for each would show
     PeakMemory peak;
     BusyThreads busy;
     peak.start();

@@ -141,12 +141,12 @@ THREADS = """
 ## Threads
 
 Time in ns per element at the largest size, repeated. The serial share is the part of the work that one thread does while the others
-wait, from the processor time and the wall time of runs with {threads}. If each run gets a new input, the median of the runs counts:
-in some of them all threads wait for the host of a virtual machine, most of all for memory that is used for the first time, several
-times as long as the work takes. Of several rounds, the one that waited least counts. Waiting for the memory itself counts as work.
-By Amdahl's law the share allows the speed-ups in the last columns, if memory is fast enough for that many threads. Calls for one
-point, polygon, volume or pattern run on the thread of the caller, who may make many at a time: their share is 100 %. Calls that
-append a thousand points do so too, except the one that finds no room and copies the arrays.
+wait, from the processor time and the wall time of runs with {threads}. The median of the runs counts, or the mean of short ones: in
+some runs all threads wait for the host of a virtual machine, most of all for memory that is used for the first time, several times
+as long as the work takes. Of several rounds, the one that waited least counts. Waiting for the memory itself counts as work. By
+Amdahl's law the share allows the speed-ups in the last columns, if memory is fast enough for that many threads. Calls for one point,
+polygon, volume or pattern run on the thread of the caller, who may make many at a time: their share is 100 %. Calls that append a
+thousand points do so too, except the one that finds no room and copies the arrays.
 """
 
 
@@ -183,12 +183,12 @@ def peak(sample: Sample) -> str:
     return short(max(sample.peak_bytes, 0))
 
 
-def elements_of(sample: Sample) -> float:
+def elements_of(sample: Sample) -> int:
     return round(sample.seconds / sample.per_element) if sample.per_element else 0
 
 
-def extent(row: Row, sample: Sample) -> tuple[float, list[int]]:
-    """By which rows of an operation are large; the other arguments decide between equally many elements."""
+def extent(row: Row, sample: Sample) -> tuple[int, list[int]]:
+    """Orders the rows of an operation by size: the number of elements, and for equally many the arguments of the row."""
     return elements_of(sample), [int(part) for part in row.size.split("/") if part.isdigit()]
 
 

@@ -51,7 +51,7 @@ class Sample:
     working_bytes: float | None = None  # per element, beyond the result
     result: float | None = None  # the same for all contenders
     similar_result: float | None = None
-    busy_threads: float | None = None  # in the median run, or on average
+    busy_threads: float | None = None  # in the median run; of short ones, on average
     process_seconds: float = 0  # of the whole process
 
 
