@@ -16,19 +16,48 @@ namespace Modeling::Internal {
 namespace {
 
     constexpr unsigned int kMostParts = 1024;
-    constexpr unsigned int kPartsPerThread =
-        16; // at least half of it: few leave threads idle at the end, many share more faces
+    // Few parts leave threads idle at the end of a loop, many share more faces: it is at least half of the first number,
+    // and up to the second one if few faces are shared.
+    constexpr unsigned int kPartsPerThread = 16;
+    constexpr unsigned int kMostPartsPerThread = 64;
+    constexpr unsigned int kSampledFaces = 1024;
     constexpr unsigned int kLeastPointBits = 10;
     constexpr unsigned int kMostRuns = 256;
     constexpr unsigned int kShortRun = 4096; // takes a few microseconds to list
 
-    unsigned int choosePointBits(unsigned int pointCount)
+    unsigned int pointBitsForParts(unsigned int pointCount, unsigned int mostParts)
+    {
+        return static_cast<unsigned int>(std::bit_width((std::max(pointCount, 1U) - 1) / mostParts));
+    }
+
+    /// Estimates from a sample whether few faces have points in several parts.
+    bool areFewShared(FaceView const& mesh, unsigned int pointBits)
+    {
+        unsigned int const sampled = std::min(mesh.count, kSampledFaces);
+        unsigned int shared = 0;
+        for (std::uint64_t k = 0; k != sampled; ++k) {
+            auto const face = static_cast<unsigned int>(k * mesh.count / sampled);
+            auto const corners = mesh.offsets.part(face, mesh.faceVertex);
+            shared += std::any_of(corners.begin(), corners.end(),
+                [&](unsigned int point) { return point >> pointBits != corners.front() >> pointBits; });
+        }
+        return shared <= sampled / 32;
+    }
+
+    unsigned int choosePointBits(FaceView const& mesh, unsigned int pointCount)
     {
         auto const threads = static_cast<unsigned int>(tbb::this_task_arena::max_concurrency());
-        bool const isOnePart = pointCount <= kFewPoints || threads == 1;
-        unsigned int const mostParts = isOnePart ? 1 : std::min(threads * kPartsPerThread, kMostParts);
-        return std::max(isOnePart ? 0 : kLeastPointBits,
-            static_cast<unsigned int>(std::bit_width((std::max(pointCount, 1U) - 1) / mostParts)));
+        if (pointCount <= kFewPoints || threads == 1)
+            return pointBitsForParts(pointCount, 1);
+        auto const bitsFor = [=](unsigned int partsPerThread) {
+            return std::max(
+                kLeastPointBits, pointBitsForParts(pointCount, std::min(threads * partsPerThread, kMostParts)));
+        };
+        unsigned int const mostBits = bitsFor(kPartsPerThread);
+        unsigned int bits = bitsFor(kMostPartsPerThread);
+        while (bits < mostBits && !areFewShared(mesh, bits))
+            ++bits;
+        return bits;
     }
 
     /// Consecutive faces. All runs but the last one have the same length.
@@ -60,7 +89,7 @@ namespace {
 
 PointParts dividePoints(FaceView const& mesh, unsigned int pointCount)
 {
-    PointParts parts{pointCount, choosePointBits(pointCount), {}, {}};
+    PointParts parts{pointCount, choosePointBits(mesh, pointCount), {}, {}};
     std::size_t const partCount = pointCount == 0 ? 0 : std::size_t{parts.partOf(pointCount - 1)} + 1;
     FaceRuns const runs{mesh.count};
     std::size_t const runCount = runs.count();

@@ -127,6 +127,7 @@ TEST(Smooth, AgreesWithPlainSmoothingForAnyDivisionOfThePoints)
         {"triangles of random points", PolygonMesh::soup(9'000, 20'000, 3, 3, random)},
         {"faces of random points", PolygonMesh::soup(9'000, 9'000, 0, 7, random)},
         {"large faces with repeated points", PolygonMesh::soup(5'000, 4, 900, 1'100, random)},
+        {"no faces", PolygonMesh::soup(5'000, 0, 3, 3, random)},
         {"mixed",
             PolygonMesh(sphere)
                 .joinedWith(PolygonMesh::quads(60).withNoise(0.2f, 3))
