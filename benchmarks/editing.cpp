@@ -1,7 +1,10 @@
 // Adding, deleting and merging elements. The rows `:flat` and `:copy and fill` are what that costs at least: the same work
-// by loops over plain arrays on one thread, without objects, checks or exceptions to rules.
+// by loops over plain arrays on one thread, without objects, checks or exceptions to rules. So are the rows `:flat copies` for
+// merging, on all threads; in `:flat copies after look-ups` the host validates each input and returns each value once before.
 
 #include "Inputs.h"
+
+#include "frame/ParallelFor.h"
 
 #include <Modeling/addPointsToPointCloud.h>
 #include <Modeling/deleteFaces.h>
@@ -10,6 +13,7 @@
 #include <Modeling/mergePointClouds.h>
 #include <TessaraGeometry/Elements.h>
 #include <TessaraGeometry/Makers.h>
+#include <TessaraGeometry/Validators.h>
 
 #include <algorithm>
 
@@ -169,8 +173,78 @@ void measureMerging(Run& run, char const* component, std::size_t elements, std::
     reportCount(run, component, measureEdit(run, run.size() * elements, Object(), mergeInto));
 }
 
-Row const mergingMeshes("mergeMeshes", kMeshes, kBesideCopy, [](Run& run) {
+/// The first `each` elements of that array of every input, plus `base` times the index of the input if they are indices.
+template <class T, class Mesh> Orvan::Array<T> concatenated(
+    std::vector<PatchedSphere> const& inputs, Orvan::Array<T> Mesh::*array, std::size_t each, unsigned int base = 0)
+{
+    Orvan::Array<T> result(inputs.size() * each, Orvan::kUninitialized);
+    Modeling::parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), 1), [&](auto const& range) {
+        for (std::size_t input = range.begin(); input != range.end(); ++input) {
+            T const* const values = (inputs[input].*array).data;
+            T* const target = result.data + input * each;
+            if constexpr (std::is_same_v<T, unsigned int>)
+                std::transform(values, values + each, target,
+                    [shift = static_cast<unsigned int>(input) * base](unsigned int index) { return index + shift; });
+            else
+                std::copy_n(values, each, target);
+        }
+    });
+    return result;
+}
+
+std::size_t concatenate(std::vector<PatchedSphere> const& inputs)
+{
+    PatchedSphere const& first = inputs[0];
+    std::size_t const corners = first.faceVertex.size, faces = first.faceCount();
+    auto const points = concatenated(inputs, &PatchedSphere::points, first.points.size);
+    auto const normals = concatenated(inputs, &PatchedSphere::normals, first.points.size);
+    auto const faceVertex = concatenated(inputs, &PatchedSphere::faceVertex, corners, first.pointCount());
+    auto const coordinates = concatenated(inputs, &PatchedSphere::coordinates, corners);
+    auto const offsets = concatenated(inputs, &PatchedSphere::faceOffset, faces, static_cast<unsigned int>(corners));
+    auto const materials = concatenated(inputs, &PatchedSphere::materials, faces);
+    DoNotOptimize(points.data[0].x + normals.data[0].x + coordinates.data[0].x);
+    DoNotOptimize(faceVertex.data[0] + offsets.data[0]);
+    return materials.size;
+}
+
+/// Validates each object, and looks up each value in it once.
+void lookUp(std::vector<Orvan::Ptr<Object>> const& inputs)
+{
+    Orvan::String const data = sData, target = sTarget;
+    Modeling::parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), 1), [&](auto const& range) {
+        for (std::size_t input = range.begin(); input != range.end(); ++input) {
+            DoNotOptimize(bool(validateMesh(*inputs[input])));
+            auto const names = inputs[input]->keys();
+            for (Orvan::String const& name : *names) {
+                Tessara::PropertyValue const property = inputs[input]->getProperty(name);
+                if (auto const* const object = property.get<Orvan::Ptr<Object>>()) {
+                    DoNotOptimize((*object)->getProperty(target).empty());
+                    DoNotOptimize((*object)->getProperty(data).empty());
+                }
+            }
+        }
+    });
+}
+
+void measureFlatCopies(Run& run, PatchedSphere const& sphere)
+{
+    std::vector<PatchedSphere> const inputs(run.size(), sphere);
+    std::vector<Orvan::Ptr<Object>> objects; // with arrays of their own, of which the validator reads the indices
+    while (run.variant == ":flat copies after look-ups" && objects.size() != inputs.size())
+        objects.push_back(sphere.build());
+    std::size_t faces = 0;
+    timeRuns(run, run.size() * sphere.faceCount(), [&] {
+        lookUp(objects);
+        faces = concatenate(inputs);
+    });
+    run.reportResult(static_cast<double>(faces));
+}
+
+std::vector<std::string> const kMergingMeshes{"", ":memcpy", ":flat copies", ":flat copies after look-ups"};
+Row const mergingMeshes("mergeMeshes", kMeshes, kMergingMeshes, [](Run& run) {
     PatchedSphere const sphere(run.size(1));
+    if (run.variant.starts_with(":flat"))
+        return measureFlatCopies(run, sphere);
     std::size_t const bytes = sphere.bytes() - sizeof(unsigned int); // the offset behind the last face
     measureMerging(run, sFaceComp, sphere.faceCount(), bytes, mergeMeshes, [&] { return sphere.build(); });
 });

@@ -172,11 +172,15 @@ MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*
     // Each input writes its own entry.
     parallelFor(tbb::blocked_range<std::size_t>(0, inputs.size(), kCoarseGrain), [&](auto const& range) {
         InputReader reader(keys);
+        Orvan::Ptr<Orvan::Array<Orvan::String>> nextNames = inputs[range.begin()]->keys();
         for (std::size_t input = range.begin(); input != range.end(); ++input) {
+            Orvan::Ptr<Orvan::Array<Orvan::String>> const names = std::move(nextNames);
+            // Small inputs are scattered in memory. A host can start loading what is under the keys, so they are asked for
+            // before the look-ups in the input before.
+            if (input + 2 < range.end())
+                __builtin_prefetch(inputs[input + 2]);
             if (input + 1 != range.end())
-                __builtin_prefetch(inputs[input + 1]); // small inputs are scattered in memory
-            // Before all other look-ups: a host can start loading what is under the keys.
-            Orvan::Ptr<Orvan::Array<Orvan::String>> const names = inputs[input]->keys();
+                nextNames = inputs[input + 1]->keys();
             if (accepts(*inputs[input]))
                 plan.inputs[input] = reader.read(*inputs[input], *names);
         }
