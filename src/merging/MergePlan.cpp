@@ -10,6 +10,7 @@
 #include <cstring>
 #include <limits>
 #include <numeric>
+#include <utility>
 
 namespace Modeling::Internal {
 
@@ -174,13 +175,11 @@ MergePlan planMerge(MergeInputs const& inputs, std::initializer_list<char const*
         InputReader reader(keys);
         Orvan::Ptr<Orvan::Array<Orvan::String>> nextNames = inputs[range.begin()]->keys();
         for (std::size_t input = range.begin(); input != range.end(); ++input) {
-            Orvan::Ptr<Orvan::Array<Orvan::String>> const names = std::move(nextNames);
             // Small inputs are scattered in memory. A host can start loading what is under the keys, so they are asked for
             // before the look-ups in the input before.
             if (input + 2 < range.end())
                 __builtin_prefetch(inputs[input + 2]);
-            if (input + 1 != range.end())
-                nextNames = inputs[input + 1]->keys();
+            auto const names = std::exchange(nextNames, input + 1 != range.end() ? inputs[input + 1]->keys() : nullptr);
             if (accepts(*inputs[input]))
                 plan.inputs[input] = reader.read(*inputs[input], *names);
         }
