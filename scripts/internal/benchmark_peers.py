@@ -17,7 +17,7 @@ from benchmark_report import (
 )
 from benchmark_runs import Program, Record, Row, Sample, Setting, count_of, groups_of, in_turns, least
 
-LONG_ENOUGH = 6.0  # seconds: a row that has taken so long in one setting is not measured again
+LONG_ENOUGH = 15.0  # seconds: a row that has taken so long in one setting is not measured again
 TOLERANCE = {"result": 1e-4, "similar_result": 0.2}  # how far results may be apart, as fractions
 
 

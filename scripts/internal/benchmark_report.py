@@ -131,9 +131,10 @@ contender divided by that of Modeling, repeated, with all threads: above 1 Model
 beyond the input in a fresh run, result included, in bytes per element.
 
 `memcpy` copies the bytes of the input, or of the result if that is larger, into new memory on one thread. "Flat" contenders are
-loops over plain arrays, without objects and checks. Peers use several threads if they offer it; the source of each row in
-[benchmarks](../benchmarks) says what a peer leaves out or does besides. Results must be equal (numbers of elements, sums of values)
-or similar if methods differ, else the run fails.
+loops over plain arrays, without objects and checks; those "after look-ups" have the host check each input and hand out each property
+once before they copy. Peers use several threads if they offer it; the source of each row in [benchmarks](../benchmarks) says what a
+peer leaves out or does besides. Results must be equal (numbers of elements, sums of values) or similar if methods differ, else the
+run fails.
 """
 
 
